@@ -1,0 +1,24 @@
+# Compiler settings that every target of this project shares.
+find_package(Threads REQUIRED)
+
+find_program(CCACHE ccache)
+if(CCACHE)
+  # Precompiled headers and several checkouts side by side need these two relaxations.
+  set(CMAKE_CXX_COMPILER_LAUNCHER
+      ${CMAKE_COMMAND} -E env CCACHE_SLOPPINESS=pch_defines,time_macros,include_file_mtime,include_file_ctime
+      CCACHE_NOHASHDIR=1 CCACHE_BASEDIR=${CMAKE_SOURCE_DIR} ${CCACHE})
+endif()
+
+add_library(zav_options INTERFACE)
+target_compile_options(zav_options INTERFACE
+  -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wnon-virtual-dtor
+  -Woverloaded-virtual -Wcast-align -Wnull-dereference -Werror
+  # Only its header is wanted from a precompiled header, not its debug info in every object.
+  -fpch-preprocess)
+# File offsets and times are 64 bits wide on 32-bit Linux too.
+target_compile_definitions(zav_options INTERFACE _FILE_OFFSET_BITS=64)
+target_link_libraries(zav_options INTERFACE Threads::Threads)
+if(CMAKE_CXX_FLAGS MATCHES "-fsanitize")
+  # Instrumented code trips the flow analysis behind this warning.
+  target_compile_options(zav_options INTERFACE -Wno-null-dereference -Wno-maybe-uninitialized)
+endif()

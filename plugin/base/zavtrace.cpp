@@ -1,0 +1,139 @@
+#include "base/zavtrace.h"
+
+#include <cstdint>
+#include <cstdio>
+#include <cstring>
+
+#include "base/zavstr.h"
+
+namespace ZAV {
+namespace {
+
+constexpr const char* kFlags = "-+ #0";
+constexpr const char* kDigits = "0123456789";
+constexpr const char* kLengths = "hljztL";
+constexpr const char* kConversions = "diuxXocsp";
+
+/// The conversion that begins at the "%" in `format`, without its length modifiers; empty when
+/// printf knows none of that form. `end` is set behind it.
+std::string conversionAt(const char* format, const char*& end) {
+    const char* at = format + 1;
+    at += std::strspn(at, kFlags);
+    at += std::strspn(at, kDigits);
+    if (*at == '.') {
+        ++at;
+        at += std::strspn(at, kDigits);
+    }
+    const std::string head(format, at);
+    at += std::strspn(at, kLengths);
+    if (*at == '\0' || std::strchr(kConversions, *at) == nullptr) return {};
+    end = at + 1;
+    return head + *at;
+}
+
+template <typename T>
+void appendFormatted(const std::string& conversion, T value, std::string& out) {
+    char buffer[64];
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+    // The caller made the conversion for exactly this type.
+    const int length = std::snprintf(buffer, sizeof buffer, conversion.c_str(), value);
+#pragma GCC diagnostic pop
+    if (length > 0) {
+        out.append(buffer, std::min(static_cast<std::size_t>(length), sizeof buffer - 1));
+    }
+}
+
+/// The precision of a conversion, or no limit.
+std::size_t precisionOf(const std::string& conversion) {
+    const std::size_t dot = conversion.find('.');
+    if (dot == std::string::npos) return std::string::npos;
+    return static_cast<std::size_t>(std::strtoul(conversion.c_str() + dot + 1, nullptr, 10));
+}
+
+}  // namespace
+
+TraceArgument::TraceArgument(const CharStar& text)
+    : kind_(Kind::Text), pointer_(static_cast<const char*>(text)) {}
+
+void TraceArgument::formatText(const std::string& conversion, std::string& out) const {
+    if (kind_ == Kind::Wide) {
+        const CharStar narrow = static_cast<const String*>(pointer_)->c_str();
+        const char* const text = narrow;
+        out.append(text, ::strnlen(text, precisionOf(conversion)));
+        return;
+    }
+    const char* const text = static_cast<const char*>(pointer_);
+    if (text == nullptr) {
+        out += "(null)";
+        return;
+    }
+    out.append(text, ::strnlen(text, precisionOf(conversion)));
+}
+
+void TraceArgument::format(const std::string& conversion, std::string& out) const {
+    const char letter = conversion.back();
+    const std::string head = conversion.substr(0, conversion.size() - 1);
+    const bool isNumber = kind_ == Kind::Signed || kind_ == Kind::Unsigned;
+    if (isNumber && letter == 'c') {
+        out += static_cast<char>(number_);
+    } else if (isNumber && (letter == 's' || letter == 'p')) {
+        out += std::to_string(number_);
+    } else if (isNumber && (letter == 'd' || letter == 'i')) {
+        appendFormatted(head + "lld", number_, out);
+    } else if (isNumber) {
+        // Hexadecimal digits of a negative int are those of its own 32 bits.
+        const long long value =
+            kind_ == Kind::Signed && number_ < 0 && number_ >= INT32_MIN
+                ? static_cast<long long>(static_cast<std::uint32_t>(number_))
+                : number_;
+        appendFormatted(head + "ll" + letter, static_cast<unsigned long long>(value), out);
+    } else if (kind_ == Kind::Pointer || letter == 'p') {
+        appendFormatted("%p", pointer_, out);
+    } else {
+        formatText(conversion, out);
+    }
+}
+
+std::string formatTrace(const char* format, std::initializer_list<TraceArgument> arguments) {
+    std::string out;
+    const TraceArgument* next = arguments.begin();
+    for (const char* at = format; *at != '\0';) {
+        if (*at != '%') {
+            const std::size_t run = std::strcspn(at, "%");
+            out.append(at, run);
+            at += run;
+            continue;
+        }
+        const char* end = nullptr;
+        const std::string conversion = conversionAt(at, end);
+        if (at[1] == '%') {
+            out += '%';
+            at += 2;
+        } else if (conversion.empty() || next == arguments.end()) {
+            out += *at++;
+        } else {
+            (next++)->format(conversion, out);
+            at = end;
+        }
+    }
+    return out;
+}
+
+void Trace::Place::write(unsigned level, const char* format,
+                         std::initializer_list<TraceArgument> arguments) const {
+    const int savedErrno = errno;
+    const std::string text = formatTrace(format, arguments);
+    RAS1_Printf(&trace_.block_, level, line_, "%s", text.c_str());
+    errno = savedErrno;
+}
+
+void Trace::writeExit() const {
+    if (hasResult_) {
+        RAS1_ExitValue(&block_, line_, result_);
+    } else {
+        RAS1_Exit(&block_, line_);
+    }
+}
+
+}  // namespace ZAV

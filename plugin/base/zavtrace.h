@@ -1,0 +1,124 @@
+/// Tracing for the functions of this library: one line per function gives it its trace block, with
+/// entry and exit events, and writes lines at detail or error level.
+///
+///     RAS1_UNIT traceUnit{"zavutil"};                       // once per source file
+///
+///     bool Util::pathExists(const String& path) {
+///         Trace trace(traceUnit);
+///         ...
+///         trace().detail("Path [%s] exists", path);
+///         return trace.exit(true);
+///     }
+///
+/// The format is printf's, but every argument carries its own type: a conversion that does not
+/// match its argument still prints something sensible, and one that printf does not know is
+/// written as it stands. Arguments are converted only when the line is wanted.
+#pragma once
+
+#include <initializer_list>
+#include <string>
+#include <type_traits>
+
+#include "platform/ras1.h"
+
+namespace ZAV {
+
+class CharStar;
+class String;
+
+/// One argument of a trace line. Borrows what it is made from.
+class TraceArgument {
+public:
+    template <typename T, std::enable_if_t<std::is_integral_v<T> || std::is_enum_v<T>, int> = 0>
+    TraceArgument(T value)
+        : kind_(std::is_signed_v<T> || std::is_enum_v<T> ? Kind::Signed : Kind::Unsigned),
+          number_(static_cast<long long>(value)) {}
+    TraceArgument(const char* text) : kind_(Kind::Text), pointer_(text) {}
+    TraceArgument(const std::string& text) : kind_(Kind::Text), pointer_(text.c_str()) {}
+    TraceArgument(const void* pointer) : kind_(Kind::Pointer), pointer_(pointer) {}
+    TraceArgument(const String& text) : kind_(Kind::Wide), pointer_(&text) {}
+    TraceArgument(const CharStar& text);
+
+    /// Appends the argument to `out` under a conversion such as "%-5d" or "%.64s". A text is read
+    /// up to its terminating 0 or the conversion's precision, whichever comes first.
+    void format(const std::string& conversion, std::string& out) const;
+
+private:
+    enum class Kind { Signed, Unsigned, Text, Wide, Pointer };
+    void formatText(const std::string& conversion, std::string& out) const;
+
+    Kind kind_;
+    union {
+        long long number_;
+        const void* pointer_;
+    };
+};
+
+/// The text that a trace line has.
+std::string formatTrace(const char* format, std::initializer_list<TraceArgument> arguments);
+
+/// The trace block of one function call. Lives on the stack, first in the function.
+class Trace {
+public:
+    explicit Trace(RAS1_UNIT& unit, const char* function = __builtin_FUNCTION(),
+                   int line = __builtin_LINE())
+        : block_{&unit, function}, flags_(RAS1_Flags(unit)), line_(line) {
+        if ((flags_ & RAS1_FLOW) != 0) RAS1_Entry(&block_, line);
+    }
+    ~Trace() {
+        if ((flags_ & RAS1_FLOW) != 0) writeExit();
+    }
+    Trace(const Trace&) = delete;
+    Trace& operator=(const Trace&) = delete;
+
+    /// A place in the source from which lines are written.
+    class Place {
+    public:
+        Place(const Trace& trace, int line) : trace_(trace), line_(line) {}
+
+        template <typename... Arguments>
+        void detail(const char* format, const Arguments&... arguments) const {
+            if (trace_.detailed()) write(RAS1_DETAIL, format, {TraceArgument(arguments)...});
+        }
+        template <typename... Arguments>
+        void error(const char* format, const Arguments&... arguments) const {
+            if (trace_.erroneous()) write(RAS1_ERROR, format, {TraceArgument(arguments)...});
+        }
+
+    private:
+        void write(unsigned level, const char* format,
+                   std::initializer_list<TraceArgument> arguments) const;
+        const Trace& trace_;
+        int line_;
+    };
+
+    /// Lines are written from the place of the call: trace().error("...").
+    Place operator()(int line = __builtin_LINE()) const { return Place(*this, line); }
+
+    /// Gives the exit event the function's result; returns it.
+    template <typename T>
+    T exit(T result, int line = __builtin_LINE()) {
+        static_assert(std::is_integral_v<T> || std::is_enum_v<T>, "only numbers are traced");
+        line_ = line;
+        hasResult_ = true;
+        result_ = static_cast<long>(result);
+        return result;
+    }
+
+    /// Whether detail lines are wanted; ask before working something out only for a trace.
+    bool detailed() const { return (flags_ & RAS1_DETAIL) != 0; }
+    bool erroneous() const { return (flags_ & RAS1_ERROR) != 0; }
+
+    const RAS1_BLOCK& block() const { return block_; }
+
+private:
+    void writeExit() const;
+
+    RAS1_BLOCK block_;
+    unsigned flags_;
+    int line_;
+    bool hasResult_ = false;
+    long result_ = 0;
+};
+
+}  // namespace ZAV

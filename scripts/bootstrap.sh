@@ -1,0 +1,51 @@
+#!/bin/sh
+# Installs what building and testing needs and this machine lacks, with the distribution's package
+# manager. Safe to run again: it says nothing and changes nothing when all is there.
+set -eu
+cd "$(dirname "$0")/.."
+
+packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev libexpat1-dev
+libboost-dev nlohmann-json3-dev libcli11-dev mksh curl procps'
+
+as_root() {
+    if [ "$(id -u)" -eq 0 ]; then "$@"; else sudo "$@"; fi
+}
+
+# A mirror that is being updated makes one list fail; the others still serve, and what is really
+# missing shows when it is installed.
+refresh_lists() {
+    as_root apt-get update -qq 2>/dev/null ||
+        echo "bootstrap: some package lists could not be refreshed; going on with what is there" >&2
+}
+
+is_installed() {
+    dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null | grep -qx installed
+}
+
+missing=
+for package in $packages; do
+    is_installed "$package" || missing="$missing $package"
+done
+if [ -n "$missing" ]; then
+    echo "bootstrap: installing$missing"
+    refresh_lists
+    # shellcheck disable=SC2086
+    DEBIAN_FRONTEND=noninteractive as_root apt-get install -y -qq --no-install-recommends $missing >/dev/null
+fi
+
+# The 32-bit expat cannot be installed beside the 64-bit one: it is unpacked below build/ instead.
+i386_root=build/third_party/i386
+if [ ! -f "$i386_root/usr/lib/i386-linux-gnu/libexpat.a" ]; then
+    echo "bootstrap: unpacking the 32-bit expat into $i386_root"
+    if ! dpkg --print-foreign-architectures | grep -qx i386; then
+        as_root dpkg --add-architecture i386
+        refresh_lists
+    elif ! apt-cache show libexpat1-dev:i386 >/dev/null 2>&1; then
+        refresh_lists
+    fi
+    mkdir -p "$i386_root"
+    scratch=$(mktemp -d)
+    trap 'rm -rf "$scratch"' EXIT
+    (cd "$scratch" && apt-get -qq -o APT::Sandbox::User=root download libexpat1-dev:i386)
+    dpkg -x "$scratch"/libexpat1-dev_*_i386.deb "$i386_root"
+fi

@@ -1,0 +1,23 @@
+#!/bin/sh
+# Builds and runs every test: on this machine's width, on 32-bit, under the address and
+# undefined-behaviour sanitizers, and what starts threads under the thread sanitizer.
+#
+#   scripts/test.sh [PRESET ...]     only these presets
+set -eu
+cd "$(dirname "$0")/.."
+
+scripts/bootstrap.sh
+[ $# -gt 0 ] || set -- native i686 asan tsan
+
+for preset in "$@"; do
+    echo "== $preset: build"
+    cmake --preset "$preset" >"build/$preset.configure.log" 2>&1 || {
+        cat "build/$preset.configure.log"
+        exit 1
+    }
+    cmake --build --preset "$preset" -- --quiet
+done
+for preset in "$@"; do
+    echo "== $preset: test"
+    ctest --preset "$preset" --progress
+done

@@ -1,0 +1,13 @@
+/// A test program that links this takes the place of BSS1_Sleep: nothing sleeps, and what would
+/// have slept is written down.
+#pragma once
+
+#include <vector>
+
+namespace fake_sleep {
+
+/// The seconds asked for since the last reset(), in order, by all threads.
+std::vector<unsigned> slept();
+void reset();
+
+}  // namespace fake_sleep
