@@ -12,7 +12,7 @@ endif()
 add_library(zav_options INTERFACE)
 target_compile_options(zav_options INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wnon-virtual-dtor
-  -Woverloaded-virtual -Wcast-align -Wnull-dereference -Werror
+  -Woverloaded-virtual -Wcast-align -Werror
   # Only its header is wanted from a precompiled header, not its debug info in every object.
   -fpch-preprocess)
 # File offsets and times are 64 bits wide on 32-bit Linux too.
@@ -20,5 +20,5 @@ target_compile_definitions(zav_options INTERFACE _FILE_OFFSET_BITS=64)
 target_link_libraries(zav_options INTERFACE Threads::Threads)
 if(CMAKE_CXX_FLAGS MATCHES "-fsanitize")
   # Instrumented code trips the flow analysis behind this warning.
-  target_compile_options(zav_options INTERFACE -Wno-null-dereference -Wno-maybe-uninitialized)
+  target_compile_options(zav_options INTERFACE -Wno-maybe-uninitialized)
 endif()
