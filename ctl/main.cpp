@@ -1,0 +1,71 @@
+// zavctl: sends a central server's requests to a managed host and shows how they ended.
+
+#include <CLI/CLI.hpp>
+#include <clocale>
+#include <csignal>
+#include <cstdio>
+
+#include "ctl/commands.h"
+#include "ctl/options.h"
+#include "ctl/outcome.h"
+
+namespace {
+
+void addGlobalOptions(CLI::App& app, ctl::Options& options) {
+    app.add_option("--socket", options.socket,
+                   "The host's socket; without it $ZAV_SOCKET, else zavhost.sock in\n"
+                   "$XDG_RUNTIME_DIR, else /run/zavhost.sock")
+        ->type_name("PATH");
+    app.add_option("--rpc-socket", options.rpcSocket,
+                   "The host's file transfer socket; without it the socket's name with .rpc\n"
+                   "appended")
+        ->type_name("PATH");
+    app.add_flag("--json", options.json, "Print one JSON document");
+    app.add_option("--timeout", options.timeoutSeconds,
+                   "How long to wait for an answer or an outcome; 660 if not given")
+        ->check(CLI::Range(0.0, 1e9))
+        ->type_name("SECONDS");
+    app.footer(
+        "Exit status: 0 success, 1 the host reported a failure, 2 wrong usage,\n"
+        "3 no host reached, 4 no outcome within --timeout.");
+}
+
+int run(int argc, char** argv) {
+    CLI::App app("Manages the monitoring agents of one host.", "zavctl");
+    ctl::Options options;
+    int status = ctl::kSuccess;
+    app.require_subcommand(1);
+    app.fallthrough();
+    addGlobalOptions(app, options);
+    // Runs before the command's own callback, when all options are known.
+    app.parse_complete_callback([&options] {
+        if (options.socket.empty()) options.socket = ctl::defaultSocket();
+        if (options.rpcSocket.empty()) options.rpcSocket = options.socket + ".rpc";
+    });
+    ctl::addTaskCommands(app, options, status);
+    ctl::addConfigurationCommands(app, options, status);
+    ctl::addInformationCommands(app, options, status);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::ParseError& error) {
+        const int code = app.exit(error);
+        return code == 0 ? ctl::kSuccess : ctl::kWrongUsage;
+    }
+    return status;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    std::setlocale(LC_CTYPE, "");
+    std::signal(SIGPIPE, SIG_IGN);  // a host that goes away is an error of the write
+    try {
+        return run(argc, argv);
+    } catch (const ctl::Failure& failure) {
+        std::fprintf(stderr, "zavctl: %s\n", failure.what());
+        return failure.status();
+    } catch (const std::exception& error) {
+        std::fprintf(stderr, "zavctl: %s\n", error.what());
+        return ctl::kNoHost;
+    }
+}
