@@ -7,7 +7,7 @@
 namespace {
 
 std::mutex& guard() {
-    static std::mutex& instance = *new std::mutex;   // used by threads that outlive main
+    static std::mutex& instance = *new std::mutex;  // used by threads that outlive main
     return instance;
 }
 

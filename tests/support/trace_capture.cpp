@@ -49,7 +49,8 @@ TraceCapture::~TraceCapture() {
 std::vector<TraceLine> TraceCapture::lines() const {
     std::vector<TraceLine> found;
     std::istringstream in(scratch_.read("trace.log"));
-    for (std::string line; std::getline(in, line);) found.push_back(parseLine(line));
+    for (std::string line; std::getline(in, line);)
+        found.push_back(parseLine(line));
     return found;
 }
 
@@ -71,7 +72,8 @@ std::vector<std::string> TraceCapture::details(const std::string& unit) const {
 
 int TraceCapture::count(char level, const std::string& text) const {
     int found = 0;
-    for (const std::string& candidate : texts(level, "")) found += candidate == text ? 1 : 0;
+    for (const std::string& candidate : texts(level, ""))
+        found += candidate == text ? 1 : 0;
     return found;
 }
 

@@ -7,11 +7,11 @@
 #include "support/scratch_dir.h"
 
 struct TraceLine {
-    char level = '?';    ///< 'E' error, 'D' detail, 'F' entry or exit
+    char level = '?';  ///< 'E' error, 'D' detail, 'F' entry or exit
     std::string unit;
     int line = 0;
     std::string function;
-    std::string text;    ///< with line ends as they were passed, the trailing ones dropped
+    std::string text;  ///< with line ends as they were passed, the trailing ones dropped
 };
 
 class TraceCapture {
