@@ -1,0 +1,13 @@
+#include "tasks/return_codes.h"
+
+const char* const rc2MsgId[36] = {
+    "",         "ZAV1001E", "ZAV1002E", "ZAV1003E", "ZAV1004E", "ZAV1005E", "ZAV1006E", "ZAV1007E",
+    "ZAV1008E", "ZAV1009E", "ZAV1010E", "ZAV1011E", "ZAV1012E", "ZAV1013E", "ZAV1014E", "ZAV1015E",
+    "ZAV1016E", "ZAV1017E", "ZAV1018E", "ZAV1019E", "ZAV1020E", "ZAV1021E", "ZAV1022E", "ZAV1023E",
+    "ZAV1024E", "ZAV1025E", "ZAV1026E", "ZAV1027E", "ZAV1028E", "ZAV1029E", "ZAV1030E", "ZAV1031E",
+    "ZAV1032E", "ZAV1033E", "ZAV1034E", "ZAV1035I",
+};
+
+const char* rcToMsgId(TASK_RC rc) {
+    return rc2MsgId[rc == TASK_OK ? 0 : rc - 1000];
+}
