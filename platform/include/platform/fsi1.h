@@ -3,7 +3,8 @@
 
 #include <cstdint>
 
-/// Result codes; any other non-zero code is an errno value.
+/// Result codes; any other non-zero code is an errno value (EIO in place of the one whose number
+/// would read as the end of the list).
 enum : int {
     FSI1_OK = 0,
     FSI1_END_OF_LIST = 9,
@@ -11,9 +12,9 @@ enum : int {
 
 /// One entry of a directory.
 struct FSI1_ENTRY {
-    char path[4096];          ///< directory, "/" and file name, 0-terminated
+    char path[4096];          ///< directory, "/" (one) and file name, 0-terminated
     std::int64_t timeStamp;   ///< last modification, seconds since the epoch
-    bool isDirectory;         ///< true for directories; links are followed
+    bool isDirectory;         ///< true for directories; links are followed if they lead anywhere
 };
 
 /// An open listing; owned by the facility.
