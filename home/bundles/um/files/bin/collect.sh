@@ -1,0 +1,99 @@
+# shellcheck shell=sh
+# The universal agent's collectors. The agent sets work, scripts, providers, max_kb and
+# script_seconds; child is the process to end with the agent.
+# shellcheck disable=SC2154
+
+# provider_started TYPE: the combined type ASFS stands for its four members.
+provider_started() {
+    case ,$providers, in
+    *",$1,"* | *,ASFS,*) return 0 ;;
+    esac
+    return 1
+}
+
+collect_all() {
+    for import in "$work"/imported/*; do
+        [ -f "$import" ] || continue
+        application=$(config_value APPL "$import")
+        provider_type=$(config_value DPTYPE "$import" | tr '[:lower:]' '[:upper:]')
+        data_source=$(config_value SOURCE "$import")
+        rows=$AGENT_DATA/$application.csv
+        if ! provider_started "$provider_type"; then
+            say_once "$application: data provider $provider_type is not started"
+            continue
+        fi
+        keep_below "$rows" "$max_kb"
+        case $provider_type in
+        SCRP) collect_script ;;
+        FILE) collect_file ;;
+        *) say_once "$application: no collector for $provider_type" ;;
+        esac
+    done
+}
+
+# What holds for every round is said in the first one only.
+said=''
+say_once() {
+    case $said in
+    *"<$1>"*) ;;
+    *)
+        said="$said<$1>"
+        say "$1"
+        ;;
+    esac
+}
+
+# store_rows: each line of standard input becomes a row with the time before it.
+store_rows() {
+    [ -s "$rows" ] || echo "time,${fields:-value}" >>"$rows"
+    NOW=$(date -u +%Y-%m-%dT%H:%M:%SZ) awk '{ sub(/\r$/, ""); print ENVIRON["NOW"] "," $0 }' \
+        >>"$rows"
+}
+
+collect_script() {
+    fields=$(config_value FIELDS "$import")
+    # Scripts are run from the one directory that they are imported into.
+    script=$scripts/${data_source##*/}
+    [ -x "$script" ] || {
+        say_once "$application: no script $script"
+        return
+    }
+    output=$work/.output
+    timeout --foreground -k 5 "$script_seconds" "$script" >"$output" </dev/null &
+    child=$!
+    wait "$child"
+    status=$?
+    child=''
+    [ "$status" -eq 0 ] || say "$application: $script ended with status $status"
+    head -c 65536 "$output" | store_rows
+    rm -f -- "$output"
+}
+
+# collect_file: the complete lines that the file has gained since the last round; offsets/ keeps how
+# far it was read. A file that has become shorter was replaced and is read from its start.
+collect_file() {
+    fields=$(config_value FIELDS "$import")
+    [ -f "$data_source" ] || {
+        say_once "$application: no file $data_source"
+        return
+    }
+    offset_file=$work/offsets/${import##*/}
+    offset=0
+    [ ! -f "$offset_file" ] || read -r offset <"$offset_file"
+    size=$(wc -c <"$data_source")
+    [ "$offset" -le "$size" ] || offset=0
+    [ "$offset" -lt "$size" ] || return 0
+    chunk=$work/.chunk
+    tail -c "+$((offset + 1))" -- "$data_source" | head -c 65536 >"$chunk"
+    complete=$(wc -l <"$chunk")
+    if [ "$complete" -eq 0 ]; then
+        # A line longer than the chunk would hold up everything behind it.
+        [ "$(wc -c <"$chunk")" -ge 65536 ] || return 0
+        taken=65536
+    else
+        taken=$(head -n "$complete" "$chunk" | wc -c)
+    fi
+    head -c "$taken" "$chunk" | store_rows
+    echo "$((offset + taken))" >"$offset_file"
+    rm -f -- "$chunk"
+}
