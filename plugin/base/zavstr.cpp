@@ -1,0 +1,371 @@
+// String: what needs no code page. The conversions are in zavstr_conv.cpp.
+
+#include "base/zavstr.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <cstring>
+#include <cwctype>
+#include <ostream>
+#include <string>
+
+#include "base/zavtrace.h"
+
+namespace ZAV {
+namespace {
+
+RAS1_UNIT traceUnit{"zavstr"};
+
+[[noreturn]] void throwOutOfBounds(const Trace& trace, int line = __builtin_LINE()) {
+    trace(line).error("IndexOutOfBounds occurred, throwing exception");
+    throw IndexOutOfBoundsException(line, traceUnit.name);
+}
+
+/// Whether `n` units, at least one, stand at `pos` in a text of `length` units.
+bool isRange(std::uint32_t pos, std::uint32_t n, std::uint32_t length) {
+    return n != 0 && n <= length && pos <= length - n;
+}
+
+/// The index of the first `ch` in [start, end), else `end`.
+std::uint32_t indexOf(const unsigned short* units, std::uint32_t start, std::uint32_t end,
+                      unsigned short ch) {
+    // Whole blocks without an exit in their midst become vector instructions.
+    constexpr std::uint32_t kBlock = 16;
+    while (end - start >= kBlock) {
+        unsigned hits = 0;
+        for (std::uint32_t k = 0; k < kBlock; ++k) {
+            hits |= static_cast<unsigned>(units[start + k] == ch);
+        }
+        if (hits != 0) break;
+        start += kBlock;
+    }
+    while (start < end && units[start] != ch)
+        ++start;
+    return start;
+}
+
+std::uint32_t lengthOf(const unsigned short* units) {
+    std::size_t count = 0;
+    while (units[count] != 0)
+        ++count;
+    if (count >= UINT32_MAX) throwArrayTooLong();
+    return static_cast<std::uint32_t>(count);
+}
+
+bool occursIn(const String& set, unsigned short unit) {
+    const std::uint32_t length = set.length();
+    return indexOf(set.getData(), 0, length, unit) != length;
+}
+
+bool isSpecial(unsigned short unit) {
+    return unit != 0 && unit < 128 && std::strchr("[]{}=\\", unit) != nullptr;
+}
+
+}  // namespace
+
+String::String(String&& other) : String() {
+    units_.swap(other.units_);
+}
+
+String::String(const String& other, std::uint32_t n) {
+    // A count that leaves no room for the terminator must not wrap.
+    if (n == UINT32_MAX) throwArrayTooLong();
+    units_.reserveCapacity(n + 1);
+    units_.append(other.getData(), n);
+    terminate();
+}
+
+String::String(const unsigned short* units) {
+    if (units != nullptr) {
+        const std::uint32_t count = lengthOf(units);
+        units_.reserveCapacity(count + 1);
+        units_.append(units, count);
+    }
+    terminate();
+}
+
+String& String::operator=(const String& other) {
+    return this == &other ? *this : assign(other);
+}
+
+String& String::operator=(String&& other) noexcept {
+    if (this == &other) return *this;
+    units_.swap(other.units_);
+    // What it holds now is no use to anybody; cutting it off needs no memory.
+    other.units_.getData()[0] = 0;
+    other.units_.remove(1, other.units_.getSize() - 1);
+    return *this;
+}
+
+String& String::assign(const unsigned short* units) {
+    return *this = String(units);
+}
+
+String& String::assign(const unsigned short* units, std::uint32_t n) {
+    String assigned;
+    if (units != nullptr) {
+        if (n == UINT32_MAX) throwArrayTooLong();
+        assigned.units_.reserveCapacity(n + 1);
+        assigned.units_.remove(0, 1);
+        assigned.units_.append(units, n);
+        assigned.terminate();
+    }
+    return *this = std::move(assigned);
+}
+
+String& String::assign(const String& other) {
+    units_ = other.units_;
+    return *this;
+}
+
+String& String::assign(const String& other, std::uint32_t n) {
+    return assign(other.getData(), n);
+}
+
+void String::clear() {
+    units_.clear();
+    terminate();
+}
+
+/// Makes room for `n` more units, and for as much again as half the text: texts are put together
+/// from many small pieces, and copying all of it for each would take time quadratic in its length.
+void String::reserveMore(std::uint32_t n) {
+    const std::uint32_t size = units_.getSize();
+    const std::uint32_t capacity = units_.getCapacity();
+    if (n > UINT32_MAX - size) throwArrayTooLong();
+    if (size + n <= capacity) return;
+    const std::uint32_t generous = capacity + std::min(capacity / 2, UINT32_MAX - capacity);
+    units_.reserveCapacity(std::max(size + n, generous));
+}
+
+/// Appends a range of a text, which may be this one.
+String& String::appendRange(const String& other, std::uint32_t pos, std::uint32_t n) {
+    reserveMore(n);
+    const std::uint32_t end = length();
+    units_.grow(n);
+    unsigned short* const units = units_.getData();
+    CopyMem(units + end, other.units_.getData() + pos, n);
+    units[end + n] = 0;
+    return *this;
+}
+
+String& String::append(unsigned short ch) {
+    reserveMore(1);
+    units_.grow(1);
+    unsigned short* const end = units_.getData() + units_.getSize();
+    end[-2] = ch;
+    end[-1] = 0;
+    return *this;
+}
+
+String& String::append(const String& other, std::uint32_t n) {
+    const Trace trace(traceUnit);
+    if (n > other.length()) throwOutOfBounds(trace);
+    return appendRange(other, 0, n);
+}
+
+String& String::erase(std::uint32_t pos) {
+    const Trace trace(traceUnit);
+    if (pos >= length()) throwOutOfBounds(trace);
+    return erase(pos, length() - pos);
+}
+
+String& String::erase(std::uint32_t pos, std::uint32_t n) {
+    const Trace trace(traceUnit);
+    if (!isRange(pos, n, length())) throwOutOfBounds(trace);
+    units_.remove(pos, n);
+    return *this;
+}
+
+String& String::trim() {
+    const Trace trace(traceUnit);
+    const unsigned short* const units = getData();
+    std::uint32_t begin = 0;
+    while (isWhiteSpace(units[begin]))
+        ++begin;
+    if (begin >= length()) {
+        clear();
+        return *this;
+    }
+    std::uint32_t end = length();
+    while (isWhiteSpace(units[end - 1]))
+        --end;
+    units_.remove(end, length() - end);
+    units_.remove(0, begin);
+    return *this;
+}
+
+String& String::toUpper() {
+    const Trace trace(traceUnit);
+    unsigned short* const units = units_.getData();
+    std::transform(units, units + length(), units, [](unsigned short unit) {
+        return static_cast<unsigned short>(std::towupper(unit));
+    });
+    return *this;
+}
+
+String& String::toLower() {
+    const Trace trace(traceUnit);
+    unsigned short* const units = units_.getData();
+    std::transform(units, units + length(), units, [](unsigned short unit) {
+        return static_cast<unsigned short>(std::towlower(unit));
+    });
+    return *this;
+}
+
+String& String::removeEscapes(unsigned short esc) {
+    const Trace trace(traceUnit);
+    unsigned short* const units = units_.getData();
+    const std::uint32_t end = length();
+    std::uint32_t kept = 0;
+    for (std::uint32_t i = 0; i < end; ++i) {
+        // What follows a removed escape is kept unexamined.
+        if (units[i] == esc && isSpecial(units[i + 1])) ++i;
+        units[kept++] = units[i];
+    }
+    units_.remove(kept, end - kept);
+    return *this;
+}
+
+String& String::insertEscapes(unsigned short esc, const String& special) {
+    const Trace trace(traceUnit);
+    // The terminator takes part: a special set that holds 0 gets it escaped like any other unit.
+    const unsigned short* const units = getData();
+    const std::uint32_t end = units_.getSize();
+    std::uint32_t escapes = 0;
+    for (std::uint32_t i = 0; i < end; ++i) {
+        if (occursIn(special, units[i])) ++escapes;
+    }
+    if (escapes == 0) return *this;
+
+    Array<unsigned short> escaped;
+    if (escapes > UINT32_MAX - end) throwArrayTooLong();
+    escaped.grow(end + escapes);
+    unsigned short* out = escaped.getData();
+    for (std::uint32_t i = 0; i < end; ++i) {
+        if (occursIn(special, units[i])) *out++ = esc;
+        *out++ = units[i];
+    }
+    units_.swap(escaped);
+    return *this;
+}
+
+void String::throwBadSubscript() {
+    const Trace trace(traceUnit, "operator[]");
+    throwOutOfBounds(trace);
+}
+
+String String::substr(std::uint32_t pos) const {
+    const Trace trace(traceUnit);
+    if (pos >= length()) throwOutOfBounds(trace);
+    return substr(pos, length() - pos);
+}
+
+String String::substr(std::uint32_t pos, std::uint32_t n) const {
+    const Trace trace(traceUnit);
+    if (!isRange(pos, n, length())) throwOutOfBounds(trace);
+    String result;
+    result.units_.reserveCapacity(n + 1);
+    result.appendRange(*this, pos, n);
+    return result;
+}
+
+std::uint32_t String::find(unsigned short ch, std::uint32_t start) const {
+    Trace trace(traceUnit);
+    if (start >= length()) throwOutOfBounds(trace);
+    const std::uint32_t index = indexOf(getData(), start, length(), ch);
+    return trace.exit(index == length() ? NPOS : index);
+}
+
+std::uint32_t String::find(char ch, std::uint32_t start) const {
+    return find(static_cast<unsigned short>(static_cast<unsigned char>(ch)), start);
+}
+
+std::uint32_t String::find(unsigned short ch, unsigned short esc, std::uint32_t start) const {
+    Trace trace(traceUnit);
+    if (start >= length()) throwOutOfBounds(trace);
+    const unsigned short* const units = getData();
+    std::uint32_t escapes = 0;  // that stand right before i, also where they precede the start
+    while (escapes < start && units[start - 1 - escapes] == esc)
+        ++escapes;
+    for (std::uint32_t i = start; i < length(); ++i) {
+        if (units[i] == ch && (i == start || escapes % 2 == 0)) return trace.exit(i);
+        escapes = units[i] == esc ? escapes + 1 : 0;
+    }
+    return trace.exit(NPOS);
+}
+
+std::uint32_t String::find(const String& other, std::uint32_t start) const {
+    Trace trace(traceUnit);
+    const std::uint32_t count = other.length();
+    if (count == 0 || count > length() || start > length() - count) return trace.exit(NPOS);
+    const unsigned short* const units = getData();
+    const unsigned short* const wanted = other.getData();
+    const std::uint32_t end = length() - count + 1;
+    for (std::uint32_t i = start; (i = indexOf(units, i, end, wanted[0])) < end; ++i) {
+        if (std::equal(wanted, wanted + count, units + i)) return trace.exit(i);
+    }
+    return trace.exit(NPOS);
+}
+
+std::uint32_t String::rfind(unsigned short ch) const {
+    Trace trace(traceUnit);
+    for (std::uint32_t i = length(); i > 0; --i) {
+        if (units_.getData()[i] == ch) return trace.exit(i);
+    }
+    return trace.exit(NPOS);
+}
+
+int String::compare(const String& a, const String& b) {
+    return compare(a.getData(), b.getData());
+}
+
+int String::compare(const unsigned short* a, const unsigned short* b) {
+    for (;; ++a, ++b) {
+        if (*a == 0 || *b == 0) return *b != 0 ? -1 : *a != 0 ? 1 : 0;
+        if (*a != *b) return *a - *b;
+    }
+}
+
+String String::replace(const String& str, const String& what, const String& with) {
+    const Trace trace(traceUnit);
+    trace().detail("Str [%s], replace [%s] with [%s]", str, what, with);
+    String result;
+    result.units_.reserveCapacity(str.units_.getSize());
+    std::uint32_t copied = 0;
+    for (std::uint32_t match = 0; (match = str.find(what, copied)) != NPOS;) {
+        result.appendRange(str, copied, match - copied).append(with);
+        copied = match + what.length();
+    }
+    result.appendRange(str, copied, str.length() - copied);
+    trace().detail("Returning [%s]", result);
+    return result;
+}
+
+bool String::isWhiteSpace(unsigned short ch) {
+    return std::iswspace(ch) != 0;
+}
+
+String operator+(const String& a, const String& b) {
+    String sum(a);
+    sum.append(b);
+    return sum;
+}
+
+std::ostream& operator<<(std::ostream& out, const String& text) {
+    std::string printed;
+    printed.reserve(text.length());
+    const unsigned short* const units = text.getData();
+    for (std::uint32_t i = 0; i < text.length(); ++i) {
+        if (units[i] >= 1 && units[i] <= 127) {
+            printed += static_cast<char>(units[i]);
+        } else {
+            char escape[8];
+            std::snprintf(escape, sizeof escape, "\\x%04X", static_cast<unsigned>(units[i]));
+            printed += escape;
+        }
+    }
+    return out.write(printed.data(), static_cast<std::streamsize>(printed.size()));
+}
+
+}  // namespace ZAV
