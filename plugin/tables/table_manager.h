@@ -1,0 +1,87 @@
+/// What the managers of all tables have in common.
+#pragma once
+
+#include <memory>
+
+#include "base/zavtrace.h"
+#include "platform/oxa.h"
+#include "tables/table_request.h"
+
+/// Holds a table's lock, which guards the list of its live requests.
+class TableLock {
+public:
+    explicit TableLock(TableManager& manager) : manager_(manager) { manager_.lock(); }
+    ~TableLock() { manager_.unlock(); }
+    TableLock(const TableLock&) = delete;
+    TableLock& operator=(const TableLock&) = delete;
+
+private:
+    TableManager& manager_;
+};
+
+/// Keeps a live request from being destroyed.
+class RequestUse {
+public:
+    explicit RequestUse(rtoxa& request) : request_(request) {
+        request_.UseHandle(request_.Handle());
+    }
+    ~RequestUse() { request_.Drop(); }
+    RequestUse(const RequestUse&) = delete;
+    RequestUse& operator=(const RequestUse&) = delete;
+
+private:
+    rtoxa& request_;
+};
+
+/// The manager that a table's global pointer names; null before start-up. Events come on other
+/// threads than the one that may just be registering the table again.
+template <typename Manager>
+Manager* managerInForce(Manager* const& staticManager) {
+    return __atomic_load_n(&staticManager, __ATOMIC_ACQUIRE);
+}
+
+/// Makes the table's manager, which lives as long as the process, and registers it. Returns the
+/// registration's status, or OXA_NO_MEMORY when there is no manager.
+template <typename Manager>
+int registerTable(Manager*& staticManager, const char* application, const char* table) {
+    Manager* manager = nullptr;
+    try {
+        manager = std::make_unique<Manager>(application, table).release();
+    } catch (...) {
+        return OXA_NO_MEMORY;
+    }
+    __atomic_store_n(&staticManager, manager, __ATOMIC_RELEASE);
+    return manager->RegisterWithManager();
+}
+
+/// Gives rows to every live request of a manager whose requests are of class Request, and has each
+/// hand on those that it wants. Returns the last status other than 0 with which one refused. A
+/// request that fails does not keep the rows from the others.
+template <typename Request, typename Row>
+int addDataToEvent(const ZAV::Trace& trace, TableManager& manager, Row* rows, int count) {
+    int result = OXA_OK;
+    const TableLock lock(manager);
+    RtoxaListIter live(&manager);
+    while (rtoxa* const object = live.Next()) {
+        const RequestUse use(*object);
+        const int status = guarded(trace, [&] {
+            static_cast<Request*>(object)->AddData(rows, count);
+            return object->Dispatch();
+        });
+        if (status != OXA_OK) result = status;
+        object->ClearCount();
+    }
+    return result;
+}
+
+/// Makes the object of one request, which the framework then owns; null when that fails.
+template <typename Request, typename Manager>
+rtoxa* createRequest(const ZAV::Trace& trace, RequestDetail* detail, ContextInfo* context,
+                     Manager* manager) {
+    rtoxa* made = nullptr;
+    guarded(trace, [&] {
+        made = std::make_unique<Request>(detail, context, manager).release();
+        return 0;
+    });
+    return made;
+}
