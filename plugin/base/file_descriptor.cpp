@@ -1,0 +1,72 @@
+#include "base/file_descriptor.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <utility>
+
+namespace ZAV {
+namespace {
+
+constexpr int kFirstOwnDescriptor = 3;
+
+}  // namespace
+
+FileDescriptor& FileDescriptor::operator=(FileDescriptor&& other) noexcept {
+    if (this != &other) {
+        close();
+        fd_ = other.release();
+    }
+    return *this;
+}
+
+FileDescriptor::~FileDescriptor() {
+    const int savedErrno = errno;
+    close();
+    errno = savedErrno;
+}
+
+int FileDescriptor::release() {
+    return std::exchange(fd_, -1);
+}
+
+int FileDescriptor::close() {
+    if (fd_ < 0) return 0;
+    // Linux frees the descriptor even when it reports EINTR, so a second try could close a
+    // stranger's.
+    if (::close(release()) == 0 || errno == EINTR) return 0;
+    return errno;
+}
+
+FileDescriptor openFile(const char* path, int flags, mode_t mode) {
+    int fd;
+    do {
+        fd = ::open(path, flags | O_CLOEXEC, mode);
+    } while (fd < 0 && errno == EINTR);
+    FileDescriptor opened(fd);
+    if (fd < 0 || fd >= kFirstOwnDescriptor) return opened;
+    return FileDescriptor(::fcntl(fd, F_DUPFD_CLOEXEC, kFirstOwnDescriptor));
+}
+
+ssize_t readSome(int fd, void* buffer, std::size_t size) {
+    ssize_t got;
+    do {
+        got = ::read(fd, buffer, size);
+    } while (got < 0 && errno == EINTR);
+    return got;
+}
+
+int writeAll(int fd, const void* data, std::size_t size) {
+    const char* at = static_cast<const char*>(data);
+    while (size > 0) {
+        const ssize_t written = ::write(fd, at, size);
+        if (written < 0 && errno == EINTR) continue;
+        if (written < 0) return errno;
+        at += written;
+        size -= static_cast<std::size_t>(written);
+    }
+    return 0;
+}
+
+}  // namespace ZAV

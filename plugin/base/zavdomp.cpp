@@ -1,0 +1,215 @@
+#include "base/zavdomp.h"
+
+namespace ZAV {
+namespace {
+
+/// Collects the text of a dump, since a String reallocates with every append.
+class Dump {
+public:
+    void add(const unsigned short* text) {
+        if (text == nullptr) return;
+        while (*text != 0)
+            units_.push_back(*text++);
+    }
+    void add(const char* ascii) {
+        while (*ascii != '\0')
+            units_.push_back(static_cast<unsigned char>(*ascii++));
+    }
+    void addTabs(std::size_t count) { units_.insert(units_.end(), count, '\t'); }
+    void add(const DOMAttr& attribute) {
+        add(attribute.getName());
+        add("=\"");
+        add(attribute.getValue());
+        add("\"");
+    }
+    void appendTo(String& out) const {
+        String text;
+        text.assign(units_.data(), static_cast<unsigned>(units_.size()));
+        out.append(text);
+    }
+
+private:
+    std::vector<unsigned short> units_;
+};
+
+bool sameText(const unsigned short* a, const unsigned short* b) {
+    return a != nullptr && b != nullptr && String::compare(a, b) == 0;
+}
+
+const DOMElement& asElement(const DOMNode* node) {
+    return static_cast<const DOMElement&>(*node);
+}
+
+void addStartTag(Dump& dump, const DOMElement& element) {
+    dump.add("<");
+    dump.add(element.getTagName());
+    dump.add(" ");
+    for (const DOMNode* node : element.getAttributes()->nodes()) {
+        dump.add(static_cast<const DOMAttr&>(*node));
+        dump.add(" ");
+    }
+    dump.add(">\n");
+}
+
+void addEndTag(Dump& dump, const DOMElement& element) {
+    dump.add("</");
+    dump.add(element.getTagName());
+    dump.add(">");
+}
+
+/// Writes the tree below `root`, without recursion: documents may be deep.
+void addTree(Dump& dump, const String& indent, const DOMElement& root) {
+    struct Open {
+        const DOMElement* element;
+        std::size_t nextChild;
+    };
+    std::vector<Open> open;
+    const auto start = [&](const DOMElement& element) {
+        dump.add(indent.getData());
+        dump.addTabs(open.size());
+        addStartTag(dump, element);
+        open.push_back({&element, 0});
+    };
+    start(root);
+    while (!open.empty()) {
+        Open& innermost = open.back();
+        const std::vector<DOMNode*>& children = innermost.element->getChildren()->nodes();
+        if (innermost.nextChild < children.size()) {
+            start(asElement(children[innermost.nextChild++]));
+            continue;
+        }
+        const DOMElement& done = *innermost.element;
+        open.pop_back();
+        dump.add(indent.getData());
+        dump.addTabs(open.size());
+        addEndTag(dump, done);
+        if (!open.empty()) dump.add("\n");
+    }
+}
+
+}  // namespace
+
+DOMNodeList::~DOMNodeList() {
+    if (!owning_) return;
+    for (DOMNode* node : nodes_)
+        delete node;
+}
+
+void DOMNodeList::append(DOMNode* node) {
+    if (node != nullptr) nodes_.push_back(node);
+}
+
+DOMNode* DOMNodeList::takeLast() {
+    if (nodes_.empty()) return nullptr;
+    DOMNode* const last = nodes_.back();
+    nodes_.pop_back();
+    return last;
+}
+
+void freeDOMNodeListFunc(void* p) {
+    delete static_cast<DOMNodeList*>(p);
+}
+
+DOMAttr::DOMAttr(const char* name, const char* value)
+    : name_(String::createUnicodeString(name)), value_(String::createUnicodeString(value)) {}
+
+DOMAttr::DOMAttr(const DOMAttr& other)
+    : DOMNode(other),
+      name_(other.name_ ? String::copyUnicodeString(other.name_.get()) : nullptr),
+      value_(other.value_ ? String::copyUnicodeString(other.value_.get()) : nullptr) {}
+
+void DOMAttr::dump(String& out) {
+    Dump dump;
+    dump.add(*this);
+    dump.appendTo(out);
+}
+
+DOMElement::DOMElement(const char* tagName) : tagName_(String::createUnicodeString(tagName)) {
+    tagLists_.setAutoDeleteValues(true);
+    tagLists_.setFreeValueFunc(reinterpret_cast<void*>(freeDOMNodeListFunc));
+}
+
+DOMElement::DOMElement(const DOMElement& other) : DOMElement(nullptr) {
+    if (other.tagName_) tagName_.reset(String::copyUnicodeString(other.tagName_.get()));
+    setElementText(other.text_.get());
+}
+
+DOMElement::~DOMElement() {
+    // Every element below is taken out of its parent before it goes, from the leaves up, so that no
+    // destructor calls another one level deeper.
+    DOMElement* at = this;
+    for (;;) {
+        if (DOMNode* const child = at->children_.takeLast(); child != nullptr) {
+            auto* const element = static_cast<DOMElement*>(child);
+            element->parent_ = at;
+            at = element;
+            continue;
+        }
+        if (at == this) return;
+        const std::unique_ptr<DOMElement> leaf(at);
+        at = leaf->parent_;
+    }
+}
+
+void DOMElement::dump(String& out) {
+    dump(String(), out);
+}
+
+void DOMElement::dump(const String& indent, String& out) {
+    Dump dump;
+    addTree(dump, indent, *this);
+    dump.appendTo(out);
+}
+
+void DOMElement::setAttribute(const char* name, const char* value) {
+    if (name == nullptr || value == nullptr) return;
+    auto attribute = std::make_unique<DOMAttr>(name, value);
+    attributes_.append(attribute.get());
+    attribute.release();
+}
+
+const unsigned short* DOMElement::getAttribute(const char* name) const {
+    return getAttribute(UnicodeText(String::createUnicodeString(name)).get());
+}
+
+const unsigned short* DOMElement::getAttribute(const unsigned short* name) const {
+    if (name == nullptr) return nullptr;
+    for (const DOMNode* node : attributes_.nodes()) {
+        const auto& attribute = static_cast<const DOMAttr&>(*node);
+        if (sameText(attribute.getName(), name)) return attribute.getValue();
+    }
+    return nullptr;
+}
+
+void DOMElement::setElementText(const unsigned short* text) {
+    text_.reset(text != nullptr ? String::copyUnicodeString(text) : nullptr);
+}
+
+void DOMElement::setElementText(const char* text) {
+    text_.reset(String::createUnicodeString(text));
+}
+
+void DOMElement::addChild(DOMElement* child) {
+    if (child == nullptr) return;
+    children_.append(child);
+    child->parent_ = this;
+}
+
+DOMNodeList* DOMElement::getElementsByTagName(const char* name) const {
+    return getElementsByTagName(UnicodeText(String::createUnicodeString(name)).get());
+}
+
+DOMNodeList* DOMElement::getElementsByTagName(const unsigned short* name) const {
+    if (name == nullptr) return nullptr;
+    const String key(name);
+    void* known = nullptr;
+    if (tagLists_.get(key, &known)) return static_cast<DOMNodeList*>(known);
+    auto found = std::make_unique<DOMNodeList>(false);
+    for (DOMNode* node : children_.nodes()) {
+        if (sameText(asElement(node).getTagName(), name)) found->append(node);
+    }
+    tagLists_.put(key, found.get());
+    return found.release();
+}
+
+}  // namespace ZAV

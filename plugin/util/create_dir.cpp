@@ -1,0 +1,78 @@
+// Making directory trees.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+#include "base/read_file.h"
+#include "base/zavtrace.h"
+#include "util/zavutil.h"
+
+namespace ZAV {
+namespace {
+
+RAS1_UNIT traceUnit{"zavutil"};
+
+constexpr mode_t kDirectoryMode = 0770;
+constexpr int kNothingToCreate = 1;
+constexpr int kNoMemory = 2;
+
+bool exists(const char* path) {
+    return ::access(path, F_OK) == 0;
+}
+
+/// Makes one directory; returns 0 or the errno value, which is traced.
+int makeTraced(Trace& trace, const char* path) {
+    if (::mkdir(path, kDirectoryMode) == 0) return 0;
+    const int failure = errno;
+    trace().error("Failed to make directory %s, return code status", path);
+    return failure;
+}
+
+/// Makes one directory above the one asked for unless it exists.
+int makeAbove(Trace& trace, const char* path) {
+    if (exists(path)) return 0;
+    trace().detail("Making directory %s", path);
+    if (::mkdir(path, kDirectoryMode) == 0) return 0;
+    const int failure = errno;
+    // Another thread may have made it since; two trees below one new directory both come about.
+    if (failure == EEXIST && exists(path)) return 0;
+    trace().error("Failed to make directory %s, return code status", path);
+    return failure;
+}
+
+/// Makes the missing directories above `path`, whose leading slashes end at `rest`.
+int makeAllAbove(Trace& trace, const char* path, const char* rest) {
+    for (const char* slash = std::strchr(rest, '/'); slash != nullptr && slash[1] != '\0';
+         slash = std::strchr(slash + 1, '/')) {
+        const std::size_t length = static_cast<std::size_t>(slash - path);
+        const MallocedText prefix(static_cast<char*>(std::malloc(length + 1)));
+        if (prefix == nullptr) {
+            trace().error("Malloc of %d bytes failed", length + 1);
+            return kNoMemory;
+        }
+        std::memcpy(prefix.get(), path, length);
+        prefix.get()[length] = '\0';
+        const int rc = makeAbove(trace, prefix.get());
+        if (rc != 0) return rc;
+    }
+    return 0;
+}
+
+}  // namespace
+
+int Util::createDir(const char* path) {
+    Trace trace(traceUnit);
+    const char* const rest = path + std::strspn(path, "/");
+    if (*rest == '\0') {
+        trace().error("Could not create directory %s, nothing to create", path);
+        return trace.exit(kNothingToCreate);
+    }
+    const int rc = makeAllAbove(trace, path, rest);
+    if (rc != 0) return trace.exit(rc);
+    trace().detail("Making final directory %s", path);
+    return trace.exit(makeTraced(trace, path));
+}
+
+}  // namespace ZAV
