@@ -1,0 +1,3 @@
+#include "tasks/home.h"
+
+const char* ZAV_TOVRINHOME = nullptr;
