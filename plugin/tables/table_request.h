@@ -6,24 +6,20 @@
 #include "base/zavtrace.h"
 #include "platform/oxa.h"
 #include "tables/table_schema.h"
-#include "util/exception_text.h"
+#include "util/exceptions.h"
 
 /// Runs `body` and returns its status. An exception must not reach the framework's threads: it is
 /// traced and becomes a status.
 template <typename Body>
 int guarded(const ZAV::Trace& trace, const Body& body) noexcept {
     try {
-        try {
-            return body();
-        } catch (const std::bad_alloc&) {
-            trace().error("Out of memory");
-            return OXA_NO_MEMORY;
-        } catch (...) {
-            trace().error("Exception caught: %s", ZAV::currentExceptionText());
-            return OXA_FAILED;
-        }
+        return body();
+    } catch (const std::bad_alloc&) {
+        ZAV::traceException(trace);
+        return OXA_NO_MEMORY;
     } catch (...) {
-        return OXA_NO_MEMORY;  // there is none for a trace line either
+        ZAV::traceException(trace);
+        return OXA_FAILED;
     }
 }
 

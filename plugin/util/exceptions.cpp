@@ -1,4 +1,4 @@
-#include "util/exception_text.h"
+#include "util/exceptions.h"
 
 #include <exception>
 
@@ -15,6 +15,14 @@ const char* currentExceptionText() noexcept {
         return exception.getErrorMessage();
     } catch (...) {
         return "an exception without a text";
+    }
+}
+
+void traceException(const Trace& trace) noexcept {
+    try {
+        trace().error("Exception caught: %s", currentExceptionText());
+    } catch (...) {
+        return;  // out of memory, of which nothing can be said then
     }
 }
 

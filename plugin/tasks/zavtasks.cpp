@@ -1,0 +1,170 @@
+#include "tasks/zavtasks.h"
+
+#include "base/zavtrace.h"
+#include "tasks/command_table.h"
+#include "tasks/executor.h"
+#include "util/exceptions.h"
+#include "util/zavutil.h"
+
+using ZAV::String;
+using ZAV::Trace;
+
+namespace {
+
+RAS1_UNIT traceUnit{"zavtasks"};
+
+void setFailure(TaskQueueElem& task, TASK_RC rc, const String& parameter) {
+    task.setRetmsgid(rcToMsgId(rc));
+    task.setRetmsgparm(parameter);
+}
+
+/// Called while an exception is handled that left the command's handler. The code counts even when
+/// there is no memory for the message.
+TASK_RC endWithException(TaskQueueElem& task, TASK_RC rc) noexcept {
+    try {
+        Trace trace(traceUnit);
+        const String command = task.getCommand();
+        trace().error("%s Command [%s] ended by an exception: %s", rcToMsgId(rc), command,
+                      ZAV::currentExceptionText());
+        setFailure(task, rc, command);
+    } catch (...) {
+        return rc;
+    }
+    return rc;
+}
+
+TASK_RC refuseUnsupported(TaskQueueElem& task) {
+    Trace trace(traceUnit);
+    const String command = task.getCommand();
+    trace().error("%s Command [%s] is not a supported command", rcToMsgId(TASK_NOT_SUPPORTED),
+                  command);
+    setFailure(task, TASK_NOT_SUPPORTED, command);
+    getSupportedTasks();
+    return trace.exit(TASK_NOT_SUPPORTED);
+}
+
+TASK_RC refuseForUniversalAgent(TaskQueueElem& task) {
+    Trace trace(traceUnit);
+    const String command = task.getCommand();
+    trace().error("%s Command [%s] is not a supported command for UA",
+                  rcToMsgId(TASK_NOT_SUPPORTED), command);
+    setFailure(task, TASK_NOT_SUPPORTED, command);
+    return trace.exit(TASK_NOT_SUPPORTED);
+}
+
+TASK_RC checkRequired(const Command& command, TaskQueueElem& task) {
+    TASK_RC rc = TASK_OK;
+    for (const RequiredParameter& parameter : command.required) {
+        if (parameter.name == nullptr) break;
+        rc = requiredParameterOk(parameter.name, (task.*parameter.value)(), task, rc,
+                                 parameter.failure);
+    }
+    return rc;
+}
+
+TASK_RC runNow(const Command& command, TaskQueueElem& task) {
+    try {
+        return command.runNow(task);
+    } catch (...) {
+        return endWithException(task, command.notStarted);
+    }
+}
+
+bool isRefused(const Command& command, const TaskQueueElem& task) {
+    return command.universalAgent == UniversalAgent::Refused && isUniversalAgent(task);
+}
+
+bool needsChecks(const Command& command, const TaskQueueElem& task) {
+    return command.universalAgent != UniversalAgent::RequiresNothing || !isUniversalAgent(task);
+}
+
+/// Checks a supported command's parameters, then runs or queues it.
+TASK_RC runCommand(const Command& command, TaskQueueElem& task) {
+    if (isRefused(command, task)) return refuseForUniversalAgent(task);
+    if (needsChecks(command, task)) {
+        const TASK_RC rc = checkRequired(command, task);
+        if (rc != TASK_OK) return rc;
+    }
+    if (command.runNow != nullptr) return runNow(command, task);
+    queueTask(task);
+    return TASK_OK;
+}
+
+}  // namespace
+
+void zav_taskmgr_init() {
+    Trace trace(traceUnit);
+    if (initialized) return;
+    if (!ZAV::Util::getAgentDepotDir(depotDir)) {
+        trace().error("%s No Agent Depot directory set", rcToMsgId(TASK_NO_DEPOT));
+        return;
+    }
+    trace().error("Command vector being initialized");
+    initialized = true;
+    for (const Command& command : commandTable)
+        commands.push_back(command.name);
+    startExecutor();
+}
+
+TASK_RC requiredParameterOk(const String& name, const String& value, TaskQueueElem& task,
+                            TASK_RC current, TASK_RC failure) {
+    Trace trace(traceUnit);
+    if (value.length() != 0) return trace.exit(current);
+    trace().error("%s No [%s] specified, it is a required parameter", rcToMsgId(failure), name);
+    setFailure(task, failure, String());
+    return trace.exit(failure);
+}
+
+bool isSupportedTask(String command) {
+    Trace trace(traceUnit);
+    for (const String& supported : commands) {
+        if (supported == command) {
+            trace().detail("Command %s is supported", command);
+            return trace.exit(true);
+        }
+    }
+    trace().error("Command %s is NOT supported", command);
+    return trace.exit(false);
+}
+
+void getSupportedTasks() {
+    Trace trace(traceUnit);
+    if (!trace.detailed()) return;
+    String list("Commands supported are: ");
+    const char* separator = "";
+    for (const String& command : commands) {
+        list.append(separator).append(command);
+        separator = ",";
+    }
+    trace().detail("%s\n", list);
+}
+
+TASK_RC runTask(TaskQueueElem& task) {
+    Trace trace(traceUnit);
+    const String name = task.getCommand();
+    TASK_RC rc = requiredParameterOk("COMMAND", name, task, TASK_OK, TASK_NO_COMMAND);
+    rc = requiredParameterOk("TRANSID", task.getTransid(), task, rc, TASK_NO_TRANSID);
+    if (rc == TASK_OK && !isSupportedTask(name)) rc = refuseUnsupported(task);
+    if (rc == TASK_OK) {
+        trace().detail("Going to run command %s", name);
+        const Command* const command = findCommand(name);
+        if (command != nullptr) rc = runCommand(*command, task);
+    }
+    task.ReturnStatus(rc);
+    return trace.exit(rc);
+}
+
+TASK_RC processAsyncTask(TaskQueueElem& task) {
+    Trace trace(traceUnit);
+    TASK_RC rc = TASK_OK;
+    const Command* const command = findCommand(task.getCommand());
+    if (command != nullptr && command->runQueued != nullptr) {
+        try {
+            rc = command->runQueued(task);
+        } catch (...) {
+            rc = endWithException(task, command->notStarted);
+        }
+    }
+    trace().detail("Return code is %d", rc);
+    return trace.exit(rc);
+}
