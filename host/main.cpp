@@ -1,0 +1,74 @@
+// zavhost: a small agent process that loads the management plug-in and serves local clients.
+
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <exception>
+
+#include "embedded/oxa_host.h"
+#include "host/code_page.h"
+#include "host/end_signals.h"
+#include "host/host_options.h"
+#include "host/http_server.h"
+#include "host/plugin_loader.h"
+#include "host/process_setup.h"
+#include "host/socket_file.h"
+#include "host/start_error.h"
+
+namespace host {
+namespace {
+
+/// How long the task in hand may take when the host is told to end.
+constexpr std::chrono::seconds kEndGrace{10};
+
+Router startPlugin(const HostOptions& options) {
+    const Plugin plugin(options.plugin);
+    if (options.originNode) oxa::setOriginNode(*options.originNode);
+    const int status = plugin.initialize();
+    std::vector<oxa::Table> tables = oxa::tables();
+    if (tables.empty()) throw StartError("plug-in " + plugin.file() + " offers no tables");
+    if (status != 0) {
+        std::fprintf(stderr,
+                     "zavhost: plug-in %s started with status %d; file transfers may fail\n",
+                     plugin.file().c_str(), status);
+    }
+    return Router(std::move(tables), CodePage::ofProcess());
+}
+
+void run(const HostOptions& options) {
+    ::setenv("TOVRINHOME", options.home.c_str(), 1);
+    SocketFile socket(options.socket);
+    const int endDescriptor = catchEndSignals();
+    Router router = startPlugin(options);
+    HttpServer server(socket.listen(), std::move(router), options.home);
+    server.endWhenReadable(endDescriptor, kEndGrace);
+    std::printf("ready: %s\n", options.socket.c_str());
+    std::fflush(stdout);
+    server.run();
+    socket.remove();
+    // The plug-in's executor never ends and uses its globals to the last, so nothing is torn down.
+    ::_exit(0);
+}
+
+int start(int argc, char** argv) {
+    setUpProcess();
+    try {
+        const auto options =
+            readOptions(argc, argv, [](const char* name) { return std::getenv(name); });
+        if (options) run(*options);
+        return 0;
+    } catch (const std::exception& error) {
+        std::fprintf(stderr, "zavhost: %s\n", error.what());
+        return 1;
+    }
+}
+
+}  // namespace
+}  // namespace host
+
+int main(int argc, char** argv) {
+    const int status = host::start(argc, argv);
+    std::fflush(stdout);
+    ::_exit(status);  // a plug-in that had been started has threads of its own
+}

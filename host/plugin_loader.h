@@ -1,0 +1,25 @@
+/// The management plug-in as the host sees it: a shared library with one start-up function.
+#pragma once
+
+#include <optional>
+#include <string>
+
+namespace host {
+
+/// A loaded plug-in. It is never unloaded: its threads and tables live as long as the process.
+class Plugin {
+public:
+    /// Loads `file`, or libzavmgmt.so from ../lib beside the executable, else from where the loader
+    /// looks. Throws StartError when there is no such library or it lacks the start-up function.
+    explicit Plugin(const std::optional<std::string>& file);
+
+    /// Runs the start-up function and returns its status, 0 for success. TOVRINHOME is set before.
+    int initialize() const { return start_(); }
+    const std::string& file() const { return file_; }
+
+private:
+    std::string file_;
+    int (*start_)() = nullptr;
+};
+
+}  // namespace host

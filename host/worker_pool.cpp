@@ -1,0 +1,74 @@
+#include "host/worker_pool.h"
+
+#include <string>
+#include <system_error>
+#include <utility>
+
+#include "host/start_error.h"
+
+namespace host {
+
+WorkerPool::WorkerPool(std::size_t threads, std::size_t queueLimit) : queueLimit_(queueLimit) {
+    try {
+        for (std::size_t i = 0; i < threads; ++i)
+            threads_.emplace_back([this] { work(); });
+    } catch (const std::system_error& error) {
+        stop();
+        throw StartError(std::string("cannot start a thread: ") + error.what());
+    }
+    // The threads count themselves as free; nobody is to find a pool without free threads.
+    std::unique_lock<std::mutex> lock(lock_);
+    changed_.wait(lock, [&] { return idle_ == threads; });
+}
+
+WorkerPool::~WorkerPool() {
+    stop();
+}
+
+void WorkerPool::stop() {
+    std::deque<Job> dropped;
+    {
+        const std::lock_guard<std::mutex> lock(lock_);
+        stopping_ = true;
+        dropped.swap(queue_);
+    }
+    changed_.notify_all();
+    for (std::thread& thread : threads_)
+        thread.join();
+    threads_.clear();
+}
+
+bool WorkerPool::submit(Job job) {
+    {
+        const std::lock_guard<std::mutex> lock(lock_);
+        // A job that a free thread is about to take does not count as waiting.
+        if (stopping_ || queue_.size() >= queueLimit_ + idle_) return false;
+        queue_.push_back(std::move(job));
+    }
+    changed_.notify_one();
+    return true;
+}
+
+void WorkerPool::work() {
+    std::unique_lock<std::mutex> lock(lock_);
+    ++idle_;
+    changed_.notify_all();
+    while (true) {
+        changed_.wait(lock, [this] { return stopping_ || !queue_.empty(); });
+        if (stopping_) return;
+        Job job = std::move(queue_.front());
+        queue_.pop_front();
+        --idle_;
+        lock.unlock();
+        try {
+            job();
+        } catch (...) {
+            // Nothing is known about the job; whoever gave it hears about failures from itself.
+        }
+        job = nullptr;  // releases what it holds before the thread waits again
+        lock.lock();
+        ++idle_;
+    }
+}
+
+}  // namespace host
