@@ -1,0 +1,81 @@
+#include "util/child_end.h"
+
+#include <poll.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <mutex>
+#include <vector>
+
+namespace ZAV {
+namespace {
+
+constexpr int kLongestStep = 20;
+
+#ifdef SYS_pidfd_open
+constexpr long kPidfdOpen = SYS_pidfd_open;
+#else
+constexpr long kPidfdOpen = 434;   // the same number on every architecture
+#endif
+
+struct Forgotten {
+    std::mutex mutex;
+    std::vector<pid_t> children;   // guarded by the mutex
+};
+
+Forgotten& forgotten() {
+    static Forgotten& instance = *new Forgotten;   // used by threads that outlive main
+    return instance;
+}
+
+}  // namespace
+
+pid_t pollChild(pid_t pid, int& status) {
+    pid_t ended;
+    do {
+        ended = ::waitpid(pid, &status, WNOHANG);
+    } while (ended == -1 && errno == EINTR);
+    return ended;
+}
+
+void ChildWatch::pause(int milliseconds) {
+    if (!asked_) {
+        asked_ = true;
+        handle_ = FileDescriptor(static_cast<int>(::syscall(kPidfdOpen, pid_, 0)));
+    }
+    if (!handle_.isOpen()) {
+        pauseWithoutHandle(milliseconds);
+        return;
+    }
+    pollfd end{handle_.get(), POLLIN, 0};
+    ::poll(&end, 1, milliseconds);
+}
+
+void ChildWatch::pauseWithoutHandle(int milliseconds) {
+    ::poll(nullptr, 0, std::min(step_, milliseconds));
+    step_ = std::min(2 * step_, kLongestStep);
+}
+
+void reapLater(pid_t pid) noexcept {
+    try {
+        const std::lock_guard<std::mutex> lock(forgotten().mutex);
+        forgotten().children.push_back(pid);
+    } catch (...) {
+        // Without memory for its id the child stays unreaped until this process ends.
+    }
+}
+
+void reapForgotten() noexcept {
+    const std::lock_guard<std::mutex> lock(forgotten().mutex);
+    auto& children = forgotten().children;
+    const auto ended = [](pid_t pid) {
+        int status = 0;
+        return pollChild(pid, status) != 0;
+    };
+    children.erase(std::remove_if(children.begin(), children.end(), ended), children.end());
+}
+
+}  // namespace ZAV
