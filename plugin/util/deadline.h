@@ -19,10 +19,9 @@ public:
 
     /// What is left in whole milliseconds, rounded up, 0 to `atMost`: the time-out of a poll.
     int millisecondsLeft(int atMost) const {
-        using std::chrono::milliseconds;
-        const auto left = std::chrono::ceil<milliseconds>(at_ - Clock::now()).count();
-        return static_cast<int>(
-            std::clamp<decltype(left)>(left, 0, static_cast<decltype(left)>(atMost)));
+        const long long left =
+            std::chrono::ceil<std::chrono::milliseconds>(at_ - Clock::now()).count();
+        return static_cast<int>(std::clamp<long long>(left, 0, atMost));
     }
 
 private:
