@@ -1,0 +1,266 @@
+#include "util/zavprocs.h"
+
+#include <fcntl.h>
+#include <grp.h>
+#include <pwd.h>
+#include <signal.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+
+#include "support/scratch_dir.h"
+#include "support/trace_capture.h"
+
+using namespace ZAV;
+using testing::Contains;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+namespace {
+
+std::vector<std::string> split(const char* text) {
+    const String command(text);
+    char** arguments = nullptr;
+    const int count = MakeArgv(&command, &arguments);
+    std::vector<std::string> result;
+    for (int i = 0; i < count; ++i) {
+        result.emplace_back(arguments[i]);
+        std::free(arguments[i]);
+    }
+    EXPECT_EQ(nullptr, arguments[count]);
+    std::free(arguments);
+    return result;
+}
+
+struct TwoEnds {
+    FileDescriptor readEnd;
+    FileDescriptor writeEnd;
+};
+
+TwoEnds makePipe() {
+    int ends[2];
+    EXPECT_EQ(0, ::pipe2(ends, O_CLOEXEC));
+    return {FileDescriptor(ends[0]), FileDescriptor(ends[1])};
+}
+
+std::unique_ptr<user_s_t, decltype(&std::free)> token(const char* user, const char* group) {
+    return {create_user_token(user, group, nullptr), &std::free};
+}
+
+}  // namespace
+
+TEST(MakeArgv, SplitsAtBlanksAndGroupsWithQuotes) {
+    EXPECT_THAT(split("/bin/sh -c 'echo a b'"), ElementsAre("/bin/sh", "-c", "echo a b"));
+    EXPECT_THAT(split("/bin/sh -c \"echo a b\""), ElementsAre("/bin/sh", "-c", "echo a b"));
+    EXPECT_THAT(split("a  b"), ElementsAre("a", "b"));
+    EXPECT_THAT(split("a"), ElementsAre("a"));
+}
+
+TEST(MakeArgv, AlwaysYieldsOneArgument) {
+    EXPECT_THAT(split(""), ElementsAre(""));
+    EXPECT_THAT(split("   "), ElementsAre(""));
+    EXPECT_THAT(split("''"), ElementsAre(""));
+}
+
+TEST(MakeArgv, LeadingBlanksAndQuotesMakeNoArgument) {
+    EXPECT_THAT(split("  a b"), ElementsAre("a", "b"));
+    EXPECT_THAT(split("'/opt/a dir/run' x"), ElementsAre("/opt/a dir/run", "x"));
+    EXPECT_THAT(split(" \"/opt/a dir/run\" x"), ElementsAre("/opt/a dir/run", "x"));
+}
+
+TEST(MakeArgv, PlacesLeftOverAreEmpty) {
+    EXPECT_THAT(split("a "), ElementsAre("a", ""));
+    EXPECT_THAT(split("a '' b"), ElementsAre("a", "b", ""));
+}
+
+TEST(MakeArgv, AQuoteInsideAWordEndsTheArgument) {
+    EXPECT_THAT(split("a'b' c"), ElementsAre("a", "b"));
+    EXPECT_THAT(split("a\"b\"c"), ElementsAre("a"));
+}
+
+TEST(MakeArgv, BothKindsOfQuoteToggleTheSameFlag) {
+    EXPECT_THAT(split("x 'a \"b c\" d'"), ElementsAre("x", "a ", "b", "c", " d"));
+}
+
+TEST(MakeArgv, AnEscapedQuoteIsKeptWithItsBackslash) {
+    EXPECT_THAT(split("a \\\"b c\\\""), ElementsAre("a", "\\\"b", "c\\\""));
+    EXPECT_THAT(split("'a\\' b'"), ElementsAre("a\\' b"));
+}
+
+TEST(MakeArgv, TabsAreNoSeparators) {
+    EXPECT_THAT(split("a\tb c"), ElementsAre("a\tb", "c"));
+}
+
+TEST(MakeArgv, AnOpenQuoteRunsToTheEnd) {
+    EXPECT_THAT(split("a 'b c "), ElementsAre("a", "b c "));
+}
+
+TEST(MakeArgv, RefusesMissingArguments) {
+    TraceCapture traces;
+    char** arguments = nullptr;
+    const String command("a");
+    errno = 0;
+    EXPECT_EQ(255, MakeArgv(nullptr, &arguments));
+    EXPECT_EQ(EINVAL, errno);
+    EXPECT_EQ(255, MakeArgv(&command, nullptr));
+    EXPECT_THAT(traces.errors("zavprocs"),
+                ElementsAre("Error occurred. ERRNO:22 Invalid argument",
+                            "Error occurred. ERRNO:22 Invalid argument"));
+}
+
+TEST(UserToken, IsTheCallersOwnByDefault) {
+    TraceCapture traces;
+    const auto own = token(nullptr, nullptr);
+    EXPECT_EQ(::getuid(), own->uid);
+    EXPECT_EQ(::getgid(), own->gid);
+    EXPECT_EQ(1, traces.count('D', "User: (null) UID: " + std::to_string(::getuid()) +
+                                       " Group: (null) GID: " + std::to_string(::getgid())));
+}
+
+TEST(UserToken, LooksNamesUp) {
+    TraceCapture traces;
+    const auto daemon = token("daemon", "sys");
+    EXPECT_EQ(::getpwnam("daemon")->pw_uid, daemon->uid);
+    EXPECT_EQ(::getgrnam("sys")->gr_gid, daemon->gid);
+    EXPECT_EQ(1, traces.count('D', "User: daemon UID: " + std::to_string(daemon->uid) +
+                                       " Group: sys GID: " + std::to_string(daemon->gid)));
+}
+
+TEST(UserToken, AnUnknownUserIsNobody) {
+    const passwd* const nobody = ::getpwnam("nobody");
+    const std::uint32_t expected = nobody != nullptr ? nobody->pw_uid : 65533;
+    EXPECT_EQ(expected, token("no-such-user-here", nullptr)->uid);
+}
+
+TEST(UserToken, AnUnknownGroupIsTheUsersOwnOnlyWhereAGroupNobodyExists) {
+    const bool hasNobody = ::getgrnam("nobody") != nullptr;
+    const std::uint32_t primary = ::getpwnam("daemon")->pw_gid;
+    EXPECT_EQ(hasNobody ? primary : 65533u, token("daemon", "no-such-group-here")->gid);
+    // Without a user there is no entry to take a group from.
+    EXPECT_EQ(65533u, token(nullptr, "no-such-group-here")->gid);
+}
+
+TEST(ErrorMessage, HasNumberAndText) {
+    const std::unique_ptr<char, decltype(&std::free)> message(getErrorMsg(ENOENT), &std::free);
+    EXPECT_STREQ("Error occurred: ERRNO:2 No such file or directory", message.get());
+}
+
+TEST(PruneLogs, ElevenLogsLoseOnlyTheOldest) {
+    TraceCapture traces;
+    const ScratchDir home;
+    for (int i = 0; i < 11; ++i) {
+        const std::string path = home.write("logs/zavproc_ras1_" + std::to_string(i) + ".log", "x");
+        const timespec times[2] = {{5000 + (i + 4) % 11, 0}, {5000 + (i + 4) % 11, 0}};
+        ASSERT_EQ(0, ::utimensat(AT_FDCWD, path.c_str(), times, 0));
+    }
+    pruneLogs(home.path("logs").c_str(), "zavproc_ras1", 10);
+    for (int i = 0; i < 11; ++i) {
+        const bool isOldest = i == 7;
+        EXPECT_NE(isOldest, home.exists("logs/zavproc_ras1_" + std::to_string(i) + ".log")) << i;
+    }
+    EXPECT_EQ(1, traces.count('D', "deleting file: " + home.path("logs/zavproc_ras1_7.log")));
+    EXPECT_THAT(traces.errors(), IsEmpty());
+}
+
+TEST(PruneLogs, CountsFilesWithThePrefixOnly) {
+    const ScratchDir home;
+    home.write("a_1", "");
+    home.write("a_2", "");
+    home.write("b_a_3", "");
+    home.makeDir("a_dir");
+    pruneLogs(home.path().c_str(), "a_", 3);
+    EXPECT_TRUE(home.exists("a_1"));
+    EXPECT_TRUE(home.exists("a_2"));
+    pruneLogs(home.path().c_str(), "a_", 2);
+    EXPECT_NE(home.exists("a_1"), home.exists("a_2"));
+    EXPECT_TRUE(home.exists("b_a_3"));
+    EXPECT_TRUE(home.exists("a_dir"));
+}
+
+TEST(PruneLogs, AMissingDirectoryIsTraced) {
+    TraceCapture traces;
+    pruneLogs("/no/such/directory", "a", 1);
+    EXPECT_THAT(traces.errors(), ElementsAre("FSI1_NewList error 2"));
+}
+
+TEST(InputStream, ReadsBytesAndBlocksUpToTheEnd) {
+    auto [readEnd, writeEnd] = makePipe();
+    ASSERT_EQ(5, ::write(writeEnd.get(), "\xff" "abcd", 5));
+    writeEnd.close();
+    ProcessInputStream stream;
+    stream.attach(std::move(readEnd));
+    EXPECT_EQ(255, stream.read());
+    char buffer[8] = "";
+    EXPECT_EQ(3, stream.read(buffer, 3));
+    EXPECT_STREQ("abc", buffer);
+    EXPECT_EQ(1, stream.read(buffer, 8));
+    EXPECT_EQ(0, stream.read(buffer, 8));
+    EXPECT_EQ(-1, stream.read());
+    EXPECT_TRUE(stream.close());
+    EXPECT_FALSE(stream.close());
+    EXPECT_EQ(-1, stream.read(buffer, 8));
+    EXPECT_EQ(-1, stream.setNonBlocking(true));
+}
+
+TEST(InputStream, NonBlockingModeDoesNotWait) {
+    auto [readEnd, writeEnd] = makePipe();
+    ProcessInputStream stream;
+    stream.attach(std::move(readEnd));
+    EXPECT_FALSE(stream.isNonBlocking());
+    EXPECT_EQ(0, stream.setNonBlocking(true));
+    EXPECT_TRUE(stream.isNonBlocking());
+    char byte;
+    EXPECT_EQ(-1, stream.read(&byte, 1));
+    EXPECT_EQ(EAGAIN, errno);
+    EXPECT_EQ(0, stream.setNonBlocking(false));
+    EXPECT_EQ(0, ::fcntl(stream.descriptor(), F_GETFL) & O_NONBLOCK);
+}
+
+TEST(OutputStream, WritesEverything) {
+    auto [readEnd, writeEnd] = makePipe();
+    ProcessOutputStream stream;
+    stream.attach(std::move(writeEnd));
+    EXPECT_TRUE(stream.write("abc", 3));
+    EXPECT_TRUE(stream.write("", 0));
+    char buffer[8];
+    EXPECT_EQ(3, ::read(readEnd.get(), buffer, sizeof buffer));
+    EXPECT_TRUE(stream.close());
+    EXPECT_FALSE(stream.close());
+    EXPECT_FALSE(stream.write("abc", 3));
+}
+
+TEST(OutputStream, AVanishedReaderCostsNoSignal) {
+    auto [readEnd, writeEnd] = makePipe();
+    readEnd.close();
+    ProcessOutputStream stream;
+    stream.attach(std::move(writeEnd));
+    EXPECT_FALSE(stream.write("abc", 3));
+    EXPECT_EQ(EPIPE, errno);
+    sigset_t pending;
+    ::sigpending(&pending);
+    EXPECT_EQ(0, ::sigismember(&pending, SIGPIPE));
+    sigset_t blocked;
+    ::pthread_sigmask(SIG_BLOCK, nullptr, &blocked);
+    EXPECT_EQ(0, ::sigismember(&blocked, SIGPIPE));
+}
+
+TEST(OutputStream, ASignalThatWasPendingStaysPending) {
+    sigset_t sigpipe;
+    ::sigemptyset(&sigpipe);
+    ::sigaddset(&sigpipe, SIGPIPE);
+    sigset_t before;
+    ::pthread_sigmask(SIG_BLOCK, &sigpipe, &before);
+    ::raise(SIGPIPE);
+
+    auto [readEnd, writeEnd] = makePipe();
+    readEnd.close();
+    ProcessOutputStream stream;
+    stream.attach(std::move(writeEnd));
+    EXPECT_FALSE(stream.write("abc", 3));
+
+    const timespec now{};
+    EXPECT_EQ(SIGPIPE, ::sigtimedwait(&sigpipe, nullptr, &now));
+    ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
+}
