@@ -86,14 +86,20 @@ Facility& facility() {
 /// move.
 [[maybe_unused]] const Facility& startedEarly = facility();
 
-/// Appends decimal digits, at least `width` of them.
+/// Appends a number in decimal, with at least `width` digits.
 char* putNumber(char* at, long long value, int width) {
     char digits[24];
     int count = 0;
+    // The most negative value has no positive counterpart in its own type.
+    unsigned long long rest = static_cast<unsigned long long>(value);
+    if (value < 0) {
+        *at++ = '-';
+        rest = 0 - rest;
+    }
     do {
-        digits[count++] = static_cast<char>('0' + value % 10);
-        value /= 10;
-    } while (value > 0);
+        digits[count++] = static_cast<char>('0' + rest % 10);
+        rest /= 10;
+    } while (rest > 0);
     while (count < width)
         digits[count++] = '0';
     while (count > 0)
@@ -283,10 +289,7 @@ void RAS1_Exit(const RAS1_BLOCK* block, int line) {
 
 void RAS1_ExitValue(const RAS1_BLOCK* block, int line, long value) {
     char text[40] = "Exit ";
-    char* at = text + 5;
-    if (value < 0) *at++ = '-';
-    // The most negative value has no positive counterpart in its own type.
-    at = putNumber(at, value < 0 ? -static_cast<long long>(value + 1) + 1 : value, 1);
+    const char* const at = putNumber(text + 5, value, 1);
     writeLine(*block, 'F', line, text, static_cast<std::size_t>(at - text));
 }
 
