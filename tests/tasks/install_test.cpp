@@ -377,7 +377,7 @@ TEST_F(InstallWithRestart, AScriptThatCouldNotBeWrittenFailsInTheShell) {
     EXPECT_EQ(1031, outcome.rc);
     EXPECT_EQ("ZAV1031E", outcome.messageId);
     EXPECT_THAT(outcome.parameter, StartsWith("/bin/sh " + home_.depot() + "none/runcmd.sh " +
-                                               home_.home() + "/install.sh -q,")));
+                                              home_.home() + "/install.sh -q,"));
     EXPECT_THAT(home_.calls(kInstaller), IsEmpty());
 }
 
