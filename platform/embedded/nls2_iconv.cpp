@@ -144,6 +144,7 @@ public:
         // A trail byte may look like ASCII, so only what precedes the first other byte is safe.
         const unsigned ascii = widensAscii_ ? widenAscii(text, std::min(length, capacity), out) : 0;
         if (ascii == length) return {ascii, NLS2_OK};
+        if (ascii == capacity) return {ascii, NLS2_TRUNCATED};
         const Lease lease(toUnits_);
         if (!lease.valid()) return {ascii, NLS2_NO_LOCALE};
         char* in = const_cast<char*>(text) + ascii;
@@ -158,13 +159,13 @@ public:
             } else if (errno == E2BIG || outLeft < sizeof *out) {
                 status = NLS2_TRUNCATED;
             } else {
-                // EINVAL is a character that the text ends within.
-                const std::size_t skipped = errno == EINVAL ? inLeft : 1;
+                // One byte at a time, also of a character that the text ends within: what follows,
+                // the terminator at least, may be a character of its own.
                 std::memcpy(to, &kReplacementUnit, sizeof kReplacementUnit);
                 to += sizeof kReplacementUnit;
                 outLeft -= sizeof kReplacementUnit;
-                in += skipped;
-                inLeft -= skipped;
+                ++in;
+                --inLeft;
                 status = NLS2_SUBSTITUTED;
             }
         }
@@ -177,6 +178,7 @@ public:
         const unsigned ascii =
             narrowsAscii_ ? narrowAscii(text, std::min(length, capacity), out) : 0;
         if (ascii == length) return {ascii, NLS2_OK};
+        if (ascii == capacity) return {ascii, NLS2_TRUNCATED};
         const Lease lease(fromUnits_);
         if (!lease.valid()) return {ascii, NLS2_NO_LOCALE};
         char* in = reinterpret_cast<char*>(const_cast<unsigned short*>(text + ascii));

@@ -152,7 +152,7 @@ public:
     static void releaseUnicodeString(unsigned short* units);
 
 private:
-    static bool openLocale();
+    static bool initializeLocked();
     static NLS2_LOCALE* localeForConversion();
     [[noreturn]] static void throwBadSubscript();
 

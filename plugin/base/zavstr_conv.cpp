@@ -1,5 +1,6 @@
 // String: conversion from and to the process's code page, and what rests on it.
 
+#include <algorithm>
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
@@ -65,20 +66,19 @@ CharStar& CharStar::operator=(CharStar&& other) noexcept {
 }
 
 bool String::initialize() {
-    Trace trace(traceUnit);
     const std::lock_guard<std::mutex> lock(localeMutex());
-    return trace.exit(openLocale());
+    return initializeLocked();
 }
 
-bool String::openLocale() {
-    Trace trace(traceUnit);
+bool String::initializeLocked() {
+    Trace trace(traceUnit, "initialize");
     int status = NLS2_OK;
     if (NLS2_LOCALE* const held = _locale.exchange(nullptr)) NLS2_ReleaseLocale(held);
     NLS2_LOCALE* locale = NLS2_GetLocale(NLS2_BY_DEFAULT, 0, 0, &status);
     const int codepage = NLS2_GetLocaleCodepageId(locale, &status);
     trace().detail("codepage=%d", codepage);
-    // Two code pages are widened to their supersets. The locale that was opened for the narrower
-    // one stays open: another thread's handle may be the same one.
+    // Two code pages are widened to their supersets, on purpose without releasing the locale that
+    // the process has.
     if (codepage == NLS2_CP943) {
         trace().detail("codepage NLS2_CP943 detected, switching to NLS2_CP932");
         locale = NLS2_GetLocale(NLS2_BY_CODEPAGE, NLS2_CP932, 0, &status);
@@ -95,7 +95,7 @@ bool String::openLocale() {
 NLS2_LOCALE* String::localeForConversion() {
     if (!_initialized.load(std::memory_order_acquire)) {
         const std::lock_guard<std::mutex> lock(localeMutex());
-        if (!_initialized.load(std::memory_order_relaxed)) _initialized.store(openLocale());
+        if (!_initialized.load(std::memory_order_relaxed)) _initialized.store(initializeLocked());
     }
     return _locale.load(std::memory_order_acquire);
 }

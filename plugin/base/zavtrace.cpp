@@ -1,8 +1,12 @@
 #include "base/zavtrace.h"
 
+#include <algorithm>
+#include <cerrno>
 #include <cstdint>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <string_view>
 
 #include "base/zavstr.h"
 
@@ -44,11 +48,24 @@ void appendFormatted(const std::string& conversion, T value, std::string& out) {
     }
 }
 
-/// The precision of a conversion, or no limit.
-std::size_t precisionOf(const std::string& conversion) {
+std::size_t numberAt(const std::string& conversion, std::size_t at) {
+    return static_cast<std::size_t>(std::strtoul(conversion.c_str() + at, nullptr, 10));
+}
+
+/// Appends a text as "%s" of that width and precision does; the text need not be terminated before
+/// the precision is reached.
+void appendText(const std::string& conversion, const char* text, std::string& out) {
+    const std::size_t flagsEnd = conversion.find_first_not_of(kFlags, 1);
+    const bool leftAligned = conversion.find('-') < flagsEnd;
+    const std::size_t width = numberAt(conversion, flagsEnd);
     const std::size_t dot = conversion.find('.');
-    if (dot == std::string::npos) return std::string::npos;
-    return static_cast<std::size_t>(std::strtoul(conversion.c_str() + dot + 1, nullptr, 10));
+    const std::size_t length = dot == std::string::npos
+                                   ? std::strlen(text)
+                                   : ::strnlen(text, numberAt(conversion, dot + 1));
+    const std::size_t padding = width > length ? width - length : 0;
+    if (!leftAligned) out.append(padding, ' ');
+    out.append(text, length);
+    if (leftAligned) out.append(padding, ' ');
 }
 
 }  // namespace
@@ -59,16 +76,11 @@ TraceArgument::TraceArgument(const CharStar& text)
 void TraceArgument::formatText(const std::string& conversion, std::string& out) const {
     if (kind_ == Kind::Wide) {
         const CharStar narrow = static_cast<const String*>(pointer_)->c_str();
-        const char* const text = narrow;
-        out.append(text, ::strnlen(text, precisionOf(conversion)));
-        return;
+        appendText(conversion, narrow, out);
+    } else {
+        const char* const text = static_cast<const char*>(pointer_);
+        appendText(conversion, text != nullptr ? text : "(null)", out);
     }
-    const char* const text = static_cast<const char*>(pointer_);
-    if (text == nullptr) {
-        out += "(null)";
-        return;
-    }
-    out.append(text, ::strnlen(text, precisionOf(conversion)));
 }
 
 void TraceArgument::format(const std::string& conversion, std::string& out) const {
@@ -78,15 +90,15 @@ void TraceArgument::format(const std::string& conversion, std::string& out) cons
     if (isNumber && letter == 'c') {
         out += static_cast<char>(number_);
     } else if (isNumber && (letter == 's' || letter == 'p')) {
-        out += std::to_string(number_);
+        out += kind_ == Kind::Signed ? std::to_string(number_)
+                                     : std::to_string(static_cast<unsigned long long>(number_));
     } else if (isNumber && (letter == 'd' || letter == 'i')) {
         appendFormatted(head + "lld", number_, out);
     } else if (isNumber) {
         // Hexadecimal digits of a negative int are those of its own 32 bits.
-        const long long value =
-            kind_ == Kind::Signed && number_ < 0 && number_ >= INT32_MIN
-                ? static_cast<long long>(static_cast<std::uint32_t>(number_))
-                : number_;
+        const long long value = kind_ == Kind::Signed && number_ < 0 && number_ >= INT32_MIN
+                                    ? static_cast<long long>(static_cast<std::uint32_t>(number_))
+                                    : number_;
         appendFormatted(head + "ll" + letter, static_cast<unsigned long long>(value), out);
     } else if (kind_ == Kind::Pointer || letter == 'p') {
         appendFormatted("%p", pointer_, out);

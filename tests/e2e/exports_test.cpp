@@ -29,8 +29,7 @@ TEST(Exports, AreExactlyTheDocumentedEntryPointsAndGlobals) {
                                          "queue_mutex",
                                          "taskQueue",
                                          "worktodo"};
-    for (const char* name : {"zav_kagreqt", "zav_kinagt", "zav_kagdyst"}) {
-        const std::string table = name;
+    for (const std::string table : {"zav_kagreqt", "zav_kinagt", "zav_kagdyst"}) {
         expected.push_back(table + "_application");
         expected.push_back(table + "_table");
         expected.push_back(table + "_static_manager");
