@@ -42,4 +42,4 @@ std::uint32_t QVS_Agent_v1_BinaryDataTransfer_stub(const rpc__request* request, 
 
 /// Registers the interface with the runtime; returns its status, 0 for success. Does not retry and
 /// traces nothing of its own.
-extern "C" int QVS_NCS_RegisterAgentInterface();
+extern "C" [[gnu::visibility("default")]] int QVS_NCS_RegisterAgentInterface();

@@ -1,0 +1,184 @@
+#!/bin/sh
+# Shows the main job from a clean clone: builds the programs, makes a home, starts the host, starts
+# and stops an agent, deploys a real agent that nobody here wrote, configures and removes it, and
+# imports a metafile into the universal agent. Asks nothing, leaves no process behind, and ends with
+# status 0 when all of it worked.
+set -eu
+cd "$(dirname "$0")/.."
+
+say() { printf '\n\033[1m== %s\033[0m\n' "$*"; }
+run() { printf '$ %s\n' "$*"; "$@"; }
+
+# ---- Build ---------------------------------------------------------------------------------------
+
+scripts/bootstrap.sh
+say "Build"
+mkdir -p build
+cmake --preset native -DZAV_BUILD_TESTS=OFF -B build/demo >build/demo.log 2>&1 || { cat build/demo.log; exit 1; }
+cmake --build build/demo -- --quiet
+PATH=$PWD/build/demo/bin:$PATH
+
+# ---- A home and its host -------------------------------------------------------------------------
+
+scratch=$(mktemp -d)
+home=$scratch/home
+host=
+cleanup() {
+    status=$?
+    trap - EXIT
+    if [ -n "$host" ]; then
+        for product in ne ux um; do zavctl stop "$product" >/dev/null 2>&1 || true; done
+        kill "$host" 2>/dev/null || true
+        wait "$host" 2>/dev/null || true
+    fi
+    rm -rf "$scratch"
+    [ "$status" -eq 0 ] || echo "demo: failed"
+    exit "$status"
+}
+trap cleanup EXIT
+trap 'exit 130' INT TERM
+
+say "Make a home and start the host on it"
+run home/bin/prepare-home "$home"
+ZAV_SOCKET=$scratch/host.sock
+QVSDEPLOY_AGENTDEPOT=$home/depot
+KBB_RAS1_LOG=$scratch/trace.log
+export ZAV_SOCKET QVSDEPLOY_AGENTDEPOT
+KBB_RAS1='ERROR (UNIT:zavtasks ALL) (UNIT:zavtqelm ALL)' KBB_RAS1_LOG=$KBB_RAS1_LOG \
+    zavhost --home "$home" --origin-node "$(hostname):DEMO" >"$scratch/host.out" 2>&1 &
+host=$!
+tries=0
+until grep -q '^ready:' "$scratch/host.out" 2>/dev/null; do
+    tries=$((tries + 1))
+    if [ "$tries" -gt 100 ] || ! kill -0 "$host" 2>/dev/null; then
+        cat "$scratch/host.out"
+        exit 1
+    fi
+    sleep 0.1
+done
+cat "$scratch/host.out"
+run zavctl status
+
+say "The tables it serves"
+curl -s --unix-socket "$ZAV_SOCKET" http://localhost/v1/tables |
+    tr '{' '\n' | sed -n 's/.*"name": *"\([A-Z]*\)".*/\1/p' | tr '\n' ' '
+echo
+
+say "What is installed"
+run zavctl agents
+
+# ---- An agent of the starter home ----------------------------------------------------------------
+
+# Ends with the newest lines of a file as soon as it has some.
+first_lines() {
+    tries=0
+    until [ -s "$1" ] && [ "$(wc -l <"$1")" -ge 2 ]; do
+        tries=$((tries + 1))
+        [ "$tries" -le 150 ] || return 1
+        sleep 0.1
+    done
+    tail -n 3 "$1"
+}
+
+say "Start the agent ux: its process and its first figures"
+run zavctl start ux --transid demo-start
+ps -eo pid,args | grep "[a]gtqvs6/.*/ux/bin/agent" | head -n 1
+first_lines "$home/data/ux/figures.csv"
+say "Restart and stop it; the outcomes as the host gives them"
+run zavctl restart ux
+run zavctl --json stop ux
+say "The trace of the first request"
+grep -h -A 60 'COMMAND\|Going to run command START' "$KBB_RAS1_LOG" | sed 's/^[^ ]* [^ ]* [0-9]* //' |
+    grep -v ' F ' | cut -c 1-150 | sed -n '1,14p'
+
+# ---- A real agent from a bundle ------------------------------------------------------------------
+
+# Makes the bundle of $1 below the scratch directory; sets product, version and bundle.
+make_bundle() {
+    product=$1
+    bundle=$scratch/bundle-$1
+    version=$(home/bundles/make-bundle "$1" "$bundle")
+}
+
+fetch_metrics() {
+    curl -s --max-time 5 --retry 20 --retry-delay 1 --retry-connrefused "http://127.0.0.1:$1/metrics" |
+        grep -E '^node_(load1|memory_MemAvailable_bytes|boot_time_seconds) '
+}
+
+# A port that nothing listens on.
+free_port() {
+    port=$1
+    while grep -qi ":$(printf '%04X' "$port") 00000000:0000 0A" /proc/net/tcp; do port=$((port + 1)); done
+    echo "$port"
+}
+
+say "Deploy a real agent: push its bundle, install it"
+if make_bundle ne 2>"$scratch/bundle.err"; then
+    echo "The bundle ne holds the distribution's Prometheus node exporter."
+else
+    sed 's/^/  /' "$scratch/bundle.err"
+    echo "The distribution cannot be reached; the demo goes on with the agent ux instead."
+    run zavctl uninstall ux
+    rm -rf "$scratch/bundle-ne"
+    make_bundle ux
+fi
+run zavctl push "$bundle" "$product/$version"
+run zavctl install "$product" "$version" -- /bin/sh '|DEPLOYDIR|/install.sh' -h '|TOVRINHOME|'
+run zavctl agents
+
+say "Configure and start it"
+if [ "$product" = ne ]; then
+    first_port=$(free_port 19100)
+    second_port=$(free_port $((first_port + 1)))
+    setting="PORT=$first_port"
+    change="PORT=$second_port"
+else
+    setting="INTERVAL=1"
+    change="INTERVAL=2"
+fi
+printf 'INSTANCE=\n%s\n' "$setting" | run zavctl config set "$product" -
+run zavctl config get "$product"
+run zavctl start "$product"
+if [ "$product" = ne ]; then
+    echo "Its metrics on port $first_port:"
+    fetch_metrics "$first_port"
+fi
+
+say "Change its configuration; it takes effect with a restart"
+printf 'INSTANCE=\n%s\n' "$change" | run zavctl config set "$product" -
+run zavctl restart "$product"
+run zavctl config get "$product"
+if [ "$product" = ne ]; then
+    echo "Its metrics on port $second_port:"
+    fetch_metrics "$second_port"
+fi
+
+say "Stop and remove it"
+run zavctl stop "$product"
+run zavctl uninstall "$product"
+run zavctl agents
+
+# ---- The universal agent -------------------------------------------------------------------------
+
+say "Import a metafile and its script into the universal agent"
+printf 'APPL=DISKS\nDPTYPE=SCRP\nSOURCE=disks.sh\nFIELDS=FILESYSTEM,USED\n' >"$scratch/disks.mdl"
+# shellcheck disable=SC2016
+printf '#!/bin/sh\ndf -P / | awk "NR > 1 { print \\$1 \\",\\" \\$5 }"\n' >"$scratch/disks.sh"
+run zavctl push "$scratch/disks.mdl"
+run zavctl push "$scratch/disks.sh"
+run zavctl start um
+run zavctl ua-config --metafile disks.mdl --scripts disks.sh --restart
+echo "What it collects:"
+first_lines "$home/data/um/DISKS.csv"
+run zavctl stop um
+
+say "End the host"
+kill "$host"
+wait "$host"
+host=
+if ps -eo args | grep -q "[${scratch%"${scratch#?}"}]${scratch#?}/home"; then
+    echo "A process was left behind:"
+    ps -eo pid,args | grep "${scratch#?}/home"
+    exit 1
+fi
+echo "Nothing is left running."
