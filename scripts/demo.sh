@@ -14,9 +14,12 @@ run() { printf '$ %s\n' "$*"; "$@"; }
 scripts/bootstrap.sh
 say "Build"
 mkdir -p build
-cmake --preset native -DZAV_BUILD_TESTS=OFF -B build/demo >build/demo.log 2>&1 || { cat build/demo.log; exit 1; }
-cmake --build build/demo -- --quiet
-PATH=$PWD/build/demo/bin:$PATH
+cmake --preset native >build/demo.log 2>&1 || {
+    cat build/demo.log
+    exit 1
+}
+cmake --build --preset native --target zavmgmt zavhost zavctl -- --quiet
+PATH=$PWD/build/native/bin:$PATH
 
 # ---- A home and its host -------------------------------------------------------------------------
 
@@ -44,7 +47,7 @@ ZAV_SOCKET=$scratch/host.sock
 QVSDEPLOY_AGENTDEPOT=$home/depot
 KBB_RAS1_LOG=$scratch/trace.log
 export ZAV_SOCKET QVSDEPLOY_AGENTDEPOT
-KBB_RAS1='ERROR (UNIT:zavtasks ALL) (UNIT:zavtqelm ALL)' KBB_RAS1_LOG=$KBB_RAS1_LOG \
+KBB_RAS1='ERROR (UNIT:zavtasks DETAIL) (UNIT:zavtqelm DETAIL)' KBB_RAS1_LOG=$KBB_RAS1_LOG \
     zavhost --home "$home" --origin-node "$(hostname):DEMO" >"$scratch/host.out" 2>&1 &
 host=$!
 tries=0
@@ -61,8 +64,7 @@ run zavctl status
 
 say "The tables it serves"
 curl -s --unix-socket "$ZAV_SOCKET" http://localhost/v1/tables |
-    tr '{' '\n' | sed -n 's/.*"name": *"\([A-Z]*\)".*/\1/p' | tr '\n' ' '
-echo
+    grep -o '"K[A-Z]*"' | tr -d '"'
 
 say "What is installed"
 run zavctl agents
@@ -88,8 +90,7 @@ say "Restart and stop it; the outcomes as the host gives them"
 run zavctl restart ux
 run zavctl --json stop ux
 say "The trace of the first request"
-grep -h -A 60 'COMMAND\|Going to run command START' "$KBB_RAS1_LOG" | sed 's/^[^ ]* [^ ]* [0-9]* //' |
-    grep -v ' F ' | cut -c 1-150 | sed -n '1,14p'
+sed -n '/Command START is supported/,/aysnc status/p' "$KBB_RAS1_LOG" | cut -c 12-160 | sed '/aysnc status/q'
 
 # ---- A real agent from a bundle ------------------------------------------------------------------
 
