@@ -1,0 +1,220 @@
+// What the task manager says and does when its lock, its condition or its thread fail. The
+// definitions below come before the C library's, in this program only.
+#include <dlfcn.h>
+#include <gtest/gtest.h>
+#include <pthread.h>
+
+#include <atomic>
+#include <cerrno>
+#include <cstdlib>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "support/fake_sleep.h"
+#include "support/outcomes.h"
+#include "support/row_text.h"
+#include "support/trace_capture.h"
+#include "tasks/fake_handlers.h"
+#include "tasks/zavtasks.h"
+
+namespace {
+
+/// The error that the next call of one function on the task manager's own objects returns, once.
+struct Failure {
+    std::atomic<int> error{0};
+    int take() { return error.exchange(0); }
+};
+
+Failure mutexInit, condInit, threadCreate, mutexLock, mutexUnlock, condSignal, condWait;
+
+/// Condition variables have an older version beside their own in 32-bit C libraries.
+template <typename Function>
+Function* original(const char* name) {
+    void* found = ::dlvsym(RTLD_NEXT, name, "GLIBC_2.3.2");
+    if (found == nullptr) found = ::dlsym(RTLD_NEXT, name);
+    return reinterpret_cast<Function*>(found);
+}
+
+bool isTheQueues(const pthread_mutex_t* mutex) {
+    return mutex == &queue_mutex;
+}
+
+}  // namespace
+
+extern "C" {
+
+int pthread_mutex_init(pthread_mutex_t* mutex, const pthread_mutexattr_t* attributes) noexcept {
+    static auto* const next = original<decltype(pthread_mutex_init)>("pthread_mutex_init");
+    const int error = isTheQueues(mutex) ? mutexInit.take() : 0;
+    return error != 0 ? error : next(mutex, attributes);
+}
+
+int pthread_cond_init(pthread_cond_t* condition, const pthread_condattr_t* attributes) noexcept {
+    static auto* const next = original<decltype(pthread_cond_init)>("pthread_cond_init");
+    const int error = condition == &worktodo ? condInit.take() : 0;
+    return error != 0 ? error : next(condition, attributes);
+}
+
+int pthread_create(pthread_t* thread, const pthread_attr_t* attributes, void* (*body)(void*),
+                   void* argument) noexcept {
+    static auto* const next = original<decltype(pthread_create)>("pthread_create");
+    const int error = body == &executor_thread ? threadCreate.take() : 0;
+    return error != 0 ? error : next(thread, attributes, body, argument);
+}
+
+int pthread_mutex_lock(pthread_mutex_t* mutex) noexcept {
+    static auto* const next = original<decltype(pthread_mutex_lock)>("pthread_mutex_lock");
+    const int error = isTheQueues(mutex) ? mutexLock.take() : 0;
+    return error != 0 ? error : next(mutex);
+}
+
+/// A failing unlock unlocks nevertheless, since nothing could go on otherwise.
+int pthread_mutex_unlock(pthread_mutex_t* mutex) noexcept {
+    static auto* const next = original<decltype(pthread_mutex_unlock)>("pthread_mutex_unlock");
+    const int error = isTheQueues(mutex) ? mutexUnlock.take() : 0;
+    const int rc = next(mutex);
+    return error != 0 ? error : rc;
+}
+
+int pthread_cond_signal(pthread_cond_t* condition) noexcept {
+    static auto* const next = original<decltype(pthread_cond_signal)>("pthread_cond_signal");
+    const int error = condition == &worktodo ? condSignal.take() : 0;
+    return error != 0 ? error : next(condition);
+}
+
+int pthread_cond_wait(pthread_cond_t* condition, pthread_mutex_t* mutex) {
+    static auto* const next = original<decltype(pthread_cond_wait)>("pthread_cond_wait");
+    const int error = condition == &worktodo ? condWait.take() : 0;
+    return error != 0 ? error : next(condition, mutex);
+}
+
+}  // extern "C"
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+class QueueFailures : public testing::Test {
+protected:
+    QueueFailures() {
+        static ScratchDir& scratch = *new ScratchDir;
+        ::setenv("QVSDEPLOY_AGENTDEPOT", scratch.makeDir("depot").c_str(), 1);
+        fake_handlers::reset();
+        fake_sleep::reset();
+    }
+
+    static TaskQueueElem request(const char* transid) {
+        return TaskQueueElem("node", transid, "START", "ux", "", "INSTANCE", "", "", "", "i");
+    }
+
+    /// Starts the executor and waits until it waits for work itself.
+    static void startExecutor() {
+        zav_taskmgr_init();
+        Outcomes outcomes;
+        queueTask(request("warm-up"));
+        ASSERT_EQ(1u, outcomes.waitFor(1).size());
+    }
+
+    static Texts transids(const std::vector<zav_kagdyst_data_t>& rows) {
+        Texts found;
+        for (const zav_kagdyst_data_t& row : rows)
+            found.push_back(trimmedField(row.transid));
+        return found;
+    }
+
+    static void awaitError(const TraceCapture& trace, const std::string& text) {
+        for (int i = 0; i < 2000 && trace.count('E', text) == 0; ++i) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(5));
+        }
+        EXPECT_EQ(1, trace.count('E', text));
+    }
+};
+
+TEST_F(QueueFailures, StartUpGoesOnWhateverFails) {
+    if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
+    mutexInit.error = ENOMEM;
+    condInit.error = EAGAIN;
+    threadCreate.error = EPERM;
+    TraceCapture trace;
+    zav_taskmgr_init();
+    EXPECT_EQ((Texts{"Command vector being initialized",
+                     "Unable to initialize queue mutex, return code 12",
+                     "Unable to initialize condition variable, return code 11",
+                     "Unable to create executor thread, return code 1"}),
+              trace.errors("zavtasks"));
+    EXPECT_TRUE(initialized);
+    EXPECT_EQ(9u, commands.size());
+
+    TaskQueueElem task = request("tx");
+    EXPECT_EQ(0, runTask(task));
+    EXPECT_EQ(1u, taskQueue.size());
+    taskQueue = {};
+    commands.clear();
+    initialized = false;
+}
+
+TEST_F(QueueFailures, ATaskIsQueuedWhateverFails) {
+    if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
+    mutexLock.error = EINVAL;
+    condSignal.error = EPERM;
+    TraceCapture trace;
+    queueTask(request("tx"));
+    EXPECT_EQ(1u, taskQueue.size());
+    const Texts errors = trace.errors("zavtasks");
+    ASSERT_LE(2u, errors.size());
+    EXPECT_EQ("Unable to get lock on queue mutex, return code 22", errors[0]);
+    EXPECT_EQ("Unable to signal executor thread, return code 1", errors[1]);
+    taskQueue = {};
+    pthread_mutex_init(&queue_mutex, nullptr);  // it was unlocked without having been locked
+}
+
+TEST_F(QueueFailures, AFailedUnlockOfTheQueueIsTraced) {
+    if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
+    mutexUnlock.error = EPERM;
+    TraceCapture trace;
+    queueTask(request("tx"));
+    EXPECT_EQ((Texts{"Unable to unlock queue mutex, return code 1"}), trace.errors("zavtasks"));
+    EXPECT_EQ(1u, taskQueue.size());
+    taskQueue = {};
+}
+
+TEST_F(QueueFailures, TheExecutorTriesAgainWhenItCannotLock) {
+    startExecutor();
+    Outcomes outcomes;
+    TraceCapture trace;
+    mutexLock.error = EINVAL;
+    // Whoever locks next gets the error: let that be the executor, woken for nothing.
+    pthread_cond_broadcast(&worktodo);
+    awaitError(trace, "Failed to lock queue mutex, return code 22");
+    queueTask(request("tx"));
+    EXPECT_EQ((Texts{"tx"}), transids(outcomes.waitFor(1)));
+}
+
+TEST_F(QueueFailures, TheExecutorTriesAgainWhenItCannotWait) {
+    startExecutor();
+    Outcomes outcomes;
+    TraceCapture trace;
+    condWait.error = EINVAL;
+    pthread_cond_broadcast(&worktodo);
+    awaitError(trace, "Failed to wait on condition, return code 22");
+    queueTask(request("tx"));
+    EXPECT_EQ((Texts{"tx"}), transids(outcomes.waitFor(1)));
+}
+
+TEST_F(QueueFailures, ATaskWhoseUnlockFailsIsSkipped) {
+    startExecutor();
+    Outcomes outcomes;
+    TraceCapture trace;
+    pthread_mutex_lock(&queue_mutex);
+    taskQueue.push(request("skipped"));
+    mutexUnlock.error = EPERM;  // for the executor: this thread's own unlock is the original one
+    static auto* const unlock = original<decltype(pthread_mutex_unlock)>("pthread_mutex_unlock");
+    pthread_cond_signal(&worktodo);
+    unlock(&queue_mutex);
+    awaitError(trace, "Failed to unlock queue mutex, return code 1");
+    queueTask(request("tx"));
+    EXPECT_EQ((Texts{"tx"}), transids(outcomes.waitFor(1)));
+}
+
+}  // namespace
