@@ -19,4 +19,7 @@ void addTaskCommands(CLI::App& app, const Options& options, int& status);
 /// config get, config set, config edit, ua-config
 void addConfigurationCommands(CLI::App& app, const Options& options, int& status);
 
+/// push
+void addTransferCommands(CLI::App& app, const Options& options, int& status);
+
 }  // namespace ctl

@@ -44,6 +44,7 @@ int run(int argc, char** argv) {
     });
     ctl::addTaskCommands(app, options, status);
     ctl::addConfigurationCommands(app, options, status);
+    ctl::addTransferCommands(app, options, status);
     ctl::addInformationCommands(app, options, status);
     try {
         app.parse(argc, argv);

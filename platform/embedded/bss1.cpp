@@ -4,6 +4,8 @@
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
+#include <limits>
+#include <new>
 #include <string>
 
 const char* BSS1_GetEnv(const char* name, const char* fallback) {
@@ -14,14 +16,21 @@ const char* BSS1_GetEnv(const char* name, const char* fallback) {
 int BSS1_PutEnv(const char* setting) {
     const char* equals = setting != nullptr ? std::strchr(setting, '=') : nullptr;
     if (equals == nullptr || equals == setting) return EINVAL;
-    const std::string name(setting, equals);
-    return ::setenv(name.c_str(), equals + 1, 1) == 0 ? 0 : errno;
+    try {
+        const std::string name(setting, equals);
+        return ::setenv(name.c_str(), equals + 1, 1) == 0 ? 0 : errno;
+    } catch (const std::bad_alloc&) {
+        return ENOMEM;
+    }
 }
 
 void BSS1_Sleep(unsigned seconds) {
     timespec wakeUp{};
     ::clock_gettime(CLOCK_MONOTONIC, &wakeUp);
-    wakeUp.tv_sec += static_cast<time_t>(seconds);
+    // Where times have 32 bits, the longest sleep ends with the clock's range.
+    constexpr time_t kLatest = std::numeric_limits<time_t>::max();
+    const bool fits = seconds <= static_cast<unsigned long long>(kLatest - wakeUp.tv_sec);
+    wakeUp.tv_sec = fits ? wakeUp.tv_sec + static_cast<time_t>(seconds) : kLatest;
     while (::clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &wakeUp, nullptr) == EINTR) {
     }
 }

@@ -7,122 +7,65 @@
 #include "platform/ras1.h"
 
 #include <fcntl.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/uio.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <csignal>
 #include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
 #include <string>
-#include <vector>
 
 #include "embedded/ras1_control.h"
+#include "embedded/ras1_selection.h"
 
 std::atomic<unsigned> RAS1_Generation{1};
 
 namespace {
 
-constexpr unsigned kAllLevels = RAS1_DETAIL | RAS1_FLOW | RAS1_ERROR;
-
-/// Which units trace what: a level for all and exceptions by the beginning of the unit's name.
-struct Selection {
-    struct Rule {
-        std::string unitPrefix;
-        unsigned flags;
-    };
-    unsigned general = RAS1_ERROR;
-    std::vector<Rule> rules;
-
-    unsigned flagsOf(const char* unit) const {
-        for (const Rule& rule : rules) {
-            if (std::strncmp(unit, rule.unitPrefix.c_str(), rule.unitPrefix.size()) == 0) {
-                return rule.flags;
-            }
-        }
-        return general;
-    }
-};
-
-unsigned levelNamed(const std::string& word) {
-    if (word == "ALL") return kAllLevels;
-    if (word == "DETAIL") return RAS1_DETAIL | RAS1_ERROR;
-    if (word == "FLOW") return RAS1_FLOW | RAS1_ERROR;
-    if (word == "ERROR") return RAS1_ERROR;
-    return 0;
+/// A descriptor of its own, outside the numbers of the standard streams, for what `descriptor` is
+/// open to; -1 when there is none. If the process closes descriptor 2 and a file or a pipe gets
+/// that number, traces must not end up there; nor must the log become a child's standard stream.
+int ownDescriptor(int descriptor) {
+    return ::fcntl(descriptor, F_DUPFD_CLOEXEC, 3);
 }
 
-std::vector<std::string> words(const std::string& text) {
-    std::vector<std::string> found;
-    std::string word;
-    for (const char c : text + " ") {
-        if (c != ' ' && c != '\t') {
-            word += c;
-        } else if (!word.empty()) {
-            found.push_back(word);
-            word.clear();
-        }
-    }
-    return found;
+int openLog(const std::string& path) {
+    if (path.empty()) return -1;
+    const int opened = ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0640);
+    if (opened == -1 || opened > STDERR_FILENO) return opened;
+    const int moved = ownDescriptor(opened);
+    ::close(opened);
+    return moved;
 }
 
-/// "UNIT:name LEVEL ..." without its parentheses; other kinds of groups select nothing.
-void addGroup(const std::string& group, Selection& selection) {
-    std::string unit;
-    unsigned flags = 0;
-    for (const std::string& word : words(group)) {
-        if (word.rfind("UNIT:", 0) == 0) {
-            unit = word.substr(5);
-        } else {
-            flags |= levelNamed(word);
-        }
-    }
-    if (!unit.empty()) selection.rules.push_back({unit, flags});
-}
-
-Selection parseSelection(const std::string& text) {
-    Selection selection;
-    unsigned general = 0;
-    std::string outside;
-    std::size_t at = 0;
-    while (at < text.size()) {
-        const std::size_t open = text.find('(', at);
-        outside += text.substr(at, open == std::string::npos ? open : open - at) + " ";
-        if (open == std::string::npos) break;
-        const std::size_t close = text.find(')', open);
-        const std::size_t end = close == std::string::npos ? text.size() : close;
-        addGroup(text.substr(open + 1, end - open - 1), selection);
-        at = end + 1;
-    }
-    for (const std::string& word : words(outside)) general |= levelNamed(word);
-    if (general != 0) selection.general = general;
-    return selection;
-}
-
-/// A descriptor of its own for standard error: if the process closes descriptor 2 later and a file
-/// or a pipe gets that number, traces must not end up there.
-int ownStandardError() {
-    return ::fcntl(STDERR_FILENO, F_DUPFD_CLOEXEC, 3);
+/// Whether a write may raise SIGPIPE.
+bool hasReader(int descriptor) {
+    struct stat found {};
+    return ::fstat(descriptor, &found) == 0 && (S_ISFIFO(found.st_mode) || S_ISSOCK(found.st_mode));
 }
 
 /// What is in force. Replaced by configure() only; never destroyed, because threads trace until
 /// the process is gone.
 struct Facility {
-    Selection selection;
-    int standardError = ownStandardError();
+    ras1::Selection selection;
+    const int standardError = ownDescriptor(STDERR_FILENO);
     int log = -1;
+    bool readerMayGo = false;  ///< the lines go to a pipe or a socket
 
     Facility() { configureFromEnvironment(); }
 
     void configure(const std::string& selectionText, const std::string& logPath) {
-        selection = parseSelection(selectionText);
+        selection = ras1::parseSelection(selectionText);
         if (log != -1) ::close(log);
-        log = logPath.empty()
-                  ? -1
-                  : ::open(logPath.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0640);
+        log = openLog(logPath);
+        readerMayGo = hasReader(descriptor());
     }
 
     void configureFromEnvironment() {
@@ -135,7 +78,7 @@ struct Facility {
 };
 
 Facility& facility() {
-    static Facility& instance = *new Facility;   // immortal, see above
+    static Facility& instance = *new Facility;  // immortal, see above
     return instance;
 }
 
@@ -143,21 +86,30 @@ Facility& facility() {
 /// move.
 [[maybe_unused]] const Facility& startedEarly = facility();
 
-/// Appends decimal digits, at least `width` of them.
+/// Appends a number in decimal, with at least `width` digits.
 char* putNumber(char* at, long long value, int width) {
     char digits[24];
     int count = 0;
+    // The most negative value has no positive counterpart in its own type.
+    unsigned long long rest = static_cast<unsigned long long>(value);
+    if (value < 0) {
+        *at++ = '-';
+        rest = 0 - rest;
+    }
     do {
-        digits[count++] = static_cast<char>('0' + value % 10);
-        value /= 10;
-    } while (value > 0);
-    while (count < width) digits[count++] = '0';
-    while (count > 0) *at++ = digits[--count];
+        digits[count++] = static_cast<char>('0' + rest % 10);
+        rest /= 10;
+    } while (rest > 0);
+    while (count < width)
+        digits[count++] = '0';
+    while (count > 0)
+        *at++ = digits[--count];
     return at;
 }
 
 char* putText(char* at, const char* end, const char* text) {
-    while (*text != '\0' && at < end) *at++ = *text++;
+    while (*text != '\0' && at < end)
+        *at++ = *text++;
     return at;
 }
 
@@ -220,23 +172,74 @@ std::size_t putHead(char (&head)[256], const RAS1_BLOCK& block, char letter, int
 /// some), so they and the backslash are written as escapes. The trailing line feeds that some texts
 /// have are dropped.
 bool needsEscapes(const char* text, std::size_t length) {
-    return std::memchr(text, '\n', length) != nullptr || std::memchr(text, '\r', length) != nullptr ||
-           std::memchr(text, '\\', length) != nullptr;
+    return std::memchr(text, '\n', length) != nullptr ||
+           std::memchr(text, '\r', length) != nullptr || std::memchr(text, '\\', length) != nullptr;
 }
 
-std::string escaped(const char* text, std::size_t length) {
-    std::string out;
-    out.reserve(length + length / 8);
-    for (std::size_t i = 0; i < length; ++i) {
-        switch (text[i]) {
-            case '\n': out += "\\n"; break;
-            case '\r': out += "\\r"; break;
-            case '\\': out += "\\\\"; break;
-            default: out += text[i];
-        }
+/// Room for an escaped text that needs no allocator: a child after fork must not call one.
+class Scratch {
+public:
+    explicit Scratch(std::size_t size) : size_(size) {
+        if (size <= sizeof small_) return;
+        void* const mapped =
+            ::mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+        at_ = mapped == MAP_FAILED ? nullptr : static_cast<char*>(mapped);
     }
-    return out;
+    ~Scratch() {
+        if (at_ != small_ && at_ != nullptr) ::munmap(at_, size_);
+    }
+    Scratch(const Scratch&) = delete;
+    Scratch& operator=(const Scratch&) = delete;
+    char* get() { return at_; }
+
+private:
+    const std::size_t size_;
+    char small_[2048];
+    char* at_ = small_;
+};
+
+std::size_t putEscaped(char* out, const char* text, std::size_t length) {
+    char* at = out;
+    for (std::size_t i = 0; i < length; ++i) {
+        const char c = text[i];
+        const bool special = c == '\n' || c == '\r' || c == '\\';
+        if (special) *at++ = '\\';
+        *at++ = c == '\n' ? 'n' : c == '\r' ? 'r' : c;
+    }
+    return static_cast<std::size_t>(at - out);
 }
+
+/// While it exists, a write to a pipe without a reader costs the process nothing: SIGPIPE is
+/// blocked in this thread and taken back if it came.
+class SigpipeShield {
+public:
+    explicit SigpipeShield(bool wanted) : wanted_(wanted) {
+        if (!wanted_) return;
+        sigset_t pending;
+        ::sigemptyset(&pipe_);
+        ::sigaddset(&pipe_, SIGPIPE);
+        ::sigpending(&pending);
+        wasPending_ = ::sigismember(&pending, SIGPIPE) == 1;
+        ::pthread_sigmask(SIG_BLOCK, &pipe_, &before_);
+    }
+    ~SigpipeShield() {
+        if (!wanted_) return;
+        const timespec now{};
+        if (!wasPending_) {
+            while (::sigtimedwait(&pipe_, nullptr, &now) == -1 && errno == EINTR) {
+            }
+        }
+        ::pthread_sigmask(SIG_SETMASK, &before_, nullptr);
+    }
+    SigpipeShield(const SigpipeShield&) = delete;
+    SigpipeShield& operator=(const SigpipeShield&) = delete;
+
+private:
+    const bool wanted_;
+    bool wasPending_ = false;
+    sigset_t pipe_{};
+    sigset_t before_{};
+};
 
 void writeLine(const RAS1_BLOCK& block, char letter, int line, const char* text,
                std::size_t length) {
@@ -244,25 +247,26 @@ void writeLine(const RAS1_BLOCK& block, char letter, int line, const char* text,
     char head[256];
     const std::size_t headLength = putHead(head, block, letter, line);
     char newline = '\n';
-    iovec parts[3] = {{head, headLength},
-                      {const_cast<char*>(text), length},
-                      {&newline, 1}};
-    ssize_t written = 0;
-    do {
-        written = ::writev(facility().descriptor(), parts, 3);
-    } while (written == -1 && errno == EINTR);
+    iovec parts[3] = {{head, headLength}, {const_cast<char*>(text), length}, {&newline, 1}};
+    {
+        const SigpipeShield shield(facility().readerMayGo);
+        while (::writev(facility().descriptor(), parts, 3) == -1 && errno == EINTR) {
+        }
+    }
     errno = savedErrno;
 }
 
 void writeText(const RAS1_BLOCK& block, char letter, int line, const char* text,
                std::size_t length) {
-    while (length > 0 && text[length - 1] == '\n') --length;
-    if (needsEscapes(text, length)) {
-        const std::string safe = escaped(text, length);
-        writeLine(block, letter, line, safe.data(), safe.size());
-    } else {
+    while (length > 0 && text[length - 1] == '\n')
+        --length;
+    if (!needsEscapes(text, length)) {
         writeLine(block, letter, line, text, length);
+        return;
     }
+    Scratch safe(length * 2);
+    if (safe.get() == nullptr) return;
+    writeLine(block, letter, line, safe.get(), putEscaped(safe.get(), text, length));
 }
 
 }  // namespace
@@ -285,10 +289,7 @@ void RAS1_Exit(const RAS1_BLOCK* block, int line) {
 
 void RAS1_ExitValue(const RAS1_BLOCK* block, int line, long value) {
     char text[40] = "Exit ";
-    char* at = text + 5;
-    if (value < 0) *at++ = '-';
-    // The most negative value has no positive counterpart in its own type.
-    at = putNumber(at, value < 0 ? -static_cast<long long>(value + 1) + 1 : value, 1);
+    const char* const at = putNumber(text + 5, value, 1);
     writeLine(*block, 'F', line, text, static_cast<std::size_t>(at - text));
 }
 
@@ -297,7 +298,8 @@ void RAS1_Printf(const RAS1_BLOCK* block, unsigned level, int line, const char* 
     std::va_list arguments;
     va_start(arguments, format);
     if (std::strcmp(format, "%s") == 0) {
-        const char* const text = va_arg(arguments, const char*);
+        const char* const given = va_arg(arguments, const char*);
+        const char* const text = given != nullptr ? given : "(null)";
         writeText(*block, letter, line, text, std::strlen(text));
     } else {
         char buffer[1024];

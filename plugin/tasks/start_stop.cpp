@@ -2,8 +2,8 @@
 
 #include "base/zavrunas.h"
 #include "base/zavtrace.h"
+#include "tasks/failure.h"
 #include "tasks/home.h"
-#include "tasks/zavtqelm.h"
 #include "util/zavutil.h"
 
 using ZAV::String;
@@ -77,10 +77,7 @@ TASK_RC startstopAgent(const String& action, const String& product, const String
     char noTraceLog[] = "KBB_RAS1_LOG=";
     char* startEnvironment[] = {noTraceLog, nullptr};
     const TASK_RC rc = runScript(command, action == "START" ? startEnvironment : nullptr);
-    if (rc != TASK_OK && task != nullptr) {
-        task->setRetmsgid(rcToMsgId(rc));
-        task->setRetmsgparm(command);
-    }
+    if (rc != TASK_OK && task != nullptr) setFailure(*task, rc, command);
     trace().detail("Exit with return code [%d]", rc);
     return trace.exit(rc);
 }

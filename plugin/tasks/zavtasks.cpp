@@ -3,6 +3,7 @@
 #include "base/zavtrace.h"
 #include "tasks/command_table.h"
 #include "tasks/executor.h"
+#include "tasks/failure.h"
 #include "util/exceptions.h"
 #include "util/zavutil.h"
 
@@ -13,32 +14,25 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
 
-void setFailure(TaskQueueElem& task, TASK_RC rc, const String& parameter) {
-    task.setRetmsgid(rcToMsgId(rc));
-    task.setRetmsgparm(parameter);
-}
-
 /// Called while an exception is handled that left the command's handler. The code counts even when
 /// there is no memory for the message.
 TASK_RC endWithException(TaskQueueElem& task, TASK_RC rc) noexcept {
     try {
         Trace trace(traceUnit);
         const String command = task.getCommand();
-        trace().error("%s Command [%s] ended by an exception: %s", rcToMsgId(rc), command,
-                      ZAV::currentExceptionText());
-        setFailure(task, rc, command);
+        return trace.exit(failTask(trace(), task, rc, command,
+                                   "%s Command [%s] ended by an exception: %s", command,
+                                   ZAV::currentExceptionText()));
     } catch (...) {
         return rc;
     }
-    return rc;
 }
 
 TASK_RC refuseUnsupported(TaskQueueElem& task) {
     Trace trace(traceUnit);
     const String command = task.getCommand();
-    trace().error("%s Command [%s] is not a supported command", rcToMsgId(TASK_NOT_SUPPORTED),
-                  command);
-    setFailure(task, TASK_NOT_SUPPORTED, command);
+    failTask(trace(), task, TASK_NOT_SUPPORTED, command,
+             "%s Command [%s] is not a supported command", command);
     getSupportedTasks();
     return trace.exit(TASK_NOT_SUPPORTED);
 }
@@ -46,10 +40,8 @@ TASK_RC refuseUnsupported(TaskQueueElem& task) {
 TASK_RC refuseForUniversalAgent(TaskQueueElem& task) {
     Trace trace(traceUnit);
     const String command = task.getCommand();
-    trace().error("%s Command [%s] is not a supported command for UA",
-                  rcToMsgId(TASK_NOT_SUPPORTED), command);
-    setFailure(task, TASK_NOT_SUPPORTED, command);
-    return trace.exit(TASK_NOT_SUPPORTED);
+    return trace.exit(failTask(trace(), task, TASK_NOT_SUPPORTED, command,
+                               "%s Command [%s] is not a supported command for UA", command));
 }
 
 TASK_RC checkRequired(const Command& command, TaskQueueElem& task) {
@@ -110,9 +102,8 @@ TASK_RC requiredParameterOk(const String& name, const String& value, TaskQueueEl
                             TASK_RC current, TASK_RC failure) {
     Trace trace(traceUnit);
     if (value.length() != 0) return trace.exit(current);
-    trace().error("%s No [%s] specified, it is a required parameter", rcToMsgId(failure), name);
-    setFailure(task, failure, String());
-    return trace.exit(failure);
+    return trace.exit(failTask(trace(), task, failure, String(),
+                               "%s No [%s] specified, it is a required parameter", name));
 }
 
 bool isSupportedTask(String command) {

@@ -143,12 +143,16 @@ TEST(BadInput, RequestsThatMakeNoSenseAreRefusedAndRunNothing) {
 TEST(BadInput, BytesThatAreNoHttpEndTheirConnectionOnly) {
     ScriptHome home;
     ManagedHost host(home.path());
-    for (const std::string bytes :
-         {std::string("\0\0\0\0", 4), std::string("GET\r\n\r\n"), std::string(100000, 'A'),
-          std::string("GET / HTTP/9.9\r\n\r\n"),
-          std::string("POST /v1/query HTTP/1.1\r\nContent-Length: -1\r\n\r\n"),
-          std::string("POST /v1/query HTTP/1.1\r\nContent-Length: 99999999999999999999\r\n\r\n"),
-          "GET / HTTP/1.1\r\nX: " + std::string(100000, 'h') + "\r\n\r\n"}) {
+    const std::string cases[] = {
+        std::string("\0\0\0\0", 4),
+        "GET\r\n\r\n",
+        std::string(100000, 'A'),
+        "GET / HTTP/9.9\r\n\r\n",
+        "POST /v1/query HTTP/1.1\r\nContent-Length: -1\r\n\r\n",
+        "POST /v1/query HTTP/1.1\r\nContent-Length: 99999999999999999999\r\n\r\n",
+        "GET / HTTP/1.1\r\nX: " + std::string(100000, 'h') + "\r\n\r\n",
+    };
+    for (const std::string& bytes : cases) {
         const std::string answer = host.exchange(bytes);
         if (!answer.empty()) {
             EXPECT_GE(statusOf(answer), 400);

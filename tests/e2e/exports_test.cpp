@@ -29,7 +29,8 @@ TEST(Exports, AreExactlyTheDocumentedEntryPointsAndGlobals) {
                                          "queue_mutex",
                                          "taskQueue",
                                          "worktodo"};
-    for (const std::string table : {"zav_kagreqt", "zav_kinagt", "zav_kagdyst"}) {
+    for (const char* name : {"zav_kagreqt", "zav_kinagt", "zav_kagdyst"}) {
+        const std::string table = name;
         expected.push_back(table + "_application");
         expected.push_back(table + "_table");
         expected.push_back(table + "_static_manager");

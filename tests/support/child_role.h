@@ -11,7 +11,7 @@ namespace child_role {
 std::string program();
 
 /// The entry for a child's environment that makes this program take `role`:
-///   "descriptors"  prints the numbers of the open descriptors, one a line
+///   "descriptors"  prints the numbers of the descriptors that it was started with, one a line
 ///   "signals"      prints "blocked N" and "ignored N" for each such signal
 std::string environmentEntry(const std::string& role);
 

@@ -187,7 +187,10 @@ TEST(PruneLogs, AMissingDirectoryIsTraced) {
 
 TEST(InputStream, ReadsBytesAndBlocksUpToTheEnd) {
     auto [readEnd, writeEnd] = makePipe();
-    ASSERT_EQ(5, ::write(writeEnd.get(), "\xff" "abcd", 5));
+    ASSERT_EQ(5, ::write(writeEnd.get(),
+                         "\xff"
+                         "abcd",
+                         5));
     writeEnd.close();
     ProcessInputStream stream;
     stream.attach(std::move(readEnd));

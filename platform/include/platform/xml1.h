@@ -1,8 +1,10 @@
 /// Base services: an event-driven XML push parser.
 ///
 /// Names, attribute values and text are handed over in the code page of the process's default
-/// locale, 0-terminated except for character data, which has a length. A parser belongs to one
-/// thread at a time.
+/// locale, 0-terminated except for character data, which has a length. What that code page lacks
+/// becomes "?". A document with neither a byte order mark nor an XML declaration is read in that
+/// code page too, so that what was written in it comes back as it was. A parser belongs to one
+/// thread at a time. Entities that expand out of all proportion are an error.
 #pragma once
 
 /// A parser; owned by the facility.

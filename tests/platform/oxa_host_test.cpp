@@ -1,0 +1,417 @@
+// ctest-label: threaded
+#include "embedded/oxa_host.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <memory>
+#include <mutex>
+#include <new>
+#include <stdexcept>
+#include <string>
+#include <thread>
+
+#include "platform/sample_table.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+std::string nameOf(const oxa::Rows& rows, std::size_t index) {
+    const std::string name(rows.row(index), 8);
+    return name.substr(0, name.find_last_not_of(' ') + 1);
+}
+
+std::vector<std::string> names(const oxa::Rows& rows) {
+    std::vector<std::string> found;
+    for (std::size_t i = 0; i < rows.count(); ++i)
+        found.push_back(nameOf(rows, i));
+    return found;
+}
+
+/// Collects the names of the rows that a sink gets.
+struct Collector {
+    std::mutex lock;
+    std::vector<std::string> seen;
+
+    oxa::Sink sink() {
+        return [this](const oxa::Rows& rows) {
+            const std::lock_guard<std::mutex> guard(lock);
+            for (std::size_t i = 0; i < rows.count(); ++i)
+                seen.push_back(nameOf(rows, i));
+            return OXA_OK;
+        };
+    }
+    std::vector<std::string> get() {
+        const std::lock_guard<std::mutex> guard(lock);
+        return seen;
+    }
+};
+
+class Host : public testing::Test {
+protected:
+    Host() {
+        manager.sample = {sampleRow("alpha", 1, "one"), sampleRow("beta", 2, "two"),
+                          sampleRow("gamma", 3, "three")};
+        EXPECT_EQ(OXA_OK, manager.RegisterWithManager());
+    }
+    std::vector<std::string> ask(const std::vector<oxa::Predicate>& where) {
+        oxa::Rows rows;
+        EXPECT_EQ(OXA_OK, oxa::query("SAMPLE", where, rows));
+        return names(rows);
+    }
+
+    SampleManager manager;
+};
+
+TEST_F(Host, AQueryIsSampledOnceAndItsObjectDestroyed) {
+    EXPECT_THAT(ask({}), ElementsAre("alpha", "beta", "gamma"));
+    EXPECT_EQ(1, manager.samples);
+    EXPECT_EQ(0, manager.objects);
+}
+
+TEST_F(Host, AQueryIsNeverAmongTheLiveObjects) {
+    std::vector<unsigned> live{99};
+    manager.onSample = [&] { live = manager.liveNumbers(); };
+    ask({});
+    EXPECT_THAT(live, IsEmpty());
+}
+
+TEST_F(Host, PredicatesAreCombinedWithAnd) {
+    EXPECT_THAT(ask({{"VALUE", OPER_GE, "2"}}), ElementsAre("beta", "gamma"));
+    EXPECT_THAT(ask({{"VALUE", OPER_GE, "2"}, {"NAME", OPER_NE, "beta"}}), ElementsAre("gamma"));
+    EXPECT_THAT(ask({{"NAME", OPER_EQ, "alpha"}, {"NAME", OPER_EQ, "beta"}}), IsEmpty());
+    EXPECT_THAT(ask({{"REMARK", OPER_LIKE, "t*"}}), ElementsAre("beta", "gamma"));
+}
+
+TEST_F(Host, AnEntryThatNamesNoColumnRestrictsNothing) {
+    EXPECT_THAT(ask({{"name", OPER_EQ, "alpha"}}), ElementsAre("alpha", "beta", "gamma"));
+    EXPECT_THAT(ask({{"NAMES", OPER_EQ, "alpha"}}), ElementsAre("alpha", "beta", "gamma"));
+    EXPECT_THAT(ask({{"", OPER_EQ, ""}, {"NAME", OPER_EQ, "beta"}}), ElementsAre("beta"));
+}
+
+TEST_F(Host, AValueWiderThanItsColumnIsComparedUpToTheColumnsWidth) {
+    manager.sample = {sampleRow("abcdefghijkl", 1)};
+    EXPECT_THAT(ask({{"NAME", OPER_EQ, "abcdefghijkl"}}), ElementsAre("abcdefgh"));
+}
+
+/// Reads its filter in its constructor, as tables do.
+class FilterReader : public SampleManager {
+public:
+    FilterReader() : SampleManager("FILTER") {}
+    rtoxa* CreateRtoxa(RequestDetail* detail, ContextInfo* context) override {
+        auto request = std::make_unique<SampleRequest>(detail, context, this);
+        FLT1_FILTERINFO entry{};
+        for (status = request->GetFilterInfo(&entry); status == OXA_OK;
+             status = request->GetFilterInfo(&entry)) {
+            seen.push_back({entry.columnName, entry.op, {entry.value, entry.valueLength}});
+            EXPECT_EQ('\0', entry.value[entry.valueLength]);
+        }
+        return request.release();
+    }
+    std::vector<oxa::Predicate> seen;
+    int status = OXA_OK;
+};
+
+TEST(Filter, EveryEntryIsHandedOnUnchangedAndInOrder) {
+    FilterReader manager;
+    manager.RegisterWithManager();
+    const std::string withZero("a\0b ", 4);
+    oxa::Rows rows;
+    oxa::query(
+        "FILTER",
+        {{"NAME", OPER_EQ, "  x  "}, {"no such", OPER_LIKE, "*"}, {"NAME", OPER_NE, withZero}},
+        rows);
+    ASSERT_EQ(3U, manager.seen.size());
+    EXPECT_EQ("NAME", manager.seen[0].column);
+    EXPECT_EQ(OPER_EQ, manager.seen[0].op);
+    EXPECT_EQ("  x  ", manager.seen[0].value);
+    EXPECT_EQ("no such", manager.seen[1].column);
+    EXPECT_EQ(OPER_LIKE, manager.seen[1].op);
+    EXPECT_EQ(withZero, manager.seen[2].value);
+    EXPECT_EQ(OXA_END_OF_FILTER, manager.status);
+}
+
+TEST_F(Host, AQueryOnAnUnknownTableSaysSo) {
+    oxa::Rows rows;
+    rows.bytes = "left over";
+    EXPECT_EQ(OXA_GONE, oxa::query("NOSUCH", {}, rows));
+    EXPECT_EQ(0U, rows.count());
+    EXPECT_EQ(nullptr, oxa::subscribe("NOSUCH", {}, [](const oxa::Rows&) { return 0; }));
+}
+
+TEST_F(Host, WhatATableThrowsBecomesAStatus) {
+    oxa::Rows rows;
+    manager.onSample = [] { throw std::runtime_error("sample"); };
+    EXPECT_EQ(OXA_FAILED, oxa::query("SAMPLE", {}, rows));
+    manager.onSample = [] { throw 1; };
+    EXPECT_EQ(OXA_FAILED, oxa::query("SAMPLE", {}, rows));
+    manager.onSample = [] { throw std::bad_alloc(); };
+    EXPECT_EQ(OXA_NO_MEMORY, oxa::query("SAMPLE", {}, rows));
+    manager.onCreate = [] { throw std::runtime_error("create"); };
+    EXPECT_EQ(OXA_FAILED, oxa::query("SAMPLE", {}, rows));
+    EXPECT_EQ(nullptr, oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; }));
+    EXPECT_EQ(0, manager.objects);
+}
+
+TEST_F(Host, TablesAreListedWithTheirColumnsAndNeverSampled) {
+    const std::vector<oxa::Table> tables = oxa::tables();
+    ASSERT_EQ(1U, tables.size());
+    EXPECT_EQ("TST", tables[0].application);
+    EXPECT_EQ("SAMPLE", tables[0].name);
+    ASSERT_EQ(3U, tables[0].columns.size());
+    ASSERT_NE(nullptr, tables[0].find("VALUE"));
+    EXPECT_EQ(8, tables[0].find("VALUE")->offset);
+    EXPECT_EQ(4, tables[0].find("VALUE")->length);
+    EXPECT_EQ(OXA_TYPE_INTEGER, tables[0].find("VALUE")->type);
+    EXPECT_EQ(nullptr, tables[0].find("value"));
+    EXPECT_EQ(0, manager.samples);
+    EXPECT_EQ(0, manager.objects);
+}
+
+TEST_F(Host, ATableThatCannotBeAskedIsListedAndAskedAgain) {
+    manager.onCreate = [] { throw std::runtime_error("not now"); };
+    ASSERT_EQ(1U, oxa::tables().size());
+    EXPECT_THAT(oxa::tables()[0].columns, IsEmpty());
+    manager.onCreate = nullptr;
+    EXPECT_EQ(3U, oxa::tables()[0].columns.size());
+}
+
+TEST_F(Host, TablesKeepTheOrderOfTheirRegistration) {
+    SampleManager second("AAA");
+    second.RegisterWithManager();
+    SampleManager again;
+    again.RegisterWithManager();
+    const std::vector<oxa::Table> tables = oxa::tables();
+    ASSERT_EQ(2U, tables.size());
+    EXPECT_EQ("SAMPLE", tables[0].name);
+    EXPECT_EQ("AAA", tables[1].name);
+}
+
+TEST(Registration, EndsWithTheManager) {
+    {
+        SampleManager manager("BRIEF");
+        manager.RegisterWithManager();
+        oxa::Rows rows;
+        EXPECT_EQ(OXA_OK, oxa::query("BRIEF", {}, rows));
+    }
+    oxa::Rows rows;
+    EXPECT_EQ(OXA_GONE, oxa::query("BRIEF", {}, rows));
+    EXPECT_THAT(oxa::tables(), IsEmpty());
+}
+
+TEST_F(Host, RowsReachALiveSubscriptionThroughItsFilter) {
+    Collector all, some;
+    const auto first = oxa::subscribe("SAMPLE", {}, all.sink());
+    const auto second = oxa::subscribe("SAMPLE", {{"NAME", OPER_EQ, "x"}}, some.sink());
+    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("x", 1)));
+    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("y", 2)));
+    EXPECT_THAT(all.get(), ElementsAre("x", "y"));
+    EXPECT_THAT(some.get(), ElementsAre("x"));
+    EXPECT_EQ(0, manager.samples);
+}
+
+TEST_F(Host, ALiveObjectIsASubscription) {
+    const auto live = oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; });
+    manager.lock();
+    RtoxaListIter objects(&manager);
+    const rtoxa* const object = objects.Next();
+    ASSERT_NE(nullptr, object);
+    EXPECT_EQ(1, object->SampleType());
+    EXPECT_EQ(0U, object->UseCount());
+    EXPECT_EQ(nullptr, objects.Next());
+    EXPECT_EQ(nullptr, objects.Next());
+    manager.unlock();
+}
+
+TEST_F(Host, LiveObjectsAreWalkedInTheOrderInWhichTheyCame) {
+    std::vector<std::unique_ptr<oxa::Subscription>> live;
+    for (int i = 0; i < 5; ++i) {
+        live.push_back(oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; }));
+    }
+    const std::vector<unsigned> all = manager.liveNumbers();
+    ASSERT_EQ(5U, all.size());
+    EXPECT_TRUE(std::is_sorted(all.begin(), all.end()));
+    live[2].reset();
+    EXPECT_THAT(manager.liveNumbers(), ElementsAre(all[0], all[1], all[3], all[4]));
+    live[0].reset();
+    live[4].reset();
+    EXPECT_THAT(manager.liveNumbers(), ElementsAre(all[1], all[3]));
+    live.push_back(oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; }));
+    EXPECT_EQ(3U, manager.liveNumbers().size());
+    EXPECT_EQ(all[1], manager.liveNumbers()[0]);
+}
+
+TEST_F(Host, WhatASinkAnswersIsTheResultOfTheDispatch) {
+    int answer = OXA_OVERFLOW;
+    const auto live = oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) { return answer; });
+    EXPECT_EQ(OXA_OVERFLOW, manager.publish(sampleRow("a", 1)));
+    answer = OXA_GONE;
+    EXPECT_EQ(OXA_GONE, manager.publish(sampleRow("a", 1)));
+    answer = OXA_OK;
+    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("a", 1)));
+}
+
+TEST_F(Host, ASinkThatThrowsLosesItsRowsAndDisturbsNobody) {
+    Collector other;
+    bool failing = true;
+    int calls = 0;
+    const auto bad = oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) -> int {
+        ++calls;
+        if (failing) throw std::runtime_error("sink");
+        return OXA_OK;
+    });
+    const auto good = oxa::subscribe("SAMPLE", {}, other.sink());
+    EXPECT_EQ(OXA_OVERFLOW, manager.publish(sampleRow("a", 1)));
+    failing = false;
+    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("b", 1)));
+    EXPECT_EQ(2, calls);
+    EXPECT_THAT(other.get(), ElementsAre("a", "b"));
+}
+
+TEST_F(Host, ASubscriptionWithoutASinkHasNoRequester) {
+    const auto live = oxa::subscribe("SAMPLE", {}, nullptr);
+    ASSERT_NE(nullptr, live);
+    EXPECT_EQ(OXA_GONE, manager.publish(sampleRow("a", 1)));
+}
+
+TEST_F(Host, ADroppedSubscriptionTakesItsObjectAndItsSinkAlong) {
+    const auto token = std::make_shared<int>(0);
+    auto live = oxa::subscribe("SAMPLE", {}, [token](const oxa::Rows&) { return 0; });
+    EXPECT_EQ(2, token.use_count());
+    EXPECT_EQ(1, manager.objects);
+    live.reset();
+    EXPECT_EQ(1, token.use_count());
+    EXPECT_EQ(0, manager.objects);
+    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("a", 1)));
+}
+
+TEST_F(Host, AnObjectInUseOutlivesItsSubscriptionUntilTheLastDrop) {
+    int calls = 0;
+    auto live = oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) { return ++calls, OXA_OK; });
+    manager.lock();
+    SampleRequest& object = *static_cast<SampleRequest*>(RtoxaListIter(&manager).Next());
+    object.UseHandle(object.Handle());
+    object.UseHandle(object.Handle());
+    manager.unlock();
+
+    live.reset();
+    EXPECT_EQ(1, manager.objects);
+    EXPECT_THAT(manager.liveNumbers(), IsEmpty());
+    object.add(sampleRow("a", 1));
+    EXPECT_EQ(OXA_GONE, object.Dispatch());
+    EXPECT_EQ(0, calls);
+    object.Drop();
+    EXPECT_EQ(1, manager.objects);
+    object.Drop();
+    EXPECT_EQ(0, manager.objects);
+}
+
+TEST_F(Host, ReRegistrationReplacesTheManagerAndKeepsTheSubscriptions) {
+    Collector rows;
+    const auto before = oxa::subscribe("SAMPLE", {}, rows.sink());
+    SampleManager successor;
+    successor.sample = {sampleRow("new", 1)};
+    ASSERT_EQ(OXA_OK, successor.RegisterWithManager());
+    EXPECT_EQ(1, manager.shutdowns);
+    EXPECT_THAT(ask({}), ElementsAre("new"));
+    EXPECT_EQ(OXA_OK, successor.publish(sampleRow("event", 1)));
+    EXPECT_THAT(rows.get(), ElementsAre("event"));
+}
+
+TEST_F(Host, RegisteringTwiceShutsNobodyDown) {
+    EXPECT_EQ(OXA_OK, manager.RegisterWithManager());
+    EXPECT_EQ(0, manager.shutdowns);
+    EXPECT_EQ(1U, oxa::tables().size());
+}
+
+TEST_F(Host, AThousandSubscriptionsComeAndGoWithoutATrace) {
+    std::vector<std::unique_ptr<oxa::Subscription>> live;
+    int calls = 0;
+    for (int i = 0; i < 1000; ++i) {
+        live.push_back(oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) { return ++calls, 0; }));
+    }
+    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("a", 1)));
+    EXPECT_EQ(1000, calls);
+    live.clear();
+    EXPECT_EQ(0, manager.objects);
+    EXPECT_THAT(manager.liveNumbers(), IsEmpty());
+}
+
+TEST_F(Host, NoSinkIsCalledOnceItsSubscriptionIsGone) {
+    std::atomic<bool> publishing{true};
+    std::thread publisher([&] {
+        while (publishing)
+            manager.publish(sampleRow("a", 1));
+    });
+    std::vector<std::thread> subscribers;
+    for (int t = 0; t < 4; ++t) {
+        subscribers.emplace_back([&] {
+            for (int i = 0; i < 200; ++i) {
+                auto alive = std::make_unique<bool>(true);
+                bool* const flag = alive.get();
+                auto live = oxa::subscribe(
+                    "SAMPLE", {}, [flag](const oxa::Rows&) { return *flag ? OXA_OK : OXA_GONE; });
+                std::this_thread::yield();
+                live.reset();
+                alive.reset();  // the sanitizers see a sink that comes too late
+            }
+        });
+    }
+    for (std::thread& thread : subscribers)
+        thread.join();
+    publishing = false;
+    publisher.join();
+    EXPECT_EQ(0, manager.objects);
+}
+
+TEST_F(Host, QueriesAndReRegistrationsRunSideBySide) {
+    SampleManager other;
+    other.sample = manager.sample;
+    std::atomic<bool> running{true};
+    std::thread registrar([&] {
+        while (running) {
+            other.RegisterWithManager();
+            manager.RegisterWithManager();
+            oxa::tables();
+        }
+    });
+    std::vector<std::thread> askers;
+    for (int t = 0; t < 4; ++t) {
+        askers.emplace_back([&] {
+            for (int i = 0; i < 200; ++i) {
+                EXPECT_EQ(1U, ask({{"VALUE", OPER_EQ, "2"}}).size());
+            }
+        });
+    }
+    for (std::thread& thread : askers)
+        thread.join();
+    running = false;
+    registrar.join();
+}
+
+TEST_F(Host, AHandleInUseMayDispatchWhileTheSubscriptionEnds) {
+    for (int i = 0; i < 200; ++i) {
+        auto alive = std::make_unique<bool>(true);
+        auto live = oxa::subscribe("SAMPLE", {}, [flag = alive.get()](const oxa::Rows&) {
+            return *flag ? OXA_OK : OXA_GONE;
+        });
+        manager.lock();
+        SampleRequest& object = *static_cast<SampleRequest*>(RtoxaListIter(&manager).Next());
+        object.UseHandle(object.Handle());
+        manager.unlock();
+        std::thread user([&object] {
+            object.add(sampleRow("a", 1));
+            object.Dispatch();
+            object.Drop();
+        });
+        live.reset();
+        alive.reset();
+        user.join();
+    }
+    EXPECT_EQ(0, manager.objects);
+}
+
+}  // namespace

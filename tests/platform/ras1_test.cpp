@@ -1,0 +1,278 @@
+// ctest-label: threaded
+#include "platform/ras1.h"
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <climits>
+#include <cstdlib>
+#include <sstream>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "embedded/ras1_control.h"
+#include "embedded/ras1_selection.h"
+#include "support/scratch_dir.h"
+#include "support/trace_capture.h"
+
+namespace {
+
+using testing::ElementsAre;
+using testing::MatchesRegex;
+
+constexpr unsigned kAll = RAS1_DETAIL | RAS1_FLOW | RAS1_ERROR;
+
+RAS1_UNIT unit{"zavsample"};
+const RAS1_BLOCK block{&unit, "doWork"};
+
+struct SelectionCase {
+    std::string text;
+    unsigned sample;  ///< flags of the unit "zavsample"
+    unsigned other;   ///< flags of the unit "zavother"
+};
+
+class Selection : public testing::TestWithParam<SelectionCase> {};
+
+TEST_P(Selection, GivesEachUnitItsFlags) {
+    const ras1::Selection selection = ras1::parseSelection(GetParam().text);
+    EXPECT_EQ(GetParam().sample, selection.flagsOf("zavsample")) << GetParam().text;
+    EXPECT_EQ(GetParam().other, selection.flagsOf("zavother")) << GetParam().text;
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Forms, Selection,
+    testing::Values(
+        SelectionCase{"", RAS1_ERROR, RAS1_ERROR}, SelectionCase{"ERROR", RAS1_ERROR, RAS1_ERROR},
+        SelectionCase{"ALL", kAll, kAll},
+        SelectionCase{"DETAIL", RAS1_DETAIL | RAS1_ERROR, RAS1_DETAIL | RAS1_ERROR},
+        SelectionCase{"FLOW DETAIL", kAll, kAll}, SelectionCase{"nonsense", RAS1_ERROR, RAS1_ERROR},
+        SelectionCase{"ERROR (UNIT:zavsample ALL)", kAll, RAS1_ERROR},
+        SelectionCase{"ERROR(UNIT:zavsample ALL)(UNIT:zavo FLOW)", kAll, RAS1_FLOW | RAS1_ERROR},
+        SelectionCase{"ALL (UNIT:zavsample)", 0, kAll},
+        SelectionCase{"(UNIT:zavsample DETAIL) ALL", RAS1_DETAIL | RAS1_ERROR, kAll},
+        SelectionCase{"ERROR (UNIT:zavs ALL) (UNIT:zavsample ERROR)", kAll, RAS1_ERROR},
+        SelectionCase{"ERROR (UNIT:zavsample ALL", kAll, RAS1_ERROR},
+        SelectionCase{"ERROR (COMP:x ALL) ()", RAS1_ERROR, RAS1_ERROR},
+        SelectionCase{") ( ((", RAS1_ERROR, RAS1_ERROR}));
+
+TEST(Line, CarriesTimeThreadLevelPlaceAndText) {
+    const ScratchDir scratch;
+    ras1::configure("ALL", scratch.path("log"));
+    RAS1_Printf(&block, RAS1_ERROR, 42, "%d files in %s", 3, "depot");
+    ras1::configureFromEnvironment();
+    EXPECT_THAT(scratch.read("log"),
+                MatchesRegex("20[0-9][0-9]-[01][0-9]-[0-3][0-9] [0-2][0-9]:[0-5][0-9]:[0-6][0-9]\\."
+                             "[0-9][0-9][0-9][0-9][0-9][0-9] [0-9]+ E zavsample:42 doWork: "
+                             "3 files in depot\n"));
+}
+
+TEST(Line, ItsDateIsTheCalendars) {
+    const ScratchDir scratch;
+    ras1::configure("ALL", scratch.path("log"));
+    const time_t before = ::time(nullptr);
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "x");
+    const time_t after = ::time(nullptr);
+    ras1::configureFromEnvironment();
+    const std::string seconds = scratch.read("log").substr(0, 19);
+    char first[32], last[32];
+    tm parts{};
+    std::strftime(first, sizeof first, "%Y-%m-%d %H:%M:%S", ::gmtime_r(&before, &parts));
+    std::strftime(last, sizeof last, "%Y-%m-%d %H:%M:%S", ::gmtime_r(&after, &parts));
+    EXPECT_LE(first, seconds);
+    EXPECT_LE(seconds, last);
+}
+
+TEST(Line, EventsHaveTheirOwnLetter) {
+    const TraceCapture trace;
+    RAS1_Entry(&block, 1);
+    RAS1_Printf(&block, RAS1_DETAIL, 2, "%s", "found");
+    RAS1_Exit(&block, 3);
+    RAS1_ExitValue(&block, 4, 17);
+    RAS1_ExitValue(&block, 5, -17);
+    RAS1_ExitValue(&block, 6, LONG_MIN);
+    std::string letters;
+    std::vector<std::string> texts;
+    for (const TraceLine& line : trace.lines()) {
+        letters += line.level;
+        texts.push_back(line.text);
+        EXPECT_EQ("zavsample", line.unit);
+        EXPECT_EQ("doWork", line.function);
+    }
+    EXPECT_EQ("FDFFFF", letters);
+    EXPECT_THAT(texts, ElementsAre("Entry", "found", "Exit", "Exit 17", "Exit -17",
+                                   "Exit " + std::to_string(LONG_MIN)));
+}
+
+TEST(Line, LineEndsInATextStayInOneLine) {
+    const TraceCapture trace;
+    const std::string text = "one\ntwo\r\nC:\\dir";
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", (text + "\n\n").c_str());
+    RAS1_Printf(&block, RAS1_ERROR, 1, "<%s>", text.c_str());
+    EXPECT_THAT(trace.errors(), ElementsAre(text, "<" + text + ">"));
+}
+
+TEST(Line, TextsOfAnyLengthAreWrittenWhole) {
+    const TraceCapture trace;
+    std::vector<std::string> expected;
+    for (const std::size_t length : {0U, 1U, 1023U, 1024U, 1025U, 4096U, 100000U}) {
+        const std::string plain(length, 'x');
+        std::string escaped = plain;
+        for (std::size_t i = 0; i + 1 < length; i += 2)
+            escaped[i] = '\\';
+        RAS1_Printf(&block, RAS1_ERROR, 1, "%s", plain.c_str());
+        RAS1_Printf(&block, RAS1_ERROR, 1, "%s:", plain.c_str());
+        RAS1_Printf(&block, RAS1_ERROR, 1, "%s", escaped.c_str());
+        expected.insert(expected.end(), {plain, plain + ":", escaped});
+    }
+    EXPECT_EQ(expected, trace.errors());
+}
+
+TEST(Line, ANullTextIsSaidToBeOne) {
+    const TraceCapture trace;
+    const char* const nothing = ::getenv("ZAV_NO_SUCH_VARIABLE");
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", nothing);
+    EXPECT_THAT(trace.errors(), ElementsAre("(null)"));
+}
+
+TEST(Line, LongNamesDoNotOverrunTheHead) {
+    static const std::string longName(500, 'u');
+    static RAS1_UNIT longUnit{longName.c_str()};
+    const RAS1_BLOCK longBlock{&longUnit, longName.c_str()};
+    const TraceCapture trace;
+    RAS1_Printf(&longBlock, RAS1_ERROR, INT_MAX, "%s", "text");
+    ASSERT_EQ(1U, trace.lines().size());
+}
+
+TEST(Line, LeavesErrnoAlone) {
+    const TraceCapture trace;
+    errno = EXDEV;
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "text");
+    EXPECT_EQ(EXDEV, errno);
+}
+
+TEST(Line, LinesOfManyThreadsDoNotMix) {
+    const TraceCapture trace;
+    const std::string text(300, 't');
+    std::vector<std::thread> threads;
+    for (int t = 0; t < 4; ++t) {
+        threads.emplace_back([&] {
+            for (int i = 0; i < 250; ++i)
+                RAS1_Printf(&block, RAS1_DETAIL, 1, "%s", text.c_str());
+        });
+    }
+    for (std::thread& thread : threads)
+        thread.join();
+    EXPECT_EQ(1000, trace.count('D', text));
+}
+
+TEST(Line, AChildBetweenForkAndExecTraces) {
+    const TraceCapture trace;
+    const pid_t child = ::fork();
+    if (child == 0) {
+        RAS1_Printf(&block, RAS1_DETAIL, 1, "%s", "in the\nchild");
+        ::_exit(0);
+    }
+    ASSERT_EQ(child, ::waitpid(child, nullptr, 0));
+    EXPECT_THAT(trace.details(), ElementsAre("in the\nchild"));
+}
+
+TEST(Flags, FollowTheSelectionInForce) {
+    {
+        const TraceCapture trace("ERROR (UNIT:zavsample DETAIL)");
+        EXPECT_EQ(RAS1_DETAIL | RAS1_ERROR, RAS1_Flags(unit));
+    }
+    {
+        const TraceCapture trace("ALL");
+        EXPECT_EQ(kAll, RAS1_Flags(unit));
+    }
+}
+
+TEST(Flags, ErrorsAreOnUnlessTheEnvironmentSaysMore) {
+    ::unsetenv("KBB_RAS1");
+    ras1::configureFromEnvironment();
+    EXPECT_EQ(unsigned{RAS1_ERROR}, RAS1_Flags(unit));
+    ::setenv("KBB_RAS1", "ALL", 1);
+    ras1::configureFromEnvironment();
+    EXPECT_EQ(kAll, RAS1_Flags(unit));
+    ::unsetenv("KBB_RAS1");
+    ras1::configureFromEnvironment();
+}
+
+TEST(Log, IsTheFileThatTheEnvironmentNamesAndIsAppendedTo) {
+    const ScratchDir scratch;
+    scratch.write("log", "before\n");
+    ::setenv("KBB_RAS1_LOG", scratch.path("log").c_str(), 1);
+    ras1::configureFromEnvironment();
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "text");
+    ::unsetenv("KBB_RAS1_LOG");
+    ras1::configureFromEnvironment();
+    EXPECT_THAT(scratch.read("log"), MatchesRegex("before\n.* doWork: text\n"));
+}
+
+/// Runs `body` in a child of this process; its exit status.
+template <typename Body>
+int inChild(Body body) {
+    const pid_t child = ::fork();
+    if (child == 0) {
+        body();
+        ::_exit(0);
+    }
+    int status = 0;
+    EXPECT_EQ(child, ::waitpid(child, &status, 0));
+    return status;
+}
+
+TEST(Log, NeverTakesTheNumberOfAStandardStream) {
+    const ScratchDir scratch;
+    const int status = inChild([&] {
+        ::close(0);
+        ::close(1);
+        ::close(2);
+        ras1::configure("ALL", scratch.path("log"));
+        RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "written");
+        ::_exit(::fcntl(0, F_GETFD) == -1 && ::fcntl(1, F_GETFD) == -1 && ::fcntl(2, F_GETFD) == -1
+                    ? 0
+                    : 1);
+    });
+    EXPECT_EQ(0, status);
+    EXPECT_THAT(scratch.read("log"), MatchesRegex(".* doWork: written\n"));
+}
+
+TEST(Log, IsNotInheritedByPrograms) {
+    const ScratchDir scratch;
+    ras1::configure("ALL", scratch.path("log"));
+    const std::string listing = scratch.script("list", "ls -l /proc/self/fd > \"$1\"");
+    const std::string out = scratch.path("out");
+    EXPECT_EQ(0, inChild([&] {
+                  ::execl(listing.c_str(), listing.c_str(), out.c_str(), nullptr);
+                  ::_exit(1);
+              }));
+    ras1::configureFromEnvironment();
+    EXPECT_EQ(std::string::npos, scratch.read("out").find(scratch.path("log")));
+}
+
+TEST(Log, APipeWithoutAReaderCostsTheProcessNothing) {
+    const ScratchDir scratch;
+    const std::string fifo = scratch.path("fifo");
+    ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
+    const int status = inChild([&] {
+        ::signal(SIGPIPE, SIG_DFL);
+        const int reader = ::open(fifo.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        ras1::configure("ALL", fifo);
+        ::close(reader);
+        RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "nobody reads this");
+        sigset_t left;
+        ::sigpending(&left);
+        ::_exit(::sigismember(&left, SIGPIPE));
+    });
+    EXPECT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(0, WEXITSTATUS(status));
+}
+
+}  // namespace

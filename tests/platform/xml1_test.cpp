@@ -1,0 +1,264 @@
+#include "platform/xml1.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <clocale>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+#include <vector>
+
+namespace {
+
+using testing::ElementsAre;
+
+/// Chooses the code page of the process's locale for one test.
+class Locale {
+public:
+    explicit Locale(const char* name) {
+        ::setenv("LC_ALL", name, 1);
+        EXPECT_NE(nullptr, std::setlocale(LC_ALL, name));
+    }
+    ~Locale() {
+        ::unsetenv("LC_ALL");
+        std::setlocale(LC_ALL, "C");
+    }
+    Locale(const Locale&) = delete;
+    Locale& operator=(const Locale&) = delete;
+};
+
+constexpr const char* kUtf8 = "C.UTF-8";
+constexpr const char* kLatin1 = "C";  // bytes above 127 are taken as ISO 8859-1
+
+/// A parser whose events are written down: "<name k=v", "text", ">name".
+class Recorder {
+public:
+    explicit Recorder(const char* encoding = nullptr) : parser_(XML1_ParserCreate(encoding)) {
+        XML1_SetElementHandler(parser_, onStart, onEnd);
+        XML1_SetCharacterDataHandler(parser_, onData);
+        XML1_SetUserData(parser_, this);
+    }
+    ~Recorder() { XML1_ParserFree(parser_); }
+    Recorder(const Recorder&) = delete;
+    Recorder& operator=(const Recorder&) = delete;
+
+    int push(const std::string& piece, bool isFinal) {
+        const int length = static_cast<int>(piece.size());
+        void* const buffer = XML1_GetBuffer(parser_, length);
+        if (length > 0) std::memcpy(buffer, piece.data(), piece.size());
+        return XML1_ParseBuffer(parser_, length, isFinal ? 1 : 0);
+    }
+    int pushInPieces(const std::string& text, std::size_t size) {
+        for (std::size_t at = 0; at < text.size(); at += size) {
+            if (push(text.substr(at, size), false) != 1) return 0;
+        }
+        return push("", true);
+    }
+    XML1_PARSER* parser() { return parser_; }
+
+    std::vector<std::string> events;
+
+private:
+    static void onStart(void* self, const char* name, const char** attributes) {
+        std::string event = std::string("<") + name;
+        for (; *attributes != nullptr; attributes += 2) {
+            event += std::string(" ") + attributes[0] + "=" + attributes[1];
+        }
+        static_cast<Recorder*>(self)->events.push_back(event);
+    }
+    static void onEnd(void* self, const char* name) {
+        static_cast<Recorder*>(self)->events.push_back(std::string(">") + name);
+    }
+    /// Neighbouring pieces of text are joined: where they are split is the parser's affair.
+    static void onData(void* self, const char* text, int length) {
+        std::vector<std::string>& events = static_cast<Recorder*>(self)->events;
+        const std::string piece(text, static_cast<std::size_t>(length));
+        const bool joins = !events.empty() && events.back()[0] == '"';
+        if (joins) events.back() += piece;
+        if (!joins) events.push_back('"' + piece);
+    }
+
+    XML1_PARSER* const parser_;
+};
+
+std::vector<std::string> eventsOf(const std::string& document) {
+    Recorder recorder;
+    EXPECT_EQ(1, recorder.push(document, true)) << document;
+    return recorder.events;
+}
+
+TEST(Xml, ElementsAttributesAndTextArriveInOrder) {
+    const Locale locale(kUtf8);
+    EXPECT_THAT(eventsOf("<a x='1' y='2'>t<b>u</b>v &lt; w<c/></a>"),
+                ElementsAre("<a x=1 y=2", "\"t", "<b", "\"u", ">b", "\"v < w", "<c", ">c", ">a"));
+}
+
+TEST(Xml, EveryWayToCutADocumentGivesTheSameEvents) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        for (const std::string head :
+             {"", "<?xml version='1.0' encoding='UTF-8'?>", "\xEF\xBB\xBF"}) {
+            const std::string document = head + "<a k='\xC3\xA4'>t\xC3\xB6<b/></a>";
+            const std::vector<std::string> whole = eventsOf(document);
+            for (std::size_t size = 1; size <= document.size(); ++size) {
+                Recorder recorder;
+                EXPECT_EQ(1, recorder.pushInPieces(document, size)) << document << size;
+                EXPECT_EQ(whole, recorder.events) << document << size;
+            }
+        }
+    }
+}
+
+TEST(Xml, HandlersMayBeMissing) {
+    const Locale locale(kLatin1);
+    Recorder recorder;
+    XML1_SetElementHandler(recorder.parser(), nullptr, nullptr);
+    XML1_SetCharacterDataHandler(recorder.parser(), nullptr);
+    EXPECT_EQ(1, recorder.push("<a>t</a>", true));
+    EXPECT_TRUE(recorder.events.empty());
+}
+
+TEST(Xml, TextsAreHandedOverAsUtf8WhereThatIsTheCodePage) {
+    const Locale locale(kUtf8);
+    EXPECT_THAT(eventsOf("<a>\xE2\x82\xAC</a>"), ElementsAre("<a", "\"\xE2\x82\xAC", ">a"));
+    EXPECT_THAT(eventsOf("<?xml version='1.0' encoding='ISO-8859-1'?><a>\xE4</a>"),
+                ElementsAre("<a", "\"\xC3\xA4", ">a"));
+}
+
+TEST(Xml, TextsAreHandedOverInAnotherCodePageWhereThatIsTheLocales) {
+    const Locale locale(kLatin1);
+    EXPECT_THAT(eventsOf("<?xml version='1.0' encoding='UTF-8'?>"
+                         "<\xC3\xA4 \xC3\xB6='\xC3\xBC'>\xC3\x9F</\xC3\xA4>"),
+                ElementsAre("<\xE4 \xF6=\xFC", "\"\xDF", ">\xE4"));
+}
+
+TEST(Xml, WhatTheCodePageLacksBecomesAQuestionMark) {
+    const Locale locale(kLatin1);
+    EXPECT_THAT(
+        eventsOf("<?xml version='1.0' encoding='UTF-8'?><a>1\xE2\x82\xAC 2\xF0\x9F\x98\x80</a>"),
+        ElementsAre("<a", "\"1? 2?", ">a"));
+}
+
+TEST(Xml, ADocumentThatSaysNoEncodingIsInTheLocalCodePage) {
+    const Locale locale(kLatin1);
+    EXPECT_THAT(eventsOf("<a k='\xE4'>\xFC\xDF\x80</a>"),
+                ElementsAre("<a k=\xE4", "\"\xFC\xDF\x80", ">a"));
+}
+
+TEST(Xml, ADeclarationOrAMarkSaysTheEncodingEverywhere) {
+    const Locale locale(kLatin1);
+    EXPECT_THAT(eventsOf("<?xml version='1.0'?><a>\xC3\xA4</a>"),
+                ElementsAre("<a", "\"\xE4", ">a"));
+    EXPECT_THAT(eventsOf("\xEF\xBB\xBF<a>\xC3\xA4</a>"), ElementsAre("<a", "\"\xE4", ">a"));
+    const std::string wide("\xFF\xFE<\0a\0>\0\xE4\0<\0/\0a\0>\0", 18);
+    EXPECT_THAT(eventsOf(wide), ElementsAre("<a", "\"\xE4", ">a"));
+}
+
+TEST(Xml, ADocumentCutOffInItsFirstBytesIsAnError) {
+    const Locale locale(kLatin1);
+    for (const std::string start : {"", "<", "<?x", "<?xml", "\xEF\xBB"}) {
+        Recorder recorder;
+        EXPECT_EQ(0, recorder.push(start, true)) << start;
+        EXPECT_NE(0, XML1_GetErrorCode(recorder.parser())) << start;
+    }
+}
+
+TEST(Xml, EncodingsOfTheCLibraryAreUnderstood) {
+    const Locale locale(kUtf8);
+    EXPECT_THAT(eventsOf("<?xml version='1.0' encoding='windows-1252'?><a>\x80</a>"),
+                ElementsAre("<a", "\"\xE2\x82\xAC", ">a"));
+    EXPECT_THAT(eventsOf("<?xml version='1.0' encoding='Shift_JIS'?><a>\x93\xFA\xB1</a>"),
+                ElementsAre("<a", "\"\xE6\x97\xA5\xEF\xBD\xB1", ">a"));
+    EXPECT_THAT(eventsOf("<?xml version='1.0' encoding='EUC-JP'?><a>\xC6\xFC\x8F\xB0\xA1</a>"),
+                ElementsAre("<a", "\"\xE6\x97\xA5\xE4\xB8\x82", ">a"));
+}
+
+TEST(Xml, ACharacterOfSeveralBytesMayBeCutBetweenPieces) {
+    const Locale locale(kUtf8);
+    Recorder recorder;
+    const std::string document =
+        "<?xml version='1.0' encoding='EUC-JP'?><a>\xC6\xFC\x8F\xB0\xA1</a>";
+    EXPECT_EQ(1, recorder.pushInPieces(document, 1));
+    EXPECT_THAT(recorder.events, ElementsAre("<a", "\"\xE6\x97\xA5\xE4\xB8\x82", ">a"));
+}
+
+TEST(Xml, AnUnknownEncodingIsAnError) {
+    const Locale locale(kUtf8);
+    Recorder recorder;
+    EXPECT_EQ(0, recorder.push("<?xml version='1.0' encoding='no-such-code'?><a/>", true));
+    EXPECT_STREQ("unknown encoding", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+}
+
+TEST(Xml, TheCallersEncodingOverridesTheDocuments) {
+    const Locale locale(kLatin1);
+    Recorder recorder("UTF-8");
+    EXPECT_EQ(1, recorder.push("<a>\xC3\xA4</a>", true));
+    EXPECT_THAT(recorder.events, ElementsAre("<a", "\"\xE4", ">a"));
+}
+
+TEST(Xml, AnErrorHasACodeATextAndAPlace) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        Recorder recorder;
+        EXPECT_EQ(0, recorder.push("<a>\n  <b></a>", true));
+        EXPECT_STREQ("mismatched tag", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        EXPECT_EQ(2, XML1_GetCurrentLineNumber(recorder.parser()));
+        EXPECT_EQ(7, XML1_GetCurrentColumnNumber(recorder.parser()));
+    }
+}
+
+TEST(Xml, CodesWithoutATextHaveNone) {
+    EXPECT_EQ(nullptr, XML1_ErrorString(0));
+    EXPECT_EQ(nullptr, XML1_ErrorString(-1));
+    EXPECT_EQ(nullptr, XML1_ErrorString(100000));
+}
+
+TEST(Xml, AnEmptyDocumentIsAnError) {
+    const Locale locale(kUtf8);
+    Recorder recorder;
+    EXPECT_EQ(0, recorder.push("", true));
+    EXPECT_STREQ("no element found", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+}
+
+TEST(Xml, MoreThanTheBufferHoldsIsRefused) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        Recorder recorder;
+        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), 5, 1));
+        EXPECT_NE(0, XML1_GetErrorCode(recorder.parser()));
+        EXPECT_EQ(nullptr, XML1_GetBuffer(recorder.parser(), -1));
+        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), -1, 1));
+    }
+}
+
+TEST(Xml, ExpandingEntitiesIsBounded) {
+    const Locale locale(kUtf8);
+    std::string document = "<!DOCTYPE a [<!ENTITY e0 'xxxxxxxxxxxxxxxx'>";
+    for (int i = 1; i <= 12; ++i) {
+        document += "<!ENTITY e" + std::to_string(i) + " '";
+        for (int n = 0; n < 10; ++n)
+            document += "&e" + std::to_string(i - 1) + ";";
+        document += "'>";
+    }
+    Recorder recorder;
+    EXPECT_EQ(0, recorder.push(document + "]><a>&e12;</a>", true));
+    EXPECT_THAT(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())),
+                testing::HasSubstr("amplification"));
+}
+
+TEST(Xml, ThousandsOfAttributesArriveInAnotherCodePage) {
+    const Locale locale(kLatin1);
+    std::string document = "<a";
+    for (int i = 0; i < 5000; ++i)
+        document += " k" + std::to_string(i) + "='\xE4'";
+    const std::vector<std::string> events = eventsOf(document + "/>");
+    ASSERT_EQ(2U, events.size());
+    EXPECT_THAT(events[0], testing::EndsWith(" k4999=\xE4"));
+}
+
+TEST(Xml, NoParserIsFreedQuietly) {
+    XML1_ParserFree(nullptr);
+}
+
+}  // namespace

@@ -1,0 +1,376 @@
+// Start-up of the task manager, the queue and the thread that works it off.
+// ctest-label: threaded
+#include <gtest/gtest.h>
+#include <pthread.h>
+
+#include <atomic>
+#include <chrono>
+#include <csignal>
+#include <cstdlib>
+#include <filesystem>
+#include <stdexcept>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "support/fake_sleep.h"
+#include "support/gate.h"
+#include "support/outcomes.h"
+#include "support/row_text.h"
+#include "support/trace_capture.h"
+#include "tasks/fake_handlers.h"
+#include "tasks/zavtasks.h"
+#include "util/zavutil.h"
+
+using fake_handlers::narrow;
+using ZAV::String;
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+std::size_t threadCount() {
+    const std::filesystem::directory_iterator threads("/proc/self/task");
+    return static_cast<std::size_t>(std::distance(begin(threads), end(threads)));
+}
+
+std::string newScratchDepot() {
+    static ScratchDir& scratch = *new ScratchDir;  // the executor may outlive main
+    return scratch.makeDir("depot");
+}
+
+class Executor : public testing::Test {
+protected:
+    Executor() { fake_handlers::reset(); }
+    ~Executor() override { fake_handlers::reset(); }
+
+    static void start() {
+        ::setenv("QVSDEPLOY_AGENTDEPOT", newScratchDepot().c_str(), 1);
+        zav_taskmgr_init();
+    }
+
+    static TaskQueueElem request(const char* command, const std::string& transid) {
+        return TaskQueueElem("node", transid.c_str(), command, "ux", "ctx", "INSTANCE", "", "",
+                             "0620", "inst1");
+    }
+
+    static std::size_t queueLength() {
+        pthread_mutex_lock(&queue_mutex);
+        const std::size_t length = taskQueue.size();
+        pthread_mutex_unlock(&queue_mutex);
+        return length;
+    }
+
+    static Texts transids(const std::vector<zav_kagdyst_data_t>& rows) {
+        Texts found;
+        for (const zav_kagdyst_data_t& row : rows)
+            found.push_back(trimmedField(row.transid));
+        return found;
+    }
+};
+
+// ---- Start-up
+// ------------------------------------------------------------------------------------
+
+TEST_F(Executor, IsNotStartedWithoutADepot) {
+    if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
+    ::unsetenv("QVSDEPLOY_AGENTDEPOT");
+    ::unsetenv("TOVRINHOME");
+    const std::size_t threads = threadCount();
+    TraceCapture trace;
+    zav_taskmgr_init();
+    EXPECT_EQ((Texts{"ZAV1010E No Agent Depot directory set"}), trace.errors("zavtasks"));
+    EXPECT_FALSE(initialized);
+    EXPECT_TRUE(commands.empty());
+    EXPECT_EQ(threads, threadCount());
+
+    TaskQueueElem task = request("START", "tx");
+    EXPECT_EQ(TASK_NOT_SUPPORTED, runTask(task));
+    EXPECT_TRUE(taskQueue.empty());
+}
+
+TEST_F(Executor, IsStartedOnce) {
+    if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
+    const std::size_t threads = threadCount();
+    TraceCapture trace;
+    start();
+    EXPECT_EQ((Texts{"Command vector being initialized"}), trace.errors("zavtasks"));
+    EXPECT_TRUE(initialized);
+    EXPECT_EQ(newScratchDepot() + "/", narrow(depotDir));
+    Texts names;
+    for (const String& command : commands)
+        names.push_back(narrow(command));
+    EXPECT_EQ((Texts{"START", "STOP", "RESTART", "INSTALL", "UNINSTALL", "GETCONFIG", "SETCONFIG",
+                     "COMPLETE_INSTALL", "REMOVEINSTANCE"}),
+              names);
+    EXPECT_EQ(threads + 1, threadCount());
+
+    zav_taskmgr_init();
+    EXPECT_EQ(9u, commands.size());
+    EXPECT_EQ(threads + 1, threadCount());
+    EXPECT_EQ(1u, trace.errors("zavtasks").size());
+}
+
+// ---- Running tasks
+// -------------------------------------------------------------------------------
+
+TEST_F(Executor, AnAcceptedInstallIsAnsweredAtOnceAndReportedLater) {
+    start();
+    Outcomes outcomes;
+    Gate gate;
+    fake_handlers::behave([&gate](const std::string&, TaskQueueElem&) {
+        gate.pass();
+        return TASK_OK;
+    });
+    TaskQueueElem task = request("INSTALL", "tx-1");
+    EXPECT_EQ(0, runTask(task));
+    EXPECT_EQ(0, task.getReturnResults().retval);
+    EXPECT_EQ(padded("", 16), fieldText(task.getReturnResults().retmsgid));
+    ASSERT_TRUE(gate.awaitArrival());
+    EXPECT_TRUE(outcomes.rows().empty());
+    gate.open();
+    const auto rows = outcomes.waitFor(1);
+    ASSERT_EQ(1u, rows.size());
+    EXPECT_EQ("INSTALL", trimmedField(rows[0].command));
+    EXPECT_EQ(0, rows[0].retval);
+}
+
+TEST_F(Executor, AFailureYieldsOneRowWithTheRequestsIdentity) {
+    start();
+    Outcomes outcomes;
+    fake_handlers::behave([](const std::string&, TaskQueueElem& task) {
+        task.setRetmsgid("ZAV1024E");
+        task.setRetmsgparm("the command line");
+        return TASK_START_STOP_FAILED;
+    });
+    queueTask(request("START", "tx-1"));
+    ASSERT_EQ(1u, outcomes.waitFor(1).size());
+    fake_handlers::reset();
+    queueTask(request("START", "tx-2"));
+    const auto rows = outcomes.waitFor(2);
+    EXPECT_EQ((Texts{"tx-1", "tx-2"}), transids(rows));
+    EXPECT_EQ("inst1", trimmedField(rows[0].targetmsn));
+    EXPECT_EQ("node", trimmedField(rows[0].originnode));
+    EXPECT_EQ(1024, rows[0].retval);
+    EXPECT_EQ("ZAV1024E", trimmedField(rows[0].retmsgid));
+    EXPECT_EQ("the command line", trimmedField(rows[0].retmsgparm));
+    EXPECT_EQ(0, rows[1].retval);
+    EXPECT_EQ("", trimmedField(rows[1].retmsgid));
+}
+
+TEST_F(Executor, RunsTasksOneAtATimeInTheirOrder) {
+    start();
+    Outcomes outcomes;
+    std::atomic<int> running{0};
+    std::atomic<int> most{0};
+    fake_handlers::behave([&](const std::string&, TaskQueueElem&) {
+        const int now = ++running;
+        if (now > most) most = now;
+        std::this_thread::yield();
+        --running;
+        return TASK_OK;
+    });
+    Texts expected;
+    for (int i = 0; i < 50; ++i) {
+        expected.push_back("tx-" + std::to_string(i));
+        TaskQueueElem task = request(i % 2 == 0 ? "START" : "UNINSTALL", expected.back());
+        ASSERT_EQ(0, runTask(task));
+    }
+    EXPECT_EQ(expected, transids(outcomes.waitFor(expected.size())));
+    EXPECT_EQ(1, most);
+}
+
+TEST_F(Executor, TakesRequestsFromManyThreads) {
+    start();
+    Outcomes outcomes;
+    std::vector<std::thread> requesters;
+    for (int i = 0; i < 4; ++i) {
+        requesters.emplace_back([i] {
+            for (int n = 0; n < 25; ++n) {
+                TaskQueueElem task = request("STOP", std::to_string(i));
+                EXPECT_EQ(0, runTask(task));
+            }
+        });
+    }
+    for (std::thread& requester : requesters)
+        requester.join();
+    EXPECT_EQ(100u, outcomes.waitFor(100).size());
+}
+
+TEST_F(Executor, SleepsASecondForEachOutcome) {
+    start();
+    Outcomes outcomes;
+    fake_sleep::reset();
+    for (const char* transid : {"1", "2", "3"})
+        queueTask(request("START", transid));
+    ASSERT_EQ(3u, outcomes.waitFor(3).size());
+    EXPECT_EQ((std::vector<unsigned>{1, 1, 1}), fake_sleep::slept());
+}
+
+TEST_F(Executor, TracesHowMuchIsQueued) {
+    start();
+    Outcomes outcomes;
+    Gate gate;
+    fake_handlers::behave([&gate](const std::string&, TaskQueueElem&) {
+        gate.pass();
+        return TASK_OK;
+    });
+    queueTask(request("START", "0"));
+    ASSERT_TRUE(gate.awaitArrival());
+    for (const char* transid : {"1", "2", "3"})
+        queueTask(request("START", transid));
+    EXPECT_EQ(3u, queueLength());
+    TraceCapture trace;
+    gate.open();
+    ASSERT_EQ(4u, outcomes.waitFor(4).size());
+    Texts lines;
+    for (const std::string& line : trace.details("zavtasks")) {
+        if (line.compare(0, 8, "Executor") == 0) lines.push_back(line);
+    }
+    EXPECT_EQ((Texts{"Executor has 3 items on queue", "Executor has 2 items on queue",
+                     "Executor has 1 items on queue"}),
+              lines);
+}
+
+TEST_F(Executor, SurvivesWakeUpsForNothing) {
+    start();
+    Outcomes outcomes;
+    queueTask(request("START", "0"));
+    ASSERT_EQ(1u, outcomes.waitFor(1).size());
+    TraceCapture trace;
+    for (int i = 0; i < 1000 && trace.count('D', "Executor awoken by signal") < 3; ++i) {
+        pthread_cond_broadcast(&worktodo);
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    EXPECT_LE(3, trace.count('D', "Executor awoken by signal"));
+    queueTask(request("START", "1"));
+    EXPECT_EQ((Texts{"0", "1"}), transids(outcomes.waitFor(2)));
+}
+
+TEST_F(Executor, QuickCommandsDoNotWaitForIt) {
+    start();
+    Outcomes outcomes;
+    Gate gate;
+    fake_handlers::behave([&gate](const std::string& handler, TaskQueueElem&) {
+        if (handler == "install") gate.pass();
+        return TASK_OK;
+    });
+    queueTask(request("INSTALL", "slow"));
+    ASSERT_TRUE(gate.awaitArrival());
+    TaskQueueElem quick = request("GETCONFIG", "quick");
+    EXPECT_EQ(0, runTask(quick));
+    EXPECT_TRUE(outcomes.rows().empty());
+    gate.open();
+    EXPECT_EQ((Texts{"slow"}), transids(outcomes.waitFor(1)));
+}
+
+TEST_F(Executor, SurvivesHandlersThatThrow) {
+    start();
+    Outcomes outcomes;
+    fake_handlers::behave([](const std::string& handler, TaskQueueElem&) -> TASK_RC {
+        if (handler == "install") throw std::runtime_error("broken");
+        if (handler == "uninstall") throw 42;
+        return TASK_OK;
+    });
+    TraceCapture trace;
+    queueTask(request("INSTALL", "1"));
+    queueTask(request("UNINSTALL", "2"));
+    queueTask(request("START", "3"));
+    const auto rows = outcomes.waitFor(3);
+    ASSERT_EQ((Texts{"1", "2", "3"}), transids(rows));
+    EXPECT_EQ(1030, rows[0].retval);
+    EXPECT_EQ("ZAV1030E", trimmedField(rows[0].retmsgid));
+    EXPECT_EQ("INSTALL", trimmedField(rows[0].retmsgparm));
+    EXPECT_EQ(1033, rows[1].retval);
+    EXPECT_EQ("UNINSTALL", trimmedField(rows[1].retmsgparm));
+    EXPECT_EQ(0, rows[2].retval);
+    EXPECT_EQ(2u, trace.errors("zavtasks").size());
+}
+
+TEST_F(Executor, SubscribersGetTheRowsOfTheirTransactionOnly) {
+    start();
+    Outcomes mine({{"TRANSID", OPER_EQ, "x"}});
+    Outcomes all;
+    for (const char* transid : {"a", "x", "b", "x", "xx"})
+        queueTask(request("START", transid));
+    ASSERT_EQ(5u, all.waitFor(5).size());
+    EXPECT_EQ((Texts{"x", "x"}), transids(mine.waitFor(2)));
+}
+
+TEST_F(Executor, AnOutcomeWithoutSubscribersIsLost) {
+    start();
+    Gate gate;
+    fake_handlers::behave([&gate](const std::string&, TaskQueueElem& task) {
+        if (narrow(task.getTransid()) == "second") gate.pass();
+        return TASK_OK;
+    });
+    TraceCapture trace;
+    queueTask(request("START", "first"));
+    queueTask(request("START", "second"));
+    ASSERT_TRUE(gate.awaitArrival());  // so the first one's outcome is out
+    Outcomes outcomes;
+    gate.open();
+    EXPECT_EQ((Texts{"second"}), transids(outcomes.waitFor(1)));
+    EXPECT_TRUE(trace.errors().empty());
+}
+
+// ---- Manners
+// -------------------------------------------------------------------------------------
+
+TEST_F(Executor, LeavesSignalsToTheHost) {
+    sigset_t before;
+    pthread_sigmask(SIG_SETMASK, nullptr, &before);
+    start();
+    sigset_t after;
+    pthread_sigmask(SIG_SETMASK, nullptr, &after);
+    sigset_t inside;
+    sigemptyset(&inside);
+    fake_handlers::behave([&inside](const std::string&, TaskQueueElem&) {
+        pthread_sigmask(SIG_SETMASK, nullptr, &inside);
+        return TASK_OK;
+    });
+    Outcomes outcomes;
+    queueTask(request("START", "1"));
+    ASSERT_EQ(1u, outcomes.waitFor(1).size());
+    for (const int signal : {SIGTERM, SIGINT, SIGHUP, SIGCHLD, SIGPIPE, SIGALRM, SIGUSR1}) {
+        EXPECT_EQ(1, sigismember(&inside, signal)) << signal;
+        EXPECT_EQ(sigismember(&before, signal), sigismember(&after, signal)) << signal;
+    }
+    for (const int fault : {SIGSEGV, SIGBUS, SIGFPE, SIGILL, SIGABRT}) {
+        EXPECT_EQ(0, sigismember(&inside, fault)) << fault;
+    }
+}
+
+TEST_F(Executor, ManyTasksMayWait) {
+    start();
+    Outcomes outcomes;
+    Gate gate;
+    fake_handlers::behave([&gate](const std::string& handler, TaskQueueElem&) {
+        if (handler == "install") gate.pass();
+        return TASK_OK;
+    });
+    queueTask(request("INSTALL", "first"));
+    ASSERT_TRUE(gate.awaitArrival());
+    constexpr std::size_t count = 10000;
+    const auto begin = std::chrono::steady_clock::now();
+    for (std::size_t i = 0; i < count; ++i)
+        queueTask(request("START", std::to_string(i)));
+    EXPECT_GT(std::chrono::seconds(20), std::chrono::steady_clock::now() - begin);
+    EXPECT_EQ(count, queueLength());
+    gate.open();
+    EXPECT_EQ(std::to_string(count - 1), transids(outcomes.waitFor(count + 1)).back());
+}
+
+TEST_F(Executor, MayBeBusyWhileTheProcessEnds) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_EXIT(
+        {
+            start();
+            for (int i = 0; i < 500; ++i)
+                queueTask(request("START", "tx"));
+            std::exit(0);
+        },
+        testing::ExitedWithCode(0), "");
+}
+
+}  // namespace

@@ -1,0 +1,90 @@
+#include "tasks/translator.h"
+
+#include "support/trace_capture.h"
+#include "tasks/task_home.h"
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using ZAV::String;
+
+namespace {
+
+class Translator : public testing::Test {
+protected:
+    std::string replaced(const std::string& text, const char* product = "ux",
+                         const char* version = "060100000") {
+        return narrow(replaceTokens(text.c_str(), product, version));
+    }
+
+    TaskHome home_;
+    TraceCapture trace_{"ERROR (UNIT:zavtasks ALL)"};
+};
+
+TEST_F(Translator, LiesInTheSharedComponentsDirectory) {
+    const std::string expected = home_.translator("true");
+    String path;
+    EXPECT_TRUE(getTwoWayTranslator(path));
+    EXPECT_EQ(expected, narrow(path));
+    EXPECT_EQ(1, trace_.count('D', "Using default two-way translator [" + expected + "]"));
+    EXPECT_THAT(home_.calls(TaskHome::kTranslator), IsEmpty());
+}
+
+TEST_F(Translator, IsLookedForInTheRootWithoutASharedComponent) {
+    String path("before");
+    EXPECT_FALSE(getTwoWayTranslator(path));
+    EXPECT_TRUE(path == "");
+    EXPECT_EQ(1, trace_.count('E',
+                              "No two-way translator found, default translator [/zav_xa] does "
+                              "not exist"));
+}
+
+TEST_F(Translator, MayBeMissingFromTheSharedComponent) {
+    const std::string expected = home_.translator("true");
+    std::filesystem::remove(expected);
+    String path("before");
+    EXPECT_FALSE(getTwoWayTranslator(path));
+    EXPECT_TRUE(path == "");
+    EXPECT_EQ(1, trace_.count('E', "No two-way translator found, default translator [" + expected +
+                                       "] does not exist"));
+}
+
+TEST_F(Translator, TextsWithoutTokensStayAsTheyAre) {
+    for (const char* text :
+         {"", "./install.sh -q", "|", "||", "|OTHER|", "|depotdir|", "|DEPOTDIR"}) {
+        EXPECT_EQ(text, replaced(text));
+    }
+    EXPECT_EQ(1, trace_.count('D', "Received String is [|OTHER|]"));
+    EXPECT_EQ(1, trace_.count('D', "Resolved String is [|OTHER|]"));
+    EXPECT_THAT(trace_.errors(), IsEmpty());
+}
+
+TEST_F(Translator, TokensBecomeDirectories) {
+    EXPECT_EQ(home_.depot() + "ux/060100000", replaced("|DEPLOYDIR|"));
+    EXPECT_EQ(home_.home(), replaced("|TOVRINHOME|"));
+    EXPECT_EQ(home_.depot(), replaced("|DEPOTDIR|"));
+}
+
+TEST_F(Translator, EveryTokenIsReplaced) {
+    EXPECT_EQ(home_.depot() + "ux/060100000/i.sh -h " + home_.home() + " -d " + home_.depot() +
+                  " " + home_.home() + home_.home(),
+              replaced("|DEPLOYDIR|/i.sh -h |TOVRINHOME| -d |DEPOTDIR| |TOVRINHOME||TOVRINHOME|"));
+}
+
+TEST_F(Translator, TheCommonInstallerHasNoVersion) {
+    EXPECT_EQ(home_.depot() + "ci", replaced("|DEPLOYDIR|", "ci"));
+    EXPECT_EQ(home_.depot() + "CI/060100000", replaced("|DEPLOYDIR|", "CI"));
+    EXPECT_EQ(home_.depot() + "ux/", replaced("|DEPLOYDIR|", "ux", ""));
+}
+
+TEST_F(Translator, WhatIsPutInIsSearchedForTheLaterTokens) {
+    depotDir = "/depot/|TOVRINHOME|/";
+    EXPECT_EQ("/depot/" + home_.home() + "/ux/1", replaced("|DEPLOYDIR|", "ux", "1"));
+    EXPECT_EQ("/depot/|TOVRINHOME|/", replaced("|DEPOTDIR|"));
+}
+
+TEST_F(Translator, ProductsAndVersionsAreTakenAsTheyAre) {
+    EXPECT_EQ(home_.depot() + home_.depot() + "/" + home_.home(),
+              replaced("|DEPLOYDIR|", "|DEPOTDIR|", "|TOVRINHOME|"));
+}
+
+}  // namespace

@@ -1,0 +1,282 @@
+#include "tasks/whole_file.h"
+
+#include <dlfcn.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+
+#include "support/scratch_dir.h"
+#include "support/trace_capture.h"
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using ZAV::String;
+
+// The definitions in the program come before the C library's, so that streams can be made to fail.
+namespace {
+int reportedStreamError = 0;
+bool closingFails = false;
+
+template <typename Function>
+Function next(const char* name) {
+    return reinterpret_cast<Function>(::dlsym(RTLD_NEXT, name));
+}
+}  // namespace
+
+extern "C" int ferror(std::FILE* stream) noexcept {
+    if (reportedStreamError != 0) return reportedStreamError;
+    return next<int (*)(std::FILE*)>("ferror")(stream);
+}
+
+extern "C" int fclose(std::FILE* stream) {
+    const int result = next<int (*)(std::FILE*)>("fclose")(stream);
+    return closingFails ? EOF : result;
+}
+
+namespace {
+
+std::string narrow(const String& text) {
+    return std::string(static_cast<const char*>(text.c_str()));
+}
+
+class WholeFile : public testing::Test {
+protected:
+    ~WholeFile() override {
+        reportedStreamError = 0;
+        closingFails = false;
+    }
+
+    String path(const std::string& name) const { return scratch_.path(name).c_str(); }
+    String written(const std::string& name, const std::string& content) const {
+        return scratch_.write(name, content).c_str();
+    }
+
+    ScratchDir scratch_;
+    TraceCapture trace_{"ERROR (UNIT:zavtasks ALL)"};
+};
+
+std::string sampleText(std::size_t length) {
+    std::string text;
+    text.reserve(length);
+    while (text.size() < length)
+        text += static_cast<char>('a' + text.size() % 23);
+    return text;
+}
+
+TEST_F(WholeFile, ReadsTextsOfAnyLength) {
+    for (const unsigned length : {1u, 1023u, 1024u, 1025u, 2048u, 5000u}) {
+        const std::string text = sampleText(length);
+        EXPECT_EQ(text, narrow(readFile(written("f", text)))) << length;
+    }
+    EXPECT_THAT(trace_.errors(), IsEmpty());
+}
+
+TEST_F(WholeFile, ReadsLineEndsAsTheyAre) {
+    EXPECT_EQ("a\r\nb\n\nc", narrow(readFile(written("f", "a\r\nb\n\nc"))));
+}
+
+TEST_F(WholeFile, ReadsAndWritesMegabytes) {
+    const std::string text = sampleText(8 << 20);
+    const String read = readFile(written("f", text));
+    EXPECT_EQ(text, narrow(read));
+    EXPECT_EQ(1, writeFile(path("g"), read));
+    EXPECT_EQ(text, scratch_.read("g"));
+}
+
+TEST_F(WholeFile, MissingFilesAreEmpty) {
+    EXPECT_TRUE(readFile(path("none")) == "");
+    EXPECT_THAT(trace_.errors("zavtasks"),
+                ElementsAre("Failed to open file " + scratch_.path("none") +
+                            " using mode \"rb\", check permissions"));
+}
+
+TEST_F(WholeFile, EmptyFilesAreEmpty) {
+    EXPECT_TRUE(readFile(written("f", "")) == "");
+    EXPECT_THAT(trace_.errors(), IsEmpty());
+}
+
+TEST_F(WholeFile, DirectoriesAreEmpty) {
+    scratch_.makeDir("d");
+    EXPECT_TRUE(readFile(path("d")) == "");
+}
+
+TEST_F(WholeFile, NulBytesAreLeftOut) {
+    EXPECT_EQ("abc", narrow(readFile(written("f", std::string("a\0b\0c", 5)))));
+}
+
+TEST_F(WholeFile, AReadErrorDropsEverything) {
+    const String file = written("f", sampleText(3000));
+    reportedStreamError = 5;
+    const String text = readFile(file);
+    reportedStreamError = 0;
+    EXPECT_TRUE(text == "");
+    EXPECT_THAT(trace_.errors("zavtasks"),
+                ElementsAre("Error reading from file " + scratch_.path("f") + ", error is 5"));
+}
+
+TEST_F(WholeFile, AFailedCloseDoesNotMatterToAReader) {
+    const String file = written("f", "text");
+    closingFails = true;
+    const String text = readFile(file);
+    closingFails = false;
+    EXPECT_TRUE(text == "text");
+    EXPECT_THAT(trace_.errors("zavtasks"),
+                ElementsAre("Failed to close stream for file " + scratch_.path("f")));
+}
+
+TEST_F(WholeFile, WritesOverWhatWasThere) {
+    const String file = written("f", "a longer text than the new one");
+    EXPECT_EQ(1, writeFile(file, "new\n"));
+    EXPECT_EQ("new\n", scratch_.read("f"));
+    EXPECT_FALSE(scratch_.exists("f.tmp"));
+}
+
+TEST_F(WholeFile, AnEmptyTextMakesAnEmptyFile) {
+    EXPECT_EQ(1, writeFile(path("new"), ""));
+    EXPECT_EQ(1, writeFile(written("old", "text"), ""));
+    EXPECT_TRUE(scratch_.exists("new"));
+    EXPECT_EQ("", scratch_.read("new"));
+    EXPECT_EQ("", scratch_.read("old"));
+}
+
+TEST_F(WholeFile, WrittenFilesAreNotExecutable) {
+    EXPECT_EQ(1, writeFile(path("script.sh"), "#!/bin/sh\n"));
+    struct stat status {};
+    ASSERT_EQ(0, ::stat(scratch_.path("script.sh").c_str(), &status));
+    EXPECT_EQ(0u, status.st_mode & 0111u);
+}
+
+TEST_F(WholeFile, NothingIsWrittenWhereNoFileCanBe) {
+    scratch_.makeDir("d");
+    EXPECT_EQ(0, writeFile(path("none/f"), "text"));
+    EXPECT_EQ(0, writeFile(path("d"), "text"));
+    EXPECT_THAT(trace_.errors("zavtasks"),
+                ElementsAre("Failed to open file " + scratch_.path("none/f") +
+                                " using mode \"rb\", check permissions",
+                            "Failed to open file " + scratch_.path("d") +
+                                " using mode \"rb\", check permissions"));
+}
+
+TEST_F(WholeFile, AWriteErrorIsReported) {
+    const String file = path("f");
+    reportedStreamError = 5;
+    EXPECT_EQ(0, writeFile(file, "text"));
+    reportedStreamError = 0;
+    EXPECT_THAT(trace_.errors("zavtasks"),
+                ElementsAre("Error writing to file " + scratch_.path("f") +
+                            ", error code: Input/output error"));
+}
+
+TEST_F(WholeFile, AFailedCloseIsAFailureOfTheWriter) {
+    EXPECT_EQ(0, writeFile("/dev/full", "text"));
+    EXPECT_THAT(trace_.errors("zavtasks"),
+                ElementsAre("Failed to close stream for file /dev/full"));
+}
+
+TEST_F(WholeFile, AFileThatMayNotGrowIsReported) {
+    struct rlimit before {};
+    ASSERT_EQ(0, ::getrlimit(RLIMIT_FSIZE, &before));
+    auto* const handler = std::signal(SIGXFSZ, SIG_IGN);
+    const struct rlimit small { 8192, before.rlim_max };
+    ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &small));
+    const int result = writeFile(path("f"), sampleText(100000).c_str());
+    ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &before));
+    std::signal(SIGXFSZ, handler);
+    EXPECT_EQ(0, result);
+    EXPECT_EQ(8192u, std::filesystem::file_size(scratch_.path("f")));
+}
+
+TEST_F(WholeFile, CharactersOfSeveralBytesAreKeptWhole) {
+    ::setenv("LC_ALL", "C.UTF-8", 1);
+    ASSERT_TRUE(String::initialize());
+    // The two bytes of an umlaut lie on both sides of a block of 1024 bytes.
+    const std::string text = sampleText(1023) + "\xC3\xA4\xE2\x82\xAC\xF0\x9F\x98\x80 end\n";
+    const String read = readFile(written("f", text));
+    EXPECT_EQ(1023u + 2u + 2u + 5u, read.length());
+    EXPECT_EQ(1, writeFile(path("g"), read));
+    EXPECT_EQ(text, scratch_.read("g"));
+    ::unsetenv("LC_ALL");
+    String::initialize();
+}
+
+TEST_F(WholeFile, DeletesFiles) {
+    EXPECT_EQ(1, deleteFile(written("f", "text")));
+    EXPECT_FALSE(scratch_.exists("f"));
+    EXPECT_THAT(trace_.details("zavtasks"),
+                ElementsAre("Successfully deleted file " + scratch_.path("f")));
+    EXPECT_THAT(trace_.errors(), IsEmpty());
+}
+
+TEST_F(WholeFile, WhatCannotBeDeletedIsReported) {
+    scratch_.makeDir("d");
+    EXPECT_EQ(0, deleteFile(path("none")));
+    EXPECT_EQ(0, deleteFile(path("d")));
+    EXPECT_TRUE(scratch_.exists("d"));
+    EXPECT_THAT(
+        trace_.errors("zavtasks"),
+        ElementsAre("Failed to delete file " + scratch_.path("none") +
+                        " error was: No such file or directory",
+                    "Failed to delete file " + scratch_.path("d") + " error was: Is a directory"));
+}
+
+TEST_F(WholeFile, SplitsPaths) {
+    String directory("before");
+    EXPECT_EQ(1, getDirectoryFromPath("/a/b/file.txt", directory));
+    EXPECT_TRUE(directory == "/a/b");
+    EXPECT_TRUE(getFilenameFromPath("/a/b/file.txt") == "file.txt");
+    EXPECT_EQ(1, getDirectoryFromPath("a/b", directory));
+    EXPECT_TRUE(directory == "a");
+    EXPECT_TRUE(getFilenameFromPath("a/b") == "b");
+}
+
+TEST_F(WholeFile, APathThatEndsInASeparatorHasNoFileName) {
+    String directory;
+    EXPECT_EQ(1, getDirectoryFromPath("/a/b/", directory));
+    EXPECT_TRUE(directory == "/a/b");
+    EXPECT_TRUE(getFilenameFromPath("/a/b/") == "");
+}
+
+TEST_F(WholeFile, PathsWithoutADirectoryPartAreWholeFileNames) {
+    for (const char* path : {"/file.txt", "file.txt", "/", ""}) {
+        trace_.clear();
+        String directory("before");
+        EXPECT_EQ(0, getDirectoryFromPath(path, directory));
+        EXPECT_TRUE(directory == "before");
+        EXPECT_TRUE(getFilenameFromPath(path) == path);
+        EXPECT_THAT(trace_.errors("zavtasks"), ElementsAre("Directory [" + std::string(path) +
+                                                           "] cannot be parsed, no dir separator"));
+    }
+}
+
+std::string without(const char* text, char c) {
+    String s(text);
+    removeChar(s, c);
+    return narrow(s);
+}
+
+TEST(RemoveChar, RemovesEveryOccurrence) {
+    EXPECT_EQ("abc", without("'a'b''c'", '\''));
+}
+
+TEST(RemoveChar, LeavesOtherTextsAlone) {
+    EXPECT_EQ("abc", without("abc", '\''));
+    EXPECT_EQ("", without("", '\''));
+}
+
+TEST(RemoveChar, MayLeaveNothing) {
+    EXPECT_EQ("", without("'", '\''));
+    EXPECT_EQ("", without("''''", '\''));
+}
+
+TEST(RemoveChar, TakesBytesAsUnsigned) {
+    const unsigned short units[] = {'a', 0xE4, 'b', 0};
+    String s(units);
+    removeChar(s, '\xE4');
+    EXPECT_TRUE(s == "ab");
+}
+
+}  // namespace

@@ -1,0 +1,332 @@
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+#include <set>
+
+#include "support/child_role.h"
+#include "support/clock.h"
+#include "support/program.h"
+#include "support/scratch_dir.h"
+#include "support/trace_capture.h"
+#include "util/zavutil.h"
+
+using namespace ZAV;
+using testing::Contains;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::Not;
+using testing::StartsWith;
+
+namespace {
+
+struct Outcome {
+    bool ran = false;
+    int rc = -99;
+    String out = "untouched";
+    String err = "untouched";
+
+    std::string text() const { return static_cast<const char*>(out.c_str()); }
+    std::string errText() const { return static_cast<const char*>(err.c_str()); }
+};
+
+Outcome run(const std::string& command, const String& input = String(), bool nonBlocking = false) {
+    Outcome outcome;
+    outcome.ran = Util::runCommand(String(command.c_str()), outcome.rc, outcome.out, outcome.err,
+                                   input, nonBlocking);
+    return outcome;
+}
+
+class CommandRunner : public testing::Test {
+protected:
+    void TearDown() override {
+        ::unsetenv("TIMEOUT");
+        EXPECT_EQ(descriptors_, child_role::openDescriptors());
+        EXPECT_TRUE(::waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD);
+    }
+    void limit(const char* seconds) { ::setenv("TIMEOUT", seconds, 1); }
+
+private:
+    std::set<int> descriptors_ = child_role::openDescriptors();
+};
+
+/// Errors of a run that was killed; the ids of its process are left out.
+std::vector<std::string> withoutNumbers(std::vector<std::string> texts) {
+    for (std::string& text : texts) text.erase(text.find_last_not_of("0123456789-") + 1);
+    return texts;
+}
+
+const auto kKilled = ElementsAre("Terminating process group ", "Terminating process ",
+                                 "Failed to wait on process");
+
+}  // namespace
+
+TEST_F(CommandRunner, HandsBackOutputAndExitCode) {
+    TraceCapture traces;
+    const Outcome outcome = run("/bin/sh -c 'echo out; echo err >&2'");
+    EXPECT_TRUE(outcome.ran);
+    EXPECT_EQ(0, outcome.rc);
+    EXPECT_EQ("out\n", outcome.text());
+    EXPECT_EQ("err\n", outcome.errText());
+    EXPECT_THAT(traces.details("zavutil"),
+                ElementsAre("Command to run is \"/bin/sh -c 'echo out; echo err >&2'\"",
+                            "outbuf: out", "errbuf: err",
+                            "Return code (0) from command \"/bin/sh -c 'echo out; echo err >&2'\"",
+                            "STDOUT [4 characters] is: out", "STDERR [4 characters] is: err"));
+    EXPECT_THAT(traces.errors(), IsEmpty());
+}
+
+TEST_F(CommandRunner, ABadExitCodeIsNoFailureOfTheRun) {
+    TraceCapture traces;
+    const Outcome outcome = run("/bin/sh -c 'exit 3'");
+    EXPECT_TRUE(outcome.ran);
+    EXPECT_EQ(3, outcome.rc);
+    EXPECT_THAT(traces.errors("zavutil"),
+                ElementsAre("Bad return code (3) from command \"/bin/sh -c 'exit 3'\"",
+                            "STDOUT [0 characters] is: ", "STDERR [0 characters] is: "));
+    EXPECT_THAT(traces.details("zavutil"), ElementsAre("Command to run is \"/bin/sh -c 'exit 3'\""));
+}
+
+TEST_F(CommandRunner, ACommandThatCannotBeStartedChangesNothing) {
+    TraceCapture traces;
+    const Outcome outcome = run("/no/such/program x");
+    EXPECT_FALSE(outcome.ran);
+    EXPECT_EQ(-99, outcome.rc);
+    EXPECT_EQ("untouched", outcome.text());
+    EXPECT_EQ("untouched", outcome.errText());
+    EXPECT_THAT(traces.errors(),
+                ElementsAre("Unable to execute command: /no/such/program",
+                            "Failed to start process for cmd /no/such/program x"));
+}
+
+TEST_F(CommandRunner, ACommandThatCannotBeExecutedEndsWithZero) {
+    TraceCapture traces;
+    const ScratchDir scratch;
+    const Outcome outcome = run(scratch.path());
+    EXPECT_TRUE(outcome.ran);
+    EXPECT_EQ(0, outcome.rc);
+    EXPECT_EQ("", outcome.text());
+    EXPECT_EQ(1, traces.count('E', "Unable to launch the executable, rc=-1"));
+}
+
+TEST_F(CommandRunner, EnvironmentEntriesReachTheChild) {
+    char first[] = "ZAV_TEST_FIRST=1 and more";
+    char second[] = "ZAV_TEST_SECOND=2";
+    char* env[] = {first, second, nullptr};
+    Outcome outcome;
+    EXPECT_TRUE(Util::runCommandEnv("/bin/sh -c 'echo $ZAV_TEST_FIRST $ZAV_TEST_SECOND'", env,
+                                    outcome.rc, outcome.out, outcome.err, String(), false));
+    EXPECT_EQ("1 and more 2\n", outcome.text());
+    char* none[] = {nullptr};
+    EXPECT_TRUE(Util::runCommandEnv("/bin/echo x", none, outcome.rc, outcome.out, outcome.err,
+                                    String(), false));
+    EXPECT_EQ("x\n", outcome.text());
+}
+
+TEST_F(CommandRunner, AChildWithoutInputSeesTheEndAtOnce) {
+    const Outcome outcome = run("/bin/cat");
+    EXPECT_TRUE(outcome.ran);
+    EXPECT_EQ("", outcome.text());
+}
+
+TEST_F(CommandRunner, InputReachesTheChild) {
+    EXPECT_EQ("a line\nand another", run("/bin/cat", "a line\nand another").text());
+}
+
+TEST_F(CommandRunner, InputLargerThanThePipesPassesThroughAChildThatWritesAsItReads) {
+    limit("20");
+    std::string input;
+    while (input.size() < 1000 * 1000) input += std::to_string(input.size()) + "\n";
+    const Outcome outcome = run("/bin/cat", String(input.c_str()));
+    EXPECT_TRUE(outcome.ran);
+    EXPECT_TRUE(outcome.text() == input);
+}
+
+TEST_F(CommandRunner, AChildThatDoesNotReadItsInputIsNoFailure) {
+    limit("20");
+    const String input(std::string(300 * 1000, 'x').c_str());
+    for (int i = 0; i < 5; ++i) {
+        const Outcome outcome = run("/bin/sh -c 'exec <&-; echo done; exit 2'", input);
+        EXPECT_TRUE(outcome.ran);
+        EXPECT_EQ(2, outcome.rc);
+        EXPECT_EQ("done\n", outcome.text());
+    }
+}
+
+TEST_F(CommandRunner, AChildThatNeverTakesItsInputIsKilledAtTheTimeout) {
+    limit("1");
+    TraceCapture traces;
+    const Stopwatch watch;
+    const Outcome outcome =
+        run("/bin/sh -c 'echo early; exec sleep 60'", String(std::string(300 * 1000, 'x').c_str()));
+    EXPECT_FALSE(outcome.ran);
+    EXPECT_LT(watch.seconds(), 2.5);
+    EXPECT_EQ("early\n", outcome.text());
+    EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
+}
+
+TEST_F(CommandRunner, LargeOutputIsCollectedWhole) {
+    const Outcome outcome = run("/bin/sh -c 'seq 1 100000; seq 1 3000 >&2'");
+    std::string expected;
+    for (int i = 1; i <= 100000; ++i) expected += std::to_string(i) + "\n";
+    EXPECT_TRUE(outcome.text() == expected);
+    EXPECT_EQ(13893u, outcome.err.length());
+}
+
+TEST_F(CommandRunner, OutputIsTracedAndCollectedInChunks) {
+    TraceCapture traces("ERROR (UNIT:zavutil DETAIL)");
+    const ScratchDir scratch;
+    const Outcome outcome = run(scratch.script("write", "head -c 40000 /dev/zero | tr '\\0' x\n"));
+    EXPECT_EQ(40000u, outcome.out.length());
+    std::size_t traced = 0;
+    for (const std::string& line : traces.details("zavutil")) {
+        if (line.rfind("outbuf: ", 0) != 0) continue;
+        EXPECT_LE(line.size(), 8u + 16384u);
+        traced += line.size() - 8;
+    }
+    EXPECT_EQ(40000u, traced);
+}
+
+TEST_F(CommandRunner, AChunkIsATextUpToItsFirstZero) {
+    const ScratchDir scratch;
+    EXPECT_EQ("a", run(scratch.script("write", "printf 'a\\000b'\n")).text());
+}
+
+TEST_F(CommandRunner, EachChunkIsConvertedOnItsOwn) {
+    // A pause between the bytes of a character makes two chunks of it; neither is a character.
+    const ScratchDir scratch;
+    const Outcome outcome =
+        run(scratch.script("write", "printf 'a\\303'; sleep 0.3; printf '\\251b'\n"));
+    EXPECT_EQ(String("a\xc3") + String("\xa9" "b"), outcome.out);
+}
+
+TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
+    limit("1");
+    TraceCapture traces;
+    const Stopwatch watch;
+    const Outcome outcome = run("/bin/sh -c 'echo begun; echo bad >&2; exec sleep 60'");
+    EXPECT_FALSE(outcome.ran);
+    EXPECT_GT(watch.seconds(), 0.9);
+    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_EQ(0, outcome.rc);
+    EXPECT_EQ("begun\n", outcome.text());
+    EXPECT_EQ("", outcome.errText());
+    EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
+}
+
+TEST_F(CommandRunner, AChildThatClosedItsOutputIsWaitedForUntilTheSameDeadline) {
+    limit("2");
+    TraceCapture traces;
+    const Stopwatch watch;
+    EXPECT_FALSE(run("/bin/sh -c 'sleep 1; exec >&- 2>&-; exec sleep 60'").ran);
+    EXPECT_GT(watch.seconds(), 1.9);
+    EXPECT_LT(watch.seconds(), 2.9);
+    EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
+}
+
+TEST_F(CommandRunner, AnUnusableTimeoutLeavesNoTime) {
+    limit("abc");
+    const Stopwatch watch;
+    EXPECT_FALSE(run("/bin/sleep 60").ran);
+    EXPECT_LT(watch.seconds(), 0.8);
+}
+
+TEST_F(CommandRunner, OutputThatOthersKeepOpenEndsTheRunAtTheTimeout) {
+    limit("1");
+    TraceCapture traces;
+    const Stopwatch watch;
+    const Outcome outcome = run("/bin/sh -c 'sleep 4 & echo started'");
+    EXPECT_FALSE(outcome.ran);
+    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_EQ("started\n", outcome.text());
+    EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
+}
+
+TEST_F(CommandRunner, AChildThatNeverStopsWritingIsKilled) {
+    limit("1");
+    const Stopwatch watch;
+    EXPECT_FALSE(run("/bin/sh -c 'while :; do echo x; done'").ran);
+    EXPECT_LT(watch.seconds(), 3.0);
+}
+
+TEST_F(CommandRunner, AChildBlockedOnAFullErrorPipeIsKilled) {
+    limit("1");
+    const Stopwatch watch;
+    const Outcome outcome = run("/bin/sh -c 'echo out; head -c 200000 /dev/zero >&2'");
+    EXPECT_FALSE(outcome.ran);
+    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_EQ("out\n", outcome.text());
+}
+
+TEST_F(CommandRunner, ADateThatIsFarAwayIsFineAsATimeout) {
+    limit("2000000000");
+    EXPECT_EQ("x\n", run("/bin/echo x").text());
+}
+
+TEST_F(CommandRunner, AnAgentCommandIsReadOnceAfterItsEnd) {
+    const ScratchDir scratch;
+    const std::string script =
+        scratch.script("TovrinAgent", "head -c 30000 /dev/zero | tr '\\0' x\n"
+                                      "head -c 20000 /dev/zero | tr '\\0' y >&2\nexit 5\n");
+    for (const bool nonBlocking : {false, true}) {
+        const Outcome outcome = run(script, String(), nonBlocking);
+        EXPECT_TRUE(outcome.ran);
+        EXPECT_EQ(5, outcome.rc);
+        EXPECT_EQ(16384u, outcome.out.length());
+        EXPECT_EQ(16384u, outcome.err.length());
+    }
+}
+
+TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsNothingUpWhenReadWithoutBlocking) {
+    const ScratchDir scratch;
+    const std::string script = scratch.script("TovrinAgent", "echo up\nsleep 3 &\nexit 0\n");
+    const Stopwatch watch;
+    const Outcome outcome = run(script, String(), true);
+    EXPECT_TRUE(outcome.ran);
+    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_EQ("up\n", outcome.text());
+    EXPECT_EQ("", outcome.errText());
+}
+
+TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsABlockingReadUpToTheTimeoutAtMost) {
+    limit("1");
+    TraceCapture traces;
+    const ScratchDir scratch;
+    const std::string script = scratch.script("TovrinAgent", "echo up\nsleep 4 &\nexit 6\n");
+    const Stopwatch watch;
+    const Outcome outcome = run(script);
+    EXPECT_TRUE(outcome.ran);
+    EXPECT_EQ(6, outcome.rc);
+    EXPECT_GT(watch.seconds(), 0.9);
+    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_EQ("up\n", outcome.text());
+    EXPECT_EQ("", outcome.errText());
+    EXPECT_THAT(traces.errors(), Contains(StartsWith("Bad return code (6)")));
+}
+
+TEST_F(CommandRunner, AnAgentCommandThatHangsIsKilled) {
+    limit("1");
+    TraceCapture traces;
+    const ScratchDir scratch;
+    const Outcome outcome = run(scratch.script("TovrinAgent", "echo lost\nexec sleep 60\n"));
+    EXPECT_FALSE(outcome.ran);
+    EXPECT_EQ("", outcome.text());
+    EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
+}
+
+TEST_F(CommandRunner, CostGrowsWithTheOutputOnly) {
+    const ScratchDir scratch;
+    const auto bestOf = [&](std::size_t bytes) {
+        const std::string file = scratch.write("data", std::string(bytes, 'x'));
+        double best = 1e9;
+        for (int i = 0; i < 3; ++i) {
+            const Stopwatch watch;
+            EXPECT_EQ(bytes, run("/bin/cat " + file).out.length());
+            best = std::min(best, watch.seconds());
+        }
+        return best;
+    };
+    // Copying everything for each chunk would make it 64 times.
+    EXPECT_LT(bestOf(32u << 20), 24 * bestOf(4u << 20));
+}
