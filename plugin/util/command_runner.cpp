@@ -201,12 +201,13 @@ bool Util::runCommandEnv(const String& command, char** env, int& rc, String& std
                          String& stdErr, const String& input, bool nonBlocking) {
     Trace trace(traceUnit);
     trace().detail("Command to run is \"%s\"", command);
+    const bool startsAgent = command.find(String(kAgentScript), 0) != String::NPOS;
     Process process(command, const_cast<const char**>(env));
     if (!process.start()) {
         trace().error("Failed to start process for cmd %s", command);
         return trace.exit(false);
     }
-    Run run(trace, process, command.find(String(kAgentScript), 0) != String::NPOS);
+    Run run(trace, process, startsAgent);
     const bool inTime = run.finish(input, rc, nonBlocking);
     run.copyOutput(stdOut, stdErr);
     if (!inTime) {

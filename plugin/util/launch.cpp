@@ -145,9 +145,9 @@ bool forkAndExecute(char* const* argv, const std::vector<std::string>& env, Proc
         trace().error("failed to fork child process");
         return trace.exit(false);
     }
-    pipes.out.writeEnd.close();
-    pipes.err.writeEnd.close();
-    pipes.in.readEnd.close();
+    closePipeEnd(pipes.out.writeEnd);
+    closePipeEnd(pipes.err.writeEnd);
+    closePipeEnd(pipes.in.readEnd);
     return trace.exit(true);
 }
 

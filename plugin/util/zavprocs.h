@@ -96,8 +96,11 @@ private:
 struct ProcessData {
     int pid = 0;
     int exitStatus = 0;
-    pthread_mutex_t mutex;      ///< guards exitStatus and exited where a thread waits for the child
-    pthread_cond_t waitCond;    ///< signalled by that thread once `exited` is set
+    /// Guards exitStatus and exited where a thread waits for the child.
+    pthread_mutex_t mutex = PTHREAD_MUTEX_INITIALIZER;
+    /// Signalled by that thread once `exited` is set. Initialised twice: what pthread_cond_init has
+    /// failed on must still be fit to be destroyed.
+    pthread_cond_t waitCond = PTHREAD_COND_INITIALIZER;
     bool exited = false;
 };
 
