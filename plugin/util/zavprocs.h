@@ -178,10 +178,10 @@ private:
     std::unique_ptr<ProcessInputStream> stdErr_;
     std::unique_ptr<ProcessOutputStream> stdIn_;
     String command_;
-    std::unique_ptr<ProcessData, DestroyedData> processData_;   // null until start()
+    std::unique_ptr<ProcessData, DestroyedData> processData_;  // null until start()
     std::vector<std::string> env_;
     std::unique_ptr<user_s_t, Freed> userToken_;
-    int timeout_ = 0;   // seconds
+    int timeout_ = 0;  // seconds
     Deadline runDeadline_ = Deadline::in(0);
     bool reaped_ = false;
 };

@@ -33,8 +33,10 @@ TEST(CommandThreads, RunsDoNotMeet) {
         }
     };
     std::vector<std::thread> threads;
-    for (int i = 0; i < 4; ++i) threads.emplace_back(work, i);
-    for (std::thread& thread : threads) thread.join();
+    for (int i = 0; i < 4; ++i)
+        threads.emplace_back(work, i);
+    for (std::thread& thread : threads)
+        thread.join();
     EXPECT_EQ(0, wrong);
     EXPECT_EQ(before, child_role::openDescriptors());
     EXPECT_TRUE(::waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD);
@@ -69,6 +71,7 @@ TEST(CommandThreads, TracesOfAllChildrenArrive) {
             }
         });
     }
-    for (std::thread& thread : threads) thread.join();
+    for (std::thread& thread : threads)
+        thread.join();
     EXPECT_EQ(20, traces.count('D', "Calling execvp"));
 }

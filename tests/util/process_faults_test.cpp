@@ -33,7 +33,7 @@ namespace {
 
 /// What fails next. Shared with the child, which is a copy.
 struct Faults {
-    int pipeCall = 0;           // this one of the coming calls fails
+    int pipeCall = 0;  // this one of the coming calls fails
     bool vfork = false;
     int dup2Onto = -1;
     bool kill = false;
@@ -45,8 +45,8 @@ struct Faults {
     bool pidfd = false;
     int fetchError = 0;
     int deleteError = 0;
-    bool interruptions = false;   // every other call of what is interruptible
-    int allocation = 0;           // this one of the coming allocations fails
+    bool interruptions = false;  // every other call of what is interruptible
+    int allocation = 0;          // this one of the coming allocations fails
 };
 Faults faults;
 
@@ -85,7 +85,8 @@ long syscall(long number, ...) noexcept {
     std::va_list list;
     va_start(list, number);
     long arguments[6];
-    for (long& argument : arguments) argument = va_arg(list, long);
+    for (long& argument : arguments)
+        argument = va_arg(list, long);
     va_end(list);
     static auto* const real = next<long(long, ...)>("syscall");
     return real(number, arguments[0], arguments[1], arguments[2], arguments[3], arguments[4],
@@ -212,7 +213,7 @@ namespace {
 
 class Fault : public testing::Test {
 protected:
-    void SetUp() override { Util::pathExists("/"); }   // opens the locale
+    void SetUp() override { Util::pathExists("/"); }  // opens the locale
     void TearDown() override {
         faults = Faults();
         ::unsetenv("TIMEOUT");
@@ -278,8 +279,8 @@ TEST_F(Fault, MutexAndConditionAreTracedAndDoNotStopTheStart) {
     faults.mutexError = 12;
     faults.conditionError = 11;
     EXPECT_TRUE(run("/bin/true"));
-    EXPECT_THAT(traces.errors(), ElementsAre("Error initializing mutex: 12",
-                                             "Error initializing condition: 11"));
+    EXPECT_THAT(traces.errors(),
+                ElementsAre("Error initializing mutex: 12", "Error initializing condition: 11"));
 }
 
 TEST_F(Fault, ArgumentsThatCannotBeCopiedFailTheStart) {
