@@ -139,8 +139,9 @@ void HttpServer::Implementation::beginEnd(std::chrono::milliseconds grace) {
 
 void HttpServer::Implementation::pollEnd() {
     const auto now = Clock::now();
-    if (core.watch.quiet() || now >= deadline)
-        return pollFlush(std::min(deadline, now) + kFlushTime);
+    if (core.watch.quiet() || now >= deadline) {
+        return pollFlush(std::min(deadline, now + kFlushTime));
+    }
     after(kEndPoll, [this] { pollEnd(); });
 }
 

@@ -39,6 +39,10 @@ struct ServerCore {
           home(std::move(serverHome)),
           watch(router.tables()),
           pool(limits.workers, limits.waitingRequests) {}
+    /// What is torn down here may wait for the lock of a table whose executor is held.
+    ~ServerCore() { watch.release(); }
+    ServerCore(const ServerCore&) = delete;
+    ServerCore& operator=(const ServerCore&) = delete;
 
     void add(std::shared_ptr<Connection> connection) {
         Connection* const key = connection.get();

@@ -46,13 +46,17 @@ TaskWatch::TaskWatch(const std::vector<oxa::Table>& tables)
 }
 
 TaskWatch::~TaskWatch() {
-    {
-        const std::lock_guard<std::mutex> lock(lock_);
-        release_ = true;
-    }
-    released_.notify_all();
+    release();
     holding_.reset();
     counting_.reset();
+}
+
+void TaskWatch::release() {
+    {
+        const std::lock_guard<std::mutex> lock(lock_);
+        letGo_ = true;
+    }
+    released_.notify_all();
 }
 
 TaskWatch::Request::Request(TaskWatch& watch, const oxa::Table& table)
@@ -109,7 +113,7 @@ void TaskWatch::holdAfterTask() {
     holding_ = oxa::subscribe(kOutcomeTable, {}, [this](const oxa::Rows&) {
         std::unique_lock<std::mutex> lock(lock_);
         held_ = true;
-        released_.wait(lock, [this] { return release_; });
+        released_.wait(lock, [this] { return letGo_; });
         return static_cast<int>(OXA_OK);
     });
 }

@@ -23,7 +23,6 @@ public:
     /// `tables`: those of the plug-in, which outlive this object; without a request table or a
     /// deploy status table nothing is ever queued.
     explicit TaskWatch(const std::vector<oxa::Table>& tables);
-    /// Lets a held executor go.
     ~TaskWatch();
     TaskWatch(const TaskWatch&) = delete;
     TaskWatch& operator=(const TaskWatch&) = delete;
@@ -48,6 +47,8 @@ public:
     /// status table must be neither opened nor closed afterwards, their table being locked while
     /// the executor is held.
     void holdAfterTask();
+    /// Lets a held executor go, and holds none any more.
+    void release();
     /// No request runs, and no task is in hand: none is outstanding, or the executor is held.
     bool quiet() const;
 
@@ -76,7 +77,7 @@ private:
     /// sampled the request got to say that it was accepted.
     std::map<std::string, int> outstanding_;
     bool held_ = false;
-    bool release_ = false;
+    bool letGo_ = false;
 
     std::unique_ptr<oxa::Subscription> counting_;
     std::unique_ptr<oxa::Subscription> holding_;

@@ -1,0 +1,179 @@
+// ctest-label: threaded
+// Subscriptions, fast and slow readers, readers that vanish.
+#include <atomic>
+#include <vector>
+
+#include "host/server_fixture.h"
+
+namespace {
+
+using std::chrono::milliseconds;
+
+class Events : public ServerTest {
+protected:
+    std::string subscriptionsInHealth() {
+        const std::string body = connect().get("/v1/health").body;
+        const std::size_t at = body.find("\"subscriptions\":");
+        return at == std::string::npos ? body : body.substr(at + 16, body.find('}', at) - at - 16);
+    }
+};
+
+TEST_F(Events, ComeAsOneServerSentEventPerRow) {
+    start();
+    RawClient client = connect();
+    client.send("GET /v1/events?table=PLAIN HTTP/1.1\r\nHost: x\r\n\r\n");
+    const std::string head = client.readUntil("\r\n\r\n");
+    EXPECT_NE(std::string::npos, head.find("Content-Type: text/event-stream\r\n"));
+    EXPECT_EQ(1U, table.liveObjects()) << "the subscription is live when the head has come";
+    EXPECT_EQ(OXA_OK, table.publish(plainRow("a", 1, "x")));
+    EXPECT_EQ(OXA_OK, table.publish(plainRow("b", -2, "line\nend")));
+    EXPECT_EQ("data: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"x\"}\n\n", client.readUntil("\n\n"));
+    EXPECT_EQ("data: {\"NAME\":\"b\",\"NUMBER\":-2,\"TEXT\":\"line\\nend\"}\n\n",
+              client.readUntil("\n\n"));
+}
+
+TEST_F(Events, AreThoseThatEveryParameterTakes) {
+    start();
+    RawClient client = subscribe("&NAME=x%20y&NUMBER=2");
+    table.publish(plainRow("x", 2, "other name"));
+    table.publish(plainRow("x y", 1, "other number"));
+    table.publish(plainRow("x y", 2, "this"));
+    EXPECT_EQ("data: {\"NAME\":\"x y\",\"NUMBER\":2,\"TEXT\":\"this\"}\n\n",
+              client.readUntil("\n\n"));
+}
+
+TEST_F(Events, ReachEverySubscriber) {
+    start();
+    std::vector<RawClient> clients;
+    for (int i = 0; i < 50; ++i)
+        clients.push_back(subscribe());
+    EXPECT_EQ("50", subscriptionsInHealth());
+    table.publish(plainRow("all", 1, ""));
+    for (RawClient& client : clients)
+        EXPECT_NE(std::string::npos, client.readUntil("\n\n").find("\"all\""));
+}
+
+TEST_F(Events, StopWithTheClient) {
+    start();
+    RawClient client = subscribe();
+    EXPECT_EQ("1", subscriptionsInHealth());
+    client.close();
+    EXPECT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
+    EXPECT_EQ("0", subscriptionsInHealth());
+    EXPECT_EQ(OXA_OK, table.publish(plainRow("nobody", 1, "")));
+}
+
+TEST_F(Events, StopWithAClientThatLeftEverythingUnread) {
+    start();
+    RawClient client = subscribe();
+    client.send(std::string(10'000, 'x'));  // bytes that nobody reads
+    for (int i = 0; i < 3000; ++i)
+        table.publish(plainRow("row", i, "filling text"));
+    client.close();
+    EXPECT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
+}
+
+TEST_F(Events, StillReachAClientThatHasEndedItsSide) {
+    start();
+    RawClient client = subscribe();
+    client.endSending();
+    std::this_thread::sleep_for(milliseconds(50));
+    EXPECT_EQ(1U, table.liveObjects());
+    table.publish(plainRow("still", 1, ""));
+    EXPECT_NE(std::string::npos, client.readUntil("\n\n").find("still"));
+    client.close();
+    EXPECT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
+}
+
+TEST_F(Events, OfAThousandSubscribersThatComeAndGoLeaveNothingBehind) {
+    start();
+    { RawClient warm = subscribe(); }
+    ASSERT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
+    const std::size_t before = openDescriptors();
+    for (int i = 0; i < 1000; ++i) {
+        RawClient client = connect();
+        // Every other one does not even wait for the answer.
+        client.send("GET /v1/events?table=PLAIN HTTP/1.1\r\n\r\n");
+        if (i % 2 == 0) {
+            const std::string head = client.readUntil("\r\n\r\n");
+            ASSERT_TRUE(head.find("200") != std::string::npos ||
+                        head.find("503") != std::string::npos);
+        }
+        if (i % 10 == 0) table.publish(plainRow("row", i, ""));
+    }
+    EXPECT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
+    EXPECT_TRUE(eventually([&] { return openDescriptors() == before; }));
+    EXPECT_EQ("0", subscriptionsInHealth());
+}
+
+/// NUMBER of a row's event, or how many an overflow event says were lost, as a negative number.
+int numberOf(const std::string& event) {
+    const bool lost = event.find("event: overflow\ndata: {\"lost\":") == 0;
+    const std::string key = lost ? "\"lost\":" : "\"NUMBER\":";
+    const int number = std::stoi(event.substr(event.find(key) + key.size()));
+    return lost ? -number : number;
+}
+
+TEST_F(Events, ThatASlowReaderMissesAreCountedInTheirPlace) {
+    start();
+    RawClient slow = subscribe();
+    RawClient quick = subscribe("&NAME=mark");
+    int published = 0;
+    bool overflowed = false;
+    for (; published < 100'000 && !overflowed; ++published)
+        overflowed = table.publish(plainRow("row", published, "filling text")) == OXA_OVERFLOW;
+    ASSERT_TRUE(overflowed);
+    for (int i = 0; i < 1000; ++i)
+        table.publish(plainRow("row", published++, ""));
+    table.publish(plainRow("mark", published++, ""));
+    EXPECT_NE(std::string::npos, quick.readUntil("\n\n").find("mark"));
+
+    int next = 0, lost = 0;
+    while (lost == 0) {
+        const int number = numberOf(slow.readUntil("\n\n"));
+        if (number < 0) {
+            lost = -number;
+        } else {
+            ASSERT_EQ(next++, number);
+        }
+    }
+    EXPECT_EQ(published, next + lost) << "every row has come or has been counted";
+    EXPECT_GE(lost, 1000);
+    table.publish(plainRow("row", 77, ""));
+    EXPECT_EQ(77, numberOf(slow.readUntil("\n\n"))) << "the stream goes on";
+}
+
+TEST_F(Events, NeverWaitForTheirReaders) {
+    start();
+    std::vector<RawClient> asleep;
+    for (int i = 0; i < 100; ++i)
+        asleep.push_back(subscribe());
+    const auto begin = std::chrono::steady_clock::now();
+    for (int i = 0; i < 2000; ++i)
+        table.publish(plainRow("row", i, "filling text"));
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(15));
+    EXPECT_EQ(200, connect().get("/v1/health").status);
+}
+
+TEST_F(Events, OfManyPublishersAllArrive) {
+    start();
+    RawClient client = subscribe();
+    std::vector<std::thread> publishers;
+    for (int t = 0; t < 4; ++t) {
+        publishers.emplace_back([&, t] {
+            for (int i = 0; i < 50; ++i)
+                table.publish(plainRow("row", t * 50 + i, ""));
+        });
+    }
+    std::vector<bool> seen(200, false);
+    for (int i = 0; i < 200; ++i) {
+        const int number = numberOf(client.readUntil("\n\n"));
+        ASSERT_GE(number, 0);
+        seen.at(static_cast<std::size_t>(number)) = true;
+    }
+    for (std::thread& publisher : publishers)
+        publisher.join();
+    EXPECT_EQ(200, std::count(seen.begin(), seen.end(), true));
+}
+
+}  // namespace

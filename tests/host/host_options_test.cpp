@@ -1,0 +1,118 @@
+#include "host/host_options.h"
+
+#include <gtest/gtest.h>
+
+#include <filesystem>
+#include <map>
+#include <vector>
+
+#include "host/start_error.h"
+#include "support/scratch_dir.h"
+
+namespace {
+
+using host::HostOptions;
+
+class Options : public testing::Test {
+protected:
+    std::optional<HostOptions> read(std::vector<const char*> arguments) {
+        arguments.insert(arguments.begin(), "zavhost");
+        return host::readOptions(
+            static_cast<int>(arguments.size()), arguments.data(), [this](const char* name) {
+                const auto found = environment.find(name);
+                return found == environment.end() ? nullptr : found->second.c_str();
+            });
+    }
+    std::string errorOf(const std::vector<const char*>& arguments) {
+        try {
+            read(arguments);
+        } catch (const host::StartError& error) {
+            return error.what();
+        }
+        return "";
+    }
+
+    ScratchDir scratch;
+    const std::string home = scratch.makeDir("home");
+    std::map<std::string, std::string> environment;
+};
+
+TEST_F(Options, AllAreTaken) {
+    const auto options = read({"--home", home.c_str(), "--socket", "/s", "--rpc-socket", "/r",
+                               "--rpc-port", "135", "--origin-node", "n", "--plugin", "p.so"});
+    ASSERT_TRUE(options);
+    EXPECT_EQ(home, options->home);
+    EXPECT_EQ("/s", options->socket);
+    EXPECT_EQ("/r", options->rpcSocket);
+    EXPECT_EQ(135, options->rpcPort);
+    EXPECT_EQ("n", options->originNode);
+    EXPECT_EQ("p.so", options->plugin);
+}
+
+TEST_F(Options, HomeComesFromTheEnvironmentWhenItIsNotGiven) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_EQ(home, read({})->home);
+    const std::string other = scratch.makeDir("other");
+    EXPECT_EQ(other, read({"--home", other.c_str()})->home);
+}
+
+TEST_F(Options, HomeMustBeADirectory) {
+    const std::string complaint = "no home: give --home DIR or set TOVRINHOME";
+    EXPECT_EQ(complaint, errorOf({}));
+    environment["TOVRINHOME"] = "";
+    EXPECT_EQ(complaint, errorOf({}));
+    EXPECT_EQ(complaint, errorOf({"--home", ""}));
+    const std::string lost = scratch.path("lost");
+    EXPECT_EQ("home " + lost + ": No such file or directory", errorOf({"--home", lost.c_str()}));
+    const std::string file = scratch.write("file", "");
+    EXPECT_EQ("home " + file + " is not a directory", errorOf({"--home", file.c_str()}));
+}
+
+TEST_F(Options, ARelativeHomeBecomesAbsolute) {
+    const std::string relative = std::filesystem::relative(home).string();
+    const std::string absolute = read({"--home", relative.c_str()})->home;
+    EXPECT_EQ('/', absolute.at(0));
+    EXPECT_TRUE(std::filesystem::equivalent(home, absolute));
+}
+
+TEST_F(Options, SocketsHaveDefaults) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_EQ("/run/zavhost.sock", read({})->socket);
+    EXPECT_EQ("/run/zavhost.sock.rpc", read({})->rpcSocket);
+    environment["XDG_RUNTIME_DIR"] = "/run/user/1";
+    EXPECT_EQ("/run/user/1/zavhost.sock", read({})->socket);
+    environment["ZAV_SOCKET"] = "/z";
+    EXPECT_EQ("/z", read({})->socket);
+    EXPECT_EQ("/z.rpc", read({})->rpcSocket);
+    EXPECT_EQ("/s.rpc", read({"--socket", "/s"})->rpcSocket);
+}
+
+TEST_F(Options, EmptyOrEqualSocketsAreRefused) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_EQ("the name of a socket is empty", errorOf({"--socket", ""}));
+    EXPECT_EQ("the name of a socket is empty", errorOf({"--rpc-socket", ""}));
+    EXPECT_EQ("--socket and --rpc-socket name the same file /s",
+              errorOf({"--socket", "/s", "--rpc-socket", "/s"}));
+}
+
+TEST_F(Options, MistakesAreOneLine) {
+    environment["TOVRINHOME"] = home;
+    for (const std::vector<const char*>& arguments : {std::vector<const char*>{"--nonsense"},
+                                                      {"stray"},
+                                                      {"--rpc-port", "0"},
+                                                      {"--rpc-port", "65536"},
+                                                      {"--rpc-port", "-1"},
+                                                      {"--rpc-port", "x"},
+                                                      {"--home"}}) {
+        const std::string error = errorOf(arguments);
+        EXPECT_NE("", error) << arguments.front();
+        EXPECT_EQ(std::string::npos, error.find('\n')) << error;
+    }
+}
+
+TEST_F(Options, HelpAndVersionRunNothing) {
+    EXPECT_FALSE(read({"--help"}));
+    EXPECT_FALSE(read({"--version"}));
+}
+
+}  // namespace

@@ -1,0 +1,202 @@
+// ctest-label: threaded
+// How a server ends: what is under way is finished, nothing new begins.
+#include <atomic>
+#include <vector>
+
+#include "host/server_fixture.h"
+
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+std::vector<ColumnInfo> taskColumns() {
+    return {{"transid", 0, 8, OXA_TYPE_CHARACTER},
+            {"command", 8, 16, OXA_TYPE_CHARACTER},
+            {"retval", 24, 4, OXA_TYPE_INTEGER}};
+}
+
+std::string taskRow(const std::string& transid) {
+    return RowBuilder().text(transid, 8).text("START", 16).integer(0);
+}
+
+class End : public ServerTest {
+protected:
+    bool hasEnded() {
+        return eventually([&] { return ended.load(); });
+    }
+};
+
+TEST_F(End, IsAtOnceWhenNothingIsUnderWay) {
+    start();
+    RawClient idle = connect();
+    EXPECT_EQ(200, idle.get("/v1/health").status);
+    RawClient stream = subscribe();
+    server->end(seconds(60));
+    EXPECT_TRUE(hasEnded());
+    EXPECT_TRUE(idle.isClosed());
+    EXPECT_FALSE(connect().connected());
+}
+
+TEST_F(End, WaitsForASampleAndSendsItsAnswer) {
+    Gate gate;
+    std::atomic<bool> running{false};
+    table.sampler = [&](rtoxa& request) {
+        running = true;
+        gate.wait();
+        insert(request, plainRow("late", 1, ""));
+        return static_cast<int>(OXA_OK);
+    };
+    start();
+    RawClient client = connect();
+    client.sendPost("/v1/query", plainQuery());
+    ASSERT_TRUE(eventually([&] { return running.load(); }));
+    server->end(seconds(60));
+    ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
+    EXPECT_FALSE(ended);
+    gate.open();
+    const auto answer = client.readAnswer();
+    EXPECT_NE(std::string::npos, answer.body.find("late"));
+    EXPECT_NE(std::string::npos, answer.head.find("Connection: close"));
+    EXPECT_TRUE(hasEnded());
+}
+
+TEST_F(End, TakesNoFurtherRequest) {
+    Gate gate;
+    std::atomic<int> samples{0};
+    table.sampler = [&](rtoxa&) {
+        ++samples;
+        gate.wait();
+        return static_cast<int>(OXA_OK);
+    };
+    start();
+    RawClient busy = connect();
+    busy.sendPost("/v1/query", plainQuery());
+    RawClient half = connect();
+    half.send("GET /v1/health HTTP/1.1\r\n");
+    RawClient both = connect();
+    both.sendPost("/v1/query", plainQuery());
+    both.sendPost("/v1/query", plainQuery());
+    ASSERT_TRUE(eventually([&] { return samples == 2; }));
+    server->end(seconds(60));
+    ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
+    half.send("\r\n");
+    EXPECT_EQ(503, half.readAnswer().status);
+    gate.open();
+    EXPECT_EQ(200, busy.readAnswer().status);
+    EXPECT_EQ(200, both.readAnswer().status);
+    EXPECT_TRUE(hasEnded());
+    EXPECT_EQ(2, samples);
+}
+
+TEST_F(End, ComesAfterTheGraceWhateverHangs) {
+    Gate gate;
+    std::atomic<bool> running{false};
+    table.sampler = [&](rtoxa&) {
+        running = true;
+        gate.wait();
+        return static_cast<int>(OXA_OK);
+    };
+    start();
+    RawClient client = connect();
+    client.sendPost("/v1/query", plainQuery());
+    ASSERT_TRUE(eventually([&] { return running.load(); }));
+    const auto begin = std::chrono::steady_clock::now();
+    server->end(milliseconds(200));
+    EXPECT_TRUE(hasEnded());
+    EXPECT_GE(std::chrono::steady_clock::now() - begin, milliseconds(200));
+    gate.open();
+}
+
+class TaskEnd : public End {
+protected:
+    TaskEnd() {
+        requests.sampler = [](rtoxa& request) {
+            FLT1_FILTERINFO entry{};
+            while (request.GetFilterInfo(&entry) == OXA_OK)
+                insert(request, taskRow(entry.value));
+            return static_cast<int>(OXA_OK);
+        };
+        requests.RegisterWithManager();
+        outcomes.RegisterWithManager();
+    }
+    ~TaskEnd() override {
+        stop();  // lets a held executor go
+        if (executor.joinable()) executor.join();
+    }
+    void accept(const std::string& transid) {
+        const auto answer = connect().post(
+            "/v1/query", R"({"table":"KAGREQT","where":[{"column":"TRANSID","op":"=","value":")" +
+                             transid + "\"}]}");
+        EXPECT_NE(std::string::npos, answer.body.find(transid));
+    }
+    RawClient subscribeToOutcomes() {
+        RawClient client = connect();
+        client.send("GET /v1/events?table=KAGDYST HTTP/1.1\r\n\r\n");
+        EXPECT_NE(std::string::npos, client.readUntil("\r\n\r\n").find("200"));
+        return client;
+    }
+
+    /// Sends more to each subscriber than its connection holds unread.
+    void flood() {
+        for (int batch = 0; batch < 60; ++batch) {
+            for (int i = 0; i < 200; ++i)
+                outcomes.publish(taskRow("flood"));
+            connect().get("/v1/health");  // the streams have been written to when this is answered
+        }
+    }
+
+    MadeUpTable requests{"KAGREQT", taskColumns()};
+    MadeUpTable outcomes{"KAGDYST", taskColumns()};
+    std::thread executor;
+};
+
+TEST_F(TaskEnd, FollowsTheTaskInHandWhoseOutcomeIsSentAndNoOtherBegins) {
+    start();
+    RawClient events = subscribeToOutcomes();
+    accept("t1");
+    accept("t2");
+    Gate first;
+    std::atomic<bool> secondBegun{false};
+    executor = std::thread([&] {
+        first.wait();
+        outcomes.publish(taskRow("t1"));
+        secondBegun = true;
+        outcomes.publish(taskRow("t2"));
+    });
+    server->end(seconds(60));
+    ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
+    std::this_thread::sleep_for(milliseconds(50));
+    EXPECT_FALSE(ended);
+    first.open();
+    EXPECT_TRUE(hasEnded());
+    EXPECT_FALSE(secondBegun);
+    EXPECT_NE(std::string::npos, events.readUntil("\n\n").find("t1"));
+}
+
+TEST_F(TaskEnd, DoesNotWaitForASubscriberThatDoesNotRead) {
+    start();
+    RawClient events = subscribeToOutcomes();
+    flood();
+    accept("t1");
+    executor = std::thread([&] { outcomes.publish(taskRow("t1")); });
+    server->end(seconds(60));
+    EXPECT_TRUE(hasEnded());
+}
+
+TEST_F(TaskEnd, SurvivesSubscribersThatLeaveWhileTheExecutorIsHeld) {
+    start();
+    std::vector<RawClient> subscribers;
+    for (int i = 0; i < 20; ++i)
+        subscribers.push_back(subscribeToOutcomes());
+    flood();
+    accept("t1");
+    server->end(seconds(60));
+    ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
+    executor = std::thread([&] { outcomes.publish(taskRow("t1")); });
+    std::this_thread::sleep_for(milliseconds(100));
+    subscribers.clear();
+    EXPECT_TRUE(hasEnded());
+}
+
+}  // namespace

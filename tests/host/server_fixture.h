@@ -1,0 +1,81 @@
+/// A server in this process, on a socket of its own, with a table of the test's.
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <filesystem>
+#include <future>
+#include <memory>
+#include <optional>
+#include <string>
+#include <thread>
+
+#include "host/http_server.h"
+#include "host/made_up_table.h"
+#include "host/raw_client.h"
+#include "host/socket_file.h"
+#include "support/scratch_dir.h"
+
+/// Holds samples until it is opened; opened at the latest when the test ends.
+class Gate {
+public:
+    ~Gate() { open(); }
+    void open() {
+        if (!open_) promise_.set_value();
+        open_ = true;
+    }
+    void wait() const { opened_.wait(); }
+
+private:
+    std::promise<void> promise_;
+    std::shared_future<void> opened_{promise_.get_future()};
+    bool open_ = false;
+};
+
+class ServerTest : public testing::Test {
+protected:
+    ServerTest() { table.RegisterWithManager(); }
+    ~ServerTest() override { stop(); }
+
+    void start(const host::ServerLimits& limits = {}) {
+        socket.emplace(scratch.path("s"));
+        server = std::make_unique<host::HttpServer>(
+            socket->listen(), host::Router(oxa::tables(), host::CodePage("UTF-8")), "/home/of/it",
+            limits);
+        serving = std::thread([this] {
+            server->run();
+            ended = true;
+        });
+    }
+    void stop() {
+        if (!serving.joinable()) return;
+        server->stop();
+        serving.join();
+        server.reset();
+    }
+
+    RawClient connect() { return RawClient(scratch.path("s")); }
+    /// A client whose subscription is live.
+    RawClient subscribe(const std::string& rest = "") {
+        RawClient client = connect();
+        client.send("GET /v1/events?table=PLAIN" + rest + " HTTP/1.1\r\nHost: x\r\n\r\n");
+        EXPECT_EQ(0U, client.readUntil("\r\n\r\n").find("HTTP/1.1 200 OK\r\n"));
+        return client;
+    }
+    static std::string plainQuery() { return R"({"table":"PLAIN"})"; }
+    static std::size_t openDescriptors() {
+        std::size_t count = 0;
+        for ([[maybe_unused]] const auto& entry :
+             std::filesystem::directory_iterator("/proc/self/fd"))
+            ++count;
+        return count;
+    }
+
+    ScratchDir scratch;
+    MadeUpTable table{"PLAIN", plainColumns()};
+    std::optional<host::SocketFile> socket;
+    std::unique_ptr<host::HttpServer> server;
+    std::thread serving;
+    std::atomic<bool> ended{false};
+};

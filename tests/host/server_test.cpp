@@ -1,0 +1,488 @@
+// ctest-label: threaded
+// Requests, good and bad, and connections.
+#include <fcntl.h>
+#include <sys/wait.h>
+
+#include <atomic>
+#include <stdexcept>
+#include <vector>
+
+#include "host/server_fixture.h"
+
+namespace {
+
+using std::chrono::milliseconds;
+
+class Requests : public ServerTest {};
+class BadRequests : public ServerTest {};
+class Connections : public ServerTest {};
+class Samples : public ServerTest {};
+
+/// A valid query of exactly `length` bytes.
+std::string paddedQuery(std::size_t length) {
+    std::string body = R"({"table":"PLAIN"})";
+    body.resize(length, ' ');
+    return body;
+}
+
+TEST_F(Requests, TablesAndHealth) {
+    start();
+    RawClient client = connect();
+    const auto tables = client.get("/v1/tables");
+    EXPECT_EQ(200, tables.status);
+    EXPECT_NE(std::string::npos, tables.head.find("Content-Type: application/json\r\n"));
+    EXPECT_EQ(0U, tables.body.find(
+                      R"({"tables":[{"application":"TEST","name":"PLAIN","columns":[{"name":)"));
+    const auto health = client.get("/v1/health");
+    EXPECT_EQ(200, health.status);
+    EXPECT_NE(std::string::npos, health.body.find(R"("home":"/home/of/it")"));
+    EXPECT_NE(std::string::npos, health.body.find(R"("subscriptions":0)"));
+}
+
+TEST_F(Requests, QueryAnswersTheRowsThatTheConditionsTake) {
+    table.sampler = [](rtoxa& request) {
+        for (int i = 1; i <= 3; ++i)
+            insert(request, plainRow("n" + std::to_string(i), i, ""));
+        return static_cast<int>(OXA_OK);
+    };
+    start();
+    RawClient client = connect();
+    const auto answer = client.post(
+        "/v1/query", R"({"table":"PLAIN","where":[{"column":"NUMBER","op":">","value":1},)"
+                     R"({"column":"NAME","op":"!=","value":"n3"}]})");
+    EXPECT_EQ(200, answer.status);
+    EXPECT_EQ("{\"rows\":[{\"NAME\":\"n2\",\"NUMBER\":2,\"TEXT\":\"\"}]}\n", answer.body);
+}
+
+TEST_F(Requests, SentTogetherAreAnsweredInOrder) {
+    start();
+    RawClient client = connect();
+    const std::string query = plainQuery();
+    const std::string one =
+        "POST /v1/query HTTP/1.1\r\nHost: x\r\nContent-Length: " + std::to_string(query.size()) +
+        "\r\n\r\n" + query;
+    ASSERT_TRUE(client.send(one + "GET /v1/nothing HTTP/1.1\r\n\r\n" + one +
+                            "GET /v1/health HTTP/1.1\r\nConnection: close\r\n\r\n"));
+    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_EQ(404, client.readAnswer().status);
+    EXPECT_EQ(200, client.readAnswer().status);
+    const auto last = client.readAnswer();
+    EXPECT_NE(std::string::npos, last.body.find("uptime_seconds"));
+    EXPECT_NE(std::string::npos, last.head.find("Connection: close\r\n"));
+    EXPECT_TRUE(client.isClosed());
+}
+
+TEST_F(Requests, MayComeByteByByte) {
+    start();
+    RawClient client = connect();
+    const std::string query = plainQuery();
+    for (const char byte : "POST /v1/query HTTP/1.1\r\nContent-Length: " +
+                               std::to_string(query.size()) + "\r\n\r\n" + query) {
+        ASSERT_TRUE(client.send(std::string(1, byte)));
+    }
+    EXPECT_EQ(200, client.readAnswer().status);
+}
+
+TEST_F(Requests, OfHttp10AreAnsweredAndClosed) {
+    start();
+    RawClient client = connect();
+    client.send("GET /v1/tables HTTP/1.0\r\n\r\n");
+    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_TRUE(client.isClosed());
+}
+
+TEST_F(Requests, MayBeChunked) {
+    start();
+    RawClient client = connect();
+    client.send(
+        "POST /v1/query HTTP/1.1\r\nTransfer-Encoding: chunked\r\n\r\n"
+        "8\r\n{\"table\"\r\n9\r\n:\"PLAIN\"}\r\n0\r\n\r\n");
+    EXPECT_EQ(200, client.readAnswer().status);
+}
+
+TEST_F(Requests, OfAClientThatHasEndedItsSideAreAnswered) {
+    start();
+    RawClient client = connect();
+    client.sendPost("/v1/query", plainQuery());
+    client.endSending();
+    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_TRUE(client.isClosed());
+}
+
+TEST_F(Requests, ThatWaitForLeaveToSendGetIt) {
+    start();
+    RawClient client = connect();
+    const std::string query = plainQuery();
+    client.send("POST /v1/query HTTP/1.1\r\nExpect: 100-continue\r\nContent-Length: " +
+                std::to_string(query.size()) + "\r\n\r\n");
+    EXPECT_EQ("HTTP/1.1 100 Continue\r\n\r\n", client.readUntil("\r\n\r\n"));
+    client.send(query);
+    EXPECT_EQ(200, client.readAnswer().status);
+}
+
+TEST_F(Requests, OfTheGreatestSizePass) {
+    start();
+    RawClient client = connect();
+    EXPECT_EQ(200, client.post("/v1/query", paddedQuery(1024 * 1024)).status);
+    EXPECT_EQ(200, client.get("/v1/health").status);
+}
+
+TEST_F(BadRequests, GetAnErrorThatSaysWhatIsWrong) {
+    start();
+    RawClient client = connect();
+    const auto unknown = client.post("/v1/query", R"({"table":"NOPE"})");
+    EXPECT_EQ(404, unknown.status);
+    EXPECT_EQ("{\"error\":\"there is no table \\\"NOPE\\\"\"}\n", unknown.body);
+    const auto method = client.get("/v1/query");
+    EXPECT_EQ(405, method.status);
+    EXPECT_NE(std::string::npos, method.head.find("Allow: POST\r\n"));
+    EXPECT_EQ(400, client.post("/v1/query", "nonsense").status);
+    EXPECT_EQ(400, client.get("/v1/events").status);
+    EXPECT_EQ(200, client.get("/v1/health").status) << "the connection is still good";
+}
+
+TEST_F(BadRequests, AHeadRequestGetsNoBody) {
+    start();
+    RawClient client = connect();
+    client.send("HEAD /v1/tables HTTP/1.1\r\n\r\nGET /v1/health HTTP/1.1\r\n\r\n");
+    EXPECT_NE(std::string::npos, client.readUntil("\r\n\r\n").find("405"));
+    EXPECT_EQ(0U, client.readUntil("\r\n").find("HTTP/1.1 200 OK"));
+}
+
+TEST_F(BadRequests, ThatAreNotHttpGet400AndAreClosed) {
+    start();
+    for (const std::string& bytes :
+         {std::string("nonsense\r\n\r\n"), std::string("GET /v1/tables\r\n\r\n"),
+          std::string("GET /v1/tables HTTP/9.9\r\n\r\n"),
+          std::string("GET /v1/tables HTTP/1.1\r\nno colon\r\n\r\n"),
+          std::string("POST /v1/query HTTP/1.1\r\nContent-Length: x\r\n\r\n"),
+          std::string("POST /v1/query HTTP/1.1\r\nContent-Length: -1\r\n\r\n"),
+          std::string("POST /v1/query HTTP/1.1\r\nContent-Length: 1\r\nContent-Length: 2\r\n\r\n"),
+          std::string("POST /v1/query HTTP/1.1\r\nTransfer-Encoding: chunked\r\n\r\nzz\r\n"),
+          std::string("\0\0\0\0\0\0\0\0", 8), std::string("\x16\x03\x01\x02\x00\x01\x00\x01", 8)}) {
+        RawClient client = connect();
+        client.send(bytes);
+        const auto answer = client.readAnswer();
+        EXPECT_EQ(400, answer.status) << bytes;
+        EXPECT_EQ(0U, answer.body.find("{\"error\":\"")) << bytes;
+        EXPECT_TRUE(client.isClosed()) << bytes;
+    }
+    EXPECT_EQ(200, connect().get("/v1/health").status);
+}
+
+TEST_F(BadRequests, WithALongHeadAreRefused) {
+    start();
+    RawClient client = connect();
+    client.send("GET /v1/tables HTTP/1.1\r\nX: " + std::string(20'000, 'x') + "\r\n\r\n");
+    const auto answer = client.readAnswer();
+    EXPECT_EQ(400, answer.status);
+    EXPECT_EQ("{\"error\":\"the request's head is larger than 16384 bytes\"}\n", answer.body);
+    EXPECT_TRUE(client.isClosed());
+}
+
+TEST_F(BadRequests, WithAnEndlessHeadAreRefused) {
+    start();
+    RawClient client = connect();
+    while (client.send(std::string(1000, 'x'))) {
+    }
+    EXPECT_EQ(200, connect().get("/v1/health").status);
+}
+
+TEST_F(BadRequests, WithALargeBodyAreRefused) {
+    start();
+    RawClient client = connect();
+    const auto answer = client.post("/v1/query", paddedQuery(1024 * 1024 + 1));
+    EXPECT_EQ(413, answer.status);
+    EXPECT_EQ("{\"error\":\"the body is larger than 1048576 bytes\"}\n", answer.body);
+}
+
+TEST_F(BadRequests, ThatOnlyAnnounceALargeBodyAreRefusedAtOnce) {
+    start();
+    for (const char* length : {"1048577", "18446744073709551615"}) {
+        RawClient client = connect();
+        client.send("POST /v1/query HTTP/1.1\r\nExpect: 100-continue\r\nContent-Length: " +
+                    std::string(length) + "\r\n\r\n");
+        EXPECT_EQ(413, client.readAnswer().status);
+    }
+}
+
+TEST_F(BadRequests, WhoseChunksAddUpToALargeBodyAreRefused) {
+    start();
+    RawClient client = connect();
+    client.send("POST /v1/query HTTP/1.1\r\nTransfer-Encoding: chunked\r\n\r\n");
+    const std::string chunk = "10000\r\n" + std::string(65536, ' ') + "\r\n";
+    for (int i = 0; i < 17; ++i)
+        client.send(chunk);
+    EXPECT_EQ(413, client.readAnswer().status);
+}
+
+TEST_F(BadRequests, ThatEndEarlyAreRefused) {
+    start();
+    for (const char* bytes : {"POST /v1/query HTTP/1.1\r\nContent-Length: 100\r\n\r\n{\"table\":",
+                              "GET /v1/tables HT", "GET /v1/tables HTTP/1.1\r\nHost: x"}) {
+        RawClient client = connect();
+        client.send(bytes);
+        client.endSending();
+        const auto answer = client.readAnswer();
+        EXPECT_EQ(400, answer.status) << bytes;
+        EXPECT_EQ("{\"error\":\"the request ended before it was complete\"}\n", answer.body);
+    }
+}
+
+TEST_F(Connections, OfSlowClientsEnd) {
+    host::ServerLimits limits;
+    limits.requestTime = milliseconds(150);
+    start(limits);
+    std::vector<RawClient> clients;
+    for (const char* bytes : {"G", "GET /v1/tables HTTP/1.1\r\n",
+                              "POST /v1/query HTTP/1.1\r\nContent-Length: 10\r\n\r\n{"}) {
+        clients.push_back(connect());
+        clients.back().send(bytes);
+    }
+    for (RawClient& client : clients)
+        EXPECT_TRUE(client.isClosed());
+}
+
+TEST_F(Connections, ThatDripBytesEndTooBecauseTheTimeIsForTheWholeRequest) {
+    host::ServerLimits limits;
+    limits.requestTime = milliseconds(300);
+    start(limits);
+    RawClient client = connect();
+    const auto begin = std::chrono::steady_clock::now();
+    client.send("GET /v1/tables HTTP/1.1\r\nX: ");
+    while (client.send("x"))
+        std::this_thread::sleep_for(milliseconds(20));
+    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(10));
+}
+
+TEST_F(Connections, ThatAreIdleEnd) {
+    host::ServerLimits limits;
+    limits.idleTime = milliseconds(100);
+    start(limits);
+    RawClient fresh = connect();
+    RawClient used = connect();
+    EXPECT_EQ(200, used.get("/v1/health").status);
+    EXPECT_TRUE(fresh.isClosed());
+    EXPECT_TRUE(used.isClosed());
+}
+
+TEST_F(Connections, OfClientsThatDoNotReadEnd) {
+    table.sampler = [](rtoxa& request) {
+        for (int i = 0; i < 20'000; ++i)
+            insert(request, plainRow("row", i, "filling text"));
+        return static_cast<int>(OXA_OK);
+    };
+    host::ServerLimits limits;
+    limits.answerTime = milliseconds(200);
+    limits.connections = 1;
+    start(limits);
+    RawClient client = connect();
+    client.sendPost("/v1/query", plainQuery());
+    EXPECT_TRUE(eventually([&] { return connect().get("/v1/health").status == 200; }));
+}
+
+TEST_F(Connections, BeyondTheLimitGet503UntilOneIsFree) {
+    start();
+    std::vector<RawClient> clients;
+    for (int i = 0; i < 256; ++i) {
+        clients.push_back(connect());
+        ASSERT_TRUE(clients.back().connected());
+    }
+    EXPECT_EQ(200, clients.back().get("/v1/health").status);
+    RawClient refused = connect();
+    const auto answer = refused.get("/v1/health");
+    EXPECT_EQ(503, answer.status);
+    EXPECT_EQ("{\"error\":\"too many connections are open\"}\n", answer.body);
+    EXPECT_TRUE(refused.isClosed());
+    EXPECT_EQ(200, clients.front().get("/v1/health").status) << "the others go on";
+    clients.front().close();
+    EXPECT_TRUE(eventually([&] { return connect().get("/v1/health").status == 200; }));
+}
+
+TEST_F(Connections, FarBeyondTheLimitCostNothing) {
+    host::ServerLimits limits;
+    limits.connections = 2;
+    limits.refusals = 3;
+    start(limits);
+    RawClient first = connect();
+    RawClient second = connect();
+    EXPECT_EQ(200, second.get("/v1/health").status);
+    const std::size_t before = openDescriptors();
+    std::vector<RawClient> flood;
+    for (int i = 0; i < 500; ++i)
+        flood.push_back(connect());
+    EXPECT_EQ(200, first.get("/v1/health").status);
+    EXPECT_LE(openDescriptors(), before + 500 + 3);
+}
+
+TEST_F(Connections, LeaveNoDescriptorBehind) {
+    start();
+    EXPECT_EQ(200, connect().get("/v1/health").status);
+    const auto settled = [&](std::size_t wanted) {
+        return eventually([&] { return openDescriptors() == wanted; });
+    };
+    std::size_t before = 0;
+    ASSERT_TRUE(eventually([&] {
+        const std::size_t now = openDescriptors();
+        return std::exchange(before, now) == now;
+    }));
+    for (int i = 0; i < 300; ++i) {
+        RawClient client = connect();
+        if (i % 3 == 0) client.get("/v1/health");
+        if (i % 3 == 1) client.send("GET /v1/ta");
+        if (i % 3 == 2) client.sendPost("/v1/query", plainQuery());
+    }
+    EXPECT_TRUE(settled(before));
+}
+
+TEST_F(Connections, AreNotInheritedByChildren) {
+    start();
+    RawClient client = connect();
+    EXPECT_EQ(200, client.get("/v1/health").status);
+    int checked = 0;
+    for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+        const int descriptor = std::stoi(entry.path().filename());
+        std::error_code error;
+        const std::string target = std::filesystem::read_symlink(entry.path(), error).string();
+        if (error || (target.find("socket:") != 0 && target.find("anon_inode:") != 0)) continue;
+        // What the test program was started with is not ours.
+        if (descriptor < 3) continue;
+        EXPECT_NE(0, ::fcntl(descriptor, F_GETFD) & FD_CLOEXEC) << target;
+        ++checked;
+    }
+    EXPECT_GE(checked, 4) << "listener, both ends of the connection, event loop";
+}
+
+TEST_F(Connections, OfOtherUsersAreRefused) {
+    if (::geteuid() != 0) GTEST_SKIP() << "only root can become another user";
+    start();
+    ASSERT_EQ(0, ::chmod(scratch.path().c_str(), 0755));
+    ASSERT_EQ(0, ::chmod(scratch.path("s").c_str(), 0666));
+    const pid_t child = ::fork();
+    if (child == 0) {
+        if (::setgid(65534) != 0 || ::setuid(65534) != 0) ::_exit(1);
+        RawClient client = connect();
+        const auto answer = client.get("/v1/health");
+        const bool refused = answer.status == 403 &&
+                             answer.body.find("serves its own user only") != std::string::npos;
+        ::_exit(refused && client.isClosed() ? 0 : 2);
+    }
+    int status = -1;
+    ASSERT_EQ(child, ::waitpid(child, &status, 0));
+    EXPECT_EQ(0, status);
+}
+
+TEST_F(Samples, ThatTakeLongHoldUpNobodyElse) {
+    Gate gate;
+    std::atomic<int> running{0};
+    table.sampler = [&](rtoxa& request) {
+        FLT1_FILTERINFO entry{};
+        if (request.GetFilterInfo(&entry) != OXA_OK) return static_cast<int>(OXA_OK);
+        ++running;
+        gate.wait();
+        insert(request, plainRow("slow", 1, ""));
+        return static_cast<int>(OXA_OK);
+    };
+    start();
+    std::vector<RawClient> slow;
+    for (int i = 0; i < 31; ++i) {
+        slow.push_back(connect());
+        slow.back().sendPost(
+            "/v1/query",
+            R"({"table":"PLAIN","where":[{"column":"NAME","op":"=","value":"slow"}]})");
+    }
+    ASSERT_TRUE(eventually([&] { return running == 31; }));
+    RawClient quick = connect();
+    EXPECT_EQ(200, quick.get("/v1/health").status);
+    EXPECT_EQ(200, quick.post("/v1/query", plainQuery()).status);
+    RawClient events = subscribe();
+    table.publish(plainRow("event", 1, ""));
+    EXPECT_NE(std::string::npos, events.readUntil("\n\n").find("event"));
+    gate.open();
+    for (RawClient& client : slow)
+        EXPECT_NE(std::string::npos, client.readAnswer().body.find(R"("NAME":"slow")"));
+}
+
+TEST_F(Samples, BeyondThoseThatMayWaitGet503) {
+    Gate gate;
+    std::atomic<int> running{0};
+    table.sampler = [&](rtoxa&) {
+        ++running;
+        gate.wait();
+        return static_cast<int>(OXA_OK);
+    };
+    host::ServerLimits limits;
+    limits.workers = 2;
+    limits.waitingRequests = 1;
+    start(limits);
+    std::vector<RawClient> clients;
+    for (int i = 0; i < 2; ++i) {
+        clients.push_back(connect());
+        clients.back().sendPost("/v1/query", plainQuery());
+    }
+    ASSERT_TRUE(eventually([&] { return running == 2; }));
+    clients.push_back(connect());
+    clients.back().sendPost("/v1/query", plainQuery());
+    RawClient late = connect();
+    EXPECT_TRUE(eventually([&] {
+        if (late.get("/v1/health").status != 200) return false;
+        RawClient probe = connect();
+        probe.sendPost("/v1/query", plainQuery());
+        return probe.readAnswer(milliseconds(200)).status == 503;
+    }));
+    const auto answer = late.post("/v1/query", plainQuery());
+    EXPECT_EQ(503, answer.status);
+    EXPECT_EQ("{\"error\":\"too many requests are waiting\"}\n", answer.body);
+    EXPECT_EQ(200, late.get("/v1/health").status);
+    gate.open();
+    for (RawClient& client : clients)
+        EXPECT_EQ(200, client.readAnswer().status);
+}
+
+TEST_F(Samples, OfClientsThatVanishedHarmNobody) {
+    Gate gate;
+    std::atomic<int> finished{0};
+    table.sampler = [&](rtoxa& request) {
+        gate.wait();
+        for (int i = 0; i < 1000; ++i)
+            insert(request, plainRow("row", i, ""));
+        ++finished;
+        return static_cast<int>(OXA_OK);
+    };
+    start();
+    for (int i = 0; i < 20; ++i)
+        connect().sendPost("/v1/query", plainQuery());
+    std::this_thread::sleep_for(milliseconds(50));
+    gate.open();
+    EXPECT_TRUE(eventually([&] { return finished == 20; }));
+    EXPECT_EQ(200, connect().get("/v1/health").status);
+}
+
+TEST_F(Samples, ThatFailGet500) {
+    int kind = 0;
+    table.sampler = [&](rtoxa&) -> int {
+        if (kind == 1) throw std::runtime_error("x");
+        if (kind == 2) throw 1;
+        return 0x21060099;
+    };
+    start();
+    RawClient client = connect();
+    EXPECT_EQ("{\"error\":\"table PLAIN failed with status 0x21060099\"}\n",
+              client.post("/v1/query", plainQuery()).body);
+    for (kind = 1; kind <= 2; ++kind)
+        EXPECT_EQ(500, client.post("/v1/query", plainQuery()).status);
+}
+
+TEST_F(Samples, WithTextThatIsNoUtf8AreAnswered) {
+    table.sampler = [](rtoxa& request) {
+        insert(request, plainRow("\xFF\xFE", 1, std::string(15, 'x') + "\xC3\xA4"));
+        return static_cast<int>(OXA_OK);
+    };
+    start();
+    RawClient client = connect();
+    const auto answer = client.post("/v1/query", plainQuery());
+    EXPECT_EQ(200, answer.status);
+    EXPECT_NE(std::string::npos, answer.body.find("xxx\xEF\xBF\xBD\""));
+}
+
+}  // namespace

@@ -1,0 +1,138 @@
+#include "host/socket_file.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+
+#include <optional>
+
+#include "host/raw_client.h"
+#include "host/start_error.h"
+#include "support/scratch_dir.h"
+
+namespace {
+
+using host::SocketFile;
+
+std::string errorOf(const std::string& path) {
+    try {
+        const SocketFile socket(path);
+    } catch (const host::StartError& error) {
+        return error.what();
+    }
+    return "";
+}
+
+class Socket : public testing::Test {
+protected:
+    mode_t modeOf(const std::string& file) {
+        struct stat found {};
+        return ::lstat(file.c_str(), &found) == 0 ? found.st_mode : 0;
+    }
+
+    ScratchDir scratch;
+    const std::string path = scratch.path("host.sock");
+};
+
+TEST_F(Socket, IsPrivateWhateverTheMask) {
+    for (const mode_t mask : {0000U, 0022U, 0777U}) {
+        const mode_t before = ::umask(mask);
+        const SocketFile socket(path);
+        ::umask(before);
+        EXPECT_EQ(S_IFSOCK | 0600U, modeOf(path)) << mask;
+    }
+}
+
+TEST_F(Socket, IsConnectedToOnlyWhenItListens) {
+    SocketFile socket(path);
+    EXPECT_FALSE(RawClient(path).connected());
+    const int descriptor = socket.listen();
+    EXPECT_TRUE(RawClient(path).connected());
+    EXPECT_NE(0, ::fcntl(descriptor, F_GETFD) & FD_CLOEXEC);
+    EXPECT_NE(0, ::fcntl(descriptor, F_GETFL) & O_NONBLOCK);
+}
+
+TEST_F(Socket, IsRemovedAtTheEndWithItsLock) {
+    {
+        SocketFile socket(path);
+        socket.listen();
+    }
+    EXPECT_FALSE(scratch.exists("host.sock"));
+    EXPECT_FALSE(scratch.exists("host.sock.lock"));
+    EXPECT_EQ("", errorOf(path)) << "the path is free again";
+}
+
+TEST_F(Socket, ThatIsServedIsLeftAlone) {
+    SocketFile socket(path);
+    EXPECT_EQ("socket " + path + " is in use by a live host", errorOf(path)) << "not yet listening";
+    socket.listen();
+    EXPECT_EQ("socket " + path + " is in use by a live host", errorOf(path));
+    EXPECT_TRUE(RawClient(path).connected());
+    EXPECT_TRUE(scratch.exists("host.sock.lock"));
+}
+
+TEST_F(Socket, ThatAProgramWithoutLockServesIsLeftAloneToo) {
+    const host::FileDescriptor other(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    path.copy(address.sun_path, path.size());
+    ASSERT_EQ(0, ::bind(other.get(), reinterpret_cast<sockaddr*>(&address), sizeof address));
+    ASSERT_EQ(0, ::listen(other.get(), 1));
+    EXPECT_EQ("socket " + path + " is in use by a live host", errorOf(path));
+    EXPECT_TRUE(RawClient(path).connected());
+    EXPECT_FALSE(scratch.exists("host.sock.lock"));
+}
+
+TEST_F(Socket, OfAHostThatWasKilledIsReplaced) {
+    const pid_t child = ::fork();
+    if (child == 0) {
+        SocketFile socket(path);
+        socket.listen();
+        ::_exit(0);  // leaves its files behind as a killed process does
+    }
+    int status = 0;
+    ASSERT_EQ(child, ::waitpid(child, &status, 0));
+    ASSERT_TRUE(scratch.exists("host.sock"));
+    ASSERT_TRUE(scratch.exists("host.sock.lock"));
+    SocketFile socket(path);
+    socket.listen();
+    EXPECT_TRUE(RawClient(path).connected());
+}
+
+TEST_F(Socket, NeverReplacesAnotherKindOfFile) {
+    scratch.write("host.sock", "precious");
+    EXPECT_EQ(path + " exists and is not a socket", errorOf(path));
+    EXPECT_EQ("precious", scratch.read("host.sock"));
+    EXPECT_FALSE(scratch.exists("host.sock.lock"));
+    const std::string directory = scratch.makeDir("dir");
+    EXPECT_EQ(directory + " exists and is not a socket", errorOf(directory));
+    const std::string link = scratch.path("link");
+    ASSERT_EQ(0, ::symlink("nowhere", link.c_str()));
+    EXPECT_EQ(link + " exists and is not a socket", errorOf(link));
+    EXPECT_TRUE(S_ISLNK(modeOf(link)));
+}
+
+TEST_F(Socket, WhoseFileWasTakenByAnotherRemovesOnlyItsOwn) {
+    std::optional<SocketFile> socket(path);
+    ASSERT_EQ(0, ::unlink(path.c_str()));
+    scratch.write("host.sock", "another's");
+    socket.reset();
+    EXPECT_EQ("another's", scratch.read("host.sock"));
+}
+
+TEST_F(Socket, NameMayBeAsLongAsAnAddressHolds) {
+    const std::size_t limit = sizeof sockaddr_un{}.sun_path - 1;
+    const std::string longest = scratch.path(std::string(limit - scratch.path().size() - 1, 's'));
+    ASSERT_EQ(limit, longest.size());
+    EXPECT_EQ("", errorOf(longest));
+    EXPECT_EQ("socket name " + longest + "s is longer than 107 bytes", errorOf(longest + "s"));
+    EXPECT_FALSE(scratch.exists(longest.substr(scratch.path().size() + 1) + "s.lock"));
+}
+
+TEST_F(Socket, InADirectoryThatIsNotThereIsAnError) {
+    const std::string lost = scratch.path("no/host.sock");
+    EXPECT_EQ("cannot make " + lost + ".lock: No such file or directory", errorOf(lost));
+}
+
+}  // namespace

@@ -1,0 +1,58 @@
+#include "host/url.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+namespace {
+
+using host::parseTarget;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::Pair;
+
+TEST(Url, SplitsPathAndParametersInOrder) {
+    const auto target = parseTarget("/v1/events?table=T&B=2&A=1&A=3");
+    ASSERT_TRUE(target);
+    EXPECT_EQ("/v1/events", target->path);
+    EXPECT_THAT(target->parameters,
+                ElementsAre(Pair("table", "T"), Pair("B", "2"), Pair("A", "1"), Pair("A", "3")));
+}
+
+TEST(Url, DecodesEscapesOnlyOnce) {
+    const auto target = parseTarget("/a%20b?n%3D=%2B%26%3d%2525");
+    ASSERT_TRUE(target);
+    EXPECT_EQ("/a b", target->path);
+    EXPECT_THAT(target->parameters, ElementsAre(Pair("n=", "+&=%25")));
+}
+
+TEST(Url, TakesPlusAsBlankInParametersOnly) {
+    const auto target = parseTarget("/a+b?x=1+2");
+    ASSERT_TRUE(target);
+    EXPECT_EQ("/a+b", target->path);
+    EXPECT_THAT(target->parameters, ElementsAre(Pair("x", "1 2")));
+}
+
+TEST(Url, KeepsEqualsSignsInValuesAndAllowsEmptyOnes) {
+    const auto target = parseTarget("/p?a=b=c&d=&e&&");
+    ASSERT_TRUE(target);
+    EXPECT_THAT(target->parameters, ElementsAre(Pair("a", "b=c"), Pair("d", ""), Pair("e", "")));
+}
+
+TEST(Url, DropsSchemeHostAndFragment) {
+    EXPECT_EQ("/v1/tables", parseTarget("http://localhost/v1/tables#x")->path);
+    EXPECT_EQ("/", parseTarget("http://localhost")->path);
+    EXPECT_THAT(parseTarget("/x#?a=b")->parameters, IsEmpty());
+}
+
+TEST(Url, RefusesMalformedEscapes) {
+    for (const char* target : {"/%", "/%4", "/%zz", "/%4g", "/p?a=%", "/p?%1=x", "/p?a=%a"}) {
+        EXPECT_FALSE(parseTarget(target)) << target;
+    }
+}
+
+TEST(Url, RefusesTheCharacterZero) {
+    EXPECT_FALSE(parseTarget("/p?a=b%00c"));
+    EXPECT_FALSE(parseTarget("/%00"));
+}
+
+}  // namespace
