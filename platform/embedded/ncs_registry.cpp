@@ -1,6 +1,5 @@
 #include "embedded/ncs_registry.h"
 
-#include <cstdlib>
 #include <cstring>
 #include <mutex>
 #include <new>
@@ -73,16 +72,4 @@ void rpc__register_mgr(const uuid__t* object, const rpc__if_spec* interface,
     } catch (const std::bad_alloc&) {
         *status = rpc__s_no_memory;
     }
-}
-
-void* rpc__malloc(std::size_t bytes) {
-    return std::malloc(bytes);
-}
-
-void rpc__free(void* memory) {
-    std::free(memory);
-}
-
-void rpc__block_copy(const void* from, void* to, std::size_t bytes) {
-    std::memcpy(to, from, bytes);
 }

@@ -84,8 +84,8 @@ extern const uuid__t uuid__nil;
 void rpc__register_mgr(const uuid__t* object, const rpc__if_spec* interface,
                        const rpc__server_epv* stubs, const void* manager, std::uint32_t* status);
 
-/// Memory for a stub's parameters, aligned for any type; null when there is none. Released with
-/// rpc__free on the same thread.
+/// Memory for a stub's parameters, aligned for any type, not cleared; null when there is none.
+/// Released with rpc__free, which takes null too.
 void* rpc__malloc(std::size_t bytes);
 void rpc__free(void* memory);
 

@@ -1,0 +1,33 @@
+/// What the runtime's threads wait for.
+#pragma once
+
+#include <unistd.h>
+
+#include <utility>
+
+namespace ncs {
+
+/// Closes its descriptor.
+class Descriptor {
+public:
+    explicit Descriptor(int descriptor) : descriptor_(descriptor) {}
+    Descriptor(Descriptor&& other) noexcept : descriptor_(std::exchange(other.descriptor_, -1)) {}
+    ~Descriptor() {
+        if (descriptor_ != -1) ::close(descriptor_);
+    }
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
+    int get() const { return descriptor_; }
+
+private:
+    int descriptor_;
+};
+
+/// Something that the poll descriptor watches.
+struct Source {
+    enum class Kind { Listener, Connection, Timer, Stop };
+    explicit Source(Kind sourceKind) : kind(sourceKind) {}
+    const Kind kind;
+};
+
+}  // namespace ncs
