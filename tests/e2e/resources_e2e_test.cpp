@@ -58,14 +58,14 @@ void openAndDropSubscriptions(const ManagedHost& host, int count) {
 
 /// Starts that all find their way to the agent script, half of them in vain.
 void startAgents(const ManagedHost& host, int count) {
-    const auto events = host.startZavctl({"events", "--count", std::to_string(count)});
+    const auto watcher = host.startZavctl({"events", "--count", std::to_string(count)});
     ASSERT_TRUE(eventually([&] {
         return json::parse(host.zavctl({"--json", "status"}).out)["subscriptions"] == 1;
     }));
     for (int i = 0; i < count; ++i) {
         ASSERT_EQ(host.zavctl({"start", i % 2 == 0 ? "ux" : "nope", "--no-wait"}).status, 0);
     }
-    const ProgramResult result = events->wait(std::chrono::seconds(180));
+    const ProgramResult result = watcher->wait(std::chrono::seconds(180));
     ASSERT_EQ(result.status, 0) << result.err;
     int failed = 0;
     for (const json& event : json::parse(result.out)["events"])
