@@ -2,25 +2,21 @@
 
 #include <sys/stat.h>
 
-#include <string>
-#include <vector>
-
-#include "base/zavhmap.h"
 #include "base/zavstr.h"
 #include "base/zavtoken.h"
 #include "base/zavtrace.h"
 #include "tasks/failure.h"
 #include "tasks/home.h"
-#include "tasks/product_arch.h"
 #include "tasks/start_stop.h"
+#include "tasks/ua_console.h"
 #include "tasks/ua_files.h"
+#include "tasks/ua_setup.h"
 #include "tasks/whole_file.h"
 #include "tasks/zavtasks.h"
 #include "tasks/zavtqelm.h"
 #include "util/zavutil.h"
 
 using ZAV::String;
-using ZAV::StrStrMap;
 using ZAV::Trace;
 using ZAV::Util;
 
@@ -30,145 +26,8 @@ RAS1_UNIT traceUnit{"zavtasks"};
 
 constexpr mode_t kScriptMode = 0755;
 
-/// One request and what has been worked out for it so far, in the order in which it is.
-struct UaSetup {
-    explicit UaSetup(TaskQueueElem& request)
-        : task(request),
-          product(request.getProduct()),
-          metafile(request.getUaconfig()),
-          scripts(request.getUascript()) {}
-
-    TaskQueueElem& task;
-    const String product;
-    const String metafile;  // its name in the depot
-    const String scripts;   // names in the depot with "," between them
-    String instance;        // empty for the default instance
-    String port;            // of the console; empty when none was given
-    bool restart = false;
-    String configFile;
-    String metaPath;
-    String workPath;
-    String rbPath;
-    String startupProviders;  // data provider types with "," between them
-    String scriptsDir;
-};
-
 bool contains(const String& text, const String& part) {
     return text.find(part, 0) != String::NPOS;
-}
-
-// ---- What the request and the configuration file say --------------------------------------------
-
-/// What follows the first "=" of an option; empty when nothing does.
-String optionValue(const String& option) {
-    const std::uint32_t separator = option.find("=", 0);
-    if (separator == String::NPOS || separator + 1 == option.length()) return {};
-    return option.substr(separator + 1);
-}
-
-void readOptions(UaSetup& setup) {
-    Trace trace(traceUnit);
-    String context = setup.task.getContext();
-    context.trim().toUpper();
-    for (StringTokenizer options(context, ","); options.hasMoreTokens();) {
-        const String option = options.nextToken();
-        const String value = optionValue(option);
-        if (value.length() == 0) continue;
-        if (contains(option, "PORT=")) setup.port = value;
-        if (contains(option, "RESTART=") && value == "Y") setup.restart = true;
-    }
-    trace().detail("Context [%s] port (optional) [%s] restart (1=true) [%d]", context, setup.port,
-                   setup.restart);
-}
-
-/// The file of the instance as it was named or else of its name in lower case, which is then the
-/// instance's name for all that follows.
-TASK_RC findConfigFile(UaSetup& setup) {
-    Trace trace(traceUnit);
-    setup.configFile = getUaConfigFileName(setup.instance);
-    if (Util::pathExists(setup.configFile)) return trace.exit(TASK_OK);
-    setup.instance.toLower();
-    setup.configFile = getUaConfigFileName(setup.instance);
-    if (Util::pathExists(setup.configFile)) return trace.exit(TASK_OK);
-    return trace.exit(failTask(
-        trace(), setup.task, TASK_NO_CONFIG_FILE, joinValues({setup.configFile, setup.instance}),
-        "%s Configuration file [%s] for instance (optional) [%s] does not exist", setup.configFile,
-        setup.instance));
-}
-
-/// A value of the configuration file, without its quotes.
-bool readValue(const StrStrMap& pairs, const char* key, String& value) {
-    if (!pairs.get(key, value)) return false;
-    removeChar(value, '\'');
-    return true;
-}
-
-TASK_RC readConfigFile(UaSetup& setup) {
-    Trace trace(traceUnit);
-    const StrStrMap pairs = populateHashMapFromFile(setup.configFile, '*');
-    struct Required {
-        const char* key;
-        String& value;
-        TASK_RC missing;
-    };
-    const Required required[] = {{"KUMP_META_PATH", setup.metaPath, TASK_NO_META_PATH},
-                                 {"KUM_WORK_PATH", setup.workPath, TASK_NO_WORK_PATH},
-                                 {"KUMP_RB_PATH", setup.rbPath, TASK_NO_RB_PATH}};
-    for (const Required& entry : required) {
-        if (readValue(pairs, entry.key, entry.value)) continue;
-        return trace.exit(failTask(
-            trace(), setup.task, entry.missing, joinValues({entry.key, setup.configFile}),
-            "%s No value found for [%s] in config file [%s]", entry.key, setup.configFile));
-    }
-    constexpr const char* kStartupProviders = "KUMA_STARTUP_DP";
-    if (!readValue(pairs, kStartupProviders, setup.startupProviders)) {
-        trace().error("No value found for %s", kStartupProviders);
-    }
-    return trace.exit(TASK_OK);
-}
-
-TASK_RC findScriptsDirectory(UaSetup& setup) {
-    Trace trace(traceUnit);
-    const std::uint32_t separator = setup.workPath.rfind('/');
-    if (separator == String::NPOS) {
-        // "[%]" is no conversion and is written as it stands: the key's name is not an argument.
-        return trace.exit(failTask(
-            trace(), setup.task, TASK_BAD_WORK_PATH,
-            joinValues({"KUM_WORK_PATH", setup.workPath, setup.configFile}),
-            "%s Work directory [%s] from tag [%] in config file [%s] cannot be parsed, no dir "
-            "separator",
-            setup.workPath, setup.configFile));
-    }
-    setup.scriptsDir = setup.workPath.substr(0, separator) + "/scripts";
-    return trace.exit(TASK_OK);
-}
-
-TASK_RC checkInstalled(UaSetup& setup) {
-    Trace trace(traceUnit);
-    const String directory = getProductArchDir(getProductArch(setup.product), setup.product);
-    if (directory.length() == 0) {
-        return trace.exit(failTask(trace(), setup.task, TASK_NOT_INSTALLED, setup.product,
-                                   "%s Supplied product code [%s] is not installed",
-                                   setup.product));
-    }
-    trace().detail("UA Base Dir is [%s]", directory + "/");
-    trace().detail("UA Bin Dir is [%s]", directory + "/bin/");
-    trace().detail("UA Work Dir is [%s]", setup.workPath);
-    trace().detail("UA Scripts Dir is [%s]", setup.scriptsDir);
-    trace().detail("UA RB Dir is [%s]", setup.rbPath);
-    return trace.exit(TASK_OK);
-}
-
-/// Works everything out without changing anything.
-TASK_RC prepare(UaSetup& setup) {
-    Trace trace(traceUnit);
-    setup.instance = getUaInstanceName(setup.task.getTargetmsn());
-    readOptions(setup);
-    TASK_RC rc = findConfigFile(setup);
-    if (rc == TASK_OK) rc = readConfigFile(setup);
-    if (rc == TASK_OK) rc = findScriptsDirectory(setup);
-    if (rc == TASK_OK) rc = checkInstalled(setup);
-    return trace.exit(rc);
 }
 
 // ---- Copying from the depot ---------------------------------------------------------------------
@@ -216,52 +75,10 @@ TASK_RC copyFiles(UaSetup& setup) {
 
 // ---- The console --------------------------------------------------------------------------------
 
-/// The settings for one run of the console, as a list that ends in a null pointer.
-class ConsoleEnvironment {
-public:
-    explicit ConsoleEnvironment(const UaSetup& setup) {
-        add("KUM_PRODSPEC_PATH=" + setup.workPath + "/");
-        add("KUMP_RB_PATH=" + setup.rbPath);
-        add("KUMP_DPCONSOLE_NOCONFIRM=Y");
-        if (setup.port.length() != 0) add("KUMP_DPCONSOLE_PORT=" + setup.port);
-        for (std::string& setting : settings_)
-            pointers_.push_back(setting.data());
-        pointers_.push_back(nullptr);
-    }
-    ConsoleEnvironment(const ConsoleEnvironment&) = delete;
-    ConsoleEnvironment& operator=(const ConsoleEnvironment&) = delete;
-
-    char** list() { return pointers_.data(); }
-
-private:
-    void add(const String& setting) {
-        Trace trace(traceUnit);
-        settings_.emplace_back(static_cast<const char*>(setting.c_str()));
-        trace().detail("Environment variable %d - %s", settings_.size(), setting);
-    }
-
-    std::vector<std::string> settings_;
-    std::vector<char*> pointers_;
-};
-
-struct ConsoleRun {
-    String command;
-    bool started = false;
-    int exitCode = 0;
-    String stdOut;
-};
-
 /// Has the console do `verb` with the metafile that was copied.
 ConsoleRun runConsole(const UaSetup& setup, const String& verb) {
-    const String home = ZAV_TOVRINHOME;
-    ConsoleRun run;
-    run.command = home + "/bin/um_console -h " + home + " -c \"" + verb + " " + setup.metaPath +
-                  "/" + setup.metafile + "\"";
-    ConsoleEnvironment environment(setup);
-    String stdErr;
-    run.started = Util::runCommandEnv(run.command, environment.list(), run.exitCode, run.stdOut,
-                                      stdErr, "", false);
-    return run;
+    const UaConsole console{setup.workPath, setup.rbPath, setup.port};
+    return console.run(verb, setup.metaPath + "/" + setup.metafile);
 }
 
 TASK_RC deleteMetafile(UaSetup& setup) {
@@ -371,7 +188,7 @@ TASK_RC setUaconfig(TaskQueueElem& task) {
         trace().error("UA SetConfig called but no MDL or Script files specified");
         return trace.exit(TASK_OK);
     }
-    TASK_RC rc = prepare(setup);
+    TASK_RC rc = prepareUaSetup(setup);
     if (rc != TASK_OK) return trace.exit(rc);
     // Without a metafile nothing is done, not even with the scripts.
     if (setup.metafile.length() != 0) {

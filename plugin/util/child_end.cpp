@@ -18,16 +18,16 @@ constexpr int kLongestStep = 20;
 #ifdef SYS_pidfd_open
 constexpr long kPidfdOpen = SYS_pidfd_open;
 #else
-constexpr long kPidfdOpen = 434;   // the same number on every architecture
+constexpr long kPidfdOpen = 434;  // the same number on every architecture
 #endif
 
 struct Forgotten {
     std::mutex mutex;
-    std::vector<pid_t> children;   // guarded by the mutex
+    std::vector<pid_t> children;  // guarded by the mutex
 };
 
 Forgotten& forgotten() {
-    static Forgotten& instance = *new Forgotten;   // used by threads that outlive main
+    static Forgotten& instance = *new Forgotten;  // used by threads that outlive main
     return instance;
 }
 

@@ -25,8 +25,8 @@ private:
 
     pid_t pid_;
     bool asked_ = false;
-    FileDescriptor handle_;   // readable once the child has ended; not open on kernels without it
-    int step_ = 1;            // milliseconds between two looks there
+    FileDescriptor handle_;  // readable once the child has ended; not open on kernels without it
+    int step_ = 1;           // milliseconds between two looks there
 };
 
 /// Leaves the child to a later call of reapForgotten. Any thread.

@@ -14,7 +14,8 @@ bool sets(const char* entry, const char* name, std::size_t length) {
 }  // namespace
 
 ChildEnvironment::ChildEnvironment(char* const* base) {
-    for (; base != nullptr && *base != nullptr; ++base) entries_.push_back(*base);
+    for (; base != nullptr && *base != nullptr; ++base)
+        entries_.push_back(*base);
     entries_.push_back(nullptr);
 }
 

@@ -21,7 +21,7 @@ public:
     char* const* list() const { return entries_.data(); }
 
 private:
-    std::vector<char*> entries_;   // the last one is null
+    std::vector<char*> entries_;  // the last one is null
 };
 
 }  // namespace ZAV

@@ -4,10 +4,9 @@
 
 #include <cerrno>
 #include <cstring>
-#include <stdexcept>
-#include <vector>
 
 #include "base/zavtrace.h"
+#include "util/unit_buffer.h"
 #include "util/zavprocs.h"
 #include "util/zavutil.h"
 
@@ -17,7 +16,7 @@ namespace {
 RAS1_UNIT traceUnit{"zavutil"};
 
 constexpr int kChunkSize = 16384;
-constexpr int kLongestPoll = 60 * 1000;   // milliseconds; the deadline may be further off
+constexpr int kLongestPoll = 60 * 1000;  // milliseconds; the deadline may be further off
 
 /// Commands with this in them start agents, whose own background processes inherit the pipes and
 /// keep them open: there is no end of file to read up to.
@@ -52,8 +51,7 @@ public:
         }
         chunk[got] = '\0';
         trace().detail(chunkFormat_, static_cast<const char*>(chunk));
-        const String text(chunk);
-        units_.insert(units_.end(), text.getData(), text.getData() + text.length());
+        units_.append(String(chunk));
     }
 
     /// Reads up to the end. False when the deadline passes before.
@@ -82,17 +80,12 @@ public:
         stream_.close();
     }
 
-    /// Text that grows chunk by chunk grows by exactly each chunk, which costs a copy of all every
-    /// time; so the units are collected here and copied once.
-    void copyTo(String& text) const {
-        if (units_.size() >= String::NPOS) throw std::length_error("output of a command");
-        text.assign(units_.data(), static_cast<std::uint32_t>(units_.size()));
-    }
+    void copyTo(String& text) const { units_.copyTo(text); }
 
 private:
     ProcessInputStream& stream_;
     const char* chunkFormat_;
-    std::vector<unsigned short> units_;
+    UnitBuffer units_;
     bool ended_ = false;
 };
 
@@ -197,16 +190,17 @@ void report(const Trace& trace, const String& command, int rc, const String& std
 
 }  // namespace
 
-bool Util::runCommandEnv(const String& command, char** env, int& rc, String& stdOut,
-                         String& stdErr, const String& input, bool nonBlocking) {
+bool Util::runCommandEnv(const String& command, char** env, int& rc, String& stdOut, String& stdErr,
+                         const String& input, bool nonBlocking) {
     Trace trace(traceUnit);
     trace().detail("Command to run is \"%s\"", command);
+    const bool startsAgent = command.find(String(kAgentScript), 0) != String::NPOS;
     Process process(command, const_cast<const char**>(env));
     if (!process.start()) {
         trace().error("Failed to start process for cmd %s", command);
         return trace.exit(false);
     }
-    Run run(trace, process, command.find(String(kAgentScript), 0) != String::NPOS);
+    Run run(trace, process, startsAgent);
     const bool inTime = run.finish(input, rc, nonBlocking);
     run.copyOutput(stdOut, stdErr);
     if (!inTime) {

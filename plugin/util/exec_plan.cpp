@@ -32,9 +32,10 @@ bool goesOn(int error) {
 ExecPlan::ExecPlan(char* const* arguments, const char* searchPath, char* const* environment)
     : arguments_(arguments), environment_(environment) {
     addCandidates(arguments[0], searchPath != nullptr ? searchPath : kSystemPath);
-    shellArguments_.push_back(const_cast<char*>(kShell));   // execve changes none of the texts
+    shellArguments_.push_back(const_cast<char*>(kShell));  // execve changes none of the texts
     shellArguments_.push_back(nullptr);
-    for (char* const* at = arguments + 1; *at != nullptr; ++at) shellArguments_.push_back(*at);
+    for (char* const* at = arguments + 1; *at != nullptr; ++at)
+        shellArguments_.push_back(*at);
     shellArguments_.push_back(nullptr);
 }
 

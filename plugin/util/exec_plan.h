@@ -20,9 +20,9 @@ public:
 private:
     void addCandidates(const std::string& name, const char* searchPath);
 
-    std::vector<std::string> candidates_;   // the files to try, in order
+    std::vector<std::string> candidates_;  // the files to try, in order
     char* const* arguments_;
-    std::vector<char*> shellArguments_;     // the shell, the script, the script's arguments
+    std::vector<char*> shellArguments_;  // the shell, the script, the script's arguments
     char* const* environment_;
 };
 

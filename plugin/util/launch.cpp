@@ -43,8 +43,10 @@ void traceEntryOfChild(const ChildPlan& plan) {
         digits[count++] = static_cast<char>('0' + rest % 10);
     }
     char* at = text;
-    while (*at != '\0') ++at;
-    while (count > 0) *at++ = digits[--count];
+    while (*at != '\0')
+        ++at;
+    while (count > 0)
+        *at++ = digits[--count];
     traceInChild(plan, RAS1_DETAIL, text);
 }
 
@@ -53,7 +55,8 @@ void traceEntryOfChild(const ChildPlan& plan) {
 void resetSignals() {
     struct sigaction byDefault {};
     byDefault.sa_handler = SIG_DFL;
-    for (int signal = 1; signal < NSIG; ++signal) ::sigaction(signal, &byDefault, nullptr);
+    for (int signal = 1; signal < NSIG; ++signal)
+        ::sigaction(signal, &byDefault, nullptr);
     sigset_t none;
     ::sigemptyset(&none);
     ::pthread_sigmask(SIG_SETMASK, &none, nullptr);
@@ -135,7 +138,8 @@ bool forkAndExecute(char* const* argv, const std::vector<std::string>& env, Proc
     const std::string setting = traceSetting(trace);
     ChildEnvironment environment(environ);
     environment.put(setting.c_str());
-    for (const std::string& entry : env) environment.put(entry.c_str());
+    for (const std::string& entry : env)
+        environment.put(entry.c_str());
     ExecPlan exec(argv, environment.find("PATH"), environment.list());
     {
         const Undisturbed undisturbed;
@@ -145,9 +149,9 @@ bool forkAndExecute(char* const* argv, const std::vector<std::string>& env, Proc
         trace().error("failed to fork child process");
         return trace.exit(false);
     }
-    pipes.out.writeEnd.close();
-    pipes.err.writeEnd.close();
-    pipes.in.readEnd.close();
+    closePipeEnd(pipes.out.writeEnd);
+    closePipeEnd(pipes.err.writeEnd);
+    closePipeEnd(pipes.in.readEnd);
     return trace.exit(true);
 }
 

@@ -18,7 +18,7 @@ int cutIntoWords(std::string& line) {
     bool inQuote = false;
     bool atSeparator = true;
     int count = 1;
-    char before = '\0';   // as it was written, not as it was cut
+    char before = '\0';  // as it was written, not as it was cut
     for (char& at : line) {
         const char here = at;
         if (here == ' ' && !inQuote) {
@@ -38,7 +38,8 @@ int cutIntoWords(std::string& line) {
 }
 
 void freeArguments(char** arguments) {
-    for (char** at = arguments; *at != nullptr; ++at) std::free(*at);
+    for (char** at = arguments; *at != nullptr; ++at)
+        std::free(*at);
     std::free(arguments);
 }
 

@@ -3,6 +3,8 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <cerrno>
+
 #include "base/zavtrace.h"
 
 namespace ZAV {
@@ -43,6 +45,17 @@ bool createPipes(Pipe& out, Pipe& err, Pipe& in) {
         return trace.exit(false);
     }
     return trace.exit(true);
+}
+
+bool closePipeEnd(FileDescriptor& end) {
+    // On Linux an interrupted close has closed all the same and must not be repeated; but there the
+    // close of a pipe is not interrupted, and elsewhere it has to be.
+    const int fd = end.release();
+    int result;
+    do {
+        result = ::close(fd);
+    } while (result == -1 && errno == EINTR);
+    return result == 0;
 }
 
 }  // namespace ZAV

@@ -23,4 +23,7 @@ struct ChildPipes {
 /// when one cannot be made; those made before stay open.
 bool createPipes(Pipe& out, Pipe& err, Pipe& in);
 
+/// Closes a pipe's end, again and again while a signal interrupts that; false when it was not open.
+bool closePipeEnd(FileDescriptor& end);
+
 }  // namespace ZAV

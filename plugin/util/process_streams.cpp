@@ -8,23 +8,13 @@
 #include <ctime>
 
 #include "base/zavtrace.h"
+#include "util/pipes.h"
 #include "util/zavprocs.h"
 
 namespace ZAV {
 namespace {
 
 RAS1_UNIT traceUnit{"zavprocs"};
-
-/// close on a pipe is never interrupted on Linux, so repeating it cannot hit a descriptor that
-/// another thread has got meanwhile; a system where it is interrupted has not closed yet.
-bool closeRepeatedly(FileDescriptor& descriptor) {
-    const int fd = descriptor.release();
-    int result;
-    do {
-        result = ::close(fd);
-    } while (result == -1 && errno == EINTR);
-    return result == 0;
-}
 
 int switchNonBlocking(int fd, bool on) {
     const int flags = ::fcntl(fd, F_GETFL);
@@ -86,7 +76,7 @@ int ProcessInputStream::setNonBlocking(bool on) {
 
 bool ProcessInputStream::close() {
     Trace trace(traceUnit);
-    return trace.exit(closeRepeatedly(fd_));
+    return trace.exit(closePipeEnd(fd_));
 }
 
 bool ProcessOutputStream::write(const char* buf, int len) {
@@ -117,7 +107,7 @@ int ProcessOutputStream::setNonBlocking(bool on) {
 
 bool ProcessOutputStream::close() {
     Trace trace(traceUnit);
-    return trace.exit(closeRepeatedly(fd_));
+    return trace.exit(closePipeEnd(fd_));
 }
 
 }  // namespace ZAV

@@ -18,9 +18,9 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavprnix"};
 
-constexpr int kDefaultTimeout = 300;   // seconds
-constexpr int kLongestPause = 1000;    // milliseconds between two looks at a child
-constexpr int kReapingTime = 5;        // seconds that a killed child may take to be gone
+constexpr int kDefaultTimeout = 300;  // seconds
+constexpr int kLongestPause = 1000;   // milliseconds between two looks at a child
+constexpr int kReapingTime = 5;       // seconds that a killed child may take to be gone
 
 int exitStatusOf(int status) {
     return (status >> 8) & 0xff;
@@ -32,7 +32,8 @@ public:
     explicit ArgumentList(const String& command) : count_(MakeArgv(&command, &arguments_)) {}
     ~ArgumentList() {
         if (arguments_ == nullptr) return;
-        for (char** at = arguments_; *at != nullptr; ++at) std::free(*at);
+        for (char** at = arguments_; *at != nullptr; ++at)
+            std::free(*at);
         std::free(arguments_);
     }
     ArgumentList(const ArgumentList&) = delete;
@@ -85,11 +86,12 @@ void Process::init(const String& command, const char** env, const String& user,
                    const String& group) {
     Trace trace(traceUnit);
     command_ = command;
-    for (; env != nullptr && *env != nullptr; ++env) env_.emplace_back(*env);
+    for (; env != nullptr && *env != nullptr; ++env)
+        env_.emplace_back(*env);
     const CharStar userName = user.c_str();
     const CharStar groupName = group.c_str();
-    userToken_.reset(create_user_token(narrowOrNull(user, userName),
-                                       narrowOrNull(group, groupName), nullptr));
+    userToken_.reset(
+        create_user_token(narrowOrNull(user, userName), narrowOrNull(group, groupName), nullptr));
     const char* const setting = BSS1_GetEnv("TIMEOUT", nullptr);
     if (setting == nullptr) {
         timeout_ = kDefaultTimeout;

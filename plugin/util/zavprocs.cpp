@@ -104,11 +104,6 @@ struct ClosedList {
 
 }  // namespace
 
-std::string errorText(int errnum) {
-    char buffer[256] = "";
-    return ::strerror_r(errnum, buffer, sizeof buffer);
-}
-
 user_s_t* create_user_token(const char* user, const char* group, const char* /*unused*/) {
     Trace trace(traceUnit);
     auto* const token = static_cast<user_s_t*>(std::malloc(sizeof(user_s_t)));

@@ -96,8 +96,11 @@ private:
 struct ProcessData {
     int pid = 0;
     int exitStatus = 0;
-    pthread_mutex_t mutex;      ///< guards exitStatus and exited where a thread waits for the child
-    pthread_cond_t waitCond;    ///< signalled by that thread once `exited` is set
+    /// Guards exitStatus and exited where a thread waits for the child.
+    pthread_mutex_t mutex = PTHREAD_MUTEX_INITIALIZER;
+    /// Signalled by that thread once `exited` is set. Initialised twice: what pthread_cond_init has
+    /// failed on must still be fit to be destroyed.
+    pthread_cond_t waitCond = PTHREAD_COND_INITIALIZER;
     bool exited = false;
 };
 
@@ -175,10 +178,10 @@ private:
     std::unique_ptr<ProcessInputStream> stdErr_;
     std::unique_ptr<ProcessOutputStream> stdIn_;
     String command_;
-    std::unique_ptr<ProcessData, DestroyedData> processData_;   // null until start()
+    std::unique_ptr<ProcessData, DestroyedData> processData_;  // null until start()
     std::vector<std::string> env_;
     std::unique_ptr<user_s_t, Freed> userToken_;
-    int timeout_ = 0;   // seconds
+    int timeout_ = 0;  // seconds
     Deadline runDeadline_ = Deadline::in(0);
     bool reaped_ = false;
 };

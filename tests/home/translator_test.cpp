@@ -127,7 +127,18 @@ TEST_F(Translator, RemovesAnInstanceAndStopsIt) {
     EXPECT_FALSE(lives(pid));
     EXPECT_FALSE(exists("config/ux_b.cfg"));
     EXPECT_FALSE(exists("run/ux_b.pid"));
+    EXPECT_FALSE(exists("data/ux_b"));
+    EXPECT_FALSE(exists("logs/ux_b.log"));
     EXPECT_EQ(translate({"-r", "b:hostA:UX", "-pc", "ux"}).status, 22);
+}
+
+TEST_F(Translator, RemovesAnInstanceThatWasNeverConfigured) {
+    addAgent("tt", "exec sleep 600\n");
+    ASSERT_EQ(agent({"start", "-o", "b", "tt"}).status, 0);
+    ASSERT_EQ(agent({"-c", "-o", "b", "stop", "tt"}).status, 0);
+    EXPECT_EQ(translate({"-r", "b:hostA:TT", "-pc", "tt"}).status, 0);
+    EXPECT_FALSE(exists("logs/tt_b.log"));
+    EXPECT_EQ(translate({"-r", "b:hostA:TT", "-pc", "tt"}).status, 22);
 }
 
 TEST_F(Translator, RemovesTheDefaultInstanceWhenNoneIsNamed) {

@@ -30,7 +30,8 @@ bool play() {
     const char* const role = std::getenv(kVariable);
     if (role == nullptr) return false;
     if (std::strcmp(role, "descriptors") == 0) {
-        for (const int fd : child_role::openDescriptors(true)) std::printf("%d\n", fd);
+        for (const int fd : child_role::openDescriptors(true))
+            std::printf("%d\n", fd);
     } else if (std::strcmp(role, "signals") == 0) {
         printSignals();
     }

@@ -53,12 +53,13 @@ private:
 
 /// Errors of a run that was killed; the ids of its process are left out.
 std::vector<std::string> withoutNumbers(std::vector<std::string> texts) {
-    for (std::string& text : texts) text.erase(text.find_last_not_of("0123456789-") + 1);
+    for (std::string& text : texts)
+        text.erase(text.find_last_not_of("0123456789-") + 1);
     return texts;
 }
 
-const auto kKilled = ElementsAre("Terminating process group ", "Terminating process ",
-                                 "Failed to wait on process");
+const auto kKilled =
+    ElementsAre("Terminating process group ", "Terminating process ", "Failed to wait on process");
 
 }  // namespace
 
@@ -85,7 +86,8 @@ TEST_F(CommandRunner, ABadExitCodeIsNoFailureOfTheRun) {
     EXPECT_THAT(traces.errors("zavutil"),
                 ElementsAre("Bad return code (3) from command \"/bin/sh -c 'exit 3'\"",
                             "STDOUT [0 characters] is: ", "STDERR [0 characters] is: "));
-    EXPECT_THAT(traces.details("zavutil"), ElementsAre("Command to run is \"/bin/sh -c 'exit 3'\""));
+    EXPECT_THAT(traces.details("zavutil"),
+                ElementsAre("Command to run is \"/bin/sh -c 'exit 3'\""));
 }
 
 TEST_F(CommandRunner, ACommandThatCannotBeStartedChangesNothing) {
@@ -95,9 +97,8 @@ TEST_F(CommandRunner, ACommandThatCannotBeStartedChangesNothing) {
     EXPECT_EQ(-99, outcome.rc);
     EXPECT_EQ("untouched", outcome.text());
     EXPECT_EQ("untouched", outcome.errText());
-    EXPECT_THAT(traces.errors(),
-                ElementsAre("Unable to execute command: /no/such/program",
-                            "Failed to start process for cmd /no/such/program x"));
+    EXPECT_THAT(traces.errors(), ElementsAre("Unable to execute command: /no/such/program",
+                                             "Failed to start process for cmd /no/such/program x"));
 }
 
 TEST_F(CommandRunner, ACommandThatCannotBeExecutedEndsWithZero) {
@@ -137,7 +138,8 @@ TEST_F(CommandRunner, InputReachesTheChild) {
 TEST_F(CommandRunner, InputLargerThanThePipesPassesThroughAChildThatWritesAsItReads) {
     limit("20");
     std::string input;
-    while (input.size() < 1000 * 1000) input += std::to_string(input.size()) + "\n";
+    while (input.size() < 1000 * 1000)
+        input += std::to_string(input.size()) + "\n";
     const Outcome outcome = run("/bin/cat", String(input.c_str()));
     EXPECT_TRUE(outcome.ran);
     EXPECT_TRUE(outcome.text() == input);
@@ -169,7 +171,8 @@ TEST_F(CommandRunner, AChildThatNeverTakesItsInputIsKilledAtTheTimeout) {
 TEST_F(CommandRunner, LargeOutputIsCollectedWhole) {
     const Outcome outcome = run("/bin/sh -c 'seq 1 100000; seq 1 3000 >&2'");
     std::string expected;
-    for (int i = 1; i <= 100000; ++i) expected += std::to_string(i) + "\n";
+    for (int i = 1; i <= 100000; ++i)
+        expected += std::to_string(i) + "\n";
     EXPECT_TRUE(outcome.text() == expected);
     EXPECT_EQ(13893u, outcome.err.length());
 }
@@ -198,7 +201,9 @@ TEST_F(CommandRunner, EachChunkIsConvertedOnItsOwn) {
     const ScratchDir scratch;
     const Outcome outcome =
         run(scratch.script("write", "printf 'a\\303'; sleep 0.3; printf '\\251b'\n"));
-    EXPECT_EQ(String("a\xc3") + String("\xa9" "b"), outcome.out);
+    EXPECT_EQ(String("a\xc3") + String("\xa9"
+                                       "b"),
+              outcome.out);
 }
 
 TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
@@ -266,9 +271,9 @@ TEST_F(CommandRunner, ADateThatIsFarAwayIsFineAsATimeout) {
 
 TEST_F(CommandRunner, AnAgentCommandIsReadOnceAfterItsEnd) {
     const ScratchDir scratch;
-    const std::string script =
-        scratch.script("TovrinAgent", "head -c 30000 /dev/zero | tr '\\0' x\n"
-                                      "head -c 20000 /dev/zero | tr '\\0' y >&2\nexit 5\n");
+    const std::string script = scratch.script("TovrinAgent",
+                                              "head -c 30000 /dev/zero | tr '\\0' x\n"
+                                              "head -c 20000 /dev/zero | tr '\\0' y >&2\nexit 5\n");
     for (const bool nonBlocking : {false, true}) {
         const Outcome outcome = run(script, String(), nonBlocking);
         EXPECT_TRUE(outcome.ran);

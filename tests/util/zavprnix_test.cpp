@@ -137,9 +137,9 @@ TEST(Process, AFirstWordThatCannotBeExecutedIsRefused) {
         Process process(String(command.c_str()));
         EXPECT_FALSE(process.start());
     }
-    EXPECT_THAT(traces.errors(), ElementsAre("Unable to execute command: /no/such/program",
-                                             "Unable to execute command: " + plain,
-                                             "Unable to execute command: "));
+    EXPECT_THAT(traces.errors(),
+                ElementsAre("Unable to execute command: /no/such/program",
+                            "Unable to execute command: " + plain, "Unable to execute command: "));
     EXPECT_EQ(before, child_role::openDescriptors());
     EXPECT_TRUE(noChildIsLeft());
 }
@@ -152,8 +152,7 @@ TEST(Process, ANameIsNotLookedForInThePathBeforeItIsTested) {
 TEST(Process, AChildThatCannotExecuteEndsWithStatusZero) {
     TraceCapture traces;
     const ScratchDir scratch;
-    const std::string badInterpreter =
-        scratch.write("script", "#!/no/such/interpreter\n", 0755);
+    const std::string badInterpreter = scratch.write("script", "#!/no/such/interpreter\n", 0755);
     for (const std::string& command : {scratch.path(), badInterpreter}) {
         traces.clear();
         Process process(String(command.c_str()));
@@ -188,11 +187,10 @@ TEST(ProcessEnvironment, EntriesReplaceAndAdd) {
     ::setenv("ZAV_TEST_KEPT", "kept", 1);
     ::setenv("ZAV_TEST_REPLACED", "old", 1);
     ::setenv("ZAV_TEST_REMOVED", "there", 1);
-    EXPECT_EQ("kept new - added=x\n",
-              outputOf("/bin/sh -c 'echo $ZAV_TEST_KEPT $ZAV_TEST_REPLACED "
-                       "${ZAV_TEST_REMOVED--} $ZAV_TEST_ADDED'",
-                       {"ZAV_TEST_REPLACED=first", "ZAV_TEST_REPLACED=new", "ZAV_TEST_REMOVED",
-                        "ZAV_TEST_ADDED=added=x", ""}));
+    EXPECT_EQ("kept new - added=x\n", outputOf("/bin/sh -c 'echo $ZAV_TEST_KEPT $ZAV_TEST_REPLACED "
+                                               "${ZAV_TEST_REMOVED--} $ZAV_TEST_ADDED'",
+                                               {"ZAV_TEST_REPLACED=first", "ZAV_TEST_REPLACED=new",
+                                                "ZAV_TEST_REMOVED", "ZAV_TEST_ADDED=added=x", ""}));
     EXPECT_STREQ("old", std::getenv("ZAV_TEST_REPLACED"));
     EXPECT_STREQ("there", std::getenv("ZAV_TEST_REMOVED"));
     EXPECT_EQ(nullptr, std::getenv("ZAV_TEST_ADDED"));
@@ -210,7 +208,8 @@ TEST(ProcessEnvironment, TheCallersListMayGoAfterConstruction) {
 TEST(ProcessTracing, AChildTracesIntoALogOfItsOwn) {
     const ScratchDir home;
     Util::_homeDir.clear();
-    for (int i = 0; i < 10; ++i) home.write("logs/zavproc_ras1_" + std::to_string(i) + ".log", "");
+    for (int i = 0; i < 10; ++i)
+        home.write("logs/zavproc_ras1_" + std::to_string(i) + ".log", "");
     ::setenv("TOVRINHOME", home.path().c_str(), 1);
     ::setenv("KBB_RAS1", "ERROR", 1);
     TraceCapture traces;
@@ -257,7 +256,8 @@ TEST(ProcessDescriptors, AChildHoldsItsStandardStreamsOnly) {
 
 TEST(ProcessDescriptors, ARunLeavesNoneBehind) {
     const auto before = child_role::openDescriptors();
-    for (int i = 0; i < 20; ++i) outputOf("/bin/true");
+    for (int i = 0; i < 20; ++i)
+        outputOf("/bin/true");
     EXPECT_EQ(before, child_role::openDescriptors());
     EXPECT_TRUE(noChildIsLeft());
 }
@@ -267,8 +267,10 @@ TEST(ProcessDescriptors, TheHostsOwnStandardStreamsMayBeClosed) {
     std::string complained;
     int exitCode = -1;
     std::vector<int> saved;
-    for (int fd = 0; fd < 3; ++fd) saved.push_back(::fcntl(fd, F_DUPFD_CLOEXEC, 100));
-    for (int fd = 0; fd < 3; ++fd) ::close(fd);
+    for (int fd = 0; fd < 3; ++fd)
+        saved.push_back(::fcntl(fd, F_DUPFD_CLOEXEC, 100));
+    for (int fd = 0; fd < 3; ++fd)
+        ::close(fd);
     {
         Process process(String("/bin/sh -c 'cat; echo complaint >&2; exit 4'"));
         if (process.start()) {
@@ -280,7 +282,8 @@ TEST(ProcessDescriptors, TheHostsOwnStandardStreamsMayBeClosed) {
         }
     }
     std::vector<bool> stayedClosed;
-    for (int fd = 0; fd < 3; ++fd) stayedClosed.push_back(::fcntl(fd, F_GETFD) == -1);
+    for (int fd = 0; fd < 3; ++fd)
+        stayedClosed.push_back(::fcntl(fd, F_GETFD) == -1);
     for (int fd = 0; fd < 3; ++fd) {
         ::dup2(saved[static_cast<std::size_t>(fd)], fd);
         ::close(saved[static_cast<std::size_t>(fd)]);
@@ -298,7 +301,8 @@ TEST(ProcessDescriptors, MoreThanAThousandMayBeOpen) {
     wanted.rlim_cur = std::min<rlim_t>(4096, before.rlim_max);
     ASSERT_EQ(0, ::setrlimit(RLIMIT_NOFILE, &wanted));
     std::vector<FileDescriptor> open;
-    for (int i = 0; i < 1100; ++i) open.push_back(openFile("/dev/null", O_RDONLY));
+    for (int i = 0; i < 1100; ++i)
+        open.push_back(openFile("/dev/null", O_RDONLY));
     ASSERT_GT(open.back().get(), 1024);
     EXPECT_EQ("there\n", outputOf("/bin/echo there"));
     open.clear();
@@ -349,8 +353,8 @@ TEST(ProcessWait, KillsAChildThatRunsPastTheTimeout) {
     EXPECT_EQ(0, exitCode);
     const std::string waiting = "Waiting for process id: ";
     const std::string pid = traces.details("zavprnix").at(0).substr(waiting.size());
-    EXPECT_THAT(traces.errors(), ElementsAre("Terminating process group -" + pid,
-                                             "Terminating process " + pid));
+    EXPECT_THAT(traces.errors(),
+                ElementsAre("Terminating process group -" + pid, "Terminating process " + pid));
     EXPECT_TRUE(noChildIsLeft());
 }
 
@@ -467,7 +471,8 @@ TEST(ProcTerminateThread, StoresTheStatusAndSignals) {
     pthread_t thread;
     ASSERT_EQ(0, ::pthread_create(&thread, nullptr, &ProcTerminateThreadFunc, &data));
     ::pthread_mutex_lock(&data.mutex);
-    while (!data.exited) ::pthread_cond_wait(&data.waitCond, &data.mutex);
+    while (!data.exited)
+        ::pthread_cond_wait(&data.waitCond, &data.mutex);
     EXPECT_EQ(6, data.exitStatus);
     ::pthread_mutex_unlock(&data.mutex);
     ::pthread_join(thread, nullptr);
@@ -477,8 +482,7 @@ TEST(ProcTerminateThread, StoresTheStatusAndSignals) {
                 ElementsAre("Waiting for process id: " + pid,
                             "waitpid returned rc=" + pid + ",waitstat=1536",
                             "WEXITSTATUS(waitstat)=6,WIFEXITED(waitstat)=1",
-                            "Signaling pd->wait_cond",
-                            "Exiting function with pthread_exit(NULL)"));
+                            "Signaling pd->wait_cond", "Exiting function with pthread_exit(NULL)"));
     ::pthread_cond_destroy(&data.waitCond);
     ::pthread_mutex_destroy(&data.mutex);
 }

@@ -1,0 +1,240 @@
+// What running a command costs against the two usual ways of starting a child with three pipes,
+// reading its outputs to their ends and waiting for it. The three take turns, so that whatever else
+// the machine does meets all of them alike; each turn is one iteration.
+//
+// Times are microseconds. "/1GiB" holds that much touched memory in 4 KiB pages; its "own" is the
+// median of a run against the median of the same run without.
+
+#include <benchmark/benchmark.h>
+#include <fcntl.h>
+#include <spawn.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <functional>
+#include <map>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "util/zavutil.h"
+
+namespace {
+
+using Microseconds = std::chrono::duration<double, std::micro>;
+
+struct Pipes {
+    int out[2];
+    int err[2];
+    int in[2];
+
+    Pipes() {
+        if (::pipe2(out, O_CLOEXEC) != 0 || ::pipe2(err, O_CLOEXEC) != 0 ||
+            ::pipe2(in, O_CLOEXEC) != 0) {
+            throw std::runtime_error("no pipes");
+        }
+    }
+};
+
+void readToEnd(int fd) {
+    char buffer[16384];
+    while (::read(fd, buffer, sizeof buffer) > 0) {
+    }
+    ::close(fd);
+}
+
+void finish(const Pipes& pipes, pid_t pid) {
+    ::close(pipes.out[1]);
+    ::close(pipes.err[1]);
+    ::close(pipes.in[0]);
+    ::close(pipes.in[1]);
+    readToEnd(pipes.out[0]);
+    readToEnd(pipes.err[0]);
+    int status = 0;
+    if (::waitpid(pid, &status, 0) != pid) throw std::runtime_error("no child");
+}
+
+void runWithFork(const char* program) {
+    const Pipes pipes;
+    const pid_t pid = ::fork();
+    if (pid == 0) {
+        ::dup2(pipes.out[1], 1);
+        ::dup2(pipes.err[1], 2);
+        ::dup2(pipes.in[0], 0);
+        char* const arguments[] = {const_cast<char*>(program), nullptr};
+        ::execve(program, arguments, environ);
+        ::_exit(127);
+    }
+    finish(pipes, pid);
+}
+
+void runWithSpawn(const char* program) {
+    const Pipes pipes;
+    posix_spawn_file_actions_t actions;
+    ::posix_spawn_file_actions_init(&actions);
+    ::posix_spawn_file_actions_adddup2(&actions, pipes.out[1], 1);
+    ::posix_spawn_file_actions_adddup2(&actions, pipes.err[1], 2);
+    ::posix_spawn_file_actions_adddup2(&actions, pipes.in[0], 0);
+    char* const arguments[] = {const_cast<char*>(program), nullptr};
+    pid_t pid = 0;
+    const int error = ::posix_spawn(&pid, program, &actions, nullptr, arguments, environ);
+    ::posix_spawn_file_actions_destroy(&actions);
+    if (error != 0) throw std::runtime_error("no child");
+    finish(pipes, pid);
+}
+
+void runCommand(const ZAV::String& command) {
+    int rc = -1;
+    ZAV::String out;
+    ZAV::String err;
+    if (!ZAV::Util::runCommand(command, rc, out, err, ZAV::String(), false) || rc != 0) {
+        throw std::runtime_error("no run");
+    }
+}
+
+/// The durations of one way to run a command.
+class Samples {
+public:
+    template <typename Work>
+    void time(const Work& work) {
+        const auto start = std::chrono::steady_clock::now();
+        work();
+        values_.push_back(Microseconds(std::chrono::steady_clock::now() - start).count());
+    }
+    double quantile(double q) {
+        std::sort(values_.begin(), values_.end());
+        return values_[static_cast<std::size_t>(q * static_cast<double>(values_.size() - 1))];
+    }
+
+private:
+    std::vector<double> values_;
+};
+
+/// Touched memory in small pages, as a large process has it.
+class Heap {
+public:
+    explicit Heap(std::size_t bytes) : bytes_(bytes) {
+        if (bytes == 0) return;
+        memory_ =
+            ::mmap(nullptr, bytes, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+        if (memory_ == MAP_FAILED) throw std::bad_alloc();
+        ::madvise(memory_, bytes, MADV_NOHUGEPAGE);
+        for (std::size_t at = 0; at < bytes; at += 4096)
+            static_cast<char*>(memory_)[at] = 1;
+    }
+    ~Heap() {
+        if (bytes_ != 0) ::munmap(memory_, bytes_);
+    }
+    Heap(const Heap&) = delete;
+    Heap& operator=(const Heap&) = delete;
+
+private:
+    std::size_t bytes_;
+    void* memory_ = nullptr;
+};
+
+/// The medians of runs at a small heap, by program.
+std::map<std::string, double>& smallMedians() {
+    static std::map<std::string, double> medians;
+    return medians;
+}
+
+void compare(benchmark::State& state, const std::string& program, std::size_t heapBytes) {
+    const Heap heap(heapBytes);
+    const ZAV::String command(program.c_str());
+    Samples run, forked, spawned;
+    const std::array<std::function<void()>, 3> ways = {
+        [&] { run.time([&] { runCommand(command); }); },
+        [&] { forked.time([&] { runWithFork(program.c_str()); }); },
+        [&] { spawned.time([&] { runWithSpawn(program.c_str()); }); }};
+    std::size_t turn = 0;
+    for (auto _ : state) {
+        for (std::size_t i = 0; i < ways.size(); ++i)
+            ways[(turn + i) % ways.size()]();
+        ++turn;
+    }
+    state.counters["run"] = run.quantile(0.5);
+    state.counters["fork"] = forked.quantile(0.5);
+    state.counters["spawn"] = spawned.quantile(0.5);
+    state.counters["run/fork"] = run.quantile(0.5) / forked.quantile(0.5);
+    state.counters["run/spawn"] = run.quantile(0.5) / spawned.quantile(0.5);
+    state.counters["run_p99"] = run.quantile(0.99);
+    state.counters["spawn_p99"] = spawned.quantile(0.99);
+    state.counters["p99_run/spawn"] = run.quantile(0.99) / spawned.quantile(0.99);
+    if (heapBytes == 0) smallMedians()[program] = run.quantile(0.5);
+    const auto own = smallMedians().find(program);
+    if (heapBytes != 0 && own != smallMedians().end()) {
+        state.counters["own"] = run.quantile(0.5) / own->second;
+    }
+}
+
+/// An executable file that goes when the object does.
+class TemporaryFile {
+public:
+    explicit TemporaryFile(const std::string& text) {
+        const int fd = ::mkstemp(path_);
+        if (fd < 0 || ::fchmod(fd, 0700) != 0) throw std::runtime_error("no file");
+        for (std::size_t at = 0; at < text.size();) {
+            const ssize_t written = ::write(fd, text.data() + at, text.size() - at);
+            if (written <= 0) throw std::runtime_error("no space");
+            at += static_cast<std::size_t>(written);
+        }
+        ::close(fd);
+    }
+    ~TemporaryFile() { ::unlink(path_); }
+    TemporaryFile(const TemporaryFile&) = delete;
+    TemporaryFile& operator=(const TemporaryFile&) = delete;
+
+    const char* path() const { return path_; }
+
+private:
+    char path_[32] = "/tmp/zavbench.XXXXXX";
+};
+
+/// The cost of collecting an output of that many bytes.
+void collect(benchmark::State& state) {
+    const TemporaryFile file(std::string(static_cast<std::size_t>(state.range(0)), 'x'));
+    const ZAV::String command((std::string("/bin/cat ") + file.path()).c_str());
+    Samples run;
+    for (auto _ : state)
+        run.time([&] { runCommand(command); });
+    state.counters["run"] = run.quantile(0.5);
+    state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * state.range(0));
+}
+
+void add(const std::string& name, const std::string& program, std::size_t heapBytes,
+         benchmark::IterationCount turns) {
+    benchmark::RegisterBenchmark(
+        name.c_str(),
+        [program, heapBytes](benchmark::State& state) { compare(state, program, heapBytes); })
+        ->Iterations(turns)
+        ->Unit(benchmark::kMillisecond);
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    ::unsetenv("KBB_RAS1");
+    benchmark::Initialize(&argc, argv);
+    const TemporaryFile script("#!/bin/sh\necho one line\n");
+    add("true/small", "/bin/true", 0, 1000);
+    add("script/small", script.path(), 0, 1000);
+    add("true/1GiB", "/bin/true", std::size_t{1} << 30, 300);
+    add("script/1GiB", script.path(), std::size_t{1} << 30, 300);
+    benchmark::RegisterBenchmark("output", collect)
+        ->RangeMultiplier(2)
+        ->Range(16 << 10, 64 << 20)
+        ->Iterations(11)
+        ->UseRealTime()
+        ->Unit(benchmark::kMillisecond);
+    benchmark::RunSpecifiedBenchmarks();
+    benchmark::Shutdown();
+    return 0;
+}

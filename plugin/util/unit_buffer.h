@@ -1,0 +1,56 @@
+/// UTF-16 units that are collected piece by piece.
+#pragma once
+
+#include <algorithm>
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+#include <new>
+#include <stdexcept>
+
+#include "base/zavstr.h"
+
+namespace ZAV {
+
+/// A String grows by exactly what is appended, which copies all of it for every piece. This doubles
+/// its room, and through realloc, which moves the pages of large blocks in place of their bytes.
+class UnitBuffer {
+public:
+    void append(const String& piece) {
+        const std::size_t count = piece.length();
+        if (size_ + count >= String::NPOS) throw std::length_error("more than a String holds");
+        if (size_ + count > room_) grow(size_ + count);
+        if (count != 0) std::memcpy(units_.get() + size_, piece.getData(), count * kUnit);
+        size_ += count;
+    }
+
+    void copyTo(String& text) const {
+        text.clear();
+        if (size_ != 0) text.assign(units_.get(), static_cast<std::uint32_t>(size_));
+    }
+
+private:
+    static constexpr std::size_t kUnit = sizeof(unsigned short);
+    static constexpr std::size_t kFirstRoom = 1024;
+
+    struct Freed {
+        void operator()(void* block) const { std::free(block); }
+    };
+
+    void grow(std::size_t needed) {
+        const std::size_t room = std::max({needed, 2 * room_, kFirstRoom});
+        if (room > SIZE_MAX / kUnit) throw std::bad_alloc();
+        void* const block = std::realloc(units_.get(), room * kUnit);
+        if (block == nullptr) throw std::bad_alloc();
+        (void)units_.release();  // realloc has taken it over
+        units_.reset(static_cast<unsigned short*>(block));
+        room_ = room;
+    }
+
+    std::unique_ptr<unsigned short, Freed> units_;
+    std::size_t size_ = 0;
+    std::size_t room_ = 0;
+};
+
+}  // namespace ZAV

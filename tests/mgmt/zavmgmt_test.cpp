@@ -1,0 +1,158 @@
+// Start-up. What only a fresh process can show is skipped in one that has started already.
+// ctest-label: threaded
+#include "mgmt/zavmgmt.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "embedded/oxa_host.h"
+#include "support/fake_sleep.h"
+#include "support/outcomes.h"
+#include "support/row_text.h"
+#include "support/scoped_env.h"
+#include "support/script_home.h"
+#include "support/trace_capture.h"
+#include "tables/zav01agt.h"
+#include "tables/zav02agt.h"
+#include "tables/zav03agt.h"
+#include "tasks/zavtasks.h"
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+std::ptrdiff_t threadCount() {
+    const std::filesystem::directory_iterator threads("/proc/self/task");
+    return std::distance(begin(threads), end(threads));
+}
+
+Texts tableNames() {
+    Texts names;
+    for (const oxa::Table& table : oxa::tables())
+        names.push_back(table.name);
+    return names;
+}
+
+bool isStarted() {
+    return zav_kagreqt_static_manager != nullptr;
+}
+
+/// The home of all cases of this process, since start-up keeps what it finds.
+ScriptHome& home() {
+    static ScriptHome& instance = *new ScriptHome;
+    return instance;
+}
+
+class StartUp : public testing::Test {
+protected:
+    StartUp() { fake_sleep::reset(); }
+    ~StartUp() override { ::unsetenv("TOVRINHOME"); }
+
+    static void TearDownTestSuite() { std::filesystem::remove_all(home().files().path()); }
+
+    static void setHome(const std::string& path) { ::setenv("TOVRINHOME", path.c_str(), 1); }
+
+    const ScopedEnv depot_{"QVSDEPLOY_AGENTDEPOT", home().files().makeDir("depot")};
+};
+
+TEST_F(StartUp, WithoutAHomeTheLibraryStaysInert) {
+    if (isStarted()) GTEST_SKIP() << "started by an earlier case of this process";
+    ::unsetenv("TOVRINHOME");
+    const std::ptrdiff_t threads = threadCount();
+    TraceCapture trace;
+    EXPECT_EQ(0, Initialize_Mgmt_Functions());
+    EXPECT_EQ((Texts{"No value for TOVRINHOME - MANAGEMENT FUNCTIONS DISABLED"}), trace.errors());
+    EXPECT_TRUE(trace.details("zavmgmt").empty());
+    EXPECT_EQ(nullptr, ZAV_TOVRINHOME);
+    EXPECT_EQ(Texts{}, tableNames());
+    oxa::Rows rows;
+    EXPECT_EQ(OXA_GONE, oxa::query("KAGREQT", {}, rows));
+    EXPECT_EQ(nullptr, zav_kagreqt_static_manager);
+    EXPECT_EQ(nullptr, zav_kinagt_static_manager);
+    EXPECT_EQ(nullptr, zav_kagdyst_static_manager);
+    EXPECT_FALSE(initialized);
+    EXPECT_EQ(threads, threadCount());
+}
+
+TEST_F(StartUp, TheHomeIsTheVariablesValueItself) {
+    setHome("/opt/tovrin");
+    EXPECT_EQ(::getenv("TOVRINHOME"), Initialize_Tovrin_Home());
+    EXPECT_EQ(::getenv("TOVRINHOME"), ZAV_TOVRINHOME);
+    ::unsetenv("TOVRINHOME");
+    TraceCapture trace;
+    EXPECT_EQ(nullptr, Initialize_Tovrin_Home());
+    EXPECT_EQ(nullptr, ZAV_TOVRINHOME);
+    EXPECT_EQ((Texts{"No value for TOVRINHOME - MANAGEMENT FUNCTIONS DISABLED"}), trace.errors());
+}
+
+TEST_F(StartUp, AnEmptyHomeCountsAsOne) {
+    if (isStarted()) GTEST_SKIP() << "started by an earlier case of this process";
+    const ScopedEnv noDepot("QVSDEPLOY_AGENTDEPOT", nullptr);
+    setHome("");
+    TraceCapture trace;
+    EXPECT_EQ(0, Initialize_Mgmt_Functions());
+    ASSERT_NE(nullptr, ZAV_TOVRINHOME);
+    EXPECT_STREQ("", ZAV_TOVRINHOME);
+    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST"}), tableNames());
+    EXPECT_EQ(1, trace.count('E', "ZAV1010E No Agent Depot directory set"));
+    EXPECT_FALSE(initialized);
+}
+
+TEST_F(StartUp, RegistersEverythingInOrder) {
+    setHome(home().path());
+    TraceCapture trace;
+    EXPECT_EQ(0, Initialize_Mgmt_Functions());
+    EXPECT_EQ(
+        (Texts{"Calling ZAV Table initialization", "Calling ZAV Task Manager initialization",
+               "Calling ZAV RPC calls initialization", "Done calling ZAV initialization routines"}),
+        trace.details("zavmgmt"));
+    Texts initialisers;
+    for (const TraceLine& line : trace.lines()) {
+        const bool isEntry = line.level == 'F' && line.text.compare(0, 5, "Entry") == 0;
+        const bool isOne =
+            line.function.size() > 5 && (line.function.rfind("_init") == line.function.size() - 5 ||
+                                         line.function == "QVS_NCS_RegisterAgentInterface");
+        if (isEntry && isOne) initialisers.push_back(line.function);
+    }
+    EXPECT_EQ((Texts{"zav_kagreqt_init", "zav_kinagt_init", "zav_kagdyst_init", "zav_taskmgr_init",
+                     "QVS_NCS_RegisterAgentInterface"}),
+              initialisers);
+    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST"}), tableNames());
+    EXPECT_TRUE(initialized);
+    EXPECT_EQ(9u, commands.size());
+}
+
+TEST_F(StartUp, ASecondCallStartsNoSecondExecutor) {
+    setHome(home().path());
+    ASSERT_EQ(0, Initialize_Mgmt_Functions());
+    const std::ptrdiff_t threads = threadCount();
+    zav_kagreqt_manager* const former = zav_kagreqt_static_manager;
+    EXPECT_EQ(0, Initialize_Mgmt_Functions());
+    EXPECT_EQ(threads, threadCount());
+    EXPECT_NE(former, zav_kagreqt_static_manager);
+    EXPECT_EQ(9u, commands.size());
+    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST"}), tableNames());
+}
+
+TEST_F(StartUp, ARequestTravelsTheWholeWay) {
+    setHome(home().path());
+    ASSERT_EQ(0, Initialize_Mgmt_Functions());
+    Outcomes outcomes({{"TRANSID", OPER_EQ, "tx-1"}});
+    oxa::Rows rows;
+    ASSERT_EQ(0, oxa::query("KAGREQT",
+                            {{"COMMAND", OPER_EQ, "START"},
+                             {"TRANSID", OPER_EQ, "tx-1"},
+                             {"PRODUCT", OPER_EQ, "ux"}},
+                            rows));
+    ASSERT_EQ(1u, rows.count());
+    const auto found = outcomes.waitFor(1);
+    ASSERT_EQ(1u, found.size());
+    EXPECT_EQ(0, found[0].retval);
+    EXPECT_EQ("-h " + home().path() + " start ux", home().agentCalls().back());
+}
+
+}  // namespace

@@ -1,0 +1,133 @@
+// Tables when memory runs out: what is answered, and that nothing is thrown at the framework. The
+// operator below serves this whole program.
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <new>
+
+#include "embedded/oxa_internal.h"
+#include "tables/zav01agt.h"
+#include "tables/zav02agt.h"
+#include "tables/zav03agt.h"
+
+namespace {
+
+/// How many allocations of this thread succeed before one fails; none fails while negative.
+thread_local long allocationsLeft = -1;
+
+bool mayAllocate() {
+    if (allocationsLeft < 0) return true;
+    return allocationsLeft-- > 0;
+}
+
+}  // namespace
+
+void* operator new(std::size_t size) {
+    void* const block = mayAllocate() ? std::malloc(size == 0 ? 1 : size) : nullptr;
+    if (block == nullptr) throw std::bad_alloc();
+    return block;
+}
+void* operator new[](std::size_t size) {
+    return operator new(size);
+}
+void operator delete(void* block) noexcept {
+    std::free(block);
+}
+void operator delete[](void* block) noexcept {
+    std::free(block);
+}
+void operator delete(void* block, std::size_t) noexcept {
+    std::free(block);
+}
+void operator delete[](void* block, std::size_t) noexcept {
+    std::free(block);
+}
+
+namespace {
+
+/// Runs `body` with one failing allocation after 0, 1, 2, ... others, until none fails any more;
+/// checks each result. Returns how many runs met a failure.
+template <typename Body, typename Check>
+int withEveryFailure(const Body& body, const Check& check) {
+    for (long count = 0; count < 10000; ++count) {
+        allocationsLeft = count;
+        const auto result = body();
+        const bool failed = allocationsLeft < 0;
+        allocationsLeft = -1;
+        if (!failed) return static_cast<int>(count);
+        check(result);
+    }
+    return -1;
+}
+
+template <typename Manager>
+void expectInitFails(int (*init)(), Manager*& staticManager) {
+    Manager* const former = staticManager;
+    allocationsLeft = 0;
+    const int status = init();
+    allocationsLeft = -1;
+    EXPECT_EQ(0x21060002, status);
+    EXPECT_EQ(former, staticManager);
+}
+
+TEST(OutOfMemory, WithoutAManagerNothingIsRegistered) {
+    expectInitFails(zav_kagreqt_init, zav_kagreqt_static_manager);
+    expectInitFails(zav_kinagt_init, zav_kinagt_static_manager);
+    expectInitFails(zav_kagdyst_init, zav_kagdyst_static_manager);
+}
+
+TEST(OutOfMemory, ARequestThatCannotBeMadeIsNone) {
+    ASSERT_EQ(0, zav_kagreqt_init());
+    const std::vector<oxa::Predicate> where = {{"COMMAND", OPER_EQ, "START"},
+                                               {"TRANSID", OPER_EQ, "tx"}};
+    RequestDetail detail{where};
+    ContextInfo context;
+    const auto make = [&] {
+        std::unique_ptr<rtoxa> made(zav_kagreqt_static_manager->CreateRtoxa(&detail, &context));
+        return made != nullptr;
+    };
+    ASSERT_TRUE(make());  // so that what is made once for all requests is there
+    EXPECT_LT(10, withEveryFailure(make, [](bool made) { EXPECT_FALSE(made); }));
+}
+
+TEST(OutOfMemory, ASampleThatRunsOutOfMemorySaysSo) {
+    ASSERT_EQ(0, zav_kagreqt_init());
+    const std::vector<oxa::Predicate> where = {{"COMMAND", OPER_EQ, "START"},
+                                               {"TRANSID", OPER_EQ, "tx"}};
+    RequestDetail detail{where};
+    ContextInfo context;
+    std::unique_ptr<rtoxa> request;
+    const auto sample = [&] { return request->TakeSample(); };
+    const auto remake = [&] {
+        const long kept = std::exchange(allocationsLeft, -1);
+        request.reset(zav_kagreqt_static_manager->CreateRtoxa(&detail, &context));
+        allocationsLeft = kept;
+    };
+    remake();
+    ASSERT_EQ(0, sample());
+    const int failures = withEveryFailure(
+        [&] {
+            remake();
+            return sample();
+        },
+        [](int status) { EXPECT_TRUE(status == 0 || status == OXA_NO_MEMORY) << status; });
+    EXPECT_LT(10, failures);
+}
+
+TEST(OutOfMemory, AnEventIsNotThrownBack) {
+    ASSERT_EQ(0, zav_kagdyst_init());
+    std::size_t delivered = 0;
+    const auto subscription = oxa::subscribe("KAGDYST", {}, [&](const oxa::Rows& rows) {
+        delivered += rows.count();
+        return 0;
+    });
+    zav_kagdyst_data_t row;
+    std::memset(&row, ' ', sizeof row);
+    withEveryFailure([&] { return publishDeployStatus(&row, 1); }, [](int) {});
+    delivered = 0;
+    EXPECT_EQ(0, publishDeployStatus(&row, 1));
+    EXPECT_EQ(1u, delivered);
+}
+
+}  // namespace

@@ -1,0 +1,392 @@
+#include "tables/zav01agt.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <string>
+#include <vector>
+
+#include "support/fake_sleep.h"
+#include "support/row_text.h"
+#include "support/scoped_env.h"
+#include "support/trace_capture.h"
+#include "tables/table_checks.h"
+#include "tasks/home.h"
+#include "tasks/zavtasks.h"
+
+namespace {
+
+using Texts = std::vector<std::string>;
+using Made = MadeRequest<zav_kagreqt_manager, zav_kagreqt_agent>;
+
+const std::vector<ExpectedColumn> kColumns = {
+    {"ORIGINNODE", "originnode", 0, 64, 9},  {"TRANSID", "transid", 64, 84, 9},
+    {"COMMAND", "command", 148, 16, 9},      {"PRODUCT", "product", 164, 32, 9},
+    {"CONTEXT", "context", 196, 3072, 9},    {"OPTIONAL", "optional", 3268, 32, 9},
+    {"UACONFIG", "uaconfig", 3300, 32, 9},   {"UASCRIPT", "uascript", 3332, 512, 9},
+    {"RETVAL", "retval", 3844, 4, 3},        {"VERSION", "version", 3848, 12, 9},
+    {"RETMSGID", "retmsgid", 3860, 16, 9},   {"RETMSGPARM", "retmsgparm", 3876, 256, 9},
+    {"TARGETMSN", "targetmsn", 4132, 64, 9},
+};
+
+zav_kagreqt_data_t rowOf(const char* transid, int retval = 0) {
+    TaskQueueElem task;
+    task.setTransid(transid);
+    task.ReturnStatus(retval);
+    return task.getReturnResults();
+}
+
+/// The table as requesters see it, with all commands supported and no executor.
+class RequestTable : public testing::Test {
+protected:
+    RequestTable() {
+        oxa::setOriginNode("this-node");
+        zav_kagreqt_init();
+        commands.clear();
+        for (const char* command : {"START", "STOP", "RESTART", "INSTALL", "UNINSTALL", "GETCONFIG",
+                                    "SETCONFIG", "COMPLETE_INSTALL", "REMOVEINSTANCE"}) {
+            commands.push_back(command);
+        }
+        taskQueue = {};
+        fake_sleep::reset();
+    }
+
+    static std::vector<zav_kagreqt_data_t> query(const std::vector<oxa::Predicate>& where) {
+        oxa::Rows rows;
+        EXPECT_EQ(0, oxa::query("KAGREQT", where, rows));
+        std::vector<zav_kagreqt_data_t> found(rows.count());
+        if (!found.empty()) std::memcpy(found.data(), rows.bytes.data(), rows.bytes.size());
+        return found;
+    }
+
+    /// The one row that answers a request.
+    static zav_kagreqt_data_t answer(const std::vector<oxa::Predicate>& where) {
+        const auto rows = query(where);
+        EXPECT_EQ(1u, rows.size());
+        return rows.empty() ? zav_kagreqt_data_t{} : rows[0];
+    }
+};
+
+// ---- Schema
+// --------------------------------------------------------------------------------------
+
+TEST(RequestTableSchema, DescribesItsColumns) {
+    Made request("KAGREQT");
+    expectColumns(*request, kColumns);
+    expectColumnBounds(*request);
+}
+
+TEST(RequestTableSchema, ComparesColumnsByTheirAttributeNames) {
+    Made request("KAGREQT");
+    expectComparisons(*request, 4196, kColumns);
+}
+
+TEST(RequestTableSchema, KeepsTheFrameworksOrderOfVirtualFunctions) {
+    expectRequestSlots<zav_kagreqt_base, zav_kagreqt_agent>();
+    expectManagerSlots<zav_kagreqt_manager>();
+}
+
+TEST(RequestTableSchema, AccessorsPointIntoTheRow) {
+    Made request("KAGREQT");
+    zav_kagreqt_data_t rows[] = {rowOf("tx-0", 10), rowOf("tx-1", 11)};
+    ASSERT_EQ(0, request->AddData(rows, 2));
+    ASSERT_EQ(2, request->NumDataItems());
+    char* const base = request->Data(1);
+    EXPECT_EQ(base + 0, request->_get_value_originnode(1));
+    EXPECT_EQ(base + 64, request->_get_value_transid(1));
+    EXPECT_EQ(base + 148, request->_get_value_command(1));
+    EXPECT_EQ(base + 164, request->_get_value_product(1));
+    EXPECT_EQ(base + 196, request->_get_value_context(1));
+    EXPECT_EQ(base + 3268, request->_get_value_optional(1));
+    EXPECT_EQ(base + 3300, request->_get_value_uaconfig(1));
+    EXPECT_EQ(base + 3332, request->_get_value_uascript(1));
+    EXPECT_EQ(base + 3844, reinterpret_cast<char*>(request->_get_value_retval(1)));
+    EXPECT_EQ(base + 3848, request->_get_value_version(1));
+    EXPECT_EQ(base + 3860, request->_get_value_retmsgid(1));
+    EXPECT_EQ(base + 3876, request->_get_value_retmsgparm(1));
+    EXPECT_EQ(base + 4132, request->_get_value_targetmsn(1));
+    EXPECT_EQ(11, *request->_get_value_retval(1));
+    EXPECT_EQ(base, reinterpret_cast<char*>(request->GetRow(1)));
+}
+
+TEST(RequestTableSchema, DataIndexesAreThoseOfHeldRows) {
+    Made request("KAGREQT");
+    EXPECT_FALSE(request->CheckDataIndex(0));
+    zav_kagreqt_data_t row = rowOf("tx");
+    request->AddData(&row, 1);
+    EXPECT_TRUE(request->CheckDataIndex(0));
+    EXPECT_FALSE(request->CheckDataIndex(1));
+    EXPECT_FALSE(request->CheckDataIndex(-1));
+}
+
+TEST(RequestTableSchema, MakesRoomForOneRowAtATime) {
+    Made request("KAGREQT");
+    EXPECT_EQ(1u, request->AllocationDefault());
+}
+
+TEST(RequestTableSchema, AddsOnlyRowsThatTheFilterWants) {
+    Made request("KAGREQT", {{"TRANSID", OPER_EQ, "x"}});
+    zav_kagreqt_data_t rows[] = {rowOf("x", 1), rowOf("y", 2), rowOf("x", 3)};
+    TraceCapture trace;
+    EXPECT_EQ(0, request->AddData(rows, 3));
+    EXPECT_EQ((Texts{"Passing row 0 to InsertRow().", "Passing row 2 to InsertRow()."}),
+              trace.details("zav01agt"));
+    ASSERT_EQ(2, request->NumDataItems());
+    EXPECT_EQ(3, *request->_get_value_retval(1));
+    EXPECT_EQ(1, request->IsRowException(&rows[0]));
+    EXPECT_EQ(0, request->IsRowException(&rows[1]));
+}
+
+TEST(RequestTableSchema, AddingNothingSucceeds) {
+    Made request("KAGREQT");
+    EXPECT_EQ(0, request->AddData(nullptr, 0));
+    EXPECT_EQ(0, request->NumDataItems());
+}
+
+TEST(RequestTableSchema, PrintsItselfAndItsRows) {
+    Made request("KAGREQT");
+    TaskQueueElem task("node", "tx", "START", "ux", "ctx", "opt", "conf", "script", "0620", "m:UX");
+    task.setRetmsgid("ZAV1024E");
+    task.setRetmsgparm("parm");
+    task.ReturnStatus(1024);
+    zav_kagreqt_data_t row = task.getReturnResults();
+    request->AddData(&row, 1);
+    TraceCapture trace;
+    request->PrintSelf();
+    Texts lines = trace.details("zav01agt");
+    ASSERT_LE(4u, lines.size());
+    char head[100];
+    std::snprintf(head, sizeof head, "zav_kagreqt_base @%p <%u,%u>",
+                  static_cast<const void*>(&*request), request->ObjectNumber(),
+                  request->UseCount());
+    const Texts expected = {
+        head,
+        "\t::appl=ZAV,table=KAGREQT,interval=0,samptype=0",
+        "\t_data {",
+        "\t\tcount=1, allocated=1, allocSize=1",
+        "\t\t{",
+        "\t\toriginnode=\"" + padded("node", 64) + "\"",
+        "\t\ttransid=\"" + padded("tx", 84) + "\"",
+        "\t\tcommand=\"" + padded("START", 16) + "\"",
+        "\t\tproduct=\"" + padded("ux", 32) + "\"",
+        "\t\tcontext=\"" + padded("ctx", 3072) + "\"",
+        "\t\toptional=\"" + padded("opt", 32) + "\"",
+        "\t\tuaconfig=\"" + padded("conf", 32) + "\"",
+        "\t\tuascript=\"" + padded("script", 512) + "\"",
+        "\t\tretval=1024",
+        "\t\tversion=\"" + padded("0620", 12) + "\"",
+        "\t\tretmsgid=\"" + padded("ZAV1024E", 16) + "\"",
+        "\t\tretmsgparm=\"" + padded("parm", 256) + "\"",
+        "\t\ttargetmsn=\"" + padded("m:UX", 64) + "\"",
+        "\t\t}",
+        "\t}",
+    };
+    EXPECT_EQ(expected, lines);
+}
+
+TEST(RequestTableSchema, PrintsNothingWhenDetailIsOff) {
+    Made request("KAGREQT");
+    TraceCapture trace("ERROR");
+    request->PrintSelf();
+    EXPECT_TRUE(trace.lines().empty());
+}
+
+// ---- Start-up
+// ------------------------------------------------------------------------------------
+
+TEST(RequestTableInit, RegistersTheTable) {
+    EXPECT_STREQ("ZAV", zav_kagreqt_application);
+    EXPECT_STREQ("KAGREQT", zav_kagreqt_table);
+    zav_kagreqt_manager* const former = zav_kagreqt_static_manager;
+    EXPECT_EQ(0, zav_kagreqt_init());
+    ASSERT_NE(nullptr, zav_kagreqt_static_manager);
+    EXPECT_NE(former, zav_kagreqt_static_manager);
+    EXPECT_STREQ("ZAV", zav_kagreqt_static_manager->ApplicationName());
+    EXPECT_STREQ("KAGREQT", zav_kagreqt_static_manager->TableName());
+    bool found = false;
+    for (const oxa::Table& table : oxa::tables()) {
+        found = found || (table.application == "ZAV" && table.name == "KAGREQT");
+    }
+    EXPECT_TRUE(found);
+}
+
+// ---- Requests
+// ------------------------------------------------------------------------------------
+
+TEST_F(RequestTable, ARequestWithoutFilterIs1002) {
+    const zav_kagreqt_data_t row = answer({});
+    EXPECT_EQ(1002, row.retval);
+    EXPECT_EQ(padded("ZAV1002E", 16), fieldText(row.retmsgid));
+    EXPECT_EQ(padded("", 256), fieldText(row.retmsgparm));
+    EXPECT_EQ(padded("this-node", 64), fieldText(row.originnode));
+    EXPECT_EQ(padded("", 84), fieldText(row.transid));
+}
+
+TEST_F(RequestTable, TheAnswerRepeatsTheRequest) {
+    const zav_kagreqt_data_t row = answer({{"TRANSID", OPER_EQ, "tx-1"},
+                                           {"COMMAND", OPER_EQ, "START"},
+                                           {"PRODUCT", OPER_EQ, "ux"},
+                                           {"CONTEXT", OPER_EQ, "ctx"},
+                                           {"OPTIONAL", OPER_EQ, "opt"},
+                                           {"UACONFIG", OPER_EQ, "conf"},
+                                           {"UASCRIPT", OPER_EQ, "script"},
+                                           {"VERSION", OPER_EQ, "0620"},
+                                           {"TARGETMSN", OPER_EQ, "m:UX"}});
+    EXPECT_EQ("this-node", trimmedField(row.originnode));
+    EXPECT_EQ("tx-1", trimmedField(row.transid));
+    EXPECT_EQ("START", trimmedField(row.command));
+    EXPECT_EQ("ux", trimmedField(row.product));
+    EXPECT_EQ("ctx", trimmedField(row.context));
+    EXPECT_EQ("opt", trimmedField(row.optional));
+    EXPECT_EQ("conf", trimmedField(row.uaconfig));
+    EXPECT_EQ("script", trimmedField(row.uascript));
+    EXPECT_EQ("0620", trimmedField(row.version));
+    EXPECT_EQ("m:UX", trimmedField(row.targetmsn));
+    EXPECT_EQ(0, row.retval);
+    EXPECT_EQ("", trimmedField(row.retmsgid));
+    ASSERT_EQ(1u, taskQueue.size());
+    EXPECT_TRUE(taskQueue.front().getTransid() == "tx-1");
+}
+
+TEST_F(RequestTable, LowerCaseNamesMatchNothing) {
+    const zav_kagreqt_data_t row = answer(
+        {{"transid", OPER_EQ, "tx"}, {"command", OPER_EQ, "START"}, {"product", OPER_EQ, "ux"}});
+    EXPECT_EQ(1002, row.retval);
+    EXPECT_EQ("ZAV1002E", trimmedField(row.retmsgid));
+    EXPECT_TRUE(taskQueue.empty());
+}
+
+TEST_F(RequestTable, AColumnNamedTwiceKeepsTheLastValue) {
+    const std::vector<oxa::Predicate> where = {{"TRANSID", OPER_EQ, "tx"},
+                                               {"COMMAND", OPER_EQ, "GETCONFIG"},
+                                               {"COMMAND", OPER_EQ, "STOP"}};
+    Made request("KAGREQT", where);
+    TraceCapture trace;
+    request->TakeSample();
+    EXPECT_EQ(1, trace.count('D', "Going to run command STOP"));
+}
+
+TEST_F(RequestTable, ColumnsOfTheOutcomeSayNothingAboutTheRequest) {
+    const zav_kagreqt_data_t row = answer({{"COMMAND", OPER_EQ, "START"},
+                                           {"TRANSID", OPER_EQ, "tx"},
+                                           {"PRODUCT", OPER_EQ, "ux"},
+                                           {"ORIGINNODE", OPER_NE, "elsewhere"},
+                                           {"RETVAL", OPER_LT, "5"},
+                                           {"RETMSGID", OPER_NE, "x"},
+                                           {"RETMSGPARM", OPER_NE, "x"}});
+    EXPECT_EQ("this-node", trimmedField(row.originnode));
+    EXPECT_EQ("", trimmedField(row.retmsgid));
+}
+
+TEST_F(RequestTable, TheAnswerMustSatisfyTheFilterToo) {
+    EXPECT_TRUE(query({{"COMMAND", OPER_EQ, "START"},
+                       {"TRANSID", OPER_EQ, "tx"},
+                       {"PRODUCT", OPER_EQ, "ux"},
+                       {"RETVAL", OPER_EQ, "1003"}})
+                    .empty());
+    EXPECT_EQ(1u, taskQueue.size());
+}
+
+TEST_F(RequestTable, ValuesAreTakenAsTheyAre) {
+    const zav_kagreqt_data_t row = answer(
+        {{"COMMAND", OPER_EQ, "START "}, {"TRANSID", OPER_EQ, " tx "}, {"PRODUCT", OPER_EQ, "ux"}});
+    EXPECT_EQ(1006, row.retval);
+    EXPECT_EQ(padded("START ", 256), fieldText(row.retmsgparm));
+    EXPECT_EQ(padded(" tx ", 84), fieldText(row.transid));
+}
+
+TEST_F(RequestTable, AValueThatWasCutStillGetsItsAnswer) {
+    const std::string context(3073, 'c');
+    TraceCapture trace;
+    const zav_kagreqt_data_t row = answer({{"COMMAND", OPER_EQ, "INSTALL"},
+                                           {"TRANSID", OPER_EQ, "tx"},
+                                           {"PRODUCT", OPER_EQ, "ux"},
+                                           {"VERSION", OPER_EQ, "0620"},
+                                           {"CONTEXT", OPER_EQ, context}});
+    EXPECT_EQ(0, row.retval);
+    EXPECT_EQ(std::string(3072, 'c'), fieldText(row.context));
+    EXPECT_EQ(1u, trace.errors("zavtqelm").size());
+    ASSERT_EQ(1u, taskQueue.size());
+    EXPECT_EQ(3073u, taskQueue.front().getContext().length());
+}
+
+TEST_F(RequestTable, AnAnswerIsTraced) {
+    TraceCapture trace;
+    answer({{"TRANSID", OPER_EQ, "tx"}});
+    EXPECT_EQ((Texts{"Passing row 0 to InsertRow()."}), trace.details("zav01agt"));
+}
+
+TEST_F(RequestTable, GetconfigIsAnsweredWithTheConfiguration) {
+    const ScratchDir scratch;
+    const std::string home = scratch.path();
+    scratch.script("bin/cinfo",
+                   "echo '\"ProdCode\",\"Description\",\"Platform\",\"Version\",\"Release\"'\n"
+                   "echo '\"ax\",\"Shared\",\"lx8266\",\"06200000\",\"100\"'\n");
+    const std::string translator = scratch.script(
+        "agtqvs6/lx8266/bin/zav_xa", "echo noise\necho INSTANCE=$2\nexit ${FAKE_EXIT:-0}\n");
+    ZAV_TOVRINHOME = home.c_str();
+    const std::vector<oxa::Predicate> where = {
+        {"COMMAND", OPER_EQ, "GETCONFIG"}, {"TRANSID", OPER_EQ, "tx"}, {"PRODUCT", OPER_EQ, "ux"}};
+    const zav_kagreqt_data_t good = answer(where);
+    EXPECT_EQ(0, good.retval) << trimmedField(good.retmsgparm);
+    EXPECT_EQ("INSTANCE=-pc", trimmedField(good.context).substr(0, 12));
+
+    const ScopedEnv failing("FAKE_EXIT", "3");
+    const zav_kagreqt_data_t bad = answer(where);
+    EXPECT_EQ(1008, bad.retval);
+    EXPECT_EQ("ZAV1008E", trimmedField(bad.retmsgid));
+    EXPECT_EQ("GETCONFIG,ux,", trimmedField(bad.retmsgparm).substr(0, 13));
+    ZAV_TOVRINHOME = nullptr;
+}
+
+// ---- Events
+// --------------------------------------------------------------------------------------
+
+class RequestEvents : public testing::Test {
+protected:
+    RequestEvents() { zav_kagreqt_init(); }
+
+    /// A subscription that answers every dispatch with `status`.
+    std::unique_ptr<oxa::Subscription> subscribe(int status,
+                                                 const std::vector<oxa::Predicate>& where = {}) {
+        return oxa::subscribe("KAGREQT", where, [this, status](const oxa::Rows& rows) {
+            delivered_ += rows.count();
+            return status;
+        });
+    }
+
+    std::size_t delivered_ = 0;
+};
+
+TEST_F(RequestEvents, ReachEverySubscriberWhoseFilterWantsThem) {
+    const auto all = subscribe(0);
+    const auto some = subscribe(0, {{"TRANSID", OPER_EQ, "x"}});
+    zav_kagreqt_data_t rows[] = {rowOf("x"), rowOf("y")};
+    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(rows, 2));
+    EXPECT_EQ(3u, delivered_);
+    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(rows, 1));
+    EXPECT_EQ(5u, delivered_);  // rows given once are not given again
+}
+
+TEST_F(RequestEvents, ReturnTheLastRefusal) {
+    const auto first = subscribe(OXA_OVERFLOW);
+    const auto second = subscribe(OXA_GONE);
+    const auto third = subscribe(0);
+    zav_kagreqt_data_t row = rowOf("x");
+    EXPECT_EQ(OXA_GONE, zav_kagreqt_manager::EventArrived(&row, 1));
+    EXPECT_EQ(3u, delivered_);
+}
+
+TEST_F(RequestEvents, WithoutSubscribersNothingHappens) {
+    zav_kagreqt_data_t row = rowOf("x");
+    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(&row, 1));
+}
+
+TEST_F(RequestEvents, WithoutManagerNothingHappens) {
+    zav_kagreqt_manager* const kept = std::exchange(zav_kagreqt_static_manager, nullptr);
+    zav_kagreqt_data_t row = rowOf("x");
+    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(&row, 1));
+    zav_kagreqt_static_manager = kept;
+}
+
+}  // namespace

@@ -1,0 +1,141 @@
+// Requests all the way through the executor, the real handlers and the programs of a scratch home.
+// ctest-label: threaded
+#include "tasks/zavtasks.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "support/fake_sleep.h"
+#include "support/outcomes.h"
+#include "support/row_text.h"
+#include "support/script_home.h"
+#include "support/trace_capture.h"
+#include "tasks/home.h"
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+/// One home for all cases of the process: what start-up finds out once stays.
+struct ManagedHome : ScriptHome {
+    ManagedHome() {
+        static std::string& kept = *new std::string(path());
+        ZAV_TOVRINHOME = kept.c_str();
+        ::setenv("TOVRINHOME", kept.c_str(), 1);
+        ::setenv("QVSDEPLOY_AGENTDEPOT", files().makeDir("depot").c_str(), 1);
+        zav_taskmgr_init();
+    }
+};
+
+class TaskManager : public testing::Test {
+protected:
+    TaskManager() : home_(managedHome()) {
+        fake_sleep::reset();
+        home_.agentScript("exit 0");
+    }
+
+    static ManagedHome& managedHome() {
+        static ManagedHome& home = *new ManagedHome;
+        return home;
+    }
+
+    static void TearDownTestSuite() { std::filesystem::remove_all(managedHome().files().path()); }
+
+    static TaskQueueElem request(const std::string& transid, const char* command,
+                                 const char* product, const char* context = "",
+                                 const char* optional = "", const char* target = "") {
+        return TaskQueueElem("node", transid.c_str(), command, product, context, optional, "", "",
+                             "062000000", target);
+    }
+
+    /// Runs an accepted request; its one outcome.
+    zav_kagdyst_data_t outcomeOf(TaskQueueElem task) {
+        Outcomes outcomes(
+            {{"TRANSID", OPER_EQ, static_cast<const char*>(task.getTransid().c_str())}});
+        EXPECT_EQ(0, runTask(task));
+        EXPECT_EQ("", trimmedField(task.getReturnResults().retmsgid));
+        const auto rows = outcomes.waitFor(1);
+        if (rows.empty()) throw std::runtime_error("no outcome");
+        return rows[0];
+    }
+
+    std::string scriptLine(const std::string& options) const {
+        return home_.path() + "/bin/TovrinAgent  -h " + home_.path() + " " + options;
+    }
+
+    ManagedHome& home_;
+};
+
+TEST_F(TaskManager, StartsAnAgentThroughTheScript) {
+    const std::size_t before = home_.agentCalls().size();
+    const zav_kagdyst_data_t row = outcomeOf(request("t1", "START", "ux"));
+    EXPECT_EQ(0, row.retval);
+    EXPECT_EQ("START", trimmedField(row.command));
+    EXPECT_EQ("node", trimmedField(row.originnode));
+    EXPECT_EQ("", trimmedField(row.retmsgparm));
+    const Texts calls = home_.agentCalls();
+    ASSERT_EQ(before + 1, calls.size());
+    EXPECT_EQ("-h " + home_.path() + " start ux", calls.back());
+}
+
+TEST_F(TaskManager, TheTargetOfAStartMayBeTheInstance) {
+    const zav_kagdyst_data_t row = outcomeOf(request("t2", "START", "ux", "", "INSTANCE", "inst1"));
+    EXPECT_EQ(0, row.retval);
+    EXPECT_EQ("inst1", trimmedField(row.targetmsn));
+    EXPECT_EQ("-h " + home_.path() + " -o inst1 start ux", home_.agentCalls().back());
+}
+
+TEST_F(TaskManager, AFailedStartIsReportedWithItsCommandLine) {
+    home_.agentScript("exit 7");
+    const zav_kagdyst_data_t row = outcomeOf(request("t3", "START", "nope"));
+    EXPECT_EQ(1024, row.retval);
+    EXPECT_EQ("ZAV1024E", trimmedField(row.retmsgid));
+    EXPECT_EQ(padded(scriptLine("start nope"), 256), fieldText(row.retmsgparm));
+}
+
+TEST_F(TaskManager, ARestartThatOnlyFailedToStopSucceedsWithTheStopsMessage) {
+    home_.agentScript("[ $verb = start ]");
+    const zav_kagdyst_data_t row = outcomeOf(request("t4", "RESTART", "ux"));
+    EXPECT_EQ(0, row.retval);
+    EXPECT_EQ("ZAV1024E", trimmedField(row.retmsgid));
+    EXPECT_EQ(padded(scriptLine("-c stop ux"), 256), fieldText(row.retmsgparm));
+}
+
+TEST_F(TaskManager, AnInstallRunsItsCommand) {
+    const std::string made = home_.files().path("made");
+    const std::string command = "/bin/sh -c 'echo done >" + made + "'";
+    const zav_kagdyst_data_t row = outcomeOf(request("t5", "INSTALL", "ux", command.c_str()));
+    EXPECT_EQ(0, row.retval) << trimmedField(row.retmsgparm);
+    EXPECT_EQ("done\n", home_.files().read("made"));
+}
+
+TEST_F(TaskManager, ChildrenOfTheExecutorHaveNoSignalsBlocked) {
+    home_.agentScript("grep SigBlk /proc/$$/status >'" + home_.files().path("mask") + "'");
+    EXPECT_EQ(0, outcomeOf(request("t6", "START", "ux")).retval);
+    EXPECT_EQ("SigBlk:\t0000000000000000\n", home_.files().read("mask"));
+}
+
+TEST_F(TaskManager, AQueryWhileATaskRunsIsAnsweredAtOnce) {
+    const std::string release = home_.files().path("release");
+    home_.agentScript("while [ ! -e '" + release + "' ]; do sleep 0.02; done");
+    Outcomes outcomes;
+    TaskQueueElem slow = request("slow", "START", "ux");
+    ASSERT_EQ(0, runTask(slow));
+    TaskQueueElem quick = request("quick", "GETCONFIG", "ux");
+    EXPECT_EQ(TASK_NO_TRANSLATOR, runTask(quick));
+    EXPECT_EQ(1007, quick.getReturnResults().retval);
+    TaskQueueElem refused = request("refused", "start", "ux");
+    EXPECT_EQ(TASK_NOT_SUPPORTED, runTask(refused));
+    EXPECT_TRUE(outcomes.rows().empty());
+    home_.files().write("release", "");
+    const auto rows = outcomes.waitFor(1);
+    ASSERT_EQ(1u, rows.size());
+    EXPECT_EQ("slow", trimmedField(rows[0].transid));
+}
+
+}  // namespace
