@@ -163,7 +163,7 @@ TEST_F(CommandRunner, AChildThatNeverTakesItsInputIsKilledAtTheTimeout) {
     const Outcome outcome =
         run("/bin/sh -c 'echo early; exec sleep 60'", String(std::string(300 * 1000, 'x').c_str()));
     EXPECT_FALSE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 2.5);
+    EXPECT_LT(watch.seconds(), 5.0);
     EXPECT_EQ("early\n", outcome.text());
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }
@@ -213,7 +213,7 @@ TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
     const Outcome outcome = run("/bin/sh -c 'echo begun; echo bad >&2; exec sleep 60'");
     EXPECT_FALSE(outcome.ran);
     EXPECT_GT(watch.seconds(), 0.9);
-    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_LT(watch.seconds(), 5.0);
     EXPECT_EQ(0, outcome.rc);
     EXPECT_EQ("begun\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
@@ -234,7 +234,7 @@ TEST_F(CommandRunner, AnUnusableTimeoutLeavesNoTime) {
     limit("abc");
     const Stopwatch watch;
     EXPECT_FALSE(run("/bin/sleep 60").ran);
-    EXPECT_LT(watch.seconds(), 0.8);
+    EXPECT_LT(watch.seconds(), 5.0);
 }
 
 TEST_F(CommandRunner, OutputThatOthersKeepOpenEndsTheRunAtTheTimeout) {
@@ -243,7 +243,7 @@ TEST_F(CommandRunner, OutputThatOthersKeepOpenEndsTheRunAtTheTimeout) {
     const Stopwatch watch;
     const Outcome outcome = run("/bin/sh -c 'sleep 4 & echo started'");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_LT(watch.seconds(), 3.5);
     EXPECT_EQ("started\n", outcome.text());
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }
@@ -252,7 +252,7 @@ TEST_F(CommandRunner, AChildThatNeverStopsWritingIsKilled) {
     limit("1");
     const Stopwatch watch;
     EXPECT_FALSE(run("/bin/sh -c 'while :; do echo x; done'").ran);
-    EXPECT_LT(watch.seconds(), 3.0);
+    EXPECT_LT(watch.seconds(), 10.0);
 }
 
 TEST_F(CommandRunner, AChildBlockedOnAFullErrorPipeIsKilled) {
@@ -260,7 +260,7 @@ TEST_F(CommandRunner, AChildBlockedOnAFullErrorPipeIsKilled) {
     const Stopwatch watch;
     const Outcome outcome = run("/bin/sh -c 'echo out; head -c 200000 /dev/zero >&2'");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_LT(watch.seconds(), 5.0);
     EXPECT_EQ("out\n", outcome.text());
 }
 
@@ -289,7 +289,7 @@ TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsNothingUpWhenReadWithoutB
     const Stopwatch watch;
     const Outcome outcome = run(script, String(), true);
     EXPECT_TRUE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_LT(watch.seconds(), 2.8);
     EXPECT_EQ("up\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
 }
@@ -304,7 +304,7 @@ TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsABlockingReadUpToTheTimeo
     EXPECT_TRUE(outcome.ran);
     EXPECT_EQ(6, outcome.rc);
     EXPECT_GT(watch.seconds(), 0.9);
-    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_LT(watch.seconds(), 3.5);
     EXPECT_EQ("up\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
     EXPECT_THAT(traces.errors(), Contains(StartsWith("Bad return code (6)")));

