@@ -1,24 +1,50 @@
-/// The fast path that conversions share: runs of ASCII, sixteen characters at a time.
+/// The fast path that conversions share: runs of ASCII, a block of characters at a time.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <cstring>
 
 namespace nls2 {
 
-constexpr unsigned kAsciiBlock = 16;
+/// Characters that are converted together.
+constexpr unsigned kBlock = 16;
+
+using ByteBlock = unsigned char __attribute__((vector_size(kBlock)));
+using UnitBlock = unsigned short __attribute__((vector_size(kBlock * 2)));
+
+/// Makes a unit of each byte of a block.
+inline void widenBlock(const char* text, unsigned short* out) {
+    ByteBlock bytes;
+    std::memcpy(&bytes, text, sizeof bytes);
+    const UnitBlock units = __builtin_convertvector(bytes, UnitBlock);
+    std::memcpy(out, &units, sizeof units);
+}
+
+/// Makes a byte of each unit of a block, of which the low half counts.
+inline void narrowBlock(const unsigned short* text, char* out) {
+    UnitBlock units;
+    std::memcpy(&units, text, sizeof units);
+    const ByteBlock bytes = __builtin_convertvector(units, ByteBlock);
+    std::memcpy(out, &bytes, sizeof bytes);
+}
+
+/// Whether any of a block's words, read as 64 bits each, has a bit of `mask`.
+template <std::size_t Words>
+bool hasBits(const void* block, std::uint64_t mask) {
+    std::uint64_t words[Words];
+    std::memcpy(words, block, sizeof words);
+    std::uint64_t all = 0;
+    for (const std::uint64_t word : words)
+        all |= word;
+    return (all & mask) != 0;
+}
 
 /// Copies the ASCII characters that `text` begins with, at most `count`; returns how many.
 inline unsigned widenAscii(const char* text, unsigned count, unsigned short* out) {
-    constexpr std::uint64_t kHighBits = 0x8080808080808080u;
     unsigned i = 0;
-    for (; count - i >= kAsciiBlock; i += kAsciiBlock) {
-        std::uint64_t bytes[2];
-        std::memcpy(bytes, text + i, sizeof bytes);
-        if (((bytes[0] | bytes[1]) & kHighBits) != 0) break;
-        for (unsigned k = 0; k < kAsciiBlock; ++k) {
-            out[i + k] = static_cast<unsigned char>(text[i + k]);
-        }
+    for (; count - i >= kBlock && !hasBits<2>(text + i, 0x8080808080808080u); i += kBlock) {
+        widenBlock(text + i, out + i);
     }
     for (; i < count && static_cast<unsigned char>(text[i]) < 0x80; ++i) {
         out[i] = static_cast<unsigned char>(text[i]);
@@ -31,15 +57,10 @@ inline unsigned widenAscii(const char* text, unsigned count, unsigned short* out
 template <unsigned short Last>
 unsigned narrowUpTo(const unsigned short* text, unsigned count, char* out) {
     static_assert(((Last + 1) & Last) == 0, "all bits of the limit are set");
+    constexpr std::uint64_t kAbove = (0xFFFFu - Last) * 0x0001000100010001u;
     unsigned i = 0;
-    for (; count - i >= kAsciiBlock; i += kAsciiBlock) {
-        unsigned short bits = 0;
-        for (unsigned k = 0; k < kAsciiBlock; ++k) {
-            bits = static_cast<unsigned short>(bits | text[i + k]);
-        }
-        if (bits > Last) break;
-        for (unsigned k = 0; k < kAsciiBlock; ++k)
-            out[i + k] = static_cast<char>(text[i + k]);
+    for (; count - i >= kBlock && !hasBits<4>(text + i, kAbove); i += kBlock) {
+        narrowBlock(text + i, out + i);
     }
     for (; i < count && text[i] <= Last; ++i)
         out[i] = static_cast<char>(text[i]);

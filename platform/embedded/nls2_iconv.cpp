@@ -26,6 +26,13 @@ bool isOpen(iconv_t descriptor) {
 class DescriptorPool {
 public:
     DescriptorPool(const char* to, const char* from) : to_(to), from_(from) {}
+    ~DescriptorPool() {
+        for (const std::atomic<iconv_t>& slot : idle_) {
+            if (isOpen(slot)) ::iconv_close(slot);
+        }
+    }
+    DescriptorPool(const DescriptorPool&) = delete;
+    DescriptorPool& operator=(const DescriptorPool&) = delete;
 
     /// Exclusive use of a descriptor in its initial state.
     class Lease {

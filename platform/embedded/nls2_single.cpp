@@ -44,11 +44,8 @@ struct Latin1Locale : NLS2_LOCALE {
                        unsigned capacity) const override {
         const unsigned count = std::min(length, capacity);
         unsigned i = 0;
-        for (; count - i >= kAsciiBlock; i += kAsciiBlock) {
-            for (unsigned k = 0; k < kAsciiBlock; ++k) {
-                out[i + k] = static_cast<unsigned char>(text[i + k]);
-            }
-        }
+        for (; count - i >= kBlock; i += kBlock)
+            widenBlock(text + i, out + i);
         for (; i < count; ++i)
             out[i] = static_cast<unsigned char>(text[i]);
         return {count, count < length ? NLS2_TRUNCATED : NLS2_OK};

@@ -26,19 +26,25 @@ bool isRange(std::uint32_t pos, std::uint32_t n, std::uint32_t length) {
     return n != 0 && n <= length && pos <= length - n;
 }
 
+using UnitBlock = unsigned short __attribute__((vector_size(16)));
+constexpr std::uint32_t kBlock = sizeof(UnitBlock) / sizeof(unsigned short);
+
+/// Whether one of the units of a block is `ch`.
+bool blockHolds(const unsigned short* units, unsigned short ch) {
+    UnitBlock block;
+    std::memcpy(&block, units, sizeof block);
+    const auto equal = block == ch;
+    std::uint64_t words[2];
+    static_assert(sizeof words == sizeof equal);
+    std::memcpy(words, &equal, sizeof words);
+    return (words[0] | words[1]) != 0;
+}
+
 /// The index of the first `ch` in [start, end), else `end`.
 std::uint32_t indexOf(const unsigned short* units, std::uint32_t start, std::uint32_t end,
                       unsigned short ch) {
-    // Whole blocks without an exit in their midst become vector instructions.
-    constexpr std::uint32_t kBlock = 16;
-    while (end - start >= kBlock) {
-        unsigned hits = 0;
-        for (std::uint32_t k = 0; k < kBlock; ++k) {
-            hits |= static_cast<unsigned>(units[start + k] == ch);
-        }
-        if (hits != 0) break;
+    while (end - start >= kBlock && !blockHolds(units + start, ch))
         start += kBlock;
-    }
     while (start < end && units[start] != ch)
         ++start;
     return start;

@@ -62,6 +62,7 @@ TEST(StringTokenizer, ThrowsWhenNoTokenIsLeft) {
 
 TEST(StringTokenizer, ThrowsWithoutDelimiters) {
     StringTokenizer tokenizer(String("text"));
+    const TraceCapture trace("ERROR");
     EXPECT_THROW(tokenizer.hasMoreTokens(), IndexOutOfBoundsException);
     EXPECT_THROW(tokenizer.countTokens(), IndexOutOfBoundsException);
     EXPECT_THROW(tokenizer.nextToken(), IndexOutOfBoundsException);
