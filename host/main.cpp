@@ -5,7 +5,9 @@
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
+#include <system_error>
 
+#include "embedded/ncs_host.h"
 #include "embedded/oxa_host.h"
 #include "host/code_page.h"
 #include "host/end_signals.h"
@@ -36,16 +38,33 @@ Router startPlugin(const HostOptions& options) {
     return Router(std::move(tables), CodePage::ofProcess());
 }
 
+/// File transfers: on a socket of their own, and on a loopback port when one is asked for.
+void serveTransfers(ncs::Server& transfers, SocketFile& socket, const HostOptions& options) {
+    transfers.listen(socket.listen());
+    if (!options.rpcPort) return;
+    try {
+        transfers.listenOnLoopback(*options.rpcPort);
+    } catch (const std::system_error& error) {
+        throw StartError("cannot listen on the loopback port " + std::to_string(*options.rpcPort) +
+                         ": " + error.code().message());
+    }
+}
+
 void run(const HostOptions& options) {
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
     SocketFile socket(options.socket);
+    SocketFile transferSocket(options.rpcSocket);
     const int endDescriptor = catchEndSignals();
     Router router = startPlugin(options);
+    ncs::Server transfers;
+    serveTransfers(transfers, transferSocket, options);
     HttpServer server(socket.listen(), std::move(router), options.home);
     server.endWhenReadable(endDescriptor, kEndGrace);
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     server.run();
+    transfers.stop();
+    transferSocket.remove();
     socket.remove();
     // The plug-in's executor never ends and uses its globals to the last, so nothing is torn down.
     ::_exit(0);
