@@ -10,8 +10,9 @@
 #include <chrono>
 #include <cstdlib>
 #include <string>
-#include <thread>
 #include <utility>
+
+#include "support/program.h"
 
 class RawClient {
 public:
@@ -136,14 +137,3 @@ private:
     bool ended_ = false;
     std::string buffer_;
 };
-
-/// True as soon as the condition holds; false when it does not within 20 seconds.
-template <typename Condition>
-bool eventually(Condition condition) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(20);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > deadline) return false;
-        std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    return true;
-}

@@ -39,7 +39,7 @@ TEST_F(End, IsAtOnceWhenNothingIsUnderWay) {
 }
 
 TEST_F(End, WaitsForASampleAndSendsItsAnswer) {
-    Gate gate;
+    OpeningGate gate;
     std::atomic<bool> running{false};
     table.sampler = [&](rtoxa& request) {
         running = true;
@@ -62,7 +62,7 @@ TEST_F(End, WaitsForASampleAndSendsItsAnswer) {
 }
 
 TEST_F(End, TakesNoFurtherRequest) {
-    Gate gate;
+    OpeningGate gate;
     std::atomic<int> samples{0};
     table.sampler = [&](rtoxa&) {
         ++samples;
@@ -90,7 +90,7 @@ TEST_F(End, TakesNoFurtherRequest) {
 }
 
 TEST_F(End, ComesAfterTheGraceWhateverHangs) {
-    Gate gate;
+    OpeningGate gate;
     std::atomic<bool> running{false};
     table.sampler = [&](rtoxa&) {
         running = true;
@@ -156,7 +156,7 @@ TEST_F(TaskEnd, FollowsTheTaskInHandWhoseOutcomeIsSentAndNoOtherBegins) {
     RawClient events = subscribeToOutcomes();
     accept("t1");
     accept("t2");
-    Gate first;
+    OpeningGate first;
     std::atomic<bool> secondBegun{false};
     executor = std::thread([&] {
         first.wait();

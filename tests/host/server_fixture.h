@@ -18,9 +18,9 @@
 #include "support/scratch_dir.h"
 
 /// Holds samples until it is opened; opened at the latest when the test ends.
-class Gate {
+class OpeningGate {
 public:
-    ~Gate() { open(); }
+    ~OpeningGate() { open(); }
     void open() {
         if (!open_) promise_.set_value();
         open_ = true;

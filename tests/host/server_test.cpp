@@ -373,7 +373,7 @@ TEST_F(Connections, OfOtherUsersAreRefused) {
 }
 
 TEST_F(Samples, ThatTakeLongHoldUpNobodyElse) {
-    Gate gate;
+    OpeningGate gate;
     std::atomic<int> running{0};
     table.sampler = [&](rtoxa& request) {
         FLT1_FILTERINFO entry{};
@@ -404,7 +404,7 @@ TEST_F(Samples, ThatTakeLongHoldUpNobodyElse) {
 }
 
 TEST_F(Samples, BeyondThoseThatMayWaitGet503) {
-    Gate gate;
+    OpeningGate gate;
     std::atomic<int> running{0};
     table.sampler = [&](rtoxa&) {
         ++running;
@@ -440,7 +440,7 @@ TEST_F(Samples, BeyondThoseThatMayWaitGet503) {
 }
 
 TEST_F(Samples, OfClientsThatVanishedHarmNobody) {
-    Gate gate;
+    OpeningGate gate;
     std::atomic<int> finished{0};
     table.sampler = [&](rtoxa& request) {
         gate.wait();

@@ -8,7 +8,7 @@
 #include <thread>
 
 #include "host/made_up_table.h"
-#include "host/raw_client.h"
+#include "support/program.h"
 
 namespace {
 

@@ -8,7 +8,7 @@
 #include <memory>
 #include <stdexcept>
 
-#include "host/raw_client.h"
+#include "support/program.h"
 
 namespace {
 

@@ -1,0 +1,291 @@
+// ctest-label: threaded
+// The program from its command line to its end, with a plug-in of the tests' own.
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <netinet/in.h>
+#include <signal.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+#include <memory>
+#include <thread>
+
+#include "host/raw_client.h"
+#include "support/program.h"
+#include "support/scratch_dir.h"
+
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+class HostProgram : public testing::Test {
+protected:
+    std::vector<std::string> command(std::vector<std::string> more = {}) const {
+        std::vector<std::string> argv = {ZAV_BUILD_DIR "/bin/zavhost",
+                                         "--home",
+                                         scratch.path("home"),
+                                         "--socket",
+                                         socket,
+                                         "--plugin",
+                                         ZAV_BUILD_DIR "/lib/made_up_plugin.so"};
+        argv.insert(argv.end(), more.begin(), more.end());
+        return argv;
+    }
+    std::unique_ptr<Program> start(std::vector<std::string> more = {}) {
+        auto program = std::make_unique<Program>(command(std::move(more)));
+        EXPECT_TRUE(program->awaitOutput("ready: " + socket + "\n", seconds(30))) << program->err();
+        return program;
+    }
+    /// Starts it for nothing; its one line of complaint.
+    static std::string complaint(const std::vector<std::string>& argv,
+                                 const Environment& environment = {}) {
+        const ProgramResult result = runProgram(argv, "", environment);
+        EXPECT_EQ(1, result.status);
+        EXPECT_EQ("", result.out);
+        EXPECT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n')) << result.err;
+        return result.err;
+    }
+    void request(const std::string& transid, int taskMilliseconds) const {
+        RawClient client(socket);
+        const auto answer = client.post(
+            "/v1/query",
+            R"({"table":"KAGREQT","where":[{"column":"COMMAND","op":"=","value":"WORK"},)"
+            R"({"column":"PRODUCT","op":"=","value":")" +
+                std::to_string(taskMilliseconds) + R"("},{"column":"TRANSID","op":"=","value":")" +
+                transid + "\"}]}");
+        EXPECT_EQ(200, answer.status) << answer.body;
+    }
+    bool began(const std::string& transid) const {
+        return eventually([&] { return scratch.exists("home/began-" + transid); });
+    }
+    void expectNoFilesLeft() const {
+        EXPECT_FALSE(scratch.exists("s"));
+        EXPECT_FALSE(scratch.exists("s.rpc"));
+        EXPECT_FALSE(scratch.exists("s.lock"));
+        EXPECT_FALSE(scratch.exists("s.rpc.lock"));
+    }
+
+    ScratchDir scratch;
+    const std::string home = scratch.makeDir("home");
+    const std::string socket = scratch.path("s");
+};
+
+TEST_F(HostProgram, SaysThatItIsReadyAndNothingElse) {
+    const auto program = start();
+    EXPECT_EQ("ready: " + socket + "\n", program->out());
+    EXPECT_EQ("", program->err());
+    for (const char* name : {"s", "s.rpc"}) {
+        struct stat found {};
+        ASSERT_EQ(0, ::stat(scratch.path(name).c_str(), &found)) << name;
+        EXPECT_EQ(S_IFSOCK | 0600U, found.st_mode);
+        EXPECT_TRUE(RawClient(scratch.path(name)).connected());
+    }
+    EXPECT_NE(std::string::npos,
+              RawClient(socket).get("/v1/health").body.find("\"home\":\"" + home + "\""));
+}
+
+TEST_F(HostProgram, EndsWithStatus0OnBothSignals) {
+    for (const int signal : {SIGTERM, SIGINT}) {
+        const auto program = start();
+        program->signal(signal);
+        EXPECT_EQ(0, program->wait().status);
+        expectNoFilesLeft();
+    }
+}
+
+TEST_F(HostProgram, TellsWhyItDoesNotStart) {
+    const std::string program = command()[0];
+    const auto withPlugin = [&](const std::string& plugin) {
+        std::vector<std::string> argv = command();
+        argv.back() = plugin;
+        return argv;
+    };
+    EXPECT_EQ("zavhost: no home: give --home DIR or set TOVRINHOME\n",
+              complaint({program}, {{"TOVRINHOME", ""}}));
+    EXPECT_EQ("zavhost: home /nonexistent: No such file or directory\n",
+              complaint({program, "--home", "/nonexistent"}));
+    EXPECT_EQ(
+        "zavhost: plug-in cannot be loaded: /nonexistent.so: cannot open shared object "
+        "file: No such file or directory\n",
+        complaint(withPlugin("/nonexistent.so")));
+    const std::string platform = ZAV_BUILD_DIR "/lib/libzavplatform.so";
+    EXPECT_EQ("zavhost: plug-in " + platform + " has no function Initialize_Mgmt_Functions\n",
+              complaint(withPlugin(platform)));
+    EXPECT_EQ("zavhost: plug-in " + command().back() + " offers no tables\n",
+              complaint(command(), {{"MADE_UP_PLUGIN", "empty"}}));
+    std::vector<std::string> here = withPlugin("libm.so.6");
+    EXPECT_EQ(
+        "zavhost: plug-in cannot be loaded: ./libm.so.6: cannot open shared object file: No "
+        "such file or directory\n",
+        complaint(here))
+        << "a file of that name, not a library of the system";
+    std::vector<std::string> odd = command({"--odd"});
+    EXPECT_EQ(
+        "zavhost: The following argument was not expected: --odd (--help shows the options)\n",
+        complaint(odd));
+    expectNoFilesLeft();
+}
+
+TEST_F(HostProgram, LeavesALiveHostAlone) {
+    const auto program = start();
+    EXPECT_EQ("zavhost: socket " + socket + " is in use by a live host\n", complaint(command()));
+    // The same file transfer socket under another name of the first one.
+    std::vector<std::string> other = command();
+    other[4] = scratch.path("other");
+    other.insert(other.end(), {"--rpc-socket", socket + ".rpc"});
+    EXPECT_EQ("zavhost: socket " + socket + ".rpc is in use by a live host\n", complaint(other));
+    EXPECT_FALSE(scratch.exists("other"));
+    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+}
+
+TEST_F(HostProgram, ReplacesTheSocketsOfOneThatWasKilled) {
+    const auto killed = start();
+    killed->signal(SIGKILL);
+    killed->wait();
+    ASSERT_TRUE(scratch.exists("s"));
+    ASSERT_TRUE(scratch.exists("s.rpc"));
+    const auto program = start();
+    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+}
+
+TEST_F(HostProgram, OfManyThatStartAtOnceExactlyOneServes) {
+    scratch.write("s.lock", "");
+    std::vector<std::unique_ptr<Program>> programs;
+    for (int i = 0; i < 8; ++i)
+        programs.push_back(std::make_unique<Program>(command()));
+    const auto running = [&] {
+        return std::count_if(programs.begin(), programs.end(),
+                             [](const auto& program) { return program->running(); });
+    };
+    EXPECT_TRUE(eventually([&] { return running() == 1; }));
+    for (const auto& program : programs) {
+        if (program->running()) {
+            EXPECT_TRUE(program->awaitOutput("ready: ", seconds(20)));
+        } else {
+            EXPECT_EQ(1, program->wait().status);
+        }
+    }
+    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+}
+
+TEST_F(HostProgram, ServesFileTransfersOnALoopbackPortWhenToldTo) {
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    const int taken = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    socklen_t length = sizeof address;
+    auto* const generic = reinterpret_cast<sockaddr*>(&address);
+    ASSERT_EQ(0, ::bind(taken, generic, length));
+    ASSERT_EQ(0, ::listen(taken, 1));
+    ASSERT_EQ(0, ::getsockname(taken, generic, &length));
+    const std::string port = std::to_string(ntohs(address.sin_port));
+    EXPECT_EQ("zavhost: cannot listen on the loopback port " + port + ": Address already in use\n",
+              complaint(command({"--rpc-port", port})));
+    ::close(taken);
+    const auto program = start({"--rpc-port", port});
+    const int client = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    EXPECT_EQ(0, ::connect(client, generic, length));
+    ::close(client);
+}
+
+TEST_F(HostProgram, GoesOnWhenOnlyFileTransfersFailToRegister) {
+    Program program(command(), "", {{"MADE_UP_PLUGIN", "status"}});
+    EXPECT_TRUE(program.awaitOutput("ready: ", seconds(30)));
+    EXPECT_EQ("zavhost: plug-in " + command().back() +
+                  " started with status 7; file transfers may fail\n",
+              program.err());
+}
+
+TEST_F(HostProgram, EndsAfterTheTaskInHandAndBeginsNoOther) {
+    const auto program = start();
+    RawClient events(socket);
+    events.send("GET /v1/events?table=KAGDYST HTTP/1.1\r\n\r\n");
+    ASSERT_NE(std::string::npos, events.readUntil("\r\n\r\n").find("200"));
+    request("first", 700);
+    request("second", 1);
+    ASSERT_TRUE(began("first"));
+    program->signal(SIGTERM);
+    EXPECT_EQ(0, program->wait(seconds(9)).status);
+    EXPECT_TRUE(scratch.exists("home/ended-first"));
+    EXPECT_FALSE(scratch.exists("home/began-second"));
+    EXPECT_NE(std::string::npos, events.readUntil("\n\n").find("\"TRANSID\":\"first\""));
+    expectNoFilesLeft();
+}
+
+TEST_F(HostProgram, EndsAfterTenSecondsWhateverItsTaskDoes) {
+    const auto program = start();
+    request("endless", 60'000);
+    ASSERT_TRUE(began("endless"));
+    const auto begin = std::chrono::steady_clock::now();
+    program->signal(SIGTERM);
+    EXPECT_EQ(0, program->wait(seconds(30)).status);
+    const auto taken = std::chrono::steady_clock::now() - begin;
+    EXPECT_GE(taken, milliseconds(9'900));
+    EXPECT_LT(taken, seconds(15));
+    expectNoFilesLeft();
+}
+
+/// Runs the program below a shell that has changed its descriptors first.
+std::vector<std::string> below(const std::string& redirections,
+                               const std::vector<std::string>& argv) {
+    std::vector<std::string> shell = {"/bin/sh", "-c", "exec \"$@\" " + redirections, "sh"};
+    shell.insert(shell.end(), argv.begin(), argv.end());
+    return shell;
+}
+
+TEST_F(HostProgram, WorksWithItsStandardDescriptorsClosed) {
+    Program program(below("<&- >&- 2>&-", command()));
+    EXPECT_TRUE(eventually([&] { return RawClient(socket).get("/v1/health").status == 200; }));
+    std::error_code error;
+    const std::filesystem::path standard = "/proc/" + std::to_string(program.pid()) + "/fd/1";
+    EXPECT_EQ("/dev/null", std::filesystem::read_symlink(standard, error).string());
+    program.signal(SIGTERM);
+    EXPECT_EQ(0, program.wait().status);
+}
+
+TEST_F(HostProgram, SurvivesWhenNobodyReadsItsOutput) {
+    const std::string pipe = scratch.path("pipe");
+    ASSERT_EQ(0, ::mkfifo(pipe.c_str(), 0600));
+    const int reader = ::open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    const int writer = ::open(pipe.c_str(), O_WRONLY | O_CLOEXEC);
+    ASSERT_GE(writer, 0);
+    ::close(reader);
+    // The shell finds a pipe whose reader has gone: its descriptor is inherited, not opened.
+    ASSERT_EQ(0, ::fcntl(writer, F_SETFD, 0));
+    const std::string number = std::to_string(writer);
+    Program program(below(">&" + number + " 2>&" + number, command()));
+    EXPECT_TRUE(eventually([&] { return RawClient(socket).get("/v1/health").status == 200; }));
+    program.signal(SIGTERM);
+    EXPECT_EQ(0, program.wait().status);
+    ::close(writer);
+}
+
+/// Wake-ups of all threads of a process so far.
+long switches(pid_t pid) {
+    long sum = 0;
+    const std::string tasks = "/proc/" + std::to_string(pid) + "/task";
+    for (const auto& task : std::filesystem::directory_iterator(tasks)) {
+        std::ifstream in(task.path() / "status");
+        for (std::string line; std::getline(in, line);) {
+            const std::string name = "voluntary_ctxt_switches:";
+            if (line.rfind(name, 0) == 0) sum += std::atol(line.c_str() + name.size());
+        }
+    }
+    return sum;
+}
+
+TEST_F(HostProgram, SleepsWhenNobodyWantsAnything) {
+    const auto program = start();
+    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+    request("t", 1);
+    ASSERT_TRUE(eventually([&] { return scratch.exists("home/ended-t"); }));
+    std::this_thread::sleep_for(milliseconds(300));
+    const long before = switches(program->pid());
+    std::this_thread::sleep_for(milliseconds(1500));
+    EXPECT_EQ(before, switches(program->pid()));
+}
+
+}  // namespace
