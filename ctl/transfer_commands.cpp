@@ -244,7 +244,7 @@ void printReport(const std::vector<PushedFile>& files, const Progress& progress)
     const std::string what =
         files.size() == 1 ? files[0].name : std::to_string(files.size()) + " files";
     if (failed == 0) {
-        std::printf("push %s: done; %s in %.1f s, %s/s\n", what.c_str(),
+        std::printf("push %s: done; %s in %.2f s, %s/s\n", what.c_str(),
                     bytesText(double(progress.sent())).c_str(), seconds,
                     bytesText(double(progress.sent()) / seconds).c_str());
     } else {
