@@ -2,6 +2,7 @@
 #pragma once
 
 #include <memory>
+#include <vector>
 
 #include "base/zavtrace.h"
 #include "platform/oxa.h"
@@ -40,13 +41,17 @@ Manager* managerInForce(Manager* const& staticManager) {
     return __atomic_load_n(&staticManager, __ATOMIC_ACQUIRE);
 }
 
-/// Makes the table's manager, which lives as long as the process, and registers it. Returns the
-/// registration's status, or OXA_NO_MEMORY when there is no manager.
+/// Makes the table's manager, which lives as long as the process, and registers it in place of an
+/// earlier one. Returns the registration's status, or OXA_NO_MEMORY when there is no manager. One
+/// thread at a time.
 template <typename Manager>
 int registerTable(Manager*& staticManager, const char* application, const char* table) {
     Manager* manager = nullptr;
     try {
-        manager = std::make_unique<Manager>(application, table).release();
+        // Immortal like the managers in it: earlier ones may still have live requests.
+        static auto& made = *new std::vector<std::unique_ptr<Manager>>;
+        made.push_back(std::make_unique<Manager>(application, table));
+        manager = made.back().get();
     } catch (...) {
         return OXA_NO_MEMORY;
     }

@@ -23,24 +23,25 @@ bool mayAllocate() {
 
 }  // namespace
 
-void* operator new(std::size_t size) {
+// Not inlined: the compiler would take the blocks for malloc's own and warn of the mismatch.
+[[gnu::noinline]] void* operator new(std::size_t size) {
     void* const block = mayAllocate() ? std::malloc(size == 0 ? 1 : size) : nullptr;
     if (block == nullptr) throw std::bad_alloc();
     return block;
 }
-void* operator new[](std::size_t size) {
+[[gnu::noinline]] void* operator new[](std::size_t size) {
     return operator new(size);
 }
-void operator delete(void* block) noexcept {
+[[gnu::noinline]] void operator delete(void* block) noexcept {
     std::free(block);
 }
-void operator delete[](void* block) noexcept {
+[[gnu::noinline]] void operator delete[](void* block) noexcept {
     std::free(block);
 }
-void operator delete(void* block, std::size_t) noexcept {
+[[gnu::noinline]] void operator delete(void* block, std::size_t) noexcept {
     std::free(block);
 }
-void operator delete[](void* block, std::size_t) noexcept {
+[[gnu::noinline]] void operator delete[](void* block, std::size_t) noexcept {
     std::free(block);
 }
 
