@@ -115,7 +115,7 @@ TEST_F(TaskManager, AnInstallRunsItsCommand) {
 }
 
 TEST_F(TaskManager, ChildrenOfTheExecutorHaveNoSignalsBlocked) {
-    home_.agentScript("grep SigBlk /proc/$$/status >'" + home_.files().path("mask") + "'");
+    home_.agentScript("grep SigBlk /proc/self/status >'" + home_.files().path("mask") + "'");
     EXPECT_EQ(0, outcomeOf(request("t6", "START", "ux")).retval);
     EXPECT_EQ("SigBlk:\t0000000000000000\n", home_.files().read("mask"));
 }
