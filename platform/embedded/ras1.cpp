@@ -20,7 +20,9 @@
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
+#include <memory>
 #include <string>
+#include <vector>
 
 #include "embedded/ras1_control.h"
 #include "embedded/ras1_selection.h"
@@ -51,21 +53,18 @@ bool hasReader(int descriptor) {
     return ::fstat(descriptor, &found) == 0 && (S_ISFIFO(found.st_mode) || S_ISSOCK(found.st_mode));
 }
 
-/// What is in force. Replaced by configure() only; never destroyed, because threads trace until
-/// the process is gone.
-struct Facility {
-    ras1::Selection selection;
-    const int standardError = ownDescriptor(STDERR_FILENO);
-    int log = -1;
-    bool readerMayGo = false;  ///< the lines go to a pipe or a socket
-
+/// What is in force. Replaced by configure() only, one thread at a time, while others trace; never
+/// destroyed, because threads trace until the process is gone.
+class Facility {
+public:
     Facility() { configureFromEnvironment(); }
 
     void configure(const std::string& selectionText, const std::string& logPath) {
-        selection = ras1::parseSelection(selectionText);
-        if (log != -1) ::close(log);
-        log = openLog(logPath);
-        readerMayGo = hasReader(descriptor());
+        selections_.push_back(
+            std::make_unique<const ras1::Selection>(ras1::parseSelection(selectionText)));
+        selection_.store(selections_.back().get(), std::memory_order_release);
+        redirect(openLog(logPath));
+        readerMayGo_.store(hasReader(descriptor()), std::memory_order_relaxed);
     }
 
     void configureFromEnvironment() {
@@ -74,7 +73,35 @@ struct Facility {
         configure(text != nullptr ? text : "", path != nullptr ? path : "");
     }
 
-    int descriptor() const { return log != -1 ? log : standardError; }
+    const ras1::Selection& selection() const { return *selection_.load(std::memory_order_acquire); }
+    int descriptor() const { return lines_.load(std::memory_order_relaxed); }
+    bool readerMayGo() const { return readerMayGo_.load(std::memory_order_relaxed); }
+
+private:
+    /// Sends lines to `log`, which is owned from here on, or to standard error when it is -1. The
+    /// number of the descriptor stays, so that a thread which is about to write meets no other
+    /// file than one of the two.
+    void redirect(int log) {
+        const int target = log != -1 ? log : standardError_;
+        const int current = descriptor();
+        if (current == -1) {
+            lines_.store(log != -1 ? log : ownDescriptor(standardError_),
+                         std::memory_order_relaxed);
+        } else if (target == -1) {
+            lines_.store(-1, std::memory_order_relaxed);
+            ::close(current);
+        } else {
+            ::dup3(target, current, O_CLOEXEC);
+            if (log != -1) ::close(log);
+        }
+    }
+
+    /// The one in force is the last; threads may still be looking at earlier ones.
+    std::vector<std::unique_ptr<const ras1::Selection>> selections_;
+    std::atomic<const ras1::Selection*> selection_{nullptr};
+    const int standardError_ = ownDescriptor(STDERR_FILENO);
+    std::atomic<int> lines_{-1};            ///< where lines go
+    std::atomic<bool> readerMayGo_{false};  ///< that is a pipe or a socket
 };
 
 Facility& facility() {
@@ -249,7 +276,7 @@ void writeLine(const RAS1_BLOCK& block, char letter, int line, const char* text,
     char newline = '\n';
     iovec parts[3] = {{head, headLength}, {const_cast<char*>(text), length}, {&newline, 1}};
     {
-        const SigpipeShield shield(facility().readerMayGo);
+        const SigpipeShield shield(facility().readerMayGo());
         while (::writev(facility().descriptor(), parts, 3) == -1 && errno == EINTR) {
         }
     }
@@ -273,7 +300,7 @@ void writeText(const RAS1_BLOCK& block, char letter, int line, const char* text,
 
 unsigned RAS1_Sync(RAS1_UNIT* unit) {
     const unsigned generation = RAS1_Generation.load(std::memory_order_acquire);
-    const unsigned flags = facility().selection.flagsOf(unit->name);
+    const unsigned flags = facility().selection().flagsOf(unit->name);
     unit->flags.store(flags, std::memory_order_relaxed);
     unit->generation.store(generation, std::memory_order_release);
     return flags;
