@@ -1,0 +1,43 @@
+// How long an inventory takes to parse: the time per line must not grow with the lines.
+#include <benchmark/benchmark.h>
+
+#include <string>
+
+#include "tables/inventory.h"
+
+namespace {
+
+ZAV::String inventoryOf(std::int64_t lines) {
+    std::string text = "\"ProdCode\",\"Description\",\"Platform\",\"Version\",\"Release\"\n";
+    for (std::int64_t i = 0; i < lines; ++i) {
+        const std::string number = std::to_string(i);
+        text += "\"p" + number + "\",\"Product number " + number +
+                " with a description of some length\",\"lx8266\",\"06200000\",\"100\"\n";
+    }
+    return ZAV::String(text.c_str());
+}
+
+void ParseInventory(benchmark::State& state) {
+    const ZAV::String inventory = inventoryOf(state.range(0));
+    for (auto _ : state) {
+        std::int64_t products = 0;
+        forEachProduct(inventory, [&products](const InstalledProduct&) {
+            ++products;
+            return 0;
+        });
+        if (products != state.range(0)) state.SkipWithError("not every line is a product");
+    }
+    state.SetItemsProcessed(state.iterations() * state.range(0));
+    state.SetComplexityN(state.range(0));
+}
+BENCHMARK(ParseInventory)
+    ->Arg(5000)
+    ->Arg(10000)
+    ->Arg(20000)
+    ->Arg(40000)
+    ->Unit(benchmark::kMillisecond)
+    ->Complexity();
+
+}  // namespace
+
+BENCHMARK_MAIN();
