@@ -31,9 +31,8 @@ int startUp(const Trace& trace) {
 
 int Initialize_Mgmt_Functions() {
     Trace trace(traceUnit);
-    if (Initialize_Tovrin_Home() == nullptr) return trace.exit(0);
     try {
-        return trace.exit(startUp(trace));
+        return trace.exit(Initialize_Tovrin_Home() == nullptr ? 0 : startUp(trace));
     } catch (...) {
         ZAV::traceException(trace);
         return trace.exit<int>(OXA_FAILED);
