@@ -3,6 +3,7 @@
 
 #include <atomic>
 #include <cstdint>
+#include <mutex>
 #include <string>
 
 #include "embedded/ncs_association.h"
@@ -33,6 +34,10 @@ public:
     /// When waiting for `next` has been long enough. Waiting for the rest of one request, or for
     /// the client to take one answer, is one wait however often some of it comes.
     Milliseconds deadlineFor(Next next);
+
+    /// Held by the thread that serves the connection. Only one is woken at a time, so nobody waits
+    /// here for longer than the other one needs to leave; the lock is what orders the two.
+    std::mutex turn;
 
     /// When the connection is to be cut; kNever while it is served. For all threads.
     std::atomic<Milliseconds> deadline{kNever};

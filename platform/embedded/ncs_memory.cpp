@@ -13,16 +13,18 @@
 namespace ncs {
 namespace {
 
-/// Blocks hold powers of two from 64 KiB to 8 MiB; what is smaller or larger comes from the
-/// allocator.
+/// Kept blocks hold powers of two from 64 KiB to 8 MiB. What is much smaller comes from the
+/// allocator, what is larger from the system.
 constexpr std::size_t kSmallest = std::size_t{64} << 10;
 constexpr std::size_t kClasses = 8;
 constexpr std::size_t kMostKept = std::size_t{16} << 20;
-constexpr std::size_t kNoClass = kClasses;
+constexpr std::size_t kSmall = kClasses;
+constexpr std::size_t kHuge = kClasses + 1;
 
 /// Stands before every block.
 struct alignas(std::max_align_t) Head {
     std::size_t sizeClass;
+    std::size_t capacity;
     Head* next;  ///< among the kept blocks
 };
 
@@ -31,11 +33,11 @@ std::size_t sizeOf(std::size_t sizeClass) {
 }
 
 std::size_t classFor(std::size_t bytes) {
-    if (bytes <= kSmallest / 2) return kNoClass;
+    if (bytes <= kSmallest / 2) return kSmall;
     for (std::size_t i = 0; i < kClasses; ++i) {
         if (bytes <= sizeOf(i)) return i;
     }
-    return kNoClass;
+    return kHuge;
 }
 
 struct Kept {
@@ -59,51 +61,54 @@ Head* takeKept(std::size_t sizeClass) {
     return head;
 }
 
-Head* mapBlock(std::size_t sizeClass) {
-    void* const mapped = ::mmap(nullptr, sizeof(Head) + sizeOf(sizeClass), PROT_READ | PROT_WRITE,
+/// False when enough is kept already.
+bool keep(Head* head) {
+    Kept& pool = kept();
+    const std::lock_guard<std::mutex> lock(pool.lock);
+    if (pool.bytes + head->capacity > kMostKept) return false;
+    head->next = std::exchange(pool.blocks[head->sizeClass], head);
+    pool.bytes += head->capacity;
+    return true;
+}
+
+Head* mapBlock(std::size_t bytes) {
+    if (bytes > static_cast<std::size_t>(-1) - sizeof(Head)) return nullptr;
+    void* const mapped = ::mmap(nullptr, sizeof(Head) + bytes, PROT_READ | PROT_WRITE,
                                 MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
     return mapped == MAP_FAILED ? nullptr : static_cast<Head*>(mapped);
 }
 
 void unmapBlock(Head* head) {
-    ::munmap(head, sizeof(Head) + sizeOf(head->sizeClass));
+    ::munmap(head, sizeof(Head) + head->capacity);
 }
 
 }  // namespace
 
 void* takeBlock(std::size_t bytes, std::size_t* capacity) {
     const std::size_t sizeClass = classFor(bytes);
-    Head* head = nullptr;
-    if (sizeClass == kNoClass) {
-        if (bytes > static_cast<std::size_t>(-1) - sizeof(Head)) return nullptr;
-        head = static_cast<Head*>(std::malloc(sizeof(Head) + bytes));
-    } else {
-        head = takeKept(sizeClass);
-        if (head == nullptr) head = mapBlock(sizeClass);
+    const bool isKeepable = sizeClass < kClasses;
+    const std::size_t size = isKeepable ? sizeOf(sizeClass) : bytes;
+    Head* head = isKeepable ? takeKept(sizeClass) : nullptr;
+    if (sizeClass == kSmall) {
+        head = static_cast<Head*>(std::malloc(sizeof(Head) + size));
+    } else if (head == nullptr) {
+        head = mapBlock(size);
     }
     if (head == nullptr) return nullptr;
     head->sizeClass = sizeClass;
-    if (capacity != nullptr) *capacity = sizeClass == kNoClass ? bytes : sizeOf(sizeClass);
+    head->capacity = size;
+    if (capacity != nullptr) *capacity = size;
     return head + 1;
 }
 
 void giveBlock(void* block) {
     if (block == nullptr) return;
     Head* const head = static_cast<Head*>(block) - 1;
-    if (head->sizeClass == kNoClass) {
+    if (head->sizeClass == kSmall) {
         std::free(head);
-        return;
+    } else if (head->sizeClass == kHuge || !keep(head)) {
+        unmapBlock(head);
     }
-    {
-        Kept& pool = kept();
-        const std::lock_guard<std::mutex> lock(pool.lock);
-        if (pool.bytes + sizeOf(head->sizeClass) <= kMostKept) {
-            head->next = std::exchange(pool.blocks[head->sizeClass], head);
-            pool.bytes += sizeOf(head->sizeClass);
-            return;
-        }
-    }
-    unmapBlock(head);
 }
 
 void releaseKeptBlocks() {

@@ -126,6 +126,7 @@ void Server::Implementation::rearm(int descriptor, Source& source, std::uint32_t
 }
 
 void Server::Implementation::work() {
+    ::pthread_setname_np(::pthread_self(), "ncs");
     for (;;) {
         epoll_event event{};
         if (::epoll_wait(poll_.get(), &event, 1, -1) != 1) continue;
@@ -210,9 +211,11 @@ void Server::Implementation::admit(int socket, const Listener& listener) {
 }
 
 void Server::Implementation::serve(Connection& connection) {
+    std::unique_lock<std::mutex> turn(connection.turn);
     connection.deadline = kNever;
     const Connection::Next next = connection.serve();
     if (next == Connection::Next::Close) {
+        turn.unlock();  // nobody else waits for it: the socket is not armed
         close(connection);
         return;
     }
@@ -220,7 +223,7 @@ void Server::Implementation::serve(Connection& connection) {
     connection.deadline = deadline;
     wakeBy(deadline);
     const std::uint32_t event = next == Connection::Next::Write ? EPOLLOUT : EPOLLIN;
-    // The last step: another thread may serve the connection before this one returns.
+    // From here another thread may be woken for the connection; it waits for the end of this turn.
     rearm(connection.socket(), connection, event);
 }
 

@@ -1,0 +1,571 @@
+#include "embedded/ncs_association.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <memory>
+#include <random>
+#include <string>
+
+#include "embedded/ncs_memory.h"
+#include "platform/ncs_packets.h"
+#include "support/trace_capture.h"
+
+namespace {
+
+using namespace ncs_test;
+
+constexpr std::size_t kLimit = 100'000;
+
+/// Feeds an association by way of its windows and collects what it says.
+class Wire {
+public:
+    explicit Wire(std::size_t limit = kLimit, std::size_t budget = 10 * kLimit)
+        : shared(limit, budget), association(std::make_unique<ncs::Association>(shared, "")) {}
+
+    /// Portions of at most `size` bytes; stops when the association ends.
+    void feed(const std::string& bytes, std::size_t size = static_cast<std::size_t>(-1)) {
+        for (std::size_t at = 0; at < bytes.size() && association->isOpen();) {
+            at += put(bytes.substr(at, size));
+            takeOutput();
+        }
+    }
+    std::vector<Reply> answers() {
+        std::vector<Reply> found = replies(output);
+        output.clear();
+        return found;
+    }
+    std::vector<Reply> ask(const std::string& bytes) {
+        feed(bytes);
+        return answers();
+    }
+
+    ncs::SharedState shared;
+    std::unique_ptr<ncs::Association> association;
+    std::string output;
+
+private:
+    std::size_t put(const std::string& portion) {
+        iovec ranges[2];
+        const int count = association->windows(ranges);
+        std::size_t done = 0;
+        for (int i = 0; i < count; ++i) {
+            const std::size_t part = std::min(portion.size() - done, ranges[i].iov_len);
+            if (part > 0) std::memcpy(ranges[i].iov_base, portion.data() + done, part);
+            done += part;
+        }
+        association->received(done);
+        return done;
+    }
+    void takeOutput() {
+        while (!association->output().empty()) {
+            output += association->output();
+            association->output().clear();
+            association->handle();
+        }
+    }
+};
+
+class AnAssociation : public testing::Test {
+protected:
+    AnAssociation() {
+        registerEcho();
+        callsOfRepeat() = 0;
+    }
+    void bind() {
+        const std::vector<Reply> answers = wire.ask(bindPacket());
+        ASSERT_EQ(1U, answers.size());
+        ASSERT_EQ(kBindAck, answers[0].type);
+        ASSERT_EQ(0U, answers[0].number(16, 2));
+    }
+    bool isOpen() const { return wire.association->isOpen(); }
+
+    Wire wire;
+};
+
+/// Result and reason of the n-th context in an answer without a port.
+std::pair<unsigned, unsigned> resultOf(const Reply& answer, std::size_t n) {
+    return {answer.number(16 + 24 * n, 2), answer.number(18 + 24 * n, 2)};
+}
+
+using Result = std::pair<unsigned, unsigned>;
+
+TEST_F(AnAssociation, AcceptsAKnownInterfaceWithNdr) {
+    for (const bool little : {true, false}) {
+        Wire fresh;
+        const std::vector<Reply> answers = fresh.ask(bindPacket({Context{}}, little, kBind, 4280));
+        ASSERT_EQ(1U, answers.size());
+        EXPECT_EQ(kBindAck, answers[0].type);
+        EXPECT_EQ(3, answers[0].flags);
+        EXPECT_EQ(7U, answers[0].callId);
+        EXPECT_EQ(4280U, answers[0].number(0, 2));
+        EXPECT_EQ(4280U, answers[0].number(2, 2));
+        EXPECT_NE(0U, answers[0].number(4, 4));
+        EXPECT_EQ(1U, answers[0].number(12, 1));
+        EXPECT_EQ(Result(0, 0), resultOf(answers[0], 0));
+        EXPECT_TRUE(fresh.association->isBound());
+    }
+}
+
+TEST_F(AnAssociation, KeepsTheGroupThatAClientNames) {
+    EXPECT_EQ(0xABCDU,
+              wire.ask(bindPacket({Context{}}, true, kBind, 4280, 0xABCD))[0].number(4, 4));
+}
+
+TEST_F(AnAssociation, SaysWhyItRejectsAContext) {
+    Context unknown, wrongVersion, wrongMinor, wrongSyntax, oldSyntax;
+    unknown.interface = kUnknown;
+    wrongVersion.version = 2;
+    wrongMinor.version = 0x00010001;
+    wrongSyntax.syntax = kEcho;
+    oldSyntax.syntaxVersion = 1;
+    const std::vector<Reply> answers = wire.ask(
+        bindPacket({unknown, wrongVersion, wrongMinor, wrongSyntax, oldSyntax, Context{}}));
+    ASSERT_EQ(1U, answers.size());
+    EXPECT_EQ(Result(2, 1), resultOf(answers[0], 0));
+    EXPECT_EQ(Result(2, 1), resultOf(answers[0], 1));
+    EXPECT_EQ(Result(2, 1), resultOf(answers[0], 2));
+    EXPECT_EQ(Result(2, 2), resultOf(answers[0], 3));
+    EXPECT_EQ(Result(2, 2), resultOf(answers[0], 4));
+    EXPECT_EQ(Result(0, 0), resultOf(answers[0], 5));
+    EXPECT_TRUE(isOpen());
+}
+
+TEST_F(AnAssociation, FindsNdrAmongSeveralTransferSyntaxes) {
+    Packet packet(kBind, 1);
+    packet.u16(4280).u16(4280).u32(0).u8(1).u8(0).u16(0);
+    packet.u16(0).u8(2).u8(0).id(kEcho).u32(1).id(kEcho).u32(1).id(kNdr).u32(2);
+    EXPECT_EQ(Result(0, 0), resultOf(wire.ask(packet.done())[0], 0));
+}
+
+TEST_F(AnAssociation, HasALimitOfContexts) {
+    std::vector<Context> many(40);
+    for (std::uint16_t i = 0; i < 40; ++i)
+        many[i].id = i;
+    const std::vector<Reply> answers = wire.ask(bindPacket(many));
+    EXPECT_EQ(Result(0, 0), resultOf(answers[0], 31));
+    EXPECT_EQ(Result(2, 3), resultOf(answers[0], 32));
+    EXPECT_TRUE(isOpen());
+}
+
+TEST_F(AnAssociation, KeepsFragmentsBetweenWhatAllTakeAndWhatFits) {
+    EXPECT_EQ(1432U, wire.ask(bindPacket({Context{}}, true, kBind, 10))[0].number(0, 2));
+    Wire other;
+    EXPECT_EQ(65528U, other.ask(bindPacket({Context{}}, true, kBind, 65535))[0].number(2, 2));
+}
+
+TEST_F(AnAssociation, RefusesABindOfAnotherVersion) {
+    std::string packet = bindPacket();
+    packet[1] = 2;
+    const std::vector<Reply> answers = wire.ask(packet);
+    ASSERT_EQ(1U, answers.size());
+    EXPECT_EQ(kBindNak, answers[0].type);
+    EXPECT_EQ(4U, answers[0].number(0, 2));
+    EXPECT_FALSE(isOpen());
+}
+
+TEST_F(AnAssociation, RefusesAuthentication) {
+    std::string packet = Packet(kBind).raw(bindPacket().substr(16)).raw("12345678AUTH").done();
+    packet[10] = 4;
+    const std::vector<Reply> answers = wire.ask(packet);
+    ASSERT_EQ(1U, answers.size());
+    EXPECT_EQ(kBindNak, answers[0].type);
+    EXPECT_EQ(8U, answers[0].number(0, 2));
+    EXPECT_FALSE(isOpen());
+}
+
+TEST_F(AnAssociation, RefusesABindInPiecesASecondBindAndOneThatHoldsTooLittle) {
+    std::string first = bindPacket();
+    first[3] = 1;
+    EXPECT_EQ(kBindNak, wire.ask(first)[0].type);
+    EXPECT_FALSE(isOpen());
+
+    Wire second;
+    second.feed(bindPacket());
+    second.answers();
+    EXPECT_EQ(kBindNak, second.ask(bindPacket())[0].type);
+    EXPECT_FALSE(second.association->isOpen());
+
+    Wire third;
+    EXPECT_EQ(kBindNak, third.ask(Packet(kBind).u32(0).done())[0].type);
+    EXPECT_FALSE(third.association->isOpen());
+}
+
+TEST_F(AnAssociation, AnswersACall) {
+    bind();
+    for (const bool little : {true, false}) {
+        const std::vector<Reply> answers =
+            wire.ask(requestPackets(kRepeat, "stub data", 65504, 0x01020304, little));
+        ASSERT_EQ(1U, answers.size());
+        EXPECT_EQ(kResponse, answers[0].type);
+        EXPECT_EQ(3, answers[0].flags);
+        EXPECT_EQ(0x01020304U, answers[0].callId);
+        EXPECT_EQ(9U, answers[0].number(0, 4));
+        EXPECT_EQ("stub data", answers[0].stub());
+    }
+    EXPECT_EQ(2U, wire.shared.calls);
+    EXPECT_EQ(2U, wire.association->requestsDone());
+}
+
+TEST_F(AnAssociation, TellsTheStubTheCallersByteOrderManagerAndHandle) {
+    bind();
+    EXPECT_EQ(std::string("\1\1\1"), wire.ask(fragment(3, kOrder, "", 1, true))[0].stub());
+    EXPECT_EQ(std::string("\0\1\1", 3), wire.ask(fragment(3, kOrder, "", 1, false))[0].stub());
+}
+
+TEST_F(AnAssociation, TakesNoNoticeOfAnObject) {
+    bind();
+    EXPECT_EQ("abc", wire.ask(fragment(0x83, kRepeat, "abc"))[0].stub());
+}
+
+TEST_F(AnAssociation, PutsFragmentsTogetherWhereverTheyAreCut) {
+    bind();
+    const std::string stub = "The quick brown fox jumps over the lazy dog";
+    for (std::size_t part = 1; part <= stub.size(); ++part) {
+        for (const std::size_t portion : {1U, 7U, 24U, 25U, 1000U}) {
+            wire.feed(requestPackets(kRepeat, stub, part), portion);
+            const std::vector<Reply> answers = wire.answers();
+            ASSERT_EQ(1U, answers.size()) << part << " " << portion;
+            EXPECT_EQ(stub, answers[0].stub()) << part << " " << portion;
+        }
+    }
+}
+
+TEST_F(AnAssociation, TakesLargeRequestsInPortionsOfAnySize) {
+    bind();
+    std::string stub(60'000, '\0');
+    for (std::size_t i = 0; i < stub.size(); ++i)
+        stub[i] = static_cast<char>(i * 31 / 7);
+    for (const std::size_t part : {1408U, 5816U, 20'000U, 60'000U}) {
+        for (const std::size_t portion : {999U, 8192U, 8193U, 65'536U, 1'000'000U}) {
+            wire.feed(requestPackets(kRepeat, stub, part), portion);
+            EXPECT_EQ(stub, stubOf(wire.answers())) << part << " " << portion;
+        }
+    }
+}
+
+TEST_F(AnAssociation, AnswersRequestsThatComeOneBehindTheOther) {
+    bind();
+    std::string packets;
+    for (std::uint32_t i = 0; i < 500; ++i) {
+        packets += requestPackets(kRepeat, std::to_string(i), 2, i);
+    }
+    for (const std::size_t portion : {1U, 100U, 100'000U}) {
+        wire.feed(packets, portion);
+        const std::vector<Reply> answers = wire.answers();
+        ASSERT_EQ(500U, answers.size());
+        for (std::uint32_t i = 0; i < 500; ++i) {
+            EXPECT_EQ(i, answers[i].callId);
+            EXPECT_EQ(std::to_string(i), answers[i].stub());
+        }
+    }
+}
+
+TEST_F(AnAssociation, EmptyFragmentsAndAnEmptyRequestAreGood) {
+    bind();
+    EXPECT_EQ("", wire.ask(fragment(3, kRepeat, ""))[0].stub());
+    EXPECT_EQ("ab", wire.ask(fragment(1, kRepeat, "") + fragment(0, kRepeat, "ab") +
+                             fragment(0, kRepeat, "") + fragment(2, kRepeat, ""))[0]
+                        .stub());
+}
+
+TEST_F(AnAssociation, AnAllocationHintIsOnlyAHint) {
+    bind();
+    for (const std::uint32_t hint : {0U, 1U, 3U, 1000U, 0xFFFFFFFFU}) {
+        EXPECT_EQ("abc", wire.ask(fragment(1, kRepeat, "a", 1, true, 0, hint) +
+                                  fragment(2, kRepeat, "bc", 1, true, 0, hint))[0]
+                             .stub());
+    }
+}
+
+TEST_F(AnAssociation, NoTruncatedRequestIsAnsweredOrCalled) {
+    const std::string request = requestPackets(kRepeat, "0123456789abcdefghijklmnop", 10);
+    for (std::size_t length = 0; length < request.size(); ++length) {
+        Wire fresh;
+        fresh.feed(bindPacket());
+        fresh.answers();
+        fresh.feed(request.substr(0, length));
+        EXPECT_TRUE(fresh.answers().empty()) << length;
+        EXPECT_EQ(length > 0, fresh.association->isMidRequest()) << length;
+        EXPECT_EQ(0, callsOfRepeat()) << length;
+    }
+}
+
+TEST_F(AnAssociation, NoTruncatedBindIsAnswered) {
+    const std::string packet = bindPacket();
+    for (std::size_t length = 0; length < packet.size(); ++length) {
+        Wire fresh;
+        fresh.feed(packet.substr(0, length));
+        EXPECT_TRUE(fresh.answers().empty()) << length;
+        EXPECT_FALSE(fresh.association->isBound());
+    }
+}
+
+TEST_F(AnAssociation, ARequestOfExactlyTheLimitPassesAndOneByteMoreIsAFault) {
+    bind();
+    EXPECT_EQ(65'536U, stubOf(wire.ask(requestPackets(kRepeat, std::string(kLimit, 'x')))).size());
+    const std::vector<Reply> answers =
+        wire.ask(requestPackets(kRepeat, std::string(kLimit + 1, 'x')));
+    ASSERT_EQ(1U, answers.size());
+    EXPECT_EQ(kFault, answers[0].type);
+    EXPECT_EQ(0x1C00001BU, answers[0].fault());
+    EXPECT_EQ(0x23, answers[0].flags);
+    EXPECT_EQ(1, callsOfRepeat());
+    EXPECT_EQ("next", wire.ask(requestPackets(kRepeat, "next"))[0].stub());
+}
+
+TEST_F(AnAssociation, WithoutMemoryForAllACallIsAFaultAndLaterOnesPass) {
+    Wire poor(kLimit, 50'000);
+    poor.feed(bindPacket());
+    poor.answers();
+    EXPECT_EQ(0x1C00001BU, poor.ask(requestPackets(kRepeat, std::string(50'001, 'x')))[0].fault());
+    EXPECT_EQ(50'000U, stubOf(poor.ask(requestPackets(kRepeat, std::string(50'000, 'x')))).size());
+}
+
+TEST_F(AnAssociation, GivesMemoryBackWhenItEndsInTheMiddleOfARequest) {
+    {
+        Wire rich(kLimit, kLimit);
+        rich.feed(bindPacket());
+        rich.feed(fragment(1, kRepeat, std::string(60'000, 'x')));
+        EXPECT_FALSE(rich.shared.memory.take(kLimit));
+        rich.association.reset();
+        EXPECT_TRUE(rich.shared.memory.take(kLimit));
+    }
+}
+
+TEST_F(AnAssociation, FaultsLeaveTheAssociationUsable) {
+    bind();
+    struct Case {
+        std::string request;
+        std::uint32_t fault;
+        int flags;
+    };
+    const Case cases[] = {
+        {fragment(3, kRepeat, "x", 5, true, 9), 0x1C010003, 0x23},
+        {fragment(3, kOperations, "x", 5), 0x1C010002, 0x23},
+        {fragment(3, 0xFFFF, std::string(50'000, 'x'), 5), 0x1C010002, 0x23},
+        {fragment(3, kRefuse, "x", 5), 0x000006F7, 3},
+        {fragment(3, kThrow, "x", 5), 0x1C000012, 3},
+        {fragment(3, kOverfill, "x", 5), 0x1C000012, 3},
+        {requestPackets(kRefuse, std::string(3000, 'x'), 100, 5), 0x000006F7, 3},
+    };
+    for (const Case& c : cases) {
+        for (const std::size_t portion : {1U, 100'000U}) {
+            wire.feed(c.request, portion);
+            const std::vector<Reply> answers = wire.answers();
+            ASSERT_EQ(1U, answers.size());
+            EXPECT_EQ(kFault, answers[0].type);
+            EXPECT_EQ(c.fault, answers[0].fault());
+            EXPECT_EQ(c.flags, answers[0].flags);
+            EXPECT_EQ(5U, answers[0].callId);
+            EXPECT_TRUE(isOpen());
+        }
+    }
+    EXPECT_EQ("good", wire.ask(requestPackets(kRepeat, "good"))[0].stub());
+}
+
+TEST_F(AnAssociation, RejectedContextsCannotBeCalled) {
+    Context unknown;
+    unknown.interface = kUnknown;
+    wire.feed(bindPacket({unknown}));
+    wire.answers();
+    EXPECT_EQ(0x1C010003U, wire.ask(fragment(3, kRepeat, "x"))[0].fault());
+}
+
+TEST_F(AnAssociation, AlterContextAddsContexts) {
+    bind();
+    Context second;
+    second.id = 5;
+    EXPECT_EQ(0x1C010003U, wire.ask(fragment(3, kRepeat, "x", 1, true, 5))[0].fault());
+    const std::vector<Reply> answers = wire.ask(bindPacket({second}, true, kAlter));
+    ASSERT_EQ(1U, answers.size());
+    EXPECT_EQ(kAlterResponse, answers[0].type);
+    EXPECT_EQ(Result(0, 0), resultOf(answers[0], 0));
+    EXPECT_EQ("x", wire.ask(fragment(3, kRepeat, "x", 1, true, 5))[0].stub());
+    EXPECT_EQ("y", wire.ask(fragment(3, kRepeat, "y"))[0].stub());
+}
+
+TEST_F(AnAssociation, LargeRepliesComeInFragments) {
+    wire.feed(bindPacket({Context{}}, true, kBind, 1432));
+    wire.answers();
+    const std::vector<Reply> answers = wire.ask(fragment(3, kFill, ""));
+    EXPECT_EQ((65'536U + 1407) / 1408, answers.size());
+    EXPECT_EQ(std::string(65'536, 'f'), stubOf(answers));
+}
+
+TEST_F(AnAssociation, WaitsWithRequestsWhileItsAnswersAreNotTaken) {
+    bind();
+    std::string packets;
+    for (std::uint32_t i = 0; i < 100; ++i)
+        packets += fragment(3, kFill, "", i);
+    iovec ranges[2];
+    wire.association->windows(ranges);
+    ASSERT_LE(packets.size(), ranges[0].iov_len);
+    std::memcpy(ranges[0].iov_base, packets.data(), packets.size());
+    wire.association->received(packets.size());
+    EXPECT_LT(wire.association->output().size(), 400'000U);
+    std::size_t answered = 0;
+    while (!wire.association->output().empty()) {
+        for (const Reply& reply : replies(wire.association->output())) {
+            answered += (reply.flags & 2) != 0 ? 1 : 0;
+        }
+        wire.association->output().clear();
+        wire.association->handle();
+    }
+    EXPECT_EQ(100U, answered);
+}
+
+TEST_F(AnAssociation, ACallerThatWantsNoAnswerGetsNone) {
+    bind();
+    EXPECT_TRUE(wire.ask(fragment(0x43, kRepeat, "x")).empty());
+    EXPECT_EQ(1, callsOfRepeat());
+    EXPECT_TRUE(wire.ask(fragment(0x43, kRefuse, "x")).empty());
+    EXPECT_TRUE(isOpen());
+}
+
+TEST_F(AnAssociation, CancelsComeTooLateAndAreIgnored) {
+    bind();
+    EXPECT_TRUE(wire.ask(Packet(kCancel).done()).empty());
+    EXPECT_EQ("ab", wire.ask(fragment(1, kRepeat, "a") + Packet(kCancel).done() +
+                             fragment(2, kRepeat, "b"))[0]
+                        .stub());
+}
+
+TEST_F(AnAssociation, AnOrphanedCallIsForgotten) {
+    bind();
+    EXPECT_TRUE(wire.ask(fragment(1, kRepeat, "a", 4) + Packet(kOrphaned, 4).done()).empty());
+    EXPECT_EQ(0, callsOfRepeat());
+    EXPECT_EQ("b", wire.ask(fragment(3, kRepeat, "b", 5))[0].stub());
+    EXPECT_TRUE(wire.ask(Packet(kOrphaned, 5).done()).empty());
+    EXPECT_EQ("ab", wire.ask(fragment(1, kRepeat, "a", 6) + Packet(kOrphaned, 5).done() +
+                             fragment(2, kRepeat, "b", 6))[0]
+                        .stub());
+}
+
+TEST_F(AnAssociation, WhatBreaksTheProtocolGetsAFaultAndTheEnd) {
+    const std::string bound = bindPacket();
+    std::string withAuth = fragment(3, kRepeat, "12345678");
+    withAuth[10] = 4;
+    std::string tooShort = fragment(3, kRepeat, "");
+    tooShort[8] = 23;
+    std::string noHeader = fragment(3, kRepeat, "");
+    noHeader[8] = 15;
+    std::string ebcdic = fragment(3, kRepeat, "");
+    ebcdic[4] = 0x11;
+    std::string longControl = Packet(kCancel).raw(std::string(9000, 'x')).done();
+    std::string objectTooShort = fragment(3, kRepeat, "");
+    objectTooShort[3] = static_cast<char>(0x83);
+    const std::string cases[] = {
+        bound + fragment(0, kRepeat, "x"),
+        bound + fragment(2, kRepeat, "x"),
+        bound + fragment(1, kRepeat, "x") + fragment(1, kRepeat, "x"),
+        bound + fragment(1, kRepeat, "x", 1) + fragment(2, kRepeat, "x", 2),
+        bound + fragment(1, kRepeat, "x") + fragment(2, kOrder, "x"),
+        bound + fragment(1, kRepeat, "x", 1, true) + fragment(2, kRepeat, "x", 1, false),
+        bound + fragment(1, kRepeat, "x", 1, true, 0) + fragment(2, kRepeat, "x", 1, true, 1),
+        bound + fragment(1, kRepeat, "x") + bindPacket({Context{}}, true, kAlter),
+        bound + withAuth,
+        bound + tooShort,
+        bound + noHeader,
+        bound + ebcdic,
+        bound + longControl,
+        bound + objectTooShort,
+        bound + Packet(kAlter).u32(0).done(),
+        bound + Packet(kResponse).u32(0).done(),
+        bound + Packet(kFault).u32(0).done(),
+        bound + Packet(kBindAck).u32(0).done(),
+        bound + Packet(kBindNak).u32(0).done(),
+        bound + Packet(kAlterResponse).u32(0).done(),
+        bound + Packet(kAuth3).u32(0).done(),
+        bound + Packet(kShutdown).done(),
+        bound + Packet(1).done(),
+        bound + Packet(255).done(),
+        fragment(3, kRepeat, "x"),
+        bindPacket({Context{}}, true, kAlter),
+    };
+    int number = 0;
+    for (const std::string& c : cases) {
+        for (const std::size_t portion : {1U, 100'000U}) {
+            Wire fresh;
+            fresh.feed(c, portion);
+            const std::vector<Reply> answers = fresh.answers();
+            ASSERT_FALSE(answers.empty()) << number;
+            EXPECT_EQ(kFault, answers.back().type) << number;
+            EXPECT_EQ(0x1C01000BU, answers.back().fault()) << number;
+            EXPECT_FALSE(fresh.association->isOpen()) << number;
+        }
+        ++number;
+    }
+    EXPECT_EQ(0, callsOfRepeat());
+}
+
+TEST_F(AnAssociation, WhatIsNoPacketAtAllGetsNothing) {
+    EXPECT_TRUE(wire.ask("GET / HTTP/1.1\r\n\r\n").empty());
+    EXPECT_FALSE(isOpen());
+}
+
+TEST_F(AnAssociation, ControlPacketsStandBetweenFragmentsOfACall) {
+    bind();
+    const std::string head(60'000, 'h');
+    wire.feed(fragment(1, kRepeat, head) + Packet(kCancel).done() + fragment(2, kRepeat, "t"), 777);
+    EXPECT_EQ(head + "t", stubOf(wire.answers()));
+}
+
+TEST_F(AnAssociation, ALaterRegistrationServesBoundCallers) {
+    bind();
+    static constexpr rpc__server_stub kStubs[] = {refuseStub};
+    static constexpr rpc__server_epv kVector = {kStubs, 1};
+    static constexpr rpc__if_spec kSmaller = {"echo", kEcho, 1, 1};
+    std::uint32_t status = 1;
+    rpc__register_mgr(&uuid__nil, &kSmaller, &kVector, nullptr, &status);
+    ASSERT_EQ(0U, status);
+    EXPECT_EQ(0x6F7U, wire.ask(fragment(3, kRepeat, "x"))[0].fault());
+    EXPECT_EQ(0x1C010002U, wire.ask(fragment(3, kOrder, "x"))[0].fault());
+    registerEcho();
+}
+
+TEST_F(AnAssociation, TracesWhatItRejects) {
+    bind();
+    const TraceCapture trace;
+    wire.ask(fragment(3, kRefuse, "x", 5));
+    EXPECT_THAT(trace.details("ncs"),
+                testing::ElementsAre("Call 5 of operation 2 ends with fault 000006f7"));
+}
+
+/// Changes a good conversation in a few places: whatever comes of it, the association answers with
+/// packets or ends, and never looks where it must not (which the sanitizers watch).
+TEST_F(AnAssociation, SurvivesDamagedConversations) {
+    std::mt19937 random(20240229);
+    const auto pick = [&random](std::size_t count) { return random() % count; };
+    const std::string good = bindPacket() + requestPackets(kRepeat, std::string(300, 'x'), 100) +
+                             Packet(kCancel).done() + bindPacket({Context{}}, false, kAlter) +
+                             requestPackets(kFill, "y", 100, 2, false) +
+                             fragment(0x83, kOrder, "z") + Packet(kOrphaned).done();
+    for (int round = 0; round < 20'000; ++round) {
+        std::string damaged = good;
+        for (std::size_t i = pick(6) + 1; i > 0; --i) {
+            const std::size_t at = pick(damaged.size());
+            switch (pick(4)) {
+                case 0:
+                    damaged[at] = static_cast<char>(random());
+                    break;
+                case 1:
+                    damaged.erase(at, pick(20));
+                    break;
+                case 2:
+                    damaged.insert(at, pick(20), static_cast<char>(random()));
+                    break;
+                default:
+                    damaged[at] = static_cast<char>(damaged[at] ^ (1 << pick(8)));
+            }
+            if (damaged.empty()) damaged = good;
+        }
+        Wire fresh(2000, 2000);
+        fresh.feed(damaged, pick(2) == 0 ? pick(50) + 1 : damaged.size());
+        ASSERT_NO_THROW(fresh.answers()) << round;
+        fresh.association.reset();
+        ASSERT_TRUE(fresh.shared.memory.take(2000)) << round;
+    }
+}
+
+}  // namespace

@@ -1,0 +1,120 @@
+// ctest-label: threaded
+#include "embedded/ncs_memory.h"
+
+#include <gtest/gtest.h>
+
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <thread>
+#include <vector>
+
+#include "embedded/ncs_stub_buffer.h"
+#include "platform/ncs.h"
+
+namespace {
+
+constexpr std::size_t kKiB = 1024;
+constexpr std::size_t kMiB = 1024 * kKiB;
+
+class Blocks : public testing::Test {
+protected:
+    Blocks() { ncs::releaseKeptBlocks(); }
+    ~Blocks() override { ncs::releaseKeptBlocks(); }
+};
+
+TEST_F(Blocks, HoldWhatWasAskedForAndAreAligned) {
+    for (const std::size_t size : {std::size_t{0}, std::size_t{1}, 32 * kKiB, 32 * kKiB + 1,
+                                   64 * kKiB, 4 * kMiB, 4 * kMiB + 1, 8 * kMiB, 9 * kMiB}) {
+        std::size_t capacity = 0;
+        void* const block = ncs::takeBlock(size, &capacity);
+        ASSERT_NE(nullptr, block);
+        EXPECT_GE(capacity, size);
+        EXPECT_EQ(0U, reinterpret_cast<std::uintptr_t>(block) % alignof(std::max_align_t));
+        std::memset(block, 'x', capacity);
+        ncs::giveBlock(block);
+    }
+}
+
+TEST_F(Blocks, TheLatestLargeOneIsUsedAgain) {
+    void* const first = rpc__malloc(3 * kMiB);
+    rpc__free(first);
+    EXPECT_EQ(4 * kMiB, ncs::keptBytes());
+    void* const second = rpc__malloc(4 * kMiB);
+    EXPECT_EQ(first, second);
+    EXPECT_EQ(0U, ncs::keptBytes());
+    rpc__free(second);
+}
+
+TEST_F(Blocks, SmallOnesAreNotKept) {
+    rpc__free(rpc__malloc(100));
+    rpc__free(rpc__malloc(32 * kKiB));
+    EXPECT_EQ(0U, ncs::keptBytes());
+}
+
+TEST_F(Blocks, FewAreKeptAndReleasedOnDemand) {
+    std::vector<void*> blocks;
+    for (int i = 0; i < 10; ++i)
+        blocks.push_back(rpc__malloc(4 * kMiB));
+    for (void* block : blocks)
+        rpc__free(block);
+    EXPECT_EQ(16 * kMiB, ncs::keptBytes());
+    ncs::releaseKeptBlocks();
+    EXPECT_EQ(0U, ncs::keptBytes());
+}
+
+TEST_F(Blocks, WhatCannotBeHadIsNull) {
+    EXPECT_EQ(nullptr, rpc__malloc(static_cast<std::size_t>(-1)));
+    EXPECT_EQ(nullptr, rpc__malloc(static_cast<std::size_t>(-1) / 2));
+    rpc__free(nullptr);
+}
+
+TEST_F(Blocks, MayBeTakenAndGivenByManyThreads) {
+    std::vector<std::thread> threads;
+    for (int t = 0; t < 4; ++t) {
+        threads.emplace_back([t] {
+            for (int i = 0; i < 500; ++i) {
+                auto* const block = static_cast<char*>(rpc__malloc((64 << (i % 4)) * kKiB));
+                block[0] = static_cast<char>(t);
+                std::this_thread::yield();
+                EXPECT_EQ(t, block[0]);
+                rpc__free(block);
+            }
+        });
+    }
+    for (std::thread& thread : threads)
+        thread.join();
+}
+
+TEST(BlockCopy, CopiesBytes) {
+    char to[4] = "abc";
+    rpc__block_copy("xyz", to, 2);
+    EXPECT_STREQ("xyc", to);
+}
+
+TEST(Buffer, KeepsItsContentWhileItGrows) {
+    ncs::MemoryBudget budget(kMiB);
+    ncs::StubBuffer buffer(budget);
+    for (std::size_t i = 0; i < 1000; ++i) {
+        ASSERT_TRUE(buffer.reserve(1000, 0));
+        std::memset(buffer.end(), static_cast<int>(i % 251), 1000);
+        buffer.grow(1000);
+    }
+    EXPECT_EQ(1'000'000U, buffer.size());
+    for (std::size_t i = 0; i < 1'000'000; ++i) {
+        ASSERT_EQ(i / 1000 % 251, buffer.data()[i]);
+    }
+}
+
+TEST(Buffer, CountsAgainstTheBudgetWhatIsFilledAndNotWhatIsExpected) {
+    ncs::MemoryBudget budget(1000);
+    ncs::StubBuffer first(budget), second(budget);
+    EXPECT_TRUE(first.reserve(600, 4 * kMiB));
+    EXPECT_FALSE(second.reserve(401, 0));
+    EXPECT_TRUE(second.reserve(400, 0));
+    first.release();
+    second.grow(400);
+    EXPECT_TRUE(second.reserve(600, 0));
+}
+
+}  // namespace
