@@ -5,7 +5,7 @@ set -eu
 cd "$(dirname "$0")/.."
 
 packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev libexpat1-dev
-libboost-dev nlohmann-json3-dev libcli11-dev mksh curl procps'
+libboost-dev nlohmann-json3-dev libcli11-dev mksh curl procps shellcheck'
 
 as_root() {
     if [ "$(id -u)" -eq 0 ]; then "$@"; else sudo "$@"; fi

@@ -36,7 +36,7 @@ bool operator==(const uuid__t& a, const uuid__t& b) {
 bool findInterface(const uuid__t& id, std::uint32_t version, RegisteredInterface& found) {
     const std::lock_guard<std::mutex> lock(registry().guard);
     for (const RegisteredInterface& candidate : registry().interfaces) {
-        if (candidate.specification->id == id && candidate.specification->version == version) {
+        if (candidate.interface->id == id && candidate.interface->version == version) {
             found = candidate;
             return true;
         }
@@ -61,8 +61,8 @@ void rpc__register_mgr(const uuid__t* object, const rpc__if_spec* interface,
     const std::lock_guard<std::mutex> lock(registry().guard);
     *status = rpc__s_ok;
     for (ncs::RegisteredInterface& known : registry().interfaces) {
-        if (ncs::operator==(known.specification->id, interface->id) &&
-            known.specification->version == interface->version) {
+        if (ncs::operator==(known.interface->id, interface->id) &&
+            known.interface->version == interface->version) {
             known = {interface, stubs, manager};
             return;
         }

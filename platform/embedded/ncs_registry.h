@@ -6,7 +6,7 @@
 namespace ncs {
 
 struct RegisteredInterface {
-    const rpc__if_spec* specification = nullptr;
+    const rpc__if_spec* interface = nullptr;
     const rpc__server_epv* stubs = nullptr;
     const void* manager = nullptr;
 };

@@ -186,7 +186,7 @@ TEST(Interface, IsRegisteredUnderItsIdentifierAndVersion) {
     ncs::RegisteredInterface found;
     const uuid__t id = {0xb1fb0fb3, 0x03c4, 0, 2, {0, 0, 0x09, 0x35, 0x18, 0x3d, 0}};
     ASSERT_TRUE(ncs::findInterface(id, 1, found));
-    EXPECT_EQ(found.specification->operations, 1);
+    EXPECT_EQ(found.interface->operations, 1);
     EXPECT_EQ(found.stubs, QVS_Agent_v1_server_epv_locator());
     EXPECT_EQ(static_cast<const QVS_Agent_v1_mgr_epv*>(found.manager)->BinaryDataTransfer,
               &ZAV::BinaryDataTransfer);
