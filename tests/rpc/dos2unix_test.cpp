@@ -1,0 +1,194 @@
+// The steps of the line-end conversion that fail, one after the other.
+#include <dlfcn.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "rpc/zavrpc.h"
+#include "support/scratch_dir.h"
+#include "support/trace_capture.h"
+#include "util/zavutil.h"
+
+// These definitions come before the C library's, so that each of the steps can be made to fail for
+// paths that end in a given text.
+namespace {
+
+struct Failure {
+    std::string step;
+    std::string end;
+};
+Failure failing;
+
+bool fails(const char* step, const std::string& path) {
+    const std::string& end = failing.end;
+    if (failing.step != step || path.size() < end.size()) return false;
+    return path.compare(path.size() - end.size(), end.size(), end) == 0;
+}
+
+template <typename Function>
+Function next(const char* name) {
+    return reinterpret_cast<Function>(::dlsym(RTLD_NEXT, name));
+}
+
+int failWith(int error) {
+    errno = error;
+    return -1;
+}
+
+}  // namespace
+
+extern "C" {
+
+int chmod(const char* path, mode_t mode) noexcept {
+    if (fails("chmod", path)) return failWith(EPERM);
+    return next<int (*)(const char*, mode_t)>("chmod")(path, mode);
+}
+
+int unlink(const char* path) noexcept {
+    if (fails("unlink", path)) return failWith(EACCES);
+    return next<int (*)(const char*)>("unlink")(path);
+}
+
+int link(const char* from, const char* to) noexcept {
+    if (fails("link", to)) return failWith(EXDEV);
+    return next<int (*)(const char*, const char*)>("link")(from, to);
+}
+
+int fclose(std::FILE* file) {
+    char path[4096] = "";
+    const std::string descriptor = "/proc/self/fd/" + std::to_string(::fileno(file));
+    const ssize_t length = ::readlink(descriptor.c_str(), path, sizeof path - 1);
+    const bool toFail =
+        length > 0 && fails("fclose", std::string(path, static_cast<std::size_t>(length)));
+    const int closed = next<int (*)(std::FILE*)>("fclose")(file);
+    if (!toFail) return closed;
+    errno = EIO;
+    return EOF;
+}
+
+}  // extern "C"
+
+namespace {
+
+using Texts = std::vector<std::string>;
+
+class Dos2Unix : public testing::Test {
+protected:
+    Dos2Unix() {
+        ::setenv("TOVRINHOME", scratch_.makeDir("home").c_str(), 1);
+        scratch_.makeDir("home/tmp");
+        ::setenv("QVSDEPLOY_AGENTDEPOT", scratch_.makeDir("depot").c_str(), 1);
+        forget();
+        file_ = scratch_.write("depot/install.sh", "a\r\nb\x1a");
+    }
+    ~Dos2Unix() override {
+        failing = {};
+        ::unsetenv("TOVRINHOME");
+        ::unsetenv("QVSDEPLOY_AGENTDEPOT");
+        forget();
+    }
+
+    static void forget() {
+        ZAV::Util::_homeDir.clear();
+        ZAV::Util::_agentDepotDir.clear();
+    }
+
+    /// The error lines of a conversion that fails because one step does.
+    Texts errorsOf(const Failure& failure) {
+        failing = failure;
+        TraceCapture trace;
+        EXPECT_EQ(-1, convertDOS2Unix(file_.c_str()));
+        failing = {};
+        return trace.errors("zavrpc");
+    }
+
+    bool exists() const { return scratch_.exists("depot/install.sh"); }
+    std::string original() const { return scratch_.read("depot/install.sh"); }
+    std::string converted() const { return scratch_.read("home/tmp/.zavtemp"); }
+    std::string temporary() const { return scratch_.path("home") + "//tmp/.zavtemp"; }
+    static std::string why(int error) {
+        return "ERRNO: " + std::to_string(error) + " - " + std::strerror(error);
+    }
+
+    ScratchDir scratch_;
+    std::string file_;
+};
+
+TEST_F(Dos2Unix, NamesItsTemporaryFileAndLeavesNone) {
+    TraceCapture trace;
+    EXPECT_EQ(0, convertDOS2Unix(file_.c_str()));
+    EXPECT_EQ(1, trace.count('D', "tempfile name: [" + temporary() + "]"));
+    EXPECT_EQ(Texts{}, trace.errors("zavrpc"));
+    EXPECT_EQ("a\nb", original());
+    EXPECT_FALSE(scratch_.exists("home/tmp/.zavtemp"));
+}
+
+TEST_F(Dos2Unix, EitherFileMayFailToClose) {
+    EXPECT_EQ((Texts{"Could not close [" + file_ + "]."}), errorsOf({"fclose", "/install.sh"}));
+    EXPECT_EQ((Texts{"Could not close [" + temporary() + "]."}), errorsOf({"fclose", "/.zavtemp"}));
+    EXPECT_EQ("a\r\nb\x1a", original());
+}
+
+TEST_F(Dos2Unix, AnInputMayFailToCloseWhenThereIsNoTemporaryFile) {
+    ASSERT_EQ(0, ::rmdir((scratch_.path("home") + "/tmp").c_str()));
+    EXPECT_EQ((Texts{"Could not open [" + temporary() + "] for writing.",
+                     "Could not close [" + file_ + "]."}),
+              errorsOf({"fclose", "/install.sh"}));
+}
+
+TEST_F(Dos2Unix, PermissionsThatCannotBeSetLeaveTheOriginal) {
+    EXPECT_EQ((Texts{"Failed to set permissions on file [" + temporary() + "] to [504]"}),
+              errorsOf({"chmod", "/.zavtemp"}));
+    EXPECT_EQ("a\r\nb\x1a", original());
+}
+
+TEST_F(Dos2Unix, AnOriginalThatCannotBeRemovedStays) {
+    EXPECT_EQ((Texts{"Failed to unlink file [" + file_ + "]. " + why(EACCES)}),
+              errorsOf({"unlink", "/install.sh"}));
+    EXPECT_EQ("a\r\nb\x1a", original());
+}
+
+TEST_F(Dos2Unix, AResultThatCannotBeLinkedStaysInTheTemporaryFile) {
+    EXPECT_EQ(
+        (Texts{"Failed to link file [" + temporary() + "] to [" + file_ + "]. " + why(EXDEV)}),
+        errorsOf({"link", "/install.sh"}));
+    EXPECT_FALSE(exists());
+    EXPECT_EQ("a\nb", converted());
+}
+
+TEST_F(Dos2Unix, ATemporaryFileThatCannotBeRemovedIsAFailureAtTheEnd) {
+    EXPECT_EQ((Texts{"Failed to unlink temp file [" + temporary() + "]. " + why(EACCES)}),
+              errorsOf({"unlink", "/.zavtemp"}));
+    EXPECT_EQ("a\nb", original());
+}
+
+TEST_F(Dos2Unix, WithoutAHomeTheTemporaryFileIsInTheWorkingDirectory) {
+    ::unsetenv("TOVRINHOME");
+    forget();
+    failing = {"unlink", "/install.sh"};
+    TraceCapture trace;
+    EXPECT_EQ(-1, convertDOS2Unix(file_.c_str()));
+    EXPECT_EQ(1, trace.count('D', "tempfile name: [.zavtemp]"));
+    EXPECT_EQ(0, ::unlink(".zavtemp"));
+}
+
+TEST_F(Dos2Unix, ATransferWhosePermissionsCannotBeSetCarriesOn) {
+    failing = {"chmod", "/depot/install.sh"};
+    const ZAV::DataChunk chunk{3, {'x', '\r', '\n'}};
+    std::int32_t status = -1;
+    TraceCapture trace;
+    BinaryDataTransfer(nullptr, 0, "install.sh", 0, 1, 0, &chunk, &status);
+    EXPECT_EQ(0, status);
+    EXPECT_EQ((Texts{"Failed to set permissions on file [" + file_ + "] to [504]"}),
+              trace.errors("zavrpc"));
+    EXPECT_EQ(1, trace.count('D', "Its a file we're interested in: " + file_));
+    EXPECT_EQ("x\n", original());
+}
+
+}  // namespace
