@@ -40,6 +40,7 @@ missing=$(missing_of $packages)
 # shellcheck disable=SC2086
 missing_judges=$(missing_of $judges)
 if [ -n "$missing$missing_judges" ]; then
+    # shellcheck disable=SC2086
     echo bootstrap: installing $missing $missing_judges
     refresh_lists
 fi
