@@ -12,8 +12,9 @@ extern "C" {
 
 /// Starts the library: registers its tables, starts the task manager and registers the file
 /// transfer interface. Without a home directory it does nothing, and the library stays inert.
-/// Returns the status of the interface's registration, 0 without a home. Called once, on one
-/// thread; nothing that it starts ends before the process does. Throws nothing.
+/// Returns the status of the interface's registration, 0 without a home, OXA_FAILED when there was
+/// no memory to finish. Called once, on one thread; nothing that it starts ends before the process
+/// does. Throws nothing.
 [[gnu::visibility("default")]] int Initialize_Mgmt_Functions();
 
 }  // extern "C"

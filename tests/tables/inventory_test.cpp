@@ -36,8 +36,7 @@ Texts productsOfLines(const std::string& lines) {
     return productsOf("*** noise\n" + kHeader + "\n" + lines);
 }
 
-// ---- The architecture probe
-// ----------------------------------------------------------------------
+// ---- The architecture probe ---------------------------------------------------------------------
 
 TEST(ArchitectureProbe, HasThisCommandLine) {
     EXPECT_EQ(
@@ -91,8 +90,7 @@ TEST(ArchitectureProbe, ThatPrintsTooMuchYieldsNothing) {
               trace.errors("zav03agt"));
 }
 
-// ---- The inventory
-// -------------------------------------------------------------------------------
+// ---- The inventory ------------------------------------------------------------------------------
 
 TEST(Inventory, HasThisCommandLine) {
     EXPECT_EQ("/opt/tovrin/bin/cinfo -d", narrow(inventoryCommand("/opt/tovrin")));

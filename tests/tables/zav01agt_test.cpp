@@ -67,8 +67,7 @@ protected:
     }
 };
 
-// ---- Schema
-// --------------------------------------------------------------------------------------
+// ---- Schema -------------------------------------------------------------------------------------
 
 TEST(RequestTableSchema, DescribesItsColumns) {
     Made request("KAGREQT");
@@ -191,8 +190,7 @@ TEST(RequestTableSchema, PrintsNothingWhenDetailIsOff) {
     EXPECT_TRUE(trace.lines().empty());
 }
 
-// ---- Start-up
-// ------------------------------------------------------------------------------------
+// ---- Start-up -----------------------------------------------------------------------------------
 
 TEST(RequestTableInit, RegistersTheTable) {
     EXPECT_STREQ("ZAV", zav_kagreqt_application);
@@ -210,8 +208,7 @@ TEST(RequestTableInit, RegistersTheTable) {
     EXPECT_TRUE(found);
 }
 
-// ---- Requests
-// ------------------------------------------------------------------------------------
+// ---- Requests -----------------------------------------------------------------------------------
 
 TEST_F(RequestTable, ARequestWithoutFilterIs1002) {
     const zav_kagreqt_data_t row = answer({});
@@ -339,8 +336,7 @@ TEST_F(RequestTable, GetconfigIsAnsweredWithTheConfiguration) {
     ZAV_TOVRINHOME = nullptr;
 }
 
-// ---- Events
-// --------------------------------------------------------------------------------------
+// ---- Events -------------------------------------------------------------------------------------
 
 class RequestEvents : public testing::Test {
 protected:

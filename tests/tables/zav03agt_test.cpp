@@ -32,8 +32,7 @@ const std::vector<ExpectedColumn> kColumns = {
     {"PLATFORM", "platform", 727, 20, 9},
 };
 
-// ---- Schema
-// --------------------------------------------------------------------------------------
+// ---- Schema -------------------------------------------------------------------------------------
 
 TEST(InstalledTableSchema, DescribesItsColumns) {
     Made request("KINAGT");
@@ -102,8 +101,7 @@ TEST(InstalledTableSchema, PrintsItselfAndItsRows) {
     EXPECT_EQ(expected, trace.details("zav03agt"));
 }
 
-// ---- Samples
-// -------------------------------------------------------------------------------------
+// ---- Samples ------------------------------------------------------------------------------------
 
 class InstalledTable : public testing::Test {
 protected:
@@ -232,8 +230,7 @@ TEST_F(InstalledTable, AShorterProductLeavesNothingOfTheOneBefore) {
     EXPECT_EQ(padded("e", 12), fieldText(found[1].release));
 }
 
-// ---- Failures
-// ------------------------------------------------------------------------------------
+// ---- Failures -----------------------------------------------------------------------------------
 
 class FailingProbe : public InstalledTable {
 protected:
@@ -326,8 +323,7 @@ TEST_F(InstalledTable, TwoIdenticalLinesAreOneRow) {
     EXPECT_EQ(1u, rows().size());
 }
 
-// ---- Many lines, many queries
-// --------------------------------------------------------------------
+// ---- Many lines, many queries -------------------------------------------------------------------
 
 TEST_F(InstalledTable, ThousandsOfProductsAreListed) {
     std::string lines;
@@ -354,8 +350,7 @@ TEST_F(InstalledTable, QueriesDoNotDisturbEachOther) {
         query.join();
 }
 
-// ---- Events
-// --------------------------------------------------------------------------------------
+// ---- Events -------------------------------------------------------------------------------------
 
 TEST_F(InstalledTable, EventsReachSubscribers) {
     std::size_t delivered = 0;

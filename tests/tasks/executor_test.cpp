@@ -69,8 +69,7 @@ protected:
     }
 };
 
-// ---- Start-up
-// ------------------------------------------------------------------------------------
+// ---- Start-up -----------------------------------------------------------------------------------
 
 TEST_F(Executor, IsNotStartedWithoutADepot) {
     if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
@@ -112,8 +111,7 @@ TEST_F(Executor, IsStartedOnce) {
     EXPECT_EQ(1u, trace.errors("zavtasks").size());
 }
 
-// ---- Running tasks
-// -------------------------------------------------------------------------------
+// ---- Running tasks ------------------------------------------------------------------------------
 
 TEST_F(Executor, AnAcceptedInstallIsAnsweredAtOnceAndReportedLater) {
     start();
@@ -315,8 +313,7 @@ TEST_F(Executor, AnOutcomeWithoutSubscribersIsLost) {
     EXPECT_TRUE(trace.errors().empty());
 }
 
-// ---- Manners
-// -------------------------------------------------------------------------------------
+// ---- Manners ------------------------------------------------------------------------------------
 
 TEST_F(Executor, LeavesSignalsToTheHost) {
     sigset_t before;

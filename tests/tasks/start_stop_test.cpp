@@ -149,8 +149,7 @@ TEST_F(StartStop, WithoutATaskFailuresAreOnlyTraced) {
         trace.errors("zavtasks"));
 }
 
-// ---- Restart
-// -------------------------------------------------------------------------------------
+// ---- Restart ------------------------------------------------------------------------------------
 
 TEST_F(StartStop, ARestartStopsAndStarts) {
     TraceCapture trace;
@@ -181,8 +180,7 @@ TEST_F(StartStop, ARestartMayFailTwice) {
     expectMessage(task_, "ZAV1024E", scriptLine("start ux"));
 }
 
-// ---- Other users
-// ---------------------------------------------------------------------------------
+// ---- Other users --------------------------------------------------------------------------------
 
 TEST_F(StartStop, ARecordedUserRunsTheCommand) {
     runAs(agentEntry("ux", "inst1", "no-such-user"));

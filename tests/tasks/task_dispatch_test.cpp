@@ -67,8 +67,7 @@ protected:
     }
 };
 
-// ---- What every request needs
-// --------------------------------------------------------------------
+// ---- What every request needs -------------------------------------------------------------------
 
 TEST_F(TaskDispatch, WithoutCommandAndTransidTheLastMissingOneIsReported) {
     TraceCapture trace;
@@ -136,8 +135,7 @@ TEST_F(TaskDispatch, SupportedTasksAreFoundInTheList) {
     EXPECT_TRUE(isSupportedTask("EXTRA"));
 }
 
-// ---- Required parameters
-// -------------------------------------------------------------------------
+// ---- Required parameters ------------------------------------------------------------------------
 
 struct Missing {
     const char* command;
@@ -225,8 +223,7 @@ TEST_F(TaskDispatch, RequiredParameterReplacesCodeAndMessage) {
     expectAnswer(task, 1002, "ZAV1002E", "");
 }
 
-// ---- The universal agent
-// -------------------------------------------------------------------------
+// ---- The universal agent ------------------------------------------------------------------------
 
 TEST_F(TaskDispatch, InstancesOfTheUniversalAgentAreNotRemoved) {
     TraceCapture trace;
@@ -246,8 +243,7 @@ TEST_F(TaskDispatch, ARefusalForTheUniversalAgentComesBeforeMissingParameters) {
     expectRefused(task, 1006, "REMOVEINSTANCE");
 }
 
-// ---- Commands that run at once
-// -------------------------------------------------------------------
+// ---- Commands that run at once ------------------------------------------------------------------
 
 TEST_F(TaskDispatch, GetconfigRunsAtOnce) {
     fake_handlers::behave([](const std::string&, TaskQueueElem& task) {
@@ -275,8 +271,7 @@ TEST_F(TaskDispatch, CompleteInstallRunsAtOnceAndRequiresNothing) {
     expectAnswer(task, 1031, "ZAV1031E", "rc.txt,3");
 }
 
-// ---- The queue
-// -----------------------------------------------------------------------------------
+// ---- The queue ----------------------------------------------------------------------------------
 
 TEST_F(TaskDispatch, TheQueueKeepsCopies) {
     TaskQueueElem task = complete("START");
@@ -297,8 +292,7 @@ TEST_F(TaskDispatch, TheQueueKeepsTheOrder) {
     EXPECT_EQ("123", order);
 }
 
-// ---- What the executor runs
-// ----------------------------------------------------------------------
+// ---- What the executor runs ---------------------------------------------------------------------
 
 struct Dispatched {
     const char* command;
@@ -368,8 +362,7 @@ TEST_F(TaskDispatch, TheExecutorRunsNothingElse) {
     EXPECT_EQ(Texts{}, fake_handlers::calls());
 }
 
-// ---- Handlers that throw
-// -------------------------------------------------------------------------
+// ---- Handlers that throw ------------------------------------------------------------------------
 
 struct Thrown {
     const char* command;
