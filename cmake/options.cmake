@@ -12,13 +12,14 @@ endif()
 add_library(zav_options INTERFACE)
 target_compile_options(zav_options INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wnon-virtual-dtor
-  -Woverloaded-virtual -Wcast-align -Werror
+  -Woverloaded-virtual -Wcast-align
+  $<$<BOOL:${ZAV_WARNINGS_AS_ERRORS}>:-Werror>
   # Only its header is wanted from a precompiled header, not its debug info in every object.
-  -fpch-preprocess)
+  $<$<CXX_COMPILER_ID:GNU>:-fpch-preprocess>)
 # File offsets and times are 64 bits wide on 32-bit Linux too.
 target_compile_definitions(zav_options INTERFACE _FILE_OFFSET_BITS=64)
 target_link_libraries(zav_options INTERFACE Threads::Threads)
-if(CMAKE_CXX_FLAGS MATCHES "-fsanitize")
+if(CMAKE_CXX_FLAGS MATCHES "-fsanitize" AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU")
   # Instrumented code trips the flow analysis behind this warning.
   target_compile_options(zav_options INTERFACE -Wno-maybe-uninitialized)
 endif()

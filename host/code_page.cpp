@@ -65,6 +65,27 @@ bool isAscii(std::string_view text) {
     return true;
 }
 
+/// The position of the first sequence that would stand for a number beyond Unicode, or the text's
+/// length. The C library's converters take such sequences, up to six bytes long, for characters.
+std::size_t startBeyondUnicode(std::string_view text) {
+    for (std::size_t i = 0; i < text.size(); ++i) {
+        const auto lead = static_cast<unsigned char>(text[i]);
+        if (lead < 0xF4) continue;
+        const auto next = static_cast<unsigned char>(i + 1 < text.size() ? text[i + 1] : 0);
+        if (lead > 0xF4 || next >= 0x90) return i;
+    }
+    return text.size();
+}
+
+/// Appends the whole text, with the replacement character in place of each byte that is no part of
+/// a character and of a cut sequence at the end.
+void appendMended(const Converter& converter, std::string_view text, std::string& out) {
+    while (const int error = converter.run(text, out)) {
+        out += kReplacement;
+        text.remove_prefix(error == EINVAL ? text.size() : 1);
+    }
+}
+
 }  // namespace
 
 CodePage::CodePage(std::string name) : name_(std::move(name)) {
@@ -82,14 +103,19 @@ std::string CodePage::toUtf8(std::string_view text) const {
     const Converter converter(kUtf8, name_.c_str());
     std::string out;
     out.reserve(text.size());
-    while (const int error = converter.run(text, out)) {
+    while (name_ == kUtf8) {
+        const std::size_t end = startBeyondUnicode(text);
+        if (end == text.size()) break;
+        appendMended(converter, text.substr(0, end), out);
         out += kReplacement;
-        text.remove_prefix(error == EINVAL ? text.size() : 1);
+        text.remove_prefix(end + 1);
     }
+    appendMended(converter, text, out);
     return out;
 }
 
 std::optional<std::string> CodePage::fromUtf8(std::string_view text) const {
+    if (startBeyondUnicode(text) != text.size()) return std::nullopt;
     const Converter converter(name_.c_str(), kUtf8);
     std::string out;
     out.reserve(text.size());

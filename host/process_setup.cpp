@@ -7,6 +7,7 @@
 #include <clocale>
 #include <csignal>
 #include <cstdlib>
+#include <initializer_list>
 
 namespace host {
 namespace {

@@ -1,12 +1,15 @@
 #!/bin/sh
 # Builds and runs every test: on this machine's width, on 32-bit, under the address and
-# undefined-behaviour sanitizers, and what starts threads under the thread sanitizer.
+# undefined-behaviour sanitizers, and what starts threads under the thread sanitizer. Before them
+# every fuzz target runs for a short time.
 #
-#   scripts/test.sh [PRESET ...]     only these presets
+#   scripts/test.sh [PRESET ...]     only these presets, and no fuzzing
 set -eu
 cd "$(dirname "$0")/.."
 
 scripts/bootstrap.sh
+fuzz=
+[ $# -gt 0 ] || fuzz=1
 [ $# -gt 0 ] || set -- native i686 asan tsan
 
 for preset in "$@"; do
@@ -17,6 +20,10 @@ for preset in "$@"; do
     }
     cmake --build --preset "$preset" -- --quiet
 done
+if [ -n "$fuzz" ]; then
+    echo "== fuzz: build and 20 seconds per target"
+    scripts/fuzz.sh --short
+fi
 for preset in "$@"; do
     echo "== $preset: test"
     ctest --preset "$preset" --progress

@@ -36,6 +36,18 @@ TEST(CodePage, ReplacesWhatIsNoCharacterAndGoesOn) {
     EXPECT_EQ("a\xEF\xBF\xBDz", CodePage("ANSI_X3.4-1968").toUtf8("a\xE4z"));
 }
 
+TEST(CodePage, ReplacesSequencesBeyondUnicode) {
+    const std::string mark = "\xEF\xBF\xBD";
+    const CodePage page("UTF-8");
+    EXPECT_EQ("a" + mark + mark + mark + mark + mark + "z", page.toUtf8("a\xFA\x8A\x8A\x8A\x8Az"));
+    EXPECT_EQ("a" + mark + mark + mark + mark + "z", page.toUtf8("a\xF4\x90\x80\x80z"));
+    EXPECT_EQ("a\xF4\x8F\xBF\xBFz", page.toUtf8("a\xF4\x8F\xBF\xBFz")) << "the last character";
+    EXPECT_EQ("a" + mark + mark, page.toUtf8("a\xE6\x97\xF8")) << "a cut sequence before one";
+    for (const char* text : {"\xF8\x88\x80\x80\x80", "\xF4\x90\x80\x80", "a\xFD\xBF"})
+        EXPECT_FALSE(page.fromUtf8(text));
+    EXPECT_EQ("\xF4\x8F\xBF\xBF", page.fromUtf8("\xF4\x8F\xBF\xBF"));
+}
+
 TEST(CodePage, TextLongerThanAnyBufferPasses) {
     std::string latin, utf8;
     for (int i = 0; i < 5000; ++i) {
