@@ -181,6 +181,17 @@ TEST_F(BinaryDataTransferTest, AChunkThatClaimsTooMuchIsStatusFive) {
     EXPECT_EQ(depot("file"), "good");
 }
 
+TEST_F(BinaryDataTransferTest, AModeThatCannotBeSetIsTracedAndNoMore) {
+    // A kernel's file that can be written, but neither removed nor given another mode.
+    ASSERT_EQ(::symlink("/proc/self", scratch_.path("depot/self").c_str()), 0);
+    TraceCapture trace;
+    EXPECT_EQ(send("self/comm", {"renamed"}), 0);
+    EXPECT_EQ(depot("self/comm"), "renamed\n");
+    EXPECT_EQ(trace.errors("zavrpc"),
+              std::vector<std::string>{"Failed to set permissions on file [" + depotPath() +
+                                       "self/comm] to [504]"});
+}
+
 TEST_F(BinaryDataTransferTest, ADirectoryThatCannotBeMadeIsStatusSix) {
     scratch_.write("depot/file", "x");
     TraceCapture trace;
