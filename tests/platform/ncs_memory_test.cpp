@@ -65,7 +65,7 @@ TEST_F(Blocks, FewAreKeptAndReleasedOnDemand) {
 
 TEST_F(Blocks, WhatCannotBeHadIsNull) {
     EXPECT_EQ(nullptr, rpc__malloc(static_cast<std::size_t>(-1)));
-    EXPECT_EQ(nullptr, rpc__malloc(static_cast<std::size_t>(-1) / 2));
+    EXPECT_EQ(nullptr, rpc__malloc(static_cast<std::size_t>(-1) - 1000));
     rpc__free(nullptr);
 }
 
