@@ -5,6 +5,7 @@
 ScriptHome::ScriptHome() {
     scratch_.makeDir("home/config");
     scratch_.makeDir("home/logs");
+    scratch_.makeDir("depot");
     agentScript("exit 0");
 }
 
@@ -13,6 +14,26 @@ void ScriptHome::agentScript(const std::string& body) {
                     "printf '%s\\n' \"$*\" >>'" + scratch_.path("calls") + "'\n" +
                         "for word in \"$@\"; do verb=$product; product=$word; done\n" + body +
                         "\n");
+}
+
+std::string ScriptHome::products(const std::vector<std::string>& codes,
+                                 const std::string& translatorBody) {
+    std::string list = "\"ProdCode\",\"Description\",\"Platform\",\"Version\",\"Release\"\n";
+    std::vector<std::string> all = {"ax", "lz"};
+    all.insert(all.end(), codes.begin(), codes.end());
+    for (const std::string& code : all) {
+        list += "\"" + code + "\",\"A product\",\"li6263\",\"060100000\",\"100\"\n";
+    }
+    scratch_.write("home/list.txt", list);
+    scratch_.script("home/bin/cinfo", "home='" + path() +
+                                          "'\n"
+                                          "case $1 in\n"
+                                          "-d) cat \"$home/list.txt\" ;;\n"
+                                          "-p) [ -e \"$home/unreported\" ] ||\n"
+                                          "    printf 'Platform codes:\\nli6263 Product (%s)\\n' "
+                                          "\"$2\" ;;\n"
+                                          "esac\n");
+    return scratch_.script("home/agtqvs6/li6263/bin/zav_xa", translatorBody + "\n");
 }
 
 std::vector<std::string> ScriptHome::agentCalls() const {

@@ -18,6 +18,14 @@ public:
     /// shell commands with $product and $verb set.
     void agentScript(const std::string& body);
 
+    /// Adds an inventory of the shared component, "lz" and these products, all for one platform, a
+    /// report for each product while no file "home/unreported" exists, and a translator with this
+    /// body. Returns the translator's path.
+    std::string products(const std::vector<std::string>& codes, const std::string& translatorBody);
+
+    /// The depot, made here, with a "/" at its end.
+    std::string depot() const { return scratch_.path("depot") + "/"; }
+
     /// The command lines of all runs of TovrinAgent so far.
     std::vector<std::string> agentCalls() const;
 
