@@ -10,6 +10,7 @@ namespace ZAV {
 namespace {
 
 constexpr int kFirstOwnDescriptor = 3;
+constexpr mode_t kStreamMode = 0666;
 
 }  // namespace
 
@@ -47,6 +48,16 @@ FileDescriptor openFile(const char* path, int flags, mode_t mode) {
     FileDescriptor opened(fd);
     if (fd < 0 || fd >= kFirstOwnDescriptor) return opened;
     return FileDescriptor(::fcntl(fd, F_DUPFD_CLOEXEC, kFirstOwnDescriptor));
+}
+
+std::FILE* openStream(const char* path, const char* mode) {
+    const bool writing = mode[0] == 'w';
+    FileDescriptor file =
+        openFile(path, writing ? O_WRONLY | O_CREAT | O_TRUNC : O_RDONLY, kStreamMode);
+    if (!file.isOpen()) return nullptr;
+    std::FILE* const stream = ::fdopen(file.get(), mode);
+    if (stream != nullptr) file.release();
+    return stream;
 }
 
 ssize_t readSome(int fd, void* buffer, std::size_t size) {

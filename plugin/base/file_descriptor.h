@@ -4,6 +4,7 @@
 #include <sys/types.h>
 
 #include <cstddef>
+#include <cstdio>
 
 namespace ZAV {
 
@@ -33,6 +34,10 @@ private:
 /// tells why. The descriptor is above 2 even when those are free: what the host prints must not
 /// end up in a file of ours.
 FileDescriptor openFile(const char* path, int flags, mode_t mode = 0);
+
+/// Opens a stream for reading ("rb") or for writing from its start ("wb"), on such a descriptor.
+/// When that fails the result is null and errno tells why. The caller closes the stream.
+std::FILE* openStream(const char* path, const char* mode);
 
 /// Reads up to `size` bytes; returns their number, 0 at the end of the file, or -1 with errno set.
 ssize_t readSome(int fd, void* buffer, std::size_t size);

@@ -10,6 +10,7 @@
 #include <mutex>
 #include <vector>
 
+#include "base/file_descriptor.h"
 #include "base/zavstr.h"
 #include "base/zavtrace.h"
 #include "rpc/zavrpc.h"
@@ -26,7 +27,7 @@ constexpr std::size_t kPieceSize = 64 * 1024;
 /// A stream that reports whether its closing failed.
 class Stream {
 public:
-    Stream(const char* path, const char* mode) : file_(std::fopen(path, mode)) {}
+    Stream(const char* path, const char* mode) : file_(openStream(path, mode)) {}
     ~Stream() { close(); }
     Stream(const Stream&) = delete;
     Stream& operator=(const Stream&) = delete;
@@ -103,12 +104,12 @@ bool convert(const Trace& trace, const char* path) {
     const char* const temporary = narrow;
     trace().detail("tempfile name: [%s]", temporary);
     // "e": the descriptors must not reach children that other threads start.
-    Stream in(path, "re");
+    Stream in(path, "rb");
     if (!in.isOpen()) {
         trace().error("Could not open [%s] for reading.", path);
         return false;
     }
-    Stream out(temporary, "we");
+    Stream out(temporary, "wb");
     if (!out.isOpen()) {
         trace().error("Could not open [%s] for writing.", temporary);
         closeTraced(trace, in, path);

@@ -10,6 +10,7 @@
 #include <string>
 #include <vector>
 
+#include "base/file_descriptor.h"
 #include "base/zavtrace.h"
 
 using ZAV::String;
@@ -24,9 +25,8 @@ constexpr std::size_t kChunk = 1024;
 /// A stream that is closed at the latest when it goes out of scope.
 using Stream = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
 
-/// `mode` asks for close-on-exec, so that no child inherits the file.
-Stream openStream(const String& path, const char* mode) {
-    return Stream(std::fopen(path.c_str(), mode), &std::fclose);
+Stream openText(const String& path, const char* mode) {
+    return Stream(ZAV::openStream(path.c_str(), mode), &std::fclose);
 }
 
 bool closeStream(Stream& stream, const String& path, const Trace& trace) {
@@ -91,7 +91,7 @@ bool writeAll(std::FILE* stream, const std::string& bytes, const String& path, c
 
 String readFile(String path) {
     Trace trace(traceUnit);
-    Stream stream = openStream(path, "rbe");
+    Stream stream = openText(path, "rb");
     if (stream == nullptr) {
         trace().error("Failed to open file %s using mode \"%s\", check permissions", path, "rb");
         return {};
@@ -104,7 +104,7 @@ String readFile(String path) {
 
 int writeFile(const String& path, const String& text) {
     Trace trace(traceUnit);
-    Stream stream = openStream(path, "wbe");
+    Stream stream = openText(path, "wb");
     if (stream == nullptr) {
         // The message has always named the other mode; those who read the traces know it so.
         trace().error("Failed to open file %s using mode \"%s\", check permissions", path, "rb");

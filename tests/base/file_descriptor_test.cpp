@@ -109,6 +109,46 @@ TEST(OpenFile, LeavesTheStandardDescriptorsAlone) {
     EXPECT_EQ(flags & FD_CLOEXEC, FD_CLOEXEC);
 }
 
+TEST(OpenStream, ReadsOrStartsTheFileAnew) {
+    const ScratchDir scratch;
+    const std::string path = scratch.write("f", "old text");
+    std::FILE* stream = openStream(path.c_str(), "wb");
+    ASSERT_NE(stream, nullptr);
+    EXPECT_EQ(std::fputs("new", stream), 1);
+    EXPECT_EQ(::fcntl(::fileno(stream), F_GETFD) & FD_CLOEXEC, FD_CLOEXEC);
+    EXPECT_EQ(std::fclose(stream), 0);
+    stream = openStream(path.c_str(), "rb");
+    ASSERT_NE(stream, nullptr);
+    char read[16] = "";
+    EXPECT_EQ(std::fread(read, 1, sizeof read, stream), 3u);
+    EXPECT_STREQ(read, "new");
+    EXPECT_EQ(std::fclose(stream), 0);
+}
+
+TEST(OpenStream, FailureLeavesTheReasonInErrno) {
+    const ScratchDir scratch;
+    EXPECT_EQ(openStream(scratch.path("none").c_str(), "rb"), nullptr);
+    EXPECT_EQ(errno, ENOENT);
+    EXPECT_EQ(openStream(scratch.path().c_str(), "wb"), nullptr);
+    EXPECT_EQ(errno, EISDIR);
+}
+
+TEST(OpenStream, LeavesTheStandardDescriptorsAlone) {
+    const ScratchDir scratch;
+    const int saved = ::fcntl(STDIN_FILENO, F_DUPFD_CLOEXEC, 3);
+    ::close(STDIN_FILENO);
+    std::FILE* const stream = openStream(scratch.path("f").c_str(), "wb");
+    const bool stayedFree = !isOpen(STDIN_FILENO);
+    if (saved >= 0) {
+        ::dup2(saved, STDIN_FILENO);
+        ::close(saved);
+    }
+    EXPECT_TRUE(stayedFree);
+    ASSERT_NE(stream, nullptr);
+    EXPECT_GT(::fileno(stream), STDERR_FILENO);
+    std::fclose(stream);
+}
+
 /// Interrupts system calls of the thread that it is sent to.
 class InterruptingSignal {
 public:

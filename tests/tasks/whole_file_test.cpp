@@ -1,8 +1,10 @@
 #include "tasks/whole_file.h"
 
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <csignal>
 #include <cstdio>
@@ -20,6 +22,7 @@ using ZAV::String;
 namespace {
 int reportedStreamError = 0;
 bool closingFails = false;
+int lastClosed = -1;  // the descriptor of the stream
 
 template <typename Function>
 Function next(const char* name) {
@@ -33,6 +36,7 @@ extern "C" int ferror(std::FILE* stream) noexcept {
 }
 
 extern "C" int fclose(std::FILE* stream) {
+    lastClosed = ::fileno(stream);
     const int result = next<int (*)(std::FILE*)>("fclose")(stream);
     return closingFails ? EOF : result;
 }
@@ -148,6 +152,23 @@ TEST_F(WholeFile, WrittenFilesAreNotExecutable) {
     struct stat status {};
     ASSERT_EQ(0, ::stat(scratch_.path("script.sh").c_str(), &status));
     EXPECT_EQ(0u, status.st_mode & 0111u);
+}
+
+TEST_F(WholeFile, FilesStayOffTheStandardDescriptors) {
+    const int saved = ::fcntl(STDIN_FILENO, F_DUPFD_CLOEXEC, 3);
+    ::close(STDIN_FILENO);
+    const int written = writeFile(path("f"), "text");
+    const int writer = lastClosed;
+    const String text = readFile(path("f"));
+    const int reader = lastClosed;
+    if (saved >= 0) {
+        ::dup2(saved, STDIN_FILENO);
+        ::close(saved);
+    }
+    EXPECT_EQ(1, written);
+    EXPECT_TRUE(text == "text");
+    EXPECT_GT(writer, STDERR_FILENO);
+    EXPECT_GT(reader, STDERR_FILENO);
 }
 
 TEST_F(WholeFile, NothingIsWrittenWhereNoFileCanBe) {
