@@ -1,5 +1,7 @@
 #include "base/zavdomp.h"
 
+#include <typeinfo>
+
 namespace ZAV {
 namespace {
 
@@ -40,12 +42,28 @@ const DOMElement& asElement(const DOMNode* node) {
     return static_cast<const DOMElement&>(*node);
 }
 
+/// A class derived from ours may dump itself in its own way.
+template <typename Class>
+bool isExactly(const DOMNode& node) {
+    return typeid(node) == typeid(Class);
+}
+
+void addAttribute(Dump& dump, DOMNode& node) {
+    if (isExactly<DOMAttr>(node)) {
+        dump.add(static_cast<const DOMAttr&>(node));
+        return;
+    }
+    String text;
+    node.dump(text);
+    dump.add(text.getData());
+}
+
 void addStartTag(Dump& dump, const DOMElement& element) {
     dump.add("<");
     dump.add(element.getTagName());
     dump.add(" ");
-    for (const DOMNode* node : element.getAttributes()->nodes()) {
-        dump.add(static_cast<const DOMAttr&>(*node));
+    for (DOMNode* node : element.getAttributes()->nodes()) {
+        addAttribute(dump, *node);
         dump.add(" ");
     }
     dump.add(">\n");
@@ -55,6 +73,15 @@ void addEndTag(Dump& dump, const DOMElement& element) {
     dump.add("</");
     dump.add(element.getTagName());
     dump.add(">");
+}
+
+void addDerivedChild(Dump& dump, String indent, std::size_t level, DOMNode& child) {
+    for (std::size_t tabs = 0; tabs < level; ++tabs)
+        indent.append('\t');
+    String text;
+    static_cast<DOMElement&>(child).dump(indent, text);
+    dump.add(text.getData());
+    dump.add("\n");
 }
 
 /// Writes the tree below `root`, without recursion: documents may be deep.
@@ -75,7 +102,12 @@ void addTree(Dump& dump, const String& indent, const DOMElement& root) {
         Open& innermost = open.back();
         const std::vector<DOMNode*>& children = innermost.element->getChildren()->nodes();
         if (innermost.nextChild < children.size()) {
-            start(asElement(children[innermost.nextChild++]));
+            DOMNode& child = *children[innermost.nextChild++];
+            if (isExactly<DOMElement>(child)) {
+                start(asElement(&child));
+            } else {
+                addDerivedChild(dump, indent, open.size(), child);
+            }
             continue;
         }
         const DOMElement& done = *innermost.element;

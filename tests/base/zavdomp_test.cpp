@@ -228,6 +228,42 @@ TEST(DOMElement, DumpShowsStructureAndAttributes) {
     EXPECT_EQ(dumped(root), "before:<a k=\"v\" >\n\t<b >\n\t</b>\n</a>");
 }
 
+/// Dump themselves in a way of their own.
+class OwnElement : public DOMElement {
+public:
+    OwnElement() : DOMElement("own") {}
+    using DOMElement::dump;
+    void dump(const String& indent, String& out) override { out.append(indent).append("(own)"); }
+};
+
+class OwnAttribute : public DOMAttr {
+public:
+    OwnAttribute() : DOMAttr("k", "v") {}
+    void dump(String& out) override { out.append("k is v"); }
+};
+
+TEST(DOMElement, DumpAsksChildrenAndAttributesOfDerivedClasses) {
+    DOMElement root("a");
+    auto* b = new DOMElement("b");
+    root.addChild(b);
+    b->addChild(new OwnElement);
+    b->addChild(new DOMElement("c"));
+    root.addChild(new CountedElement);
+    b->getAttributes()->append(new OwnAttribute);
+    String out;
+    root.dump("> ", out);
+    EXPECT_STREQ(out.c_str(),
+                 "> <a >\n"
+                 "> \t<b k is v >\n"
+                 "> \t\t(own)\n"
+                 "> \t\t<c >\n"
+                 "> \t\t</c>\n"
+                 "> \t</b>\n"
+                 "> \t<counted >\n"
+                 "> \t</counted>\n"
+                 "> </a>");
+}
+
 TEST(DOMElement, DumpIndentsEveryLevelByATab) {
     DOMElement root("a");
     auto* b = new DOMElement("b");
