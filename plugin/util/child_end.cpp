@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <mutex>
+#include <new>
 #include <vector>
 
 namespace ZAV {
@@ -27,7 +28,10 @@ struct Forgotten {
 };
 
 Forgotten& forgotten() {
-    static Forgotten& instance = *new Forgotten;  // used by threads that outlive main
+    // Never destroyed, because threads that outlive main use it, and made without asking for memory,
+    // because the callers cannot fail.
+    alignas(Forgotten) static unsigned char place[sizeof(Forgotten)];
+    static Forgotten& instance = *new (place) Forgotten;
     return instance;
 }
 
