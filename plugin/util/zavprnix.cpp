@@ -155,13 +155,22 @@ bool Process::waitUntil(const Deadline& deadline, int* exitCode) {
         reaped_ = ended != 0;
     }
     if (ended == -1) trace().error("Error occurred. ERRNO:%d %s", errno, errorText(errno));
-    if (ended == 0) return trace.exit(giveUp(exitCode));
+    if (ended == 0) {
+        terminate(trace, exitCode);
+        return trace.exit(false);
+    }
     if (exitCode != nullptr) *exitCode = exitStatusOf(status);
     return trace.exit(true);
 }
 
 bool Process::giveUp(int* exitCode) {
     Trace trace(traceUnit);
+    trace().detail("Waiting for process id: %d", processData_->pid);
+    terminate(trace, exitCode);
+    return trace.exit(false);
+}
+
+void Process::terminate(const Trace& trace, int* exitCode) {
     const int pid = processData_->pid;
     trace().error("Terminating process group %d", -pid);
     ::kill(-pid, SIGKILL);
@@ -171,7 +180,6 @@ bool Process::giveUp(int* exitCode) {
     reapKilled();
     // What stands for the status of a child that had not ended when it was looked at.
     if (exitCode != nullptr) *exitCode = 0;
-    return trace.exit(false);
 }
 
 void Process::killUnlessEnded() noexcept {

@@ -23,6 +23,7 @@
 namespace ZAV {
 
 struct ChildPipes;
+class Trace;
 
 /// Bytes that come in.
 class InputStream {
@@ -149,7 +150,8 @@ public:
     bool wait(int* exitCode);
     /// The same with a deadline of the caller's.
     bool waitUntil(const Deadline& deadline, int* exitCode);
-    /// Does what wait does with a child whose time is over. False.
+    /// Does what wait does with a child whose time is over, its trace lines included, without
+    /// looking at the child once more. False.
     bool giveUp(int* exitCode);
 
     /// When the time-out is over, counted from start().
@@ -172,6 +174,7 @@ private:
     void init(const String& command, const char** env, const String& user, const String& group);
     bool launch(ChildPipes& pipes);
     bool hasChild() const { return processData_ != nullptr && processData_->pid > 0 && !reaped_; }
+    void terminate(const Trace& trace, int* exitCode);
     void reapKilled() noexcept;
 
     std::unique_ptr<ProcessInputStream> stdOut_;

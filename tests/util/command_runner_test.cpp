@@ -218,6 +218,8 @@ TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
     EXPECT_EQ("begun\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
+    // Also when the time was up while the output was read, and nobody had begun to wait.
+    EXPECT_EQ("Waiting for process id: ", withoutNumbers(traces.details("zavprnix")).back());
 }
 
 TEST_F(CommandRunner, AChildThatClosedItsOutputIsWaitedForUntilTheSameDeadline) {
