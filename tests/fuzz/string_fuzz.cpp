@@ -42,6 +42,11 @@ std::uint32_t indexOf(std::size_t position) {
     return position == std::u16string::npos ? String::NPOS : static_cast<std::uint32_t>(position);
 }
 
+/// A position in the text's first 255 units, its end or, now and then, one beyond it.
+std::size_t position(State& state) {
+    return state.input.byte() % std::min<std::size_t>(state.model.size() + 2, 256);
+}
+
 void append(State& state) {
     const std::u16string tail = state.input.units(kTextBound);
     if (tail.size() == 1) {
@@ -67,7 +72,7 @@ void appendItself(State& state) {
 }
 
 void eraseRange(State& state) {
-    const std::size_t pos = state.input.byte();
+    const std::size_t pos = position(state);
     const std::size_t n = state.input.byte();
     const bool toEnd = n == 255;
     const std::size_t length = state.model.size();
@@ -147,7 +152,7 @@ void escapeAndBack(State& state) {
 
 void findUnit(State& state) {
     const char16_t unit = state.input.unit();
-    const std::size_t start = state.input.byte();
+    const std::size_t start = position(state);
     const auto at = static_cast<std::uint32_t>(start);
     const auto found =
         attempt([&] { return state.text.find(static_cast<unsigned short>(unit), at); });
@@ -165,7 +170,7 @@ void findUnit(State& state) {
 void findUnescaped(State& state) {
     const char16_t unit = state.input.unit();
     const char16_t escape = state.input.unit();
-    const std::size_t start = state.input.byte();
+    const std::size_t start = position(state);
     const auto found =
         attempt([&] { return state.text.find(unit, escape, static_cast<std::uint32_t>(start)); });
     require(found.has_value() == (start < state.model.size()), "a start outside throws");
@@ -181,7 +186,7 @@ void findUnescaped(State& state) {
 
 void findText(State& state) {
     const std::u16string wanted = state.input.units(6);
-    const std::size_t start = state.input.byte();
+    const std::size_t start = position(state);
     const std::size_t expected =
         wanted.empty() ? std::u16string::npos : state.model.find(wanted, start);
     require(
@@ -267,7 +272,7 @@ void copyAndMove(State& state) {
 }
 
 void subscript(State& state) {
-    const std::size_t i = state.input.byte();
+    const std::size_t i = position(state);
     const auto unit = attempt([&] { return state.text[static_cast<std::uint32_t>(i)]; });
     require(unit.has_value() == (i <= state.model.size()), "a subscript outside throws");
     if (unit) require(*unit == state.model.c_str()[i], "the unit stands there");

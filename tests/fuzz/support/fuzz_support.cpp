@@ -117,6 +117,9 @@ ZAV::String MemoryFile::path() const {
 
 /// Called once by the fuzzer. Traces are made, because inputs reach them too, and thrown away.
 extern "C" int LLVMFuzzerInitialize(int* /*argc*/, char*** /*argv*/) {
+    // The environment decides only where the process's locale says nothing: then it says nothing
+    // too.
+    ::setenv("LC_ALL", "C", 1);
     fuzz::require(std::setlocale(LC_ALL, "C.UTF-8") != nullptr, "there is a UTF-8 locale");
     ras1::configure("DETAIL", "/dev/null");
     return 0;
