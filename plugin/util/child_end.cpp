@@ -28,8 +28,8 @@ struct Forgotten {
 };
 
 Forgotten& forgotten() {
-    // Never destroyed, because threads that outlive main use it, and made without asking for memory,
-    // because the callers cannot fail.
+    // Never destroyed, because threads that outlive main use it, and made without asking for
+    // memory, because the callers cannot fail.
     alignas(Forgotten) static unsigned char place[sizeof(Forgotten)];
     static Forgotten& instance = *new (place) Forgotten;
     return instance;
