@@ -109,7 +109,8 @@ int runEdit(const Options& options, const std::string& product, const std::strin
                      describeRow(row).c_str());
         return kHostReportedFailure;
     }
-    const std::string before = textOf(row, "CONTEXT") + "\n";
+    std::string before = textOf(row, "CONTEXT");
+    if (before.empty() || before.back() != '\n') before += '\n';
     const std::string after = EditedFile(before).edit();
     if (after == before) {
         if (options.json) {
