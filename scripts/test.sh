@@ -1,16 +1,16 @@
 #!/bin/sh
-# Builds and runs every test: on this machine's width, on 32-bit, under the address and
-# undefined-behaviour sanitizers, and what starts threads under the thread sanitizer. Before them
-# every fuzz target runs for a short time.
+# Builds and runs every test: on this machine's width, on 32-bit, and under the address and
+# undefined-behaviour sanitizers. Before them every fuzz target runs for a short time.
 #
 #   scripts/test.sh [PRESET ...]     only these presets, and no fuzzing
+#   scripts/test.sh tsan             what starts threads, under the thread sanitizer
 set -eu
 cd "$(dirname "$0")/.."
 
 scripts/bootstrap.sh
 fuzz=
 [ $# -gt 0 ] || fuzz=1
-[ $# -gt 0 ] || set -- native i686 asan tsan
+[ $# -gt 0 ] || set -- native i686 asan
 
 for preset in "$@"; do
     echo "== $preset: build"
