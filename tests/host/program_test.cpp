@@ -264,7 +264,7 @@ TEST_F(HostProgram, SurvivesWhenNobodyReadsItsOutput) {
 }
 
 /// Wake-ups of all threads of a process so far.
-long switches(pid_t pid) {
+[[maybe_unused]] long switches(pid_t pid) {
     long sum = 0;
     const std::string tasks = "/proc/" + std::to_string(pid) + "/task";
     for (const auto& task : std::filesystem::directory_iterator(tasks)) {
@@ -277,10 +277,8 @@ long switches(pid_t pid) {
     return sum;
 }
 
+#ifndef __SANITIZE_THREAD__  // whose own thread is woken all the time
 TEST_F(HostProgram, SleepsWhenNobodyWantsAnything) {
-#ifdef __SANITIZE_THREAD__
-    GTEST_SKIP() << "the sanitizer's own thread is woken all the time";
-#endif
     const auto program = start();
     EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
     request("t", 1);
@@ -290,5 +288,6 @@ TEST_F(HostProgram, SleepsWhenNobodyWantsAnything) {
     std::this_thread::sleep_for(milliseconds(1500));
     EXPECT_EQ(before, switches(program->pid()));
 }
+#endif
 
 }  // namespace
