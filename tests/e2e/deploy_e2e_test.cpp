@@ -1,4 +1,5 @@
 // Products are installed and removed: what the host answers, and what is on the disk afterwards.
+// ctest-label: threaded
 
 #include <signal.h>
 #include <sys/mount.h>

@@ -1,5 +1,6 @@
 // What is installed here, as the host tells it of a real home, and which instance a managed system
 // name means.
+// ctest-label: threaded
 
 #include <sys/stat.h>
 #include <unistd.h>

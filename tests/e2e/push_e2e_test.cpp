@@ -1,4 +1,5 @@
 // zavctl push: what arrives in the depot of a real host, under which name, and what is said of it.
+// ctest-label: threaded
 
 #include <gmock/gmock.h>
 #include <sys/stat.h>

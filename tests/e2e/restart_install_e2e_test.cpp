@@ -1,5 +1,6 @@
 // Installs that stop the process that runs them: the early outcome, the host's return, and the real
 // outcome fetched afterwards.
+// ctest-label: threaded
 
 #include <signal.h>
 #include <unistd.h>

@@ -1,5 +1,6 @@
 // The host's RPC socket and port seen by clients of any kind: who gets in, what garbage does, and a
 // transfer drawn byte by byte.
+// ctest-label: threaded
 
 #include <arpa/inet.h>
 #include <gmock/gmock.h>
