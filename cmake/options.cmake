@@ -14,6 +14,8 @@ target_compile_options(zav_options INTERFACE
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wnon-virtual-dtor
   -Woverloaded-virtual -Wcast-align
   $<$<BOOL:${ZAV_WARNINGS_AS_ERRORS}>:-Werror>
+  # Locks and what they guard are marked for clang alone, which builds the fuzz targets.
+  $<$<CXX_COMPILER_ID:Clang>:-Wthread-safety -Werror=thread-safety>
   # Only its header is wanted from a precompiled header, not its debug info in every object.
   $<$<CXX_COMPILER_ID:GNU>:-fpch-preprocess>)
 # File offsets and times are 64 bits wide on 32-bit Linux too.

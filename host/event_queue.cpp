@@ -21,7 +21,7 @@ std::size_t EventQueue::room(std::size_t count, unsigned rowSize) const {
 int EventQueue::push(const oxa::Rows& rows) noexcept {
     const std::size_t count = rows.count();
     if (count == 0) return OXA_OK;
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     const bool first = held_.empty();
     std::size_t taken = room(count, rows.rowSize);
     try {
@@ -42,12 +42,12 @@ int EventQueue::push(const oxa::Rows& rows) noexcept {
 }
 
 EventQueue::Batch EventQueue::take() {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     return std::exchange(held_, {});
 }
 
 bool EventQueue::empty() const {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     return held_.empty();
 }
 

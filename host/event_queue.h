@@ -3,9 +3,9 @@
 
 #include <cstddef>
 #include <functional>
-#include <mutex>
 #include <string>
 
+#include "embedded/mutex.h"
 #include "embedded/oxa_host.h"
 
 namespace host {
@@ -38,12 +38,12 @@ public:
 
 private:
     /// How many of `count` rows have room.
-    std::size_t room(std::size_t count, unsigned rowSize) const;
+    std::size_t room(std::size_t count, unsigned rowSize) const ZAV_REQUIRES(lock_);
 
     const Limits limits_;
     const std::function<void()> wake_;
-    mutable std::mutex lock_;  // guards what follows
-    Batch held_;
+    mutable embedded::Mutex lock_;
+    Batch held_ ZAV_GUARDED_BY(lock_);
 };
 
 }  // namespace host

@@ -53,7 +53,7 @@ TaskWatch::~TaskWatch() {
 
 void TaskWatch::release() {
     {
-        const std::lock_guard<std::mutex> lock(lock_);
+        const embedded::MutexLock lock(lock_);
         letGo_ = true;
     }
     released_.notify_all();
@@ -80,12 +80,12 @@ void TaskWatch::Request::answered(const oxa::Rows& rows) {
 }
 
 void TaskWatch::began() {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     ++running_;
 }
 
 void TaskWatch::ended() {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     if (--running_ > 0) return;
     // Nobody is left who could still claim an outcome that came early.
     for (auto entry = outstanding_.begin(); entry != outstanding_.end();) {
@@ -94,12 +94,12 @@ void TaskWatch::ended() {
 }
 
 void TaskWatch::accepted(const std::string& transid) {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     if (++outstanding_[transid] == 0) outstanding_.erase(transid);
 }
 
 void TaskWatch::published(const oxa::Rows& rows) {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     for (std::size_t i = 0; i < rows.count(); ++i) {
         const std::string transid(textField(*outcomeColumns_.transid, rowOf(rows, i)));
         if (running_ == 0 && outstanding_.count(transid) == 0) continue;
@@ -111,15 +111,16 @@ void TaskWatch::holdAfterTask() {
     if (!counting_ || holding_) return;
     // Live objects get rows in the order in which they came, so this one is the last.
     holding_ = oxa::subscribe(kOutcomeTable, {}, [this](const oxa::Rows&) {
-        std::unique_lock<std::mutex> lock(lock_);
+        embedded::MutexLock lock(lock_);
         held_ = true;
-        released_.wait(lock, [this] { return letGo_; });
+        while (!letGo_)
+            lock.wait(released_);
         return static_cast<int>(OXA_OK);
     });
 }
 
 bool TaskWatch::quiet() const {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     if (running_ > 0) return false;
     return held_ || std::all_of(outstanding_.begin(), outstanding_.end(),
                                 [](const auto& entry) { return entry.second <= 0; });

@@ -4,10 +4,10 @@
 #include <condition_variable>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <vector>
 
+#include "embedded/mutex.h"
 #include "embedded/oxa_host.h"
 
 namespace host {
@@ -70,14 +70,14 @@ private:
     Columns requestColumns_;
     Columns outcomeColumns_;
 
-    mutable std::mutex lock_;  // guards what follows
+    mutable embedded::Mutex lock_;
     std::condition_variable released_;
-    unsigned running_ = 0;
+    unsigned running_ ZAV_GUARDED_BY(lock_) = 0;
     /// Tasks accepted less outcomes published. Negative: the outcome came before the thread that
     /// sampled the request got to say that it was accepted.
-    std::map<std::string, int> outstanding_;
-    bool held_ = false;
-    bool letGo_ = false;
+    std::map<std::string, int> outstanding_ ZAV_GUARDED_BY(lock_);
+    bool held_ ZAV_GUARDED_BY(lock_) = false;
+    bool letGo_ ZAV_GUARDED_BY(lock_) = false;
 
     std::unique_ptr<oxa::Subscription> counting_;
     std::unique_ptr<oxa::Subscription> holding_;

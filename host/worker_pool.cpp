@@ -17,8 +17,9 @@ WorkerPool::WorkerPool(std::size_t threads, std::size_t queueLimit) : queueLimit
         throw StartError(std::string("cannot start a thread: ") + error.what());
     }
     // The threads count themselves as free; nobody is to find a pool without free threads.
-    std::unique_lock<std::mutex> lock(lock_);
-    changed_.wait(lock, [&] { return idle_ == threads; });
+    embedded::MutexLock lock(lock_);
+    while (idle_ != threads)
+        lock.wait(changed_);
 }
 
 WorkerPool::~WorkerPool() {
@@ -28,7 +29,7 @@ WorkerPool::~WorkerPool() {
 void WorkerPool::stop() {
     std::deque<Job> dropped;
     {
-        const std::lock_guard<std::mutex> lock(lock_);
+        const embedded::MutexLock lock(lock_);
         stopping_ = true;
         dropped.swap(queue_);
     }
@@ -40,7 +41,7 @@ void WorkerPool::stop() {
 
 bool WorkerPool::submit(Job job) {
     {
-        const std::lock_guard<std::mutex> lock(lock_);
+        const embedded::MutexLock lock(lock_);
         // A job that a free thread is about to take does not count as waiting.
         if (stopping_ || queue_.size() >= queueLimit_ + idle_) return false;
         queue_.push_back(std::move(job));
@@ -50,11 +51,12 @@ bool WorkerPool::submit(Job job) {
 }
 
 void WorkerPool::work() {
-    std::unique_lock<std::mutex> lock(lock_);
+    embedded::MutexLock lock(lock_);
     ++idle_;
     changed_.notify_all();
     while (true) {
-        changed_.wait(lock, [this] { return stopping_ || !queue_.empty(); });
+        while (!stopping_ && queue_.empty())
+            lock.wait(changed_);
         if (stopping_) return;
         Job job = std::move(queue_.front());
         queue_.pop_front();

@@ -5,9 +5,10 @@
 #include <cstddef>
 #include <deque>
 #include <functional>
-#include <mutex>
 #include <thread>
 #include <vector>
+
+#include "embedded/mutex.h"
 
 namespace host {
 
@@ -33,11 +34,11 @@ private:
     void stop();
 
     const std::size_t queueLimit_;
-    std::mutex lock_;  // guards what follows
+    embedded::Mutex lock_;
     std::condition_variable changed_;
-    std::deque<Job> queue_;
-    std::size_t idle_ = 0;
-    bool stopping_ = false;
+    std::deque<Job> queue_ ZAV_GUARDED_BY(lock_);
+    std::size_t idle_ ZAV_GUARDED_BY(lock_) = 0;
+    bool stopping_ ZAV_GUARDED_BY(lock_) = false;
 
     std::vector<std::thread> threads_;  // constant after construction
 };

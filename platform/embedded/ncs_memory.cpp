@@ -5,9 +5,9 @@
 #include <array>
 #include <cstdlib>
 #include <cstring>
-#include <mutex>
 #include <utility>
 
+#include "embedded/mutex.h"
 #include "platform/ncs.h"
 
 namespace ncs {
@@ -41,9 +41,10 @@ std::size_t classFor(std::size_t bytes) {
 }
 
 struct Kept {
-    std::mutex lock;
-    std::array<Head*, kClasses> blocks{};  ///< the latest first, as its memory is warm
-    std::size_t bytes = 0;
+    embedded::Mutex lock;
+    /// The latest first, as its memory is warm.
+    std::array<Head*, kClasses> blocks ZAV_GUARDED_BY(lock){};
+    std::size_t bytes ZAV_GUARDED_BY(lock) = 0;
 };
 
 Kept& kept() {
@@ -53,7 +54,7 @@ Kept& kept() {
 
 Head* takeKept(std::size_t sizeClass) {
     Kept& pool = kept();
-    const std::lock_guard<std::mutex> lock(pool.lock);
+    const embedded::MutexLock lock(pool.lock);
     Head* const head = pool.blocks[sizeClass];
     if (head == nullptr) return nullptr;
     pool.blocks[sizeClass] = head->next;
@@ -64,7 +65,7 @@ Head* takeKept(std::size_t sizeClass) {
 /// False when enough is kept already.
 bool keep(Head* head) {
     Kept& pool = kept();
-    const std::lock_guard<std::mutex> lock(pool.lock);
+    const embedded::MutexLock lock(pool.lock);
     if (pool.bytes + head->capacity > kMostKept) return false;
     head->next = std::exchange(pool.blocks[head->sizeClass], head);
     pool.bytes += head->capacity;
@@ -115,7 +116,7 @@ void releaseKeptBlocks() {
     std::array<Head*, kClasses> blocks{};
     {
         Kept& pool = kept();
-        const std::lock_guard<std::mutex> lock(pool.lock);
+        const embedded::MutexLock lock(pool.lock);
         blocks.swap(pool.blocks);
         pool.bytes = 0;
     }
@@ -126,8 +127,9 @@ void releaseKeptBlocks() {
 }
 
 std::size_t keptBytes() {
-    const std::lock_guard<std::mutex> lock(kept().lock);
-    return kept().bytes;
+    Kept& pool = kept();
+    const embedded::MutexLock lock(pool.lock);
+    return pool.bytes;
 }
 
 }  // namespace ncs

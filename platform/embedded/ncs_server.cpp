@@ -19,6 +19,7 @@
 #include <unordered_map>
 #include <vector>
 
+#include "embedded/mutex.h"
 #include "embedded/ncs_connection.h"
 #include "embedded/ncs_host.h"
 #include "embedded/ncs_listener.h"
@@ -72,7 +73,7 @@ private:
     void close(Connection& connection);
     void runTimer();
     void wakeBy(Milliseconds deadline);
-    void setTimer(Milliseconds deadline);
+    void setTimer(Milliseconds deadline) ZAV_REQUIRES(lock_);
 
     const Limits limits_;
     SharedState shared_;
@@ -83,13 +84,12 @@ private:
     Source stopSource_{Source::Kind::Stop};
     std::atomic<Milliseconds> wakeUp_{kNever};  ///< changed under the lock
 
-    mutable std::mutex lock_;
-    // Guarded by the lock:
-    std::unordered_map<Connection*, std::unique_ptr<Connection>> connections_;
-    std::vector<std::unique_ptr<Listener>> listeners_;
-    std::vector<Descriptor> ownSockets_;
-    std::vector<std::thread> threads_;
-    Counts counts_;
+    mutable embedded::Mutex lock_;
+    std::unordered_map<Connection*, std::unique_ptr<Connection>> connections_ ZAV_GUARDED_BY(lock_);
+    std::vector<std::unique_ptr<Listener>> listeners_ ZAV_GUARDED_BY(lock_);
+    std::vector<Descriptor> ownSockets_ ZAV_GUARDED_BY(lock_);
+    std::vector<std::thread> threads_ ZAV_GUARDED_BY(lock_);
+    Counts counts_ ZAV_GUARDED_BY(lock_);
 };
 
 Server::Implementation::Implementation(const Limits& limits)
@@ -149,7 +149,7 @@ void Server::Implementation::work() {
 
 void Server::Implementation::listen(int socket, const std::string& port) {
     auto listener = std::make_unique<Listener>(socket, port);
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     listeners_.push_back(std::move(listener));
     checked(watch(EPOLL_CTL_ADD, socket, *listeners_.back(), EPOLLIN | EPOLLONESHOT), "epoll_ctl");
 }
@@ -157,7 +157,7 @@ void Server::Implementation::listen(int socket, const std::string& port) {
 std::uint16_t Server::Implementation::listenOnLoopback(std::uint16_t port) {
     Descriptor made = loopbackSocket(port);
     listen(made.get(), std::to_string(port));
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     ownSockets_.push_back(std::move(made));
     return port;
 }
@@ -175,7 +175,7 @@ void Server::Implementation::accept(Listener& listener) {
         // Out of descriptors or memory: the connection stays where it is, and asking again at
         // once would keep this thread spinning.
         {
-            const std::lock_guard<std::mutex> lock(lock_);
+            const embedded::MutexLock lock(lock_);
             listener.paused = true;
         }
         wakeBy(now() + kAcceptPause);
@@ -188,7 +188,7 @@ void Server::Implementation::accept(Listener& listener) {
 void Server::Implementation::admit(int socket, const Listener& listener) {
     Descriptor accepted(socket);
     const bool isWelcome = listener.admits(socket);
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     if (!isWelcome || connections_.size() >= limits_.connections) {
         ++counts_.refused;
         return;
@@ -228,18 +228,17 @@ void Server::Implementation::serve(Connection& connection) {
 }
 
 void Server::Implementation::close(Connection& connection) {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     connections_.erase(&connection);
     if (connections_.empty()) releaseKeptBlocks();
 }
 
 void Server::Implementation::wakeBy(Milliseconds deadline) {
     if (deadline >= wakeUp_) return;
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     if (deadline < wakeUp_) setTimer(deadline);
 }
 
-/// With the lock held.
 void Server::Implementation::setTimer(Milliseconds deadline) {
     wakeUp_ = deadline;
     itimerspec when{};
@@ -252,7 +251,7 @@ void Server::Implementation::setTimer(Milliseconds deadline) {
 void Server::Implementation::runTimer() {
     std::uint64_t expirations = 0;
     [[maybe_unused]] const ssize_t got = ::read(timer_.get(), &expirations, sizeof expirations);
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     // First of all: whoever set a deadline before this is seen below, whoever comes later sets the
     // timer itself.
     wakeUp_ = kNever;
@@ -281,14 +280,14 @@ void Server::Implementation::runTimer() {
 void Server::Implementation::stop() {
     std::vector<std::thread> threads;
     {
-        const std::lock_guard<std::mutex> lock(lock_);
+        const embedded::MutexLock lock(lock_);
         threads.swap(threads_);
     }
     const std::uint64_t one = 1;
     [[maybe_unused]] const ssize_t put = ::write(stopEvent_.get(), &one, sizeof one);
     for (std::thread& thread : threads)
         thread.join();
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     for (const auto& listener : listeners_) {
         ::epoll_ctl(poll_.get(), EPOLL_CTL_DEL, listener->socket, nullptr);
     }
@@ -299,7 +298,7 @@ void Server::Implementation::stop() {
 }
 
 Counts Server::Implementation::counts() const {
-    const std::lock_guard<std::mutex> lock(lock_);
+    const embedded::MutexLock lock(lock_);
     Counts counts = counts_;
     counts.connections = static_cast<unsigned>(connections_.size());
     counts.calls = shared_.calls;
