@@ -1,11 +1,11 @@
 // The conversion of transferred scripts and model files to this system's line ends.
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
 #include <mutex>
 #include <vector>
@@ -22,27 +22,8 @@ namespace {
 RAS1_UNIT traceUnit{"zavrpc"};
 
 constexpr mode_t kFileMode = 0770;
+constexpr mode_t kTemporaryMode = 0666;
 constexpr std::size_t kPieceSize = 64 * 1024;
-
-/// A stream that reports whether its closing failed.
-class Stream {
-public:
-    Stream(const char* path, const char* mode) : file_(openStream(path, mode)) {}
-    ~Stream() { close(); }
-    Stream(const Stream&) = delete;
-    Stream& operator=(const Stream&) = delete;
-
-    bool isOpen() const { return file_ != nullptr; }
-    std::FILE* get() const { return file_; }
-    bool close() {
-        std::FILE* const file = file_;
-        file_ = nullptr;
-        return file == nullptr || std::fclose(file) == 0;
-    }
-
-private:
-    std::FILE* file_;
-};
 
 /// One conversion at a time: they share one temporary file. Immortal, since transfers may run while
 /// the process ends.
@@ -56,21 +37,27 @@ String temporaryFile() {
     return Util::getTovrinHomeDir(home) ? home + String("/tmp/.zavtemp") : String(".zavtemp");
 }
 
-/// Copies without carriage returns and Ctrl-Z. False when reading or writing fails.
-bool copyConverted(std::FILE* in, std::FILE* out) {
+/// A failed write counts as a failed close, where a stream with a buffer would report it.
+struct Copied {
+    bool read = true;
+    bool written = true;
+};
+
+/// Copies without carriage returns and Ctrl-Z.
+Copied copyConverted(const FileDescriptor& in, const FileDescriptor& out) {
     std::vector<char> piece(kPieceSize);
     for (;;) {
-        const std::size_t length = std::fread(piece.data(), 1, piece.size(), in);
-        if (length == 0) return std::ferror(in) == 0;
+        const ssize_t length = readSome(in.get(), piece.data(), piece.size());
+        if (length <= 0) return {length == 0, true};
         char* const end = std::remove_if(piece.data(), piece.data() + length,
                                          [](char c) { return c == 13 || c == 26; });
         const auto kept = static_cast<std::size_t>(end - piece.data());
-        if (std::fwrite(piece.data(), 1, kept, out) != kept) return false;
+        if (writeAll(out.get(), piece.data(), kept) != 0) return {true, false};
     }
 }
 
-bool closeTraced(const Trace& trace, Stream& stream, const char* name) {
-    if (stream.close()) return true;
+bool closeTraced(const Trace& trace, FileDescriptor& file, const char* name, bool written = true) {
+    if (file.close() == 0 && written) return true;
     trace().error("Could not close [%s].", name);
     return false;
 }
@@ -103,21 +90,20 @@ bool convert(const Trace& trace, const char* path) {
     const CharStar narrow = temporaryFile().c_str();
     const char* const temporary = narrow;
     trace().detail("tempfile name: [%s]", temporary);
-    // "e": the descriptors must not reach children that other threads start.
-    Stream in(path, "rb");
+    FileDescriptor in = openFile(path, O_RDONLY);
     if (!in.isOpen()) {
         trace().error("Could not open [%s] for reading.", path);
         return false;
     }
-    Stream out(temporary, "wb");
+    FileDescriptor out = openFile(temporary, O_WRONLY | O_CREAT | O_TRUNC, kTemporaryMode);
     if (!out.isOpen()) {
         trace().error("Could not open [%s] for writing.", temporary);
         closeTraced(trace, in, path);
         return false;
     }
-    bool ok = copyConverted(in.get(), out.get());
-    ok = closeTraced(trace, in, path) && ok;
-    ok = closeTraced(trace, out, temporary) && ok;
+    const Copied copied = copyConverted(in, out);
+    bool ok = closeTraced(trace, in, path) && copied.read;
+    ok = closeTraced(trace, out, temporary, copied.written) && ok;
     return ok && replaceFile(trace, path, temporary);
 }
 

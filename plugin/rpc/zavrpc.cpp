@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <vector>
 
+#include "base/file_descriptor.h"
 #include "base/zavstr.h"
 #include "base/zavtrace.h"
 #include "rpc/transfer_path.h"
@@ -21,6 +22,7 @@ namespace {
 RAS1_UNIT traceUnit{"zavrpc"};
 
 constexpr std::uint32_t kLongestPath = 1024;
+constexpr mode_t kCreationMode = 0666;
 constexpr mode_t kFileMode = 0770;
 
 /// The destination file, closed at the end of the batch whatever happens. A batch is one gathering
@@ -29,15 +31,10 @@ constexpr mode_t kFileMode = 0770;
 class DestinationFile {
 public:
     DestinationFile(const char* path, bool anew)
-        : descriptor_(::open(
-              path, O_CREAT | O_CLOEXEC | (anew ? O_WRONLY | O_TRUNC : O_RDWR | O_APPEND), 0666)) {}
-    ~DestinationFile() {
-        if (descriptor_ != -1) ::close(descriptor_);
-    }
-    DestinationFile(const DestinationFile&) = delete;
-    DestinationFile& operator=(const DestinationFile&) = delete;
+        : file_(openFile(path, O_CREAT | (anew ? O_WRONLY | O_TRUNC : O_RDWR | O_APPEND),
+                         kCreationMode)) {}
 
-    bool isOpen() const { return descriptor_ != -1; }
+    bool isOpen() const { return file_.isOpen(); }
 
     /// Writes pieces that hold data one behind the other; false when one cannot be written.
     /// `pieces` is left with what was not written at its end, `done` counts the whole ones.
@@ -45,7 +42,7 @@ public:
         for (done = 0; done < pieces.size();) {
             const int count =
                 static_cast<int>(std::min<std::size_t>(pieces.size() - done, IOV_MAX));
-            const ssize_t written = ::writev(descriptor_, &pieces[done], count);
+            const ssize_t written = ::writev(file_.get(), &pieces[done], count);
             if (written == -1 && errno == EINTR) continue;
             if (written <= 0) return false;
             done = skipWritten(pieces, done, static_cast<std::size_t>(written));
@@ -64,7 +61,7 @@ private:
         return at;
     }
 
-    int descriptor_;
+    FileDescriptor file_;
 };
 
 /// The directory part of a path; false when it has none.

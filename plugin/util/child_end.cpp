@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <ctime>
 #include <mutex>
 #include <new>
 #include <vector>
@@ -35,7 +36,18 @@ Forgotten& forgotten() {
     return instance;
 }
 
+/// May return early.
+void sleepFor(int milliseconds) {
+    constexpr long kNanosecondsPerMillisecond = 1000 * 1000;
+    const timespec length{milliseconds / 1000, milliseconds % 1000 * kNanosecondsPerMillisecond};
+    ::nanosleep(&length, nullptr);
+}
+
 }  // namespace
+
+void shortPause() {
+    sleepFor(kLongestStep);
+}
 
 pid_t pollChild(pid_t pid, int& status) {
     pid_t ended;
@@ -55,11 +67,11 @@ void ChildWatch::pause(int milliseconds) {
         return;
     }
     pollfd end{handle_.get(), POLLIN, 0};
-    ::poll(&end, 1, milliseconds);
+    if (::poll(&end, 1, milliseconds) == -1 && errno != EINTR) pauseWithoutHandle(milliseconds);
 }
 
 void ChildWatch::pauseWithoutHandle(int milliseconds) {
-    ::poll(nullptr, 0, std::min(step_, milliseconds));
+    sleepFor(std::min(step_, milliseconds));
     step_ = std::min(2 * step_, kLongestStep);
 }
 

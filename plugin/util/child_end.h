@@ -11,6 +11,10 @@ namespace ZAV {
 /// waitpid does; 0 while it runs; -1 with errno when there is no such child.
 pid_t pollChild(pid_t pid, int& status);
 
+/// Lets the calling thread sleep for some milliseconds, before it asks again for what the system
+/// could not tell.
+void shortPause();
+
 /// Lets a thread sleep until one child of this process ends.
 class ChildWatch {
 public:

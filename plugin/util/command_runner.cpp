@@ -6,6 +6,7 @@
 #include <cstring>
 
 #include "base/zavtrace.h"
+#include "util/child_end.h"
 #include "util/unit_buffer.h"
 #include "util/zavprocs.h"
 #include "util/zavutil.h"
@@ -22,12 +23,15 @@ constexpr int kLongestPoll = 60 * 1000;  // milliseconds; the deadline may be fu
 /// keep them open: there is no end of file to read up to.
 constexpr const char* kAgentScript = "TovrinAgent";
 
-/// Waits until one of the descriptors is ready; false when the deadline has passed before.
+/// Waits until one of the descriptors is ready; false when the deadline has passed before. When
+/// the system cannot even tell, it is asked again a little later: to go on as if something were
+/// ready could mean to wait without end.
 bool pollUntil(pollfd* descriptors, nfds_t count, const Deadline& deadline) {
     for (;;) {
         const int ready = ::poll(descriptors, count, deadline.millisecondsLeft(kLongestPoll));
-        if (ready > 0 || (ready == -1 && errno != EINTR)) return true;
+        if (ready > 0) return true;
         if (deadline.passed()) return false;
+        if (ready == -1 && errno != EINTR) shortPause();
     }
 }
 
@@ -69,14 +73,9 @@ public:
     /// The one read that follows the end of the child. A stream that somebody else keeps open
     /// without writing to it holds nothing up beyond the deadline.
     void readRest(const Trace& trace, bool nonBlocking, const Deadline& deadline) {
-        bool mayRead = true;
-        if (nonBlocking) {
-            stream_.setNonBlocking(true);
-        } else {
-            pollfd readable{descriptor(), POLLIN, 0};
-            mayRead = pollUntil(&readable, 1, deadline);
-        }
-        if (mayRead) readChunk(trace);
+        const bool returnsAtOnce = nonBlocking && stream_.setNonBlocking(true) != -1;
+        pollfd readable{descriptor(), POLLIN, 0};
+        if (returnsAtOnce || pollUntil(&readable, 1, deadline)) readChunk(trace);
         stream_.close();
     }
 

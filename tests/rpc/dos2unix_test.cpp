@@ -4,7 +4,6 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <string>
@@ -60,16 +59,14 @@ int link(const char* from, const char* to) noexcept {
     return next<int (*)(const char*, const char*)>("link")(from, to);
 }
 
-int fclose(std::FILE* file) {
+int close(int fd) {
     char path[4096] = "";
-    const std::string descriptor = "/proc/self/fd/" + std::to_string(::fileno(file));
+    const std::string descriptor = "/proc/self/fd/" + std::to_string(fd);
     const ssize_t length = ::readlink(descriptor.c_str(), path, sizeof path - 1);
     const bool toFail =
-        length > 0 && fails("fclose", std::string(path, static_cast<std::size_t>(length)));
-    const int closed = next<int (*)(std::FILE*)>("fclose")(file);
-    if (!toFail) return closed;
-    errno = EIO;
-    return EOF;
+        length > 0 && fails("close", std::string(path, static_cast<std::size_t>(length)));
+    const int closed = next<int (*)(int)>("close")(fd);
+    return toFail ? failWith(EIO) : closed;
 }
 
 }  // extern "C"
@@ -130,8 +127,8 @@ TEST_F(Dos2Unix, NamesItsTemporaryFileAndLeavesNone) {
 }
 
 TEST_F(Dos2Unix, EitherFileMayFailToClose) {
-    EXPECT_EQ((Texts{"Could not close [" + file_ + "]."}), errorsOf({"fclose", "/install.sh"}));
-    EXPECT_EQ((Texts{"Could not close [" + temporary() + "]."}), errorsOf({"fclose", "/.zavtemp"}));
+    EXPECT_EQ((Texts{"Could not close [" + file_ + "]."}), errorsOf({"close", "/install.sh"}));
+    EXPECT_EQ((Texts{"Could not close [" + temporary() + "]."}), errorsOf({"close", "/.zavtemp"}));
     EXPECT_EQ("a\r\nb\x1a", original());
 }
 
@@ -139,7 +136,7 @@ TEST_F(Dos2Unix, AnInputMayFailToCloseWhenThereIsNoTemporaryFile) {
     ASSERT_EQ(0, ::rmdir((scratch_.path("home") + "/tmp").c_str()));
     EXPECT_EQ((Texts{"Could not open [" + temporary() + "] for writing.",
                      "Could not close [" + file_ + "]."}),
-              errorsOf({"fclose", "/install.sh"}));
+              errorsOf({"close", "/install.sh"}));
 }
 
 TEST_F(Dos2Unix, PermissionsThatCannotBeSetLeaveTheOriginal) {

@@ -9,6 +9,7 @@
 #include <poll.h>
 #include <pthread.h>
 #include <signal.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -161,8 +162,11 @@ ssize_t write(int fd, const void* buffer, std::size_t size) {
     return interrupted() ? -1 : ::syscall(SYS_write, fd, buffer, size);
 }
 
+/// Only the close of a pipe may be tried again after an interruption.
 int close(int fd) {
-    return interrupted() ? -1 : static_cast<int>(::syscall(SYS_close, fd));
+    struct stat info {};
+    const bool isPipe = faults.interruptions && ::fstat(fd, &info) == 0 && S_ISFIFO(info.st_mode);
+    return isPipe && interrupted() ? -1 : static_cast<int>(::syscall(SYS_close, fd));
 }
 
 pid_t waitpid(pid_t pid, int* status, int options) {
