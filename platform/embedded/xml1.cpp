@@ -1,5 +1,5 @@
-// The XML parser, over expat. Where the local code page is UTF-8, the caller's handlers and user
-// data are the parser's own; elsewhere each event's texts are converted on the way.
+// The XML parser, over expat. Where the local code page is UTF-8, each event's texts are handed
+// over as they come; elsewhere they are converted on the way.
 
 #include "platform/xml1.h"
 
@@ -30,6 +30,7 @@ struct XML1_PARSER {
     const char* buffer = nullptr;      ///< that was handed out last
     int capacity = 0;                  ///< of that buffer
     XML_Error error = XML_ERROR_NONE;  ///< an error that expat was not asked about
+    bool hasElement = false;           ///< one has begun
     bool encodingDecided;
     std::string head;  ///< the first bytes, until they decide about the encoding
 
@@ -40,6 +41,26 @@ struct XML1_PARSER {
 };
 
 namespace {
+
+XML1_PARSER& parserOf(void* context) {
+    return *static_cast<XML1_PARSER*>(context);
+}
+
+void XMLCALL startDirect(void* context, const XML_Char* name, const XML_Char** attributes) {
+    XML1_PARSER& parser = parserOf(context);
+    parser.hasElement = true;
+    if (parser.start != nullptr) parser.start(parser.userData, name, attributes);
+}
+
+void XMLCALL endDirect(void* context, const XML_Char* name) {
+    const XML1_PARSER& parser = parserOf(context);
+    parser.end(parser.userData, name);
+}
+
+void XMLCALL dataDirect(void* context, const XML_Char* text, int length) {
+    const XML1_PARSER& parser = parserOf(context);
+    parser.data(parser.userData, text, length);
+}
 
 /// Runs what may throw inside one of expat's callbacks; a failure ends the parsing.
 template <typename Action>
@@ -60,7 +81,9 @@ void addText(XML1_PARSER& parser, const char* utf8) {
 }
 
 void XMLCALL startConverted(void* context, const XML_Char* name, const XML_Char** attributes) {
-    XML1_PARSER& parser = *static_cast<XML1_PARSER*>(context);
+    XML1_PARSER& parser = parserOf(context);
+    parser.hasElement = true;
+    if (parser.start == nullptr) return;
     guarded(parser, [&] {
         parser.text.clear();
         parser.offsets.clear();
@@ -77,7 +100,7 @@ void XMLCALL startConverted(void* context, const XML_Char* name, const XML_Char*
 }
 
 void XMLCALL endConverted(void* context, const XML_Char* name) {
-    XML1_PARSER& parser = *static_cast<XML1_PARSER*>(context);
+    XML1_PARSER& parser = parserOf(context);
     guarded(parser, [&] {
         parser.text.clear();
         parser.local.append(name, parser.text);
@@ -86,7 +109,7 @@ void XMLCALL endConverted(void* context, const XML_Char* name) {
 }
 
 void XMLCALL dataConverted(void* context, const XML_Char* utf8, int length) {
-    XML1_PARSER& parser = *static_cast<XML1_PARSER*>(context);
+    XML1_PARSER& parser = parserOf(context);
     guarded(parser, [&] {
         parser.text.clear();
         parser.local.append({utf8, static_cast<std::size_t>(length)}, parser.text);
@@ -121,6 +144,12 @@ XML_Status parseHead(XML1_PARSER& parser, int length, bool isFinal) {
                      isFinal ? XML_TRUE : XML_FALSE);
 }
 
+/// Whether all that is wrong with a document is that end tags are missing.
+bool endedWithinElement(const XML1_PARSER& parser) {
+    return parser.hasElement && parser.error == XML_ERROR_NONE &&
+           XML_GetErrorCode(parser.expat.get()) == XML_ERROR_NO_ELEMENTS;
+}
+
 }  // namespace
 
 XML1_PARSER::XML1_PARSER(const char* encoding)
@@ -128,7 +157,8 @@ XML1_PARSER::XML1_PARSER(const char* encoding)
       encodingDecided(encoding != nullptr || !local.readsItself()) {
     if (!expat) throw std::bad_alloc();
     XML_SetUnknownEncodingHandler(expat.get(), xml1::describeEncoding, nullptr);
-    if (!local.isUtf8()) XML_SetUserData(expat.get(), this);
+    XML_SetUserData(expat.get(), this);
+    XML1_SetElementHandler(this, nullptr, nullptr);
 }
 
 XML1_PARSER* XML1_ParserCreate(const char* encoding) {
@@ -142,22 +172,21 @@ XML1_PARSER* XML1_ParserCreate(const char* encoding) {
 void XML1_SetElementHandler(XML1_PARSER* parser, XML1_StartHandler start, XML1_EndHandler end) {
     parser->start = start;
     parser->end = end;
-    if (!parser->local.isUtf8()) {
-        if (start != nullptr) start = startConverted;
-        if (end != nullptr) end = endConverted;
-    }
-    XML_SetElementHandler(parser->expat.get(), start, end);
+    const bool direct = parser->local.isUtf8();
+    // The start is always listened to: whether there was an element decides how a document may end.
+    XML_SetStartElementHandler(parser->expat.get(), direct ? startDirect : startConverted);
+    const XML_EndElementHandler forward = direct ? endDirect : endConverted;
+    XML_SetEndElementHandler(parser->expat.get(), end != nullptr ? forward : nullptr);
 }
 
 void XML1_SetCharacterDataHandler(XML1_PARSER* parser, XML1_DataHandler handler) {
     parser->data = handler;
-    if (!parser->local.isUtf8() && handler != nullptr) handler = dataConverted;
-    XML_SetCharacterDataHandler(parser->expat.get(), handler);
+    const XML_CharacterDataHandler forward = parser->local.isUtf8() ? dataDirect : dataConverted;
+    XML_SetCharacterDataHandler(parser->expat.get(), handler != nullptr ? forward : nullptr);
 }
 
 void XML1_SetUserData(XML1_PARSER* parser, void* userData) {
     parser->userData = userData;
-    if (parser->local.isUtf8()) XML_SetUserData(parser->expat.get(), userData);
 }
 
 void* XML1_GetBuffer(XML1_PARSER* parser, int length) {
@@ -178,7 +207,7 @@ int XML1_ParseBuffer(XML1_PARSER* parser, int length, int isFinal) {
                 ? XML_ParseBuffer(parser->expat.get(), length, isFinal != 0 ? 1 : 0)
                 : parseHead(*parser, length, isFinal != 0);
         parser->capacity = 0;
-        return status == XML_STATUS_OK ? 1 : 0;
+        return status == XML_STATUS_OK || endedWithinElement(*parser) ? 1 : 0;
     } catch (const std::bad_alloc&) {
         parser->error = XML_ERROR_NO_MEMORY;
         return 0;

@@ -67,10 +67,18 @@ TEST(DOMParser, MalformedTextGivesPlaceAndReason) {
     EXPECT_STREQ(parser.getErrorMessage(), "2:5: mismatched tag\n");
 }
 
-TEST(DOMParser, UnclosedElementIsAnError) {
-    DOMParser parser("<a><b></b>");
+TEST(DOMParser, UnclosedElementIsIncomplete) {
+    for (const char* text : {"<a><b></b>", "<a>", "<a k='v'>text\n", "<a><b>text\r", "<a>]"}) {
+        DOMParser parser(text);
+        EXPECT_EQ(parser.parse(), 0) << text;
+        EXPECT_STREQ(parser.getErrorMessage(), "incomplete xml") << text;
+    }
+}
+
+TEST(DOMParser, TextThatEndsWithinATagIsMalformed) {
+    DOMParser parser("<a><b");
     EXPECT_EQ(parser.parse(), 0);
-    EXPECT_STREQ(parser.getErrorMessage(), "1:10: no element found\n");
+    EXPECT_STREQ(parser.getErrorMessage(), "1:3: unclosed token\n");
 }
 
 TEST(DOMParser, SecondRootIsAnError) {

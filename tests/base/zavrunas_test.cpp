@@ -155,10 +155,17 @@ TEST_F(RunAs, EmptyFileIsAnEmptyDatabase) {
 }
 
 TEST_F(RunAs, MalformedFileIsAnEmptyDatabase) {
+    const auto db = load("<r><agent><productCode>ux</productCode></r>");
+    EXPECT_EQ(db->getNumAgents(), 0u);
+    EXPECT_THAT(traces.errors("zavrunas"),
+                ElementsAre("Error parsing xml defaults will be used: 1:41: mismatched tag"));
+}
+
+TEST_F(RunAs, UnfinishedFileIsAnEmptyDatabase) {
     const auto db = load("<r><agent><productCode>ux</productCode></agent>");
     EXPECT_EQ(db->getNumAgents(), 0u);
     EXPECT_THAT(traces.errors("zavrunas"),
-                ElementsAre("Error parsing xml defaults will be used: 1:47: no element found"));
+                ElementsAre("Error parsing xml defaults will be used: incomplete xml"));
 }
 
 TEST_F(RunAs, SaveReproducesTheFile) {

@@ -221,6 +221,23 @@ TEST(Xml, AnEmptyDocumentIsAnError) {
     EXPECT_STREQ("no element found", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
 }
 
+TEST(Xml, ADocumentMayEndWithinAnElement) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        Recorder whole;
+        EXPECT_EQ(1, whole.push("<a>t<b>u</b>", true));
+        EXPECT_THAT(whole.events, ElementsAre("<a", "\"t", "<b", "\"u", ">b"));
+        Recorder cut;
+        EXPECT_EQ(1, cut.pushInPieces("<a>t<b>u</b>", 1));
+        EXPECT_EQ(whole.events, cut.events);
+        Recorder deaf;
+        XML1_SetElementHandler(deaf.parser(), nullptr, nullptr);
+        EXPECT_EQ(1, deaf.push("<a>", true));
+        EXPECT_EQ(0, Recorder().push("<a", true));
+        EXPECT_EQ(0, Recorder().push("<!-- no element -->", true));
+    }
+}
+
 TEST(Xml, MoreThanTheBufferHoldsIsRefused) {
     for (const char* const name : {kUtf8, kLatin1}) {
         const Locale locale(name);

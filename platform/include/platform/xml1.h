@@ -33,7 +33,8 @@ void XML1_SetUserData(XML1_PARSER* parser, void* userData);
 void* XML1_GetBuffer(XML1_PARSER* parser, int length);
 
 /// Parses `length` bytes of the buffer from XML1_GetBuffer; `isFinal` is non-zero for the last
-/// piece. Returns 1 on success, 0 after an error.
+/// piece. Returns 1 on success, 0 after an error. A document that ends while elements are open is
+/// no error: whoever handles the events knows which have not been closed.
 int XML1_ParseBuffer(XML1_PARSER* parser, int length, int isFinal);
 
 int XML1_GetErrorCode(XML1_PARSER* parser);
