@@ -1,31 +1,51 @@
-// How long a task takes to be queued: the time per task must not grow with the queue.
+// How the cost of accepting requests into the queue and taking them off again grows with its depth.
 #include <benchmark/benchmark.h>
 
+#include <vector>
+
+#include "embedded/oxa_host.h"
+#include "tables/zav01agt.h"
 #include "tasks/zavtasks.h"
 
 namespace {
 
-void QueueTasks(benchmark::State& state) {
-    const TaskQueueElem task("node", "a-transaction-id", "START", "ux", "some context", "INSTANCE",
-                             "", "", "062000000", "host:UX");
-    for (auto _ : state) {
-        for (std::int64_t i = 0; i < state.range(0); ++i)
-            queueTask(task);
-        state.PauseTiming();
-        taskQueue = {};
-        state.ResumeTiming();
+/// Takes all tasks as the executor does it, without running them.
+void takeAll() {
+    while (!taskQueue.empty()) {
+        TaskQueueElem taken;
+        pthread_mutex_lock(&queue_mutex);
+        taken = std::move(taskQueue.front());
+        taskQueue.pop();
+        pthread_mutex_unlock(&queue_mutex);
     }
-    state.SetItemsProcessed(state.iterations() * state.range(0));
-    state.SetComplexityN(state.range(0));
 }
-BENCHMARK(QueueTasks)
-    ->Arg(12500)
-    ->Arg(25000)
-    ->Arg(50000)
-    ->Arg(100000)
-    ->Unit(benchmark::kMillisecond)
-    ->Complexity();
+
+/// That many requests are accepted before the first is taken.
+void queue(benchmark::State& state) {
+    const std::vector<oxa::Predicate> request = {{"COMMAND", OPER_EQ, "START"},
+                                                 {"PRODUCT", OPER_EQ, "ux"},
+                                                 {"TRANSID", OPER_EQ, "a-transaction-id"},
+                                                 {"TARGETMSN", OPER_EQ, "host:UX"}};
+    const auto depth = static_cast<std::size_t>(state.range(0));
+    for (auto _ : state) {
+        for (std::size_t i = 0; i < depth; ++i) {
+            oxa::Rows answer;
+            oxa::query("KAGREQT", request, answer);
+        }
+        if (taskQueue.size() != depth) state.SkipWithError("a request was not queued");
+        takeAll();
+    }
+}
+BENCHMARK(queue)->RangeMultiplier(10)->Range(1, 100000);
 
 }  // namespace
 
-BENCHMARK_MAIN();
+int main(int argc, char** argv) {
+    benchmark::Initialize(&argc, argv);
+    // The table's commands without the executor, which would take the tasks itself.
+    commands.push_back("START");
+    if (zav_kagreqt_init() != 0) return 1;
+    benchmark::RunSpecifiedBenchmarks();
+    benchmark::Shutdown();
+    return 0;
+}

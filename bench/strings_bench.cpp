@@ -1,180 +1,139 @@
-// Text: conversions beside bare iconv with a kept descriptor, searching, editing, splitting.
-//
-// Every conversion of this library makes its owned result; iconv is given its buffers, so its
-// figures are those of the conversion alone.
+// Searching, editing and splitting texts, beside the same done with the standard library's string
+// of 16-bit units; and how the cost of building long texts piece by piece grows with their length.
 
 #include <benchmark/benchmark.h>
-#include <iconv.h>
 
-#include <cstdlib>
+#include <algorithm>
 #include <string>
-#include <vector>
 
 #include "base/zavstr.h"
 #include "base/zavtoken.h"
 
-using ZAV::CharStar;
 using ZAV::String;
 
 namespace {
 
-enum Kind : int { kAscii, kUtf8, kLatin1 };
-
-/// Converts in the code page of that kind from here on.
-void useLocaleOf(int kind) {
-    ::setenv("LC_ALL", kind == kLatin1 ? "C" : "C.UTF-8", 1);
-    String::initialize();
-}
-
-/// Text of that kind, `size` bytes with some room for rounding.
-std::string sample(int kind, std::size_t size) {
-    const std::string pattern = kind == kAscii  ? "The quick brown fox, 0123456789 "
-                                : kind == kUtf8 ? "Gr\xC3\xB6\xC3\x9F"
-                                                  "e \xE2\x82\xAC 12, "
-                                                : "Gr\xF6\xDF"
-                                                  "e \xA3 12, ";
-    std::string text;
-    while (text.size() < size)
-        text += pattern;
-    if (kind != kUtf8) text.resize(size);
-    return text;
-}
-
-class Iconv {
-public:
-    Iconv(const char* to, const char* from) : descriptor_(::iconv_open(to, from)) {}
-    ~Iconv() { ::iconv_close(descriptor_); }
-    Iconv(const Iconv&) = delete;
-    Iconv& operator=(const Iconv&) = delete;
-
-    void convert(const char* text, std::size_t length, char* out, std::size_t room) {
-        char* in = const_cast<char*>(text);
-        ::iconv(descriptor_, nullptr, nullptr, nullptr, nullptr);
-        benchmark::DoNotOptimize(::iconv(descriptor_, &in, &length, &out, &room));
-    }
-
-private:
-    iconv_t descriptor_;
-};
-
-const char* codesetOf(int kind) {
-    return kind == kLatin1 ? "ISO-8859-1" : "UTF-8";
-}
-
-void finish(benchmark::State& state, std::size_t bytes) {
-    state.SetBytesProcessed(static_cast<std::int64_t>(bytes) * state.iterations());
-}
-
-int kindOf(const benchmark::State& state) {
-    return static_cast<int>(state.range(0));
-}
-
-std::string sampleOf(const benchmark::State& state) {
-    return sample(kindOf(state), static_cast<std::size_t>(state.range(1)));
-}
-
-void stringFromNarrow(benchmark::State& state) {
-    useLocaleOf(kindOf(state));
-    const std::string text = sampleOf(state);
-    for (auto _ : state) {
-        const String converted(text.c_str());
-        benchmark::DoNotOptimize(converted.getData());
-    }
-    finish(state, text.size());
-}
-
-void iconvFromNarrow(benchmark::State& state) {
-    const std::string text = sampleOf(state);
-    Iconv iconv("UTF-16LE", codesetOf(kindOf(state)));
-    std::vector<char> out(text.size() * 2 + 2);
-    for (auto _ : state) {
-        iconv.convert(text.c_str(), text.size() + 1, out.data(), out.size());
-        benchmark::ClobberMemory();
-    }
-    finish(state, text.size());
-}
-
-void stringToNarrow(benchmark::State& state) {
-    useLocaleOf(kindOf(state));
-    const std::string text = sampleOf(state);
-    const String wide(text.c_str());
-    for (auto _ : state) {
-        const CharStar converted = wide.c_str();
-        benchmark::DoNotOptimize(static_cast<const char*>(converted));
-    }
-    finish(state, text.size());
-}
-
-void iconvToNarrow(benchmark::State& state) {
-    useLocaleOf(kindOf(state));
-    const std::string text = sampleOf(state);
-    const String wide(text.c_str());
-    Iconv iconv(codesetOf(kindOf(state)), "UTF-16LE");
-    // The room that c_str() has, so that both cut the text at the same place.
-    std::vector<char> out(wide.length() + 1);
-    for (auto _ : state) {
-        iconv.convert(reinterpret_cast<const char*>(wide.getData()), out.size() * 2, out.data(),
-                      out.size());
-        benchmark::ClobberMemory();
-    }
-    finish(state, text.size());
-}
-
-void everySize(benchmark::internal::Benchmark* bench) {
-    bench->ArgNames({"kind", "bytes"});
-    for (const int kind : {kAscii, kUtf8, kLatin1}) {
-        for (const int bytes : {32, 256, 65536})
-            bench->Args({kind, bytes});
-    }
-}
-
-BENCHMARK(stringFromNarrow)->Apply(everySize);
-BENCHMARK(iconvFromNarrow)->Apply(everySize);
-BENCHMARK(stringToNarrow)->Apply(everySize);
-BENCHMARK(iconvToNarrow)->Apply(everySize);
+constexpr const char* kSentence = "The quick brown fox, 0123456789 ";
 
 std::size_t sizeOf(const benchmark::State& state) {
     return static_cast<std::size_t>(state.range(0));
 }
 
-String asciiText(const benchmark::State& state) {
-    useLocaleOf(kAscii);
-    return String(sample(kAscii, sizeOf(state)).c_str());
+std::string narrowText(std::size_t size) {
+    std::string text;
+    while (text.size() < size)
+        text += kSentence;
+    text.resize(size);
+    return text;
 }
 
-void findUnit(benchmark::State& state) {
-    const String text = asciiText(state);
+String ownText(std::size_t size) {
+    return String(narrowText(size).c_str());
+}
+
+std::u16string standardText(std::size_t size) {
+    const std::string text = narrowText(size);
+    return std::u16string(text.begin(), text.end());
+}
+
+// ---- This library -------------------------------------------------------------------------------
+
+void findUnitString(benchmark::State& state) {
+    const String text = ownText(sizeOf(state));
     for (auto _ : state)
         benchmark::DoNotOptimize(text.find('~'));
-    finish(state, sizeOf(state));
 }
 
-void findText(benchmark::State& state) {
-    const String text = asciiText(state);
+void findTextString(benchmark::State& state) {
+    const String text = ownText(sizeOf(state));
     const String wanted("quick red fox");
     for (auto _ : state)
         benchmark::DoNotOptimize(text.find(wanted, 0));
-    finish(state, sizeOf(state));
 }
 
-void replaceText(benchmark::State& state) {
-    const String text = asciiText(state);
+void replaceString(benchmark::State& state) {
+    const String text = ownText(sizeOf(state));
     const String what("quick"), with("very slow");
     for (auto _ : state)
         benchmark::DoNotOptimize(String::replace(text, what, with).getData());
-    finish(state, sizeOf(state));
 }
 
-void trimText(benchmark::State& state) {
-    const String blanks(std::string(8, ' ').c_str());
-    const String text = blanks + asciiText(state) + blanks;
+void trimString(benchmark::State& state) {
+    const String blanks("        ");
+    const String text = blanks + ownText(sizeOf(state)) + blanks;
     for (auto _ : state) {
         String trimmed(text);
         benchmark::DoNotOptimize(trimmed.trim().getData());
     }
-    finish(state, sizeOf(state));
 }
 
+void splitString(benchmark::State& state) {
+    const String text = ownText(sizeOf(state));
+    const String delimiters(", ");
+    for (auto _ : state) {
+        StringTokenizer tokenizer(text, delimiters);
+        while (tokenizer.hasMoreTokens())
+            benchmark::DoNotOptimize(tokenizer.nextToken().getData());
+    }
+}
+
+// ---- The standard library -----------------------------------------------------------------------
+
+void findUnitStandard(benchmark::State& state) {
+    const std::u16string text = standardText(sizeOf(state));
+    for (auto _ : state)
+        benchmark::DoNotOptimize(text.find(u'~'));
+}
+
+void findTextStandard(benchmark::State& state) {
+    const std::u16string text = standardText(sizeOf(state));
+    const std::u16string wanted(u"quick red fox");
+    for (auto _ : state)
+        benchmark::DoNotOptimize(text.find(wanted));
+}
+
+void replaceStandard(benchmark::State& state) {
+    const std::u16string text = standardText(sizeOf(state));
+    const std::u16string what(u"quick"), with(u"very slow");
+    for (auto _ : state) {
+        std::u16string out;
+        std::size_t at = 0;
+        for (std::size_t hit; (hit = text.find(what, at)) != text.npos; at = hit + what.size()) {
+            out.append(text, at, hit - at);
+            out += with;
+        }
+        out.append(text, at);
+        benchmark::DoNotOptimize(out.data());
+    }
+}
+
+void trimStandard(benchmark::State& state) {
+    const std::u16string blanks(8, u' ');
+    const std::u16string text = blanks + standardText(sizeOf(state)) + blanks;
+    for (auto _ : state) {
+        std::u16string trimmed(text);
+        trimmed.erase(trimmed.find_last_not_of(u" \t\r\n\f") + 1);
+        trimmed.erase(0, trimmed.find_first_not_of(u" \t\r\n\f"));
+        benchmark::DoNotOptimize(trimmed.data());
+    }
+}
+
+void splitStandard(benchmark::State& state) {
+    const std::u16string text = standardText(sizeOf(state));
+    const std::u16string delimiters(u", ");
+    for (auto _ : state) {
+        std::size_t end = 0;
+        for (std::size_t at; (at = text.find_first_not_of(delimiters, end)) != text.npos;) {
+            end = std::min(text.find_first_of(delimiters, at), text.size());
+            const std::u16string token(text, at, end - at);
+            benchmark::DoNotOptimize(token.data());
+        }
+    }
+}
+
+// ---- Growth -------------------------------------------------------------------------------------
+
+/// Unit by unit.
 void appendUnits(benchmark::State& state) {
     for (auto _ : state) {
         String text;
@@ -182,48 +141,56 @@ void appendUnits(benchmark::State& state) {
             text.append('x');
         benchmark::DoNotOptimize(text.getData());
     }
-    finish(state, sizeOf(state));
 }
 
-void insertAndRemoveEscapes(benchmark::State& state) {
-    const String text = asciiText(state);
+/// By a line's length at a time.
+void appendTexts(benchmark::State& state) {
+    const String line = ownText(64);
+    for (auto _ : state) {
+        String text;
+        for (std::size_t i = 0; i < sizeOf(state); i += 64)
+            text.append(line);
+        benchmark::DoNotOptimize(text.getData());
+    }
+}
+
+void insertEscapes(benchmark::State& state) {
+    const String text = ownText(sizeOf(state));
     const String special(",");
     for (auto _ : state) {
         String escaped(text);
-        benchmark::DoNotOptimize(
-            escaped.insertEscapes('\\', special).removeEscapes('\\').getData());
+        benchmark::DoNotOptimize(escaped.insertEscapes('\\', special).getData());
     }
-    finish(state, sizeOf(state));
 }
 
-void splitText(benchmark::State& state) {
-    const String text = asciiText(state);
-    const String delimiters(", ");
-    for (auto _ : state) {
-        StringTokenizer tokenizer(text, delimiters);
-        while (tokenizer.hasMoreTokens())
-            benchmark::DoNotOptimize(tokenizer.nextToken().getData());
+void addOperation(const std::string& name, void (*own)(benchmark::State&),
+                  void (*standard)(benchmark::State&)) {
+    for (const auto& [way, run] : {std::pair{"/string", own}, std::pair{"/standard", standard}}) {
+        benchmark::RegisterBenchmark((name + way).c_str(), run)->Arg(32)->Arg(256)->Arg(65536);
     }
-    finish(state, sizeOf(state));
 }
 
-void compareTexts(benchmark::State& state) {
-    const String text = asciiText(state);
-    const String same(text);
-    for (auto _ : state)
-        benchmark::DoNotOptimize(text == same);
-    finish(state, sizeOf(state));
+void addGrowth(const std::string& name, void (*run)(benchmark::State&)) {
+    benchmark::RegisterBenchmark(("growth/" + name).c_str(), run)
+        ->RangeMultiplier(4)
+        ->Range(1 << 10, 4 << 20);
 }
-
-BENCHMARK(findUnit)->Arg(32)->Arg(256)->Arg(65536);
-BENCHMARK(findText)->Arg(32)->Arg(256)->Arg(65536);
-BENCHMARK(replaceText)->Arg(32)->Arg(256)->Arg(65536);
-BENCHMARK(trimText)->Arg(32)->Arg(256)->Arg(65536);
-BENCHMARK(appendUnits)->Arg(32)->Arg(256)->Arg(65536);
-BENCHMARK(insertAndRemoveEscapes)->Arg(32)->Arg(256)->Arg(65536);
-BENCHMARK(splitText)->Arg(32)->Arg(256)->Arg(65536);
-BENCHMARK(compareTexts)->Arg(32)->Arg(256)->Arg(65536);
 
 }  // namespace
 
-BENCHMARK_MAIN();
+int main(int argc, char** argv) {
+    benchmark::Initialize(&argc, argv);
+    addOperation("find_unit", findUnitString, findUnitStandard);
+    addOperation("find_text", findTextString, findTextStandard);
+    addOperation("replace", replaceString, replaceStandard);
+    addOperation("trim", trimString, trimStandard);
+    addOperation("split", splitString, splitStandard);
+    addGrowth("append_units", appendUnits);
+    addGrowth("append_texts", appendTexts);
+    addGrowth("insert_escapes", insertEscapes);
+    addGrowth("replace", replaceString);
+    addGrowth("split", splitString);
+    benchmark::RunSpecifiedBenchmarks();
+    benchmark::Shutdown();
+    return 0;
+}

@@ -56,19 +56,21 @@ void TaskQueueElem::ReturnStatus(int rc) {
     Trace trace(traceUnit);
     trace().detail("Returning status return code [%d], message id [%s] parms [%s]", rc, retmsgid_,
                    retmsgparm_);
-    setField(row_.originnode, originnode_);
-    setField(row_.transid, transid_);
-    setField(row_.command, command_);
-    setField(row_.product, product_);
-    setField(row_.context, context_);
-    setField(row_.optional, optional_);
-    setField(row_.uaconfig, uaconfig_);
-    setField(row_.uascript, uascript_);
-    setField(row_.version, version_);
-    row_.retval = rc;
-    setField(row_.retmsgid, retmsgid_);
-    setField(row_.retmsgparm, retmsgparm_);
-    setField(row_.targetmsn, targetmsn_);
+    const auto row = std::make_shared<zav_kagreqt_data_t>();
+    setField(row->originnode, originnode_);
+    setField(row->transid, transid_);
+    setField(row->command, command_);
+    setField(row->product, product_);
+    setField(row->context, context_);
+    setField(row->optional, optional_);
+    setField(row->uaconfig, uaconfig_);
+    setField(row->uascript, uascript_);
+    setField(row->version, version_);
+    row->retval = rc;
+    setField(row->retmsgid, retmsgid_);
+    setField(row->retmsgparm, retmsgparm_);
+    setField(row->targetmsn, targetmsn_);
+    row_ = row;
 }
 
 void TaskQueueElem::returnAsyncStatus(int rc) {

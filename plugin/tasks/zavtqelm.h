@@ -1,6 +1,8 @@
 /// One management request of the server together with its outcome.
 #pragma once
 
+#include <memory>
+
 #include "base/zavstr.h"
 #include "tasks/request_row.h"
 
@@ -46,7 +48,7 @@ public:
     ZAV::String getTargetmsn() const { return targetmsn_; }
 
     /// The request table's row as ReturnStatus() has filled it; all 0 before.
-    zav_kagreqt_data_t getReturnResults() const { return row_; }
+    zav_kagreqt_data_t getReturnResults() const { return row_ ? *row_ : zav_kagreqt_data_t{}; }
     /// Fills the request table's row with the record's values and `rc`; sends nothing. Values that
     /// are too long for their columns are cut and traced.
     void ReturnStatus(int rc);
@@ -71,5 +73,7 @@ private:
     ZAV::String targetmsn_;
     ZAV::String retmsgid_;
     ZAV::String retmsgparm_;
-    zav_kagreqt_data_t row_{};
+    // Shared by copies, never changed, and null until it is filled: a row takes far more room than
+    // all the rest, and a task that waits in the queue has none.
+    std::shared_ptr<const zav_kagreqt_data_t> row_;
 };

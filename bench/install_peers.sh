@@ -1,0 +1,57 @@
+#!/bin/sh
+# Installs what the benchmarks compare with, and what draws their pictures, as far as it is missing
+# and the distribution has it.
+#
+#   bench/install_peers.sh
+#
+# No service is started or left to be started by this: the benchmarks start what they need.
+set -eu
+
+tools='gnuplot-nox python3'
+peers='libicu-dev rsync openssh-client openssh-server nagios-nrpe-server nagios-nrpe-plugin zabbix-agent'
+
+as_root() { if [ "$(id -u)" -eq 0 ]; then "$@"; else sudo "$@"; fi; }
+
+is_installed() {
+    dpkg-query -W -f '${db:Status-Status}' "$1" 2>/dev/null | grep -qx installed
+}
+
+# Packages that bring a service start it unless this program, which belongs to the administrator,
+# says no.
+policy=/usr/sbin/policy-rc.d
+made_policy=
+forbid_starting() {
+    [ ! -e "$policy" ] || return 0
+    made_policy=yes
+    trap allow_starting EXIT
+    printf '#!/bin/sh\nexit 101\n' | as_root tee "$policy" >/dev/null
+    as_root chmod 755 "$policy"
+}
+allow_starting() { [ -z "$made_policy" ] || as_root rm -f "$policy"; }
+
+install() {
+    DEBIAN_FRONTEND=noninteractive as_root \
+        apt-get install -y -qq --no-install-recommends "$1" >/dev/null 2>&1
+}
+
+missing=''
+for package in $tools $peers; do
+    is_installed "$package" || missing="$missing $package"
+done
+[ -n "$missing" ] || exit 0
+
+echo "install_peers: installing$missing"
+forbid_starting
+as_root apt-get update -qq 2>/dev/null || true
+for package in $missing; do
+    if ! install "$package"; then
+        echo "install_peers: $package cannot be had" >&2
+        continue
+    fi
+    case $package in
+    openssh-server) service=ssh ;;
+    nagios-nrpe-server | zabbix-agent) service=$package ;;
+    *) continue ;;
+    esac
+    as_root systemctl disable --quiet "$service" 2>/dev/null || true
+done

@@ -1,0 +1,106 @@
+#!/bin/bash
+# shellcheck disable=SC2034 # what is set here is used by those that source it
+#
+# Functions for scripts that measure this system beside others on the loopback interface; to be
+# sourced by a script that calls make_scratch first. What is started by them is ended, and the
+# scratch folder removed, when the script exits.
+
+# make_scratch NAME: sets `scratch` to a new folder in memory, which other users may pass through.
+make_scratch() {
+    scratch=$(mktemp -d "/dev/shm/$1.XXXXXX")
+    chmod 711 "$scratch"
+    started=()
+    made_run_sshd=
+    trap end_all EXIT
+    trap 'exit 130' INT TERM HUP
+}
+
+end_all() {
+    local pid
+    for pid in "${started[@]}"; do kill "$pid" && wait "$pid"; done
+    rm -rf "$scratch"
+    [ -z "$made_run_sshd" ] || rmdir /run/sshd
+} >/dev/null 2>&1
+
+# start COMMAND...: runs it in the background until the script ends; its messages go to the log.
+start() {
+    "$@" >>"$scratch/log" 2>&1 &
+    started+=($!)
+}
+
+# path_of PROGRAM: where it is, also when that is not a user's directory for programs.
+path_of() { PATH=$PATH:/usr/sbin:/usr/lib/nagios/plugins command -v "$1"; }
+
+free_port() {
+    local port
+    while :; do
+        port=$((20000 + RANDOM % 12000))
+        (exec 3<>"/dev/tcp/127.0.0.1/$port") 2>/dev/null || { echo "$port"; return; }
+    done
+}
+
+# await COMMAND...: runs it until it succeeds, for 10 s at most.
+await() {
+    local i
+    for ((i = 0; i < 200; ++i)); do "$@" >/dev/null 2>&1 && return; sleep 0.05; done
+    echo "not ready: $*" >&2
+    return 1
+}
+
+answers() { (exec 3<>"/dev/tcp/127.0.0.1/$1"); }
+
+# start_host BUILD: starts a host with the home and depot in the scratch folder; sets `host` to its
+# process and `host_socket`.
+start_host() {
+    mkdir -p "$scratch"/{depot,home/{bin,config,logs,tmp}}
+    if [ ! -e "$scratch/home/bin/TovrinAgent" ]; then
+        printf '#!/bin/sh\nexit 0\n' >"$scratch/home/bin/TovrinAgent"
+        chmod +x "$scratch/home/bin/TovrinAgent"
+    fi
+    host_socket=$scratch/host.sock
+    QVSDEPLOY_AGENTDEPOT=$scratch/depot start "$1/bin/zavhost" --home "$scratch/home" \
+        --socket "$host_socket"
+    host=${started[-1]}
+    await grep -q ready: "$scratch/log"
+}
+
+# start_sshd: starts a server with throw-away keys; sets `ssh_port` and `ssh_options` for its
+# clients. Fails when there is no server. Its shells take themselves for inner ones, so that the
+# user's own start-up file, which may do anything, does not count against ssh.
+start_sshd() {
+    local sshd
+    sshd=$(path_of sshd) && path_of ssh >/dev/null || return
+    ssh_port=$(free_port)
+    if [ "$(id -u)" -eq 0 ] && [ ! -d /run/sshd ]; then
+        mkdir -p /run/sshd
+        made_run_sshd=1
+    fi
+    ssh-keygen -q -t ed25519 -N '' -f "$scratch/hostkey"
+    ssh-keygen -q -t ed25519 -N '' -f "$scratch/key"
+    start "$sshd" -D -f /dev/null -p "$ssh_port" \
+        -o ListenAddress=127.0.0.1 -h "$scratch/hostkey" -o PidFile=none -o StrictModes=no \
+        -o AuthorizedKeysFile="$scratch/key.pub" -o PermitRootLogin=yes -o UsePAM=no \
+        -o SetEnv=SHLVL=2 -o Subsystem="sftp internal-sftp"
+    await answers "$ssh_port" || return
+    ssh_options=(-F none -i "$scratch/key" -o StrictHostKeyChecking=no
+        -o UserKnownHostsFile=/dev/null -o LogLevel=ERROR -o BatchMode=yes)
+}
+
+# start_rsync: starts a daemon whose module "target" is $scratch/target; sets `rsync_port`. Fails
+# when there is no rsync.
+start_rsync() {
+    path_of rsync >/dev/null || return
+    rsync_port=$(free_port)
+    mkdir -p "$scratch/target"
+    printf '%s\n' 'use chroot = no' "uid = $(id -u)" "gid = $(id -g)" '[target]' \
+        "path = $scratch/target" 'read only = no' >"$scratch/rsyncd.conf"
+    start rsync --daemon --no-detach --address=127.0.0.1 --port="$rsync_port" \
+        --config="$scratch/rsyncd.conf"
+    await answers "$rsync_port"
+}
+
+# now: nanoseconds since 1970.
+now() { date +%s%N; }
+
+# write_result KEY VALUE: appends a figure to the file that the variable `out` names, if any.
+write_result() { [ -z "$out" ] || printf '%s\t%s\n' "$1" "$2" >>"$out"; }

@@ -1,0 +1,160 @@
+"""The table of ratios: what is compared with what, the goals, and whether they are met."""
+
+from dataclasses import dataclass
+from typing import Optional
+
+from curves import CURVES, MOST_PER_DOUBLING
+
+
+@dataclass
+class Row:
+    what: str
+    against: str
+    values: list  # numbers; None where a figure is missing
+    goal: Optional[float] = None  # each value is at most this
+    strict: bool = False  # below it
+    goal_text: str = ""
+    reason: str = ""  # why the goal may be missed, and what was tried
+
+    def met(self):
+        present = [value for value in self.values if value is not None]
+        if not present or self.goal is None:
+            return None
+        return all(value < self.goal if self.strict else value <= self.goal for value in present)
+
+    def cells(self):
+        if all(value is None for value in self.values):
+            shown = "left out"
+        else:
+            shown = " / ".join("–" if v is None else _number(v) for v in self.values)
+        goal = self.goal_text
+        if self.goal is not None and not goal:
+            goal = ("below " if self.strict else "at most ") + _number(self.goal)
+        met = {None: "", True: "yes", False: "**no**"}[self.met()]
+        return [self.what, self.against, shown, goal, met]
+
+
+def _number(value):
+    if value == int(value) and value < 100:
+        return str(int(value))
+    if value < 0.1:
+        return f"{value:.3f}"
+    return f"{value:.2f}"
+
+
+class Table:
+    """Builds the rows from a run's figures."""
+
+    def __init__(self, figures):
+        self._figures = figures
+
+    def _ratio(self, own, other, times=1.0):
+        if own not in self._figures or other not in self._figures:
+            return None
+        return self._figures[own] * times / self._figures[other]
+
+    def _commands(self):
+        def counter(run, name):
+            return self._figures.get(f"{run}:{name}")
+
+        yield Row("running a one-line script", "`posix_spawn` and three pipes",
+                  [counter("script/small", "run/spawn")], 1.25)
+        yield Row("the same, 99th percentile", "the same",
+                  [counter("script/small", "p99_run/spawn")], 2)
+        yield Row("the same, median", "`fork`, `execve` and three pipes",
+                  [counter("script/small", "run/fork")])
+        yield Row("the same with 1 GiB of touched heap", "`posix_spawn` and three pipes",
+                  [counter("script/1GiB", "run/spawn")])
+        yield Row("the same with 1 GiB of touched heap", "`fork`, `execve` and three pipes",
+                  [counter("script/1GiB", "run/fork")])
+        yield Row("the same with 1 GiB of touched heap", "itself with a small heap",
+                  [self._ratio("script/1GiB:run", "script/small:run")], 1.2)
+
+    def _requests(self):
+        children = self._figures.get("request/children", 0)
+        share = 1 / children if children else 1
+        peers = [("zabbix", "Zabbix agent, `system.run`"), ("nrpe", "NRPE, raw client without TLS"),
+                 ("check_nrpe", "NRPE, `check_nrpe`"), ("ssh_master", "`ssh`, master connection"),
+                 ("ssh", "`ssh`")]
+        for peer, title in peers:
+            yield Row("GETCONFIG per child process, connection new / kept", title,
+                      [self._ratio(f"request/host/getconfig/{way}", f"request/{peer}", share)
+                       for way in ("anew", "kept")], 1, strict=True)
+        for query, title in (("inventory", "query of KINAGT (two child processes)"),
+                             ("refused", "request that is refused")):
+            for peer, peer_title in peers[:2]:
+                yield Row(f"{title}, connection new / kept", peer_title,
+                          [self._ratio(f"request/host/{query}/{way}", f"request/{peer}")
+                           for way in ("anew", "kept")])
+
+    def _conversions(self):
+        kinds = [("utf8_ascii", "ASCII", "UTF-8"), ("utf8_mixed", "mixed text", "UTF-8"),
+                 ("latin1_ascii", "ASCII", "ISO-8859-1"),
+                 ("latin1_mixed", "mixed text", "ISO-8859-1")]
+        for way, title in (("iconv", "bare `iconv`, descriptor kept"),
+                           ("icu", "ICU's converter, kept")):
+            for direction in ("from", "to"):
+                for kind, text, codeset in kinds:
+                    goal = 1 if way == "iconv" and kind.endswith("ascii") else None
+                    yield Row(f"`String` {direction} {codeset}, {text}, 32 B / 256 B / 64 KiB",
+                              title,
+                              [self._ratio(f"{direction}/{kind}/{size}/string",
+                                           f"{direction}/{kind}/{size}/{way}")
+                               for size in (32, 256, 65536)], goal, strict=True)
+
+    def _texts(self):
+        for operation, title in (("find_unit", "`find` of a character"),
+                                 ("find_text", "`find` of a text"), ("replace", "`replace`"),
+                                 ("trim", "`trim` of a copy"), ("split", "`StringTokenizer`")):
+            yield Row(f"{title}, 32 / 256 / 65,536 characters", "`std::u16string`",
+                      [self._ratio(f"{operation}/string/{size}", f"{operation}/standard/{size}")
+                       for size in (32, 256, 65536)])
+
+    def _files(self):
+        yield Row("run-as database read, 1 KiB / 1 MiB", "bare expat that builds a tree",
+                  [self._ratio(f"runas/{size}", f"expat/{size}") for size in (1024, 1 << 20)])
+
+    def _transfers(self):
+        def row(what, peer, title, goal=None, goal_text=""):
+            return Row("push of one file of 1 GiB" if what == "large" else
+                       "push of a folder of 10,000 files of 4 KiB", title,
+                       [self._ratio(f"transfer/{what}/push", f"transfer/{what}/{peer}")], goal,
+                       goal_text=goal_text)
+
+        yield row("large", "sync", "`rsync` to a daemon", 1)
+        yield row("large", "copy", "`cp`")
+        yield row("large", "secure", "`scp`")
+        yield row("many", "secure", "`scp -r`", 1 / 6, "at most 0.17")
+        yield row("many", "sync", "`rsync` to a daemon", 1)
+        yield row("many", "copy", "`cp -r`")
+
+    def _growth(self):
+        for curve in CURVES:
+            yield Row(f"growth: {curve.title}, worst doubling", "half the work",
+                      [curve.worst_doubling(self._figures)], MOST_PER_DOUBLING)
+
+    def _rest(self):
+        seconds = self._figures.get("rest/seconds", 0)
+        yield Row(f"host at rest: wake-ups in {seconds:.0f} s", "none",
+                  [self._figures.get("rest/wakeups")], 0, goal_text="0")
+        yield Row("host at rest: resident memory", "12 MiB",
+                  [None if "rest/resident_kib" not in self._figures else
+                   self._figures["rest/resident_kib"] / (12 * 1024)], 1, strict=True)
+
+    def rows(self):
+        for part in (self._commands, self._requests, self._conversions, self._texts, self._files,
+                     self._transfers, self._growth, self._rest):
+            yield from part()
+
+
+HEAD = ["What", "Against", "Ratio", "Goal", "Met"]
+
+
+def markdown(head, rows):
+    """A table in Markdown whose columns are aligned, so that it can be read as it is, too."""
+    rows = [head, *rows]
+    widths = [max(len(row[i]) for row in rows) for i in range(len(head))]
+    lines = ["| " + " | ".join(cell.ljust(w) for cell, w in zip(row, widths)) + " |"
+             for row in rows]
+    lines.insert(1, "|" + "|".join("-" * (width + 2) for width in widths) + "|")
+    return "\n".join(lines)
