@@ -1,15 +1,16 @@
 #!/bin/sh
 # Builds and runs every test: on this machine's width, on 32-bit, and under the address and
-# undefined-behaviour sanitizers. Before them every fuzz target runs for a short time.
+# undefined-behaviour sanitizers. Before them every fuzz target runs for a short time, and after them
+# a host is soaked for two minutes.
 #
-#   scripts/test.sh [PRESET ...]     only these presets, and no fuzzing
+#   scripts/test.sh [PRESET ...]     only these presets, no fuzzing and no soak
 #   scripts/test.sh tsan             what starts threads, under the thread sanitizer
 set -eu
 cd "$(dirname "$0")/.."
 
 scripts/bootstrap.sh
-fuzz=
-[ $# -gt 0 ] || fuzz=1
+all=
+[ $# -gt 0 ] || all=1
 [ $# -gt 0 ] || set -- native i686 asan
 
 for preset in "$@"; do
@@ -20,7 +21,7 @@ for preset in "$@"; do
     }
     cmake --build --preset "$preset" -- --quiet
 done
-if [ -n "$fuzz" ]; then
+if [ -n "$all" ]; then
     echo "== fuzz: build and 20 seconds per target"
     scripts/fuzz.sh --short
 fi
@@ -29,3 +30,7 @@ for preset in "$@"; do
     # Some cases measure seconds; on a machine that is busy otherwise one may fail once.
     ctest --preset "$preset" --progress --repeat until-pass:2
 done
+if [ -n "$all" ]; then
+    echo "== native: soak"
+    scripts/soak.sh 2
+fi

@@ -1,0 +1,40 @@
+/// HTTP requests and answers as texts.
+#pragma once
+
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "soak/ledger.h"
+
+namespace soak {
+
+struct Answer {
+    int status = 0;
+    bool closes = false;  ///< the host says that it closes the connection
+    std::string body;
+};
+
+std::string getRequest(const std::string& target);
+std::string postRequest(const std::string& target, const std::string& body);
+
+/// A query with the conditions "column = value".
+std::string queryBody(const std::string& table,
+                      const std::vector<std::pair<std::string, std::string>>& where);
+
+/// Takes one complete answer out of `in`; nothing while it is not complete. An answer that is none
+/// has the status -1.
+std::optional<Answer> takeAnswer(std::string& in);
+
+/// One message of an event stream: a row, or how many were lost.
+struct EventMessage {
+    bool overflow = false;
+    std::size_t lost = 0;
+    OutcomeRow row;
+};
+
+/// Takes one complete message out of `in`. Throws std::runtime_error when it is none.
+std::optional<EventMessage> takeEvent(std::string& in);
+
+}  // namespace soak

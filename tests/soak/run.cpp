@@ -1,0 +1,219 @@
+#include "soak/run.h"
+
+#include <algorithm>
+#include <atomic>
+#include <cinttypes>
+#include <cstdio>
+#include <filesystem>
+#include <stdexcept>
+
+#include "soak/requester.h"
+#include "soak/subscriber.h"
+
+namespace soak {
+namespace {
+
+constexpr double kProgressSeconds = 10;
+constexpr double kDrainSeconds = 240;
+constexpr double kFenceSeconds = 120;
+constexpr double kHostEndSeconds = 30;
+/// Children that nobody waits for any more end by themselves within that.
+constexpr double kSettleSeconds = 20;
+/// How far the memory after the warm-up may be exceeded: what the allocator keeps in pieces.
+constexpr long kMemoryMarginKiB = 8192;
+
+// Instrumented programs keep freed memory for a while.
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr bool kMeasuresMemory = false;
+#else
+constexpr bool kMeasuresMemory = true;
+#endif
+
+std::atomic<bool> interruption{false};
+
+const char* verdict(bool good) {
+    return good ? "good" : "BAD";
+}
+
+}  // namespace
+
+void Run::interrupt() {
+    interruption = true;
+}
+
+bool Run::interrupted() {
+    return interruption;
+}
+
+Run::Run(const Options& options, const SoakHome& home)
+    : options_(options),
+      home_(home),
+      world_(options.seed, home),
+      host_(options.host, options.plugin, home),
+      crowd_(world_),
+      mix_(world_, crowd_, options.clients),
+      weather_(world_, host_) {}
+
+bool Run::toTheEnd() {
+    if (!openControl()) return false;
+    const double whole = options_.minutes * 60;
+    const double warmUp = std::min(60.0, whole / 4);
+    traffic(warmUp);
+    drain();
+    const Gauges before = settledGauges();
+    std::printf("%6.0f s  warm: %ld descriptors, %ld threads, %ld KiB resident\n",
+                world_.clock.wall(), before.descriptors, before.threads, before.residentKiB);
+    traffic(whole - warmUp);
+    drain();
+    const Gauges after = settledGauges();
+    if (interrupted()) return false;
+    judge(before, after);
+    endHost();
+    printVerdict(before, after);
+    return world_.tally.faultCount() == 0;
+}
+
+bool Run::openControl() {
+    auto control = std::make_unique<ControlSubscriber>(world_);
+    const ControlSubscriber& opened = *control;
+    crowd_.add(std::move(control));
+    if (turnUntil(30, [&opened] { return opened.live(); })) return true;
+    std::printf("the control subscription cannot be opened\n");
+    return false;
+}
+
+bool Run::turnUntil(double seconds, const std::function<bool()>& done) {
+    const double end = world_.clock.wall() + seconds;
+    while (!done()) {
+        if (interrupted() || world_.clock.wall() >= end) return false;
+        crowd_.turn();
+        progress();
+    }
+    return true;
+}
+
+void Run::traffic(double seconds) {
+    world_.draining = false;
+    turnUntil(seconds, [this] {
+        if (!host_.running()) {
+            world_.tally.fault("the host has ended in the midst of it");
+            Run::interrupt();
+            return true;
+        }
+        mix_.pass();
+        weather_.pass();
+        return false;
+    });
+    weather_.clear();
+}
+
+void Run::drain() {
+    world_.draining = true;
+    const bool left = turnUntil(kDrainSeconds, [this] { return crowd_.size() <= 1; });
+    if (!left && !interrupted()) {
+        for (const auto& [kind, count] : crowd_.kinds()) {
+            if (count > 0 && kind != "control") {
+                world_.tally.fault(std::to_string(count) + " clients of the kind \"" + kind +
+                                   "\" do not come to their end");
+            }
+        }
+    }
+    // What clients that have vanished left behind is accepted before the second fence at the
+    // latest.
+    if (!awaitFence() || !awaitFence()) {
+        if (!interrupted()) world_.tally.fault("the queue does not come to its end");
+    }
+}
+
+/// Tasks are carried out one after the other, so when this one is, those before it are.
+bool Run::awaitFence() {
+    turnUntil(1, [] { return false; });
+    const Ledger::Number number = mix_.commands().announceStart();
+    crowd_.add(std::make_unique<Requester>(
+        world_, "fence",
+        [this, number] {
+            std::vector<Exchange> exchanges;
+            exchanges.push_back(mix_.commands().announced(number));
+            return exchanges;
+        },
+        1));
+    return turnUntil(kFenceSeconds, [this, number] { return world_.ledger.done(number); });
+}
+
+Gauges Run::settledGauges() {
+    home_.removePushedFiles();
+    turnUntil(kSettleSeconds,
+              [this] { return childrenOf(host_.pid()).empty() && crowd_.size() <= 1; });
+    // The host notices closed connections, and children of children end.
+    turnUntil(7, [] { return false; });
+    return gaugesOf(host_.pid(), home_);
+}
+
+void Run::progress() {
+    if (world_.clock.wall() < nextProgress_) return;
+    nextProgress_ += kProgressSeconds;
+    const Tally& tally = world_.tally;
+    std::printf(
+        "%6.0f s  %" PRIu64 " requests, %zu commands, %" PRIu64
+        " outcomes, %zu on their way, %zu clients, %" PRIu64 " pushes, %" PRIu64 " faults\n",
+        world_.clock.wall(), tally.of("requests"), world_.ledger.size(), tally.of("outcomes"),
+        world_.ledger.outstanding(), crowd_.size(), tally.of("pushes"), tally.faultCount());
+    std::fflush(stdout);
+}
+
+void Run::judge(const Gauges& before, const Gauges& after) {
+    Tally& tally = world_.tally;
+    world_.ledger.judge(tally);
+    for (const SubscriptionRecord& record : world_.subscriptions)
+        judgeSubscription(record, world_.ledger, tally);
+    if (after.descriptors > before.descriptors) tally.fault("the host holds more descriptors");
+    if (after.threads > before.threads) tally.fault("the host has more threads");
+    if (after.children > 0) tally.fault("the host has children left");
+    if (kMeasuresMemory && after.residentKiB > before.residentKiB + kMemoryMarginKiB) {
+        tally.fault("the host holds more memory");
+    }
+    for (const std::string& file : after.files) {
+        if (before.files.count(file) == 0) tally.fault("a file is left: " + file);
+    }
+}
+
+void Run::endHost() {
+    const int status = host_.end(kHostEndSeconds);
+    Tally& tally = world_.tally;
+    if (status != 0) tally.fault("the host ended with status " + std::to_string(status));
+    const std::string errors = contentOf(home_.log("host.err"));
+    if (!errors.empty())
+        tally.fault("the host wrote to its standard error: " + errors.substr(0, 4000));
+    for (const std::string& socket : {home_.socket(), home_.transferSocket()}) {
+        if (std::filesystem::exists(socket)) tally.fault("the host left its socket " + socket);
+    }
+}
+
+void Run::printVerdict(const Gauges& before, const Gauges& after) const {
+    const Tally& tally = world_.tally;
+    std::printf("\n%-32s %12s\n", "traffic", "count");
+    for (const auto& [what, count] : tally.counts())
+        std::printf("%-32s %12" PRIu64 "\n", what.c_str(), count);
+    const auto line = [](const char* what, long begin, long end, bool good) {
+        std::printf("%-32s %12ld %12ld  %s\n", what, begin, end, verdict(good));
+    };
+    std::printf("\n%-32s %12s %12s  %s\n", "what", "begin", "end", "verdict");
+    line("descriptors", before.descriptors, after.descriptors,
+         after.descriptors <= before.descriptors);
+    line("threads", before.threads, after.threads, after.threads <= before.threads);
+    line("children", before.children, after.children, after.children == 0);
+    line(kMeasuresMemory ? "KiB resident (margin 8192)" : "KiB resident (not judged)",
+         before.residentKiB, after.residentKiB,
+         !kMeasuresMemory || after.residentKiB <= before.residentKiB + kMemoryMarginKiB);
+    line("files", static_cast<long>(before.files.size()), static_cast<long>(after.files.size()),
+         std::includes(before.files.begin(), before.files.end(), after.files.begin(),
+                       after.files.end()));
+    line("outcomes of accepted commands", 0, static_cast<long>(tally.of("outcomes")),
+         tally.faultCount() == 0);
+    std::printf("\n");
+    for (const std::string& fault : tally.faults())
+        std::printf("fault: %s\n", fault.c_str());
+    std::printf("%" PRIu64 " faults\n", tally.faultCount());
+}
+
+}  // namespace soak

@@ -1,0 +1,57 @@
+/// One soak from its beginning to its verdict.
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+#include "soak/client.h"
+#include "soak/gauges.h"
+#include "soak/host_process.h"
+#include "soak/mix.h"
+#include "soak/weather.h"
+
+namespace soak {
+
+struct Options {
+    double minutes = 10;
+    std::uint64_t seed = 1;
+    std::size_t clients = 200;
+    std::string host;    ///< the program
+    std::string plugin;  ///< empty: the host's own
+};
+
+class Run {
+public:
+    /// Starts the host.
+    Run(const Options& options, const SoakHome& home);
+
+    /// True when nothing was found; false too when it was interrupted.
+    bool toTheEnd();
+
+    /// For signal handlers: makes toTheEnd() return soon.
+    static void interrupt();
+    static bool interrupted();
+
+private:
+    bool openControl();
+    void traffic(double seconds);
+    void drain();
+    bool awaitFence();
+    bool turnUntil(double seconds, const std::function<bool()>& done);
+    Gauges settledGauges();
+    void judge(const Gauges& before, const Gauges& after);
+    void endHost();
+    void progress();
+    void printVerdict(const Gauges& before, const Gauges& after) const;
+
+    const Options options_;
+    const SoakHome& home_;
+    World world_;
+    HostProcess host_;
+    Crowd crowd_;
+    Mix mix_;
+    Weather weather_;
+    double nextProgress_ = 0;
+};
+
+}  // namespace soak
