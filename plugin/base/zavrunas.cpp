@@ -30,7 +30,8 @@ void forEachChild(const DOMElement& parent, const char* tagName, Use use) {
     for (const DOMNode* node : parent.getChildren()->nodes()) {
         if (node->getNodeType() != DOMNode::ELEMENT_NODE) continue;
         const auto& element = static_cast<const DOMElement&>(*node);
-        if (String::compare(element.getTagName(), wanted.getData()) == 0) use(element);
+        const unsigned short* const name = element.getTagName();
+        if (name != nullptr && String::compare(name, wanted.getData()) == 0) use(element);
     }
 }
 

@@ -79,7 +79,7 @@ public:
         stream_.close();
     }
 
-    void copyTo(String& text) const { units_.copyTo(text); }
+    void appendTo(String& text) const { units_.appendTo(text); }
 
 private:
     ProcessInputStream& stream_;
@@ -115,9 +115,12 @@ public:
         return true;
     }
 
+    /// One and the same text for both gets the output, then the errors.
     void copyOutput(String& stdOut, String& stdErr) const {
-        out_.copyTo(stdOut);
-        err_.copyTo(stdErr);
+        stdOut.clear();
+        stdErr.clear();
+        out_.appendTo(stdOut);
+        err_.appendTo(stdErr);
     }
 
 private:

@@ -102,7 +102,10 @@ int copyBytes(Trace& trace, const String& src, const String& dst) {
     FileDescriptor in = openTraced(trace, "source", src, "rb");
     if (!in.isOpen()) return errno;
     FileDescriptor file = openTraced(trace, "destination", dst, "wb");
-    if (!file.isOpen()) return afterClosing(trace, errno, in.close(), src);
+    if (!file.isOpen()) {
+        const int failure = errno;  // which closing may change
+        return afterClosing(trace, failure, in.close(), src);
+    }
     BufferedOutput out(std::move(file));
     int rc = copyBlocks(trace, in, src, out, dst);
     rc = afterClosing(trace, rc, in.close(), src);

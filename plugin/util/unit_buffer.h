@@ -8,6 +8,7 @@
 #include <memory>
 #include <new>
 #include <stdexcept>
+#include <utility>
 
 #include "base/zavstr.h"
 
@@ -25,9 +26,15 @@ public:
         size_ += count;
     }
 
-    void copyTo(String& text) const {
-        text.clear();
-        if (size_ != 0) text.assign(units_.get(), static_cast<std::uint32_t>(size_));
+    void appendTo(String& text) const {
+        if (size_ == 0) return;
+        String collected;
+        collected.assign(units_.get(), static_cast<std::uint32_t>(size_));
+        if (text.length() == 0) {
+            text = std::move(collected);
+        } else {
+            text.append(collected);
+        }
     }
 
 private:

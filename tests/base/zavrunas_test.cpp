@@ -249,6 +249,20 @@ TEST_F(RunAs, ChildElementIsTheFirstOfItsName) {
     EXPECT_EQ(getChildElement(&parent, "c"), first);
 }
 
+TEST_F(RunAs, ElementsWithoutATagNameAreNoneOfOurs) {
+    DOMElement root("r");
+    root.addChild(new DOMElement(nullptr));
+    auto* agent = new DOMElement("agent");
+    root.addChild(agent);
+    agent->addChild(new DOMElement(nullptr));
+    agent->addChild(new DOMElement("productCode"));
+    StartupDB db(path());
+    db.buildModel(&root);
+    EXPECT_EQ(db.getNumAgents(), 1u);
+    db.buildModel(nullptr);
+    EXPECT_EQ(db.getNumAgents(), 1u);
+}
+
 TEST_F(RunAs, LeavesWithoutTextAreEmpty) {
     DOMElement agent("agent");
     agent.addChild(new DOMElement("productCode"));

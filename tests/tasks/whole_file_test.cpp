@@ -10,6 +10,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
+#include <vector>
 
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
@@ -23,6 +24,7 @@ namespace {
 int reportedStreamError = 0;
 bool closingFails = false;
 int lastClosed = -1;  // the descriptor of the stream
+std::vector<std::size_t> chunksRead;
 
 template <typename Function>
 Function next(const char* name) {
@@ -33,6 +35,12 @@ Function next(const char* name) {
 extern "C" int ferror(std::FILE* stream) noexcept {
     if (reportedStreamError != 0) return reportedStreamError;
     return next<int (*)(std::FILE*)>("ferror")(stream);
+}
+
+extern "C" std::size_t fread(void* buffer, std::size_t size, std::size_t count, std::FILE* stream) {
+    using Fread = std::size_t (*)(void*, std::size_t, std::size_t, std::FILE*);
+    chunksRead.push_back(next<Fread>("fread")(buffer, size, count, stream));
+    return chunksRead.back();
 }
 
 extern "C" int fclose(std::FILE* stream) {
@@ -77,6 +85,17 @@ TEST_F(WholeFile, ReadsTextsOfAnyLength) {
         EXPECT_EQ(text, narrow(readFile(written("f", text)))) << length;
     }
     EXPECT_THAT(trace_.errors(), IsEmpty());
+}
+
+TEST_F(WholeFile, ReadsUntilAChunkIsEmpty) {
+    const String exact = written("f", sampleText(1024));
+    const String longer = written("g", sampleText(1025));
+    chunksRead.clear();
+    readFile(exact);
+    EXPECT_THAT(chunksRead, ElementsAre(1024u, 0u));
+    chunksRead.clear();
+    readFile(longer);
+    EXPECT_THAT(chunksRead, ElementsAre(1024u, 1u, 0u));
 }
 
 TEST_F(WholeFile, ReadsLineEndsAsTheyAre) {

@@ -8,6 +8,7 @@
 #include "support/child_role.h"
 #include "support/clock.h"
 #include "support/program.h"
+#include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 #include "util/zavutil.h"
@@ -197,13 +198,24 @@ TEST_F(CommandRunner, AChunkIsATextUpToItsFirstZero) {
 }
 
 TEST_F(CommandRunner, EachChunkIsConvertedOnItsOwn) {
-    // A pause between the bytes of a character makes two chunks of it; neither is a character.
+    const ScopedEnv locale("LC_ALL", "C.UTF-8");
+    ASSERT_TRUE(String::initialize());
     const ScratchDir scratch;
-    const Outcome outcome =
-        run(scratch.script("write", "printf 'a\\303'; sleep 0.3; printf '\\251b'\n"));
-    EXPECT_EQ(String("a\xc3") + String("\xa9"
-                                       "b"),
-              outcome.out);
+    // The two bytes of a character lie on both sides of the end of a chunk; neither is one alone.
+    const std::string before(16383, 'x');
+    const Outcome outcome = run("/bin/cat " + scratch.write("f", before + "\xC3\xA9z"));
+    ASSERT_EQ(16383u + 3u, outcome.out.length());
+    EXPECT_EQ(0xFFFD, outcome.out[16383]);
+    EXPECT_EQ(0xFFFD, outcome.out[16384]);
+    EXPECT_EQ('z', outcome.out[16385]);
+}
+
+TEST_F(CommandRunner, OneTextForBothGetsTheOutputThenTheErrors) {
+    int rc = -1;
+    String both("before");
+    EXPECT_TRUE(
+        Util::runCommand("/bin/sh -c 'echo err >&2; echo out'", rc, both, both, String(), false));
+    EXPECT_EQ(String("out\nerr\n"), both);
 }
 
 TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {

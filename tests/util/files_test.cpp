@@ -328,6 +328,15 @@ TEST_F(Files, CopyReportsTheFirstFailureOfSeveral) {
     EXPECT_EQ(traces.errors("zavutil").size(), 2u);
 }
 
+TEST_F(Files, CopyThatCannotBeginReportsThatAndNotTheCloseAfterIt) {
+    scratch.write("f", "x");
+    const String from = wide("f");
+    const String to = wide("none/g");
+    faults.failingClose = 1;
+    EXPECT_EQ(Util::_copyFile(from, to), ENOENT);
+    EXPECT_EQ(traces.errors("zavutil").size(), 2u);
+}
+
 // Without a capture, whose own writes would meet the faults first.
 TEST(InterruptedFiles, CopyThatIsInterruptedOrTakesLittleAtATimeIsExact) {
     const ScratchDir scratch;
