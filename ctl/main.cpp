@@ -4,6 +4,8 @@
 #include <clocale>
 #include <csignal>
 #include <cstdio>
+#include <string>
+#include <vector>
 
 #include "ctl/commands.h"
 #include "ctl/options.h"
@@ -30,6 +32,17 @@ void addGlobalOptions(CLI::App& app, ctl::Options& options) {
         "3 no host reached, 4 no outcome within --timeout.");
 }
 
+/// Prints what is wrong with the command line, or the help that it asks for. An unknown word also
+/// keeps a required one from being found; then the unknown one is what to say.
+int reportParse(const CLI::App& app, const CLI::ParseError& error) {
+    const std::vector<std::string> unknown = app.remaining(true);
+    const bool missing = dynamic_cast<const CLI::RequiredError*>(&error) != nullptr;
+    const int code = missing && !unknown.empty()
+                         ? app.exit(CLI::ExtrasError(app.get_name(), unknown))
+                         : app.exit(error);
+    return code == 0 ? ctl::kSuccess : ctl::kWrongUsage;
+}
+
 int run(int argc, char** argv) {
     CLI::App app("Manages the monitoring agents of one host.", "zavctl");
     ctl::Options options;
@@ -49,8 +62,7 @@ int run(int argc, char** argv) {
     try {
         app.parse(argc, argv);
     } catch (const CLI::ParseError& error) {
-        const int code = app.exit(error);
-        return code == 0 ? ctl::kSuccess : ctl::kWrongUsage;
+        return reportParse(app, error);
     }
     return status;
 }

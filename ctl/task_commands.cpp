@@ -67,10 +67,16 @@ void addStartStop(CLI::App& app, const Verb& verb, const Options& options, int& 
     });
 }
 
+/// The words as one command line, which the host takes apart again at the blanks outside quotes: a
+/// word with blanks stays one word. Quotes that are there already are left to group what they do.
 std::string joined(const std::vector<std::string>& words) {
     std::string text;
-    for (const std::string& word : words)
-        text += (text.empty() ? "" : " ") + word;
+    for (const std::string& word : words) {
+        const bool quote = words.size() > 1 && word.find(' ') != std::string::npos &&
+                           word.find_first_of("\"'\\") == std::string::npos;
+        if (!text.empty()) text += ' ';
+        text += quote ? '"' + word + '"' : word;
+    }
     return text;
 }
 
