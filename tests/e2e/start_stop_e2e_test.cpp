@@ -99,6 +99,8 @@ TEST(StartStop, StartHasAnEmptyTraceLogInItsEnvironmentAndStopDoesNot) {
     ManagedHost host(home.path());
     host.zavctl({"start", "ux"});
     EXPECT_EQ(home.files().read("env"), "[]");
+    host.zavctl({"stop", "ux"});
+    EXPECT_THAT(home.files().read("env"), testing::MatchesRegex("\\[\\]\\[/.*/trace\\.log\\]"));
 }
 
 TEST(StartStop, TasksRunOneAtATimeInTheOrderOfTheirArrival) {

@@ -1,0 +1,305 @@
+// zavctl as somebody at a terminal and a script meet it: what each command line asks of the host,
+// where the host is looked for, and what is said when it goes away.
+// ctest-label: threaded
+
+#include <sys/types.h>
+
+#include <algorithm>
+#include <csignal>
+#include <nlohmann/json.hpp>
+
+#include "support/managed_host.h"
+#include "support/script_home.h"
+
+namespace {
+
+using nlohmann::json;
+using testing::ContainsRegex;
+using testing::HasSubstr;
+using Arguments = std::vector<std::string>;
+
+/// The columns of a request that a command line fills, as the reply repeats them.
+json requested(const ManagedHost& host, Arguments arguments) {
+    const auto end = std::find(arguments.begin(), arguments.end(), "--");
+    arguments.insert(end, {"--json", "--no-wait", "--transid", "T"});
+    const ProgramResult result = host.zavctl(arguments);
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.err, "");
+    const json document = json::parse(result.out, nullptr, false);
+    EXPECT_EQ(document.size(), 2U) << result.out;
+    EXPECT_EQ(document.value("events", json()), json::array());
+    const json reply = document.value("reply", json::object());
+    json filled = json::object();
+    for (const auto& [name, value] : reply.items()) {
+        if (value != "" && name != "ORIGINNODE") filled[name] = value;
+    }
+    EXPECT_EQ(filled["TRANSID"], "T");
+    EXPECT_EQ(filled["RETVAL"], 0);
+    filled.erase("TRANSID");
+    filled.erase("RETVAL");
+    return filled;
+}
+
+struct CommandLine {
+    Arguments arguments;
+    json request;
+};
+
+TEST(ControlProgram, EveryCommandLineIsItsRequest) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const std::vector<CommandLine> lines = {
+        {{"start", "ux"}, {{"COMMAND", "START"}, {"PRODUCT", "ux"}}},
+        {{"start", "ux", "--target", "a:h:UX"},
+         {{"COMMAND", "START"}, {"PRODUCT", "ux"}, {"TARGETMSN", "a:h:UX"}}},
+        {{"start", "ux", "--instance", "a"},
+         {{"COMMAND", "START"}, {"PRODUCT", "ux"}, {"OPTIONAL", "INSTANCE"}, {"TARGETMSN", "a"}}},
+        {{"stop", "ux", "--target", "a:h:UX"},
+         {{"COMMAND", "STOP"}, {"PRODUCT", "ux"}, {"TARGETMSN", "a:h:UX"}}},
+        {{"restart", "ux", "--target", "a:h:UX"},
+         {{"COMMAND", "RESTART"}, {"PRODUCT", "ux"}, {"TARGETMSN", "a:h:UX"}}},
+        {{"install", "ux", "7", "--optional", "SETCMS", "--", "/bin/true", "-q"},
+         {{"COMMAND", "INSTALL"},
+          {"PRODUCT", "ux"},
+          {"VERSION", "7"},
+          {"OPTIONAL", "SETCMS"},
+          {"CONTEXT", "/bin/true -q"}}},
+        {{"install", "ux", "7", "--restart", "--", "/bin/true"},
+         {{"COMMAND", "INSTALL"},
+          {"PRODUCT", "ux"},
+          {"VERSION", "7"},
+          {"OPTIONAL", "REQUIRES_RESTART"},
+          {"CONTEXT", "/bin/true"}}},
+        {{"uninstall", "ux"}, {{"COMMAND", "UNINSTALL"}, {"PRODUCT", "ux"}}},
+        {{"remove-instance", "ux", "a:h:UX", "--context", "text"},
+         {{"COMMAND", "REMOVEINSTANCE"},
+          {"PRODUCT", "ux"},
+          {"TARGETMSN", "a:h:UX"},
+          {"CONTEXT", "text"}}},
+        {{"config", "set", "ux", "A=1", "--target", "a:h:UX"},
+         {{"COMMAND", "SETCONFIG"},
+          {"PRODUCT", "ux"},
+          {"TARGETMSN", "a:h:UX"},
+          {"CONTEXT", "A=1"}}},
+        {{"ua-config", "--metafile", "x.mdl", "--scripts", "a,b", "--port", "7700", "--restart",
+          "--target", "a:h:UA"},
+         {{"COMMAND", "SETCONFIG"},
+          {"PRODUCT", "um"},
+          {"UACONFIG", "x.mdl"},
+          {"UASCRIPT", "a,b"},
+          {"CONTEXT", "PORT=7700,RESTART=Y"},
+          {"TARGETMSN", "a:h:UA"}}},
+        {{"ua-config", "--metafile", "x.mdl", "--restart"},
+         {{"COMMAND", "SETCONFIG"},
+          {"PRODUCT", "um"},
+          {"UACONFIG", "x.mdl"},
+          {"CONTEXT", "RESTART=Y"}}},
+        {{"ua-config", "--scripts", "a"},
+         {{"COMMAND", "SETCONFIG"}, {"PRODUCT", "um"}, {"UASCRIPT", "a"}}},
+    };
+    for (const CommandLine& line : lines)
+        EXPECT_EQ(requested(host, line.arguments), line.request);
+}
+
+TEST(ControlProgram, AWordOfAnInstallCommandStaysAWord) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const std::string seen = home.files().path("seen");
+    const std::string installer =
+        home.files().script("installer", "printf '[%s]' \"$@\" >>'" + seen + "'");
+    EXPECT_EQ(host.zavctl({"install", "ux", "7", "--", installer, "a b", "c", "'d e'"}).status, 0);
+    EXPECT_EQ(home.files().read("seen"), "[a b][c][d e]");
+    // A command line that comes as one word is taken as it is.
+    EXPECT_EQ(host.zavctl({"install", "ux", "7", "--", installer + " f 'g h'"}).status, 0);
+    EXPECT_EQ(home.files().read("seen"), "[a b][c][d e][f][g h]");
+    EXPECT_EQ(host.zavctl({"install", "ux", "7", "--", "/bin/sh", "-c", "exit 3"}).status, 1);
+}
+
+TEST(ControlProgram, EveryCommandHasATransactionOfItsOwn) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const auto transid = [&host] {
+        const ProgramResult result = host.zavctl({"--json", "start", "ux", "--no-wait"});
+        return json::parse(result.out)["reply"]["TRANSID"].get<std::string>();
+    };
+    const std::string first = transid();
+    EXPECT_NE(first, "");
+    EXPECT_NE(transid(), first);
+}
+
+TEST(ControlProgram, AnUnknownWordIsWrongUsageAndIsNamed) {
+    for (const Arguments& arguments :
+         {Arguments{"frobnicate"}, Arguments{"--frobnicate"}, Arguments{"config", "frobnicate"},
+          Arguments{"start", "--frobnicate"}, Arguments{"stop", "ux", "frobnicate"}}) {
+        Arguments line = {zavctlPath()};
+        line.insert(line.end(), arguments.begin(), arguments.end());
+        const ProgramResult result = runProgram(line);
+        EXPECT_EQ(result.status, 2);
+        EXPECT_EQ(result.out, "");
+        EXPECT_THAT(result.err, ContainsRegex("not expected: (--)?frobnicate\n"));
+    }
+}
+
+TEST(ControlProgram, EveryCommandHasHelpThatNeedsNoHost) {
+    const Arguments commands[] = {{},
+                                  {"query"},
+                                  {"agents"},
+                                  {"start"},
+                                  {"stop"},
+                                  {"restart"},
+                                  {"install"},
+                                  {"uninstall"},
+                                  {"complete-install"},
+                                  {"config"},
+                                  {"config", "get"},
+                                  {"config", "set"},
+                                  {"config", "edit"},
+                                  {"push"},
+                                  {"ua-config"},
+                                  {"events"},
+                                  {"status"},
+                                  {"remove-instance"}};
+    for (const Arguments& command : commands) {
+        Arguments line = {zavctlPath()};
+        line.insert(line.end(), command.begin(), command.end());
+        line.emplace_back("--help");
+        const ProgramResult result = runProgram(line);
+        EXPECT_EQ(result.status, 0);
+        EXPECT_EQ(result.err, "");
+        std::string usage = "Usage: zavctl ";
+        for (const std::string& word : command)
+            usage += word + " ";
+        EXPECT_THAT(result.out, HasSubstr(usage + "[OPTIONS]"));
+    }
+}
+
+// ---- Where the host is --------------------------------------------------------------------------
+
+TEST(ControlProgram, FindsTheHostByTheEnvironmentAsTheHostDoes) {
+    ScriptHome home;
+    home.files().makeDir("runtime");
+    const Environment byRuntime = {{"ZAV_SOCKET", ""},
+                                   {"XDG_RUNTIME_DIR", home.files().path("runtime")},
+                                   {"KBB_RAS1_LOG", "/dev/null"}};
+    const Environment byName = {{"ZAV_SOCKET", home.files().path("named")},
+                                {"XDG_RUNTIME_DIR", home.files().path("runtime")},
+                                {"KBB_RAS1_LOG", "/dev/null"}};
+    const std::string file = home.files().write("file", "content");
+    const std::pair<Environment, std::string> cases[] = {
+        {byRuntime, home.files().path("runtime/zavhost.sock")},
+        {byName, home.files().path("named")}};
+    for (const auto& [environment, socket] : cases) {
+        Program host({zavhostPath(), "--home", home.path()}, "", environment);
+        ASSERT_TRUE(host.awaitOutput("ready: " + socket + "\n", std::chrono::seconds(20)))
+            << host.err();
+        EXPECT_EQ(runProgram({zavctlPath(), "status"}, "", environment).status, 0);
+        EXPECT_EQ(runProgram({zavctlPath(), "push", file}, "", environment).status, 0);
+        EXPECT_EQ(runProgram({zavctlPath(), "--socket", socket, "push", file}).status, 0);
+        host.signal(SIGTERM);
+        EXPECT_EQ(host.wait().status, 0);
+        const ProgramResult gone = runProgram({zavctlPath(), "status"}, "", environment);
+        EXPECT_EQ(gone.status, 3);
+        EXPECT_THAT(gone.err, HasSubstr("no host reached at " + socket + ": "));
+    }
+}
+
+// ---- A host that goes away ----------------------------------------------------------------------
+
+TEST(ControlProgram, AHostThatGoesAwayBeforeTheOutcomeIsStatusThree) {
+    ScriptHome home;
+    home.agentScript("exec sleep 3");
+    ManagedHost host(home.path());
+    const auto waiting = host.startZavctl({"start", "ux"});
+    ASSERT_TRUE(eventually([&] { return !home.agentCalls().empty(); }));
+    host.program().signal(SIGKILL);
+    const ProgramResult result = waiting->wait();
+    EXPECT_EQ(result.status, 3);
+    EXPECT_EQ(result.err, "zavctl: the host went away before the outcome came\n");
+    const json document = json::parse(result.out);
+    EXPECT_EQ(document["reply"]["RETVAL"], 0);
+    EXPECT_EQ(document["events"], json::array());
+}
+
+TEST(ControlProgram, EventsThatEndWithTheHostAreStatusThreeAndAWholeDocument) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const auto events = host.startZavctl({"events"});
+    ASSERT_EQ(host.zavctl({"start", "ux", "--transid", "T"}).status, 0);
+    ASSERT_TRUE(events->awaitOutput("\"T\"", std::chrono::seconds(20)));
+    host.program().signal(SIGKILL);
+    const ProgramResult result = events->wait();
+    EXPECT_EQ(result.status, 3);
+    EXPECT_EQ(result.err, "zavctl: the host closed the stream\n");
+    EXPECT_EQ(json::parse(result.out)["events"].size(), 1U);
+}
+
+TEST(ControlProgram, InterruptedEventsAreASuccessAndAWholeDocument) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    for (const int number : {SIGINT, SIGTERM}) {
+        const auto events = host.startZavctl({"events"});
+        ASSERT_TRUE(events->awaitOutput("{\"events\": [", std::chrono::seconds(20)));
+        ASSERT_EQ(host.zavctl({"start", "ux", "--transid", "T"}).status, 0);
+        ASSERT_TRUE(events->awaitOutput("\"T\"", std::chrono::seconds(20)));
+        events->signal(number);
+        const ProgramResult result = events->wait();
+        EXPECT_EQ(result.status, 0);
+        EXPECT_EQ(json::parse(result.out)["events"].size(), 1U);
+    }
+}
+
+TEST(ControlProgram, EventsThatDoNotComeInTimeAreStatusFour) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const ProgramResult none =
+        host.zavctl({"--json", "--timeout", "0.3", "events", "--count", "1"});
+    EXPECT_EQ(none.status, 4);
+    EXPECT_EQ(json::parse(none.out)["events"], json::array());
+    EXPECT_EQ(host.zavctl({"--timeout", "0.3", "events"}).status, 0) << "as long as was asked for";
+}
+
+// ---- What is said -------------------------------------------------------------------------------
+
+TEST(ControlProgram, AnInstallThatRestartsTheHostTellsHowToGoOn) {
+    ScriptHome home;
+    home.products({"ux"}, "exit 0");
+    ManagedHost host(home.path(), {{"QVSDEPLOY_AGENTDEPOT", home.files().path("depot")}});
+    const ProgramResult result =
+        host.zavctl({"install", "ux", "7", "--restart", "--", "/bin/true"});
+    EXPECT_EQ(result.status, 0) << result.err;
+    EXPECT_THAT(result.out, ContainsRegex("^install ux: accepted\n"
+                                          "install ux: done after [0-9]+ s\n"
+                                          "The install has begun; fetch its outcome with: "
+                                          "zavctl complete-install\n$"));
+}
+
+TEST(ControlProgram, ARefusalIsSaidInWords) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const ProgramResult refused = host.zavctl({"remove-instance", "um", "a:h:UA"});
+    EXPECT_EQ(refused.status, 1);
+    EXPECT_EQ(refused.out,
+              "remove-instance um a:h:UA: refused; ZAV1006E: the command is not supported "
+              "[REMOVEINSTANCE]\n");
+    const ProgramResult failed = host.zavctl({"config", "get", "ux"});
+    EXPECT_EQ(failed.status, 1);
+    EXPECT_EQ(failed.out, "");
+    EXPECT_EQ(failed.err,
+              "zavctl: config get ux: failed; ZAV1007E: no two-way translator was found for the "
+              "product [GETCONFIG,ux]\n");
+}
+
+TEST(ControlProgram, ATerminalSeesAClockThatRuns) {
+    ScriptHome home;
+    home.agentScript("sleep 2");
+    ManagedHost host(home.path());
+    const ProgramResult result =
+        runProgram({"/usr/bin/script", "-qec",
+                    zavctlPath() + " --socket " + host.socket() + " start ux", "/dev/null"});
+    EXPECT_EQ(result.status, 0) << result.out;
+    EXPECT_THAT(result.out, HasSubstr("\rstart ux: waiting, 1 s "));
+    EXPECT_THAT(result.out, HasSubstr("\rstart ux: waiting, 2 s "));
+    EXPECT_THAT(result.out, ContainsRegex("start ux: done after [0-9]+ s"));
+}
+
+}  // namespace
