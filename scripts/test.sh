@@ -1,7 +1,7 @@
 #!/bin/sh
 # Builds and runs every test: on this machine's width, on 32-bit, and under the address and
-# undefined-behaviour sanitizers. Before them every fuzz target runs for a short time, and after them
-# a host is soaked for two minutes.
+# undefined-behaviour sanitizers. Before them every fuzz target runs for a short time, and a host is
+# soaked for two minutes.
 #
 #   scripts/test.sh [PRESET ...]     only these presets, no fuzzing and no soak
 #   scripts/test.sh tsan             what starts threads, under the thread sanitizer
@@ -24,13 +24,11 @@ done
 if [ -n "$all" ]; then
     echo "== fuzz: build and 20 seconds per target"
     scripts/fuzz.sh --short
+    echo "== native: soak for two minutes"
+    scripts/soak.sh 2
 fi
 for preset in "$@"; do
     echo "== $preset: test"
     # Some cases measure seconds; on a machine that is busy otherwise one may fail once.
     ctest --preset "$preset" --progress --repeat until-pass:2
 done
-if [ -n "$all" ]; then
-    echo "== native: soak"
-    scripts/soak.sh 2
-fi
