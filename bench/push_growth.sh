@@ -3,7 +3,8 @@
 #
 #   bench/push_growth.sh [--mib LARGEST] [--rounds N] [--build DIR] [--out FILE]
 #
-# Each size is sent --rounds times and its median counts. --out FILE appends the figures in seconds.
+# Each size is sent --rounds times, one below 128 MiB four times as often, and its median counts.
+# --out FILE appends the figures in seconds.
 set -eu
 cd "$(dirname "$0")/.."
 # shellcheck source=bench/peers.sh
@@ -17,7 +18,7 @@ while [ $# -gt 0 ]; do
     --build) build=$2 ;;
     --out) out=$2 ;;
     *)
-        sed -n '2,6s/^# \{0,1\}//p' "$0" >&2
+        sed -n '2,7s/^# \{0,1\}//p' "$0" >&2
         exit 2
         ;;
     esac
@@ -40,8 +41,9 @@ push() { # prints nanoseconds
 
 for ((size = mib; size >= 1; size /= 2)); do
     truncate -s "${size}M" "$scratch/file"
-    for ((round = 0; round < rounds; ++round)); do push; done | sort -n |
-        awk -v middle=$(((rounds + 1) / 2)) 'NR == middle' >"$scratch/median"
+    times=$((size < 128 ? 4 * rounds : rounds))
+    for ((i = 0; i < times; ++i)); do push; done | sort -n |
+        awk -v middle=$(((times + 1) / 2)) 'NR == middle' >"$scratch/median"
     echo "$size MiB: $(awk -v mib="$size" '{ printf "%.2f ms per MiB", $1 / mib / 1e6 }' "$scratch/median")"
     write_result "push/$((size << 20))" "$(cat "$scratch/median")e-9"
 done

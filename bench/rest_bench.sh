@@ -3,7 +3,8 @@
 #
 #   bench/rest_bench.sh [--seconds N] [--build DIR] [--out FILE]
 #
-# The host has answered a query before, so that everything it ever starts has been started.
+# The host has answered a query before, so that everything it ever starts has been started, and the
+# time that it leaves a client to read its last answer has passed.
 set -eu
 cd "$(dirname "$0")/.."
 # shellcheck source=bench/peers.sh
@@ -16,7 +17,7 @@ while [ $# -gt 0 ]; do
     --build) build=$2 ;;
     --out) out=$2 ;;
     *)
-        sed -n '2,6s/^# \{0,1\}//p' "$0" >&2
+        sed -n '2,7s/^# \{0,1\}//p' "$0" >&2
         exit 2
         ;;
     esac
@@ -25,7 +26,7 @@ done
 make_scratch rest_bench
 start_host "$build"
 "$build/bin/zavctl" --socket "$host_socket" query KINAGT >>"$scratch/log" 2>&1 || true
-sleep 1
+sleep 5
 
 # Voluntary and other switches of all threads: a thread that is not woken is not switched to.
 switches() {

@@ -108,13 +108,12 @@ def _plot_script(figure, columns, path):
     step = max(1, (len(works) + 6) // 7)
     tics = ", ".join(f'"{figure.label(work)}" {work}' for work in works[::step])
     third = works[FIRST_THAT_COUNTS]
-    plots = [f'x / {third}.0 with lines dashtype 2 linecolor "#777777" title '
-             '"in proportion to the work"']
-    blocks = []
+    plots = ['$proportion with lines dashtype 2 linecolor "#777777" title "in proportion to the work"']
+    blocks = ["\n".join(["$proportion << END", *(f"{work} {work / third}" for work in works), "END"])]
     for index, (curve, points) in enumerate(columns):
         color = _PALETTE[index % len(_PALETTE)]
         plots.append(f'$curve{index} with linespoints linewidth 2 pointtype 7 pointsize 0.6 '
-                     f'linecolor "{color}" title "{curve.title}"')
+                     f'linecolor "{color}" title "{curve.title if len(columns) > 1 else "measured"}"')
         data = "\n".join(f"{work} {cost:.6g}" for work, cost in points)
         blocks.append(f"$curve{index} << END\n{data}\nEND")
     # Half a step of room on either side, so that no point lies on the frame.
@@ -142,6 +141,8 @@ def draw(figure, figures, folder):
     columns = figure.relative(figures)
     if not columns:
         return False
-    subprocess.run(["gnuplot"], input=_plot_script(figure, columns, folder / f"{figure.name}.svg"),
-                   text=True, check=True)
+    path = folder / f"{figure.name}.svg"
+    subprocess.run(["gnuplot"], input=_plot_script(figure, columns, path), text=True, check=True)
+    # Browsers show the title where the pointer is.
+    path.write_text(path.read_text().replace("<title>Gnuplot<", f"<title>{figure.title}<", 1))
     return True

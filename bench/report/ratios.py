@@ -54,21 +54,17 @@ class Table:
         return self._figures[own] * times / self._figures[other]
 
     def _commands(self):
-        def counter(run, name):
-            return self._figures.get(f"{run}:{name}")
-
-        yield Row("running a one-line script", "`posix_spawn` and three pipes",
-                  [counter("script/small", "run/spawn")], 1.25)
-        yield Row("the same, 99th percentile", "the same",
-                  [counter("script/small", "p99_run/spawn")], 2)
-        yield Row("the same, median", "`fork`, `execve` and three pipes",
-                  [counter("script/small", "run/fork")])
-        yield Row("the same with 1 GiB of touched heap", "`posix_spawn` and three pipes",
-                  [counter("script/1GiB", "run/spawn")])
-        yield Row("the same with 1 GiB of touched heap", "`fork`, `execve` and three pipes",
-                  [counter("script/1GiB", "run/fork")])
-        yield Row("the same with 1 GiB of touched heap", "itself with a small heap",
-                  [self._ratio("script/1GiB:run", "script/small:run")], 1.2)
+        for run, title in (("small", "running a one-line script"),
+                           ("1GiB", "running it with 1 GiB of touched heap")):
+            limits = (1.25, 2) if run == "small" else (None, None)
+            for counter, quantile, limit in (("ratio", "median", limits[0]),
+                                             ("p99_ratio", "99th percentile", limits[1])):
+                yield Row(f"{title}, {quantile}", "`posix_spawn` and three pipes",
+                          [self._figures.get(f"spawn/{run}:{counter}")], limit)
+            yield Row(f"{title}, median", "`fork`, `execve` and three pipes",
+                      [self._figures.get(f"fork/{run}:ratio")])
+        yield Row("running it with 1 GiB of touched heap, median", "running it with a small heap",
+                  [self._ratio("spawn/1GiB:run", "spawn/small:run")], 1.2)
 
     def _requests(self):
         children = self._figures.get("request/children", 0)
@@ -127,6 +123,9 @@ class Table:
         yield row("many", "secure", "`scp -r`", 1 / 6, "at most 0.17")
         yield row("many", "sync", "`rsync` to a daemon", 1)
         yield row("many", "copy", "`cp -r`")
+        yield Row("push of one file of 1 GiB: growth of the host's memory", "32 MiB",
+                  [None if "transfer/growth" not in self._figures else
+                   self._figures["transfer/growth"] / 32], 1, strict=True)
 
     def _growth(self):
         for curve in CURVES:
