@@ -1,9 +1,13 @@
+// ctest-label: threaded
 #include "tables/zav01agt.h"
 
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <chrono>
 #include <cstdlib>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "support/fake_sleep.h"
@@ -134,6 +138,27 @@ TEST(RequestTableSchema, AddsOnlyRowsThatTheFilterWants) {
     EXPECT_EQ(3, *request->_get_value_retval(1));
     EXPECT_EQ(1, request->IsRowException(&rows[0]));
     EXPECT_EQ(0, request->IsRowException(&rows[1]));
+}
+
+/// A request that has room for one row only.
+class FullRequest : public zav_kagreqt_agent {
+public:
+    explicit FullRequest(TableManager* manager) : zav_kagreqt_agent(nullptr, nullptr, manager) {}
+    int InsertRow(char* row) override {
+        ++inserts;
+        return inserts > 1 ? 4711 : zav_kagreqt_agent::InsertRow(row);
+    }
+    int inserts = 0;
+};
+
+TEST(RequestTableSchema, AFailedInsertIsTheLastOne) {
+    zav_kagreqt_manager manager("ZAV", "KAGREQT");
+    FullRequest request(&manager);
+    zav_kagreqt_data_t rows[] = {rowOf("a"), rowOf("b"), rowOf("c")};
+    EXPECT_EQ(4711, request.AddData(rows, 3));
+    EXPECT_EQ(2, request.inserts);
+    EXPECT_EQ(1, request.NumDataItems());
+    EXPECT_EQ(4711, request.TakeSample()) << "a sample ends as its insert does";
 }
 
 TEST(RequestTableSchema, AddingNothingSucceeds) {
@@ -371,6 +396,25 @@ TEST_F(RequestEvents, ReturnTheLastRefusal) {
     zav_kagreqt_data_t row = rowOf("x");
     EXPECT_EQ(OXA_GONE, zav_kagreqt_manager::EventArrived(&row, 1));
     EXPECT_EQ(3u, delivered_);
+}
+
+TEST_F(RequestEvents, AreGivenUnderTheTablesLock) {
+    std::atomic<bool> locked{false};
+    std::thread other;
+    const auto subscription = oxa::subscribe("KAGREQT", {}, [&](const oxa::Rows&) {
+        other = std::thread([&locked] {
+            zav_kagreqt_static_manager->lock();
+            locked = true;
+            zav_kagreqt_static_manager->unlock();
+        });
+        std::this_thread::sleep_for(std::chrono::milliseconds(100));
+        return locked ? OXA_GONE : OXA_OK;
+    });
+    zav_kagreqt_data_t row = rowOf("x");
+    EXPECT_EQ(OXA_OK, zav_kagreqt_manager::EventArrived(&row, 1));
+    ASSERT_TRUE(other.joinable());
+    other.join();
+    EXPECT_TRUE(locked) << "the lock is given back";
 }
 
 TEST_F(RequestEvents, WithoutSubscribersNothingHappens) {

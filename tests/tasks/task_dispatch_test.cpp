@@ -105,6 +105,19 @@ TEST_F(TaskDispatch, AnUnknownCommandIsRefusedWithTheListOfThoseThatThereAre) {
     EXPECT_EQ(kSupported, details[0]);
 }
 
+TEST_F(TaskDispatch, TheListOfCommandsComesLastInTheTrace) {
+    TaskQueueElem task = complete("DANCE");
+    const TraceCapture trace("ERROR (UNIT:zavtasks ALL)");
+    runTask(task);
+    Texts texts;
+    for (const TraceLine& line : trace.lines()) {
+        if (line.level != 'F') texts.push_back(line.text);
+    }
+    EXPECT_EQ((Texts{"Command DANCE is NOT supported",
+                     "ZAV1006E Command [DANCE] is not a supported command", kSupported}),
+              texts);
+}
+
 TEST_F(TaskDispatch, CommandsAreComparedExactly) {
     expectRefused(complete("start"), 1006, "start");
     expectRefused(complete("START "), 1006, "START ");

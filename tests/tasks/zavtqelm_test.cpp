@@ -38,6 +38,16 @@ std::string integerBytes(int value) {
     return std::string(reinterpret_cast<const char*>(&value), sizeof value);
 }
 
+/// The widths at which values were cut, in the order of the fields' writing.
+std::vector<int> widthsOfCuts(const TraceCapture& trace) {
+    const std::string before = "exceeded the maximum size of ";
+    std::vector<int> widths;
+    for (const std::string& line : trace.errors("zavtqelm")) {
+        widths.push_back(std::stoi(line.substr(line.find(before) + before.size())));
+    }
+    return widths;
+}
+
 TEST(TaskRecord, IsEmptyAtFirst) {
     const TaskQueueElem task;
     for (const String& value : {task.getCommand(), task.getTransid(), task.getProduct(),
@@ -215,7 +225,8 @@ TEST(ReturnStatus, EveryFieldIsCutToItsOwnWidth) {
     std::string expected(4196, 'y');
     expected.replace(3844, 4, integerBytes(7));
     EXPECT_EQ(expected, bytes(task.getReturnResults()));
-    EXPECT_EQ(12u, trace.errors("zavtqelm").size());
+    EXPECT_EQ((std::vector<int>{64, 84, 16, 32, 3072, 32, 32, 512, 12, 16, 256, 64}),
+              widthsOfCuts(trace));
 }
 
 TEST(ReturnAsyncStatus, PublishesOneRow) {
@@ -276,6 +287,22 @@ TEST(ReturnAsyncStatus, CutsWhatIsTooLong) {
     EXPECT_EQ(std::string(256, 'z'), fieldText(rows[0].retmsgparm));
     EXPECT_EQ(padded("host:UX", 64), fieldText(rows[0].targetmsn));
     EXPECT_EQ(1u, trace.errors("zavtqelm").size());
+}
+
+TEST(ReturnAsyncStatus, CutsEveryFieldToItsOwnWidth) {
+    const String value(std::string(300, 'y').c_str());
+    TaskQueueElem task(value, value, value, value, value, value, value, value, value, value);
+    task.setRetmsgid(value);
+    task.setRetmsgparm(value);
+    Outcomes outcomes;
+    TraceCapture trace;
+    task.returnAsyncStatus(7);
+    const auto rows = outcomes.rows();
+    ASSERT_EQ(1u, rows.size());
+    std::string expected(504, 'y');
+    expected.replace(164, 4, integerBytes(7));
+    EXPECT_EQ(expected, bytes(rows[0]));
+    EXPECT_EQ((std::vector<int>{64, 84, 16, 64, 16, 256}), widthsOfCuts(trace));
 }
 
 }  // namespace
