@@ -1,6 +1,7 @@
 #include "support/fake_sleep.h"
 
 #include <mutex>
+#include <utility>
 
 #include "platform/bss1.h"
 
@@ -16,12 +17,22 @@ std::vector<unsigned>& record() {
     return instance;
 }
 
+std::function<void()>& happeningAsleep() {
+    static std::function<void()>& instance = *new std::function<void()>;
+    return instance;
+}
+
 }  // namespace
 
 // The definition in the program comes before the platform library's.
 void BSS1_Sleep(unsigned seconds) {
-    const std::lock_guard<std::mutex> lock(guard());
-    record().push_back(seconds);
+    std::function<void()> happening;
+    {
+        const std::lock_guard<std::mutex> lock(guard());
+        record().push_back(seconds);
+        happening = happeningAsleep();
+    }
+    if (happening) happening();
 }
 
 namespace fake_sleep {
@@ -31,9 +42,15 @@ std::vector<unsigned> slept() {
     return record();
 }
 
+void whileAsleep(std::function<void()> happening) {
+    const std::lock_guard<std::mutex> lock(guard());
+    happeningAsleep() = std::move(happening);
+}
+
 void reset() {
     const std::lock_guard<std::mutex> lock(guard());
     record().clear();
+    happeningAsleep() = nullptr;
 }
 
 }  // namespace fake_sleep

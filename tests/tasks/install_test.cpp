@@ -1,5 +1,7 @@
 #include "tasks/install.h"
 
+#include <chrono>
+
 #include "support/fake_sleep.h"
 #include "support/trace_capture.h"
 #include "tasks/task_home.h"
@@ -295,6 +297,35 @@ TEST_F(Install, OnlyPatchesOfTwoProductsAreReadWithoutBlocking) {
     }
 }
 
+/// An installer that leaves a process behind, which keeps the pipes open and writes nothing. The
+/// script's name in the arguments has the output read after the installer's end only.
+class InstallThatLeavesAProcess : public InstallTest {
+protected:
+    using Clock = std::chrono::steady_clock;
+
+    ~InstallThatLeavesAProcess() override { home_.dir().write("home/release", ""); }
+
+    Clock::duration timeToInstall(const char* product) {
+        const std::string release = home_.home() + "/release";
+        const std::string command = installer("(n=0; until [ -e " + release +
+                                              " ] || [ $n -gt 600 ]; do n=$((n + 1)); "
+                                              "sleep 0.05; done) &");
+        const auto begin = Clock::now();
+        EXPECT_EQ(kSuccess, run(command + " qvspatch TovrinAgent", "", product));
+        return Clock::now() - begin;
+    }
+};
+
+TEST_F(InstallThatLeavesAProcess, IsNotWaitedForWhenItPatchesOneOfTheTwoProducts) {
+    const ScopedEnv timeout("TIMEOUT", "20");
+    EXPECT_GT(std::chrono::seconds(10), timeToInstall("OR"));
+}
+
+TEST_F(InstallThatLeavesAProcess, IsWaitedForToTheTimeoutOtherwise) {
+    const ScopedEnv timeout("TIMEOUT", "1");
+    EXPECT_LE(std::chrono::milliseconds(900), timeToInstall("ux"));
+}
+
 TEST_F(Install, AnInstallerMayPrintEightMegabytes) {
     const TraceCapture quiet("ERROR");
     EXPECT_EQ(kSuccess, run(installer("head -c 8388608 /dev/zero | tr '\\0' x")));
@@ -432,6 +463,15 @@ TEST_F(CompleteInstall, TakesWhatIsNoNumberForSuccess) {
 TEST_F(CompleteInstall, NeedsTheScriptsResult) {
     EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,NOTFOUND"}), complete());
     EXPECT_EQ(1, trace_.count('E', "Unable to read rc.txt for install's return code"));
+}
+
+TEST_F(CompleteInstall, LooksForTheResultOnlyAfterItsSleep) {
+    fake_sleep::reset();
+    fake_sleep::whileAsleep([this] { home_.dir().write("depot/rc.txt", "3\n"); });
+    TaskQueueElem task;
+    const TASK_RC rc = completeInstallAfterRestart(task);
+    EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,3"}), outcomeOf(task, rc));
+    EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(CompleteInstall, ReportsWhatTheScriptLeft) {

@@ -37,6 +37,7 @@ protected:
     TaskManager() : home_(managedHome()) {
         fake_sleep::reset();
         home_.agentScript("exit 0");
+        std::filesystem::remove(home_.path() + "/bin/cinfo");
     }
 
     static ManagedHome& managedHome() {
@@ -112,6 +113,25 @@ TEST_F(TaskManager, AnInstallRunsItsCommand) {
     const zav_kagdyst_data_t row = outcomeOf(request("t5", "INSTALL", "ux", command.c_str()));
     EXPECT_EQ(0, row.retval) << trimmedField(row.retmsgparm);
     EXPECT_EQ("done\n", home_.files().read("made"));
+}
+
+TEST_F(TaskManager, AnInstallThatRestartsTheAgentHasTwoOutcomes) {
+    home_.products({"ux"}, "exit 0");
+    const std::string command = home_.files().script("restarting", "exit 9");
+    Outcomes outcomes({{"TRANSID", OPER_EQ, "t7"}});
+    TaskQueueElem task =
+        request("t7", "INSTALL", "ux", command.c_str(), "REQUIRES_RESTART", "host:UX");
+    ASSERT_EQ(0, runTask(task));
+    const auto rows = outcomes.waitFor(2);
+    ASSERT_EQ(2u, rows.size());
+    EXPECT_EQ(0, rows[0].retval);
+    EXPECT_EQ("", trimmedField(rows[0].retmsgid));
+    EXPECT_EQ("host:UX", trimmedField(rows[0].targetmsn));
+    EXPECT_EQ(1031, rows[1].retval);
+    EXPECT_EQ("ZAV1031E", trimmedField(rows[1].retmsgid));
+    const std::string run = "/bin/sh " + home_.depot() + "runcmd.sh " + command + ",9";
+    EXPECT_EQ(padded(run, 256), fieldText(rows[1].retmsgparm));
+    EXPECT_EQ("host:UX", trimmedField(rows[1].targetmsn));
 }
 
 TEST_F(TaskManager, ChildrenOfTheExecutorHaveNoSignalsBlocked) {
