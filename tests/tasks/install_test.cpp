@@ -373,6 +373,16 @@ TEST_F(InstallWithRestart, ReportsSuccessBeforeItRuns) {
     EXPECT_TRUE(home_.dir().exists("depot/runcmd.sh"));
 }
 
+TEST_F(InstallWithRestart, TheProductIsInLowerCaseForTheDepotOnly) {
+    home_.translator("true");
+    home_.dir().write("depot/ne/file", "");
+    home_.dir().write("depot/NE/file", "");
+    EXPECT_EQ(kSuccess, run(installer("true"), "REQUIRES_RESTART", "NE"));
+    EXPECT_THAT(home_.calls(kTranslator), ElementsAre("[-setCMS][NE]"));
+    EXPECT_FALSE(home_.dir().exists("depot/ne"));
+    EXPECT_TRUE(home_.dir().exists("depot/NE"));
+}
+
 TEST_F(InstallWithRestart, LeavesTheInstallersExitCodeInTheDepot) {
     home_.translator("true");
     const std::string command = installer("exit 9");

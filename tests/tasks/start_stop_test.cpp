@@ -3,11 +3,13 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <cstdlib>
 #include <string>
 #include <vector>
 
 #include "support/row_text.h"
+#include "support/scoped_env.h"
 #include "support/script_home.h"
 #include "support/trace_capture.h"
 #include "tasks/home.h"
@@ -117,6 +119,24 @@ TEST_F(StartStop, OnlyAStartSilencesTheAgentsTraceLog) {
     EXPECT_STREQ("/dev/null", ::getenv("KBB_RAS1_LOG"));
     ::unsetenv("KBB_RAS1_LOG");
     EXPECT_EQ("\n/dev/null\n", home_.files().read("found"));
+}
+
+TEST_F(StartStop, TheScriptHasNothingToRead) {
+    home_.agentScript("cat >'" + home_.files().path("input") + "'");
+    EXPECT_EQ(TASK_OK, startAgent("ux", "", nullptr));
+    EXPECT_EQ(TASK_OK, stopAgent("ux", "", nullptr));
+    EXPECT_EQ("", home_.files().read("input"));
+}
+
+TEST_F(StartStop, AnAgentThatKeepsTheScriptsOutputIsWaitedForToTheTimeout) {
+    home_.agentScript("(n=0; until [ -e '" + home_.files().path("release") +
+                      "' ] || [ $n -gt 600 ]; do n=$((n + 1)); sleep 0.05; done) &");
+    const ScopedEnv timeout("TIMEOUT", "1");
+    const auto begin = std::chrono::steady_clock::now();
+    EXPECT_EQ(TASK_OK, startAgent("ux", "", &task_));
+    EXPECT_LE(std::chrono::milliseconds(900), std::chrono::steady_clock::now() - begin);
+    expectMessage(task_, "", "");
+    home_.files().write("release", "");
 }
 
 TEST_F(StartStop, AScriptThatFailsIs1024WithTheCommandLine) {
