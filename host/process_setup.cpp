@@ -35,6 +35,16 @@ void surviveBrokenPipes() {
     ::sigaction(SIGPIPE, &action, nullptr);
 }
 
+/// What a burst of large outputs took goes back to the system when it is over. By default the first
+/// large block that is freed raises both limits, and then the gaps between small blocks stay.
+void giveMemoryBack() {
+    constexpr int kLargeBlock = 256 * 1024;
+    ::mallopt(M_MMAP_THRESHOLD, kLargeBlock);
+    ::mallopt(M_TRIM_THRESHOLD, kLargeBlock);
+    // One arena per thread would cost more than all that the host holds.
+    ::mallopt(M_ARENA_MAX, 2);
+}
+
 /// Services are often started without any locale, which would make everything beyond ASCII
 /// unspeakable; only in that case text is taken as UTF-8.
 void chooseLocale() {
@@ -54,8 +64,7 @@ void setUpProcess() {
     openStandardDescriptors();
     surviveBrokenPipes();
     chooseLocale();
-    // One arena per thread would cost more than all that the host holds.
-    ::mallopt(M_ARENA_MAX, 2);
+    giveMemoryBack();
 }
 
 }  // namespace host
