@@ -20,7 +20,7 @@ constexpr double kHostEndSeconds = 30;
 /// Children that nobody waits for any more end by themselves within that.
 constexpr double kSettleSeconds = 20;
 /// How far the memory after the warm-up may be exceeded: what the allocator keeps in pieces.
-constexpr long kMemoryMarginKiB = 8192;
+constexpr long kMemoryMarginKiB = 4096;
 
 // Instrumented programs keep freed memory for a while.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
@@ -202,7 +202,7 @@ void Run::printVerdict(const Gauges& before, const Gauges& after) const {
          after.descriptors <= before.descriptors);
     line("threads", before.threads, after.threads, after.threads <= before.threads);
     line("children", before.children, after.children, after.children == 0);
-    line(kMeasuresMemory ? "KiB resident (margin 8192)" : "KiB resident (not judged)",
+    line(kMeasuresMemory ? "KiB resident (margin 4096)" : "KiB resident (not judged)",
          before.residentKiB, after.residentKiB,
          !kMeasuresMemory || after.residentKiB <= before.residentKiB + kMemoryMarginKiB);
     line("files", static_cast<long>(before.files.size()), static_cast<long>(after.files.size()),
