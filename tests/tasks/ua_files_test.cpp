@@ -185,6 +185,14 @@ TEST_F(StartupParms, OfALargeFileAreChanged) {
     EXPECT_EQ(expected + "A|DATAPROVIDER|X|\n", changed(content + "A|DATAPROVIDER|1|", "X", "A"));
 }
 
+TEST_F(StartupParms, OfAFileThatMayOnlyBeReadAreChanged) {
+    home_.dir().write("home/kumenv", "A|DATAPROVIDER|1|\n", 0444);
+    EXPECT_EQ(1, changeUaStartupParms(file().c_str(), "X", "A"));
+    EXPECT_EQ("A|DATAPROVIDER|X|\n", home_.dir().read("home/kumenv"));
+    EXPECT_FALSE(home_.dir().exists("home/kumenv.copy"));
+    EXPECT_THAT(trace_.errors(), IsEmpty());
+}
+
 TEST_F(StartupParms, NeedAFileWithContent) {
     home_.dir().write("home/kumenv", "");
     EXPECT_EQ(0, changeUaStartupParms(file().c_str(), "X", "A"));
