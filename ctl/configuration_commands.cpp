@@ -59,7 +59,11 @@ std::string readAll(std::istream& in) {
 std::string readFile(const std::string& path) {
     std::ifstream in(path, std::ios::binary);
     if (!in) throw Failure(kWrongUsage, "cannot read " + path);
-    return readAll(in);
+    try {
+        return readAll(in);
+    } catch (const std::ios_base::failure&) {  // a directory, for one, can be opened
+        throw Failure(kWrongUsage, "cannot read " + path);
+    }
 }
 
 QueuedCommand setCommand(const std::string& product, const std::string& target,

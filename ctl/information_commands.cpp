@@ -85,7 +85,8 @@ public:
         if (asJson_) std::printf("%s]}\n", count_ > 0 ? "\n" : "");
         std::fflush(stdout);
     }
-    void print(const json& row) {
+    /// False when nobody reads the output any more.
+    bool print(const json& row) {
         if (asJson_) {
             std::printf("%s\n  %s", count_ > 0 ? "," : "",
                         row.dump(-1, ' ', false, json::error_handler_t::replace).c_str());
@@ -98,8 +99,8 @@ public:
                             ? ""
                             : ("  target " + textOf(row, "TARGETMSN")).c_str());
         }
-        std::fflush(stdout);
         ++count_;
+        return std::fflush(stdout) == 0;
     }
     unsigned count() const { return count_; }
 
@@ -123,7 +124,7 @@ int streamEvents(const Options& options, EventStream& stream, unsigned wanted) {
         if (event.type != "message") {
             std::fprintf(stderr, "zavctl: %s: %s\n", event.type.c_str(), event.data.c_str());
         } else if (row.is_object()) {
-            printer.print(row);
+            if (!printer.print(row)) return kSuccess;
         }
     }
     return kSuccess;

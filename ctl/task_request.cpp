@@ -61,7 +61,10 @@ json Task::askNow() {
         client_.query("KAGREQT", request_.conditions(), deadline_, [this] { clock_.tick(); });
     clock_.erase();
     if (rows.empty()) {
-        throw Failure(kNoHost, "the host's answer does not match the request");
+        // The reply repeats the request's values and passes only when they are the same.
+        throw Failure(kHostReportedFailure,
+                      "the host's reply holds another value than the request, so it is not known "
+                      "what became of it: the host cuts text with many characters beyond ASCII");
     }
     return rows.front();
 }

@@ -97,7 +97,13 @@ json reportDocument(const std::vector<PushedFile>& files, const Progress& progre
 }
 
 int runPush(const Options& options, const std::string& source, const std::string& destination) {
-    std::vector<PushedFile> files = filesToPush(source, destination);
+    std::vector<PushedFile> files;
+    try {
+        files = filesToPush(source, destination);
+    } catch (const fs::filesystem_error& error) {
+        throw Failure(kWrongUsage,
+                      "cannot read " + error.path1().string() + ": " + error.code().message());
+    }
     if (files.empty()) throw Failure(kWrongUsage, source + " holds no files");
     std::uintmax_t total = 0;
     for (const PushedFile& file : files)

@@ -2,7 +2,7 @@
 // where the host is looked for, and what is said when it goes away.
 // ctest-label: threaded
 
-#include <sys/types.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <csignal>
@@ -248,6 +248,21 @@ TEST(ControlProgram, InterruptedEventsAreASuccessAndAWholeDocument) {
     }
 }
 
+TEST(ControlProgram, EventsThatNobodyReadsAnyMoreEnd) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const std::string events = zavctlPath() + " --socket " + host.socket() + " events";
+    Program pipeline({"/bin/sh", "-c", events + " | head -n 1"});
+    ASSERT_TRUE(eventually([&] {
+        return json::parse(host.zavctl({"--json", "status"}).out)["subscriptions"] == 1;
+    }));
+    for (const char* transid : {"A", "B"})
+        ASSERT_EQ(host.zavctl({"start", "ux", "--transid", transid}).status, 0);
+    const ProgramResult result = pipeline.wait(std::chrono::seconds(20));
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.out, "A  START  done\n");
+}
+
 TEST(ControlProgram, EventsThatDoNotComeInTimeAreStatusFour) {
     ScriptHome home;
     ManagedHost host(home.path());
@@ -271,6 +286,39 @@ TEST(ControlProgram, AnInstallThatRestartsTheHostTellsHowToGoOn) {
                                           "install ux: done after [0-9]+ s\n"
                                           "The install has begun; fetch its outcome with: "
                                           "zavctl complete-install\n$"));
+}
+
+TEST(ControlProgram, AReplyThatIsNotTheRequestsIsAFailureThatIsSaid) {
+    ScriptHome home;
+    ManagedHost host(home.path(), {{"LC_ALL", "C.UTF-8"}});
+    const ProgramResult result =
+        host.zavctl({"start", "\xC3\xA9\xC3\xA9\xC3\xA9\xC3\xA9"}, "", {{"LC_ALL", "C.UTF-8"}});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "");
+    EXPECT_EQ(result.err,
+              "zavctl: the host's reply holds another value than the request, so it is not known "
+              "what became of it: the host cuts text with many characters beyond ASCII\n");
+}
+
+TEST(ControlProgram, WhatCannotBeReadIsWrongUsage) {
+    ScriptHome home;
+    home.files().makeDir("folder");
+    const std::string folder = home.files().path("folder");
+    ASSERT_EQ(::symlink("loop", (folder + "/loop").c_str()), 0);
+    ManagedHost host(home.path());
+    const std::pair<Arguments, std::string> cases[] = {
+        {{"push", folder}, "cannot read " + folder + "/loop: "},
+        {{"config", "set", "ux", "--file", folder}, "cannot read " + folder + "\n"},
+        {{"config", "set", "ux", "--file", folder + "/none"}, "cannot read " + folder + "/none\n"},
+        {{"config", "set", "ux", "-"}, "the configuration is empty\n"},
+        {{"config", "set", "ux"}, "config set takes --file FILE, a text, or - for"},
+        {{"config", "set", "ux", "A=1", "--file", folder}, "config set takes --file FILE, a text"}};
+    for (const auto& [arguments, words] : cases) {
+        const ProgramResult result = host.zavctl(arguments);
+        EXPECT_EQ(result.status, 2);
+        EXPECT_EQ(result.out, "");
+        EXPECT_THAT(result.err, testing::StartsWith("zavctl: " + words));
+    }
 }
 
 TEST(ControlProgram, ARefusalIsSaidInWords) {
