@@ -6,6 +6,7 @@
 #include <atomic>
 #include <chrono>
 #include <cstdlib>
+#include <memory>
 #include <string>
 #include <thread>
 #include <vector>
@@ -396,6 +397,39 @@ TEST_F(RequestEvents, ReturnTheLastRefusal) {
     zav_kagreqt_data_t row = rowOf("x");
     EXPECT_EQ(OXA_GONE, zav_kagreqt_manager::EventArrived(&row, 1));
     EXPECT_EQ(3u, delivered_);
+}
+
+/// A table whose requests tell how often they were in use when a row was inserted.
+class WatchedManager : public zav_kagreqt_manager {
+public:
+    WatchedManager() : zav_kagreqt_manager("ZAV", "KAGREQT") {}
+    rtoxa* CreateRtoxa(RequestDetail* detail, ContextInfo* context) override {
+        auto request = std::make_unique<Watched>(detail, context, this);
+        made = request.get();
+        return request.release();
+    }
+
+    struct Watched : zav_kagreqt_agent {
+        using zav_kagreqt_agent::zav_kagreqt_agent;
+        int InsertRow(char* row) override {
+            useAtInsert = UseCount();
+            return zav_kagreqt_agent::InsertRow(row);
+        }
+        unsigned useAtInsert = 0;
+    };
+    Watched* made = nullptr;
+};
+
+TEST_F(RequestEvents, KeepARequestInUseAndLeaveItEmpty) {
+    WatchedManager manager;
+    ASSERT_EQ(0, manager.RegisterWithManager());
+    const auto subscription = subscribe(0);
+    zav_kagreqt_data_t row = rowOf("x");
+    EXPECT_EQ(0, manager.AddDataToEvent(&row, 1));
+    EXPECT_EQ(1u, delivered_);
+    EXPECT_EQ(1u, manager.made->useAtInsert);
+    EXPECT_EQ(0u, manager.made->UseCount());
+    EXPECT_EQ(0, manager.made->NumDataItems());
 }
 
 TEST_F(RequestEvents, AreGivenUnderTheTablesLock) {
