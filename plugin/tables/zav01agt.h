@@ -67,6 +67,7 @@ public:
     /// Takes the request's values from the filter. A column named twice keeps the last value; names
     /// of columns that say nothing about a request, and unknown ones, are passed over.
     void TakeSampleConstructor();
+    /// Only traces.
     void TakeSampleDestructor();
 
 private:

@@ -57,6 +57,7 @@ public:
     /// Adds no row.
     int TakeSample() override;
 
+    /// Both only trace: nothing is kept between samples.
     void TakeSampleConstructor();
     void TakeSampleDestructor();
 };

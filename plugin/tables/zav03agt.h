@@ -86,6 +86,7 @@ public:
     /// 0 or the status of an insert that failed, which ends the sample.
     int TakeSample() override;
 
+    /// Both only trace: nothing is kept between samples.
     void TakeSampleConstructor();
     void TakeSampleDestructor();
 

@@ -12,6 +12,7 @@
 class TaskQueueElem {
 public:
     TaskQueueElem() = default;
+    /// A request with these values and no message yet.
     TaskQueueElem(const ZAV::String& originnode, const ZAV::String& transid,
                   const ZAV::String& command, const ZAV::String& product,
                   const ZAV::String& context, const ZAV::String& optional,
