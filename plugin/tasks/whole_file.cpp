@@ -35,17 +35,18 @@ bool closeStream(Stream& stream, const String& path, const Trace& trace) {
     return false;
 }
 
-/// The text as bytes of the local code page. String::c_str makes room for one byte per unit only
-/// and would cut the end off a text with characters of several bytes, so such a text is converted
-/// with zeros behind it that make room for all of them.
+/// The text up to its first 0 as bytes of the local code page. String::c_str makes room for one
+/// byte per unit only and would cut the end off a text with characters of several bytes, so such a
+/// text is converted with zeros behind it that make room for all of them.
 std::string allBytes(const String& text) {
     constexpr std::size_t kMostBytesPerUnit = 4;
     const unsigned short* const begin = text.getData();
-    const unsigned short* const end = begin + text.length();
+    const unsigned short* const end = std::find(begin, begin + text.length(), 0);
     if (std::all_of(begin, end, [](unsigned short unit) { return unit < 0x80; })) {
         return std::string(begin, end);
     }
-    std::vector<unsigned short> units(text.length() * kMostBytesPerUnit, 0);
+    const auto count = static_cast<std::size_t>(end - begin);
+    std::vector<unsigned short> units(count * kMostBytesPerUnit, 0);
     std::copy(begin, end, units.begin());
     String padded;
     padded.assign(units.data(), static_cast<std::uint32_t>(units.size()));

@@ -10,7 +10,8 @@
 ZAV::String readFile(ZAV::String path);
 
 /// Replaces the file's content by the text, making the file when there is none. The file is
-/// rewritten in place: a failure part-way leaves it cut. Returns 1, or 0 on failure.
+/// rewritten in place: a failure part-way leaves it cut. The text ends at its first 0, if there is
+/// one. Returns 1, or 0 on failure.
 int writeFile(const ZAV::String& path, const ZAV::String& text);
 
 /// Removes the file. Returns 1, or 0 on failure.

@@ -14,6 +14,7 @@
 
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
+#include "support/units.h"
 
 using testing::ElementsAre;
 using testing::IsEmpty;
@@ -50,10 +51,6 @@ extern "C" int fclose(std::FILE* stream) {
 }
 
 namespace {
-
-std::string narrow(const String& text) {
-    return std::string(static_cast<const char*>(text.c_str()));
-}
 
 class WholeFile : public testing::Test {
 protected:
@@ -164,6 +161,19 @@ TEST_F(WholeFile, AnEmptyTextMakesAnEmptyFile) {
     EXPECT_TRUE(scratch_.exists("new"));
     EXPECT_EQ("", scratch_.read("new"));
     EXPECT_EQ("", scratch_.read("old"));
+}
+
+TEST_F(WholeFile, AWrittenTextEndsAtItsFirstZero) {
+    for (const unsigned short last : Units{'b', 0xE4}) {
+        const unsigned short units[] = {'a', last, 0, last};
+        String text;
+        text.assign(units, 4);
+        EXPECT_EQ(1, writeFile(path("f"), text));
+        text.assign(units, 2);
+        EXPECT_EQ(1, writeFile(path("g"), text));
+        EXPECT_EQ(scratch_.read("g"), scratch_.read("f"));
+        EXPECT_GE(scratch_.read("f").size(), 2u);
+    }
 }
 
 TEST_F(WholeFile, WrittenFilesAreNotExecutable) {
