@@ -1,6 +1,6 @@
 #!/bin/sh
 # Measures which lines and branches of the plug-in the tests run: builds it with counters in
-# build/coverage, runs every test there and prints a table for each file and the lines that no test
+# build/coverage, runs every test there and prints a line for each file and the lines that no test
 # reached.
 #
 #   scripts/coverage.sh              build, run all tests, report
@@ -31,8 +31,8 @@ fi
 
 # Branches to the handling of exceptions that no statement of ours throws are left out.
 report() {
-    gcovr --root . --filter plugin/ --object-directory build/coverage/plugin \
-        --exclude-throw-branches --exclude-unreachable-branches "$@" build/coverage/plugin
+    gcovr --root . --filter plugin/ -j 2 --exclude-throw-branches \
+        --exclude-unreachable-branches "$@" build/coverage/plugin build/coverage/tests
 }
 
 mkdir -p build/coverage/report

@@ -133,10 +133,14 @@ std::string formatTrace(const char* format, std::initializer_list<TraceArgument>
 }
 
 void Trace::Place::write(unsigned level, const char* format,
-                         std::initializer_list<TraceArgument> arguments) const {
+                         std::initializer_list<TraceArgument> arguments) const noexcept {
     const int savedErrno = errno;
-    const std::string text = formatTrace(format, arguments);
-    RAS1_Printf(&trace_.block_, level, line_, "%s", text.c_str());
+    try {
+        const std::string text = formatTrace(format, arguments);
+        RAS1_Printf(&trace_.block_, level, line_, "%s", text.c_str());
+    } catch (...) {
+        RAS1_Printf(&trace_.block_, level, line_, "%s", format);
+    }
     errno = savedErrno;
 }
 

@@ -71,7 +71,8 @@ public:
     Trace(const Trace&) = delete;
     Trace& operator=(const Trace&) = delete;
 
-    /// A place in the source from which lines are written.
+    /// A place in the source from which lines are written. Without memory for a line its format
+    /// alone is written.
     class Place {
     public:
         Place(const Trace& trace, int line) : trace_(trace), line_(line) {}
@@ -87,7 +88,7 @@ public:
 
     private:
         void write(unsigned level, const char* format,
-                   std::initializer_list<TraceArgument> arguments) const;
+                   std::initializer_list<TraceArgument> arguments) const noexcept;
         const Trace& trace_;
         int line_;
     };

@@ -3,6 +3,7 @@
 #include <csignal>
 
 #include "base/zavtrace.h"
+#include "platform/bss1.h"
 #include "tasks/zavtasks.h"
 #include "util/exceptions.h"
 
@@ -11,6 +12,9 @@ using ZAV::Trace;
 namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
+
+constexpr int kAttempts = 5;
+constexpr unsigned kPauseSeconds = 1;
 
 /// Keeps signals from the threads that are created while it exists: those sent to the process are
 /// its own business. Signals that report a fault of the thread itself stay deliverable.
@@ -89,14 +93,30 @@ bool takeTask(TaskQueueElem& task) {
     return trace.exit(taken && rc == 0);
 }
 
+/// Runs `step`, again when it throws. Between a task's leaving the queue and its outcome nothing
+/// throws once it has had its effect, and every task has its one outcome, also when there is no
+/// memory for that at first.
+template <typename Step>
+auto untilItWorks(const Trace& trace, const Step& step) {
+    for (int attempt = 1; attempt < kAttempts; ++attempt) {
+        try {
+            return step();
+        } catch (...) {
+            ZAV::traceException(trace);
+        }
+        BSS1_Sleep(kPauseSeconds);
+    }
+    return step();
+}
+
 /// Handlers' exceptions do not come this far; what does must not end the thread either.
 void executeNextTask() noexcept {
     const Trace trace(traceUnit);
     try {
         TaskQueueElem task;
         if (!takeTask(task)) return;
-        const TASK_RC rc = processAsyncTask(task);
-        task.returnAsyncStatus(rc);
+        const TASK_RC rc = untilItWorks(trace, [&] { return processAsyncTask(task); });
+        untilItWorks(trace, [&] { task.returnAsyncStatus(rc); });
     } catch (...) {
         ZAV::traceException(trace);
     }

@@ -19,11 +19,7 @@ const char* currentExceptionText() noexcept {
 }
 
 void traceException(const Trace& trace) noexcept {
-    try {
-        trace().error("Exception caught: %s", currentExceptionText());
-    } catch (...) {
-        return;  // out of memory, of which nothing can be said then
-    }
+    trace().error("Exception caught: %s", currentExceptionText());
 }
 
 }  // namespace ZAV

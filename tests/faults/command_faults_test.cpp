@@ -108,7 +108,7 @@ TEST_F(CommandFaults, PollThatKeepsFailingEndsAtTheTimeout) {
     EXPECT_LT(watch.seconds(), 4);
 }
 
-TEST_F(CommandFaults, InputOutputThatCannotBeSwitchedStillEndsAtTheTimeout) {
+TEST_F(CommandFaults, OutputThatCannotBeSwitchedStillEndsAtTheTimeout) {
     const ScopedEnv timeout("TIMEOUT", "1");
     // The grandchild keeps the output open.
     const char* const command = "/bin/sh -c \"/bin/sleep 3 & # TovrinAgent\"";
@@ -133,6 +133,24 @@ TEST_F(CommandFaults, AChildThatSomebodyElseReaped) {
     EXPECT_THAT(traces.errors(),
                 testing::ElementsAre("Error occurred. ERRNO:10 No child processes"));
     EXPECT_LT(0, ::waitpid(-1, nullptr, 0));  // there was nobody else
+}
+
+TEST_F(CommandFaults, WithoutASearchPathTheCommandRunsAllTheSame) {
+    const ScopedEnv path("PATH", nullptr);
+    EXPECT_EQ(echo_.unharmed(), echo_.runOnce());
+}
+
+TEST_F(CommandFaults, TheServersNameCannotBeFoundWithoutACommand) {
+    const auto run = [] {
+        String dir = "/nowhere/";
+        return std::to_string(Util::getDepotHome(dir, false, false));
+    };
+    Scenario scenario([] {}, run, {"2", {}});
+    for (const Call call : {Call::kPipe2, Call::kVfork}) {
+        const End end = scenario.endWith(call, 1, EAGAIN);
+        EXPECT_EQ("2", end.result);
+        EXPECT_EQ("Unable to determine CMS name, process failed to start", end.errors.back());
+    }
 }
 
 TEST_F(CommandFaults, Memory) {

@@ -5,13 +5,17 @@
 #include <filesystem>
 #include <new>
 
+#include "base/zavdomp.h"
 #include "base/zavrbndl.h"
 #include "faults/scenario.h"
+#include "mgmt/zavmgmt.h"
+#include "platform/oxa.h"
 #include "rpc/zavagts.h"
 #include "rpc/zavrpc.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 #include "tasks/whole_file.h"
+#include "tasks/zavtasks.h"
 #include "util/zavutil.h"
 
 using namespace faults;
@@ -123,6 +127,33 @@ TEST_F(MemoryShortage, PropertiesThrowAtMost) {
     };
     EXPECT_EQ("value", withEveryFailure(failures_, look));
     EXPECT_EQ((std::set<std::string>{"no memory"}), results_);
+}
+
+TEST_F(MemoryShortage, DocumentsThrowAtMost) {
+    const auto parse = [] {
+        ZAV::DOMParser parser("<a one='1'><b>text</b></a>");
+        String out;
+        if (parser.parse() == 1) parser.getDocument()->dump(out);
+        return narrow(out);
+    };
+    const std::string whole = parse();
+    EXPECT_NE("", whole);
+    EXPECT_EQ(whole, withEveryFailure(failures_, parse));
+    // Without an event parser there is no document.
+    EXPECT_EQ((std::set<std::string>{"", "no memory"}), results_);
+}
+
+TEST_F(MemoryShortage, AStartUpThatFailsSaysSoAndCanBeRepeated) {
+    TraceCapture traces("ERROR");
+    {
+        const Fault fault(Call::kNew, 1, ENOMEM, Fault::Lasts::kOnwards);
+        EXPECT_EQ(OXA_FAILED, Initialize_Mgmt_Functions());
+    }
+    EXPECT_FALSE(initialized);
+    // There was no memory for the reason.
+    EXPECT_EQ(1, traces.count('E', "Exception caught: %s"));
+    EXPECT_EQ(0, Initialize_Mgmt_Functions());
+    EXPECT_TRUE(initialized);
 }
 
 TEST_F(MemoryShortage, ACommandThrowsAtMost) {

@@ -1,0 +1,86 @@
+// The executor when memory runs out at any of its allocations: each task has one outcome all the
+// same. Outcomes and sleeps are taken over here, without a need for memory.
+#include <unistd.h>
+
+#include <atomic>
+#include <cstdlib>
+#include <string>
+
+#include "faults/scenario.h"
+#include "platform/bss1.h"
+#include "support/scratch_dir.h"
+#include "tasks/deploy_status.h"
+#include "tasks/fake_handlers.h"
+#include "tasks/zavtasks.h"
+#include "util/zavutil.h"
+
+using namespace faults;
+
+namespace {
+
+std::atomic<int> published{0};
+std::atomic<int> lastCode{-1};
+
+}  // namespace
+
+int publishDeployStatus(zav_kagdyst_data_t* rows, int count) {
+    lastCode = rows->retval;
+    published += count;
+    return 0;
+}
+
+void BSS1_Sleep(unsigned) {}
+
+namespace {
+
+class ExecutorFaults : public testing::Test {
+protected:
+    void SetUp() override {
+        if (!kMemoryIsOurs) GTEST_SKIP() << "the sanitizer owns malloc";
+        static ScratchDir& scratch = *new ScratchDir;  // the executor outlives the test
+        ::setenv("QVSDEPLOY_AGENTDEPOT", scratch.makeDir("depot").c_str(), 1);
+        zav_taskmgr_init();
+        ASSERT_TRUE(initialized);
+    }
+
+    /// Queues a task whose execution meets a fault from its `nth` allocation on, one that works or
+    /// several; gives its return code once its outcome is there.
+    static int codeWithFault(int nth, bool& happened) {
+        const int before = published;
+        TaskQueueElem task("node", "T1", "START", "ux", "", "INSTANCE", "", "", "", "i");
+        pthread_mutex_lock(&queue_mutex);
+        taskQueue.push(std::move(task));
+        const Fault fault(Call::kNew, nth, ENOMEM);
+        pthread_cond_signal(&worktodo);
+        pthread_mutex_unlock(&queue_mutex);
+        for (int i = 0; i < 5000 && published == before; ++i)
+            ::usleep(1000);
+        happened = fault.happened();
+        EXPECT_EQ(before + 1, published) << nth;
+        return lastCode;
+    }
+
+    /// The codes of tasks with a fault at each of their allocations.
+    static std::set<int> codesWithEveryFault() {
+        std::set<int> codes;
+        bool happened = true;
+        for (int nth = 1; happened && nth < 1000; ++nth)
+            codes.insert(codeWithFault(nth, happened));
+        EXPECT_FALSE(happened);
+        return codes;
+    }
+
+    TraceCapture traces_{"ERROR"};
+};
+
+TEST_F(ExecutorFaults, ATaskHasOneOutcomeWhateverMemoryIsMissing) {
+    // A handler that has no memory has not started its command.
+    EXPECT_EQ((std::set<int>{0, 1025}), codesWithEveryFault());
+}
+
+TEST_F(ExecutorFaults, AHandlersExceptionIsItsOutcomeAlsoWithoutMemoryForTheMessage) {
+    fake_handlers::behave([](const std::string&, TaskQueueElem&) -> TASK_RC { throw 42; });
+    EXPECT_EQ((std::set<int>{1025}), codesWithEveryFault());
+}
+
+}  // namespace
