@@ -25,6 +25,8 @@ Failure broken() {
 }
 
 void setTimeout(int descriptor, std::chrono::milliseconds timeout) {
+    // Nothing at all would mean without end.
+    timeout = std::max(timeout, std::chrono::milliseconds(1));
     timeval limit{};
     limit.tv_sec = static_cast<time_t>(timeout.count() / 1000);
     limit.tv_usec = static_cast<suseconds_t>(timeout.count() % 1000 * 1000);

@@ -205,6 +205,26 @@ TEST(ControlProgram, FindsTheHostByTheEnvironmentAsTheHostDoes) {
 
 // ---- A host that goes away ----------------------------------------------------------------------
 
+TEST(ControlProgram, AHostThatDoesNotAnswerIsStatusFour) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    ::kill(host.pid(), SIGSTOP);
+    for (const Arguments& command :
+         {Arguments{"status"}, Arguments{"agents"}, Arguments{"query", "KINAGT"},
+          Arguments{"start", "ux"}, Arguments{"config", "get", "ux"}, Arguments{"complete-install"},
+          Arguments{"events", "--count", "1"}}) {
+        for (const char* timeout : {"0.2", "0"}) {
+            Arguments line = {"--timeout", timeout};
+            line.insert(line.end(), command.begin(), command.end());
+            const ProgramResult result = host.zavctl(line);
+            EXPECT_EQ(result.status, 4) << command[0];
+            EXPECT_EQ(result.out, "");
+            EXPECT_EQ(result.err, "zavctl: no answer within the time-out\n");
+        }
+    }
+    ::kill(host.pid(), SIGCONT);
+}
+
 TEST(ControlProgram, AHostThatGoesAwayBeforeTheOutcomeIsStatusThree) {
     ScriptHome home;
     home.agentScript("exec sleep 3");
