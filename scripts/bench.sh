@@ -29,6 +29,7 @@ fi
 
 step() { echo "== $*"; }
 
+printf 'machine/load\t%s\n' "$(cut -d' ' -f1 /proc/loadavg)" >"$results/shell.tsv"
 step what is needed
 scripts/bootstrap.sh
 bench/install_peers.sh

@@ -26,8 +26,18 @@ def _output(*command):
     return run.stdout.strip() if run.returncode == 0 else ""
 
 
-def describe():
-    """Lines of a list in Markdown."""
+def _busyness(load):
+    if load is None:
+        return "not recorded"
+    text = f"load average {load:.2f} before the run"
+    if load > 0.5 * os.cpu_count():
+        text += ("; **the machine did other work meanwhile, which counts in everything that is "
+                 "measured by the clock**")
+    return text
+
+
+def describe(load):
+    """Lines of a list in Markdown. `load` is the load average at the beginning, or None."""
     memory = int(_field("/proc/meminfo", r"^MemTotal:\s*(\d+)")) / (1 << 20)
     return "\n".join([
         f"- processor: {_field('/proc/cpuinfo', r'^model name.*: (.*)$')}, "
@@ -36,6 +46,7 @@ def describe():
         f"- kernel: {platform.system()} {platform.release()}",
         f"- distribution: {_field('/etc/os-release', _NAME)}",
         f"- compiler: {_output('c++', '--version').splitlines()[0]}",
+        f"- other work: {_busyness(load)}",
     ])
 
 

@@ -38,8 +38,8 @@ def missed_section(missed):
     lines = ["### Goals that were not met", ""]
     for row in missed:
         lines.append(f"- **{row.what}** against {row.against}: "
-                     f"{row.reason or 'a new finding of this run, not looked into yet.'}")
-    return "\n".join(lines) + "\n"
+                     f"{row.reason.strip() or 'not looked into yet.'}")
+    return "\n".join(lines)
 
 
 def main():
@@ -49,13 +49,16 @@ def main():
     docs = Path(sys.argv[2])
     rows = list(ratios.Table(figures).rows())
     table = ratios.markdown(ratios.HEAD, [row.cells() for row in rows])
-    goals = [row for row in rows if row.met() is not None]
-    missed = [row for row in goals if not row.met()]
-    summary = f"Of {len(goals)} goals {len(goals) - len(missed)} are met."
+    goals = [row for row in rows if row.goal is not None]
+    missed = [row for row in goals if row.met() is False]
+    unmeasured = sum(row.met() is None for row in goals)
+    summary = f"Of {len(goals)} goals {len(goals) - len(missed) - unmeasured} are met."
+    if unmeasured:
+        summary += f" {unmeasured} could not be measured: what they need was not to be had."
     page = (Path(__file__).parent / "performance.md.in").read_text()
     for mark, text in {
             "DATE": datetime.datetime.now(datetime.timezone.utc).strftime("%Y-%m-%d"),
-            "MACHINE": machine.describe(),
+            "MACHINE": machine.describe(figures.get("machine/load")),
             "VERSIONS": ratios.markdown(["What", "Package", "Version"], machine.versions()),
             "SUMMARY": summary,
             "RATIOS": table,
