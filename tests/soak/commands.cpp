@@ -3,41 +3,17 @@
 #include <nlohmann/json.hpp>
 #include <utility>
 
+#include "soak/answers.h"
+
 namespace soak {
 namespace {
 
 using nlohmann::json;
 using Conditions = std::vector<std::pair<std::string, std::string>>;
 
-/// The answer's document; a fault and null when it is no success.
-json documentOf(World& world, const Answer* answer, const std::string& what) {
-    if (answer == nullptr || answer->status == 503) return {};
-    if (answer->status != 200) {
-        world.tally.fault(what + " was answered with status " + std::to_string(answer->status) +
-                          ": " + answer->body);
-        return {};
-    }
-    json document = json::parse(answer->body, nullptr, false);
-    if (document.is_discarded()) {
-        world.tally.fault(what + " was answered with what is no JSON: " + answer->body);
-        return {};
-    }
-    return document;
-}
-
-Hope hopeFor(bool failure, bool success) {
-    return failure ? Hope::Failure : success ? Hope::Success : Hope::Any;
-}
-
-/// The one row of an answer to a command.
-json rowOf(World& world, const Answer* answer, const std::string& what) {
-    const json document = documentOf(world, answer, what);
-    if (document.is_null()) return {};
-    if (!document.contains("rows") || document["rows"].size() != 1) {
-        world.tally.fault(what + " was not answered with one row: " + answer->body);
-        return {};
-    }
-    return document["rows"][0];
+Hope hopeFor(const std::string& product) {
+    if (product == "er") return Hope::Failure;
+    return product == "ux" || product == "db" ? Hope::Success : Hope::Any;
 }
 
 }  // namespace
@@ -79,64 +55,79 @@ std::string Commands::target() {
     return "node" + std::to_string(world_.chance.below(8)) + ":soak";
 }
 
+std::string Commands::product() {
+    Chance& chance = world_.chance;
+    if (chance.oneIn(250)) return chance.of({"hg", "df", "fl", "bo", "he"});
+    if (chance.oneIn(10)) return chance.of({"er", "sk"});
+    return chance.of({"ux", "db", "lz", "oy"});
+}
+
 Exchange Commands::queued(std::size_t burst) {
+    const std::size_t kind = world_.chance.below(10);
+    return make(kind < 4   ? startStop()
+                : kind < 6 ? configuration()
+                : kind < 8 ? install()
+                           : removal(),
+                burst);
+}
+
+Commands::Shape Commands::startStop() {
+    const std::string code = product();
+    const Hope hope = hopeFor(code);
+    switch (world_.chance.below(4)) {
+        case 0:
+            return {"START", code, {}, hope};
+        case 1:
+            return {"START", code, {{"OPTIONAL", "INSTANCE"}, {"TARGETMSN", "one"}}, hope};
+        case 2:
+            return {"STOP", code, {{"TARGETMSN", target()}}, Hope::Any};
+        default:
+            return {"RESTART", code, {}, hope};
+    }
+}
+
+Commands::Shape Commands::configuration() {
+    Chance& chance = world_.chance;
+    if (chance.oneIn(2)) {
+        const std::string options = chance.of({"PORT=7700", "RESTART=Y", "PORT=7700,RESTART=Y"});
+        return {"SETCONFIG",
+                "um",
+                {{"UACONFIG", "app.mdl"}, {"UASCRIPT", "one.sh"}, {"CONTEXT", options}},
+                Hope::Any};
+    }
+    const std::string code = product();
+    const std::string text = "A=1\n" + std::string(chance.below(2500), 'c');
+    return {"SETCONFIG", code, {{"TARGETMSN", target()}, {"CONTEXT", text}}, hopeFor(code)};
+}
+
+Commands::Shape Commands::install() {
     Chance& chance = world_.chance;
     const std::string mood = chance.oneIn(100) ? chance.of({"hang", "deaf"})
                              : chance.oneIn(8)
                                  ? chance.of({"flood", "both", "fail", "suicide", "heir"})
                                  : "well";
-    // A start of "fl" fills its pipe and waits for a reader that never comes.
-    const std::string product = chance.oneIn(250)  ? chance.of({"hg", "df", "fl", "bo", "he"})
-                                : chance.oneIn(10) ? chance.of({"er", "sk"})
-                                                   : chance.of({"ux", "db", "lz", "oy"});
-    const Hope hope = hopeFor(product == "er", product == "ux" || product == "db");
-    const std::string install = "|TOVRINHOME|/bin/installer " + mood + " |DEPLOYDIR|";
-    const Hope installs = hopeFor(mood == "fail", mood == "well");
-    switch (chance.below(10)) {
-        case 0:
-            return make({"START", product, {}, hope}, burst);
-        case 1:
-            return make({"START", product, {{"OPTIONAL", "INSTANCE"}, {"TARGETMSN", "one"}}, hope},
-                        burst);
-        case 2:
-            return make({"STOP", product, {{"TARGETMSN", target()}}, Hope::Any}, burst);
-        case 3:
-            return make({"RESTART", product, {}, hope}, burst);
-        case 4:
-            return make({"SETCONFIG",
-                         product,
-                         {{"TARGETMSN", target()},
-                          {"CONTEXT", "A=1\n" + std::string(chance.below(2500), 'c')}},
-                         hope},
-                        burst);
-        case 5:
-            return make(
-                {"SETCONFIG",
-                 "um",
-                 {{"UACONFIG", "app.mdl"},
-                  {"UASCRIPT", "one.sh"},
-                  {"CONTEXT", chance.of({"PORT=7700", "RESTART=Y", "PORT=7700,RESTART=Y"})}},
-                 Hope::Any},
-                burst);
-        case 6:
-            return make(
-                {"INSTALL", product, {{"VERSION", "060100000"}, {"CONTEXT", install}}, installs},
-                burst);
-        case 7:
-            return make({"INSTALL",
-                         product,
-                         {{"VERSION", "060100000"},
-                          {"CONTEXT", install},
-                          {"OPTIONAL", chance.of({"REQUIRES_RESTART", "SETCMS"})}},
-                         installs},
-                        burst);
-        case 8:
-            return make({"UNINSTALL", product, {}, hope}, burst);
-        default:
-            return make(
-                {"REMOVEINSTANCE", product, {{"TARGETMSN", target()}, {"CONTEXT", "input"}}, hope},
-                burst);
+    const std::string code = product();
+    const bool sound = hopeFor(code) == Hope::Success;
+    Shape shape{"INSTALL",
+                code,
+                {{"VERSION", "060100000"},
+                 {"CONTEXT", "|TOVRINHOME|/bin/installer " + mood + " |DEPLOYDIR|"}},
+                mood == "fail"            ? Hope::Failure
+                : mood == "well" && sound ? Hope::Success
+                                          : Hope::Any};
+    if (chance.oneIn(2)) {
+        shape.more.emplace_back("OPTIONAL", chance.of({"REQUIRES_RESTART", "SETCMS"}));
     }
+    return shape;
+}
+
+Commands::Shape Commands::removal() {
+    const std::string code = product();
+    if (world_.chance.oneIn(2)) {
+        // The inventory may have been killed, and then the product is not found.
+        return {"UNINSTALL", code, {}, hopeFor(code)};
+    }
+    return {"REMOVEINSTANCE", code, {{"TARGETMSN", target()}, {"CONTEXT", "input"}}, hopeFor(code)};
 }
 
 Exchange Commands::make(const Shape& shape, std::size_t burst) {
@@ -183,114 +174,6 @@ Exchange Commands::entered(Ledger::Number number, std::string body) const {
                 }
                 world.ledger.answered(number, row.at("RETVAL") == 0, now);
             }};
-}
-
-Exchange Commands::getConfiguration() {
-    World& world = world_;
-    const std::string product = world.chance.oneIn(60) ? world.chance.of({"hg", "fl", "er", "sk"})
-                                                       : world.chance.of({"ux", "db", "lz"});
-    world.tally.count("GETCONFIG");
-    return {postRequest("/v1/query", queryBody("KAGREQT", {{"COMMAND", "GETCONFIG"},
-                                                           {"TRANSID", "at once"},
-                                                           {"PRODUCT", product},
-                                                           {"TARGETMSN", target()}})),
-            nullptr, [&world, product](const Answer* answer) {
-                const json row = rowOf(world, answer, "GETCONFIG");
-                if (row.is_null()) return;
-                if (row.at("RETVAL") != 0) return world.tally.count("GETCONFIG, failed");
-                // A translator that a signal has ended counts as one that had nothing to say.
-                const std::string context = row.at("CONTEXT").get<std::string>();
-                if (!context.empty() && context != "INSTANCE=" + product + "\nKEY=value\n") {
-                    world.tally.fault("GETCONFIG of " + product + " brought: " + context);
-                }
-            }};
-}
-
-Exchange Commands::completeInstall() {
-    World& world = world_;
-    world.tally.count("COMPLETE_INSTALL");
-    return {postRequest("/v1/query", queryBody("KAGREQT", {{"COMMAND", "COMPLETE_INSTALL"},
-                                                           {"TRANSID", "at once"}})),
-            nullptr, [&world](const Answer* answer) { rowOf(world, answer, "COMPLETE_INSTALL"); }};
-}
-
-Exchange Commands::refused() {
-    World& world = world_;
-    const Ledger::Number number = world.ledger.announce("none", "", 1, Hope::Any, 0);
-    const std::string transid = world.ledger.transid(number);
-    const Conditions where = world.chance.of<Conditions>(
-        {{{"COMMAND", "JUMP"}, {"TRANSID", transid}},
-         {{"COMMAND", "START"}, {"TRANSID", transid}},
-         {{"COMMAND", "INSTALL"}, {"TRANSID", transid}, {"PRODUCT", "ux"}},
-         {{"COMMAND", "REMOVEINSTANCE"}, {"TRANSID", transid}, {"PRODUCT", "um"}},
-         {{"TRANSID", transid}}});
-    world.tally.count("commands to be refused");
-    return {postRequest("/v1/query", queryBody("KAGREQT", where)),
-            [&world, number] { world.ledger.sending(number, world.clock.wall()); },
-            [&world, number](const Answer* answer) {
-                const json row = rowOf(world, answer, "a bad command");
-                world.ledger.answered(number, false, world.clock.wall());
-                if (!row.is_null() && row.at("RETVAL") == 0) {
-                    world.tally.fault("a bad command was accepted: " + row.dump());
-                }
-            }};
-}
-
-Exchange Commands::inventory() {
-    World& world = world_;
-    const bool filtered = world.chance.oneIn(2);
-    world.tally.count("KINAGT queries");
-    return {postRequest("/v1/query", filtered ? queryBody("KINAGT", {{"PRODUCT", "ux"}})
-                                              : queryBody("KINAGT", {})),
-            nullptr, [&world, filtered](const Answer* answer) {
-                const json document = documentOf(world, answer, "KINAGT");
-                if (document.is_null()) return;
-                for (const json& row : document.at("rows")) {
-                    if (filtered && row.at("PRODUCT") != "ux") {
-                        world.tally.fault("a row that does not match: " + row.dump());
-                    }
-                }
-                // Its program may have been killed.
-                if (document.at("rows").size() != (filtered ? 1 : 13)) {
-                    world.tally.count("KINAGT queries, incomplete");
-                }
-            }};
-}
-
-Exchange Commands::health() const {
-    World& world = world_;
-    return {getRequest("/v1/health"), nullptr,
-            [&world](const Answer* answer) { documentOf(world, answer, "/v1/health"); }};
-}
-
-Exchange Commands::query() {
-    World& world = world_;
-    world.tally.count("other queries");
-    switch (world.chance.below(4)) {
-        case 0:
-            return health();
-        case 1:
-            return {getRequest("/v1/tables"), nullptr, [&world](const Answer* answer) {
-                        const json document = documentOf(world, answer, "/v1/tables");
-                        if (!document.is_null() && document.at("tables").size() != 3) {
-                            world.tally.fault("not all tables: " + document.dump());
-                        }
-                    }};
-        case 2:
-            return {postRequest("/v1/query", queryBody("KAGDYST", {})), nullptr,
-                    [&world](const Answer* answer) {
-                        const json document = documentOf(world, answer, "KAGDYST");
-                        if (!document.is_null() && !document.at("rows").empty()) {
-                            world.tally.fault("a query on KAGDYST has rows: " + document.dump());
-                        }
-                    }};
-        default:
-            return {getRequest("/v1/nothing"), nullptr, [&world](const Answer* answer) {
-                        if (answer != nullptr && answer->status != 404 && answer->status != 503) {
-                            world.tally.fault("nothing was found: " + answer->body);
-                        }
-                    }};
-    }
 }
 
 }  // namespace soak

@@ -37,6 +37,11 @@ private:
     Exchange refused();
     Exchange make(const Shape& shape, std::size_t burst);
     Exchange entered(Ledger::Number number, std::string body) const;
+    Shape startStop();
+    Shape configuration();
+    Shape install();
+    Shape removal();
+    std::string product();
     std::string target();
 
     World& world_;

@@ -18,9 +18,6 @@ namespace {
 constexpr std::chrono::milliseconds kPause{10};
 constexpr int kReadyPauses = 6000;
 
-/// Seconds that a child of the host may run.
-constexpr const char* kChildTimeout = "2";
-
 int logFile(const std::string& path) {
     return ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
 }
@@ -32,7 +29,7 @@ int logFile(const std::string& path) {
     ::dup2(logFile(home.log("host.out")), STDOUT_FILENO);
     ::dup2(logFile(home.log("host.err")), STDERR_FILENO);
     ::setenv("TMPDIR", home.temporary().c_str(), 1);
-    ::setenv("TIMEOUT", kChildTimeout, 1);
+    ::setenv("TIMEOUT", std::to_string(kChildSeconds).c_str(), 1);
     ::setenv("QVSDEPLOY_AGENTDEPOT", home.depot().c_str(), 1);
     ::setenv("KBB_RAS1_LOG", home.log("host.trace").c_str(), 1);
     for (const char* name : {"KBB_RAS1", "QVS_BINARCH", "ZAV_SOCKET", "TOVRINHOME"})

@@ -69,20 +69,20 @@ int soakAll(const Arguments& arguments) {
                 static_cast<unsigned long long>(arguments.options.seed), arguments.options.clients,
                 arguments.options.minutes, home.root().c_str());
     std::fflush(stdout);
-    bool good = false;
+    auto result = soak::Run::Result::Bad;
     try {
-        good = soak::Run(arguments.options, home).toTheEnd();
+        result = soak::Run(arguments.options, home).toTheEnd();
     } catch (const std::exception& error) {
         std::printf("zavsoak: %s\n", error.what());
     }
-    if (soak::Run::interrupted()) std::printf("broken off\n");
-    if (good && !arguments.keep) {
+    if (result == soak::Run::Result::Interrupted) std::printf("broken off\n");
+    if (result != soak::Run::Result::Bad && !arguments.keep) {
         home.remove();
     } else {
         std::printf("kept: %s, the host's log is %s\n", home.root().c_str(),
                     home.log("host.trace").c_str());
     }
-    return good ? 0 : 1;
+    return result == soak::Run::Result::Good ? 0 : 1;
 }
 
 }  // namespace

@@ -31,8 +31,8 @@ constexpr bool kMeasuresMemory = true;
 
 std::atomic<bool> interruption{false};
 
-const char* verdict(bool good) {
-    return good ? "good" : "BAD";
+bool holdsMore(const Gauges& before, const Gauges& after) {
+    return after.residentKiB > before.residentKiB + kMemoryMarginKiB;
 }
 
 }  // namespace
@@ -54,23 +54,34 @@ Run::Run(const Options& options, const SoakHome& home)
       mix_(world_, crowd_, options.clients),
       weather_(world_, host_) {}
 
-bool Run::toTheEnd() {
-    if (!openControl()) return false;
+Run::Result Run::toTheEnd() {
     const double whole = options_.minutes * 60;
     const double warmUp = std::min(60.0, whole / 4);
-    traffic(warmUp);
-    drain();
-    const Gauges before = settledGauges();
-    std::printf("%6.0f s  warm: %ld descriptors, %ld threads, %ld KiB resident\n",
-                world_.clock.wall(), before.descriptors, before.threads, before.residentKiB);
-    traffic(whole - warmUp);
-    drain();
-    const Gauges after = settledGauges();
-    if (interrupted()) return false;
-    judge(before, after);
+    Gauges before;
+    Gauges after;
+    if (openControl()) {
+        traffic(warmUp);
+        drain();
+        before = settledGauges();
+        std::printf("%6.0f s  warm: %ld descriptors, %ld threads, %ld KiB resident\n",
+                    world_.clock.wall(), before.descriptors, before.threads, before.residentKiB);
+        traffic(whole - warmUp);
+        drain();
+        after = settledGauges();
+    }
+    if (interrupted()) return Result::Interrupted;
+    judgeTraffic();
+    judgeHost(before, after);
     endHost();
-    printVerdict(before, after);
-    return world_.tally.faultCount() == 0;
+    printTraffic();
+    printHost(before, after);
+    printFaults();
+    return world_.tally.faultCount() == 0 ? Result::Good : Result::Bad;
+}
+
+/// False when the run was interrupted or the host is gone.
+bool Run::goesOn() {
+    return !interrupted() && host_.running();
 }
 
 bool Run::openControl() {
@@ -78,14 +89,14 @@ bool Run::openControl() {
     const ControlSubscriber& opened = *control;
     crowd_.add(std::move(control));
     if (turnUntil(30, [&opened] { return opened.live(); })) return true;
-    std::printf("the control subscription cannot be opened\n");
+    world_.tally.fault("the control subscription cannot be opened");
     return false;
 }
 
 bool Run::turnUntil(double seconds, const std::function<bool()>& done) {
     const double end = world_.clock.wall() + seconds;
     while (!done()) {
-        if (interrupted() || world_.clock.wall() >= end) return false;
+        if (!goesOn() || world_.clock.wall() >= end) return false;
         crowd_.turn();
         progress();
     }
@@ -95,11 +106,6 @@ bool Run::turnUntil(double seconds, const std::function<bool()>& done) {
 void Run::traffic(double seconds) {
     world_.draining = false;
     turnUntil(seconds, [this] {
-        if (!host_.running()) {
-            world_.tally.fault("the host has ended in the midst of it");
-            Run::interrupt();
-            return true;
-        }
         mix_.pass();
         weather_.pass();
         return false;
@@ -110,7 +116,7 @@ void Run::traffic(double seconds) {
 void Run::drain() {
     world_.draining = true;
     const bool left = turnUntil(kDrainSeconds, [this] { return crowd_.size() <= 1; });
-    if (!left && !interrupted()) {
+    if (!left && goesOn()) {
         for (const auto& [kind, count] : crowd_.kinds()) {
             if (count > 0 && kind != "control") {
                 world_.tally.fault(std::to_string(count) + " clients of the kind \"" + kind +
@@ -121,7 +127,7 @@ void Run::drain() {
     // What clients that have vanished left behind is accepted before the second fence at the
     // latest.
     if (!awaitFence() || !awaitFence()) {
-        if (!interrupted()) world_.tally.fault("the queue does not come to its end");
+        if (goesOn()) world_.tally.fault("the queue does not come to its end");
     }
 }
 
@@ -161,15 +167,19 @@ void Run::progress() {
     std::fflush(stdout);
 }
 
-void Run::judge(const Gauges& before, const Gauges& after) {
-    Tally& tally = world_.tally;
-    world_.ledger.judge(tally);
+void Run::judgeTraffic() {
+    world_.ledger.judge(world_.tally);
     for (const SubscriptionRecord& record : world_.subscriptions)
-        judgeSubscription(record, world_.ledger, tally);
+        judgeSubscription(record, world_.ledger, world_.tally);
+}
+
+void Run::judgeHost(const Gauges& before, const Gauges& after) {
+    Tally& tally = world_.tally;
+    if (!host_.running()) return tally.foremostFault("the host has ended by itself");
     if (after.descriptors > before.descriptors) tally.fault("the host holds more descriptors");
     if (after.threads > before.threads) tally.fault("the host has more threads");
     if (after.children > 0) tally.fault("the host has children left");
-    if (kMeasuresMemory && after.residentKiB > before.residentKiB + kMemoryMarginKiB) {
+    if (kMeasuresMemory && holdsMore(before, after)) {
         tally.fault("the host holds more memory");
     }
     for (const std::string& file : after.files) {
@@ -180,22 +190,24 @@ void Run::judge(const Gauges& before, const Gauges& after) {
 void Run::endHost() {
     const int status = host_.end(kHostEndSeconds);
     Tally& tally = world_.tally;
-    if (status != 0) tally.fault("the host ended with status " + std::to_string(status));
+    if (status != 0) tally.foremostFault("the host ended with status " + std::to_string(status));
     const std::string errors = contentOf(home_.log("host.err"));
     if (!errors.empty())
-        tally.fault("the host wrote to its standard error: " + errors.substr(0, 4000));
+        tally.foremostFault("the host wrote to its standard error: " + errors.substr(0, 4000));
     for (const std::string& socket : {home_.socket(), home_.transferSocket()}) {
         if (std::filesystem::exists(socket)) tally.fault("the host left its socket " + socket);
     }
 }
 
-void Run::printVerdict(const Gauges& before, const Gauges& after) const {
-    const Tally& tally = world_.tally;
+void Run::printTraffic() const {
     std::printf("\n%-32s %12s\n", "traffic", "count");
-    for (const auto& [what, count] : tally.counts())
+    for (const auto& [what, count] : world_.tally.counts())
         std::printf("%-32s %12" PRIu64 "\n", what.c_str(), count);
+}
+
+void Run::printHost(const Gauges& before, const Gauges& after) const {
     const auto line = [](const char* what, long begin, long end, bool good) {
-        std::printf("%-32s %12ld %12ld  %s\n", what, begin, end, verdict(good));
+        std::printf("%-32s %12ld %12ld  %s\n", what, begin, end, good ? "good" : "BAD");
     };
     std::printf("\n%-32s %12s %12s  %s\n", "what", "begin", "end", "verdict");
     line("descriptors", before.descriptors, after.descriptors,
@@ -203,17 +215,17 @@ void Run::printVerdict(const Gauges& before, const Gauges& after) const {
     line("threads", before.threads, after.threads, after.threads <= before.threads);
     line("children", before.children, after.children, after.children == 0);
     line(kMeasuresMemory ? "KiB resident (margin 4096)" : "KiB resident (not judged)",
-         before.residentKiB, after.residentKiB,
-         !kMeasuresMemory || after.residentKiB <= before.residentKiB + kMemoryMarginKiB);
+         before.residentKiB, after.residentKiB, !kMeasuresMemory || !holdsMore(before, after));
     line("files", static_cast<long>(before.files.size()), static_cast<long>(after.files.size()),
          std::includes(before.files.begin(), before.files.end(), after.files.begin(),
                        after.files.end()));
-    line("outcomes of accepted commands", 0, static_cast<long>(tally.of("outcomes")),
-         tally.faultCount() == 0);
+}
+
+void Run::printFaults() const {
     std::printf("\n");
-    for (const std::string& fault : tally.faults())
+    for (const std::string& fault : world_.tally.faults())
         std::printf("fault: %s\n", fault.c_str());
-    std::printf("%" PRIu64 " faults\n", tally.faultCount());
+    std::printf("%" PRIu64 " faults\n", world_.tally.faultCount());
 }
 
 }  // namespace soak

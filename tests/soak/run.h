@@ -25,8 +25,8 @@ public:
     /// Starts the host.
     Run(const Options& options, const SoakHome& home);
 
-    /// True when nothing was found; false too when it was interrupted.
-    bool toTheEnd();
+    enum class Result { Good, Bad, Interrupted };
+    Result toTheEnd();
 
     /// For signal handlers: makes toTheEnd() return soon.
     static void interrupt();
@@ -39,10 +39,14 @@ private:
     bool awaitFence();
     bool turnUntil(double seconds, const std::function<bool()>& done);
     Gauges settledGauges();
-    void judge(const Gauges& before, const Gauges& after);
+    void judgeHost(const Gauges& before, const Gauges& after);
+    void judgeTraffic();
     void endHost();
     void progress();
-    void printVerdict(const Gauges& before, const Gauges& after) const;
+    void printTraffic() const;
+    void printHost(const Gauges& before, const Gauges& after) const;
+    void printFaults() const;
+    bool goesOn();
 
     const Options options_;
     const SoakHome& home_;

@@ -19,10 +19,13 @@ void write(const std::string& path, const std::string& content, mode_t mode = 06
     ::chmod(path.c_str(), mode);
 }
 
-/// What a program does by the word in $mood. Nothing outlives its start by more than 6 seconds.
-constexpr const char* kMoods = R"(case $mood in
-hang) exec sleep 6 ;;
-deaf) trap '' TERM HUP INT; exec sleep 6 ;;
+/// Longer than the host waits; then what nobody killed ends by itself.
+const std::string kHang = "exec sleep " + std::to_string(3 * kChildSeconds);
+
+/// What a program does by the word in $mood.
+const std::string kMoods =
+    "case $mood in\nhang) " + kHang + " ;;\ndeaf) trap '' TERM HUP INT; " + kHang + " ;;" + R"(
+
 flood) head -c 2000000 /dev/zero | tr '\0' x ;;
 both) head -c 300000 /dev/zero | tr '\0' o; head -c 300000 /dev/zero | tr '\0' e >&2 ;;
 fail) echo "it went wrong" >&2; exit 3 ;;
@@ -32,7 +35,7 @@ esac
 )";
 
 /// The mood that belongs to a product code.
-constexpr const char* kMoodOfProduct = R"(case $product in
+const std::string kMoodOfProduct = R"(case $product in
 hg) mood=hang ;;
 df) mood=deaf ;;
 fl) mood=flood ;;
@@ -45,7 +48,7 @@ esac
 )";
 
 /// Once in a while a program hangs whatever it was asked.
-constexpr const char* kRarelyHang = "[ $(($$ % 499)) -ne 7 ] || exec sleep 6\n";
+const std::string kRarelyHang = "[ $(($$ % 499)) -ne 7 ] || " + kHang + "\n";
 
 void script(const std::string& path, const std::string& body) {
     write(path, "#!/bin/sh\n" + body, 0755);
@@ -73,7 +76,7 @@ void SoakHome::writePrograms() const {
         list += "\"" + std::string(product) + "\",\"A product\",\"li6263\",\"060100000\",\"100\"\n";
     }
     write(home() + "/list.txt", list);
-    script(home() + "/bin/cinfo", kRarelyHang + ("case $1 in\n-d) exec cat '" + home()) +
+    script(home() + "/bin/cinfo", kRarelyHang + "case $1 in\n-d) exec cat '" + home() +
                                       "/list.txt' ;;\n-p) printf 'Platform codes:\\nli6263 "
                                       "Product (%s)\\n' \"$2\" ;;\nesac\n");
     write(home() + "/bin/dynarch.shl", "os=Linux\ncArch=li6263\n");

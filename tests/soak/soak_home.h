@@ -6,6 +6,13 @@
 
 namespace soak {
 
+// An instrumented host is slow to start children, all the more on a machine that is busy otherwise.
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+constexpr int kChildSeconds = 6;
+#else
+constexpr int kChildSeconds = 2;  ///< that the host lets a child run
+#endif
+
 /// Everything of one run lies below one directory, which stays until it is removed.
 class SoakHome {
 public:

@@ -9,6 +9,8 @@ namespace {
 constexpr double kLag = 4;
 /// How long a head may take, and an outcome that one waits for.
 constexpr double kPatience = 90;
+/// How often one that waits looks whether there is anything to wait for.
+constexpr double kLookSeconds = 1;
 /// Rows that may come to the control subscription after another one of the same moment.
 constexpr std::size_t kRowsAhead = 600;
 
@@ -131,7 +133,16 @@ void Subscriber::takeRows() {
         record_.items.push_back({row.number, row.retval, 0});
         served_ = served_ || manner_.awaitsItsOwn;
     }
-    if (now() < decidesAt_ && !decided_) wakeIn(decidesAt_ - now());
+    if (manner_.awaitsItsOwn) lookForAnswer();
+    if (now() < decidesAt_ && !decided_) {
+        wakeIn(manner_.awaitsItsOwn ? kLookSeconds : decidesAt_ - now());
+    }
+}
+
+/// Of a command that was not accepted nothing is to be waited for.
+void Subscriber::lookForAnswer() {
+    const Ledger::State state = world_.ledger.entry(record_.filter.number).state;
+    served_ = served_ || state == Ledger::State::Refused || state == Ledger::State::Unknown;
 }
 
 void Subscriber::decideToGo() {

@@ -47,6 +47,7 @@ protected:
 private:
     bool takeHead();
     void takeRows();
+    void lookForAnswer();
     void decideToGo();
     bool leave();
 

@@ -22,6 +22,11 @@ public:
         ++faultCount_;
         if (faults_.size() < kKept) faults_.push_back(text);
     }
+    /// One that explains the others.
+    void foremostFault(const std::string& text) {
+        ++faultCount_;
+        faults_.insert(faults_.begin(), text);
+    }
     std::uint64_t faultCount() const { return faultCount_; }
     const std::vector<std::string>& faults() const { return faults_; }
 
