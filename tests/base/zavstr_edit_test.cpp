@@ -228,6 +228,11 @@ TEST(StringFindUnescaped, CountsEscapesBeforeTheStart) {
     EXPECT_EQ(String("a\\\\\\=").find('=', '\\', 3), String::NPOS);
 }
 
+TEST(StringFindUnescaped, TheTerminatorIsNoPartOfTheText) {
+    EXPECT_EQ(String("ab").find(static_cast<unsigned short>(0), '\\', 0), String::NPOS);
+    EXPECT_EQ(fromUnits({'a', '\\', 0, 0}).find(static_cast<unsigned short>(0), '\\', 0), 3u);
+}
+
 TEST(StringFindUnescaped, TheEscapeItself) {
     EXPECT_EQ(String("\\\\").find('\\', '\\', 0), 0u);
     EXPECT_EQ(String("a\\\\").find('\\', '\\', 0), 1u);
