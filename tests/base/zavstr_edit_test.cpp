@@ -200,6 +200,11 @@ TEST(StringFind, FindsAText) {
     EXPECT_EQ(String("aab").find(String("ab"), 0), 1u);
 }
 
+TEST(StringFind, ATextIsNotFoundAcrossTheEnd) {
+    EXPECT_EQ(String("xa").find(fromUnits({'a', 0}), 0), String::NPOS);
+    EXPECT_EQ(fromUnits({'x', 'a', 0}).find(fromUnits({'a', 0}), 0), 1u);
+}
+
 TEST(StringFind, OfTextNeverThrowsAndNeverFindsNothing) {
     EXPECT_EQ(String().find(String("ab"), 0), String::NPOS);
     EXPECT_EQ(String().find(String(), 0), String::NPOS);

@@ -6,6 +6,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -24,6 +25,7 @@ using ZAV::String;
 namespace {
 int reportedStreamError = 0;
 bool closingFails = false;
+bool writesAreShort = false;
 int lastClosed = -1;  // the descriptor of the stream
 std::vector<std::size_t> chunksRead;
 
@@ -44,6 +46,13 @@ extern "C" std::size_t fread(void* buffer, std::size_t size, std::size_t count, 
     return chunksRead.back();
 }
 
+extern "C" std::size_t fwrite(const void* data, std::size_t size, std::size_t count,
+                              std::FILE* stream) {
+    using Fwrite = std::size_t (*)(const void*, std::size_t, std::size_t, std::FILE*);
+    const std::size_t taken = writesAreShort ? std::min<std::size_t>(count, 100) : count;
+    return next<Fwrite>("fwrite")(data, size, taken, stream);
+}
+
 extern "C" int fclose(std::FILE* stream) {
     lastClosed = ::fileno(stream);
     const int result = next<int (*)(std::FILE*)>("fclose")(stream);
@@ -57,6 +66,7 @@ protected:
     ~WholeFile() override {
         reportedStreamError = 0;
         closingFails = false;
+        writesAreShort = false;
     }
 
     String path(const std::string& name) const { return scratch_.path(name).c_str(); }
@@ -153,6 +163,14 @@ TEST_F(WholeFile, WritesOverWhatWasThere) {
     EXPECT_EQ(1, writeFile(file, "new\n"));
     EXPECT_EQ("new\n", scratch_.read("f"));
     EXPECT_FALSE(scratch_.exists("f.tmp"));
+}
+
+TEST_F(WholeFile, WritesOnAfterAWriteThatTookLittle) {
+    const std::string text = sampleText(1050);
+    writesAreShort = true;
+    EXPECT_EQ(1, writeFile(path("f"), text.c_str()));
+    EXPECT_EQ(text, scratch_.read("f"));
+    EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(WholeFile, AnEmptyTextMakesAnEmptyFile) {

@@ -3,14 +3,29 @@
 #include <sys/utsname.h>
 
 #include <atomic>
+#include <cstdlib>
 #include <cstring>
 #include <thread>
 #include <vector>
 
+#include "platform/bss1.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 #include "util/zavutil.h"
+
+namespace {
+
+/// Whether the base services know of no variable at all.
+std::atomic<bool> baseServicesAreBlind{false};
+
+}  // namespace
+
+// Stands in front of the platform's.
+const char* BSS1_GetEnv(const char* name, const char* fallback) {
+    const char* const value = baseServicesAreBlind ? nullptr : std::getenv(name);
+    return value != nullptr ? value : fallback;
+}
 
 using namespace ZAV;
 using ::testing::Contains;
@@ -25,7 +40,10 @@ std::string narrow(const String& text) {
 class Directories : public ::testing::Test {
 protected:
     Directories() { forget(); }
-    ~Directories() override { forget(); }
+    ~Directories() override {
+        baseServicesAreBlind = false;
+        forget();
+    }
 
     static void forget() {
         Util::_homeDir.clear();
@@ -87,6 +105,19 @@ TEST_F(Directories, UnsetHomeFails) {
     EXPECT_EQ(dir.length(), 0u);
     EXPECT_THAT(traces.errors("zavutil"),
                 ElementsAre("Environment variable TOVRINHOME, does not exist"));
+}
+
+TEST_F(Directories, HomeThatTheBaseServicesDoNotKnowIsInTheEnvironment) {
+    scratch.makeDir("config");
+    home.set(scratch.path().c_str());
+    depot.set(scratch.path("depot").c_str());
+    baseServicesAreBlind = true;
+    EXPECT_TRUE(Util::getTovrinHomeDir(dir));
+    EXPECT_EQ(narrow(dir), scratch.path() + "/");
+    EXPECT_TRUE(Util::getTovrinConfigDir(dir));
+    EXPECT_EQ(narrow(dir), scratch.path("config") + "/");
+    EXPECT_TRUE(Util::getAgentDepotDir(dir));
+    EXPECT_EQ(narrow(dir), scratch.path() + "/") << "the depot is the base services' to know";
 }
 
 TEST_F(Directories, EmptyHomeNamesNothing) {

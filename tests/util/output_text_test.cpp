@@ -49,6 +49,10 @@ TEST(FsoTest, LeadingQuoteTakesNoBytesBeyondAscii) {
     EXPECT_EQ(fsoTest("\"\xC3\xA9/").cleaned, "\xC3\xA9");
 }
 
+TEST(FsoTest, LeadingQuoteTakesWhatIsBelowTheNumberSign) {
+    EXPECT_EQ(fsoTest("\"\x01 !\"#x").cleaned, "#x");
+}
+
 TEST(FsoTest, PathOfNothingButWhatIsCleanedAwayIsMissing) {
     for (const char* path : {"/", "///", "\"", "\"\"", "\"  \"", "\\\\", "\"/\""}) {
         const Tested tested = fsoTest(path);
