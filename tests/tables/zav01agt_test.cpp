@@ -5,6 +5,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <clocale>
 #include <cstdlib>
 #include <memory>
 #include <string>
@@ -331,6 +332,40 @@ TEST_F(RequestTable, AValueThatWasCutStillGetsItsAnswer) {
     EXPECT_EQ(1u, trace.errors("zavtqelm").size());
     ASSERT_EQ(1u, taskQueue.size());
     EXPECT_EQ(3073u, taskQueue.front().getContext().length());
+}
+
+/// The process's code page while it exists.
+class CodePage {
+public:
+    explicit CodePage(const char* locale) : former_(::setlocale(LC_CTYPE, nullptr)) {
+        ::setlocale(LC_CTYPE, locale);
+        ZAV::String::initialize();
+    }
+    ~CodePage() {
+        ::setlocale(LC_CTYPE, former_.c_str());
+        ZAV::String::initialize();
+    }
+    CodePage(const CodePage&) = delete;
+    CodePage& operator=(const CodePage&) = delete;
+
+private:
+    const std::string former_;
+};
+
+TEST_F(RequestTable, ARequestWhoseTextTheCodePageCutsIsQueuedWithoutAnAnswer) {
+    const CodePage utf8("C.UTF-8");
+    const auto ask = [](const std::string& product) {
+        return query({{"COMMAND", OPER_EQ, "START"},
+                      {"TRANSID", OPER_EQ, "tx"},
+                      {"PRODUCT", OPER_EQ, product}});
+    };
+    // The row has room for one byte per character and one more, its filter for all of them.
+    const auto answered = ask("u\u00E9");
+    ASSERT_EQ(1u, answered.size());
+    EXPECT_EQ(padded("u\u00E9", 32), fieldText(answered[0].product));
+    EXPECT_TRUE(ask("\u00E9\u00E9").empty());
+    ASSERT_EQ(2u, taskQueue.size());
+    EXPECT_EQ(2u, taskQueue.back().getProduct().length());
 }
 
 TEST_F(RequestTable, AnAnswerIsTraced) {
