@@ -13,8 +13,6 @@ _CLOCK = ("this is measured by the clock and over several processes, so whatever
           "counts. ")
 GROWTH_REASONS = {
     "append by line": _CACHES + "With the caches to itself it has been seen in proportion.",
-    "size of a run-as database": _CACHES + "A document of 1 MiB becomes some 16 MiB of elements, each "
-                                 "with lists of its children by name, that are all freed again.",
     "output of a command": _CLOCK + "Beyond 1 MiB the collected text is new memory from the kernel, "
                            "whose pages cost about a third of the time.",
     "size of a pushed file": _CLOCK,

@@ -23,16 +23,38 @@ String trimmedText(const DOMElement& element) {
     return text;
 }
 
-/// Calls `use` with each direct child of that tag name, in order.
+/// Whether that is the element's tag name; `tagName` is ASCII.
+bool isNamed(const DOMElement& element, const char* tagName) {
+    const unsigned short* name = element.getTagName();
+    if (name == nullptr) return false;
+    while (*name != 0 && *name == static_cast<unsigned char>(*tagName)) {
+        ++name;
+        ++tagName;
+    }
+    return *name == static_cast<unsigned char>(*tagName);
+}
+
+/// Calls `use` with each direct child of that tag name, in order, until it returns false. Unlike a
+/// search by getElementsByTagName this leaves no list behind in the element.
 template <typename Use>
 void forEachChild(const DOMElement& parent, const char* tagName, Use use) {
-    const String wanted(tagName);
     for (const DOMNode* node : parent.getChildren()->nodes()) {
         if (node->getNodeType() != DOMNode::ELEMENT_NODE) continue;
         const auto& element = static_cast<const DOMElement&>(*node);
-        const unsigned short* const name = element.getTagName();
-        if (name != nullptr && String::compare(name, wanted.getData()) == 0) use(element);
+        if (isNamed(element, tagName) && !use(element)) return;
     }
+}
+
+/// The first direct child of that tag name, or null.
+const DOMElement* firstChild(const DOMElement* parent, const char* tagName) {
+    const DOMElement* found = nullptr;
+    if (parent != nullptr) {
+        forEachChild(*parent, tagName, [&found](const DOMElement& element) {
+            found = &element;
+            return false;
+        });
+    }
+    return found;
 }
 
 /// One line of the file: `indent` tabs and a value between its tags.
@@ -151,6 +173,7 @@ void StartupDB::buildModel(const DOMElement* root) {
     forEachChild(*root, "agent", [this](const DOMElement& element) {
         std::unique_ptr<AgentEntry> agent(buildAgentEntry(&element));
         if (agent != nullptr) agents_.push_back(std::move(agent));
+        return true;
     });
 }
 
@@ -163,7 +186,7 @@ DOMElement* getChildElement(const DOMElement* parent, const char* name) {
 
 AgentEntry* buildAgentEntry(const DOMElement* agentElement) {
     Trace trace(traceUnit);
-    const DOMElement* const productCode = getChildElement(agentElement, "productCode");
+    const DOMElement* const productCode = firstChild(agentElement, "productCode");
     if (productCode == nullptr) {
         trace().error("Agent element missing <productCode> element");
         return nullptr;
@@ -171,6 +194,7 @@ AgentEntry* buildAgentEntry(const DOMElement* agentElement) {
     auto agent = std::make_unique<AgentEntry>(trimmedText(*productCode));
     forEachChild(*agentElement, "instance", [&agent](const DOMElement& element) {
         agent->addInstance(buildInstanceEntry(&element));
+        return true;
     });
     return agent.release();
 }
@@ -179,8 +203,8 @@ InstanceEntry* buildInstanceEntry(const DOMElement* instanceElement) {
     Trace trace(traceUnit);
     String instanceName;
     String user;
-    const DOMElement* const nameElement = getChildElement(instanceElement, "name");
-    const DOMElement* const userElement = getChildElement(instanceElement, "user");
+    const DOMElement* const nameElement = firstChild(instanceElement, "name");
+    const DOMElement* const userElement = firstChild(instanceElement, "user");
     if (nameElement != nullptr) {
         instanceName = trimmedText(*nameElement);
         if (userElement != nullptr) user = trimmedText(*userElement);
