@@ -4,24 +4,18 @@
 #include <algorithm>
 #include <ctime>
 
-/// Processor time of the calling thread, in seconds: what else the machine does is not counted.
-inline double threadSeconds() {
-    timespec time{};
-    ::clock_gettime(CLOCK_THREAD_CPUTIME_ID, &time);
-    return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) * 1e-9;
-}
-
 /// How many times as long `work(8 * size)` takes as `work(size)`: about 8 when the work is in
-/// proportion to its size, about 64 when it is quadratic. The shortest of five runs counts; the
-/// work is done by the calling thread.
+/// proportion to its size, about 64 when it is quadratic. The shortest of three runs counts, in
+/// processor time, so that it does not matter what else the machine does.
 template <typename Work>
 double growthOverEightfold(unsigned size, Work work) {
     const auto shortest = [&work](unsigned n) {
         double best = 1e9;
-        for (int run = 0; run < 5; ++run) {
-            const double start = threadSeconds();
+        for (int run = 0; run < 3; ++run) {
+            const std::clock_t start = std::clock();
             work(n);
-            best = std::min(best, threadSeconds() - start);
+            const auto taken = static_cast<double>(std::clock() - start);
+            best = std::min(best, taken / CLOCKS_PER_SEC);
         }
         return best;
     };
