@@ -38,6 +38,10 @@ bool sameText(const unsigned short* a, const unsigned short* b) {
     return a != nullptr && b != nullptr && String::compare(a, b) == 0;
 }
 
+bool isElement(const DOMNode& node) {
+    return node.getNodeType() == DOMNode::ELEMENT_NODE;
+}
+
 const DOMElement& asElement(const DOMNode* node) {
     return static_cast<const DOMElement&>(*node);
 }
@@ -75,11 +79,16 @@ void addEndTag(Dump& dump, const DOMElement& element) {
     dump.add(">");
 }
 
-void addDerivedChild(Dump& dump, String indent, std::size_t level, DOMNode& child) {
+/// A child of a class of its own, or one that was put into the list without being an element.
+void addOtherChild(Dump& dump, String indent, std::size_t level, DOMNode& child) {
     for (std::size_t tabs = 0; tabs < level; ++tabs)
         indent.append('\t');
     String text;
-    static_cast<DOMElement&>(child).dump(indent, text);
+    if (isElement(child)) {
+        static_cast<DOMElement&>(child).dump(indent, text);
+    } else {
+        child.dump(text);
+    }
     dump.add(text.getData());
     dump.add("\n");
 }
@@ -106,7 +115,7 @@ void addTree(Dump& dump, const String& indent, const DOMElement& root) {
             if (isExactly<DOMElement>(child)) {
                 start(asElement(&child));
             } else {
-                addDerivedChild(dump, indent, open.size(), child);
+                addOtherChild(dump, indent, open.size(), child);
             }
             continue;
         }
@@ -172,6 +181,10 @@ DOMElement::~DOMElement() {
     DOMElement* at = this;
     for (;;) {
         if (DOMNode* const child = at->children_.takeLast(); child != nullptr) {
+            if (!isElement(*child)) {
+                delete child;
+                continue;
+            }
             auto* const element = static_cast<DOMElement*>(child);
             element->parent_ = at;
             at = element;
@@ -238,7 +251,7 @@ DOMNodeList* DOMElement::getElementsByTagName(const unsigned short* name) const 
     if (tagLists_.get(key, &known)) return static_cast<DOMNodeList*>(known);
     auto found = std::make_unique<DOMNodeList>(false);
     for (DOMNode* node : children_.nodes()) {
-        if (sameText(asElement(node).getTagName(), name)) found->append(node);
+        if (isElement(*node) && sameText(asElement(node).getTagName(), name)) found->append(node);
     }
     tagLists_.put(key, found.get());
     return found.release();

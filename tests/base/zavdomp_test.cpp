@@ -264,6 +264,17 @@ TEST(DOMElement, DumpAsksChildrenAndAttributesOfDerivedClasses) {
                  "> </a>");
 }
 
+TEST(DOMElement, NodesInItsListThatAreNoElementsArePassedOver) {
+    DOMElement root("a");
+    root.getChildren()->append(new DOMAttr("b", "v"));
+    root.getChildren()->append(new PlainNode);
+    auto* b = new DOMElement("b");
+    root.addChild(b);
+    ASSERT_EQ(root.getElementsByTagName("b")->getLength(), 1u);
+    EXPECT_EQ(root.getElementsByTagName("b")->item(0), b);
+    EXPECT_EQ(dumped(root), "before:<a >\nb=\"v\"\n\n\t<b >\n\t</b>\n</a>");
+}
+
 TEST(DOMElement, DumpIndentsEveryLevelByATab) {
     DOMElement root("a");
     auto* b = new DOMElement("b");

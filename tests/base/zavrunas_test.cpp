@@ -249,12 +249,14 @@ TEST_F(RunAs, ChildElementIsTheFirstOfItsName) {
     EXPECT_EQ(getChildElement(&parent, "c"), first);
 }
 
-TEST_F(RunAs, ElementsWithoutATagNameAreNoneOfOurs) {
+TEST_F(RunAs, WhatIsNoElementOrHasNoTagNameIsNoneOfOurs) {
     DOMElement root("r");
     root.addChild(new DOMElement(nullptr));
+    root.getChildren()->append(new DOMAttr("agent", ""));
     auto* agent = new DOMElement("agent");
     root.addChild(agent);
     agent->addChild(new DOMElement(nullptr));
+    agent->getChildren()->append(new DOMAttr("productCode", ""));
     agent->addChild(new DOMElement("productCode"));
     StartupDB db(path());
     db.buildModel(&root);
