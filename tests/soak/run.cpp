@@ -15,7 +15,8 @@ namespace {
 
 constexpr double kProgressSeconds = 10;
 constexpr double kDrainSeconds = 240;
-constexpr double kFenceSeconds = 120;
+/// At the latest, one more task has been carried out.
+constexpr double kFenceSeconds = 60;
 constexpr double kHostEndSeconds = 30;
 /// Children that nobody waits for any more end by themselves within that.
 constexpr double kSettleSeconds = 20;
@@ -69,9 +70,10 @@ Run::Result Run::toTheEnd() {
         drain();
         after = settledGauges();
     }
+    if (!interrupted()) judgeTraffic();
+    if (!interrupted()) judgeHost(before, after);
+    weather_.killLeftChildren();
     if (interrupted()) return Result::Interrupted;
-    judgeTraffic();
-    judgeHost(before, after);
     endHost();
     printTraffic();
     printHost(before, after);
@@ -143,7 +145,11 @@ bool Run::awaitFence() {
             return exchanges;
         },
         1));
-    return turnUntil(kFenceSeconds, [this, number] { return world_.ledger.done(number); });
+    while (goesOn() && !world_.ledger.done(number)) {
+        const std::size_t rows = world_.ledger.rows().size();
+        if (!turnUntil(kFenceSeconds, [&] { return world_.ledger.rows().size() > rows; })) break;
+    }
+    return world_.ledger.done(number);
 }
 
 Gauges Run::settledGauges() {

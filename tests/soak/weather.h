@@ -15,6 +15,8 @@ public:
     void pass();
     /// Fair weather from now on: the host runs.
     void clear();
+    /// Kills the children that the host has left, which would outlive it when they are stopped.
+    void killLeftChildren() const;
 
 private:
     void killOneChild();
