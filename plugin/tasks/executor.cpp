@@ -119,6 +119,8 @@ void executeNextTask() noexcept {
         untilItWorks(trace, [&] { task.returnAsyncStatus(rc); });
     } catch (...) {
         ZAV::traceException(trace);
+        // Without memory it would come back here at once.
+        BSS1_Sleep(kPauseSeconds);
     }
 }
 

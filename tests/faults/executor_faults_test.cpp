@@ -29,7 +29,9 @@ int publishDeployStatus(zav_kagdyst_data_t* rows, int count) {
     return 0;
 }
 
-void BSS1_Sleep(unsigned) {}
+void BSS1_Sleep(unsigned) {
+    ::usleep(1000);
+}
 
 namespace {
 
@@ -39,6 +41,7 @@ protected:
         if (!kMemoryIsOurs) GTEST_SKIP() << "the sanitizer owns malloc";
         static ScratchDir& scratch = *new ScratchDir;  // the executor outlives the test
         ::setenv("QVSDEPLOY_AGENTDEPOT", scratch.makeDir("depot").c_str(), 1);
+        fake_handlers::reset();
         zav_taskmgr_init();
         ASSERT_TRUE(initialized);
     }
@@ -81,6 +84,26 @@ TEST_F(ExecutorFaults, ATaskHasOneOutcomeWhateverMemoryIsMissing) {
 TEST_F(ExecutorFaults, AHandlersExceptionIsItsOutcomeAlsoWithoutMemoryForTheMessage) {
     fake_handlers::behave([](const std::string&, TaskQueueElem&) -> TASK_RC { throw 42; });
     EXPECT_EQ((std::set<int>{1025}), codesWithEveryFault());
+}
+
+TEST_F(ExecutorFaults, WithoutAnyMemoryATaskIsGivenUpAndTheNextOneRuns) {
+    const int before = published;
+    pthread_mutex_lock(&queue_mutex);
+    taskQueue.push(TaskQueueElem("node", "T1", "START", "ux", "", "INSTANCE", "", "", "", "i"));
+    {
+        const Fault fault(Call::kNew, 1, ENOMEM, Fault::Lasts::kOnwards);
+        pthread_cond_signal(&worktodo);
+        pthread_mutex_unlock(&queue_mutex);
+        ::usleep(100 * 1000);
+        EXPECT_TRUE(fault.happened());
+    }
+    EXPECT_EQ(before, published);
+    bool happened = false;
+    EXPECT_EQ(0, codeWithFault(100000, happened));
+    // Each attempt and each later look at the queue says so, at the pace of the pauses.
+    const int told = traces_.count('E', "Exception caught: %s");
+    EXPECT_LE(5, told);
+    EXPECT_GE(150, told);
 }
 
 }  // namespace

@@ -16,6 +16,7 @@
 #include "support/scratch_dir.h"
 #include "tasks/whole_file.h"
 #include "tasks/zavtasks.h"
+#include "util/zavprocs.h"
 #include "util/zavutil.h"
 
 using namespace faults;
@@ -154,6 +155,19 @@ TEST_F(MemoryShortage, ACommandThrowsAtMost) {
     EXPECT_EQ("true input", withEveryFailure(failures_, command));
     EXPECT_LT(10, failures_);
     EXPECT_EQ((std::set<std::string>{"no memory"}), results_);
+}
+
+TEST_F(MemoryShortage, PruningThrowsAtMost) {
+    const auto prune = [&] {
+        scratch_.write("logs/a_long_enough_prefix_1", "");
+        scratch_.write("logs/a_long_enough_prefix_2", "");
+        ZAV::pruneLogs(scratch_.path("logs").c_str(), "a_long_enough_prefix_", 2);
+        const bool both = scratch_.exists("logs/a_long_enough_prefix_1") &&
+                          scratch_.exists("logs/a_long_enough_prefix_2");
+        return std::string(both ? "both" : "one");
+    };
+    EXPECT_EQ("one", withEveryFailure(failures_, prune));
+    EXPECT_EQ(1u, results_.count("no memory"));
 }
 
 // The last one, because it leaves a thread behind.

@@ -1,12 +1,15 @@
 // What requests end in when the system refuses what their commands take: return code, message id,
 // parameter and trace.
 #include <cerrno>
+#include <new>
+#include <stdexcept>
 
 #include "faults/scenario.h"
 #include "support/fake_sleep.h"
 #include "support/row_text.h"
 #include "support/scoped_env.h"
 #include "support/script_home.h"
+#include "tables/table_request.h"
 #include "tasks/agent_config.h"
 #include "tasks/home.h"
 #include "tasks/install.h"
@@ -161,6 +164,19 @@ TEST_F(TaskFaults, ACompletedInstallWhoseResultCannotBeReadIs1031) {
     scenario.expectEach(Call::kLseek, EIO, {failed, failed});
     scenario.expectEach(Call::kRead, EIO, {failed});
     EXPECT_FALSE(fake_sleep::slept().empty());
+}
+
+TEST_F(TaskFaults, NoExceptionReachesTheFrameworksThreads) {
+    RAS1_UNIT unit{"zav01agt"};
+    const ZAV::Trace trace(unit);
+    TraceCapture traces("ERROR");
+    EXPECT_EQ(OXA_NO_MEMORY, guarded(trace, []() -> int { throw std::bad_alloc(); }));
+    EXPECT_EQ(OXA_FAILED, guarded(trace, []() -> int { throw std::runtime_error("broken"); }));
+    EXPECT_EQ(OXA_FAILED, guarded(trace, []() -> int { throw 42; }));
+    EXPECT_EQ(OXA_OK, guarded(trace, [] { return OXA_OK; }));
+    EXPECT_THAT(traces.errors(),
+                testing::ElementsAre("Exception caught: std::bad_alloc", "Exception caught: broken",
+                                     "Exception caught: an exception without a text"));
 }
 
 }  // namespace

@@ -1,11 +1,14 @@
 // The transfer of a file, with and without the conversion of its line ends, whose calls of the
 // system fail one after the other.
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <csignal>
 #include <cstring>
 #include <filesystem>
 
+#include "embedded/ras1_control.h"
 #include "faults/scenario.h"
 #include "rpc/zavrpc.h"
 #include "support/scoped_env.h"
@@ -78,6 +81,33 @@ TEST_F(TransferFaults, WritingIsStatusFiveAndNamesTheChunk) {
         plain.expectEach(Call::kWritev, error,
                          {{"status 5 []", {"Error writing chunk 0, error number was 1"}}});
     }
+}
+
+TEST_F(TransferFaults, AChunkThatFitsInPartIsStatusFive) {
+    Scenario plain = transferOf("file", "ab\r\nab\r\n");
+    plain.prepare();
+    rlimit before{};
+    ASSERT_EQ(0, ::getrlimit(RLIMIT_FSIZE, &before));
+    auto* const handler = std::signal(SIGXFSZ, SIG_IGN);
+    const rlimit small{6, before.rlim_max};
+    std::int32_t status = -1;
+    {
+        const NothingLeft nothing;
+        const std::string name = "file";
+        DataChunk chunks[2];
+        for (DataChunk& chunk : chunks) {
+            chunk.length = 4;
+            std::memcpy(chunk.data, "abcd", 4);
+        }
+        ras1::configure("", "/dev/null");  // the trace must not be cut as well
+        ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &small));
+        BinaryDataTransfer(nullptr, 0, name.c_str(), 0, 1, 1, chunks, &status);
+        ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &before));
+        ras1::configureFromEnvironment();
+    }
+    std::signal(SIGXFSZ, handler);
+    EXPECT_EQ(5, status);
+    EXPECT_EQ("abcdab", scratch_.read("depot/file"));
 }
 
 TEST_F(TransferFaults, MakingTheDirectoryIsStatusSix) {
