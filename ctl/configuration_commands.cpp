@@ -66,9 +66,19 @@ std::string readFile(const std::string& path) {
     }
 }
 
+/// A host takes SETCONFIG for the universal agent as the import of a metafile, whatever the context
+/// says, and one without a metafile as done.
+void warnOfUniversalAgent(const std::string& product) {
+    if (product != "um" && product != "UM" && product != "Um" && product != "uM") return;
+    std::fprintf(stderr,
+                 "zavctl: note: the host changes nothing of the universal agent by this; "
+                 "ua-config imports metafiles\n");
+}
+
 QueuedCommand setCommand(const std::string& product, const std::string& target,
                          const std::string& text) {
     if (text.empty()) throw Failure(kWrongUsage, "the configuration is empty");
+    warnOfUniversalAgent(product);
     QueuedCommand command;
     command.request = request("SETCONFIG", product, target);
     command.request.context = text;

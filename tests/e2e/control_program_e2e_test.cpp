@@ -352,6 +352,20 @@ TEST(ControlProgram, WhatCannotBeReadIsWrongUsage) {
     }
 }
 
+TEST(ControlProgram, ANoteSaysThatSettingTheUniversalAgentsTextChangesNothing) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    for (const char* product : {"um", "UM", "ux"}) {
+        const ProgramResult result = host.zavctl({"config", "set", product, "A=1", "--no-wait"});
+        EXPECT_EQ(result.status, 0);
+        EXPECT_EQ(result.out, std::string("config set ") + product + ": accepted\n");
+        EXPECT_EQ(result.err, product == std::string("ux")
+                                  ? ""
+                                  : "zavctl: note: the host changes nothing of the universal agent "
+                                    "by this; ua-config imports metafiles\n");
+    }
+}
+
 TEST(ControlProgram, ARefusalIsSaidInWords) {
     ScriptHome home;
     ManagedHost host(home.path());
