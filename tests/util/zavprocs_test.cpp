@@ -10,6 +10,7 @@
 #include <cerrno>
 #include <cstring>
 
+#include "platform/fsi1.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 
@@ -177,6 +178,26 @@ TEST(PruneLogs, CountsFilesWithThePrefixOnly) {
     EXPECT_NE(home.exists("a_1"), home.exists("a_2"));
     EXPECT_TRUE(home.exists("b_a_3"));
     EXPECT_TRUE(home.exists("a_dir"));
+}
+
+TEST(PruneLogs, OfSeveralOldestLogsTheFirstListedGoes) {
+    const ScratchDir home;
+    for (const char* name : {"a_1", "a_2", "a_3"}) {
+        const timespec times[2] = {{5000, 0}, {5000, 0}};
+        ASSERT_EQ(0, ::utimensat(AT_FDCWD, home.write(name, "").c_str(), times, 0));
+    }
+    FSI1_LIST* list = nullptr;
+    ASSERT_EQ(FSI1_OK, FSI1_NewList(home.path().c_str(), &list));
+    std::vector<std::string> paths;
+    FSI1_ENTRY entry;
+    while (FSI1_FetchList(list, &entry) == FSI1_OK)
+        paths.emplace_back(entry.path);
+    FSI1_DeleteList(list);
+    ASSERT_EQ(3u, paths.size());
+    pruneLogs(home.path().c_str(), "a_", 3);
+    EXPECT_NE(0, ::access(paths[0].c_str(), F_OK));
+    EXPECT_EQ(0, ::access(paths[1].c_str(), F_OK));
+    EXPECT_EQ(0, ::access(paths[2].c_str(), F_OK));
 }
 
 TEST(PruneLogs, AMissingDirectoryIsTraced) {
