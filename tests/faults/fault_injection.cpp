@@ -20,7 +20,11 @@
 #include <cstdlib>
 #include <cstring>
 #include <ctime>
-#include <new>
+
+// The sanitizers own the allocator.
+#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
+#include "support/own_new.h"
+#endif
 
 using faults::Call;
 
@@ -441,25 +445,7 @@ char* strdup(const char* text) noexcept {
 
 }  // extern "C"
 
-// Not inlined: the compiler would take the blocks for malloc's own and warn of the mismatch.
-[[gnu::noinline]] void* operator new(std::size_t size) {
-    void* const block = fails(Call::kNew, nullptr) ? nullptr : __libc_malloc(size == 0 ? 1 : size);
-    if (block == nullptr) throw std::bad_alloc();
-    return block;
-}
-[[gnu::noinline]] void* operator new[](std::size_t size) {
-    return operator new(size);
-}
-[[gnu::noinline]] void operator delete(void* block) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete[](void* block) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete(void* block, std::size_t) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete[](void* block, std::size_t) noexcept {
-    std::free(block);
+void* memoryForNew(std::size_t size) noexcept {
+    return fails(Call::kNew, nullptr) ? nullptr : __libc_malloc(size);
 }
 #endif

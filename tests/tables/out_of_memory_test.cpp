@@ -1,12 +1,11 @@
-// Tables when memory runs out: what is answered, and that nothing is thrown at the framework. The
-// operator below serves this whole program.
+// Tables when memory runs out: what is answered, and that nothing is thrown at the framework.
 #include <gtest/gtest.h>
 
 #include <cstdlib>
 #include <cstring>
-#include <new>
 
 #include "embedded/oxa_internal.h"
+#include "support/own_new.h"
 #include "tables/zav01agt.h"
 #include "tables/zav02agt.h"
 #include "tables/zav03agt.h"
@@ -23,26 +22,8 @@ bool mayAllocate() {
 
 }  // namespace
 
-// Not inlined: the compiler would take the blocks for malloc's own and warn of the mismatch.
-[[gnu::noinline]] void* operator new(std::size_t size) {
-    void* const block = mayAllocate() ? std::malloc(size == 0 ? 1 : size) : nullptr;
-    if (block == nullptr) throw std::bad_alloc();
-    return block;
-}
-[[gnu::noinline]] void* operator new[](std::size_t size) {
-    return operator new(size);
-}
-[[gnu::noinline]] void operator delete(void* block) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete[](void* block) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete(void* block, std::size_t) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete[](void* block, std::size_t) noexcept {
-    std::free(block);
+void* memoryForNew(std::size_t size) noexcept {
+    return mayAllocate() ? std::malloc(size) : nullptr;
 }
 
 namespace {

@@ -25,6 +25,7 @@
 #include "platform/fsi1.h"
 #include "support/child_role.h"
 #include "support/clock.h"
+#include "support/own_new.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 #include "util/zavprocs.h"
@@ -187,26 +188,8 @@ int FSI1_DeleteList(FSI1_LIST* list) {
 
 }  // extern "C"
 
-[[gnu::noinline]] void* operator new(std::size_t size) {
-    if (faults.allocation > 0 && --faults.allocation == 0) throw std::bad_alloc();
-    void* const block = std::malloc(size);
-    if (block == nullptr) throw std::bad_alloc();
-    return block;
-}
-[[gnu::noinline]] void* operator new[](std::size_t size) {
-    return operator new(size);
-}
-[[gnu::noinline]] void operator delete(void* block) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete[](void* block) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete(void* block, std::size_t) noexcept {
-    std::free(block);
-}
-[[gnu::noinline]] void operator delete[](void* block, std::size_t) noexcept {
-    std::free(block);
+void* memoryForNew(std::size_t size) noexcept {
+    return faults.allocation > 0 && --faults.allocation == 0 ? nullptr : std::malloc(size);
 }
 
 using namespace ZAV;
