@@ -162,15 +162,6 @@ void compare(benchmark::State& state, const char* program, Peer peer, std::size_
     state.counters["p99_ratio"] = own.quantile(0.99) / others.quantile(0.99);
 }
 
-/// The cost of collecting an output of that many bytes.
-void collect(benchmark::State& state) {
-    const TemporaryFile file(std::string(static_cast<std::size_t>(state.range(0)), 'x'));
-    const ZAV::String command((std::string("/bin/cat ") + file.path()).c_str());
-    for (auto _ : state)
-        runCommand(command);
-    state.SetBytesProcessed(static_cast<std::int64_t>(state.iterations()) * state.range(0));
-}
-
 void add(const std::string& name, const char* program, Peer peer, std::size_t heapBytes,
          benchmark::IterationCount turns) {
     benchmark::RegisterBenchmark(
@@ -190,12 +181,6 @@ int main(int argc, char** argv) {
     add("spawn/1GiB", script.path(), runWithSpawn, kGiB, 200);
     add("fork/small", script.path(), runWithFork, 0, 500);
     add("fork/1GiB", script.path(), runWithFork, kGiB, 50);
-    benchmark::RegisterBenchmark("output", collect)
-        ->RangeMultiplier(2)
-        ->Range(16 << 10, 64 << 20)
-        ->Iterations(11)
-        ->UseRealTime()
-        ->Unit(benchmark::kMillisecond);
     benchmark::RunSpecifiedBenchmarks();
     benchmark::Shutdown();
     return 0;
