@@ -1,5 +1,8 @@
 // zavctl: sends a central server's requests to a managed host and shows how they ended.
 
+#include <poll.h>
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
 #include <clocale>
 #include <csignal>
@@ -67,13 +70,28 @@ int run(int argc, char** argv) {
     return status;
 }
 
+/// False when standard output is a pipe that nobody reads any more.
+bool isOutputRead() {
+    pollfd output{STDOUT_FILENO, 0, 0};
+    return ::poll(&output, 1, 0) == 0;
+}
+
+/// What could not be written is missed by its reader, on a full disk for instance; a reader that
+/// has read enough misses nothing.
+int withOutputWritten(int status) {
+    const bool written = std::fflush(stdout) == 0 && std::ferror(stdout) == 0;
+    if (written || status != ctl::kSuccess || !isOutputRead()) return status;
+    std::fprintf(stderr, "zavctl: the output could not be written\n");
+    return ctl::kWrongUsage;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
     std::setlocale(LC_CTYPE, "");
     std::signal(SIGPIPE, SIG_IGN);  // a host that goes away is an error of the write
     try {
-        return run(argc, argv);
+        return withOutputWritten(run(argc, argv));
     } catch (const ctl::Failure& failure) {
         std::fprintf(stderr, "zavctl: %s\n", failure.what());
         return failure.status();

@@ -352,6 +352,18 @@ TEST(ControlProgram, WhatCannotBeReadIsWrongUsage) {
     }
 }
 
+TEST(ControlProgram, OutputThatCannotBeWrittenIsNoSuccess) {
+    ScriptHome home;
+    ManagedHost host(home.path());
+    const std::string zavctl = zavctlPath() + " --socket " + host.socket();
+    const ProgramResult full = runProgram({"/bin/sh", "-c", zavctl + " query KAGDYST >/dev/full"});
+    EXPECT_EQ(full.status, 2);
+    EXPECT_EQ(full.err, "zavctl: the output could not be written\n");
+    const ProgramResult unread = runProgram(
+        {"/bin/sh", "-c", "{ sleep 1; " + zavctl + " query KAGDYST; echo $? >&2; } | true"});
+    EXPECT_EQ(unread.err, "0\n");
+}
+
 TEST(ControlProgram, ANoteSaysThatSettingTheUniversalAgentsTextChangesNothing) {
     ScriptHome home;
     ManagedHost host(home.path());
