@@ -22,10 +22,18 @@ for preset in "$@"; do
     cmake --build --preset "$preset" -- --quiet
 done
 if [ -n "$all" ]; then
-    echo "== fuzz: build and 20 seconds per target"
+    echo "== fuzz: build and 20 seconds per target; native: soak for two minutes meanwhile"
+    scripts/soak.sh 2 >build/soak.log 2>&1 &
+    soak=$!
+    trap 'kill "$soak" 2>/dev/null' EXIT
+    trap 'exit 130' HUP INT TERM
     scripts/fuzz.sh --short
-    echo "== native: soak for two minutes"
-    scripts/soak.sh 2
+    wait "$soak" || {
+        cat build/soak.log
+        exit 1
+    }
+    trap - EXIT
+    tail -n 25 build/soak.log
 fi
 for preset in "$@"; do
     echo "== $preset: test"
