@@ -1,5 +1,4 @@
 // Where the central server keeps its package depot.
-#include <sys/resource.h>
 
 #include <chrono>
 #include <string>
@@ -149,19 +148,6 @@ TEST_F(DepotHome, MissingConfigurationIsReportedInTheCommandsWords) {
     ASSERT_EQ(errors.size(), 3u);
     EXPECT_THAT(errors[1], ::testing::StartsWith("Error message is: grep: "));
     EXPECT_THAT(errors[1], ::testing::HasSubstr("kmsenv"));
-}
-
-TEST_F(DepotHome, CommandThatCannotBeStartedGivesNoName) {
-    rlimit before{};
-    ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
-    const rlimit none{0, before.rlim_max};
-    String dir((scratch.path() + "/").c_str());
-    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
-    const int rc = Util::getDepotHome(dir, false, false);
-    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
-    EXPECT_EQ(rc, 2);
-    EXPECT_EQ(dir, (scratch.path() + "/").c_str());
-    EXPECT_THAT(own('E'), ElementsAre("Unable to determine CMS name, process failed to start"));
 }
 
 TEST_F(DepotHome, LongErrorMessageIsReadWhole) {
