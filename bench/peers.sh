@@ -99,6 +99,13 @@ start_rsync() {
     await answers "$rsync_port"
 }
 
+# have_pages MIB: lets the kernel have that much free memory at hand. A virtual machine may have given
+# it back to the machine below, and the first to write to it again would pay for that.
+have_pages() {
+    head -c "$1M" /dev/zero >"$scratch/pages"
+    rm "$scratch/pages"
+}
+
 # now: nanoseconds since 1970.
 now() { date +%s%N; }
 

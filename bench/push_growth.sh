@@ -34,6 +34,7 @@ start_host "$build"
 push() { # prints nanoseconds
     local from
     rm -f "$scratch/depot/file"
+    have_pages "$size"
     from=$(now)
     "$build/bin/zavctl" --socket "$host_socket" push "$scratch/file" >>"$scratch/log" 2>&1
     echo $(($(now) - from))

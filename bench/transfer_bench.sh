@@ -61,6 +61,7 @@ run() {          # WHAT WAY
     local from to where=target
     [ "$2" != push ] || where=depot
     rm -rf "$scratch/target/$1" "$scratch/depot/$1"
+    have_pages "$mib"
     from=$(now)
     "$2" "$scratch/source/$1" >"$scratch/out" 2>&1 || { cat "$scratch/out" >&2; exit 1; }
     to=$(now)
