@@ -69,7 +69,8 @@ void startAgents(const ManagedHost& host, int count) {
     ASSERT_EQ(result.status, 0) << result.err;
     int failed = 0;
     const json events = json::parse(result.out)["events"];
-    for (const json& event : events) failed += event["RETVAL"] == 0 ? 0 : 1;
+    for (const json& event : events)
+        failed += event["RETVAL"] == 0 ? 0 : 1;
     EXPECT_EQ(failed, count / 2);
 }
 

@@ -12,9 +12,9 @@ enum : int {
 
 /// One entry of a directory.
 struct FSI1_ENTRY {
-    char path[4096];          ///< directory, "/" (one) and file name, 0-terminated
-    std::int64_t timeStamp;   ///< last modification, seconds since the epoch
-    bool isDirectory;         ///< true for directories; links are followed if they lead anywhere
+    char path[4096];         ///< directory, "/" (one) and file name, 0-terminated
+    std::int64_t timeStamp;  ///< last modification, seconds since the epoch
+    bool isDirectory;        ///< true for directories; links are followed if they lead anywhere
 };
 
 /// An open listing; owned by the facility.

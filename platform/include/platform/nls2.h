@@ -8,15 +8,15 @@ struct NLS2_LOCALE;
 
 enum : int {
     NLS2_OK = 0,
-    NLS2_NO_LOCALE = 1,        ///< the handle is null, or no such locale or code page
-    NLS2_SUBSTITUTED = 2,      ///< something had no counterpart and was replaced
-    NLS2_TRUNCATED = 3,        ///< the output had no room for everything
+    NLS2_NO_LOCALE = 1,    ///< the handle is null, or no such locale or code page
+    NLS2_SUBSTITUTED = 2,  ///< something had no counterpart and was replaced
+    NLS2_TRUNCATED = 3,    ///< the output had no room for everything
 };
 
 /// Selectors of NLS2_GetLocale.
 enum : int {
-    NLS2_BY_DEFAULT = 0,           ///< the process's own locale
-    NLS2_BY_CODEPAGE = 25690123,   ///< 0x0188000B: the code page in the second argument
+    NLS2_BY_DEFAULT = 0,          ///< the process's own locale
+    NLS2_BY_CODEPAGE = 25690123,  ///< 0x0188000B: the code page in the second argument
 };
 
 /// Code page numbers that callers name.

@@ -10,17 +10,17 @@
 
 /// Bits of a unit's flags and, one at a time, the level of a line.
 enum : unsigned {
-    RAS1_DETAIL = 1,    ///< what a function found out and did
-    RAS1_FLOW = 64,     ///< entry to and exit from functions
-    RAS1_ERROR = 128,   ///< failures; on unless the facility is told otherwise
+    RAS1_DETAIL = 1,   ///< what a function found out and did
+    RAS1_FLOW = 64,    ///< entry to and exit from functions
+    RAS1_ERROR = 128,  ///< failures; on unless the facility is told otherwise
 };
 
 /// One source unit as the facility sees it. Constant-initialised, so it may be used by static
 /// initialisers of other units.
 struct RAS1_UNIT {
-    const char* name;                        ///< such as "zavtasks"; selected by this name
-    std::atomic<unsigned> flags{0};          ///< owned by the facility
-    std::atomic<unsigned> generation{0};     ///< owned by the facility; 0 = flags not worked out
+    const char* name;                     ///< such as "zavtasks"; selected by this name
+    std::atomic<unsigned> flags{0};       ///< owned by the facility
+    std::atomic<unsigned> generation{0};  ///< owned by the facility; 0 = flags not worked out
 
     constexpr explicit RAS1_UNIT(const char* unitName) : name(unitName) {}
 };
