@@ -10,9 +10,9 @@
 #include <string>
 #include <vector>
 
-#include "ctl/commands.h"
-#include "ctl/options.h"
-#include "ctl/outcome.h"
+#include "ctl/client/failure.h"
+#include "ctl/client/options.h"
+#include "ctl/verbs/commands.h"
 
 namespace {
 

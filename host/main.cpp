@@ -9,14 +9,14 @@
 
 #include "embedded/ncs_host.h"
 #include "embedded/oxa_host.h"
-#include "host/code_page.h"
-#include "host/end_signals.h"
-#include "host/host_options.h"
-#include "host/http_server.h"
-#include "host/plugin_loader.h"
-#include "host/process_setup.h"
-#include "host/socket_file.h"
-#include "host/start_error.h"
+#include "host/http/server.h"
+#include "host/process/end_signals.h"
+#include "host/process/options.h"
+#include "host/process/plugin_loader.h"
+#include "host/process/setup.h"
+#include "host/process/socket_file.h"
+#include "host/process/start_error.h"
+#include "host/tables/code_page.h"
 
 namespace host {
 namespace {

@@ -1,6 +1,6 @@
-#include "ctl/condition_text.h"
+#include "ctl/client/condition_text.h"
 
-#include "ctl/outcome.h"
+#include "ctl/client/failure.h"
 
 namespace {
 

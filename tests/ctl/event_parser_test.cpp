@@ -1,4 +1,4 @@
-#include "ctl/event_parser.h"
+#include "ctl/client/event_parser.h"
 
 namespace {
 

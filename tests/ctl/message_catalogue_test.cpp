@@ -1,4 +1,4 @@
-#include "ctl/message_catalogue.h"
+#include "ctl/show/message_catalogue.h"
 
 #include <set>
 

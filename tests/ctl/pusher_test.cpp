@@ -1,4 +1,4 @@
-#include "ctl/pusher.h"
+#include "ctl/client/pusher.h"
 
 #include <gtest/gtest.h>
 

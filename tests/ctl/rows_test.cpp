@@ -1,4 +1,4 @@
-#include "ctl/rows.h"
+#include "ctl/show/rows.h"
 
 #include <nlohmann/json.hpp>
 

@@ -1,4 +1,4 @@
-#include "ctl/rpc_wire.h"
+#include "ctl/client/rpc_wire.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

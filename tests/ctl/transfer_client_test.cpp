@@ -1,5 +1,5 @@
 // ctest-label: threaded
-#include "ctl/transfer_client.h"
+#include "ctl/client/transfer_client.h"
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
@@ -12,7 +12,7 @@
 #include <functional>
 #include <thread>
 
-#include "ctl/outcome.h"
+#include "ctl/client/failure.h"
 #include "support/scratch_dir.h"
 
 namespace {

@@ -5,8 +5,8 @@
 #include <cstring>
 #include <vector>
 
-#include "ctl/event_parser.h"
-#include "ctl/rpc_wire.h"
+#include "ctl/client/event_parser.h"
+#include "ctl/client/rpc_wire.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;

@@ -3,8 +3,8 @@
 
 #include <nlohmann/json.hpp>
 
-#include "host/json_documents.h"
-#include "host/router.h"
+#include "host/api/router.h"
+#include "host/tables/json_documents.h"
 #include "platform/sample_table.h"
 #include "support/fuzz_support.h"
 

@@ -3,8 +3,8 @@
 #include <iterator>
 #include <nlohmann/json.hpp>
 
-#include "host/code_page.h"
-#include "host/url.h"
+#include "host/http/url.h"
+#include "host/tables/code_page.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;

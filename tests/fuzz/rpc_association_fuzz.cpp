@@ -8,7 +8,7 @@
 #include <cstring>
 #include <vector>
 
-#include "embedded/ncs_association.h"
+#include "ncs/association.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;

@@ -1,10 +1,10 @@
-#include "host/code_page.h"
+#include "host/tables/code_page.h"
 
 #include <gtest/gtest.h>
 
 #include <clocale>
 
-#include "host/start_error.h"
+#include "host/process/start_error.h"
 
 namespace {
 

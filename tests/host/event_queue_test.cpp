@@ -1,4 +1,4 @@
-#include "host/event_queue.h"
+#include "host/outcomes/event_queue.h"
 
 #include <gtest/gtest.h>
 

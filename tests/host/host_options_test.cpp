@@ -1,4 +1,4 @@
-#include "host/host_options.h"
+#include "host/process/options.h"
 
 #include <gtest/gtest.h>
 
@@ -6,7 +6,7 @@
 #include <map>
 #include <vector>
 
-#include "host/start_error.h"
+#include "host/process/start_error.h"
 #include "support/scratch_dir.h"
 
 namespace {

@@ -1,4 +1,4 @@
-#include "host/json_documents.h"
+#include "host/tables/json_documents.h"
 
 #include <gtest/gtest.h>
 

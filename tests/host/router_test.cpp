@@ -1,4 +1,4 @@
-#include "host/router.h"
+#include "host/api/router.h"
 
 #include <gtest/gtest.h>
 

@@ -11,10 +11,10 @@
 #include <string>
 #include <thread>
 
-#include "host/http_server.h"
+#include "host/http/server.h"
 #include "host/made_up_table.h"
+#include "host/process/socket_file.h"
 #include "host/raw_client.h"
-#include "host/socket_file.h"
 #include "support/scratch_dir.h"
 
 /// Holds samples until it is opened; opened at the latest when the test ends.

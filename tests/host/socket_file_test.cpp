@@ -1,4 +1,4 @@
-#include "host/socket_file.h"
+#include "host/process/socket_file.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -7,8 +7,8 @@
 
 #include <optional>
 
+#include "host/process/start_error.h"
 #include "host/raw_client.h"
-#include "host/start_error.h"
 #include "support/scratch_dir.h"
 
 namespace {

@@ -1,5 +1,5 @@
 // ctest-label: threaded
-#include "host/task_watch.h"
+#include "host/outcomes/task_watch.h"
 
 #include <gtest/gtest.h>
 

@@ -1,4 +1,4 @@
-#include "host/url.h"
+#include "host/http/url.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

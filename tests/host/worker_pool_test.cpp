@@ -1,5 +1,5 @@
 // ctest-label: threaded
-#include "host/worker_pool.h"
+#include "host/http/worker_pool.h"
 
 #include <gtest/gtest.h>
 

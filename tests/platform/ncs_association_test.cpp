@@ -1,4 +1,4 @@
-#include "embedded/ncs_association.h"
+#include "ncs/association.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -7,7 +7,7 @@
 #include <random>
 #include <string>
 
-#include "embedded/ncs_memory.h"
+#include "ncs/memory.h"
 #include "platform/ncs_packets.h"
 #include "support/trace_capture.h"
 

@@ -1,5 +1,5 @@
 // ctest-label: threaded
-#include "embedded/ncs_memory.h"
+#include "ncs/memory.h"
 
 #include <gtest/gtest.h>
 
@@ -9,7 +9,7 @@
 #include <thread>
 #include <vector>
 
-#include "embedded/ncs_stub_buffer.h"
+#include "ncs/stub_buffer.h"
 #include "platform/ncs.h"
 
 namespace {

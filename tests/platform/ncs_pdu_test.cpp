@@ -1,10 +1,10 @@
-#include "embedded/ncs_pdu.h"
+#include "ncs/pdu.h"
 
 #include <gtest/gtest.h>
 
 #include <string>
 
-#include "embedded/ncs_registry.h"
+#include "ncs/registry.h"
 #include "platform/ncs_packets.h"
 
 namespace {

@@ -23,7 +23,7 @@
 #include <vector>
 
 #include "embedded/ncs_host.h"
-#include "embedded/ncs_memory.h"
+#include "ncs/memory.h"
 #include "platform/ncs_packets.h"
 #include "support/scratch_dir.h"
 

@@ -12,7 +12,7 @@
 #include <random>
 #include <thread>
 
-#include "embedded/nls2_codepages.h"
+#include "nls2/codepages.h"
 
 namespace {
 

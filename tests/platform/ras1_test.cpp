@@ -17,7 +17,7 @@
 #include <vector>
 
 #include "embedded/ras1_control.h"
-#include "embedded/ras1_selection.h"
+#include "ras1/selection.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 

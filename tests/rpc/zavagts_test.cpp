@@ -2,7 +2,7 @@
 
 #include <cstring>
 
-#include "embedded/ncs_registry.h"
+#include "ncs/registry.h"
 
 namespace {
 

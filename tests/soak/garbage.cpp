@@ -1,6 +1,6 @@
 #include "soak/garbage.h"
 
-#include "ctl/rpc_wire.h"
+#include "ctl/client/rpc_wire.h"
 #include "soak/http_text.h"
 
 namespace soak {

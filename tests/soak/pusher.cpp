@@ -4,7 +4,7 @@
 #include <cstdio>
 #include <cstring>
 
-#include "ctl/rpc_wire.h"
+#include "ctl/client/rpc_wire.h"
 
 namespace soak {
 namespace {

@@ -4,7 +4,7 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "embedded/oxa_internal.h"
+#include "oxa/internal.h"
 #include "support/own_new.h"
 #include "tables/zav01agt.h"
 #include "tables/zav02agt.h"

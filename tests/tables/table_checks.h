@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "embedded/oxa_internal.h"
+#include "oxa/internal.h"
 #include "platform/oxa.h"
 
 /// A column as requesters must find it.

@@ -1,0 +1,229 @@
+#include "ctl/client/transfer_client.h"
+
+#include <sys/socket.h>
+#include <sys/time.h>
+#include <sys/uio.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+
+#include "ctl/client/failure.h"
+
+namespace ctl {
+namespace {
+
+constexpr int kFragmentsAtATime = 16;
+
+Failure broken() {
+    if (errno == EAGAIN || errno == EWOULDBLOCK) {
+        return {kNoOutcome, "the host did not take the file within the time-out"};
+    }
+    return {kNoHost, std::string("the connection to the host broke: ") + std::strerror(errno)};
+}
+
+void setTimeout(int descriptor, std::chrono::milliseconds timeout) {
+    // Nothing at all would mean without end.
+    timeout = std::max(timeout, std::chrono::milliseconds(1));
+    timeval limit{};
+    limit.tv_sec = static_cast<time_t>(timeout.count() / 1000);
+    limit.tv_usec = static_cast<suseconds_t>(timeout.count() % 1000 * 1000);
+    ::setsockopt(descriptor, SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
+    ::setsockopt(descriptor, SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof limit);
+}
+
+/// Sends what the pieces hold, changing them on the way.
+void sendPieces(int descriptor, std::vector<iovec>& pieces) {
+    std::size_t at = 0;
+    while (at < pieces.size()) {
+        msghdr message{};
+        message.msg_iov = &pieces[at];
+        message.msg_iovlen = pieces.size() - at;
+        const ssize_t sent = ::sendmsg(descriptor, &message, MSG_NOSIGNAL);
+        if (sent == -1 && errno == EINTR) continue;
+        if (sent == -1) throw broken();
+        auto bytes = static_cast<std::size_t>(sent);
+        while (at < pieces.size() && pieces[at].iov_len <= bytes)
+            bytes -= pieces[at++].iov_len;
+        if (at == pieces.size()) break;
+        pieces[at].iov_base = static_cast<char*>(pieces[at].iov_base) + bytes;
+        pieces[at].iov_len -= bytes;
+    }
+}
+
+/// Walks over a request's data, which stands in two places.
+class RequestData {
+public:
+    RequestData(const std::vector<unsigned char>& head, const ChunkBatch& batch)
+        : parts_{{const_cast<unsigned char*>(head.data()), head.size()},
+                 {const_cast<unsigned char*>(batch.data()), batch.size()}} {}
+
+    std::size_t total() const { return parts_[0].iov_len + parts_[1].iov_len; }
+
+    /// Adds pieces for the next `length` bytes.
+    void take(std::size_t length, std::vector<iovec>& pieces) {
+        while (length > 0) {
+            iovec& part = parts_[0].iov_len > 0 ? parts_[0] : parts_[1];
+            const std::size_t count = std::min(length, part.iov_len);
+            pieces.push_back({part.iov_base, count});
+            part.iov_base = static_cast<char*>(part.iov_base) + count;
+            part.iov_len -= count;
+            length -= count;
+        }
+    }
+
+private:
+    iovec parts_[2];
+};
+
+}  // namespace
+
+ChunkBatch::ChunkBatch() : bytes_(kMostChunks * kChunkSize) {}
+
+std::size_t ChunkBatch::read(int descriptor, const std::string& name) {
+    std::size_t total = 0;
+    while (total < kMostChunks * kChunkData) {
+        iovec places[kMostChunks];
+        int count = 0;
+        for (std::size_t at = total; at < kMostChunks * kChunkData;) {
+            const std::size_t within = at % kChunkData;
+            unsigned char* const place = &bytes_[at / kChunkData * kChunkSize + 4 + within];
+            places[count++] = {place, kChunkData - within};
+            at += kChunkData - within;
+        }
+        const ssize_t length = ::readv(descriptor, places, count);
+        if (length == -1 && errno == EINTR) continue;
+        if (length == -1)
+            throw Failure(kWrongUsage, "cannot read " + name + ": " + std::strerror(errno));
+        if (length == 0) break;
+        total += static_cast<std::size_t>(length);
+    }
+    putLengths(total);
+    return total;
+}
+
+void ChunkBatch::putLengths(std::size_t total) {
+    count_ =
+        static_cast<std::uint16_t>(std::max<std::size_t>(1, (total + kChunkData - 1) / kChunkData));
+    for (std::size_t i = 0; i < count_; ++i) {
+        unsigned char* const chunk = &bytes_[i * kChunkSize];
+        const std::size_t length = std::min(kChunkData, total - std::min(total, i * kChunkData));
+        for (unsigned byte = 0; byte < 4; ++byte) {
+            chunk[byte] = static_cast<unsigned char>(length >> (8 * byte));
+        }
+        // What an earlier batch left there is nobody's business.
+        std::fill(chunk + 4 + length, chunk + kChunkSize, static_cast<unsigned char>(0));
+    }
+}
+
+TransferClient::TransferClient(const std::string& socketPath, std::chrono::milliseconds timeout)
+    : descriptor_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    if (descriptor_ == -1) throw broken();
+    try {
+        setTimeout(descriptor_, timeout);
+        connect(socketPath);
+        bind();
+    } catch (...) {
+        ::close(descriptor_);
+        throw;
+    }
+}
+
+TransferClient::~TransferClient() {
+    ::close(descriptor_);
+}
+
+void TransferClient::connect(const std::string& path) {
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    if (path.size() >= sizeof address.sun_path) {
+        throw Failure(kWrongUsage, "the socket's path is too long: " + path);
+    }
+    std::memcpy(address.sun_path, path.c_str(), path.size());
+    if (::connect(descriptor_, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+        throw Failure(kNoHost, "no host reached at " + path + ": " + std::strerror(errno));
+    }
+}
+
+void TransferClient::bind() {
+    const std::vector<unsigned char> request = rpc::bindPacket(nextCall_++);
+    sendAll(request.data(), request.size());
+    const Packet answer = readPacket();
+    std::uint16_t largestFragment = 0;
+    if (answer.header.type != rpc::kBindAck ||
+        !rpc::parseBindAck(answer.body, answer.header.littleEndian, largestFragment)) {
+        throw Failure(kNoHost, "the host does not offer file transfer");
+    }
+    largestData_ = std::min(largestFragment, rpc::kLargestFragment) - rpc::kRequestHeader;
+}
+
+void TransferClient::send(const std::string& name, bool firstBatch, const ChunkBatch& batch) {
+    const std::vector<unsigned char> head = rpc::transferHead(name, firstBatch, batch.count());
+    RequestData data(head, batch);
+    const std::size_t total = data.total();
+    const std::uint32_t call = nextCall_++;
+    std::array<std::array<unsigned char, rpc::kRequestHeader>, kFragmentsAtATime> headers{};
+    for (std::size_t at = 0; at < total;) {
+        std::vector<iovec> pieces;
+        for (std::size_t i = 0; i < headers.size() && at < total; ++i) {
+            const std::size_t length = std::min(largestData_, total - at);
+            std::uint8_t flags = 0;
+            if (at == 0) flags |= rpc::kFirstFragment;
+            if (at + length == total) flags |= rpc::kLastFragment;
+            headers[i] = rpc::requestHeader(call, flags, length, total);
+            pieces.push_back({headers[i].data(), headers[i].size()});
+            data.take(length, pieces);
+            at += length;
+        }
+        sendPieces(descriptor_, pieces);
+    }
+}
+
+TransferAnswer TransferClient::receive() {
+    const Packet packet = readPacket();
+    TransferAnswer answer;
+    // Behind the common header stand the allocation hint, context and cancel count: 8 bytes; then
+    // the result of a response or the status of a fault.
+    if (packet.body.size() < 12) throw Failure(kNoHost, "the host's answer makes no sense");
+    const std::uint32_t value = rpc::number32(packet.body.data() + 8, packet.header.littleEndian);
+    if (packet.header.type == rpc::kResponse) {
+        answer.status = static_cast<std::int32_t>(value);
+    } else if (packet.header.type == rpc::kFault) {
+        answer.fault = value;
+    } else {
+        throw Failure(kNoHost, "the host's answer makes no sense");
+    }
+    return answer;
+}
+
+void TransferClient::sendAll(const unsigned char* data, std::size_t length) {
+    std::vector<iovec> pieces = {{const_cast<unsigned char*>(data), length}};
+    sendPieces(descriptor_, pieces);
+}
+
+TransferClient::Packet TransferClient::readPacket() {
+    unsigned char bytes[rpc::kCommonHeader];
+    readAll(bytes, sizeof bytes);
+    Packet packet;
+    if (!rpc::parseCommonHeader(bytes, packet.header)) {
+        throw Failure(kNoHost, "the host's answer makes no sense");
+    }
+    packet.body.resize(packet.header.fragmentLength - rpc::kCommonHeader);
+    readAll(packet.body.data(), packet.body.size());
+    return packet;
+}
+
+void TransferClient::readAll(unsigned char* data, std::size_t length) {
+    while (length > 0) {
+        const ssize_t got = ::recv(descriptor_, data, length, 0);
+        if (got == -1 && errno == EINTR) continue;
+        if (got == -1) throw broken();
+        if (got == 0) throw Failure(kNoHost, "the host closed the connection");
+        data += got;
+        length -= static_cast<std::size_t>(got);
+    }
+}
+
+}  // namespace ctl

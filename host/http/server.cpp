@@ -1,0 +1,193 @@
+#include "host/http/server.h"
+
+#include <fcntl.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <boost/asio/posix/stream_descriptor.hpp>
+#include <boost/asio/post.hpp>
+#include <boost/asio/steady_timer.hpp>
+#include <cerrno>
+#include <exception>
+#include <utility>
+
+#include "host/http/server_core.h"
+#include "host/http/session.h"
+#include "host/process/file_descriptor.h"
+#include "host/process/start_error.h"
+
+namespace host {
+namespace {
+
+namespace net = boost::asio;
+using Clock = std::chrono::steady_clock;
+using Error = boost::system::error_code;
+
+/// How long accepting pauses when the process is out of descriptors.
+constexpr std::chrono::milliseconds kAcceptPause{100};
+/// How often a server that ends looks whether all is done.
+constexpr std::chrono::milliseconds kEndPoll{10};
+/// How long clients have to take what is left for them once the task in hand has ended.
+constexpr std::chrono::milliseconds kFlushTime{1'000};
+
+int duplicate(int descriptor) {
+    const int copy = ::fcntl(descriptor, F_DUPFD_CLOEXEC, 0);
+    if (copy < 0) throw StartError("out of file descriptors");
+    return copy;
+}
+
+/// Processes of the own user and of root may connect, whatever became of the socket's mode.
+bool mayConnect(int connection) {
+    ucred peer{};
+    socklen_t length = sizeof peer;
+    if (::getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &length) != 0) return false;
+    return peer.uid == ::geteuid() || peer.uid == 0;
+}
+
+}  // namespace
+
+struct HttpServer::Implementation {
+    Implementation(int listenerDescriptor, Router router, std::string home,
+                   const ServerLimits& limits)
+        : core(std::move(router), std::move(home), limits),
+          listener(core.io, duplicate(listenerDescriptor)),
+          signal(core.io),
+          timer(core.io) {}
+
+    void awaitConnection();
+    void acceptAll();
+    void admit(FileDescriptor connection);
+    void beginEnd(std::chrono::milliseconds grace);
+    void pollEnd();
+    void pollFlush(Clock::time_point deadline);
+    template <typename Next>
+    void after(std::chrono::milliseconds time, Next next);
+
+    ServerCore core;
+    net::posix::basic_stream_descriptor<net::io_context::executor_type> listener;
+    net::posix::basic_stream_descriptor<net::io_context::executor_type> signal;
+    net::basic_waitable_timer<Clock, net::wait_traits<Clock>, net::io_context::executor_type> timer;
+    Clock::time_point deadline;
+};
+
+void HttpServer::Implementation::awaitConnection() {
+    listener.async_wait(net::posix::descriptor_base::wait_read, [this](Error error) {
+        if (!error && !core.ending) acceptAll();
+    });
+}
+
+/// Not the library's own accept, which makes descriptors that the plug-in's children inherit.
+void HttpServer::Implementation::acceptAll() {
+    while (true) {
+        FileDescriptor connection(
+            ::accept4(listener.native_handle(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+        if (connection) {
+            admit(std::move(connection));
+        } else if (errno == EAGAIN || errno == EWOULDBLOCK) {
+            return awaitConnection();
+        } else if (errno != EINTR && errno != ECONNABORTED) {
+            // Out of descriptors or memory: the connection stays readable, so waiting for it would
+            // spin.
+            return after(kAcceptPause, [this] {
+                if (!core.ending) acceptAll();
+            });
+        }
+    }
+}
+
+void HttpServer::Implementation::admit(FileDescriptor connection) {
+    const bool allowed = mayConnect(connection.get());
+    const bool full = core.connections.size() - core.refusals >= core.limits.connections;
+    if ((!allowed || full) && core.refusals >= core.limits.refusals) return;
+    Stream stream(core.io.get_executor());
+    Error error;
+    stream.socket().assign(net::local::stream_protocol(), connection.get(), error);
+    if (error) return;
+    connection.release();
+    const auto session = std::make_shared<HttpSession>(core, std::move(stream));
+    if (!allowed) return session->refuse(403, "this host serves its own user only");
+    if (full) return session->refuse(503, "too many connections are open");
+    session->serve();
+}
+
+template <typename Next>
+void HttpServer::Implementation::after(std::chrono::milliseconds time, Next next) {
+    timer.expires_after(time);
+    timer.async_wait([next](Error error) {
+        if (!error) next();
+    });
+}
+
+void HttpServer::Implementation::beginEnd(std::chrono::milliseconds grace) {
+    if (core.ending) return;
+    core.ending = true;
+    deadline = Clock::now() + grace;
+    // Who comes now is turned away at once instead of waiting for nobody.
+    ::shutdown(listener.native_handle(), SHUT_RDWR);
+    Error ignored;
+    listener.close(ignored);
+    std::vector<std::shared_ptr<Connection>> open;
+    for (const auto& entry : core.connections)
+        open.push_back(entry.second);
+    for (const auto& connection : open)
+        connection->prepareForEnd();
+    // Waits for the table's lock, which a dispatch in progress holds for a moment.
+    core.watch.holdAfterTask();
+    pollEnd();
+}
+
+void HttpServer::Implementation::pollEnd() {
+    const auto now = Clock::now();
+    if (core.watch.quiet() || now >= deadline) {
+        return pollFlush(std::min(deadline, now + kFlushTime));
+    }
+    after(kEndPoll, [this] { pollEnd(); });
+}
+
+void HttpServer::Implementation::pollFlush(Clock::time_point flushDeadline) {
+    const bool done = std::all_of(core.connections.begin(), core.connections.end(),
+                                  [](const auto& entry) { return entry.second->quiet(); });
+    if (done || Clock::now() >= flushDeadline) return core.io.stop();
+    after(kEndPoll, [this, flushDeadline] { pollFlush(flushDeadline); });
+}
+
+HttpServer::HttpServer(int listener, Router router, std::string home, const ServerLimits& limits)
+    : implementation_(
+          std::make_unique<Implementation>(listener, std::move(router), std::move(home), limits)) {
+    implementation_->awaitConnection();
+}
+
+HttpServer::~HttpServer() = default;
+
+void HttpServer::run() {
+    net::io_context& io = implementation_->core.io;
+    while (!io.stopped()) {
+        try {
+            io.run();
+        } catch (const std::exception&) {
+            // Memory ran out in one connection's handler, which ends that connection's chain of
+            // operations; the others are served on.
+        }
+    }
+}
+
+void HttpServer::stop() {
+    implementation_->core.io.stop();
+}
+
+void HttpServer::end(std::chrono::milliseconds grace) {
+    Implementation& implementation = *implementation_;
+    net::post(implementation.core.io, [&implementation, grace] { implementation.beginEnd(grace); });
+}
+
+void HttpServer::endWhenReadable(int descriptor, std::chrono::milliseconds grace) {
+    Implementation& implementation = *implementation_;
+    implementation.signal.assign(duplicate(descriptor));
+    implementation.signal.async_wait(net::posix::descriptor_base::wait_read,
+                                     [&implementation, grace](Error error) {
+                                         if (!error) implementation.beginEnd(grace);
+                                     });
+}
+
+}  // namespace host

@@ -1,0 +1,76 @@
+#include "host/http/worker_pool.h"
+
+#include <string>
+#include <system_error>
+#include <utility>
+
+#include "host/process/start_error.h"
+
+namespace host {
+
+WorkerPool::WorkerPool(std::size_t threads, std::size_t queueLimit) : queueLimit_(queueLimit) {
+    try {
+        for (std::size_t i = 0; i < threads; ++i)
+            threads_.emplace_back([this] { work(); });
+    } catch (const std::system_error& error) {
+        stop();
+        throw StartError(std::string("cannot start a thread: ") + error.what());
+    }
+    // The threads count themselves as free; nobody is to find a pool without free threads.
+    embedded::MutexLock lock(lock_);
+    while (idle_ != threads)
+        lock.wait(changed_);
+}
+
+WorkerPool::~WorkerPool() {
+    stop();
+}
+
+void WorkerPool::stop() {
+    std::deque<Job> dropped;
+    {
+        const embedded::MutexLock lock(lock_);
+        stopping_ = true;
+        dropped.swap(queue_);
+    }
+    changed_.notify_all();
+    for (std::thread& thread : threads_)
+        thread.join();
+    threads_.clear();
+}
+
+bool WorkerPool::submit(Job job) {
+    {
+        const embedded::MutexLock lock(lock_);
+        // A job that a free thread is about to take does not count as waiting.
+        if (stopping_ || queue_.size() >= queueLimit_ + idle_) return false;
+        queue_.push_back(std::move(job));
+    }
+    changed_.notify_one();
+    return true;
+}
+
+void WorkerPool::work() {
+    embedded::MutexLock lock(lock_);
+    ++idle_;
+    changed_.notify_all();
+    while (true) {
+        while (!stopping_ && queue_.empty())
+            lock.wait(changed_);
+        if (stopping_) return;
+        Job job = std::move(queue_.front());
+        queue_.pop_front();
+        --idle_;
+        lock.unlock();
+        try {
+            job();
+        } catch (...) {
+            // Nothing is known about the job; whoever gave it hears about failures from itself.
+        }
+        job = nullptr;  // releases what it holds before the thread waits again
+        lock.lock();
+        ++idle_;
+    }
+}
+
+}  // namespace host

@@ -1,0 +1,143 @@
+#include "host/process/socket_file.h"
+
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+
+#include <cerrno>
+#include <cstring>
+#include <system_error>
+
+#include "host/process/start_error.h"
+
+namespace host {
+namespace {
+
+[[noreturn]] void fail(const std::string& what, int error) {
+    throw StartError(what + ": " + std::generic_category().message(error));
+}
+
+[[noreturn]] void failInUse(const std::string& path) {
+    throw StartError("socket " + path + " is in use by a live host");
+}
+
+sockaddr_un addressOf(const std::string& path) {
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    if (path.size() >= sizeof address.sun_path) {
+        throw StartError("socket name " + path + " is longer than " +
+                         std::to_string(sizeof address.sun_path - 1) + " bytes");
+    }
+    path.copy(address.sun_path, path.size());
+    return address;
+}
+
+const sockaddr* generic(const sockaddr_un& address) {
+    return reinterpret_cast<const sockaddr*>(&address);
+}
+
+FileDescriptor newSocket(const std::string& path) {
+    FileDescriptor made(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+    if (!made) fail("socket " + path, errno);
+    return made;
+}
+
+/// True when the open file still stands under its name: its last holder removes it, and a lock on
+/// a file that others no longer find guards nothing.
+bool isStill(int descriptor, const std::string& name) {
+    struct stat opened {};
+    struct stat named {};
+    return ::fstat(descriptor, &opened) == 0 && ::lstat(name.c_str(), &named) == 0 &&
+           opened.st_dev == named.st_dev && opened.st_ino == named.st_ino;
+}
+
+FileDescriptor takeLock(const std::string& path) {
+    const std::string name = path + ".lock";
+    while (true) {
+        FileDescriptor lock(
+            ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
+        if (!lock) fail("cannot make " + name, errno);
+        if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
+            if (errno == EWOULDBLOCK) failInUse(path);
+            if (errno == EINTR) continue;
+            fail("cannot lock " + name, errno);
+        }
+        if (isStill(lock.get(), name)) return lock;
+    }
+}
+
+}  // namespace
+
+SocketFile::SocketFile(const std::string& path) : path_(path) {
+    addressOf(path_);  // before the lock file is made for a name that cannot be
+    lock_ = takeLock(path_);
+    try {
+        replaceStale();
+        bind();
+    } catch (...) {
+        remove();
+        throw;
+    }
+}
+
+SocketFile::~SocketFile() {
+    remove();
+}
+
+void SocketFile::replaceStale() const {
+    struct stat found {};
+    if (::lstat(path_.c_str(), &found) != 0) {
+        if (errno == ENOENT) return;
+        fail("socket " + path_, errno);
+    }
+    if (!S_ISSOCK(found.st_mode)) throw StartError(path_ + " exists and is not a socket");
+    const sockaddr_un address = addressOf(path_);
+    const FileDescriptor probe = newSocket(path_);
+    // EAGAIN: somebody listens who is too busy to accept.
+    if (::connect(probe.get(), generic(address), sizeof address) == 0 || errno == EAGAIN) {
+        failInUse(path_);
+    }
+    if (errno == ENOENT) return;
+    if (errno != ECONNREFUSED) fail("socket " + path_ + " is in use", errno);
+    if (::unlink(path_.c_str()) != 0 && errno != ENOENT) {
+        fail("cannot remove the stale socket " + path_, errno);
+    }
+}
+
+void SocketFile::bind() {
+    const sockaddr_un address = addressOf(path_);
+    socket_ = newSocket(path_);
+    // The file is made with the socket's own mode, so it is private from birth without a change of
+    // the process's mask, which other threads would see.
+    if (::fchmod(socket_.get(), 0600) != 0) fail("socket " + path_, errno);
+    if (::bind(socket_.get(), generic(address), sizeof address) != 0) {
+        fail("cannot bind the socket " + path_, errno);
+    }
+    struct stat made {};
+    if (::lstat(path_.c_str(), &made) != 0) fail("socket " + path_, errno);
+    device_ = made.st_dev;
+    inode_ = made.st_ino;
+    // The mask may have taken away more than was asked for.
+    if (::chmod(path_.c_str(), 0600) != 0) fail("socket " + path_, errno);
+}
+
+int SocketFile::listen() {
+    if (::listen(socket_.get(), SOMAXCONN) != 0) fail("cannot listen on " + path_, errno);
+    return socket_.get();
+}
+
+void SocketFile::remove() {
+    if (!lock_) return;
+    struct stat found {};
+    if (inode_ != 0 && ::lstat(path_.c_str(), &found) == 0 && found.st_dev == device_ &&
+        found.st_ino == inode_) {
+        ::unlink(path_.c_str());
+    }
+    socket_.reset();
+    ::unlink((path_ + ".lock").c_str());
+    lock_.reset();
+}
+
+}  // namespace host

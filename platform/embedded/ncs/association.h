@@ -1,0 +1,117 @@
+/// One association: what a client and the runtime say to each other over one connection, without
+/// the connection itself. Bytes go in, calls are made, bytes come out.
+#pragma once
+
+#include <sys/uio.h>
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <map>
+#include <string>
+
+#include "ncs/pdu.h"
+#include "ncs/registry.h"
+#include "ncs/stub_buffer.h"
+#include "platform/ncs.h"
+
+/// Stands for a caller while its call runs; managers can ask nothing of it.
+struct rpc__binding {};
+
+namespace ncs {
+
+/// What all associations of a server share.
+struct SharedState {
+    SharedState(std::size_t stubLimit, std::size_t totalLimit)
+        : largestStub(stubLimit), memory(totalLimit) {}
+
+    const std::size_t largestStub;  ///< bytes of one call's parameters
+    MemoryBudget memory;
+    std::atomic<std::uint64_t> calls{0};   ///< that reached a stub
+    std::atomic<std::uint64_t> faults{0};  ///< that were answered
+};
+
+/// Not thread-safe; one thread at a time feeds it.
+class Association {
+public:
+    /// `port` is what the client connected to in decimal digits, empty for a Unix socket.
+    Association(SharedState& shared, std::string port);
+    Association(const Association&) = delete;
+    Association& operator=(const Association&) = delete;
+
+    /// Where the next bytes of the client go: one or two ranges, in that order. A fragment's stub
+    /// data goes straight to its place behind the fragments before it. To be called when handle()
+    /// has nothing left to do; at least one byte of room is offered.
+    int windows(iovec (&ranges)[2]);
+    /// Takes over `count` bytes that were put there, and handles what is complete.
+    void received(std::size_t count);
+    /// Goes on with bytes that were left because output() had grown large. Does nothing when
+    /// there are none.
+    void handle();
+
+    /// What is to be sent; the sender removes it.
+    std::string& output() { return output_; }
+    /// False when, after the output, the connection is to be closed.
+    bool isOpen() const { return open_; }
+
+    bool isBound() const { return bound_; }
+    /// A packet or a request has begun and is not complete.
+    bool isMidRequest() const { return call_.active || directLeft_ > 0 || inboxEnd_ > 0; }
+    /// How many requests have been completed, answered or not.
+    std::uint64_t requestsDone() const { return requestsDone_; }
+
+private:
+    struct Context {
+        uuid__t interface {};
+        std::uint32_t version = 0;
+    };
+    struct Call {
+        bool active = false;
+        std::uint32_t id = 0;
+        std::uint16_t contextId = 0;
+        std::uint16_t operation = 0;
+        bool littleEndian = true;
+        RegisteredInterface interface;
+        bool answered = true;     ///< false when the caller wants no answer
+        std::uint32_t fault = 0;  ///< decided already; the rest is thrown away
+    };
+
+    bool handleNext();
+    bool handleFragment(const unsigned char* pdu, std::size_t available, const PduHeader& header);
+    void handleControl(const unsigned char* pdu, const PduHeader& header);
+    bool fits(const PduHeader& header, const RequestHead& head) const;
+    void startCall(const PduHeader& header, const RequestHead& head);
+    void makeRoom(std::size_t stubBytes, std::size_t hint);
+    void endFragment();
+    void finishCall();
+    std::uint32_t resolve();
+    std::uint32_t execute();
+    void endCall();
+
+    void bind(PduType answerType, const unsigned char* pdu, const PduHeader& header);
+    ContextResult accept(const PresentationContext& context);
+    void refuseHeader(HeaderProblem problem, const PduHeader& header);
+    void refuseBind(const PduHeader& header, BindRefusal reason);
+    void protocolError(const PduHeader& header);
+
+    SharedState& shared_;
+    const std::string port_;
+    bool open_ = true;
+    bool bound_ = false;
+    std::uint16_t largestSent_ = kSmallestMaximum;
+    std::map<std::uint16_t, Context> contexts_;
+    std::uint64_t requestsDone_ = 0;
+    std::string output_;
+
+    Call call_;
+    StubBuffer stub_;
+    std::size_t directLeft_ = 0;  ///< bytes of this fragment's stub data that are still to come
+    bool lastFragment_ = false;
+
+    /// Holds heads, and packets other than requests; what of it is not handled yet.
+    unsigned char inbox_[8192];
+    std::size_t inboxStart_ = 0;
+    std::size_t inboxEnd_ = 0;
+};
+
+}  // namespace ncs

@@ -1,0 +1,360 @@
+// Trace lines. Each event becomes one line and one write, so that lines of several threads and
+// processes do not mix in an append-mode file. Nothing here takes a lock, and a line with the
+// format "%s" is written with async-signal-safe calls only: a child between fork and exec traces.
+//
+//   2026-01-31 12:34:56.123456 4711 E zavtasks:123 runTask: text
+
+#include "platform/ras1.h"
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/uio.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstdarg>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <ctime>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "embedded/ras1_control.h"
+#include "ras1/selection.h"
+
+std::atomic<unsigned> RAS1_Generation{1};
+
+namespace {
+
+/// A descriptor of its own, outside the numbers of the standard streams, for what `descriptor` is
+/// open to; -1 when there is none. If the process closes descriptor 2 and a file or a pipe gets
+/// that number, traces must not end up there; nor must the log become a child's standard stream.
+int ownDescriptor(int descriptor) {
+    return ::fcntl(descriptor, F_DUPFD_CLOEXEC, 3);
+}
+
+int openLog(const std::string& path) {
+    if (path.empty()) return -1;
+    const int opened = ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0640);
+    if (opened == -1 || opened > STDERR_FILENO) return opened;
+    const int moved = ownDescriptor(opened);
+    ::close(opened);
+    return moved;
+}
+
+/// Whether a write may raise SIGPIPE.
+bool hasReader(int descriptor) {
+    struct stat found {};
+    return ::fstat(descriptor, &found) == 0 && (S_ISFIFO(found.st_mode) || S_ISSOCK(found.st_mode));
+}
+
+/// What is in force. Replaced by configure() only, one thread at a time, while others trace; never
+/// destroyed, because threads trace until the process is gone.
+class Facility {
+public:
+    Facility() { configureFromEnvironment(); }
+
+    void configure(const std::string& selectionText, const std::string& logPath) {
+        selections_.push_back(
+            std::make_unique<const ras1::Selection>(ras1::parseSelection(selectionText)));
+        selection_.store(selections_.back().get(), std::memory_order_release);
+        redirect(openLog(logPath));
+        readerMayGo_.store(hasReader(descriptor()), std::memory_order_relaxed);
+    }
+
+    void configureFromEnvironment() {
+        const char* text = std::getenv("KBB_RAS1");
+        const char* path = std::getenv("KBB_RAS1_LOG");
+        configure(text != nullptr ? text : "", path != nullptr ? path : "");
+    }
+
+    const ras1::Selection& selection() const { return *selection_.load(std::memory_order_acquire); }
+    int descriptor() const { return lines_.load(std::memory_order_relaxed); }
+    bool readerMayGo() const { return readerMayGo_.load(std::memory_order_relaxed); }
+
+private:
+    /// Sends lines to `log`, which is owned from here on, or to standard error when it is -1. The
+    /// number of the descriptor stays, so that a thread which is about to write meets no other
+    /// file than one of the two.
+    void redirect(int log) {
+        const int target = log != -1 ? log : standardError_;
+        const int current = descriptor();
+        if (current == -1) {
+            lines_.store(log != -1 ? log : ownDescriptor(standardError_),
+                         std::memory_order_relaxed);
+        } else if (target == -1) {
+            lines_.store(-1, std::memory_order_relaxed);
+            ::close(current);
+        } else {
+            ::dup3(target, current, O_CLOEXEC);
+            if (log != -1) ::close(log);
+        }
+    }
+
+    /// The one in force is the last; threads may still be looking at earlier ones.
+    std::vector<std::unique_ptr<const ras1::Selection>> selections_;
+    std::atomic<const ras1::Selection*> selection_{nullptr};
+    const int standardError_ = ownDescriptor(STDERR_FILENO);
+    std::atomic<int> lines_{-1};            ///< where lines go
+    std::atomic<bool> readerMayGo_{false};  ///< that is a pipe or a socket
+};
+
+Facility& facility() {
+    static Facility& instance = *new Facility;  // immortal, see above
+    return instance;
+}
+
+/// Opens the log and takes the copy of standard error while the process starts, before its files
+/// move.
+[[maybe_unused]] const Facility& startedEarly = facility();
+
+/// Appends a number in decimal, with at least `width` digits.
+char* putNumber(char* at, long long value, int width) {
+    char digits[24];
+    int count = 0;
+    // The most negative value has no positive counterpart in its own type.
+    unsigned long long rest = static_cast<unsigned long long>(value);
+    if (value < 0) {
+        *at++ = '-';
+        rest = 0 - rest;
+    }
+    do {
+        digits[count++] = static_cast<char>('0' + rest % 10);
+        rest /= 10;
+    } while (rest > 0);
+    while (count < width)
+        digits[count++] = '0';
+    while (count > 0)
+        *at++ = digits[--count];
+    return at;
+}
+
+char* putText(char* at, const char* end, const char* text) {
+    while (*text != '\0' && at < end)
+        *at++ = *text++;
+    return at;
+}
+
+/// Days since the epoch to year, month and day (proleptic Gregorian calendar, UTC); gmtime is not
+/// async-signal-safe.
+void civilDate(long long days, int& year, int& month, int& day) {
+    const long long z = days + 719468;
+    const long long era = z / 146097;
+    const long long dayOfEra = z - era * 146097;
+    const long long yearOfEra =
+        (dayOfEra - dayOfEra / 1460 + dayOfEra / 36524 - dayOfEra / 146096) / 365;
+    const long long dayOfYear = dayOfEra - (365 * yearOfEra + yearOfEra / 4 - yearOfEra / 100);
+    const long long shifted = (5 * dayOfYear + 2) / 153;
+    day = static_cast<int>(dayOfYear - (153 * shifted + 2) / 5 + 1);
+    month = static_cast<int>(shifted < 10 ? shifted + 3 : shifted - 9);
+    year = static_cast<int>(yearOfEra + era * 400 + (month <= 2 ? 1 : 0));
+}
+
+char* putTime(char* at) {
+    timespec now{};
+    ::clock_gettime(CLOCK_REALTIME, &now);
+    const long long seconds = now.tv_sec;
+    int year = 0, month = 0, day = 0;
+    civilDate(seconds / 86400, year, month, day);
+    at = putNumber(at, year, 4);
+    *at++ = '-';
+    at = putNumber(at, month, 2);
+    *at++ = '-';
+    at = putNumber(at, day, 2);
+    *at++ = ' ';
+    at = putNumber(at, seconds / 3600 % 24, 2);
+    *at++ = ':';
+    at = putNumber(at, seconds / 60 % 60, 2);
+    *at++ = ':';
+    at = putNumber(at, seconds % 60, 2);
+    *at++ = '.';
+    return putNumber(at, now.tv_nsec / 1000, 6);
+}
+
+/// Everything of a line that stands before its text.
+std::size_t putHead(char (&head)[256], const RAS1_BLOCK& block, char letter, int line) {
+    const char* const end = head + sizeof head - 32;
+    char* at = putTime(head);
+    *at++ = ' ';
+    at = putNumber(at, ::syscall(SYS_gettid), 1);
+    *at++ = ' ';
+    *at++ = letter;
+    *at++ = ' ';
+    at = putText(at, end, block.unit->name);
+    *at++ = ':';
+    at = putNumber(at, line, 1);
+    *at++ = ' ';
+    at = putText(at, end, block.function);
+    *at++ = ':';
+    *at++ = ' ';
+    return static_cast<std::size_t>(at - head);
+}
+
+/// Text that holds line ends would make a line look like several (and let a caller's data forge
+/// some), so they and the backslash are written as escapes. The trailing line feeds that some texts
+/// have are dropped.
+bool needsEscapes(const char* text, std::size_t length) {
+    return std::memchr(text, '\n', length) != nullptr ||
+           std::memchr(text, '\r', length) != nullptr || std::memchr(text, '\\', length) != nullptr;
+}
+
+/// Room for an escaped text that needs no allocator: a child after fork must not call one.
+class Scratch {
+public:
+    explicit Scratch(std::size_t size) : size_(size) {
+        if (size <= sizeof small_) return;
+        void* const mapped =
+            ::mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+        at_ = mapped == MAP_FAILED ? nullptr : static_cast<char*>(mapped);
+    }
+    ~Scratch() {
+        if (at_ != small_ && at_ != nullptr) ::munmap(at_, size_);
+    }
+    Scratch(const Scratch&) = delete;
+    Scratch& operator=(const Scratch&) = delete;
+    char* get() { return at_; }
+
+private:
+    const std::size_t size_;
+    char small_[2048];
+    char* at_ = small_;
+};
+
+std::size_t putEscaped(char* out, const char* text, std::size_t length) {
+    char* at = out;
+    for (std::size_t i = 0; i < length; ++i) {
+        const char c = text[i];
+        const bool special = c == '\n' || c == '\r' || c == '\\';
+        if (special) *at++ = '\\';
+        *at++ = c == '\n' ? 'n' : c == '\r' ? 'r' : c;
+    }
+    return static_cast<std::size_t>(at - out);
+}
+
+/// While it exists, a write to a pipe without a reader costs the process nothing: SIGPIPE is
+/// blocked in this thread and taken back if it came.
+class SigpipeShield {
+public:
+    explicit SigpipeShield(bool wanted) : wanted_(wanted) {
+        if (!wanted_) return;
+        sigset_t pending;
+        ::sigemptyset(&pipe_);
+        ::sigaddset(&pipe_, SIGPIPE);
+        ::sigpending(&pending);
+        wasPending_ = ::sigismember(&pending, SIGPIPE) == 1;
+        ::pthread_sigmask(SIG_BLOCK, &pipe_, &before_);
+    }
+    ~SigpipeShield() {
+        if (!wanted_) return;
+        const timespec now{};
+        if (!wasPending_) {
+            while (::sigtimedwait(&pipe_, nullptr, &now) == -1 && errno == EINTR) {
+            }
+        }
+        ::pthread_sigmask(SIG_SETMASK, &before_, nullptr);
+    }
+    SigpipeShield(const SigpipeShield&) = delete;
+    SigpipeShield& operator=(const SigpipeShield&) = delete;
+
+private:
+    const bool wanted_;
+    bool wasPending_ = false;
+    sigset_t pipe_{};
+    sigset_t before_{};
+};
+
+void writeLine(const RAS1_BLOCK& block, char letter, int line, const char* text,
+               std::size_t length) {
+    const int savedErrno = errno;
+    char head[256];
+    const std::size_t headLength = putHead(head, block, letter, line);
+    char newline = '\n';
+    iovec parts[3] = {{head, headLength}, {const_cast<char*>(text), length}, {&newline, 1}};
+    {
+        const SigpipeShield shield(facility().readerMayGo());
+        while (::writev(facility().descriptor(), parts, 3) == -1 && errno == EINTR) {
+        }
+    }
+    errno = savedErrno;
+}
+
+void writeText(const RAS1_BLOCK& block, char letter, int line, const char* text,
+               std::size_t length) {
+    while (length > 0 && text[length - 1] == '\n')
+        --length;
+    if (!needsEscapes(text, length)) {
+        writeLine(block, letter, line, text, length);
+        return;
+    }
+    Scratch safe(length * 2);
+    if (safe.get() == nullptr) return;
+    writeLine(block, letter, line, safe.get(), putEscaped(safe.get(), text, length));
+}
+
+}  // namespace
+
+unsigned RAS1_Sync(RAS1_UNIT* unit) {
+    const unsigned generation = RAS1_Generation.load(std::memory_order_acquire);
+    const unsigned flags = facility().selection().flagsOf(unit->name);
+    unit->flags.store(flags, std::memory_order_relaxed);
+    unit->generation.store(generation, std::memory_order_release);
+    return flags;
+}
+
+void RAS1_Entry(const RAS1_BLOCK* block, int line) {
+    writeLine(*block, 'F', line, "Entry", 5);
+}
+
+void RAS1_Exit(const RAS1_BLOCK* block, int line) {
+    writeLine(*block, 'F', line, "Exit", 4);
+}
+
+void RAS1_ExitValue(const RAS1_BLOCK* block, int line, long value) {
+    char text[40] = "Exit ";
+    const char* const at = putNumber(text + 5, value, 1);
+    writeLine(*block, 'F', line, text, static_cast<std::size_t>(at - text));
+}
+
+void RAS1_Printf(const RAS1_BLOCK* block, unsigned level, int line, const char* format, ...) {
+    const char letter = level == RAS1_ERROR ? 'E' : 'D';
+    std::va_list arguments;
+    va_start(arguments, format);
+    if (std::strcmp(format, "%s") == 0) {
+        const char* const given = va_arg(arguments, const char*);
+        const char* const text = given != nullptr ? given : "(null)";
+        writeText(*block, letter, line, text, std::strlen(text));
+    } else {
+        char buffer[1024];
+        std::va_list again;
+        va_copy(again, arguments);
+        const int length = std::vsnprintf(buffer, sizeof buffer, format, arguments);
+        if (length >= 0 && static_cast<std::size_t>(length) < sizeof buffer) {
+            writeText(*block, letter, line, buffer, static_cast<std::size_t>(length));
+        } else if (length >= 0) {
+            std::string whole(static_cast<std::size_t>(length) + 1, '\0');
+            std::vsnprintf(whole.data(), whole.size(), format, again);
+            writeText(*block, letter, line, whole.data(), static_cast<std::size_t>(length));
+        }
+        va_end(again);
+    }
+    va_end(arguments);
+}
+
+namespace ras1 {
+
+void configure(const std::string& selection, const std::string& logPath) {
+    facility().configure(selection, logPath);
+    ++RAS1_Generation;
+}
+
+void configureFromEnvironment() {
+    facility().configureFromEnvironment();
+    ++RAS1_Generation;
+}
+
+}  // namespace ras1
