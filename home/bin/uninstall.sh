@@ -1,5 +1,5 @@
 #!/bin/sh
-# Removes a product of one platform from the home that this program is in.
+# Removes a product of one platform from the home that contains this program.
 set -u
 program=uninstall.sh
 CDPATH='' own_dir=$(cd -- "$(dirname -- "$0")" && pwd) || exit 2
@@ -20,7 +20,7 @@ TEXT
     exit "$EXIT_USAGE"
 }
 
-# needed_by_others: every other product of the platform needs the shared component.
+# needed_by_others: succeeds when another product of the platform needs the shared component.
 needed_by_others() {
     for other in "$home/registry"/*"$arch.ver"; do
         [ "$other" = "$entry" ] || [ ! -e "$other" ] || return 0
@@ -28,11 +28,11 @@ needed_by_others() {
     return 1
 }
 
-# What the product has outside its folder, for all its instances.
+# Removes the product's files outside its folder, for all its instances.
 remove_traces() {
     for kind in config/%.cfg config/%_*.cfg config/%.config config/%_*.config run/%.pid run/%_*.pid \
         logs/%.log logs/%_*.log logs/%.log.1 logs/%_*.log.1 data/% data/%_*; do
-        # Only the kind's own stars are patterns; the home's path is taken as it is.
+        # Only the stars of the kind are patterns; the home's path is literal.
         (
             cd -- "$home/${kind%/*}" 2>/dev/null || exit 0
             pattern=${kind##*/}
@@ -48,7 +48,7 @@ uninstall_product() {
         return "$EXIT_ABSENT"
     fi
     stop_all "$product" "$arch" || return
-    # The folder goes in one step: half a product would still be started.
+    # The folder is removed in one step: half a product could still be started.
     gone=${folder%/*}/.${folder##*/}.gone
     rm -rf -- "$gone" 2>/dev/null
     if [ -d "$folder" ] && ! mv -- "$folder" "$gone" 2>/dev/null; then

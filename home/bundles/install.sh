@@ -1,5 +1,5 @@
 #!/bin/sh
-# Installs the product of the bundle that this script is in.
+# Installs the product of the bundle that contains this script.
 set -u
 program=install.sh
 CDPATH='' bundle=$(cd -- "$(dirname -- "$0")" && pwd) || exit 28
@@ -45,7 +45,7 @@ use_home "$chosen_home"
 
 read_description "$bundle/product.dsc" ||
     fail "$EXIT_DAMAGED" "$bundle/product.dsc is missing or not complete"
-# A file that was not transferred, or not to its end, must not be found out by the running agent.
+# A missing or incomplete file must be noticed here, not by the running agent.
 (cd -- "$bundle" && sha256sum --quiet --strict -c manifest) >&2 ||
     fail "$EXIT_DAMAGED" "the files in $bundle are not those of its manifest"
 

@@ -1,7 +1,7 @@
 # shellcheck shell=sh
 # What the programs of a home share: exit codes, checks of names, file names, configuration values.
-# A program sets `program` (its name for messages) before it reads this file, and `home` with
-# use_home before it calls anything else. Functions set plain variables, since sh has no others.
+# A program sets `program` (its name in messages) before it sources this file, and calls use_home, which
+# sets `home`, before anything else. Functions set global variables, because sh has no others.
 
 # shellcheck disable=SC2154
 
@@ -41,14 +41,14 @@ fail() {
     exit "$fail_code"
 }
 
-# use_home DIR: sets home to its absolute path, or ends the program.
+# use_home DIR: sets home to its absolute path, or exits.
 use_home() {
     home=$(CDPATH='' cd -- "$1" 2>/dev/null && pwd) || fail "$EXIT_HOME" "no home directory $1"
     [ -d "$home/agtqvs6" ] && [ -d "$home/registry" ] ||
         fail "$EXIT_HOME" "$home is not a home: it lacks agtqvs6 or registry"
 }
 
-# A product's code is part of file names. "bin" is the folder of the shared component.
+# A product code is part of file names. "bin" is taken: it is the folder of the shared component.
 valid_product() {
     case $1 in
     '' | bin | *[!A-Za-z0-9]*) return 1 ;;
@@ -73,8 +73,8 @@ instance_key() {
     key=$1${2:+_$2}
 }
 
-# config_file PRODUCT INSTANCE: sets config to the instance's configuration file. The universal
-# agent's files have names of their own because the management library reads them too.
+# config_file PRODUCT INSTANCE: sets config to the instance's configuration file. The universal agent's
+# files are named differently because the management library reads them too.
 config_file() {
     instance_key "$1" "$2"
     case $1 in
@@ -83,8 +83,8 @@ config_file() {
     esac
 }
 
-# config_value NAME FILE...: prints the value that NAME has in the first of the files that has it.
-# In one file the last line counts. Single quotes around values are not part of them.
+# config_value NAME FILE...: prints the value of NAME from the first file that sets it. Within a file
+# the last line counts. Single quotes around a value are removed.
 config_value() {
     config_name=$1
     shift
@@ -103,8 +103,8 @@ config_value() {
     return 1
 }
 
-# config_number NAME DEFAULT MIN MAX FILE...: prints the value, or DEFAULT when there is none or
-# when it is no number of that range.
+# config_number NAME DEFAULT MIN MAX FILE...: prints the value, or DEFAULT when it is missing or is not
+# a number in that range.
 config_number() {
     number_name=$1 number_default=$2 number_min=$3 number_max=$4
     shift 4
@@ -112,7 +112,7 @@ config_number() {
         case $number in
         '' | *[!0-9]* | ??????????*) ;;
         *)
-            # A leading 0 would make the shell take it for an octal number.
+            # The shell would read a number with a leading 0 as octal.
             while [ "$number" != "${number#0?}" ]; do number=${number#0}; done
             if [ "$number" -ge "$number_min" ] && [ "$number" -le "$number_max" ]; then
                 printf '%s\n' "$number"
@@ -125,7 +125,7 @@ config_number() {
     printf '%s\n' "$number_default"
 }
 
-# host_arch: prints this machine's platform code, or nothing when the table does not know it.
+# host_arch: prints this machine's platform code, or nothing when it is not in the table.
 host_arch() (
     set -- "$home/registry/archdsc.tbl"
     [ -r "$home/bin/dynarch.shl" ] || return 1
@@ -160,7 +160,7 @@ replace_file() {
     return 1
 }
 
-# keep_below FILE KILOBYTES: a file that has grown beyond that becomes FILE.1.
+# keep_below FILE KILOBYTES: rotates a file larger than that to FILE.1.
 keep_below() {
     [ -f "$1" ] || return 0
     kept_size=$(wc -c <"$1")

@@ -1,9 +1,9 @@
 # shellcheck shell=sh
-# Laying a product's files into a home, all or nothing. Read after common.sh and process.sh.
+# Installing a product's files into a home, all or nothing. Read after common.sh and process.sh.
 # shellcheck disable=SC2034,SC2154
 
 # read_description FILE: sets described_code, described_text, described_version, described_release
-# and described_platform ("any" when every platform will do); fails when one is missing.
+# and described_platform ("any": runs on every platform); fails when one is missing.
 read_description() {
     described_code=$(config_value ProdCode "$1") &&
         described_text=$(config_value Description "$1") &&
@@ -13,35 +13,35 @@ read_description() {
         valid_product "$described_code"
 }
 
-# write_entry ARCH ENTRY: the inventory's entry of the described product.
+# write_entry ARCH ENTRY: writes the described product's inventory entry.
 write_entry() {
     printf 'ProdCode=%s\nDescription=%s\nPlatform=%s\nVersion=%s\nRelease=%s\n' "$described_code" \
         "$described_text" "$1" "$described_version" "$described_release" | replace_file "$2"
 }
 
-# set_modes DIR: a file transfer keeps no modes. What stands in a folder named bin is executable.
+# set_modes DIR: transfers do not preserve modes. Files in a folder named bin become executable.
 set_modes() (
     cd -- "$1" && find . -type d -exec chmod 755 {} + &&
         find . -type f ! -path '*/bin/*' -exec chmod 644 {} + &&
         find . -type f -path '*/bin/*' -exec chmod 755 {} +
 )
 
-# clear_leftovers: what an installation that was killed has left. Without it the product would be
-# missing when it was killed between its two renamings.
+# clear_leftovers: cleans up after an installation that was killed. One that was killed between its two
+# renames has left the product missing; this brings it back.
 clear_leftovers() {
     [ -d "$target" ] || [ ! -d "$old" ] || mv -- "$old" "$target" 2>/dev/null
     rm -rf -- "$staged" "$old" 2>/dev/null
 }
 
 # install_product ARCH FILES, after read_description and inside with_lock: FILES becomes the
-# described product's folder. A running agent goes on with the files that it has open; the new ones
-# serve from its next start. On failure the home is as before.
+# described product's folder. A running agent keeps the files it has open and uses the new ones from
+# its next start. On failure the home is unchanged.
 install_product() {
     arch_dir=$home/agtqvs6/$1
     folder=$described_code
     target=$arch_dir/$folder staged=$arch_dir/.$folder.new old=$arch_dir/.$folder.old
     complete=$staged swapped=no
-    # The shared component's programs are the platform's own bin folder.
+    # The shared component lives in the platform's own bin folder.
     [ "$folder" != ax ] || target=$arch_dir/bin complete=$staged/bin
     mkdir -p -- "$arch_dir" 2>/dev/null && [ -w "$arch_dir" ] && [ -w "$home/registry" ] || {
         say "cannot write to $arch_dir or $home/registry"

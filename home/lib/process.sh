@@ -2,15 +2,15 @@
 # Starting, finding and stopping the process of an agent's instance. Read after common.sh.
 #
 # run/<product>[_<instance>].pid holds one line: process id, start time in clock ticks since boot,
-# boot id, platform. The start time and the boot id tell an agent from a stranger that got its
-# process id later. Each agent leads a session of its own, so its process id is also that of its
-# process group.
+# boot id, platform. The start time and the boot id distinguish an agent from an unrelated process that
+# got the same process id later. Each agent leads its own session, so its process id is also its process
+# group id.
 # shellcheck disable=SC2154
 
-# process_start_time PID: sets start_time; fails when there is no such process or only its remains.
+# process_start_time PID: sets start_time; fails when the process does not exist or is a zombie.
 process_start_time() {
     { IFS= read -r stat_line <"/proc/$1/stat"; } 2>/dev/null || return 1
-    # The second field is the program's name, which may hold blanks and parentheses.
+    # The second field is the program's name, which may contain blanks and parentheses.
     # shellcheck disable=SC2086
     set -- ${stat_line##*) }
     case ${1-Z} in
@@ -25,7 +25,7 @@ boot_id() {
     IFS= read -r this_boot </proc/sys/kernel/random/boot_id
 }
 
-# agent_lives: whether the process that find_agent or launch_agent set is still there.
+# agent_lives: succeeds while the process found by find_agent or launch_agent exists.
 agent_lives() {
     process_start_time "$agent_pid" && [ "$start_time" = "$agent_start" ]
 }
@@ -41,13 +41,13 @@ find_agent() {
     esac
     boot_id
     [ "$agent_boot" = "$this_boot" ] && agent_lives || return 1
-    # Whoever may write into run/ must not be able to point a privileged stop at another's process.
+    # Someone who may write to run/ must not be able to have root stop another user's process.
     pid_owner=$(stat -c %u -- "$pid_file") || return 1
     [ "$pid_owner" -eq 0 ] || [ "$pid_owner" = "$(stat -c %u "/proc/$agent_pid" 2>/dev/null)" ]
 }
 
 # with_lock PRODUCT COMMAND...: runs the command while no other program of this home starts, stops,
-# installs or removes that product; gives the command's status. EXIT_WRITE when there is no lock.
+# installs or removes that product; returns the command's status, or EXIT_WRITE without a lock.
 with_lock() {
     lock_file=$home/run/.$1.lock
     shift
@@ -62,7 +62,7 @@ with_lock() {
     done
 }
 
-# An uninstallation removes the lock file that others may be waiting for.
+# An uninstall removes the lock file while others may be waiting for it.
 locked() {
     if ! flock -w 60 9; then
         say "another program is busy with this product"
@@ -76,8 +76,8 @@ locked() {
     "$@"
 }
 
-# tenths_while TENTHS COMMAND...: waits as long as the command succeeds, at most so many tenths of a
-# second; fails when it still succeeds then.
+# tenths_while TENTHS COMMAND...: waits while the command succeeds, for at most so many tenths of a
+# second; fails when it still succeeds after that.
 tenths_while() {
     tenths=$1
     shift
@@ -88,8 +88,8 @@ tenths_while() {
     done
 }
 
-# launch_agent: runs the agent in a session of its own, on none of this program's descriptors,
-# because whoever called this program reads its output to the end. Sets agent_pid.
+# launch_agent: runs the agent in its own session and without this program's descriptors, because the
+# caller of this program reads its output to the end. Sets agent_pid.
 launch_agent() {
     (
         cd -- "$home" || exit 1
@@ -139,7 +139,7 @@ start_instance() {
     say "$key started, process $agent_pid"
 }
 
-# What the agent left of itself goes before its process id is free for others.
+# The pid file goes before the agent's process id can be reused.
 report_death() {
     kill -KILL "-$agent_pid" 2>/dev/null
     wait "$agent_pid"
@@ -147,7 +147,7 @@ report_death() {
     tail -n 5 -- "$log" >&2
 }
 
-# stop_instance PRODUCT INSTANCE, inside with_lock: asks with SIGTERM, then insists with SIGKILL.
+# stop_instance PRODUCT INSTANCE, inside with_lock: sends SIGTERM, then SIGKILL.
 stop_instance() {
     config_file "$1" "$2"
     if ! find_agent "$home/run/$key.pid"; then
@@ -170,7 +170,7 @@ stop_instance() {
             return "$EXIT_NOT_STOPPED"
         fi
     fi
-    # Children that outlived it have had their SIGTERM too.
+    # Children that outlived it were sent SIGTERM as well.
     kill -KILL "-$agent_pid" 2>/dev/null
     rm -f -- "$home/run/$key.pid"
     say "$key $how"

@@ -1,9 +1,9 @@
 # shellcheck shell=sh
 # The universal agent's collectors. The agent sets work, scripts, providers, max_kb and
-# script_seconds; child is the process to end with the agent.
+# script_seconds. child is the process to stop together with the agent.
 # shellcheck disable=SC2154
 
-# provider_started TYPE: the combined type ASFS stands for its four members.
+# provider_started TYPE: the type ASFS stands for all four types.
 provider_started() {
     case ,$providers, in
     *",$1,"* | *,ASFS,*) return 0 ;;
@@ -31,7 +31,7 @@ collect_all() {
     done
 }
 
-# What holds for every round is said in the first one only.
+# Messages that hold for every round are written in the first one only.
 said=''
 say_once() {
     case $said in
@@ -43,7 +43,7 @@ say_once() {
     esac
 }
 
-# store_rows: each line of standard input becomes a row with the time before it.
+# store_rows: stores each line of standard input as a row that begins with the time.
 store_rows() {
     [ -s "$rows" ] || echo "time,${fields:-value}" >>"$rows"
     NOW=$(date -u +%Y-%m-%dT%H:%M:%SZ) awk '{ sub(/\r$/, ""); print ENVIRON["NOW"] "," $0 }' \
@@ -52,7 +52,7 @@ store_rows() {
 
 collect_script() {
     fields=$(config_value FIELDS "$import")
-    # Scripts are run from the one directory that they are imported into.
+    # Scripts run from the directory they are imported into, and from nowhere else.
     script=$scripts/${data_source##*/}
     [ -x "$script" ] || {
         say_once "$application: no script $script"
@@ -69,8 +69,8 @@ collect_script() {
     rm -f -- "$output"
 }
 
-# collect_file: the complete lines that the file has gained since the last round; offsets/ keeps how
-# far it was read. A file that has become shorter was replaced and is read from its start.
+# collect_file: stores the complete lines added to the file since the last round. offsets/ keeps how far
+# it was read. A file that has become shorter was replaced and is read from the start.
 collect_file() {
     fields=$(config_value FIELDS "$import")
     [ -f "$data_source" ] || {
@@ -87,7 +87,7 @@ collect_file() {
     tail -c "+$((offset + 1))" -- "$data_source" | head -c 65536 >"$chunk"
     complete=$(wc -l <"$chunk")
     if [ "$complete" -eq 0 ]; then
-        # A line longer than the chunk would hold up everything behind it.
+        # A line longer than the chunk would block everything after it.
         [ "$(wc -c <"$chunk")" -ge 65536 ] || return 0
         taken=65536
     else
