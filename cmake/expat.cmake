@@ -15,6 +15,7 @@ if(CMAKE_SIZEOF_VOID_P EQUAL 4)
     ${ZAV_I386_ROOT}/usr/include/i386-linux-gnu)
   target_link_libraries(zav_expat INTERFACE ${ZAV_EXPAT_I386})
 else()
-  find_package(EXPAT REQUIRED)
+  # The first version that bounds what entities expand to.
+  find_package(EXPAT 2.4 REQUIRED)
   target_link_libraries(zav_expat INTERFACE EXPAT::EXPAT)
 endif()

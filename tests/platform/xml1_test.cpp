@@ -6,6 +6,7 @@
 #include <clocale>
 #include <cstdlib>
 #include <cstring>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -208,6 +209,19 @@ TEST(Xml, AnErrorHasACodeATextAndAPlace) {
     }
 }
 
+TEST(Xml, EveryErrorHasItsOwnText) {
+    EXPECT_STREQ("out of memory", XML1_ErrorString(1));
+    EXPECT_STREQ("mismatched tag", XML1_ErrorString(7));
+    EXPECT_STREQ("limit on input amplification factor (from DTD and entities) breached",
+                 XML1_ErrorString(43));
+    std::set<std::string> texts;
+    for (int code = 1; code <= 43; ++code) {
+        ASSERT_NE(nullptr, XML1_ErrorString(code)) << code;
+        EXPECT_TRUE(texts.insert(XML1_ErrorString(code)).second) << code;
+    }
+    EXPECT_EQ(nullptr, XML1_ErrorString(44));
+}
+
 TEST(Xml, CodesWithoutATextHaveNone) {
     EXPECT_EQ(nullptr, XML1_ErrorString(0));
     EXPECT_EQ(nullptr, XML1_ErrorString(-1));
@@ -215,10 +229,68 @@ TEST(Xml, CodesWithoutATextHaveNone) {
 }
 
 TEST(Xml, AnEmptyDocumentIsAnError) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        Recorder recorder;
+        EXPECT_EQ(0, recorder.push("", true));
+        EXPECT_STREQ("no element found", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        EXPECT_EQ(1, XML1_GetCurrentLineNumber(recorder.parser()));
+        EXPECT_EQ(0, XML1_GetCurrentColumnNumber(recorder.parser()));
+    }
+}
+
+TEST(Xml, ADocumentMayBeginWithEmptyPieces) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        Recorder recorder;
+        EXPECT_EQ(1, recorder.push("", false));
+        EXPECT_EQ(1, recorder.push("", false));
+        EXPECT_EQ(1, recorder.push("<a/>", true));
+        EXPECT_THAT(recorder.events, ElementsAre("<a", ">a"));
+    }
+}
+
+TEST(Xml, ThereIsABufferForNoBytes) {
     const Locale locale(kUtf8);
-    Recorder recorder;
-    EXPECT_EQ(0, recorder.push("", true));
-    EXPECT_STREQ("no element found", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+    EXPECT_NE(nullptr, XML1_GetBuffer(Recorder().parser(), 0));
+}
+
+TEST(Xml, AnEmptyPieceNeedsNoBuffer) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        Recorder recorder;
+        EXPECT_EQ(1, XML1_ParseBuffer(recorder.parser(), 0, 0));
+        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), 0, 1));
+        EXPECT_STREQ("no element found", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        Recorder whole;
+        EXPECT_EQ(1, whole.push("<a/>", false));
+        EXPECT_EQ(1, XML1_ParseBuffer(whole.parser(), 0, 1));
+    }
+}
+
+TEST(Xml, NothingIsParsedAfterTheLastPiece) {
+    for (const std::string document : {"<a/>", "<a>"}) {
+        const Locale locale(kUtf8);
+        Recorder recorder;
+        EXPECT_EQ(1, recorder.push(document, true));
+        EXPECT_EQ(0, XML1_GetErrorCode(recorder.parser())) << document;
+        const std::size_t events = recorder.events.size();
+        EXPECT_EQ(nullptr, XML1_GetBuffer(recorder.parser(), 1)) << document;
+        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), 0, 1)) << document;
+        EXPECT_STREQ("parsing finished", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        EXPECT_EQ(events, recorder.events.size());
+    }
+}
+
+TEST(Xml, AnErrorStaysWhenMoreIsPushed) {
+    for (const char* const name : {kUtf8, kLatin1}) {
+        const Locale locale(name);
+        Recorder recorder;
+        EXPECT_EQ(0, recorder.push("<a></b>", true));
+        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), 0, 1));
+        EXPECT_STREQ("mismatched tag", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        EXPECT_THAT(recorder.events, ElementsAre("<a"));
+    }
 }
 
 TEST(Xml, ADocumentMayEndWithinAnElement) {

@@ -18,11 +18,11 @@ DefaultLocale openDefaultLocale() {
     return DefaultLocale(NLS2_GetLocale(NLS2_BY_DEFAULT, 0, 0, &status));
 }
 
-/// One encoding: turns the bytes of one character into its code point.
+/// Turns the bytes of one character of an encoding into its code point.
 class Decoder {
 public:
     virtual ~Decoder() = default;
-    /// The character that exactly these bytes make, or kNoCharacter.
+    /// The code point, or kNoCharacter when the bytes are not exactly one character.
     virtual int decode(const char* bytes, std::size_t count) = 0;
 };
 
@@ -92,20 +92,20 @@ bool leadsThree(Decoder& decoder, char lead) {
     return false;
 }
 
-/// What the parser wants to know of a byte: the character that it is, or minus the number of bytes
-/// of the characters that it begins, or -1.
+/// A byte's entry in expat's table: the character that it is, or minus the length of the characters
+/// that it begins, or -1 when it begins none.
 int meaningOf(Decoder& decoder, int byte) {
     const char lead = static_cast<char>(byte);
     const int character = decoder.decode(&lead, 1);
     if (character != kNoCharacter) return character;
     if (byte < 0x80) return -1;
     if (leadsTwo(decoder, lead)) return -2;
-    // Only extended UNIX codes have three bytes, behind a single shift.
+    // Only EUC encodings have characters of three bytes; they begin with a single shift.
     const bool isSingleShift = byte == 0x8E || byte == 0x8F;
     return isSingleShift && leadsThree(decoder, lead) ? -3 : -1;
 }
 
-/// What lives as long as the parser reads an encoding.
+/// What convertCharacter needs; expat frees it with the parser.
 struct Reading {
     std::unique_ptr<Decoder> decoder;
     std::array<int, 256> meanings;

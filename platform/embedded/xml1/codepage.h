@@ -1,5 +1,5 @@
-/// The code page side of the XML parser: texts out of it in the local code page, and input
-/// encodings that the parser itself does not know.
+/// Code pages for the XML parser: its texts are converted to the local code page, and it learns to
+/// read encodings that expat does not know itself.
 #pragma once
 
 #include <expat.h>
@@ -18,13 +18,15 @@ struct LocaleCloser {
 };
 using DefaultLocale = std::unique_ptr<NLS2_LOCALE, LocaleCloser>;
 
-/// Turns the parser's UTF-8 into the code page of the process's default locale. One parser's own.
+/// Converts expat's UTF-8 to the code page of the process's default locale. Not to be shared
+/// between threads.
 class LocalText {
 public:
     LocalText();
-    /// True when texts can be handed on as they are.
+    /// True when texts need no conversion.
     bool isUtf8() const { return codepage_ == NLS2_CP_UTF8; }
-    /// True when bytes above 127 have a meaning in the local code page that differs from UTF-8's.
+    /// True when bytes above 127 mean something else in the local code page than in UTF-8, so that
+    /// a document without a declared encoding has to be read in it.
     bool readsItself() const;
     /// Appends well-formed UTF-8 in the local code page. Throws std::bad_alloc.
     void append(std::string_view utf8, std::string& out);
@@ -32,14 +34,14 @@ public:
 private:
     const DefaultLocale locale_;
     int codepage_ = NLS2_CP_UTF8;
-    std::vector<unsigned short> wide_;  ///< kept for its memory
+    std::vector<unsigned short> wide_;  ///< scratch space, kept to save allocations
 };
 
-/// The name under which the parser is told to read the local code page.
+/// The encoding name that stands for the local code page.
 constexpr const char* kLocalEncoding = "x-local-code-page";
 
-/// The parser's handler for encodings beyond those built into it: the local code page, and what the
-/// C library can convert, as far as one to three bytes make a character. `data` is not used.
+/// Expat's handler for encodings that it does not know: the local code page, and whatever the C
+/// library can convert in which a character has one to three bytes. `data` is not used.
 int describeEncoding(void* data, const XML_Char* name, XML_Encoding* encoding);
 
 }  // namespace xml1

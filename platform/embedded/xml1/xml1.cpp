@@ -1,17 +1,20 @@
-// The XML parser, over expat. Where the local code page is UTF-8, each event's texts are handed
-// over as they come; elsewhere they are converted on the way.
+// The XML parser, over expat. Where the local code page is UTF-8, texts are passed on as expat
+// gives them; elsewhere they are converted first.
 
 #include "platform/xml1.h"
 
 #include <expat.h>
 
-#include <cstring>
+#include <cstddef>
 #include <exception>
+#include <memory>
+#include <new>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "xml1/codepage.h"
+#include "xml1/errors.h"
 
 struct XML1_PARSER {
     explicit XML1_PARSER(const char* encoding);
@@ -27,14 +30,16 @@ struct XML1_PARSER {
     XML1_DataHandler data = nullptr;
     void* userData = nullptr;
 
-    const char* buffer = nullptr;      ///< that was handed out last
-    int capacity = 0;                  ///< of that buffer
-    XML_Error error = XML_ERROR_NONE;  ///< an error that expat was not asked about
-    bool hasElement = false;           ///< one has begun
+    const char* buffer = nullptr;      ///< handed out by the last XML1_GetBuffer
+    int capacity = 0;                  ///< how many bytes of it may be parsed
+    XML_Error error = XML_ERROR_NONE;  ///< of the last call
+    bool hasElement = false;           ///< a start tag has been seen
+    bool hasFailed = false;            ///< some input was not well-formed
+    bool hasEnded = false;             ///< the last piece has been parsed
     bool encodingDecided;
-    std::string head;  ///< the first bytes, until they decide about the encoding
+    std::string head;  ///< the first bytes, collected until they tell the encoding
 
-    // Kept for their memory:
+    // Scratch space for converted texts, kept to save allocations.
     std::string text;
     std::vector<std::size_t> offsets;
     std::vector<const char*> pointers;
@@ -62,9 +67,11 @@ void XMLCALL dataDirect(void* context, const XML_Char* text, int length) {
     parser.data(parser.userData, text, length);
 }
 
-/// Runs what may throw inside one of expat's callbacks; a failure ends the parsing.
+/// Runs an action that may throw inside one of expat's callbacks. An exception stops the parser and
+/// becomes its error; the callbacks that expat still makes after that are dropped.
 template <typename Action>
 void guarded(XML1_PARSER& parser, Action action) {
+    if (parser.error != XML_ERROR_NONE) return;
     try {
         action();
     } catch (const std::exception&) {
@@ -73,7 +80,7 @@ void guarded(XML1_PARSER& parser, Action action) {
     }
 }
 
-/// Converts a 0-terminated text behind those that are there already.
+/// Converts a 0-terminated text and appends it to parser.text.
 void addText(XML1_PARSER& parser, const char* utf8) {
     parser.offsets.push_back(parser.text.size());
     parser.local.append(utf8, parser.text);
@@ -119,8 +126,9 @@ void XMLCALL dataConverted(void* context, const XML_Char* utf8, int length) {
 
 enum class Origin { Unknown, SaysItself, Local };
 
-/// What a document's first bytes say of its encoding: one with a byte order mark, a declaration or
-/// a 0 in front (16-bit units) says itself; any other was written in the local code page.
+/// Decides from a document's first bytes who knows its encoding. A byte order mark, an XML
+/// declaration or a zero byte (16-bit units) means that the document says it. Anything else was
+/// written in the local code page. `isWhole` says that no more bytes will come.
 Origin originOf(std::string_view head, bool isWhole) {
     static constexpr std::string_view kMarks[] = {"\xEF\xBB\xBF", "\xFE\xFF", "\xFF\xFE", "<?xml"};
     if (head.substr(0, 2).find('\0') != std::string_view::npos) return Origin::SaysItself;
@@ -132,7 +140,15 @@ Origin originOf(std::string_view head, bool isWhole) {
     return Origin::Local;
 }
 
-/// Parses the first pieces, which are kept until they say what encoding they are in.
+/// Passes on one piece of input. A piece without bytes goes through XML_Parse, which takes it at
+/// any time; XML_ParseBuffer wants a buffer first, except in some versions of expat.
+XML_Status parsePiece(XML1_PARSER& parser, int length, bool isFinal) {
+    const XML_Parser expat = parser.expat.get();
+    if (length == 0) return XML_Parse(expat, "", 0, isFinal);
+    return XML_ParseBuffer(expat, length, isFinal);
+}
+
+/// Parses the first pieces. They are collected until they tell the encoding.
 XML_Status parseHead(XML1_PARSER& parser, int length, bool isFinal) {
     const XML_Parser expat = parser.expat.get();
     if (length > 0) parser.head.append(parser.buffer, static_cast<std::size_t>(length));
@@ -140,14 +156,23 @@ XML_Status parseHead(XML1_PARSER& parser, int length, bool isFinal) {
     if (origin == Origin::Unknown) return XML_STATUS_OK;
     parser.encodingDecided = true;
     if (origin == Origin::Local) XML_SetEncoding(expat, xml1::kLocalEncoding);
-    return XML_Parse(expat, parser.head.data(), static_cast<int>(parser.head.size()),
-                     isFinal ? XML_TRUE : XML_FALSE);
+    return XML_Parse(expat, parser.head.data(), static_cast<int>(parser.head.size()), isFinal);
 }
 
-/// Whether all that is wrong with a document is that end tags are missing.
+/// Whether missing end tags are all that is wrong with the document.
 bool endedWithinElement(const XML1_PARSER& parser) {
     return parser.hasElement && parser.error == XML_ERROR_NONE &&
            XML_GetErrorCode(parser.expat.get()) == XML_ERROR_NO_ELEMENTS;
+}
+
+/// Parses a piece and keeps the error code, if any. Throws std::bad_alloc.
+bool parse(XML1_PARSER& parser, int length, bool isFinal) {
+    const XML_Status status = parser.encodingDecided ? parsePiece(parser, length, isFinal)
+                                                     : parseHead(parser, length, isFinal);
+    if (status == XML_STATUS_OK || endedWithinElement(parser)) return true;
+    // An exception in a callback has left its own code.
+    if (parser.error == XML_ERROR_NONE) parser.error = XML_GetErrorCode(parser.expat.get());
+    return false;
 }
 
 }  // namespace
@@ -173,7 +198,7 @@ void XML1_SetElementHandler(XML1_PARSER* parser, XML1_StartHandler start, XML1_E
     parser->start = start;
     parser->end = end;
     const bool direct = parser->local.isUtf8();
-    // The start is always listened to: whether there was an element decides how a document may end.
+    // Start tags are always watched: whether there was an element decides how a document may end.
     XML_SetStartElementHandler(parser->expat.get(), direct ? startDirect : startConverted);
     const XML_EndElementHandler forward = direct ? endDirect : endConverted;
     XML_SetEndElementHandler(parser->expat.get(), end != nullptr ? forward : nullptr);
@@ -190,9 +215,20 @@ void XML1_SetUserData(XML1_PARSER* parser, void* userData) {
 }
 
 void* XML1_GetBuffer(XML1_PARSER* parser, int length) {
-    void* const buffer = XML_GetBuffer(parser->expat.get(), length);
+    parser->buffer = nullptr;
+    parser->capacity = 0;
+    if (length < 0 || parser->hasEnded) {
+        parser->error = length < 0 ? XML_ERROR_INVALID_ARGUMENT : XML_ERROR_FINISHED;
+        return nullptr;
+    }
+    // Some versions of expat have no buffer to give for 0 bytes.
+    void* const buffer = XML_GetBuffer(parser->expat.get(), length > 0 ? length : 1);
+    if (buffer == nullptr) {
+        parser->error = XML_GetErrorCode(parser->expat.get());
+        return nullptr;
+    }
     parser->buffer = static_cast<const char*>(buffer);
-    parser->capacity = buffer != nullptr ? length : 0;
+    parser->capacity = length;
     return buffer;
 }
 
@@ -201,27 +237,29 @@ int XML1_ParseBuffer(XML1_PARSER* parser, int length, int isFinal) {
         parser->error = XML_ERROR_INVALID_ARGUMENT;
         return 0;
     }
-    try {
-        const XML_Status status =
-            parser->encodingDecided
-                ? XML_ParseBuffer(parser->expat.get(), length, isFinal != 0 ? 1 : 0)
-                : parseHead(*parser, length, isFinal != 0);
-        parser->capacity = 0;
-        return status == XML_STATUS_OK || endedWithinElement(*parser) ? 1 : 0;
-    } catch (const std::bad_alloc&) {
-        parser->error = XML_ERROR_NO_MEMORY;
+    if (parser->hasFailed) return 0;
+    if (parser->hasEnded) {
+        parser->error = XML_ERROR_FINISHED;
         return 0;
     }
+    parser->capacity = 0;
+    parser->hasEnded = isFinal != 0;
+    parser->error = XML_ERROR_NONE;
+    try {
+        parser->hasFailed = !parse(*parser, length, isFinal != 0);
+    } catch (const std::bad_alloc&) {
+        parser->error = XML_ERROR_NO_MEMORY;
+        parser->hasFailed = true;
+    }
+    return parser->hasFailed ? 0 : 1;
 }
 
 int XML1_GetErrorCode(XML1_PARSER* parser) {
-    if (parser->error != XML_ERROR_NONE) return parser->error;
-    return XML_GetErrorCode(parser->expat.get());
+    return parser->error;
 }
 
 const char* XML1_ErrorString(int code) {
-    constexpr int kRange = 64;  // what the enumeration's type can hold for certain
-    return code >= 0 && code < kRange ? XML_ErrorString(static_cast<XML_Error>(code)) : nullptr;
+    return xml1::errorText(code);
 }
 
 int XML1_GetCurrentLineNumber(XML1_PARSER* parser) {

@@ -29,17 +29,22 @@ void XML1_SetCharacterDataHandler(XML1_PARSER* parser, XML1_DataHandler handler)
 void XML1_SetUserData(XML1_PARSER* parser, void* userData);
 
 /// A buffer of at least `length` bytes for the next piece of input, owned by the parser and valid
-/// until the next call; null when there is no memory.
+/// until the next call. For 0 bytes there is one too. Null when memory is short, when `length` is
+/// negative, and after the last piece.
 void* XML1_GetBuffer(XML1_PARSER* parser, int length);
 
 /// Parses `length` bytes of the buffer from XML1_GetBuffer; `isFinal` is non-zero for the last
-/// piece. Returns 1 on success, 0 after an error. A document that ends while elements are open is
-/// no error: whoever handles the events knows which have not been closed.
+/// piece. A piece of 0 bytes needs no buffer. Returns 1 on success, 0 after an error; after an
+/// error or the last piece every further call returns 0. A document without an element is an error.
+/// One that ends while elements are open is none: whoever handles the events knows which have not
+/// been closed.
 int XML1_ParseBuffer(XML1_PARSER* parser, int length, int isFinal);
 
+/// What was wrong with the last call; 0 when nothing was.
 int XML1_GetErrorCode(XML1_PARSER* parser);
 
-/// A constant text for an error code, or null for a code that has none.
+/// A constant text for an error code, or null for a code that has none. The texts belong to this
+/// interface: they do not depend on which XML library stands behind it, nor on its version.
 const char* XML1_ErrorString(int code);
 
 /// Where the last event or error stands; lines count from 1, columns from 0.
