@@ -69,6 +69,13 @@ bool isSpecial(unsigned short unit) {
 
 }  // namespace
 
+std::string localText(const String& text) {
+    return static_cast<const char*>(text.c_str());
+}
+
+TraceArgument::TraceArgument(const CharStar& text)
+    : kind_(Kind::Text), pointer_(static_cast<const char*>(text)) {}
+
 String::String(String&& other) : String() {
     units_.swap(other.units_);
 }

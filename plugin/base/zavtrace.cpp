@@ -8,8 +8,6 @@
 #include <cstring>
 #include <string_view>
 
-#include "base/zavstr.h"
-
 namespace ZAV {
 namespace {
 
@@ -70,13 +68,9 @@ void appendText(const std::string& conversion, const char* text, std::string& ou
 
 }  // namespace
 
-TraceArgument::TraceArgument(const CharStar& text)
-    : kind_(Kind::Text), pointer_(static_cast<const char*>(text)) {}
-
 void TraceArgument::formatText(const std::string& conversion, std::string& out) const {
     if (kind_ == Kind::Wide) {
-        const CharStar narrow = static_cast<const String*>(pointer_)->c_str();
-        appendText(conversion, narrow, out);
+        appendText(conversion, localText(*static_cast<const String*>(pointer_)).c_str(), out);
     } else {
         const char* const text = static_cast<const char*>(pointer_);
         appendText(conversion, text != nullptr ? text : "(null)", out);

@@ -26,6 +26,10 @@ namespace ZAV {
 class CharStar;
 class String;
 
+/// The text in the local code page. The text type lies above the trace and defines this; the
+/// declaration is all that the trace knows of it.
+std::string localText(const String& text);
+
 /// One argument of a trace line. Borrows what it is made from.
 class TraceArgument {
 public:
@@ -37,7 +41,7 @@ public:
     TraceArgument(const std::string& text) : kind_(Kind::Text), pointer_(text.c_str()) {}
     TraceArgument(const void* pointer) : kind_(Kind::Pointer), pointer_(pointer) {}
     TraceArgument(const String& text) : kind_(Kind::Wide), pointer_(&text) {}
-    TraceArgument(const CharStar& text);
+    TraceArgument(const CharStar& text);  ///< defined with CharStar
 
     /// Appends the argument to `out` under a conversion such as "%-5d" or "%.64s". A text is read
     /// up to its terminating 0 or the conversion's precision, whichever comes first.
