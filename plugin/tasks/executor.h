@@ -1,6 +1,6 @@
-/// The thread that runs queued tasks.
+/// The executor: the one thread that runs the queued tasks, in the order in which they came.
 #pragma once
 
-/// Prepares the queue's lock and starts the thread, which lives as long as the process. Failures
-/// are traced only. Called once.
-void startExecutor();
+/// The thread's body: takes tasks off the queue, runs them and publishes their outcomes. Never
+/// returns; no exception ends it. `unused` is what a thread's function takes.
+void* executor_thread(void* unused);

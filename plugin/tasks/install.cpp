@@ -7,9 +7,9 @@
 #include "base/zavtrace.h"
 #include "platform/bss1.h"
 #include "tasks/failure.h"
+#include "tasks/task_state.h"
 #include "tasks/translator.h"
 #include "tasks/whole_file.h"
-#include "tasks/zavtasks.h"
 #include "tasks/zavtqelm.h"
 #include "util/zavutil.h"
 

@@ -3,7 +3,7 @@
 #include "base/zavtrace.h"
 #include "tasks/home.h"
 #include "tasks/product_arch.h"
-#include "tasks/zavtasks.h"
+#include "tasks/task_state.h"
 #include "util/zavutil.h"
 
 using ZAV::String;

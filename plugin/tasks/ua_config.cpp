@@ -8,11 +8,11 @@
 #include "tasks/failure.h"
 #include "tasks/home.h"
 #include "tasks/start_stop.h"
+#include "tasks/task_state.h"
 #include "tasks/ua_console.h"
 #include "tasks/ua_files.h"
 #include "tasks/ua_setup.h"
 #include "tasks/whole_file.h"
-#include "tasks/zavtasks.h"
 #include "tasks/zavtqelm.h"
 #include "util/zavutil.h"
 

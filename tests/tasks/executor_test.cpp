@@ -8,6 +8,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <filesystem>
+#include <functional>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -39,13 +40,38 @@ std::string newScratchDepot() {
     return scratch.makeDir("depot");
 }
 
+/// Start-up while `request` is made again and again on several threads, each of which ends when its
+/// request is accepted. Returns every result that was not TASK_NOT_SUPPORTED.
+std::vector<TASK_RC> resultsDuringStartUp(const std::function<TASK_RC()>& request) {
+    constexpr unsigned count = 3;
+    std::atomic<unsigned> refused{0};
+    std::vector<TASK_RC> results(count);
+    std::vector<std::thread> requesters;
+    for (TASK_RC& result : results) {
+        requesters.emplace_back([&] {
+            result = request();
+            if (result == TASK_NOT_SUPPORTED) ++refused;
+            while (result == TASK_NOT_SUPPORTED)
+                result = request();
+        });
+    }
+    while (refused < count)
+        std::this_thread::yield();
+    zav_taskmgr_init();
+    for (std::thread& requester : requesters)
+        requester.join();
+    return results;
+}
+
 class Executor : public testing::Test {
 protected:
     Executor() { fake_handlers::reset(); }
     ~Executor() override { fake_handlers::reset(); }
 
+    static void offerDepot() { ::setenv("QVSDEPLOY_AGENTDEPOT", newScratchDepot().c_str(), 1); }
+
     static void start() {
-        ::setenv("QVSDEPLOY_AGENTDEPOT", newScratchDepot().c_str(), 1);
+        offerDepot();
         zav_taskmgr_init();
     }
 
@@ -109,6 +135,30 @@ TEST_F(Executor, IsStartedOnce) {
     EXPECT_EQ(9u, commands.size());
     EXPECT_EQ(threads + 1, threadCount());
     EXPECT_EQ(1u, trace.errors("zavtasks").size());
+}
+
+TEST_F(Executor, RequestsThatArriveDuringItsStartUpAreRefusedOrRun) {
+    if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
+    offerDepot();
+    const TraceCapture trace("ERROR");  // which there are many of
+    Outcomes outcomes;
+    const auto results = resultsDuringStartUp([] {
+        TaskQueueElem task = request("START", "tx");
+        return runTask(task);
+    });
+    EXPECT_EQ(std::vector<TASK_RC>(3, TASK_OK), results);
+    EXPECT_EQ(3u, outcomes.waitFor(3).size());
+}
+
+TEST_F(Executor, RequestsFindAllCommandsAsSoonAsTheyFindOne) {
+    if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
+    offerDepot();
+    const TraceCapture trace("ERROR");  // which there are many of
+    const auto results = resultsDuringStartUp([] {
+        if (!isSupportedTask("START")) return TASK_NOT_SUPPORTED;
+        return isSupportedTask("REMOVEINSTANCE") ? TASK_OK : TASK_INFORMATION;
+    });
+    EXPECT_EQ(std::vector<TASK_RC>(3, TASK_OK), results);
 }
 
 // ---- Running tasks ------------------------------------------------------------------------------
