@@ -1,8 +1,13 @@
 #include "rpc/zavagts.h"
 
-#include <cstring>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
 
-#include "ncs/registry.h"
+#include <cstdint>
+#include <cstring>
+#include <new>
+#include <string>
+#include <vector>
 
 namespace {
 
@@ -179,21 +184,6 @@ TEST_F(StubTest, RefusesNamesThatAreNone) {
 TEST_F(StubTest, AManagerThatThrowsIsAFault) {
     managerThrows = true;
     EXPECT_EQ(callStub(request(true, "name", {"x"})).fault, rpc__s_fault_unspec);
-}
-
-TEST(Interface, IsRegisteredUnderItsIdentifierAndVersion) {
-    EXPECT_EQ(QVS_NCS_RegisterAgentInterface(), 0);
-    ncs::RegisteredInterface found;
-    const uuid__t id = {0xb1fb0fb3, 0x03c4, 0, 2, {0, 0, 0x09, 0x35, 0x18, 0x3d, 0}};
-    ASSERT_TRUE(ncs::findInterface(id, 1, found));
-    EXPECT_EQ(found.interface->operations, 1);
-    EXPECT_EQ(found.stubs, QVS_Agent_v1_server_epv_locator());
-    EXPECT_EQ(static_cast<const QVS_Agent_v1_mgr_epv*>(found.manager)->BinaryDataTransfer,
-              &ZAV::BinaryDataTransfer);
-    EXPECT_FALSE(ncs::findInterface(id, 2, found));
-    const unsigned count = ncs::registeredCount();
-    EXPECT_EQ(QVS_NCS_RegisterAgentInterface(), 0);
-    EXPECT_EQ(ncs::registeredCount(), count) << "registering again adds nothing";
 }
 
 }  // namespace

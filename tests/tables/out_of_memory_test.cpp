@@ -3,9 +3,13 @@
 
 #include <cstdlib>
 #include <cstring>
+#include <memory>
+#include <utility>
+#include <vector>
 
-#include "oxa/internal.h"
+#include "embedded/oxa_host.h"
 #include "support/own_new.h"
+#include "support/request_lender.h"
 #include "tables/zav01agt.h"
 #include "tables/zav02agt.h"
 #include "tables/zav03agt.h"
@@ -59,41 +63,42 @@ TEST(OutOfMemory, WithoutAManagerNothingIsRegistered) {
     expectInitFails(zav_kagdyst_init, zav_kagdyst_static_manager);
 }
 
+const std::vector<oxa::Predicate> startRequest = {{"COMMAND", OPER_EQ, "START"},
+                                                  {"TRANSID", OPER_EQ, "tx"}};
+
 TEST(OutOfMemory, ARequestThatCannotBeMadeIsNone) {
     ASSERT_EQ(0, zav_kagreqt_init());
-    const std::vector<oxa::Predicate> where = {{"COMMAND", OPER_EQ, "START"},
-                                               {"TRANSID", OPER_EQ, "tx"}};
-    RequestDetail detail{where};
-    ContextInfo context;
-    const auto make = [&] {
-        std::unique_ptr<rtoxa> made(zav_kagreqt_static_manager->CreateRtoxa(&detail, &context));
-        return made != nullptr;
-    };
-    ASSERT_TRUE(make());  // so that what is made once for all requests is there
-    EXPECT_LT(10, withEveryFailure(make, [](bool made) { EXPECT_FALSE(made); }));
+    int failures = 0;
+    lendQuery(startRequest, [&](RequestDetail* detail, ContextInfo* context) {
+        const auto make = [&] {
+            std::unique_ptr<rtoxa> made(zav_kagreqt_static_manager->CreateRtoxa(detail, context));
+            return made != nullptr;
+        };
+        ASSERT_TRUE(make());  // so that what is made once for all requests is there
+        failures = withEveryFailure(make, [](bool made) { EXPECT_FALSE(made); });
+    });
+    EXPECT_LT(10, failures);
 }
 
 TEST(OutOfMemory, ASampleThatRunsOutOfMemorySaysSo) {
     ASSERT_EQ(0, zav_kagreqt_init());
-    const std::vector<oxa::Predicate> where = {{"COMMAND", OPER_EQ, "START"},
-                                               {"TRANSID", OPER_EQ, "tx"}};
-    RequestDetail detail{where};
-    ContextInfo context;
-    std::unique_ptr<rtoxa> request;
-    const auto sample = [&] { return request->TakeSample(); };
-    const auto remake = [&] {
-        const long kept = std::exchange(allocationsLeft, -1);
-        request.reset(zav_kagreqt_static_manager->CreateRtoxa(&detail, &context));
-        allocationsLeft = kept;
-    };
-    remake();
-    ASSERT_EQ(0, sample());
-    const int failures = withEveryFailure(
-        [&] {
-            remake();
-            return sample();
-        },
-        [](int status) { EXPECT_TRUE(status == 0 || status == OXA_NO_MEMORY) << status; });
+    int failures = 0;
+    lendQuery(startRequest, [&](RequestDetail* detail, ContextInfo* context) {
+        std::unique_ptr<rtoxa> request;
+        const auto remake = [&] {
+            const long kept = std::exchange(allocationsLeft, -1);
+            request.reset(zav_kagreqt_static_manager->CreateRtoxa(detail, context));
+            allocationsLeft = kept;
+        };
+        remake();
+        ASSERT_EQ(0, request->TakeSample());
+        failures = withEveryFailure(
+            [&] {
+                remake();
+                return request->TakeSample();
+            },
+            [](int status) { EXPECT_TRUE(status == 0 || status == OXA_NO_MEMORY) << status; });
+    });
     EXPECT_LT(10, failures);
 }
 

@@ -9,8 +9,8 @@
 #include <string>
 #include <vector>
 
-#include "oxa/internal.h"
 #include "platform/oxa.h"
+#include "support/request_lender.h"
 
 /// A column as requesters must find it.
 struct ExpectedColumn {
@@ -27,18 +27,17 @@ class MadeRequest {
 public:
     explicit MadeRequest(const char* table, const std::vector<oxa::Predicate>& where = {},
                          int sampleType = 0)
-        : where_(where), manager_("ZAV", table) {
-        RequestDetail detail{where_};
-        ContextInfo context;
-        context.sampleType = sampleType;
-        object_.reset(manager_.CreateRtoxa(&detail, &context));
+        : manager_("ZAV", table) {
+        const auto lend = sampleType == 0 ? lendQuery : lendSubscription;
+        lend(where, [this](RequestDetail* detail, ContextInfo* context) {
+            object_.reset(manager_.CreateRtoxa(detail, context));
+        });
     }
     Agent& operator*() const { return *static_cast<Agent*>(object_.get()); }
     Agent* operator->() const { return static_cast<Agent*>(object_.get()); }
     Manager& manager() { return manager_; }
 
 private:
-    const std::vector<oxa::Predicate> where_;
     Manager manager_;
     std::unique_ptr<rtoxa> object_;
 };
