@@ -289,7 +289,7 @@ function checkReadme(    picture, n, lines, m, i, inBlock, at, same) {
 
 END {
     layers = "docs/layers.txt"
-    rootCount = split("plugin platform/include platform/embedded tests bench", roots, " ")
+    rootCount = split("plugin platform platform/include platform/embedded tests bench", roots, " ")
     readPicture()
     for (i = 1; i <= fileCount; i++) {
         checkRooms(files[i])
