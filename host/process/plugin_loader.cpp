@@ -13,17 +13,21 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr const char* kLibrary = "libzavmgmt.so";
+/// The plain name is for builds and for who links the plug-in; what a system only runs may bring no
+/// more than the name with the version.
+constexpr const char* kLibraries[] = {"libzavmgmt.so", "libzavmgmt.so.1"};
 constexpr const char* kStartFunction = "Initialize_Mgmt_Functions";
 
 std::string defaultFile() {
     std::error_code error;
     const fs::path self = fs::read_symlink("/proc/self/exe", error);
     if (!error) {
-        const fs::path beside = self.parent_path().parent_path() / "lib" / kLibrary;
-        if (fs::exists(beside, error)) return beside.string();
+        for (const char* const library : kLibraries) {
+            const fs::path beside = self.parent_path().parent_path() / "lib" / library;
+            if (fs::exists(beside, error)) return beside.string();
+        }
     }
-    return kLibrary;
+    return kLibraries[1];
 }
 
 /// A name without a slash would be looked for in the loader's path instead of here.

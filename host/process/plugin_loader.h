@@ -9,8 +9,9 @@ namespace host {
 /// A loaded plug-in. It is never unloaded: its threads and tables live as long as the process.
 class Plugin {
 public:
-    /// Loads `file`, or libzavmgmt.so from ../lib beside the executable, else from where the loader
-    /// looks. Throws StartError when there is no such library or it lacks the start-up function.
+    /// Loads `file`, or libzavmgmt.so or libzavmgmt.so.1 from ../lib beside the executable, else
+    /// from where the loader looks. Throws StartError when there is no such library or it lacks the
+    /// start-up function.
     explicit Plugin(const std::optional<std::string>& file);
 
     /// Runs the start-up function and returns its status, 0 for success. TOVRINHOME is set before.
