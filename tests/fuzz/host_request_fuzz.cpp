@@ -5,7 +5,7 @@
 
 #include "host/api/router.h"
 #include "host/tables/json_documents.h"
-#include "platform/sample_table.h"
+#include "conformance/sample_table.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;

@@ -1,4 +1,3 @@
-// ctest-label: threaded
 #include "ncs/memory.h"
 
 #include <gtest/gtest.h>
@@ -6,7 +5,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
-#include <thread>
 #include <vector>
 
 #include "ncs/stub_buffer.h"
@@ -61,35 +59,6 @@ TEST_F(Blocks, FewAreKeptAndReleasedOnDemand) {
     EXPECT_EQ(16 * kMiB, ncs::keptBytes());
     ncs::releaseKeptBlocks();
     EXPECT_EQ(0U, ncs::keptBytes());
-}
-
-TEST_F(Blocks, WhatCannotBeHadIsNull) {
-    EXPECT_EQ(nullptr, rpc__malloc(static_cast<std::size_t>(-1)));
-    EXPECT_EQ(nullptr, rpc__malloc(static_cast<std::size_t>(-1) - 1000));
-    rpc__free(nullptr);
-}
-
-TEST_F(Blocks, MayBeTakenAndGivenByManyThreads) {
-    std::vector<std::thread> threads;
-    for (int t = 0; t < 4; ++t) {
-        threads.emplace_back([t] {
-            for (int i = 0; i < 500; ++i) {
-                auto* const block = static_cast<char*>(rpc__malloc((64 << (i % 4)) * kKiB));
-                block[0] = static_cast<char>(t);
-                std::this_thread::yield();
-                EXPECT_EQ(t, block[0]);
-                rpc__free(block);
-            }
-        });
-    }
-    for (std::thread& thread : threads)
-        thread.join();
-}
-
-TEST(BlockCopy, CopiesBytes) {
-    char to[4] = "abc";
-    rpc__block_copy("xyz", to, 2);
-    EXPECT_STREQ("xyc", to);
 }
 
 TEST(Buffer, KeepsItsContentWhileItGrows) {

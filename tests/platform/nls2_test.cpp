@@ -1,5 +1,3 @@
-// ctest-label: threaded
-
 #include "platform/nls2.h"
 
 #include <iconv.h>
@@ -7,10 +5,8 @@
 #include <locale.h>
 
 #include <algorithm>
-#include <atomic>
 #include <cstdlib>
 #include <random>
-#include <thread>
 
 #include "nls2/codepages.h"
 
@@ -101,29 +97,8 @@ int defaultPage(int& status) {
 
 // --- Opening ---------------------------------------------------------------------------------
 
-TEST(Nls2Open, RefusesWhatDoesNotExist) {
-    EXPECT_EQ(openPage(12345), nullptr);
-    EXPECT_EQ(openPage(0), nullptr);
-    EXPECT_EQ(openPage(-1), nullptr);
-    int status = -1;
-    EXPECT_EQ(NLS2_GetLocale(7, NLS2_CP_UTF8, 0, &status), nullptr);
-    EXPECT_EQ(status, NLS2_NO_LOCALE);
-    EXPECT_NE(NLS2_GetLocale(NLS2_BY_CODEPAGE, NLS2_CP_UTF8, 0, nullptr), nullptr);
-}
-
 TEST(Nls2Open, SelectorIsTheGivenNumber) {
     EXPECT_EQ(NLS2_BY_CODEPAGE, 0x0188000B);
-}
-
-TEST(Nls2Open, ANullHandleConvertsNothing) {
-    int status = -1;
-    EXPECT_EQ(NLS2_GetLocaleCodepageId(nullptr, &status), 0);
-    EXPECT_EQ(status, NLS2_NO_LOCALE);
-    EXPECT_EQ(widen(nullptr, "abc", 4).text, Units());
-    EXPECT_EQ(widen(nullptr, "abc", 4).status, NLS2_NO_LOCALE);
-    EXPECT_EQ(narrow(nullptr, {'a'}, 4).text, "");
-    EXPECT_EQ(narrow(nullptr, {'a'}, 4).status, NLS2_NO_LOCALE);
-    NLS2_ReleaseLocale(nullptr);
 }
 
 class Nls2Default : public testing::Test {
@@ -140,16 +115,6 @@ protected:
         return number;
     }
 };
-
-TEST_F(Nls2Default, IsTheEnvironmentsWhenTheProcessHasSetNone) {
-    EXPECT_EQ(page("C.UTF-8"), 1208);
-    EXPECT_STREQ(::setlocale(LC_ALL, nullptr), "C") << "the process's own locale was changed";
-}
-
-TEST_F(Nls2Default, IsTheProcessesWhenItHasSetOne) {
-    ASSERT_NE(::setlocale(LC_CTYPE, "C.UTF-8"), nullptr);
-    EXPECT_EQ(page("C"), 1208);
-}
 
 TEST_F(Nls2Default, OfPlainCKeepsEveryByte) {
     EXPECT_EQ(page("C"), 819);
@@ -478,36 +443,6 @@ TEST(Nls2Utf8, ReplacesEachMalformedPart) {
     EXPECT_EQ(widen(locale, "\xEF\xBF\xBD", 1).status, NLS2_OK);
 }
 
-TEST(Nls2Utf8, ReplacesSurrogatesWithoutPartner) {
-    NLS2_LOCALE* const locale = openPage(NLS2_CP_UTF8);
-    EXPECT_EQ(narrowed(locale, {0xD83D}), "?");
-    EXPECT_EQ(narrowed(locale, {0xDE00}), "?");
-    EXPECT_EQ(narrowed(locale, {0xDE00, 0xD83D}), "??");
-    EXPECT_EQ(narrowed(locale, {0xD83D, 'a'}), "?a");
-    EXPECT_EQ(narrowed(locale, {0xD83D, 0xD83D, 0xDE00}), "?\xF0\x9F\x98\x80");
-    EXPECT_EQ(narrow(locale, {0xD83D}, 1).status, NLS2_SUBSTITUTED);
-}
-
-TEST(Nls2Utf8, EveryCharacterSurvives) {
-    NLS2_LOCALE* const locale = openPage(NLS2_CP_UTF8);
-    Units units;
-    for (unsigned unit = 0; unit < 0x10000; ++unit) {
-        if (unit < 0xD800 || unit > 0xDFFF) units.push_back(static_cast<unsigned short>(unit));
-    }
-    for (unsigned high = 0xD800; high < 0xDC00; ++high) {
-        for (unsigned low = 0xDC00; low < 0xE000; low += 13) {
-            units.push_back(static_cast<unsigned short>(high));
-            units.push_back(static_cast<unsigned short>(low));
-        }
-    }
-    const Result<std::string> bytes =
-        narrow(locale, units, static_cast<unsigned>(units.size()) * 3);
-    EXPECT_EQ(bytes.status, NLS2_OK);
-    const Result<Units> back = widen(locale, bytes.text, static_cast<unsigned>(units.size()));
-    EXPECT_EQ(back.status, NLS2_OK);
-    EXPECT_TRUE(back.text == units);
-}
-
 TEST(Nls2Utf8, AgreesWithTheCLibrary) {
     NLS2_LOCALE* const locale = openPage(NLS2_CP_UTF8);
     const iconv_t descriptor = ::iconv_open("UTF-8", "UTF-16LE");
@@ -530,30 +465,6 @@ TEST(Nls2Utf8, AgreesWithTheCLibrary) {
         ASSERT_EQ(widened(locale, expected), units);
     }
     ::iconv_close(descriptor);
-}
-
-// --- Threads ---------------------------------------------------------------------------------
-
-TEST(Nls2Threads, ShareAHandle) {
-    std::atomic<int> wrong{0};
-    std::vector<std::thread> threads;
-    for (int i = 0; i < 12; ++i) {
-        threads.emplace_back([&wrong] {
-            int status = -1;
-            for (int turn = 0; turn < 200; ++turn) {
-                NLS2_LOCALE* const locale = NLS2_GetLocale(NLS2_BY_CODEPAGE, 932, 0, &status);
-                const std::string bytes =
-                    "\x82\xA0"
-                    "a\x82\xA2";
-                const Units units = {0x3042, 'a', 0x3044};
-                if (widened(locale, bytes) != units || narrowed(locale, units) != bytes) ++wrong;
-                NLS2_ReleaseLocale(locale);
-            }
-        });
-    }
-    for (std::thread& thread : threads)
-        thread.join();
-    EXPECT_EQ(wrong, 0);
 }
 
 }  // namespace

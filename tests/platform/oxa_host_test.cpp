@@ -12,7 +12,7 @@
 #include <string>
 #include <thread>
 
-#include "platform/sample_table.h"
+#include "conformance/sample_table.h"
 
 namespace {
 
@@ -65,74 +65,6 @@ protected:
 
     SampleManager manager;
 };
-
-TEST_F(Host, AQueryIsSampledOnceAndItsObjectDestroyed) {
-    EXPECT_THAT(ask({}), ElementsAre("alpha", "beta", "gamma"));
-    EXPECT_EQ(1, manager.samples);
-    EXPECT_EQ(0, manager.objects);
-}
-
-TEST_F(Host, AQueryIsNeverAmongTheLiveObjects) {
-    std::vector<unsigned> live{99};
-    manager.onSample = [&] { live = manager.liveNumbers(); };
-    ask({});
-    EXPECT_THAT(live, IsEmpty());
-}
-
-TEST_F(Host, PredicatesAreCombinedWithAnd) {
-    EXPECT_THAT(ask({{"VALUE", OPER_GE, "2"}}), ElementsAre("beta", "gamma"));
-    EXPECT_THAT(ask({{"VALUE", OPER_GE, "2"}, {"NAME", OPER_NE, "beta"}}), ElementsAre("gamma"));
-    EXPECT_THAT(ask({{"NAME", OPER_EQ, "alpha"}, {"NAME", OPER_EQ, "beta"}}), IsEmpty());
-    EXPECT_THAT(ask({{"REMARK", OPER_LIKE, "t*"}}), ElementsAre("beta", "gamma"));
-}
-
-TEST_F(Host, AnEntryThatNamesNoColumnRestrictsNothing) {
-    EXPECT_THAT(ask({{"name", OPER_EQ, "alpha"}}), ElementsAre("alpha", "beta", "gamma"));
-    EXPECT_THAT(ask({{"NAMES", OPER_EQ, "alpha"}}), ElementsAre("alpha", "beta", "gamma"));
-    EXPECT_THAT(ask({{"", OPER_EQ, ""}, {"NAME", OPER_EQ, "beta"}}), ElementsAre("beta"));
-}
-
-TEST_F(Host, AValueWiderThanItsColumnIsComparedUpToTheColumnsWidth) {
-    manager.sample = {sampleRow("abcdefghijkl", 1)};
-    EXPECT_THAT(ask({{"NAME", OPER_EQ, "abcdefghijkl"}}), ElementsAre("abcdefgh"));
-}
-
-/// Reads its filter in its constructor, as tables do.
-class FilterReader : public SampleManager {
-public:
-    FilterReader() : SampleManager("FILTER") {}
-    rtoxa* CreateRtoxa(RequestDetail* detail, ContextInfo* context) override {
-        auto request = std::make_unique<SampleRequest>(detail, context, this);
-        FLT1_FILTERINFO entry{};
-        for (status = request->GetFilterInfo(&entry); status == OXA_OK;
-             status = request->GetFilterInfo(&entry)) {
-            seen.push_back({entry.columnName, entry.op, {entry.value, entry.valueLength}});
-            EXPECT_EQ('\0', entry.value[entry.valueLength]);
-        }
-        return request.release();
-    }
-    std::vector<oxa::Predicate> seen;
-    int status = OXA_OK;
-};
-
-TEST(Filter, EveryEntryIsHandedOnUnchangedAndInOrder) {
-    FilterReader manager;
-    manager.RegisterWithManager();
-    const std::string withZero("a\0b ", 4);
-    oxa::Rows rows;
-    oxa::query(
-        "FILTER",
-        {{"NAME", OPER_EQ, "  x  "}, {"no such", OPER_LIKE, "*"}, {"NAME", OPER_NE, withZero}},
-        rows);
-    ASSERT_EQ(3U, manager.seen.size());
-    EXPECT_EQ("NAME", manager.seen[0].column);
-    EXPECT_EQ(OPER_EQ, manager.seen[0].op);
-    EXPECT_EQ("  x  ", manager.seen[0].value);
-    EXPECT_EQ("no such", manager.seen[1].column);
-    EXPECT_EQ(OPER_LIKE, manager.seen[1].op);
-    EXPECT_EQ(withZero, manager.seen[2].value);
-    EXPECT_EQ(OXA_END_OF_FILTER, manager.status);
-}
 
 TEST_F(Host, AQueryOnAnUnknownTableSaysSo) {
     oxa::Rows rows;
@@ -202,58 +134,6 @@ TEST(Registration, EndsWithTheManager) {
     EXPECT_THAT(oxa::tables(), IsEmpty());
 }
 
-TEST_F(Host, RowsReachALiveSubscriptionThroughItsFilter) {
-    Collector all, some;
-    const auto first = oxa::subscribe("SAMPLE", {}, all.sink());
-    const auto second = oxa::subscribe("SAMPLE", {{"NAME", OPER_EQ, "x"}}, some.sink());
-    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("x", 1)));
-    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("y", 2)));
-    EXPECT_THAT(all.get(), ElementsAre("x", "y"));
-    EXPECT_THAT(some.get(), ElementsAre("x"));
-    EXPECT_EQ(0, manager.samples);
-}
-
-TEST_F(Host, ALiveObjectIsASubscription) {
-    const auto live = oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; });
-    manager.lock();
-    RtoxaListIter objects(&manager);
-    const rtoxa* const object = objects.Next();
-    ASSERT_NE(nullptr, object);
-    EXPECT_EQ(1, object->SampleType());
-    EXPECT_EQ(0U, object->UseCount());
-    EXPECT_EQ(nullptr, objects.Next());
-    EXPECT_EQ(nullptr, objects.Next());
-    manager.unlock();
-}
-
-TEST_F(Host, LiveObjectsAreWalkedInTheOrderInWhichTheyCame) {
-    std::vector<std::unique_ptr<oxa::Subscription>> live;
-    for (int i = 0; i < 5; ++i) {
-        live.push_back(oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; }));
-    }
-    const std::vector<unsigned> all = manager.liveNumbers();
-    ASSERT_EQ(5U, all.size());
-    EXPECT_TRUE(std::is_sorted(all.begin(), all.end()));
-    live[2].reset();
-    EXPECT_THAT(manager.liveNumbers(), ElementsAre(all[0], all[1], all[3], all[4]));
-    live[0].reset();
-    live[4].reset();
-    EXPECT_THAT(manager.liveNumbers(), ElementsAre(all[1], all[3]));
-    live.push_back(oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; }));
-    EXPECT_EQ(3U, manager.liveNumbers().size());
-    EXPECT_EQ(all[1], manager.liveNumbers()[0]);
-}
-
-TEST_F(Host, WhatASinkAnswersIsTheResultOfTheDispatch) {
-    int answer = OXA_OVERFLOW;
-    const auto live = oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) { return answer; });
-    EXPECT_EQ(OXA_OVERFLOW, manager.publish(sampleRow("a", 1)));
-    answer = OXA_GONE;
-    EXPECT_EQ(OXA_GONE, manager.publish(sampleRow("a", 1)));
-    answer = OXA_OK;
-    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("a", 1)));
-}
-
 TEST_F(Host, ASinkThatThrowsLosesItsRowsAndDisturbsNobody) {
     Collector other;
     bool failing = true;
@@ -286,39 +166,6 @@ TEST_F(Host, ADroppedSubscriptionTakesItsObjectAndItsSinkAlong) {
     EXPECT_EQ(1, token.use_count());
     EXPECT_EQ(0, manager.objects);
     EXPECT_EQ(OXA_OK, manager.publish(sampleRow("a", 1)));
-}
-
-TEST_F(Host, AnObjectInUseOutlivesItsSubscriptionUntilTheLastDrop) {
-    int calls = 0;
-    auto live = oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) { return ++calls, OXA_OK; });
-    manager.lock();
-    SampleRequest& object = *static_cast<SampleRequest*>(RtoxaListIter(&manager).Next());
-    object.UseHandle(object.Handle());
-    object.UseHandle(object.Handle());
-    manager.unlock();
-
-    live.reset();
-    EXPECT_EQ(1, manager.objects);
-    EXPECT_THAT(manager.liveNumbers(), IsEmpty());
-    object.add(sampleRow("a", 1));
-    EXPECT_EQ(OXA_GONE, object.Dispatch());
-    EXPECT_EQ(0, calls);
-    object.Drop();
-    EXPECT_EQ(1, manager.objects);
-    object.Drop();
-    EXPECT_EQ(0, manager.objects);
-}
-
-TEST_F(Host, ReRegistrationReplacesTheManagerAndKeepsTheSubscriptions) {
-    Collector rows;
-    const auto before = oxa::subscribe("SAMPLE", {}, rows.sink());
-    SampleManager successor;
-    successor.sample = {sampleRow("new", 1)};
-    ASSERT_EQ(OXA_OK, successor.RegisterWithManager());
-    EXPECT_EQ(1, manager.shutdowns);
-    EXPECT_THAT(ask({}), ElementsAre("new"));
-    EXPECT_EQ(OXA_OK, successor.publish(sampleRow("event", 1)));
-    EXPECT_THAT(rows.get(), ElementsAre("event"));
 }
 
 TEST_F(Host, RegisteringTwiceShutsNobodyDown) {

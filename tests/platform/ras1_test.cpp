@@ -1,4 +1,3 @@
-// ctest-label: threaded
 #include "platform/ras1.h"
 
 #include <fcntl.h>
@@ -11,9 +10,7 @@
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
-#include <sstream>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "embedded/ras1_control.h"
@@ -154,21 +151,6 @@ TEST(Line, LeavesErrnoAlone) {
     errno = EXDEV;
     RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "text");
     EXPECT_EQ(EXDEV, errno);
-}
-
-TEST(Line, LinesOfManyThreadsDoNotMix) {
-    const TraceCapture trace;
-    const std::string text(300, 't');
-    std::vector<std::thread> threads;
-    for (int t = 0; t < 4; ++t) {
-        threads.emplace_back([&] {
-            for (int i = 0; i < 250; ++i)
-                RAS1_Printf(&block, RAS1_DETAIL, 1, "%s", text.c_str());
-        });
-    }
-    for (std::thread& thread : threads)
-        thread.join();
-    EXPECT_EQ(1000, trace.count('D', text));
 }
 
 TEST(Line, AChildBetweenForkAndExecTraces) {

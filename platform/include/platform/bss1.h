@@ -8,7 +8,8 @@ extern "C" {
 /// of the environment as the C library's getenv.
 const char* BSS1_GetEnv(const char* name, const char* fallback);
 
-/// Puts "NAME=value" into the environment. The text is copied. Returns 0, or an errno value.
+/// Puts "NAME=value" into the environment. The text is copied. Returns 0 or an errno value: EINVAL
+/// when `setting` is null, has no "=" or has no name before it.
 int BSS1_PutEnv(const char* setting);
 
 /// Sleeps for `seconds`, whatever signals arrive meanwhile. The library sleeps through this

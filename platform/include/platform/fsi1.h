@@ -22,16 +22,16 @@ struct FSI1_LIST;
 
 extern "C" {
 
-/// Opens a listing of `directory`. On FSI1_OK `*list` is to be closed with FSI1_DeleteList; on any
-/// other result it is null.
+/// Opens a listing of `directory`. On FSI1_OK the caller closes `*list` with FSI1_DeleteList; on any
+/// other result it is null. EINVAL when `directory` is null.
 int FSI1_NewList(const char* directory, FSI1_LIST** list);
 
 /// Fetches the next entry, in no particular order; "." and ".." are left out, and so are entries
 /// that vanish while the listing runs or whose path does not fit. FSI1_END_OF_LIST after the last
-/// one; `*entry` is meaningful with FSI1_OK only.
+/// one, and again after that; EINVAL for a null handle. `*entry` is meaningful with FSI1_OK only.
 int FSI1_FetchList(FSI1_LIST* list, FSI1_ENTRY* entry);
 
-/// Closes a listing. The handle is gone whatever the result.
+/// Closes a listing. The handle is gone whatever the result. EINVAL for a null handle.
 int FSI1_DeleteList(FSI1_LIST* list);
 
 }  // extern "C"

@@ -1,6 +1,7 @@
-/// A table made up for tests: readings with a name, a value and a remark.
+/// A table made up for checks: readings with a name, a value and a remark.
 #pragma once
 
+#include <algorithm>
 #include <atomic>
 #include <cstdint>
 #include <cstring>
@@ -76,7 +77,7 @@ public:
     }
     void Shutdown(unsigned long) override { ++shutdowns; }
 
-    /// Hands one row to every live object; the last status that was not 0.
+    /// Hands one row to every live object. Returns the last status that was not 0.
     int publish(const SampleRow& row) {
         int result = 0;
         lock();
