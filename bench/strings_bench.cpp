@@ -166,7 +166,11 @@ void insertEscapes(benchmark::State& state) {
 void addOperation(const std::string& name, void (*own)(benchmark::State&),
                   void (*standard)(benchmark::State&)) {
     for (const auto& [way, run] : {std::pair{"/string", own}, std::pair{"/standard", standard}}) {
-        benchmark::RegisterBenchmark((name + way).c_str(), run)->Arg(32)->Arg(256)->Arg(65536);
+        benchmark::RegisterBenchmark((name + way).c_str(), run)
+            ->Arg(32)
+            ->Arg(256)
+            ->Arg(1024)
+            ->Arg(65536);
     }
 }
 

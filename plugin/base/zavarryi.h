@@ -29,7 +29,12 @@ void CopyMem(T* dest, const T* src, std::uint32_t count) {
 template <typename T>
 class Array {
 public:
-    Array() : data(new T[kInitialCapacity]), size(0), capacity(kInitialCapacity) {}
+    Array() : Array(0) {}
+    /// An array of `n` elements, which are left as they are.
+    explicit Array(std::uint32_t n)
+        : data(nullptr), size(n), capacity(n > kInitialCapacity ? n : kInitialCapacity) {
+        data = new T[capacity];
+    }
     Array(const Array& other) : data(nullptr), size(0), capacity(0) { init(other); }
     /// Leaves `other` empty and without a block; it may be used like any other array.
     Array(Array&& other) noexcept : data(nullptr), size(0), capacity(0) { swap(other); }

@@ -50,12 +50,58 @@ std::uint32_t indexOf(const unsigned short* units, std::uint32_t start, std::uin
     return start;
 }
 
+/// Copies the two ends of a text, which may overlap: it has as many units as one or two words.
+template <typename Word>
+void copyEnds(unsigned short* to, const unsigned short* from, std::uint32_t n) {
+    constexpr std::uint32_t kUnits = sizeof(Word) / sizeof(unsigned short);
+    Word first;
+    Word last;
+    std::memcpy(&first, from, sizeof first);
+    std::memcpy(&last, from + n - kUnits, sizeof last);
+    std::memcpy(to, &first, sizeof first);
+    std::memcpy(to + n - kUnits, &last, sizeof last);
+}
+
+/// Copies a text in pieces that are short enough for the C library to use vector moves. For longer
+/// ones it uses a string instruction that takes three times as long on some processors.
+void copyLong(unsigned short* to, const unsigned short* from, std::uint32_t n) {
+    constexpr std::uint32_t kPiece = 512;
+    while (n > 0) {
+        const std::uint32_t piece = std::min(n, kPiece);
+        std::memcpy(to, from, piece * sizeof *to);
+        to += piece;
+        from += piece;
+        n -= piece;
+    }
+}
+
+/// Copies `n` units. Most texts are short, and a call would take longer than the copy.
+inline void copyUnits(unsigned short* to, const unsigned short* from, std::uint32_t n) {
+    if (n > 2 * kBlock) {
+        copyLong(to, from, n);
+    } else if (n >= kBlock) {
+        copyEnds<UnitBlock>(to, from, n);
+    } else if (n >= 4) {
+        copyEnds<std::uint64_t>(to, from, n);
+    } else if (n > 0) {
+        to[0] = from[0];
+        to[n / 2] = from[n / 2];
+        to[n - 1] = from[n - 1];
+    }
+}
+
 std::uint32_t lengthOf(const unsigned short* units) {
     std::size_t count = 0;
     while (units[count] != 0)
         ++count;
     if (count >= UINT32_MAX) throwArrayTooLong();
     return static_cast<std::uint32_t>(count);
+}
+
+/// `n`, of which a count that leaves no room for the terminator is refused: it must not wrap.
+std::uint32_t withRoomForTerminator(std::uint32_t n) {
+    if (n == UINT32_MAX) throwArrayTooLong();
+    return n;
 }
 
 bool occursIn(const String& set, unsigned short unit) {
@@ -80,22 +126,20 @@ String::String(String&& other) : String() {
     units_.swap(other.units_);
 }
 
-String::String(const String& other, std::uint32_t n) {
-    // A count that leaves no room for the terminator must not wrap.
-    if (n == UINT32_MAX) throwArrayTooLong();
-    units_.reserveCapacity(n + 1);
-    units_.append(other.getData(), n);
-    terminate();
+/// Takes `n` units in a block of just the size that they need.
+String::String(Counted, const unsigned short* units, std::uint32_t n) : units_(n + 1) {
+    unsigned short* const own = units_.getData();
+    copyUnits(own, units, n);
+    own[n] = 0;
 }
 
-String::String(const unsigned short* units) {
-    if (units != nullptr) {
-        const std::uint32_t count = lengthOf(units);
-        units_.reserveCapacity(count + 1);
-        units_.append(units, count);
-    }
-    terminate();
-}
+String::String(const String& other) : String(Counted{}, other.getData(), other.length()) {}
+
+String::String(const String& other, std::uint32_t n)
+    : String(Counted{}, other.getData(), withRoomForTerminator(n)) {}
+
+String::String(const unsigned short* units)
+    : String(Counted{}, units, units != nullptr ? lengthOf(units) : 0) {}
 
 String& String::operator=(const String& other) {
     return this == &other ? *this : assign(other);
@@ -115,15 +159,7 @@ String& String::assign(const unsigned short* units) {
 }
 
 String& String::assign(const unsigned short* units, std::uint32_t n) {
-    String assigned;
-    if (units != nullptr) {
-        if (n == UINT32_MAX) throwArrayTooLong();
-        assigned.units_.reserveCapacity(n + 1);
-        assigned.units_.remove(0, 1);
-        assigned.units_.append(units, n);
-        assigned.terminate();
-    }
-    return *this = std::move(assigned);
+    return *this = String(Counted{}, units, units != nullptr ? withRoomForTerminator(n) : 0);
 }
 
 String& String::assign(const String& other) {
@@ -277,10 +313,7 @@ String String::substr(std::uint32_t pos) const {
 String String::substr(std::uint32_t pos, std::uint32_t n) const {
     const Trace trace(traceUnit);
     if (!isRange(pos, n, length())) throwOutOfBounds(trace);
-    String result;
-    result.units_.reserveCapacity(n + 1);
-    result.appendRange(*this, pos, n);
-    return result;
+    return String(Counted{}, getData() + pos, n);
 }
 
 std::uint32_t String::find(unsigned short ch, std::uint32_t start) const {

@@ -47,7 +47,7 @@ public:
     static constexpr std::uint32_t NPOS = 0xFFFFFFFFu;
 
     String() { terminate(); }
-    String(const String& other) = default;
+    String(const String& other);
     /// Leaves `other` empty. May run out of memory, since `other` needs a block for its terminator.
     String(String&& other);
     /// The first `n` units of `other`, which is trusted to have them.
@@ -155,6 +155,10 @@ private:
     static bool initializeLocked();
     static NLS2_LOCALE* localeForConversion();
     [[noreturn]] static void throwBadSubscript();
+
+    /// Names the constructor that takes the number of units, which is less than UINT32_MAX.
+    struct Counted {};
+    String(Counted, const unsigned short* units, std::uint32_t n);
 
     void terminate() { units_.append(0); }
     void convertFrom(const char* text);

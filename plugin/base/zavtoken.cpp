@@ -1,6 +1,5 @@
 #include "base/zavtoken.h"
 
-#include <algorithm>
 #include <utility>
 
 #include "base/zavtrace.h"
@@ -12,57 +11,59 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtoken"};
 
-std::uint32_t index(int p) {
-    return static_cast<std::uint32_t>(p);
-}
-
 }  // namespace
 
-StringTokenizer::StringTokenizer(String textToSplit) : text(std::move(textToSplit)) {}
+StringTokenizer::StringTokenizer(String textToSplit)
+    : StringTokenizer(std::move(textToSplit), String()) {}
 
 StringTokenizer::StringTokenizer(String textToSplit, String delimiterCharacters)
-    : text(std::move(textToSplit)), delimiters(std::move(delimiterCharacters)) {}
+    : text(std::move(textToSplit)),
+      delimiters(std::move(delimiterCharacters)),
+      delimiterSet(delimiters.getData(), delimiters.length()),
+      position(skipDelimiters(0)) {}
 
-bool StringTokenizer::isDelimiterAt(int p) const {
-    const unsigned short unit = text[index(p)];
-    // String::find is what throws without delimiters; a trace block for each character of the text
-    // would cost more than all the rest.
-    if (delimiters.length() == 0) return delimiters.find(unit, 0) != String::NPOS;
-    const unsigned short* const first = delimiters.getData();
-    const unsigned short* const end = first + delimiters.length();
-    return std::find(first, end, unit) != end;
+/// The first index at or after `p` that holds no delimiter, else the length.
+inline std::uint32_t StringTokenizer::skipDelimiters(std::uint32_t p) const {
+    const unsigned short* const units = text.getData();
+    return static_cast<std::uint32_t>(delimiterSet.findOther(units + p, units + text.length()) -
+                                      units);
 }
 
-int StringTokenizer::skipDelimiters(int p) const {
-    while (index(p) < text.length() && isDelimiterAt(p))
-        ++p;
-    return p;
+/// The end of the token at `p`.
+inline std::uint32_t StringTokenizer::readToken(std::uint32_t p) const {
+    const unsigned short* const units = text.getData();
+    return static_cast<std::uint32_t>(delimiterSet.findMember(units + p, units + text.length()) -
+                                      units);
 }
 
-int StringTokenizer::readToken(int p) const {
-    while (index(p) < text.length() && !isDelimiterAt(p))
-        ++p;
-    return p;
+/// Whether there is a token at the position. Throws when there are no delimiters, as a search among
+/// none does.
+inline bool StringTokenizer::isAtToken() const {
+    if (position >= text.length()) return false;
+    if (delimiters.length() == 0) delimiters.find(text.getData()[position], 0);
+    return true;
 }
 
 bool StringTokenizer::hasMoreTokens() const {
     Trace trace(traceUnit);
-    return trace.exit(index(skipDelimiters(position)) < text.length());
+    return trace.exit(isAtToken());
 }
 
 int StringTokenizer::countTokens() const {
     Trace trace(traceUnit);
     int count = 0;
-    for (int p = skipDelimiters(position); index(p) < text.length(); p = skipDelimiters(p)) {
-        p = readToken(p);
-        ++count;
+    if (isAtToken()) {
+        for (std::uint32_t p = position; p < text.length(); p = skipDelimiters(readToken(p)))
+            ++count;
     }
     return trace.exit(count);
 }
 
 String StringTokenizer::nextToken() {
     const Trace trace(traceUnit);
-    const int start = skipDelimiters(position);
-    position = readToken(start);
-    return text.substr(index(start), index(position - start));
+    // Where there is no token, substr is asked for nothing and throws.
+    const std::uint32_t start = position;
+    const std::uint32_t end = isAtToken() ? readToken(start) : start;
+    position = skipDelimiters(end);
+    return text.substr(start, end - start);
 }

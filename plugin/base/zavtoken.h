@@ -1,5 +1,8 @@
 #pragma once
 
+#include <cstdint>
+
+#include "base/unit_set.h"
 #include "base/zavstr.h"
 
 /// Splits a text at delimiter characters; runs of them count as one, and those at the ends as none.
@@ -19,11 +22,12 @@ public:
     ZAV::String nextToken();
 
 private:
-    bool isDelimiterAt(int p) const;
-    int skipDelimiters(int p) const;
-    int readToken(int p) const;
+    bool isAtToken() const;
+    std::uint32_t skipDelimiters(std::uint32_t p) const;
+    std::uint32_t readToken(std::uint32_t p) const;
 
     ZAV::String text;
     ZAV::String delimiters;
-    int position = 0;  // where the unread rest begins
+    ZAV::UnitSet delimiterSet;
+    std::uint32_t position;  // of the next token, or the length when there is none
 };

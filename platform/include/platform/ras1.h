@@ -57,9 +57,8 @@ void RAS1_Printf(const RAS1_BLOCK* block, unsigned level, int line, const char* 
 
 /// The unit's flags as they are now.
 inline unsigned RAS1_Flags(RAS1_UNIT& unit) {
-    if (unit.generation.load(std::memory_order_acquire) ==
-        RAS1_Generation.load(std::memory_order_relaxed)) {
-        return unit.flags.load(std::memory_order_relaxed);
-    }
-    return RAS1_Sync(&unit);
+    const bool changed = unit.generation.load(std::memory_order_acquire) !=
+                         RAS1_Generation.load(std::memory_order_relaxed);
+    if (__builtin_expect(changed, false)) return RAS1_Sync(&unit);
+    return unit.flags.load(std::memory_order_relaxed);
 }
