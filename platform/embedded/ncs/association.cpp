@@ -15,6 +15,8 @@ RAS1_UNIT traceUnit{"ncs"};
 constexpr std::size_t kMostContexts = 32;
 /// Unsent output beyond which no more requests are handled.
 constexpr std::size_t kOutputPause = std::size_t{256} << 10;
+/// Length of the largest packet that is not a request.
+constexpr std::size_t kLargestControlPacket = 8192;
 constexpr std::size_t kReplyCapacity = std::size_t{64} << 10;
 
 template <typename... Arguments>
@@ -107,7 +109,7 @@ bool Association::handleNext() {
         return false;
     }
     if (header.is(PduType::Request)) return handleFragment(pdu, available, header);
-    if (header.fragmentLength > sizeof inbox_) {
+    if (header.fragmentLength > kLargestControlPacket) {
         protocolError(header);
         return false;
     }

@@ -108,8 +108,10 @@ private:
     std::size_t directLeft_ = 0;  ///< bytes of this fragment's stub data that are still to come
     bool lastFragment_ = false;
 
-    /// Holds heads, and packets other than requests; what of it is not handled yet.
-    unsigned char inbox_[8192];
+    /// Bytes that are not handled yet: heads, packets other than requests, and requests small
+    /// enough that several come with one read. Untouched memory costs nothing, so it may be
+    /// generous.
+    unsigned char inbox_[std::size_t{32} << 10];
     std::size_t inboxStart_ = 0;
     std::size_t inboxEnd_ = 0;
 };
