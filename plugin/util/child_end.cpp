@@ -29,8 +29,8 @@ struct Forgotten {
 };
 
 Forgotten& forgotten() {
-    // Never destroyed, because threads that outlive main use it, and made without asking for
-    // memory, because the callers cannot fail.
+    // Never destroyed, because threads that outlive main use it. Constructed in static storage,
+    // because the callers cannot handle a failed allocation.
     alignas(Forgotten) static unsigned char place[sizeof(Forgotten)];
     static Forgotten& instance = *new (place) Forgotten;
     return instance;
@@ -80,7 +80,7 @@ void reapLater(pid_t pid) noexcept {
         const std::lock_guard<std::mutex> lock(forgotten().mutex);
         forgotten().children.push_back(pid);
     } catch (...) {
-        // Without memory for its id the child stays unreaped until this process ends.
+        // No memory for its id: the child stays a zombie until this process ends.
     }
 }
 

@@ -1,4 +1,4 @@
-/// Noticing that children have ended, without a look at anybody else's.
+/// Noticing that a child has ended, without reaping children that others have started.
 #pragma once
 
 #include <sys/types.h>
@@ -7,21 +7,22 @@
 
 namespace ZAV {
 
-/// One look at the child `pid`: its id when it has ended, which reaps it and sets `status` as
-/// waitpid does; 0 while it runs; -1 with errno when there is no such child.
+/// Checks the child `pid` without waiting. When it has ended, reaps it, sets `status` as waitpid
+/// does and returns its id. Returns 0 while it runs, and -1 with errno set when there is no such
+/// child.
 pid_t pollChild(pid_t pid, int& status);
 
-/// Lets the calling thread sleep for some milliseconds, before it asks again for what the system
-/// could not tell.
+/// Sleeps for a few milliseconds: the pause before asking the system again after it failed to
+/// answer.
 void shortPause();
 
-/// Lets a thread sleep until one child of this process ends.
+/// Waits for the end of one child of this process.
 class ChildWatch {
 public:
-    /// `pid` must not have been reaped while this exists.
+    /// Nobody may reap `pid` while this object exists.
     explicit ChildWatch(pid_t pid) : pid_(pid) {}
 
-    /// Returns when the child has ended, after `milliseconds` at the latest; may return early.
+    /// Returns when the child has ended, or after `milliseconds`. May return early.
     void pause(int milliseconds);
 
 private:
@@ -29,14 +30,14 @@ private:
 
     pid_t pid_;
     bool asked_ = false;
-    FileDescriptor handle_;  // readable once the child has ended; not open on kernels without it
-    int step_ = 1;           // milliseconds between two looks there
+    FileDescriptor handle_;  // a pidfd, readable once the child has ended; not open on old kernels
+    int step_ = 1;           // milliseconds between two checks without a pidfd
 };
 
-/// Leaves the child to a later call of reapForgotten. Any thread.
+/// Leaves the child for a later call of reapForgotten. Any thread.
 void reapLater(pid_t pid) noexcept;
 
-/// Reaps those of the children left to it that have ended. Does not wait. Any thread.
+/// Reaps those children that were left to it and have ended. Does not wait. Any thread.
 void reapForgotten() noexcept;
 
 }  // namespace ZAV

@@ -1,19 +1,19 @@
-/// The environment that a child is to have, made before there is a child.
+/// A child's environment, built before the child exists.
 #pragma once
 
 #include <vector>
 
 namespace ZAV {
 
-/// A list of "NAME=value" texts that follows putenv's rules. Borrows every text: the process's own
-/// and those put in must stay until the child has been started.
+/// A list of "NAME=value" texts that follows putenv's rules. Borrows every text: those of the
+/// process and those passed to put must stay valid until the child has been started.
 class ChildEnvironment {
 public:
-    /// Starts with the texts of `base`, a list that ends in a null pointer, or null. Reads the list
-    /// as getenv would, so nobody may change it at the same time.
+    /// Starts with the texts of `base`, which is null or a list that ends in a null pointer. Nobody
+    /// may change that list meanwhile, as with getenv.
     explicit ChildEnvironment(char* const* base);
 
-    /// "NAME=value" takes the place of NAME's value or is added; "NAME" alone takes NAME out.
+    /// "NAME=value" sets the variable; "NAME" alone removes it.
     void put(const char* setting);
     /// The value of `name`, or null.
     const char* find(const char* name) const;

@@ -1,4 +1,4 @@
-// Running a command to its end and collecting what it writes.
+// Runs a command to its end and collects what it writes.
 
 #include <poll.h>
 
@@ -19,13 +19,13 @@ RAS1_UNIT traceUnit{"zavutil"};
 constexpr int kChunkSize = 16384;
 constexpr int kLongestPoll = 60 * 1000;  // milliseconds; the deadline may be further off
 
-/// Commands with this in them start agents, whose own background processes inherit the pipes and
-/// keep them open: there is no end of file to read up to.
+/// Commands that contain this start agents. The agents' background processes inherit the pipes and
+/// keep them open, so there is no end of file to wait for.
 constexpr const char* kAgentScript = "TovrinAgent";
 
-/// Waits until one of the descriptors is ready; false when the deadline has passed before. When
-/// the system cannot even tell, it is asked again a little later: to go on as if something were
-/// ready could mean to wait without end.
+/// Waits until one of the descriptors is ready; false when the deadline passes first. When poll
+/// itself fails, it is tried again a little later: going on as if a descriptor were ready could
+/// block for ever.
 bool pollUntil(pollfd* descriptors, nfds_t count, const Deadline& deadline) {
     for (;;) {
         const int ready = ::poll(descriptors, count, deadline.millisecondsLeft(kLongestPoll));
@@ -35,7 +35,7 @@ bool pollUntil(pollfd* descriptors, nfds_t count, const Deadline& deadline) {
     }
 }
 
-/// What one of the child's output streams has brought so far.
+/// One of the child's output streams and what has been read from it so far.
 class Output {
 public:
     /// `chunkFormat` is the format of the trace line for each chunk.
@@ -45,7 +45,8 @@ public:
     bool ended() const { return ended_; }
     int descriptor() const { return stream_.descriptor(); }
 
-    /// Reads once and collects it, each chunk converted on its own; waits when nothing is there.
+    /// Reads one chunk, waiting for it if necessary, and collects it. Each chunk is converted from
+    /// the local code page by itself.
     void readChunk(const Trace& trace) {
         char chunk[kChunkSize + 1];
         const int got = stream_.read(chunk, kChunkSize);
@@ -58,20 +59,20 @@ public:
         units_.append(String(chunk));
     }
 
-    /// Reads up to the end. False when the deadline passes before.
+    /// Reads to the end of the stream; false when the deadline passes first.
     bool drain(const Trace& trace, const Deadline& deadline) {
         while (!ended_) {
             pollfd readable{descriptor(), POLLIN, 0};
             if (!pollUntil(&readable, 1, deadline)) return false;
             readChunk(trace);
-            // A child that never stops writing is ready all the time.
+            // The descriptor of a child that never stops writing is always ready.
             if (!ended_ && deadline.passed()) return false;
         }
         return true;
     }
 
-    /// The one read that follows the end of the child. A stream that somebody else keeps open
-    /// without writing to it holds nothing up beyond the deadline.
+    /// The one read after the child has ended. Another process may keep the stream open without
+    /// writing to it; that delays this no longer than the deadline.
     void readRest(const Trace& trace, bool nonBlocking, const Deadline& deadline) {
         const bool returnsAtOnce = nonBlocking && stream_.setNonBlocking(true) != -1;
         pollfd readable{descriptor(), POLLIN, 0};
@@ -88,7 +89,7 @@ private:
     bool ended_ = false;
 };
 
-/// One started command. An exception that ends the run ends the child too.
+/// A command that has been started. When an exception ends the run, the child is killed.
 class Run {
 public:
     Run(const Trace& trace, Process& process, bool startsAgent)
@@ -101,9 +102,9 @@ public:
     Run(const Run&) = delete;
     Run& operator=(const Run&) = delete;
 
-    /// Gives the child its input, collects its output and waits for its end. The time-out bounds
-    /// all of it: false when it passes, and then the child is killed, also when it has ended itself
-    /// and left its output open to others.
+    /// Gives the child its input, collects its output and waits for its end, all within the
+    /// time-out. Returns false when that passes, and kills the child. This is also the result when
+    /// the child itself has ended, but another process keeps its output open.
     bool finish(const String& input, int& rc, bool nonBlocking) {
         if (!feed(input) || !drain()) {
             process_.giveUp(&rc);
@@ -115,7 +116,7 @@ public:
         return true;
     }
 
-    /// One and the same text for both gets the output, then the errors.
+    /// The caller may pass the same text twice; it then gets the output followed by the errors.
     void copyOutput(String& stdOut, String& stdErr) const {
         stdOut.clear();
         stdErr.clear();
@@ -128,15 +129,15 @@ private:
 
     bool drain() {
         if (startsAgent_) return true;
-        // Once, as the process never reports that it is still running.
+        // Runs once, because running() is always false.
         do {
             if (!out_.drain(trace_, deadline()) || !err_.drain(trace_, deadline())) return false;
         } while (process_.running());
         return true;
     }
 
-    /// Writes the input and closes the child's standard input. A child that does not want it all is
-    /// no failure. False when the deadline passes.
+    /// Writes the input and closes the child's standard input. A child that does not read it all is
+    /// no failure. Returns false when the deadline passes.
     bool feed(const String& input) {
         ProcessOutputStream& stream = *process_.getStdIn();
         const CharStar narrow = input.c_str();
@@ -158,8 +159,8 @@ private:
         return true;
     }
 
-    /// Waits until the child takes more input. Its standard output is drained meanwhile: a child
-    /// that writes while it reads would otherwise wait for us, and we for it.
+    /// Waits until the child takes more input. Reads its standard output meanwhile: a child that
+    /// writes while it reads would otherwise wait for us while we wait for it.
     bool awaitRoom(ProcessOutputStream& stream) {
         pollfd ready[2] = {{stream.descriptor(), POLLOUT, 0}, {out_.descriptor(), POLLIN, 0}};
         const bool alsoDrains = !startsAgent_ && !out_.ended();

@@ -1,4 +1,4 @@
-// Making directory trees.
+// Creates directory trees.
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -22,7 +22,7 @@ bool exists(const char* path) {
     return ::access(path, F_OK) == 0;
 }
 
-/// Makes one directory; returns 0 or the errno value, which is traced.
+/// Creates one directory. Returns 0, or the errno value after tracing it.
 int makeTraced(Trace& trace, const char* path) {
     if (::mkdir(path, kDirectoryMode) == 0) return 0;
     const int failure = errno;
@@ -30,19 +30,19 @@ int makeTraced(Trace& trace, const char* path) {
     return failure;
 }
 
-/// Makes one directory above the one asked for unless it exists.
+/// Creates one of the parent directories unless it exists.
 int makeAbove(Trace& trace, const char* path) {
     if (exists(path)) return 0;
     trace().detail("Making directory %s", path);
     if (::mkdir(path, kDirectoryMode) == 0) return 0;
     const int failure = errno;
-    // Another thread may have made it since; two trees below one new directory both come about.
+    // Another thread may have created it meanwhile, for a tree of its own below the same directory.
     if (failure == EEXIST && exists(path)) return 0;
     trace().error("Failed to make directory %s, return code status", path);
     return failure;
 }
 
-/// Makes the missing directories above `path`, whose leading slashes end at `rest`.
+/// Creates the missing parents of `path`. `rest` points behind its leading slashes.
 int makeAllAbove(Trace& trace, const char* path, const char* rest) {
     for (const char* slash = std::strchr(rest, '/'); slash != nullptr && slash[1] != '\0';
          slash = std::strchr(slash + 1, '/')) {

@@ -1,4 +1,4 @@
-/// A point in time that no change of the system's date moves.
+/// A point in time that does not move when the system's clock is set.
 #pragma once
 
 #include <algorithm>
@@ -6,18 +6,18 @@
 
 namespace ZAV {
 
-/// When a run of a command has had its time. On the monotonic clock, so that a date that jumps
+/// The end of a command's time-out. Uses the monotonic clock, so that setting the system's clock
 /// neither ends a run early nor makes it endless.
 class Deadline {
 public:
-    /// `seconds` from now; 0 and less have passed at once.
+    /// `seconds` from now. With 0 or less it has passed already.
     static Deadline in(int seconds) {
         return Deadline(Clock::now() + std::chrono::seconds(seconds));
     }
 
     bool passed() const { return Clock::now() >= at_; }
 
-    /// What is left in whole milliseconds, rounded up, 0 to `atMost`: the time-out of a poll.
+    /// The time left in whole milliseconds, rounded up, from 0 to `atMost`: a time-out for poll.
     int millisecondsLeft(int atMost) const {
         const long long left =
             std::chrono::ceil<std::chrono::milliseconds>(at_ - Clock::now()).count();

@@ -1,4 +1,4 @@
-// Where the central server keeps its package depot.
+// Finds the central server's package depot.
 #include <string>
 
 #include "base/zavrbndl.h"
@@ -14,8 +14,8 @@ RAS1_UNIT traceUnit{"zavutil"};
 constexpr int kNoDirectory = 1;
 constexpr int kNoServerName = 2;
 
-/// What an ended child left in a stream. A process that it started and that still holds the other
-/// end is not waited for.
+/// Reads what a child that has ended left in a stream. Does not wait for other processes that may
+/// still hold the write end.
 String readRest(ProcessInputStream& stream) {
     stream.setNonBlocking(true);
     std::string text;
@@ -26,7 +26,8 @@ String readRest(ProcessInputStream& stream) {
     return String(text.c_str());
 }
 
-/// The server's name stands before the first "|" of what the home's configuration says.
+/// The server's name is the part before the first "|" of the CELLNAME line in the home's
+/// configuration.
 bool findServerName(Trace& trace, const String& home, String& name) {
     const String command = String("/bin/sh -c \"grep CELLNAME ") + home +
                            "config/.ConfigData/kmsenv | grep -v default\"";
@@ -54,7 +55,7 @@ bool findServerName(Trace& trace, const String& home, String& name) {
     return true;
 }
 
-/// What the server's environment file says, or else the depot beside that file.
+/// The value in the server's environment file, or else the depot beside that file.
 String readDepotHome(Trace& trace, const String& tables) {
     const String environment = tables + "/KBBENV";
     const String usual = tables + "/depot";
@@ -73,7 +74,7 @@ String readDepotHome(Trace& trace, const String& tables) {
     return usual;
 }
 
-/// Sees to it that the depot exists; returns 0 or kNoDirectory.
+/// Checks that the depot exists, or creates it. Returns 0 or kNoDirectory.
 int provideDirectory(Trace& trace, const String& dir, bool create) {
     if (Util::pathExists(dir)) return 0;
     if (!create) {

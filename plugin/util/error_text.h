@@ -1,11 +1,11 @@
-/// The system's text for an errno value, made in one place.
+/// The system's text for an errno value.
 #pragma once
 
 #include <string>
 
 namespace ZAV {
 
-/// What strerror says about `errnum`; safe on any number of threads.
+/// Returns strerror's text for `errnum`. Any thread.
 std::string errorText(int errnum);
 
 }  // namespace ZAV

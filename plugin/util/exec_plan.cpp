@@ -12,7 +12,7 @@ constexpr const char* kShell = "/bin/sh";
 constexpr const char* kSystemPath = "/bin:/usr/bin";
 constexpr std::size_t kScriptPlace = 1;
 
-/// Whether a file that could not be executed for this reason is passed over in a search.
+/// Whether the search goes on with the next directory after this error of exec.
 bool goesOn(int error) {
     switch (error) {
         case EACCES:

@@ -1,4 +1,5 @@
-/// execvp in two halves: what looks up and allocates, and what a child may do before exec.
+/// execvp in two halves: the one that looks up and allocates, and the one that is safe after a
+/// fork.
 #pragma once
 
 #include <string>
@@ -6,15 +7,15 @@
 
 namespace ZAV {
 
-/// How to turn a process into a command, worked out beforehand.
+/// Everything that executing a command needs, prepared before the fork.
 class ExecPlan {
 public:
-    /// Borrows the lists, which end in a null pointer. A first argument without a "/" is looked for
-    /// in the directories of `searchPath` (the system's own when that is null).
+    /// Borrows both lists, which end in a null pointer. A first argument without a "/" is searched
+    /// for in the directories of `searchPath`, or in the system's default path when that is null.
     ExecPlan(char* const* arguments, const char* searchPath, char* const* environment);
 
-    /// Does what execvp does, a script without a "#!" line that the shell runs included. Returns
-    /// when nothing could be executed, with errno set. Async-signal-safe.
+    /// Does what execvp does; like execvp it has the shell run a script that has no "#!" line.
+    /// Returns, with errno set, only when nothing could be executed. Async-signal-safe.
     void execute();
 
 private:

@@ -1,4 +1,4 @@
-// Reading, removing and copying whole files.
+// Reads, removes and copies whole files.
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -19,14 +19,13 @@ RAS1_UNIT traceUnit{"zavutil"};
 constexpr int kNoFileName = 5;
 constexpr mode_t kFileMode = 0666;
 
-/// A file being written, through a buffer: a full disk shows while writing, or, with little to
-/// write, when the file is closed.
+/// A buffered writer. A full disk is reported by write, or, for a short file, by close.
 class BufferedOutput {
 public:
     explicit BufferedOutput(FileDescriptor file) : file_(std::move(file)) {}
 
-    /// Takes `size` bytes, no more than the buffer holds; returns 0 or an errno value. After a
-    /// failure what was in the buffer is gone.
+    /// Writes `size` bytes, at most the buffer's size. Returns 0 or an errno value; after a failure
+    /// the content of the buffer is lost.
     int write(const char* data, std::size_t size) {
         const int rc = size > buffer_.size() - used_ ? flush() : 0;
         if (rc != 0) return rc;
@@ -54,7 +53,7 @@ private:
     std::size_t used_ = 0;
 };
 
-/// Opens a file for the copy, in words of fopen's modes; traces a failure.
+/// Opens a file for the copy; `mode` is one of fopen's. Traces a failure.
 FileDescriptor openTraced(Trace& trace, const char* which, const String& path, const char* mode) {
     const bool writing = mode[0] == 'w';
     FileDescriptor file =
@@ -90,7 +89,7 @@ int copyBlocks(Trace& trace, const FileDescriptor& in, const String& src, Buffer
     }
 }
 
-/// Traces what closing a stream gave, and returns the first failure of the copy.
+/// Traces the result of closing a file. Returns the first failure of the copy.
 int afterClosing(Trace& trace, int soFar, int closed, const String& path) {
     if (closed == 0) return soFar;
     trace().error("Failed to close stream for file %s, error code: %s", path,
@@ -103,7 +102,7 @@ int copyBytes(Trace& trace, const String& src, const String& dst) {
     if (!in.isOpen()) return errno;
     FileDescriptor file = openTraced(trace, "destination", dst, "wb");
     if (!file.isOpen()) {
-        const int failure = errno;  // which closing may change
+        const int failure = errno;  // closing may change it
         return afterClosing(trace, failure, in.close(), src);
     }
     BufferedOutput out(std::move(file));
@@ -112,7 +111,7 @@ int copyBytes(Trace& trace, const String& src, const String& dst) {
     return afterClosing(trace, rc, out.close(), dst);
 }
 
-/// The part that both forms of copyFile have in common once the destination is known.
+/// What both forms of copyFile do once the destination is known.
 int copyTraced(Trace& trace, const String& src, const String& dst) {
     const int rc = Util::_copyFile(src, dst);
     trace().detail("Exit with return code (%d)", rc);

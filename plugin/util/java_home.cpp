@@ -16,13 +16,13 @@ constexpr int kNoDirectory = 1;
 
 constexpr const char* kJavaVariables[] = {"JAVA_HOME", "JAVAHOME"};
 
-/// What fso_test says of a path that stays as it is.
+/// The result of fso_test, without changing the path.
 int kindOf(const char* path) {
     std::string copy = path;
     return Util::fso_test(copy.data());
 }
 
-/// What the home's own script prints, cut to its first line; traces when that is nothing.
+/// Takes the first line that the home's own script prints; traces when it prints nothing.
 void askScript(Trace& trace, const String& homeDir, String& javaHome) {
     const String script = homeDir + "/bin/TovrinGetJavaHome";
     trace().detail("JavaHome location script is [%s]", script);
@@ -42,7 +42,7 @@ void askScript(Trace& trace, const String& homeDir, String& javaHome) {
     javaHome = output;
 }
 
-/// Whether `variable` names a directory; then it is taken.
+/// Takes the directory that `variable` names; false when it names none.
 bool askVariable(Trace& trace, const char* variable, String& javaHome) {
     const char* const value = std::getenv(variable);
     if (value == nullptr || *value == '\0') {

@@ -21,8 +21,8 @@ RAS1_UNIT traceUnit{"zavprnix"};
 constexpr int kLogsKept = 10;
 constexpr const char* kLogPrefix = "zavproc_ras1";
 
-/// What the child needs, so that it neither allocates nor looks anything up. The child runs in the
-/// memory of its parent, whose thread stands still meanwhile.
+/// Everything that the child needs, so that it neither allocates nor looks anything up. The child
+/// runs in its parent's memory while the parent's thread is suspended.
 struct ChildPlan {
     const Trace& trace;
     ExecPlan& exec;
@@ -50,8 +50,8 @@ void traceEntryOfChild(const ChildPlan& plan) {
     traceInChild(plan, RAS1_DETAIL, text);
 }
 
-/// A handler of the parent's must not run in the child, which shares its memory, and a signal that
-/// the parent ignores or blocks is not to be ignored or blocked in the command.
+/// The child shares its parent's memory, so the parent's signal handlers must not run in it. And
+/// the command must not inherit signals that the parent ignores or blocks.
 void resetSignals() {
     struct sigaction byDefault {};
     byDefault.sa_handler = SIG_DFL;
@@ -83,8 +83,8 @@ void connect(const ChildPlan& plan, const FileDescriptor& end, int standard, con
     ::_exit(EXIT_SUCCESS);
 }
 
-/// The calling thread takes no signal and is not cancelled while this exists: between fork and exec
-/// either would act in the child on the memory that it shares.
+/// While it exists, the calling thread takes no signal and cannot be cancelled: between fork and
+/// exec either would happen in the child, on the memory that it shares.
 class Undisturbed {
 public:
     Undisturbed() {
@@ -105,15 +105,15 @@ private:
     int cancelBefore_ = 0;
 };
 
-/// A function of its own, with nothing in its frame that changes after vfork: the child runs on the
-/// same stack before the parent does.
+/// A function of its own, and nothing in its frame changes after vfork, because the child runs on
+/// the same stack before the parent continues.
 [[gnu::noinline]] pid_t forkOnSharedMemory(const ChildPlan& plan) {
     const pid_t pid = ::vfork();
     if (pid == 0) runChild(plan);
     return pid;
 }
 
-/// The setting that tells the child where to trace to; empty when this process does not trace.
+/// The setting that tells the child where to trace; empty when KBB_RAS1 is not set.
 std::string traceSetting(const Trace& trace) {
     const char* const selection = BSS1_GetEnv("KBB_RAS1", nullptr);
     if (selection == nullptr || *selection == '\0') return {};

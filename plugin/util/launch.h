@@ -1,4 +1,4 @@
-/// Making the child process of a command.
+/// Creates the child process of a command.
 #pragma once
 
 #include <string>
@@ -9,17 +9,18 @@
 
 namespace ZAV {
 
-/// Starts the command `argv` (a list that ends in a null pointer, with at least one argument) with
-/// its standard streams on the pipes, with the calling process's environment and the "NAME=value"
-/// texts of `env`. When the calling process is told to trace, so is the child, into a log of its
-/// own in the home's directory "logs".
+/// Starts the command `argv`, a list of at least one argument that ends in a null pointer. Its
+/// standard streams are the pipes; its environment is the calling process's plus the "NAME=value"
+/// texts of `env`. When KBB_RAS1 is set in the calling process, the child traces too, into a log of
+/// its own in the home's directory "logs".
 ///
-/// True when there is a child: `data` has its id, and the child's ends of the pipes are closed.
-/// False, with a trace line, when there is none.
+/// Returns true when there is a child: `data` has its id, and the child's ends of the pipes are
+/// closed here. Returns false, with a trace line, when there is none.
 ///
-/// The memory of the calling process is not copied, so a large process pays no more than a small
-/// one; in return the calling thread stands still until the child has executed the command. The
-/// child has the default signal dispositions and an empty signal mask whatever the caller's are.
+/// The memory of the calling process is not copied, so starting a command costs a large process no
+/// more than a small one. In return the calling thread is suspended until the child has called
+/// exec. The child has default signal dispositions and an empty signal mask, whatever the caller's
+/// are.
 bool forkAndExecute(char* const* argv, const std::vector<std::string>& env, ProcessData& data,
                     ChildPipes& pipes);
 

@@ -1,4 +1,4 @@
-// Command lines and their arguments.
+// Splits command lines into arguments.
 
 #include <cerrno>
 #include <cstring>
@@ -12,13 +12,13 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavprocs"};
 
-/// Puts a 0 in place of every separator and every quote that groups; returns the number of
-/// arguments that the blanks outside quotes make.
+/// Overwrites every separator and every grouping quote with a 0. Returns the number of arguments
+/// that the blanks outside quotes delimit.
 int cutIntoWords(std::string& line) {
     bool inQuote = false;
     bool atSeparator = true;
     int count = 1;
-    char before = '\0';  // as it was written, not as it was cut
+    char before = '\0';  // the character as it was before it was overwritten
     for (char& at : line) {
         const char here = at;
         if (here == ' ' && !inQuote) {
@@ -43,8 +43,8 @@ void freeArguments(char** arguments) {
     std::free(arguments);
 }
 
-/// Each argument is the next run between zeros; what the count demands beyond them is empty. Null
-/// when memory is short.
+/// Copies the runs between zeros; the rest of the `count` arguments are empty texts. Null when out
+/// of memory.
 char** copyWords(const std::string& words, int count) {
     auto** const arguments =
         static_cast<char**>(std::calloc(static_cast<std::size_t>(count) + 1, sizeof(char*)));

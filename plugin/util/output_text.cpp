@@ -1,4 +1,4 @@
-// Paths and values as they come out of scripts and environments.
+// Cleans paths and values that come from scripts and the environment.
 #include <sys/stat.h>
 
 #include <cstring>
@@ -15,7 +15,7 @@ constexpr int kDirectory = 0;
 constexpr int kNoDirectory = 1;
 constexpr int kMissing = 2;
 
-/// Moves what follows a leading quote, and the blanks and quotes behind it, to the front.
+/// Removes a leading quote together with the blanks and quotes after it.
 void dropLeadingQuotes(char* path) {
     constexpr unsigned char kFirstKept = '#';
     if (*path != '"') return;
@@ -25,7 +25,7 @@ void dropLeadingQuotes(char* path) {
     std::memmove(path, kept, std::strlen(kept) + 1);
 }
 
-/// Cleans a path in place as it may come out of a script or a user's profile.
+/// Cleans, in place, a path from a script or a user's profile.
 void cleanPath(char* path) {
     dropLeadingQuotes(path);
     std::size_t length = std::strlen(path);

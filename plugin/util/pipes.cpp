@@ -48,8 +48,8 @@ bool createPipes(Pipe& out, Pipe& err, Pipe& in) {
 }
 
 bool closePipeEnd(FileDescriptor& end) {
-    // On Linux an interrupted close has closed all the same and must not be repeated; but there the
-    // close of a pipe is not interrupted, and elsewhere it has to be.
+    // On Linux an interrupted close has closed the descriptor and must not be repeated, but closing
+    // a pipe is never interrupted there. Elsewhere it can be, and has to be repeated.
     const int fd = end.release();
     int result;
     do {

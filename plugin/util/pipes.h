@@ -1,29 +1,31 @@
-/// The three pipes between a command and whoever runs it.
+/// The three pipes between a command and its caller.
 #pragma once
 
 #include "base/file_descriptor.h"
 
 namespace ZAV {
 
-/// Both ends are close-on-exec from birth, so that no other child holds them, and numbered above 2
-/// even when those are free: a child can make its standard streams of them in any order.
+/// One pipe. Both ends are created close-on-exec, so that no other child inherits them. Their
+/// numbers are above 2 even when lower ones are free, so that a child can dup2 them onto its
+/// standard streams in any order.
 struct Pipe {
     FileDescriptor readEnd;
     FileDescriptor writeEnd;
 };
 
-/// The ends of the names are the child's: it writes `out` and `err` and reads `in`.
+/// Named from the child's side: it writes to `out` and `err` and reads from `in`.
 struct ChildPipes {
     Pipe out;
     Pipe err;
     Pipe in;
 };
 
-/// Makes the pipes for standard output, error and input, in this order. False, with a trace line,
-/// when one cannot be made; those made before stay open.
+/// Creates the pipes for standard output, error and input, in this order. Returns false, with a
+/// trace line, when one cannot be created; the earlier ones stay open.
 bool createPipes(Pipe& out, Pipe& err, Pipe& in);
 
-/// Closes a pipe's end, again and again while a signal interrupts that; false when it was not open.
+/// Closes one end of a pipe and restarts the call when a signal interrupts it. Returns false when
+/// the end was not open.
 bool closePipeEnd(FileDescriptor& end);
 
 }  // namespace ZAV

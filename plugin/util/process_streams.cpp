@@ -22,8 +22,8 @@ int switchNonBlocking(int fd, bool on) {
     return ::fcntl(fd, F_SETFL, on ? flags | O_NONBLOCK : flags & ~O_NONBLOCK);
 }
 
-/// Keeps SIGPIPE from the calling thread while it exists, and takes away the one that a write has
-/// raised. One that was pending before stays.
+/// While it exists, SIGPIPE is blocked in the calling thread; at its end it discards the SIGPIPE
+/// that a write has raised. One that was pending before stays pending.
 class SigpipeHeldBack {
 public:
     SigpipeHeldBack() {

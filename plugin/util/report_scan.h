@@ -1,6 +1,6 @@
-/// Reading the reports of the inventory program and its like: a header line, and below it lines
-/// that consist of fields. Plain text work without traces, so that each reader of a report reports
-/// what it missed in its own words. All functions take time in proportion to the text.
+/// Reads reports such as the inventory program's: a header line, followed by lines of fields.
+/// Traces nothing, so that each caller can report in its own words what is missing. All functions
+/// take time linear in the length of the text.
 #pragma once
 
 #include <cstdint>
@@ -10,25 +10,25 @@
 
 namespace ZAV {
 
-/// Where the part of a report that matters begins; String::NPOS for what was not found.
+/// Where the body of a report begins; String::NPOS for what was not found.
 struct ReportBody {
     std::uint32_t header = String::NPOS;   ///< the header's first code unit
     std::uint32_t newline = String::NPOS;  ///< the first newline at or after it
 };
 
-/// Finds the first `header` in a report, and the end of its line.
+/// Finds the first occurrence of `header` in a report and the end of its line.
 ReportBody findReportBody(const String& report, const String& header);
 
-/// Cuts a text into its tokens, the longest runs without delimiters; tokens are never empty.
-/// Borrows both texts.
+/// Splits a text into tokens, the longest runs without delimiters; tokens are never empty. Borrows
+/// both texts.
 class TokenScanner {
 public:
-    /// `delimiters` are ASCII characters. Begins at code unit `start`, which may lie behind the
-    /// text's end.
+    /// `delimiters` are ASCII characters. Begins at code unit `start`, which may lie beyond the
+    /// end.
     TokenScanner(const String& text, const char* delimiters, std::uint32_t start = 0);
 
-    /// Puts the next token into `token` and returns true; false, and `token` as it was, when there
-    /// is none left.
+    /// Stores the next token in `token` and returns true. When none is left, returns false and
+    /// leaves `token` unchanged.
     bool next(String& token);
 
 private:

@@ -1,4 +1,4 @@
-/// UTF-16 units that are collected piece by piece.
+/// Collects UTF-16 units piece by piece.
 #pragma once
 
 #include <algorithm>
@@ -14,8 +14,8 @@
 
 namespace ZAV {
 
-/// A String grows by exactly what is appended, which copies all of it for every piece. This doubles
-/// its room, and through realloc, which moves the pages of large blocks in place of their bytes.
+/// Doubles its capacity when it is full, where a String would copy its whole text more often. It
+/// uses realloc, which for large blocks remaps pages rather than copying bytes.
 class UnitBuffer {
 public:
     void append(const String& piece) {

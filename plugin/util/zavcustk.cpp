@@ -1,4 +1,4 @@
-// Splitting the RESERVED column.
+// Splits the RESERVED column.
 #include "base/zavtoken.h"
 #include "base/zavtrace.h"
 #include "util/zavutil.h"
@@ -19,7 +19,7 @@ String withoutDots(const String& version) {
     return String::replace(version, ".", "");
 }
 
-/// Where the values go.
+/// The caller's variables.
 struct Outputs {
     String& agentLevel;
     String& agentArch;
@@ -28,7 +28,7 @@ struct Outputs {
     String& commonVersion;
 };
 
-/// Splits one product's entry into its two values; `complaint` is traced when it has not both.
+/// Splits one product's entry into its two values; traces `complaint` when one is missing.
 bool splitProduct(Trace& trace, const String& product, const char* complaint, String& first,
                   String& second) {
     StringTokenizer tokens(product, "=:");
@@ -43,7 +43,7 @@ bool splitProduct(Trace& trace, const String& product, const char* complaint, St
     return true;
 }
 
-/// Stores one product's values; false when the entry is not of its form or of no known product.
+/// Stores one product's values; false when the entry is malformed or its product unknown.
 bool parseProduct(Trace& trace, const String& product, const Outputs& out) {
     String first;
     String second;

@@ -1,4 +1,4 @@
-// A command's process: starting it and waiting for it.
+// Starts a command's process and waits for it.
 
 #include <signal.h>
 #include <sys/wait.h>
@@ -19,14 +19,14 @@ namespace {
 RAS1_UNIT traceUnit{"zavprnix"};
 
 constexpr int kDefaultTimeout = 300;  // seconds
-constexpr int kLongestPause = 1000;   // milliseconds between two looks at a child
-constexpr int kReapingTime = 5;       // seconds that a killed child may take to be gone
+constexpr int kLongestPause = 1000;   // milliseconds between two checks of a child
+constexpr int kReapingTime = 5;       // seconds that a killed child may take to end
 
 int exitStatusOf(int status) {
     return (status >> 8) & 0xff;
 }
 
-/// The arguments of a command line, freed at the end.
+/// Owns the argument list that MakeArgv returns.
 class ArgumentList {
 public:
     explicit ArgumentList(const String& command) : count_(MakeArgv(&command, &arguments_)) {}
@@ -178,7 +178,7 @@ void Process::terminate(const Trace& trace, int* exitCode) {
     const int killed = ::kill(pid, SIGKILL);
     if (killed != 0) trace().error("Error occurred. ERRNO:%d %s", killed, errorText(killed));
     reapKilled();
-    // What stands for the status of a child that had not ended when it was looked at.
+    // Reported for a child that had not ended by then.
     if (exitCode != nullptr) *exitCode = 0;
 }
 
@@ -189,7 +189,7 @@ void Process::killUnlessEnded() noexcept {
 }
 
 void Process::reapKilled() noexcept {
-    // Even a killed child may hang in the kernel, on a dead file server for instance.
+    // Even a killed child can hang in the kernel, for instance on a dead file server.
     const Deadline deadline = Deadline::in(kReapingTime);
     const pid_t pid = processData_->pid;
     ChildWatch watch(pid);

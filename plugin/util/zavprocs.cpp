@@ -1,4 +1,4 @@
-// What goes with child processes: user tokens, error texts and the pruning of their logs.
+// Helpers for child processes: user tokens, error texts and pruning of logs.
 
 #include "util/zavprocs.h"
 
@@ -24,8 +24,8 @@ RAS1_UNIT traceUnit{"zavprocs"};
 constexpr std::uint32_t kUnknownId = 65533;
 constexpr std::size_t kLargestEntry = 1 << 20;
 
-/// Calls one of the C library's re-entrant look-ups with a buffer that is large enough and returns
-/// whether it found an entry.
+/// Calls one of the C library's re-entrant look-up functions with a buffer that is large enough.
+/// Returns whether it found an entry.
 template <typename Entry, typename LookUp>
 bool lookUp(LookUp function, const char* name, Entry& entry, std::vector<char>& buffer) {
     buffer.resize(1024);
@@ -73,7 +73,7 @@ const char* fileName(const char* path) {
     return name;
 }
 
-/// The files of a listing whose names begin with a prefix: how many, and which one is the oldest.
+/// The log files in a directory listing: how many there are, and which one is the oldest.
 struct Logs {
     int count = 0;
     std::string oldest;
@@ -87,7 +87,7 @@ struct Logs {
     }
 };
 
-/// Reads a listing to its end; returns the code that ended it.
+/// Reads a directory listing to its end. Returns the status that ended it.
 int collectLogs(FSI1_LIST* list, const char* prefix, Logs& logs) {
     FSI1_ENTRY entry;
     for (;;) {

@@ -1,9 +1,8 @@
-/// Child processes: one external command with pipes on its standard streams, and what goes with it.
+/// Child processes: one external command with pipes on its standard streams, and helpers around it.
 ///
-/// Failures are reported by results and trace lines. A Process and its streams belong to one thread
-/// at a time; any number of threads may have one each. No signal handler, signal mask or variable
-/// of the environment of the calling process is changed, and no child but the Process's own is
-/// waited for.
+/// Failures are reported by return values and trace lines. A Process and its streams are used by
+/// one thread at a time; any number of threads may have one each. Nothing here changes the calling
+/// process's signal handlers, signal mask or environment, or waits for another child than its own.
 #pragma once
 
 #include <pthread.h>
@@ -25,7 +24,7 @@ namespace ZAV {
 struct ChildPipes;
 class Trace;
 
-/// Bytes that come in.
+/// A source of bytes.
 class InputStream {
 public:
     InputStream() = default;
@@ -33,14 +32,14 @@ public:
     InputStream(const InputStream&) = delete;
     InputStream& operator=(const InputStream&) = delete;
 
-    /// One byte, 0 to 255; -1 when there is none.
+    /// Reads one byte, 0 to 255; -1 at the end or on failure.
     virtual int read() = 0;
-    /// Up to `len` bytes: their number, 0 at the end, -1 on failure with errno set.
+    /// Reads up to `len` bytes. Returns their number, 0 at the end, or -1 with errno set.
     virtual int read(void* buf, int len) = 0;
     virtual bool close() = 0;
 };
 
-/// Bytes that go out.
+/// A sink for bytes.
 class OutputStream {
 public:
     OutputStream() = default;
@@ -48,26 +47,26 @@ public:
     OutputStream(const OutputStream&) = delete;
     OutputStream& operator=(const OutputStream&) = delete;
 
-    /// Writes all of `len` bytes; false when that failed on the way.
+    /// Writes all of `len` bytes; false when only some or none could be written.
     virtual bool write(const char* buf, int len) = 0;
     virtual bool close() = 0;
 };
 
-/// The read end of a pipe. Calls that a signal interrupts are repeated.
+/// The read end of a pipe. Restarts calls that a signal interrupts.
 class ProcessInputStream : public InputStream {
 public:
-    /// Takes the descriptor over; one that was open before is closed.
+    /// Takes ownership of the descriptor and closes the one it had before.
     void attach(FileDescriptor fd) { fd_ = std::move(fd); }
     /// The descriptor to poll, or -1.
     int descriptor() const { return fd_.get(); }
 
     int read() override;
-    /// In non-blocking mode -1 with EAGAIN when nothing is there.
+    /// In non-blocking mode returns -1 with EAGAIN when nothing is there yet.
     int read(void* buf, int len) override;
-    /// Switches O_NONBLOCK; 0, or -1 with errno set.
+    /// Switches O_NONBLOCK. Returns 0, or -1 with errno set.
     int setNonBlocking(bool on);
     bool isNonBlocking() const { return nonBlocking_; }
-    /// False when the descriptor was not open.
+    /// Returns false when the descriptor was not open.
     bool close() override;
 
 private:
@@ -75,16 +74,17 @@ private:
     bool nonBlocking_ = false;
 };
 
-/// The write end of a pipe. Calls that a signal interrupts are repeated; a reader that is gone
-/// makes a write fail with EPIPE and never raises SIGPIPE in the calling process.
+/// The write end of a pipe. Restarts calls that a signal interrupts. When the reader is gone, a
+/// write fails with EPIPE; it never raises SIGPIPE in the calling process.
 class ProcessOutputStream : public OutputStream {
 public:
-    /// Takes the descriptor over; one that was open before is closed.
+    /// Takes ownership of the descriptor and closes the one it had before.
     void attach(FileDescriptor fd) { fd_ = std::move(fd); }
     int descriptor() const { return fd_.get(); }
 
     bool write(const char* buf, int len) override;
-    /// One write: the number of bytes taken, or -1 with errno set (EAGAIN in non-blocking mode).
+    /// Writes once. Returns the number of bytes written, or -1 with errno set (EAGAIN when the pipe
+    /// is full in non-blocking mode).
     ssize_t writeSome(const char* buf, std::size_t len);
     int setNonBlocking(bool on);
     bool close() override;
@@ -93,14 +93,14 @@ private:
     FileDescriptor fd_;
 };
 
-/// One started child.
+/// A child that has been started.
 struct ProcessData {
     int pid = 0;
     int exitStatus = 0;
-    /// Guards exitStatus and exited where a thread waits for the child.
+    /// Guards exitStatus and exited when ProcTerminateThreadFunc waits for the child.
     pthread_mutex_t mutex = PTHREAD_MUTEX_INITIALIZER;
-    /// Signalled by that thread once `exited` is set. Initialised twice: what pthread_cond_init has
-    /// failed on must still be fit to be destroyed.
+    /// Signalled by that thread once `exited` is set. Initialised statically as well, so that it
+    /// can be destroyed even after pthread_cond_init has failed.
     pthread_cond_t waitCond = PTHREAD_COND_INITIALIZER;
     bool exited = false;
 };
@@ -111,7 +111,7 @@ struct user_s_t {
     std::uint32_t gid;
 };
 
-/// One external command. Started at most once:
+/// One external command. Can be started once:
 ///
 ///     Process process("/bin/ls -l");
 ///     if (process.start()) {
@@ -119,14 +119,14 @@ struct user_s_t {
 ///         bool inTime = process.wait(&exitCode);
 ///     }
 ///
-/// The destructor closes what is open of the pipes and neither ends the child nor waits for it; a
-/// child that nobody waited for is reaped when it has ended and the next one is started.
+/// The destructor closes the pipes. It neither kills the child nor waits for it. A child that
+/// nobody waited for is reaped once it has ended, when the next command is started.
 class Process {
 public:
-    /// The command line is split as MakeArgv does. `env` is a list of "NAME=value" texts that ends
-    /// in a null pointer, or null; it is copied. User and group are looked up and kept only: the
-    /// child runs as the caller does. The time-out is TIMEOUT's value in seconds (0 when it is not
-    /// a number), or 300 when that variable is not set.
+    /// MakeArgv splits the command line. `env` is null or a list of "NAME=value" texts that ends in
+    /// a null pointer; it is copied. User and group are only looked up: the child runs as the
+    /// caller does. The time-out is the value of the variable TIMEOUT in seconds (0 when it is not
+    /// a number), or 300 when the variable is not set.
     explicit Process(const String& command);
     Process(const String& command, const char** env);
     Process(const String& command, const char** env, String user, String group);
@@ -134,29 +134,29 @@ public:
     Process(const Process&) = delete;
     Process& operator=(const Process&) = delete;
 
-    /// The streams on the child's standard output, error and input; owned by the Process.
+    /// The other ends of the child's standard output, error and input. The Process owns them.
     ProcessInputStream* getStdOut() const { return stdOut_.get(); }
     ProcessInputStream* getStdErr() const { return stdErr_.get(); }
     ProcessOutputStream* getStdIn() const { return stdIn_.get(); }
 
-    /// Makes the pipes and the child. The first word of the command must be the path of an
-    /// executable. True when there is a child, also when it cannot execute the command: it ends
-    /// with status 0 then.
+    /// Creates the pipes and the child. The first word of the command must be the path of an
+    /// executable. Returns true when there is a child, even when that child cannot execute the
+    /// command: it then ends with status 0.
     bool start();
 
-    /// Waits until the child has ended, but no longer than the time-out from now: then the child is
-    /// killed. True when it ended in time. `*exitCode`, unless null, is its exit status, 0 when it
-    /// was killed. A child that has ended is noticed at once.
+    /// Waits for the child to end and kills it when the time-out, counted from now, has passed.
+    /// Returns true when the child ended in time. `*exitCode`, unless null, becomes its exit
+    /// status, or 0 when it was killed. The end of a child is noticed at once.
     bool wait(int* exitCode);
-    /// The same with a deadline of the caller's.
+    /// Does the same with the caller's own deadline.
     bool waitUntil(const Deadline& deadline, int* exitCode);
-    /// Does what wait does with a child whose time is over, its trace lines included, without
-    /// looking at the child once more. False.
+    /// Does what wait does when the time-out has passed, trace lines included, without checking the
+    /// child once more. Returns false.
     bool giveUp(int* exitCode);
 
-    /// When the time-out is over, counted from start().
+    /// The end of the time-out, counted from start().
     const Deadline& runDeadline() const { return runDeadline_; }
-    /// Kills and reaps a child that nobody has waited for; nothing is traced.
+    /// Kills and reaps the child if nobody has waited for it. Traces nothing.
     void killUnlessEnded() noexcept;
 
     /// Always false.
@@ -189,31 +189,34 @@ private:
     bool reaped_ = false;
 };
 
-/// The ids of a user and a group by their names; null stands for the caller's own. A user that does
-/// not exist gets the id of "nobody", or 65533; a group that does not exist gets the primary group
-/// of the user's entry (nobody's, if that was taken), or 65533. The caller frees the result with
-/// free; null when memory is short.
+/// Looks up the ids of a user and a group by name; null means the caller's own. An unknown user
+/// gets the id of "nobody", or 65533 when there is no such entry either. An unknown group gets the
+/// primary group of the entry that was found for the user ("nobody" included), or 65533. The caller
+/// frees the result with free. Returns null when out of memory.
 user_s_t* create_user_token(const char* user, const char* group, const char* unused);
 
-/// "Error occurred: ERRNO:<number> <text>" in a malloc'ed buffer that the caller frees; null when
-/// memory is short.
+/// Returns "Error occurred: ERRNO:<number> <text>" in a malloc'ed buffer that the caller frees, or
+/// null when out of memory.
 char* getErrorMsg(int errnum);
 
-/// When `dir` holds `keep` files or more whose names begin with `prefix`, deletes the one that was
-/// modified first.
+/// Deletes the oldest file in `dir` whose name begins with `prefix`, by modification time, when
+/// there are `keep` of them or more.
 void pruneLogs(const char* dir, const char* prefix, int keep);
 
 /// Splits a command line at blanks outside quotes and returns the number of arguments. `*argv`
-/// becomes a list of that many texts and a null pointer; list and texts are freed with free. A
-/// quote ends the argument it stands in, so the rest of that word is the next one, and quotes
-/// without anything between them are no argument; places that are left over for such reasons hold
-/// empty texts. There is always at least one argument. A quote behind a backslash is an ordinary
-/// character. Without a command or a place for the list the result is 255 and errno EINVAL; 0 when
-/// memory is short.
+/// becomes a list of that many texts plus a null pointer; the caller frees each text and the list
+/// with free.
+///
+/// A quote ends the argument that it stands in, so the rest of that word becomes the next argument.
+/// Empty quotes yield no argument. The count is taken before that, so the list may end in empty
+/// texts. There is always at least one argument. A quote after a backslash is an ordinary
+/// character.
+///
+/// Returns 255 with errno EINVAL when `command` or `argv` is null, and 0 when out of memory.
 int MakeArgv(const String* command, char*** argv);
 
-/// Thread function that waits for the child of a ProcessData, stores its exit status, signals
-/// `waitCond` and ends its thread. Process::wait does not need it.
+/// Thread function: waits for the child of a ProcessData, stores its exit status, signals
+/// `waitCond` and ends the thread. Process::wait does not use it.
 void* ProcTerminateThreadFunc(void* processData);
 
 }  // namespace ZAV

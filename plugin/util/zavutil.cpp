@@ -1,4 +1,4 @@
-// The directories that the library works in, and the host's name.
+// The library's directories, and the host's name.
 #include "util/zavutil.h"
 
 #include <sys/utsname.h>
@@ -24,14 +24,14 @@ RAS1_UNIT traceUnit{"zavutil"};
 constexpr const char* kHomeVariable = "TOVRINHOME";
 constexpr const char* kDepotVariable = "QVSDEPLOY_AGENTDEPOT";
 
-// One lock for each kept directory, held while it is worked out, so that of several first callers
-// one does the work and the others get its result. The depot's is taken before the home's. All
+// One lock for each cached directory, held while it is determined: one of several first callers
+// does the work and the others get its result. The depot's lock is taken before the home's. All
 // three are constant-initialised and never destroyed.
 std::mutex homeLock;
 std::mutex configLock;
 std::mutex depotLock;
 
-/// Hands out a kept directory, working it out when that has not succeeded yet.
+/// Returns a cached directory, or determines it when that has not succeeded yet.
 bool getKept(std::mutex& lock, String& kept, bool (*init)(String&), String& dir) {
     const std::lock_guard<std::mutex> guard(lock);
     if (kept.length() == 0) {
