@@ -1,4 +1,4 @@
-// The conversion of transferred scripts and model files to this system's line ends.
+// Converts the line ends of transferred scripts and model files to this system's.
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -25,8 +25,8 @@ constexpr mode_t kFileMode = 0770;
 constexpr mode_t kTemporaryMode = 0666;
 constexpr std::size_t kPieceSize = 64 * 1024;
 
-/// One conversion at a time: they share one temporary file. Immortal, since transfers may run while
-/// the process ends.
+/// Allows one conversion at a time, because all share one temporary file. Never destroyed, because
+/// transfers may run while the process exits.
 std::mutex& conversionMutex() {
     static std::mutex& instance = *new std::mutex;
     return instance;
@@ -37,7 +37,8 @@ String temporaryFile() {
     return Util::getTovrinHomeDir(home) ? home + String("/tmp/.zavtemp") : String(".zavtemp");
 }
 
-/// A failed write counts as a failed close, where a stream with a buffer would report it.
+/// Reports a failed write as a failed close, because that is where a buffered stream would report
+/// it.
 struct Copied {
     bool read = true;
     bool written = true;
@@ -62,7 +63,7 @@ bool closeTraced(const Trace& trace, FileDescriptor& file, const char* name, boo
     return false;
 }
 
-/// Puts the converted text in the place of the original.
+/// Replaces the original by the converted text.
 bool replaceFile(const Trace& trace, const char* path, const char* temporary) {
     if (::chmod(temporary, kFileMode) != 0) {
         trace().error("Failed to set permissions on file [%s] to [%d]", temporary, kFileMode);

@@ -1,16 +1,16 @@
-/// Names of transferred files: where below the depot they stand, and whether they stay there.
+/// Names of transferred files: their place in the depot, and whether they lead out of it.
 #pragma once
 
 #include "base/zavstr.h"
 
 namespace ZAV {
 
-/// The name relative to the depot: "\" becomes "/", and one leading "/" goes.
+/// Returns the name relative to the depot: replaces each "\" by "/" and removes one leading "/".
 String transferName(const char* fileName);
 
-/// Whether a name (see transferName) leads out of the depot: a ".." climbs above it, or undoes a
-/// symbolic link, in which case nobody knows where it leads. Links themselves are followed,
-/// because installers put them into the depot. `depot` ends in "/".
+/// Whether a name (see transferName) leads out of the depot: a ".." climbs above it or follows a
+/// symbolic link, after which it could lead anywhere. Links by themselves are allowed, because
+/// installers create them in the depot. `depot` ends in "/".
 bool leadsOutOfDepot(const String& depot, const String& name);
 
 }  // namespace ZAV

@@ -9,8 +9,8 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavagts"};
 
-/// Takes fields out of a request. Every operation checks that they are there and leaves the reader
-/// failed otherwise; a failed reader yields zeros.
+/// Reads fields from a request. Each operation checks that the field is there, and marks the reader
+/// as failed otherwise; a failed reader returns zeros.
 class RequestReader {
 public:
     explicit RequestReader(const rpc__request& request) : request_(request) {}
@@ -31,7 +31,7 @@ public:
         return request_.littleEndian == kLittleEndianMachine ? value : __builtin_bswap16(value);
     }
 
-    /// A 0-terminated text, which stays in the request; null when it is none.
+    /// A 0-terminated text, borrowed from the request; null when it is not well-formed.
     const char* text() {
         const std::uint32_t room = number32();
         const std::uint32_t offset = number32();
@@ -82,8 +82,8 @@ struct RpcMemory {
 };
 using Chunks = std::unique_ptr<ZAV::DataChunk[], RpcMemory>;
 
-/// Copies the chunks out of the request. Null, and the reader failed, when one claims more than it
-/// can hold; null, and the reader still good, when there is no memory.
+/// Copies the chunks from the request. Returns null with a failed reader when a chunk claims more
+/// than it can hold, and null with a reader that has not failed when out of memory.
 Chunks readChunks(RequestReader& reader, std::size_t count) {
     // Checked before the allocation: a small packet must not ask for much memory.
     if (!reader.align(4) || !reader.has(count * sizeof(ZAV::DataChunk))) return nullptr;
@@ -147,7 +147,7 @@ const rpc__server_epv* QVS_Agent_v1_server_epv_locator() {
 std::uint32_t QVS_Agent_v1_BinaryDataTransfer_stub(const rpc__request* request, const void* manager,
                                                    rpc__reply* reply) {
     ZAV::Trace trace(traceUnit);
-    // Memory may run out anywhere in the manager; the runtime's thread must not see that.
+    // Memory may run out anywhere in the manager; no exception may reach the runtime's thread.
     try {
         return trace.exit(callManager(request, manager, reply));
     } catch (...) {

@@ -25,9 +25,9 @@ constexpr std::uint32_t kLongestPath = 1024;
 constexpr mode_t kCreationMode = 0666;
 constexpr mode_t kFileMode = 0770;
 
-/// The destination file, closed at the end of the batch whatever happens. A batch is one gathering
-/// write instead of a buffered one per chunk, so that a full filesystem shows at the chunk that no
-/// longer fits and not when the file is closed.
+/// The destination file, closed at the end of the batch in any case. A batch is written with one
+/// gathering write, without a buffer, so that a full file system is reported for the chunk that no
+/// longer fits rather than when the file is closed.
 class DestinationFile {
 public:
     DestinationFile(const char* path, bool anew)
@@ -36,8 +36,8 @@ public:
 
     bool isOpen() const { return file_.isOpen(); }
 
-    /// Writes pieces that hold data one behind the other; false when one cannot be written.
-    /// `pieces` is left with what was not written at its end, `done` counts the whole ones.
+    /// Writes the pieces, none of them empty, in order; false when one cannot be written. On return
+    /// `done` is the number of pieces written in full, and the pieces after them describe the rest.
     bool write(std::vector<iovec>& pieces, std::size_t& done) const {
         for (done = 0; done < pieces.size();) {
             const int count =
@@ -64,7 +64,7 @@ private:
     FileDescriptor file_;
 };
 
-/// The directory part of a path; false when it has none.
+/// Stores the directory part of a path; false when it has none.
 bool directoryOf(const String& path, String& directory) {
     const std::uint32_t slash = path.rfind('/');
     if (slash == String::NPOS) return false;
@@ -72,22 +72,22 @@ bool directoryOf(const String& path, String& directory) {
     return true;
 }
 
-/// Makes the directory of the destination; false, traced, when that cannot be.
+/// Creates the destination's directory. Returns false, with a trace line, on failure.
 bool ensureDirectory(const Trace& trace, const String& destination) {
     String directory;
     if (!directoryOf(destination, directory) || Util::pathExists(directory)) return true;
-    // Files of one folder may arrive on several threads, of which one makes the directory first.
+    // Files for one directory may arrive on several threads; one of them creates it first.
     const CharStar narrow = directory.c_str();
     if (Util::createDir(narrow) == 0 || Util::pathExists(directory)) return true;
     trace().error("Could not create destination directory %s", directory);
     return false;
 }
 
-/// The batch as pieces to write, and the chunk that each comes from.
+/// A batch as pieces to write, and the chunk that each comes from.
 struct Batch {
     std::vector<iovec> pieces;
     std::vector<std::int32_t> chunks;
-    std::int32_t badChunk = -1;  ///< claims more than a chunk can hold; nothing behind it counts
+    std::int32_t badChunk = -1;  ///< claims more than a chunk holds; those after it are ignored
 };
 
 Batch batchOf(const DataChunk* chunks, std::int32_t lastIndex) {
@@ -114,13 +114,13 @@ bool writeChunks(const Trace& trace, const DestinationFile& file, const DataChun
     std::size_t done = 0;
     const bool written = file.write(batch.pieces, done);
     if (written && batch.badChunk == -1) return true;
-    constexpr int kErrorIndicator = 1;  // what a stream's error indicator says of any failed write
+    constexpr int kErrorIndicator = 1;  // the value of ferror after any failed write
     trace().error("Error writing chunk %d, error number was %d",
                   written ? batch.badChunk : batch.chunks[done], kErrorIndicator);
     return false;
 }
 
-/// Opens, writes and closes the file.
+/// Opens the file, writes the batch and closes the file.
 TransferStatus writeBatch(const Trace& trace, const String& destination, const char* path,
                           bool anew, const DataChunk* chunks, std::int32_t lastIndex) {
     const char* const mode = anew ? "wb" : "a+b";

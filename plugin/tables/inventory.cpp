@@ -22,7 +22,7 @@ constexpr const char* kInventoryHeader =
 constexpr const char* kFieldDelimiters = "\n\r,\"";
 constexpr std::size_t kProductFields = 5;
 
-/// Where the inventory's lines begin; String::NPOS without any.
+/// The position of the first product line; String::NPOS when there is none.
 std::uint32_t startOfProductLines(const String& inventory) {
     Trace trace(traceUnit);
     const ZAV::ReportBody body = ZAV::findReportBody(inventory, kInventoryHeader);
@@ -39,13 +39,13 @@ std::uint32_t startOfProductLines(const String& inventory) {
     return trace.exit(body.newline);
 }
 
-/// Versions of eight characters carry their last number with one digit too few for the table.
+/// In versions of eight characters the last number has one digit fewer than the table shows.
 String shownVersion(const String& version) {
     if (version.length() != 8) return version;
     return version.substr(0, 6) + "0" + version.substr(6, 2);
 }
 
-/// False, and a trace line, when the line has too few fields; further ones do not count.
+/// Returns false, with a trace line, when the line has too few fields. Ignores extra ones.
 bool parseProductLine(const String& line, InstalledProduct& product) {
     Trace trace(traceUnit);
     std::vector<String> fields = ZAV::splitFields(line, kFieldDelimiters);
@@ -62,7 +62,7 @@ bool parseProductLine(const String& line, InstalledProduct& product) {
     return trace.exit(true);
 }
 
-/// What makes two lines the same product: their fields one behind the other.
+/// Two lines with the same key, all fields joined, are duplicates.
 std::u16string keyOf(const InstalledProduct& product) {
     std::u16string key;
     for (const String* field : {&product.code, &product.description, &product.platform,

@@ -1,24 +1,24 @@
-/// The two reports from which the table KINAGT is made: the architecture probe's and the inventory
-/// program's. Command lines and parsing only; running is the table's business. What a report lacks
-/// is traced under the table's unit.
+/// The two reports behind the table KINAGT: the architecture probe's and the inventory program's.
+/// This unit makes the command lines and parses the output; the table runs the commands. Whatever
+/// is missing in a report is traced under the table's unit.
 #pragma once
 
 #include <functional>
 
 #include "base/zavstr.h"
 
-/// What the probe says of this host; both empty when it says nothing usable.
+/// The probe's answer for this host; both are empty when it has none that can be used.
 struct HostArchitecture {
     ZAV::String os;
     ZAV::String architecture;
 };
 
-/// One product of the inventory.
+/// One installed product, as the inventory program lists it.
 struct InstalledProduct {
     ZAV::String code;
     ZAV::String description;
     ZAV::String platform;
-    ZAV::String version;  ///< as the table shows it
+    ZAV::String version;  ///< in the form that the table shows
     ZAV::String release;
 };
 
@@ -29,8 +29,8 @@ HostArchitecture parseArchitectureProbe(const ZAV::String& output);
 
 ZAV::String inventoryCommand(const ZAV::String& home);
 
-/// Gives each product of the inventory to `take`, in the report's order and without duplicates,
-/// until it returns a status other than 0. Returns that status, or 0. Takes time in proportion to
-/// the report.
+/// Calls `take` for each product of the inventory, in the report's order and without duplicates,
+/// until it returns a status other than 0. Returns that status, or 0. Takes time linear in the
+/// length of the report.
 int forEachProduct(const ZAV::String& inventory,
                    const std::function<int(const InstalledProduct& product)>& take);

@@ -1,4 +1,4 @@
-/// What the managers of all tables have in common.
+/// What the managers of all tables share.
 #pragma once
 
 #include <memory>
@@ -8,7 +8,7 @@
 #include "platform/oxa.h"
 #include "tables/table_request.h"
 
-/// Holds a table's lock, which guards the list of its live requests.
+/// Holds a table's lock, which guards its list of live requests.
 class TableLock {
 public:
     explicit TableLock(TableManager& manager) : manager_(manager) { manager_.lock(); }
@@ -34,21 +34,21 @@ private:
     rtoxa& request_;
 };
 
-/// The manager that a table's global pointer names; null before start-up. Events come on other
-/// threads than the one that may just be registering the table again.
+/// Reads a table's global manager pointer, which is null before start-up. Atomic, because events
+/// arrive on other threads while the table may be registered again.
 template <typename Manager>
 Manager* managerInForce(Manager* const& staticManager) {
     return __atomic_load_n(&staticManager, __ATOMIC_ACQUIRE);
 }
 
-/// Makes the table's manager, which lives as long as the process, and registers it in place of an
-/// earlier one. Returns the registration's status, or OXA_NO_MEMORY when there is no manager. One
-/// thread at a time.
+/// Creates the table's manager and registers it in place of an earlier one. The manager lives until
+/// the process ends. Returns the status of the registration, or OXA_NO_MEMORY when the manager
+/// cannot be created. One thread at a time.
 template <typename Manager>
 int registerTable(Manager*& staticManager, const char* application, const char* table) {
     Manager* manager = nullptr;
     try {
-        // Immortal like the managers in it: earlier ones may still have live requests.
+        // Never destroyed, like the managers in it: earlier ones may still have live requests.
         static auto& made = *new std::vector<std::unique_ptr<Manager>>;
         made.push_back(std::make_unique<Manager>(application, table));
         manager = made.back().get();
@@ -59,9 +59,9 @@ int registerTable(Manager*& staticManager, const char* application, const char* 
     return manager->RegisterWithManager();
 }
 
-/// Gives rows to every live request of a manager whose requests are of class Request, and has each
-/// hand on those that it wants. Returns the last status other than 0 with which one refused. A
-/// request that fails does not keep the rows from the others.
+/// Gives the rows to every live request of a manager; each dispatches those that pass its filter.
+/// All requests of the manager must be of class Request. Returns the last status other than 0, or
+/// 0. A request that fails does not keep the rows from the others.
 template <typename Request, typename Row>
 int addDataToEvent(const ZAV::Trace& trace, TableManager& manager, Row* rows, int count) {
     int result = OXA_OK;
@@ -79,7 +79,7 @@ int addDataToEvent(const ZAV::Trace& trace, TableManager& manager, Row* rows, in
     return result;
 }
 
-/// Makes the object of one request, which the framework then owns; null when that fails.
+/// Creates the object of one request, which the framework then owns. Returns null on failure.
 template <typename Request, typename Manager>
 rtoxa* createRequest(const ZAV::Trace& trace, RequestDetail* detail, ContextInfo* context,
                      Manager* manager) {

@@ -1,4 +1,4 @@
-/// What the requests of all tables have in common.
+/// What the requests of all tables share.
 #pragma once
 
 #include <new>
@@ -8,8 +8,8 @@
 #include "tables/table_schema.h"
 #include "util/exceptions.h"
 
-/// Runs `body` and returns its status. An exception must not reach the framework's threads: it is
-/// traced and becomes a status.
+/// Runs `body` and returns its status. An exception must not reach the framework's threads, so it
+/// is traced and turned into a status.
 template <typename Body>
 int guarded(const ZAV::Trace& trace, const Body& body) noexcept {
     try {
@@ -23,8 +23,8 @@ int guarded(const ZAV::Trace& trace, const Body& body) noexcept {
     }
 }
 
-/// A request on a table of which it knows the schema. Requests belong to the framework, which
-/// never uses one on two threads at a time.
+/// A request on a table that is described by a schema. The framework owns requests and never uses
+/// one on two threads at a time.
 class TableRequest : public rtoxa {
 public:
     TableRequest(const TableSchema& schema, RequestDetail* detail, ContextInfo* context,
@@ -34,17 +34,17 @@ public:
     /// Traces the request and its rows at detail level.
     void PrintSelf() override;
     int NumColumns() override;
-    /// The index one beyond the last column is accepted and fills nothing.
+    /// Accepts the index one past the last column, and fills nothing then.
     int GetColumnInfo(ColumnInfo* info, int index) override;
-    /// The column is found by its exact upper-case name.
+    /// Finds the column by its exact upper-case name.
     int ColumnIsException(char* column, char* row, _IntfOper op, char* value) override;
 
-    /// Whether row `index` is held.
+    /// Whether the request holds a row with this index.
     bool CheckDataIndex(int index) const;
 
 protected:
-    /// Inserts those of `count` adjoining rows that satisfy the filter, until an insert fails.
-    /// Returns the last insert's status, 0 without one.
+    /// Inserts those of `count` contiguous rows that pass the filter, until an insert fails.
+    /// Returns the status of the last insert, or 0 when there was none.
     int addRows(char* rows, int count);
 
 private:
@@ -59,13 +59,14 @@ class TypedTableRequest : public TableRequest {
 public:
     using TableRequest::TableRequest;
 
-    /// Inserts those of `count` rows that satisfy the request's filter, until an insert fails. The
-    /// rows stay the caller's. Returns the last insert's status, 0 without one.
+    /// Inserts those of `count` rows that pass the request's filter, until an insert fails. Copies
+    /// the rows. Returns the status of the last insert, or 0 when there was none.
     virtual int AddData(Row* rows, int count) {
         return addRows(reinterpret_cast<char*>(rows), count);
     }
-    /// Non-zero when the row satisfies the request's filter.
+    /// Returns non-zero when the row passes the request's filter.
     int IsRowException(Row* row) { return CheckForException(reinterpret_cast<char*>(row)); }
-    /// Row `index`, which must be held; valid until rows are next added or cleared.
+    /// Returns row `index`, which the request must hold. Valid until rows are next added or
+    /// cleared.
     Row* GetRow(int index) const { return reinterpret_cast<Row*>(Data(index)); }
 };

@@ -1,5 +1,5 @@
-/// The declaration of a table's columns, from which everything about them follows: column info,
-/// filter tests, printing and the row's size.
+/// The declaration of a table's columns. Column info, filter tests, printing and the row's size all
+/// derive from it.
 #pragma once
 
 #include <array>
@@ -9,18 +9,18 @@
 #include "platform/oxa.h"
 #include "platform/ras1.h"
 
-/// One column, as it lies in the table's row record.
+/// One column and its place in the table's row record.
 struct TableColumn {
     const char* name;  ///< lower case; requesters use the same name in upper case
     int offset;        ///< bytes from the row's start
     int length;        ///< bytes
     int type;          ///< OXA_TYPE_...
 
-    /// Whether a requester's name, which is in upper case, is this column's.
+    /// Whether `attribute`, an upper-case name from a requester, is this column's name.
     bool isNamed(const char* attribute) const;
 };
 
-/// A column for a field of the row record: an int or an array of char.
+/// The column for a field of the row record, which is an int or an array of char.
 template <typename Field>
 constexpr TableColumn makeColumn(const char* name, std::size_t offset) {
     static_assert(std::is_same_v<Field, int> || std::is_same_v<std::remove_extent_t<Field>, char>,
@@ -29,10 +29,11 @@ constexpr TableColumn makeColumn(const char* name, std::size_t offset) {
             std::is_same_v<Field, int> ? OXA_TYPE_INTEGER : OXA_TYPE_CHARACTER};
 }
 
-/// A field by its name, which only the preprocessor can turn into a text.
+/// The column for a field by its name. A macro, because only the preprocessor turns a name into
+/// text.
 #define ZAV_COLUMN(Row, field) makeColumn<decltype(Row::field)>(#field, offsetof(Row, field))
 
-/// Whether the columns follow each other without a gap and make up the whole row.
+/// Whether the columns are contiguous and cover the whole row.
 template <std::size_t Count>
 constexpr bool coversRow(const std::array<TableColumn, Count>& columns, std::size_t rowSize) {
     std::size_t end = 0;
@@ -45,12 +46,12 @@ constexpr bool coversRow(const std::array<TableColumn, Count>& columns, std::siz
 
 /// One table. Everything it points to has static storage.
 struct TableSchema {
-    const char* requestClass;  ///< the name by which requests are printed
+    const char* requestClass;  ///< printed with each request
     const TableColumn* columns;
     int columnCount;
     unsigned rowSize;  ///< bytes
-    RAS1_UNIT* unit;   ///< the table's source unit, under which its requests trace
+    RAS1_UNIT* unit;   ///< the unit under which the table's requests trace
 
-    /// The column of an upper-case name, or null.
+    /// Finds a column by its upper-case name; null when there is none.
     const TableColumn* find(const char* attribute) const;
 };

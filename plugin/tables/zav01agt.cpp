@@ -25,7 +25,7 @@ static_assert(coversRow(columns, sizeof(Row)), "every field of the row is a colu
 const TableSchema schema{"zav_kagreqt_base", columns.data(), static_cast<int>(columns.size()),
                          sizeof(Row), &traceUnit};
 
-/// The columns by which a filter says what is requested.
+/// The columns of the filter that make up a request.
 constexpr struct {
     const char* column;
     void (TaskQueueElem::*set)(String value);

@@ -1,5 +1,6 @@
-/// KAGREQT, the table by which requests come in. The values of a query's filter are the request;
-/// the answer is one row that repeats them with the outcome of checking or running the command.
+/// KAGREQT, the table through which requests come in. The values in a query's filter are the
+/// request. The answer is one row that repeats them, with the result of checking or running the
+/// command.
 #pragma once
 
 #include "tables/table_request.h"
@@ -8,33 +9,34 @@
 
 class zav_kagreqt_manager;
 
-/// The table's names, and its manager since start-up, null before.
+/// The table's names, and its manager, which is null until start-up.
 [[gnu::visibility("default")]] extern const char* const zav_kagreqt_application;
 [[gnu::visibility("default")]] extern const char* const zav_kagreqt_table;
 [[gnu::visibility("default")]] extern zav_kagreqt_manager* zav_kagreqt_static_manager;
 
-/// Makes the table's manager and registers it. Returns the registration's status, or
+/// Creates the table's manager and registers it. Returns the status of the registration, or
 /// OXA_NO_MEMORY.
 int zav_kagreqt_init();
 
-/// Offers the table to the framework. One lives from start-up to the end of the process.
+/// Offers the table to the framework. There is one from start-up until the process ends.
 class zav_kagreqt_manager : public TableManager {
 public:
     using TableManager::TableManager;
     ~zav_kagreqt_manager() override = default;
 
-    /// A new zav_kagreqt_agent, which the caller owns; null when it cannot be made.
+    /// Creates a zav_kagreqt_agent, which the caller owns. Returns null on failure.
     rtoxa* CreateRtoxa(RequestDetail* detail, ContextInfo* context) override;
 
-    /// Gives `count` rows to the table's live requests; 0 when there is no manager. Any thread.
+    /// Gives `count` rows to the table's live requests. Returns 0 when there is no manager. Any
+    /// thread.
     static int EventArrived(zav_kagreqt_data_t* rows, int count);
-    /// Gives the rows to each live request, under the table's lock, and dispatches what its filter
-    /// lets through. Returns the last status with which one refused, or 0. Any thread.
+    /// Gives the rows to each live request, under the table's lock, and dispatches those that pass
+    /// its filter. Returns the last status other than 0, or 0. Any thread.
     int AddDataToEvent(zav_kagreqt_data_t* rows, int count);
 };
 
-/// A request on the table; knows its columns. The accessors point into row `row`, which must be
-/// held, and are valid until rows are next added or cleared.
+/// A request on the table, with access to its columns. The accessors return pointers into row
+/// `row`, which the request must hold; they are valid until rows are next added or cleared.
 class zav_kagreqt_base : public TypedTableRequest<zav_kagreqt_data_t> {
 public:
     zav_kagreqt_base(RequestDetail* detail, ContextInfo* context, TableManager* manager);
@@ -54,18 +56,18 @@ public:
     char* _get_value_targetmsn(int row) const { return GetRow(row)->targetmsn; }
 };
 
-/// One request: its record is filled from the filter when the request is made.
+/// One request. Its task record is filled from the filter when the request is created.
 class zav_kagreqt_agent : public zav_kagreqt_base {
 public:
     zav_kagreqt_agent(RequestDetail* detail, ContextInfo* context, TableManager* manager);
     ~zav_kagreqt_agent() override;
 
-    /// Runs or queues the command and adds the row that answers it. Blocks for as long as a command
-    /// that runs at once takes.
+    /// Runs or queues the command and adds the row that answers it. A command that runs at once
+    /// blocks until it has ended.
     int TakeSample() override;
 
-    /// Takes the request's values from the filter. A column named twice keeps the last value; names
-    /// of columns that say nothing about a request, and unknown ones, are passed over.
+    /// Reads the request's values from the filter. When a column appears twice, the last value
+    /// wins. Ignores unknown columns and those that are not part of a request.
     void TakeSampleConstructor();
     /// Only traces.
     void TakeSampleDestructor();

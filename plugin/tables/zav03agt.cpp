@@ -30,7 +30,7 @@ void setField(char (&field)[Size], const String& value) {
     TaskQueueElem::SetValueAndPad(field, Size, value.c_str());
 }
 
-/// Runs a command of the home; true, and what it printed, when it succeeded.
+/// Runs a command of the home. Returns true, and what it printed, when it succeeded.
 bool outputOf(const String& command, String& output) {
     Trace trace(traceUnit);
     int exitCode = 0;

@@ -1,13 +1,13 @@
 /// KINAGT, the table of the products that are installed under the home directory, one row each.
-/// Every query asks the home's programs anew.
+/// Every query runs the home's programs again.
 #pragma once
 
 #include <cstddef>
 
 #include "tables/table_request.h"
 
-/// All columns are padded with blanks and not 0-terminated. The layout is what requesters see, the
-/// same on every width.
+/// All columns are padded with blanks and not 0-terminated. Requesters see this layout; it is the
+/// same on 32 and 64 bits.
 struct zav_kinagt_data_t {
     char originnode[64];
     char tovrinhome[512];
@@ -33,33 +33,34 @@ static_assert(offsetof(zav_kinagt_data_t, platform) == 727, "column offsets are 
 
 class zav_kinagt_manager;
 
-/// The table's names, and its manager since start-up, null before.
+/// The table's names, and its manager, which is null until start-up.
 [[gnu::visibility("default")]] extern const char* const zav_kinagt_application;
 [[gnu::visibility("default")]] extern const char* const zav_kinagt_table;
 [[gnu::visibility("default")]] extern zav_kinagt_manager* zav_kinagt_static_manager;
 
-/// Makes the table's manager and registers it. Returns the registration's status, or
+/// Creates the table's manager and registers it. Returns the status of the registration, or
 /// OXA_NO_MEMORY.
 int zav_kinagt_init();
 
-/// Offers the table to the framework. One lives from start-up to the end of the process.
+/// Offers the table to the framework. There is one from start-up until the process ends.
 class zav_kinagt_manager : public TableManager {
 public:
     using TableManager::TableManager;
     ~zav_kinagt_manager() override = default;
 
-    /// A new zav_kinagt_agent, which the caller owns; null when it cannot be made.
+    /// Creates a zav_kinagt_agent, which the caller owns. Returns null on failure.
     rtoxa* CreateRtoxa(RequestDetail* detail, ContextInfo* context) override;
 
-    /// Gives `count` rows to the table's live requests; 0 when there is no manager. Any thread.
+    /// Gives `count` rows to the table's live requests. Returns 0 when there is no manager. Any
+    /// thread.
     static int EventArrived(zav_kinagt_data_t* rows, int count);
-    /// Gives the rows to each live request, under the table's lock, and dispatches what its filter
-    /// lets through. Returns the last status with which one refused, or 0. Any thread.
+    /// Gives the rows to each live request, under the table's lock, and dispatches those that pass
+    /// its filter. Returns the last status other than 0, or 0. Any thread.
     int AddDataToEvent(zav_kinagt_data_t* rows, int count);
 };
 
-/// A request on the table; knows its columns. The accessors point into row `row`, which must be
-/// held, and are valid until rows are next added or cleared.
+/// A request on the table, with access to its columns. The accessors return pointers into row
+/// `row`, which the request must hold; they are valid until rows are next added or cleared.
 class zav_kinagt_base : public TypedTableRequest<zav_kinagt_data_t> {
 public:
     zav_kinagt_base(RequestDetail* detail, ContextInfo* context, TableManager* manager);
@@ -82,11 +83,11 @@ public:
     ~zav_kinagt_agent() override;
 
     /// Runs the architecture probe and the inventory program and adds a row for each product.
-    /// Blocks until both have ended. What they fail to say is traced, and the rows lack it. Returns
-    /// 0 or the status of an insert that failed, which ends the sample.
+    /// Blocks until both have ended. What their output lacks is traced, and missing in the rows.
+    /// Returns 0, or the status of an insert that failed, which ends the sample.
     int TakeSample() override;
 
-    /// Both only trace: nothing is kept between samples.
+    /// Both only trace; there is nothing to keep between samples.
     void TakeSampleConstructor();
     void TakeSampleDestructor();
 

@@ -24,7 +24,7 @@ struct TranslatorRun {
     String stdErr;
 };
 
-/// The blanks are part of the option, so without a target two of them stand side by side.
+/// The blanks are part of the option, so without a target there are two of them in a row.
 TranslatorRun runTranslator(const String& translator, const String& option, const String& target,
                             const String& product, const String& input) {
     TranslatorRun run;
@@ -59,7 +59,7 @@ TASK_RC setByTranslator(TaskQueueElem& task) {
         run.exitCode, run.command, run.stdErr));
 }
 
-/// What the translator printed before the configuration itself is dropped.
+/// Drops what the translator printed before the configuration itself.
 String configurationIn(const String& output) {
     const std::uint32_t begin = output.find("INSTANCE=", 0);
     return begin == String::NPOS ? String() : output.substr(begin);

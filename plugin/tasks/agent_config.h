@@ -1,4 +1,4 @@
-/// The configuration of an agent, through the two-way translator.
+/// Reads and writes the configuration of an agent with the two-way translator.
 #pragma once
 
 #include "base/zavstr.h"
@@ -6,15 +6,16 @@
 
 class TaskQueueElem;
 
-/// SETCONFIG of any product but the universal agent: hands the task's context to the translator. On
-/// failure the task carries the message id and its parameter. Runs on the executor.
+/// SETCONFIG of any product except the universal agent: passes the task's context to the
+/// translator. On failure puts the message id and its parameter into the task. Runs on the
+/// executor.
 TASK_RC setConfig(TaskQueueElem& task);
 
-/// GETCONFIG: the task's context becomes what the translator prints, from "INSTANCE=" on, or empty
-/// without that marker. On failure the task carries the message id and its parameter. Runs on the
-/// thread of the request.
+/// GETCONFIG: sets the task's context to what the translator prints from "INSTANCE=" on, or to an
+/// empty text when that marker is missing. On failure puts the message id and its parameter into
+/// the task. Runs on the thread of the request.
 TASK_RC getConfig(TaskQueueElem& task);
 
-/// The instance of `product` that a managed system name stands for, trimmed; empty when there is
-/// none or it cannot be found out. Runs a program unless the name is empty or the product is "um".
+/// The instance of `product` that a managed system name denotes, trimmed; empty when there is none
+/// or it cannot be determined. Runs a program unless the name is empty or the product is "um".
 ZAV::String getInstanceName(const ZAV::String& product, const ZAV::String& managedSystemName);

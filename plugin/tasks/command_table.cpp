@@ -41,8 +41,8 @@ constexpr UniversalAgent likewise = UniversalAgent::Likewise;
 
 }  // namespace
 
-// COMPLETE_INSTALL starts no command of its own. Its only failure says that how the install command
-// ended is bad or not known, which also describes a completion that an exception has ended.
+// COMPLETE_INSTALL starts no command of its own. Its only failure says that the install command
+// ended badly or in an unknown way, which fits a completion that an exception has ended, too.
 const std::array<Command, 9> commandTable{{
     {"START", {product}, likewise, nullptr, start, TASK_START_STOP_NOT_STARTED},
     {"STOP", {product}, likewise, nullptr, stop, TASK_START_STOP_NOT_STARTED},

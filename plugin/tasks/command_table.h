@@ -1,4 +1,4 @@
-/// The commands: what each requires, when it runs and what runs it.
+/// The commands: the parameters that each requires, where it runs and its handler.
 #pragma once
 
 #include <array>
@@ -7,16 +7,16 @@
 #include "tasks/return_codes.h"
 #include "tasks/zavtqelm.h"
 
-/// A value that a request must have. An entry without a name ends a list.
+/// A value that a request must have. An entry without a name ends the list.
 struct RequiredParameter {
-    const char* name = nullptr;  ///< as it is traced
+    const char* name = nullptr;  ///< for the trace
     ZAV::String (TaskQueueElem::*value)() const = nullptr;
-    TASK_RC failure = TASK_OK;  ///< the code when it is missing
+    TASK_RC failure = TASK_OK;  ///< the code when the value is missing
 };
 
-/// What a command does when its product is the universal agent.
+/// How a command treats the universal agent.
 enum class UniversalAgent {
-    Likewise,         ///< the same as for any product
+    Likewise,         ///< like any other product
     RequiresNothing,  ///< no parameter is checked
     Refused,
 };
@@ -32,11 +32,11 @@ struct Command {
     TASK_RC notStarted;     ///< the code when the handler throws
 };
 
-/// All commands, in the order in which they are listed to requesters.
+/// All commands, in the order in which requesters see them.
 extern const std::array<Command, 9> commandTable;
 
-/// The command of exactly that name, or null.
+/// Finds a command by its exact name; null when there is none.
 const Command* findCommand(const ZAV::String& name);
 
-/// Whether the product is the universal agent's, in upper or lower case.
+/// Whether the task's product is the universal agent's code, in upper or lower case.
 bool isUniversalAgent(const TaskQueueElem& task);

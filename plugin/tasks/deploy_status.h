@@ -1,11 +1,12 @@
-/// The row of the table KAGDYST, the outcome of one queued command, and the way by which a task
-/// record publishes it. The table lies above the tasks; this declaration is all they know of it.
+/// The row of the table KAGDYST, which is the outcome of one queued command, and the function with
+/// which a task record publishes it. The table lies above the tasks, which know only this
+/// declaration.
 #pragma once
 
 #include <cstddef>
 
-/// Character columns are padded with blanks and not 0-terminated. The layout is what requesters
-/// see, the same on every width.
+/// Character columns are padded with blanks and not 0-terminated. Requesters see this layout; it is
+/// the same on 32 and 64 bits.
 struct zav_kagdyst_data_t {
     char originnode[64];
     char transid[84];
@@ -26,7 +27,7 @@ static_assert(offsetof(zav_kagdyst_data_t, retmsgid) == 168, "column offsets are
 static_assert(offsetof(zav_kagdyst_data_t, retmsgparm) == 184, "column offsets are fixed");
 static_assert(offsetof(zav_kagdyst_data_t, targetmsn) == 440, "column offsets are fixed");
 
-/// Gives `count` rows to whoever subscribes to KAGDYST; rows that nobody waits for are lost.
-/// Returns 0 or the last status with which a subscriber refused them. Any thread; throws nothing.
-/// Defined by the table.
+/// Gives `count` rows to the subscribers of KAGDYST; without subscribers the rows are lost. Returns
+/// 0 or the last status with which a subscriber refused them. Any thread; throws nothing. The table
+/// defines it.
 int publishDeployStatus(zav_kagdyst_data_t* rows, int count);

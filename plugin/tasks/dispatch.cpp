@@ -15,8 +15,8 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
 
-/// Called while an exception is handled that left the command's handler. The code counts even when
-/// there is no memory for the message.
+/// Fails the task after an exception has left its handler; called in the catch block. The code is
+/// returned even when there is no memory for the message.
 TASK_RC endWithException(TaskQueueElem& task, TASK_RC rc) noexcept {
     try {
         Trace trace(traceUnit);

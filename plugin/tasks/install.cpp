@@ -23,7 +23,7 @@ RAS1_UNIT traceUnit{"zavtasks"};
 
 constexpr const char* kRequiresRestart = "REQUIRES_RESTART";
 
-/// Depot directories that an installation leaves behind, beside that of its own product.
+/// Directories that an installation leaves in the depot, besides its own product's.
 constexpr const char* kCleanedProducts[] = {"ui", "ci", "jr", "gs", "dd", "ax", "la", "uf", "ux"};
 
 String setCmsCommand(const String& translator, const String& product) {
@@ -38,8 +38,8 @@ String scriptLines(std::initializer_list<String> lines) {
     return script;
 }
 
-/// The lines that both scripts begin with: they outlive the signals that end the agent process, and
-/// run their arguments.
+/// The first lines of both scripts: they ignore the signals that end the agent process, and run
+/// their arguments.
 String scriptHead() {
     return scriptLines({
         "#!/bin/sh",
@@ -82,14 +82,14 @@ String installAndTwoWayScript(const String& product, const String& translatorCom
            scriptTail();
 }
 
-/// Turns `command` into one that survives a restart of this process, and reports success for the
-/// task before it has begun: afterwards there may be nobody left who could report.
+/// Changes `command` into one that survives a restart of this process. Reports success before the
+/// command has begun, because this process may be gone when it ends.
 TASK_RC prepareForRestart(String& command, TaskQueueElem& task) {
     Trace trace(traceUnit);
     String translator;
     if (!getTwoWayTranslator(translator)) {
         trace().error("No default two way translator found");
-        // The server has always been given the other message with this code.
+        // Not the message of the returned code: servers rely on this pair.
         setFailure(task, TASK_INSTALL_NOT_STARTED, command);
         return trace.exit(TASK_INSTALL_FAILED);
     }
@@ -103,8 +103,8 @@ TASK_RC prepareForRestart(String& command, TaskQueueElem& task) {
     return trace.exit(TASK_OK);
 }
 
-/// A patch of these two products leaves processes behind that hold the pipes open, so that reading
-/// to the end of the output would never finish.
+/// A patch of these two products leaves processes behind that keep the pipes open, so reading to
+/// the end of the output would never finish.
 bool needsNonBlockingReads(const String& command, const TaskQueueElem& task) {
     Trace trace(traceUnit);
     String product = task.getProduct();
@@ -171,7 +171,7 @@ TASK_RC installInSteps(TaskQueueElem& task) {
     const bool requiresRestart = optional == kRequiresRestart;
     TASK_RC rc = requiresRestart ? prepareForRestart(command, task) : TASK_OK;
     if (rc == TASK_OK) rc = runInstallCommand(command, task);
-    // With a restart the script has run the translator.
+    // With a restart, the script has run the translator.
     if (rc == TASK_OK && optional.length() != 0 && !requiresRestart) rc = runSetCms(task);
     return trace.exit(rc);
 }
@@ -212,7 +212,7 @@ TASK_RC completeInstallAfterRestart(TaskQueueElem& task) {
         trace().error("Unable to read rc.txt for install's return code");
         return trace.exit(setFailure(task, TASK_INSTALL_FAILED, joinValues({path, "NOTFOUND"})));
     }
-    // Whatever is not a number other than 0 counts as success.
+    // Everything except a number other than 0 counts as success.
     int exitCode = 0;
     if (String::convertToInt(String(buffer).trim(), &exitCode) && exitCode != 0) {
         return trace.exit(

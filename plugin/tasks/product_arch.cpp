@@ -18,7 +18,7 @@ RAS1_UNIT traceUnit{"zavtasks"};
 
 constexpr const char* kSharedComponent = "ax";
 
-/// Runs the inventory program; true, and what it printed, when it ran and says that it succeeded.
+/// Runs the inventory program. Returns true, and what it printed, when it ran and succeeded.
 bool runInventory(const String& options, String& report) {
     int exitCode = 0;
     String stdErr;
@@ -29,8 +29,7 @@ bool runInventory(const String& options, String& report) {
 
 // ---- The report about one product ---------------------------------------------------------------
 
-/// The architecture in a line such as "li6263 Product (ux)"; empty when the line is about anything
-/// else.
+/// The architecture in a line such as "li6263 Product (ux)"; empty for a line about something else.
 String archInReportLine(const String& line, const String& product) {
     const std::vector<String> words = ZAV::splitFields(line, "\n :");
     const bool matches =
@@ -63,7 +62,7 @@ String archInProductReport(const String& report, const String& product) {
 
 // ---- The list of all products -------------------------------------------------------------------
 
-/// What a line of the list says, as far as it matters here.
+/// The fields of a line that are used here.
 struct ListLine {
     String product;
     String platform;
@@ -92,7 +91,7 @@ bool isUnusable(const ListLine& line) {
                        [&](const char* platform) { return line.platform == platform; });
 }
 
-/// Whether two platforms are as long and end in the same two characters.
+/// Whether two platforms have the same length and the same last two characters.
 bool endAlike(const String& platform, const String& preferred) {
     const std::uint32_t length = platform.length();
     return length >= 2 && length == preferred.length() &&

@@ -1,10 +1,10 @@
-/// The row of the table KAGREQT: a request's values and the outcome of checking or running it.
+/// The row of the table KAGREQT: the values of a request, and the result of checking or running it.
 #pragma once
 
 #include <cstddef>
 
-/// Character columns are padded with blanks and not 0-terminated. The layout is what requesters
-/// see, the same on every width.
+/// Character columns are padded with blanks and not 0-terminated. Requesters see this layout; it is
+/// the same on 32 and 64 bits.
 struct zav_kagreqt_data_t {
     char originnode[64];
     char transid[84];

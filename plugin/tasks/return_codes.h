@@ -1,8 +1,8 @@
-/// How a command ended: the code that travels to the server as RETVAL and the message identifier
-/// that goes with it. The server owns the texts of the messages.
+/// The result of a command: the code that the server gets as RETVAL, and the message identifier
+/// that belongs to it. The texts of the messages are the server's.
 #pragma once
 
-/// The values are fixed by the wire.
+/// The values are part of the protocol.
 enum TASK_RC : int {
     TASK_OK = 0,
     TASK_NO_COMMAND = 1001,
@@ -39,12 +39,12 @@ enum TASK_RC : int {
     TASK_UNINSTALL_FAILED = 1032,
     TASK_UNINSTALL_NOT_STARTED = 1033,
     TASK_NO_ARCHITECTURE = 1034,
-    TASK_INFORMATION = 1035,  ///< no operation of this library ends with it
+    TASK_INFORMATION = 1035,  ///< not used by this library
 };
 
-/// The message identifiers: entry 0 is empty, entry n belongs to code 1000 + n.
+/// The message identifiers. Entry 0 is empty; entry n belongs to code 1000 + n.
 extern const char* const rc2MsgId[36];
 
-/// The constant text that goes into RETMSGID; empty for success. Takes values of the enumeration
-/// only, nothing else is guarded against.
+/// The text for RETMSGID, which is constant and empty for success. `rc` must be a value of the
+/// enumeration; this is not checked.
 const char* rcToMsgId(TASK_RC rc);

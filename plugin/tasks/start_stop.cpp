@@ -14,7 +14,7 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
 
-/// The user for whom the instance is recorded in the run-as database; empty without one.
+/// The user that the run-as database has for the instance; empty when it has none.
 String runAsUser(const String& product, const String& instance) {
     const String path = String(ZAV_TOVRINHOME) + "/config/" + Util::getHostName() + "_zavrunas.cfg";
     const ZAV::StartupDB database(path);
@@ -30,7 +30,7 @@ String verbFor(const String& action) {
     return "oh-oh-not-supported";
 }
 
-/// The script's command line. The two blanks before "-h" belong there.
+/// The script's command line. The two blanks before "-h" are intended.
 String scriptCommand(const String& action, const String& product, const String& instance) {
     const String home(ZAV_TOVRINHOME);
     String command = home + "/" + "bin" + "/" + "TovrinAgent " + " " + "-h " + home + " ";
@@ -46,7 +46,7 @@ String commandLine(const String& action, const String& product, const String& in
     return String("/bin/") + "su - " + user + " -c \"" + command + "\"";
 }
 
-/// Runs the command; on failure traces why.
+/// Runs the command; traces the reason of a failure.
 TASK_RC runScript(const String& command, char** environment) {
     Trace trace(traceUnit);
     int exitCode = 0;
@@ -73,7 +73,7 @@ TASK_RC startstopAgent(const String& action, const String& product, const String
     trace().detail("Attempting to [%s] product code [%s] instance [%s]", action, product, instance);
     const String command = commandLine(action, product, instance);
 
-    // An agent writes its own trace, not into the file of the process that started it.
+    // An agent must not trace into the log of the process that started it.
     char noTraceLog[] = "KBB_RAS1_LOG=";
     char* startEnvironment[] = {noTraceLog, nullptr};
     const TASK_RC rc = runScript(command, action == "START" ? startEnvironment : nullptr);

@@ -12,8 +12,7 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
 
-// Neither function traces while it holds the lock, so that no request waits for another one's
-// trace.
+// Nothing is traced under the lock, so that no request waits while another one traces.
 
 bool isListed(const String& command) {
     const std::lock_guard<std::mutex> lock(ZAV::commandsMutex);

@@ -13,7 +13,7 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
 
-/// Where the depot keeps a product. The common installer "ci" is kept once for all its versions.
+/// The depot's directory for a product. The common installer "ci" has one for all its versions.
 String deployDirectory(const String& product, const String& version) {
     const String directory = depotDir + product;
     return product == "ci" ? directory : directory + "/" + version;

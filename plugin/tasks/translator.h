@@ -1,14 +1,14 @@
-/// The two-way translator, and the directories that a request's text may name by tokens.
+/// The two-way translator, and the tokens for directories that a request's text may contain.
 #pragma once
 
 #include "base/zavstr.h"
 
-/// Puts the translator's full path into `path` and returns true; when there is no translator,
-/// `path` becomes empty and the result is false. Runs the inventory program.
+/// Stores the translator's full path in `path` and returns true. Without a translator empties
+/// `path` and returns false. Runs the inventory program.
 bool getTwoWayTranslator(ZAV::String& path);
 
-/// `text` with every "|DEPLOYDIR|" (the depot's directory of this product and version),
-/// "|TOVRINHOME|" and "|DEPOTDIR|" replaced, in this order. A value put in by one is searched for
-/// the following ones.
+/// Returns `text` with each "|DEPLOYDIR|" (the depot's directory for this product and version),
+/// "|TOVRINHOME|" and "|DEPOTDIR|" replaced, in this order. Tokens in a replacement are replaced as
+/// well when they come later in that order.
 ZAV::String replaceTokens(const ZAV::String& text, const ZAV::String& product,
                           const ZAV::String& version);

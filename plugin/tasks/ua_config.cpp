@@ -64,8 +64,8 @@ TASK_RC copyScripts(UaSetup& setup) {
     return trace.exit(TASK_OK);
 }
 
-/// The scripts are copied even when the metafile could not be; a script's failure is then the one
-/// that is reported.
+/// Copies the scripts even when copying the metafile failed. If both fail, the failure of the
+/// scripts is reported.
 TASK_RC copyFiles(UaSetup& setup) {
     Trace trace(traceUnit);
     const TASK_RC metafile = copyMetafile(setup);
@@ -75,7 +75,7 @@ TASK_RC copyFiles(UaSetup& setup) {
 
 // ---- The console --------------------------------------------------------------------------------
 
-/// Has the console do `verb` with the metafile that was copied.
+/// Has the console apply `verb` to the copied metafile.
 ConsoleRun runConsole(const UaSetup& setup, const String& verb) {
     const UaConsole console{setup.workPath, setup.rbPath, setup.port};
     return console.run(verb, setup.metaPath + "/" + setup.metafile);
@@ -84,7 +84,8 @@ ConsoleRun runConsole(const UaSetup& setup, const String& verb) {
 TASK_RC deleteMetafile(UaSetup& setup) {
     Trace trace(traceUnit);
     const ConsoleRun run = runConsole(setup, "DELETE");
-    // What the console says does not matter: a metafile imported for the first time is not there.
+    // The exit code does not matter: before its first import the console does not know the
+    // metafile.
     if (run.started) return trace.exit(TASK_OK);
     return trace.exit(failTask(trace(), setup.task, TASK_DELETE_NOT_STARTED, run.command,
                                "%s Failed to start DELETE command [%s]", run.command));
@@ -107,8 +108,8 @@ TASK_RC importMetafile(UaSetup& setup) {
 
 // ---- Adding the data provider -------------------------------------------------------------------
 
-/// The data provider type of the metafile, in upper case as the list of start-up data providers
-/// then is too.
+/// Reads the metafile's data provider type. Converts it and the list of start-up data providers to
+/// upper case.
 TASK_RC readProviderType(UaSetup& setup, String& type) {
     Trace trace(traceUnit);
     ConsoleRun run = runConsole(setup, "getdptype");
@@ -126,8 +127,8 @@ TASK_RC readProviderType(UaSetup& setup, String& type) {
     return trace.exit(TASK_OK);
 }
 
-/// Whether the list starts the data provider already, by its own name or as one of the four that
-/// the combined type stands for.
+/// Whether the list contains the data provider already, by its own name or as one of the four types
+/// that the combined type includes.
 bool alreadyStarted(const String& providers, const String& type) {
     Trace trace(traceUnit);
     constexpr const char* kCombined = "ASFS";
@@ -142,8 +143,8 @@ bool alreadyStarted(const String& providers, const String& type) {
     return trace.exit(true);
 }
 
-/// Stops the instance, changes its start-up parameters and starts it. A failure part-way leaves it
-/// stopped.
+/// Stops the instance, changes its start-up parameters and starts it again. A failure in between
+/// leaves it stopped.
 TASK_RC restartWithProviders(UaSetup& setup) {
     Trace trace(traceUnit);
     const String& instance = setup.instance;
@@ -190,7 +191,7 @@ TASK_RC setUaconfig(TaskQueueElem& task) {
     }
     TASK_RC rc = prepareUaSetup(setup);
     if (rc != TASK_OK) return trace.exit(rc);
-    // Without a metafile nothing is done, not even with the scripts.
+    // Without a metafile nothing is done, and the scripts are not copied either.
     if (setup.metafile.length() != 0) {
         rc = copyFiles(setup);
         if (rc == TASK_OK && setup.restart) {

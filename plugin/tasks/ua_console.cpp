@@ -28,7 +28,7 @@ std::vector<std::string> settingsFor(const UaConsole& console) {
     return narrowed;
 }
 
-/// The texts as a list that ends in a null pointer and lives as long as they do.
+/// A list of pointers to the texts that ends in a null pointer. Valid as long as the texts are.
 std::vector<char*> pointersTo(std::vector<std::string>& texts) {
     std::vector<char*> pointers;
     for (std::string& text : texts)

@@ -16,7 +16,7 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
 
-/// "NAME=value" as its two parts; false when either is empty. Neither is trimmed.
+/// Splits "NAME=value" without trimming the parts; false when one of them is empty.
 bool splitPair(const String& line, String& key, String& value) {
     const std::uint32_t separator = line.find("=", 0);
     if (separator == String::NPOS || separator == 0 || separator + 1 == line.length()) return false;
@@ -25,8 +25,8 @@ bool splitPair(const String& line, String& key, String& value) {
     return true;
 }
 
-/// The text with every line that contains `marker` replaced as a whole. Empty lines are dropped.
-/// The units are collected in a vector, because a String would be copied for each line.
+/// Replaces every line that contains `marker` as a whole, and drops empty lines. Collects the units
+/// in a vector, because a String would copy its text for each line.
 String replaceMarkedLines(const String& text, const String& marker, const String& replacement) {
     std::vector<unsigned short> units;
     units.reserve(text.length() + 1);
@@ -97,7 +97,7 @@ int changeUaStartupParms(String configFile, String parms, String instance) {
         trace().error("Failed to write to file %s", configFile);
         return trace.exit(0);
     }
-    // From here until the copy is back, the file does not exist under its own name.
+    // From here until the copy is moved back, the file does not exist under its own name.
     String directory;
     if (deleteFile(configFile) == 0 || getDirectoryFromPath(configFile, directory) == 0 ||
         ZAV::Util::copyFile(copy, directory, getFilenameFromPath(configFile)) != 0) {

@@ -22,7 +22,7 @@ bool contains(const String& text, const String& part) {
     return text.find(part, 0) != String::NPOS;
 }
 
-/// What follows the first "=" of an option; empty when nothing does.
+/// The part of an option after its first "="; empty when there is none.
 String optionValue(const String& option) {
     const std::uint32_t separator = option.find("=", 0);
     if (separator == String::NPOS || separator + 1 == option.length()) return {};
@@ -44,8 +44,8 @@ void readOptions(UaSetup& setup) {
                    setup.restart);
 }
 
-/// The file of the instance as it was named or else of its name in lower case, which is then the
-/// instance's name for all that follows.
+/// Finds the instance's file by the given name, or else by the name in lower case, which is then
+/// used as the instance's name from here on.
 TASK_RC findConfigFile(UaSetup& setup) {
     Trace trace(traceUnit);
     setup.configFile = getUaConfigFileName(setup.instance);
@@ -59,7 +59,7 @@ TASK_RC findConfigFile(UaSetup& setup) {
         setup.instance));
 }
 
-/// A value of the configuration file, without its quotes.
+/// Reads a value of the configuration file and removes its quotes.
 bool readValue(const StrStrMap& pairs, const char* key, String& value) {
     if (!pairs.get(key, value)) return false;
     removeChar(value, '\'');
@@ -94,7 +94,7 @@ TASK_RC findScriptsDirectory(UaSetup& setup) {
     Trace trace(traceUnit);
     const std::uint32_t separator = setup.workPath.rfind('/');
     if (separator == String::NPOS) {
-        // "[%]" is no conversion and is written as it stands: the key's name is not an argument.
+        // "[%]" is not a conversion and is written literally; the key's name is no argument.
         return trace.exit(failTask(
             trace(), setup.task, TASK_BAD_WORK_PATH,
             joinValues({"KUM_WORK_PATH", setup.workPath, setup.configFile}),

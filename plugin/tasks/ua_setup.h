@@ -1,14 +1,14 @@
-/// What a SETCONFIG request for the universal agent amounts to: its own values, and those of the
-/// instance's configuration file.
+/// The values behind a SETCONFIG request for the universal agent: those of the request, and those
+/// in the instance's configuration file.
 #pragma once
 
 #include "base/zavstr.h"
 #include "tasks/return_codes.h"
 #include "tasks/zavtqelm.h"
 
-/// One request and what has been worked out for it so far, in the order in which it is.
+/// One request and the values determined for it, in the order in which they are determined.
 struct UaSetup {
-    /// Takes the request's own values. The task must outlive this.
+    /// Takes the request's own values. The task must outlive this object.
     explicit UaSetup(TaskQueueElem& request)
         : task(request),
           product(request.getProduct()),
@@ -18,7 +18,7 @@ struct UaSetup {
     TaskQueueElem& task;
     const ZAV::String product;
     const ZAV::String metafile;  ///< its name in the depot
-    const ZAV::String scripts;   ///< names in the depot with "," between them
+    const ZAV::String scripts;   ///< names in the depot, separated by ","
     ZAV::String instance;        ///< empty for the default instance
     ZAV::String port;            ///< of the console; empty when none was given
     bool restart = false;        ///< the instance may be restarted for its data provider
@@ -26,11 +26,11 @@ struct UaSetup {
     ZAV::String metaPath;        ///< the directory for metafiles
     ZAV::String workPath;
     ZAV::String rbPath;
-    ZAV::String startupProviders;  ///< data provider types with "," between them
+    ZAV::String startupProviders;  ///< data provider types, separated by ","
     ZAV::String scriptsDir;
 };
 
-/// Works out all that the request and the configuration file say, and changes nothing outside
-/// `setup`. On failure the task carries the message id and its parameter. Runs the inventory
+/// Determines all values from the request and the configuration file; changes nothing outside
+/// `setup`. On failure puts the message id and its parameter into the task. Runs the inventory
 /// program.
 TASK_RC prepareUaSetup(UaSetup& setup);

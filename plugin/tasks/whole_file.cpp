@@ -22,7 +22,7 @@ RAS1_UNIT traceUnit{"zavtasks"};
 
 constexpr std::size_t kChunk = 1024;
 
-/// A stream that is closed at the latest when it goes out of scope.
+/// A stream that is closed when it goes out of scope, if not before.
 using Stream = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
 
 Stream openText(const String& path, const char* mode) {
@@ -35,9 +35,9 @@ bool closeStream(Stream& stream, const String& path, const Trace& trace) {
     return false;
 }
 
-/// The text up to its first 0 as bytes of the local code page. String::c_str makes room for one
-/// byte per unit only and would cut the end off a text with characters of several bytes, so such a
-/// text is converted with zeros behind it that make room for all of them.
+/// The text up to its first 0 as bytes of the local code page. String::c_str has room for only one
+/// byte per unit and would truncate a text with characters of several bytes. Such a text is
+/// converted with zeros appended, which make room for all of it.
 std::string allBytes(const String& text) {
     constexpr std::size_t kMostBytesPerUnit = 4;
     const unsigned short* const begin = text.getData();
@@ -53,7 +53,8 @@ std::string allBytes(const String& text) {
     return std::string(static_cast<const char*>(padded.c_str()));
 }
 
-/// Reads to the end of the stream; an error, unless it leaves nothing to read, drops everything.
+/// Reads to the end of the stream. After an error returns nothing, unless there was nothing left to
+/// read.
 std::string readAll(std::FILE* stream, const String& path, const Trace& trace) {
     std::string bytes;
     char chunk[kChunk];
@@ -69,8 +70,8 @@ std::string readAll(std::FILE* stream, const String& path, const Trace& trace) {
     return bytes;
 }
 
-/// A write that takes nothing ends the loop without being a failure of its own: closing the stream
-/// then reports what is wrong.
+/// A write that takes nothing ends the loop but is not reported as a failure here: closing the
+/// stream reports it.
 bool writeAll(std::FILE* stream, const std::string& bytes, const String& path, const Trace& trace) {
     const char* next = bytes.c_str();
     const char* const end = next + bytes.size();
@@ -107,7 +108,7 @@ int writeFile(const String& path, const String& text) {
     Trace trace(traceUnit);
     Stream stream = openText(path, "wb");
     if (stream == nullptr) {
-        // The message has always named the other mode; those who read the traces know it so.
+        // Not the mode that is used: readers of the traces know the message in this form.
         trace().error("Failed to open file %s using mode \"%s\", check permissions", path, "rb");
         return trace.exit(0);
     }
@@ -128,7 +129,7 @@ int deleteFile(String path) {
 
 int getDirectoryFromPath(const String& path, String& dir) {
     Trace trace(traceUnit);
-    // rfind leaves the first character out, so a separator that is found has text before it.
+    // rfind skips the first character, so there is text before any separator that it finds.
     const std::uint32_t separator = path.rfind('/');
     if (separator == String::NPOS) {
         trace().error("Directory [%s] cannot be parsed, no dir separator", path);

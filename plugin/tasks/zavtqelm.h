@@ -1,4 +1,4 @@
-/// One management request of the server together with its outcome.
+/// One management request from the server, together with its outcome.
 #pragma once
 
 #include <memory>
@@ -6,13 +6,13 @@
 #include "base/zavstr.h"
 #include "tasks/request_row.h"
 
-/// The request table fills the record, the task manager checks, runs or queues it, the handlers
-/// read it and set its message, and the record itself formats the rows that answer it. A record
-/// is used by one thread at a time.
+/// The request table fills the record. The task manager checks it, then runs or queues it. The
+/// handlers read it and set its message. The record itself formats the rows that answer it. One
+/// thread at a time.
 class TaskQueueElem {
 public:
     TaskQueueElem() = default;
-    /// A request with these values and no message yet.
+    /// A request with these values, and no message yet.
     TaskQueueElem(const ZAV::String& originnode, const ZAV::String& transid,
                   const ZAV::String& command, const ZAV::String& product,
                   const ZAV::String& context, const ZAV::String& optional,
@@ -34,7 +34,7 @@ public:
     void setUascript(ZAV::String value) { uascript_ = std::move(value); }
     void setVersion(ZAV::String value) { version_ = std::move(value); }
     void setTargetmsn(ZAV::String value) { targetmsn_ = std::move(value); }
-    /// The identifier of the result's message, and the message's one parameter.
+    /// The message id of the result, and the message's one parameter.
     void setRetmsgid(ZAV::String value) { retmsgid_ = std::move(value); }
     void setRetmsgparm(ZAV::String value) { retmsgparm_ = std::move(value); }
 
@@ -48,17 +48,17 @@ public:
     ZAV::String getVersion() const { return version_; }
     ZAV::String getTargetmsn() const { return targetmsn_; }
 
-    /// The request table's row as ReturnStatus() has filled it; all 0 before.
+    /// The row of the request table, as ReturnStatus() has filled it; all zeros before.
     zav_kagreqt_data_t getReturnResults() const { return row_ ? *row_ : zav_kagreqt_data_t{}; }
-    /// Fills the request table's row with the record's values and `rc`; sends nothing. Values that
-    /// are too long for their columns are cut and traced.
+    /// Fills the row of the request table with the record's values and `rc`; sends nothing. Values
+    /// that are too long for their columns are truncated and traced.
     void ReturnStatus(int rc);
-    /// Publishes the record's outcome as one row of the deploy status table. Sleeps one second
-    /// first, which paces the events. Values that are too long are cut and traced.
+    /// Publishes the outcome as one row of the deploy status table. Sleeps for a second first, to
+    /// pace the events. Values that are too long are truncated and traced.
     void returnAsyncStatus(int rc);
 
-    /// Writes a 0-terminated text into a field of `size` bytes: padded with blanks, or cut and
-    /// traced; no terminator.
+    /// Copies a 0-terminated text into a field of `size` bytes, without its terminator. A shorter
+    /// text is padded with blanks; a longer one is truncated and traced.
     static void SetValueAndPad(char* field, unsigned size, const char* value);
 
 private:
@@ -74,7 +74,7 @@ private:
     ZAV::String targetmsn_;
     ZAV::String retmsgid_;
     ZAV::String retmsgparm_;
-    // Shared by copies, never changed, and null until it is filled: a row takes far more room than
-    // all the rest, and a task that waits in the queue has none.
+    // Null until it is filled, then immutable and shared by copies: a row is much larger than the
+    // rest of the record, and tasks in the queue do not need one.
     std::shared_ptr<const zav_kagreqt_data_t> row_;
 };
