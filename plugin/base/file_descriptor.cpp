@@ -34,8 +34,8 @@ int FileDescriptor::release() {
 
 int FileDescriptor::close() {
     if (fd_ < 0) return 0;
-    // Linux frees the descriptor even when it reports EINTR, so a second try could close a
-    // stranger's.
+    // Linux frees the descriptor even when it reports EINTR. A second close could hit a descriptor
+    // that another thread has just opened.
     if (::close(release()) == 0 || errno == EINTR) return 0;
     return errno;
 }

@@ -1,4 +1,4 @@
-/// File descriptors that close themselves, and reading and writing through them.
+/// File descriptors that close themselves, and reading from and writing to them.
 #pragma once
 
 #include <sys/types.h>
@@ -8,11 +8,11 @@
 
 namespace ZAV {
 
-/// Owns one file descriptor, or none (-1). For one thread at a time.
+/// Owns one file descriptor, or none (-1). One thread at a time.
 class FileDescriptor {
 public:
     FileDescriptor() = default;
-    /// Takes over an open descriptor.
+    /// Takes ownership of an open descriptor.
     explicit FileDescriptor(int fd) : fd_(fd) {}
     FileDescriptor(FileDescriptor&& other) noexcept : fd_(other.release()) {}
     FileDescriptor& operator=(FileDescriptor&& other) noexcept;
@@ -20,29 +20,29 @@ public:
 
     bool isOpen() const { return fd_ >= 0; }
     int get() const { return fd_; }
-    /// Hands the descriptor over to the caller.
+    /// Gives up ownership and returns the descriptor.
     int release();
-    /// Closes the descriptor; returns 0 (also when none was open) or an errno value. The descriptor
-    /// is gone whatever the result.
+    /// Closes the descriptor. Returns 0, also when none was open, or an errno value. Either way the
+    /// object owns no descriptor afterwards.
     int close();
 
 private:
     int fd_ = -1;
 };
 
-/// Opens a file as open does, close-on-exec. When that fails the result is not open and errno
-/// tells why. The descriptor is above 2 even when those are free: what the host prints must not
-/// end up in a file of ours.
+/// Opens a file like open does, close-on-exec. On failure the result is not open and errno says
+/// why. The descriptor is above 2 even when lower ones are free, so that the host's output never
+/// ends up in a file of this library.
 FileDescriptor openFile(const char* path, int flags, mode_t mode = 0);
 
-/// Opens a stream for reading ("rb") or for writing from its start ("wb"), on such a descriptor.
-/// When that fails the result is null and errno tells why. The caller closes the stream.
+/// Opens a stream on such a descriptor, for reading ("rb") or for writing from the start ("wb").
+/// Returns null with errno set on failure. The caller closes the stream.
 std::FILE* openStream(const char* path, const char* mode);
 
-/// Reads up to `size` bytes; returns their number, 0 at the end of the file, or -1 with errno set.
+/// Reads up to `size` bytes. Returns their number, 0 at the end of the file, or -1 with errno set.
 ssize_t readSome(int fd, void* buffer, std::size_t size);
 
-/// Writes all of `size` bytes; returns 0 or an errno value.
+/// Writes all of `size` bytes. Returns 0 or an errno value.
 int writeAll(int fd, const void* data, std::size_t size);
 
 }  // namespace ZAV

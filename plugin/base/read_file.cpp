@@ -13,14 +13,14 @@
 namespace ZAV {
 namespace {
 
-// The utilities offer this operation as theirs, and it is traced as theirs for every caller.
+// Util::readFile is this function, so it traces under the unit of the utilities for every caller.
 RAS1_UNIT traceUnit{"zavutil"};
 
 /// The size of an open file, or -1 with errno set.
 off_t sizeOf(const FileDescriptor& file) {
     struct stat info;
     if (::fstat(file.get(), &info) != 0) return -1;
-    // Some file systems let a directory be sought, to an end that is no size.
+    // On some file systems one can seek in a directory, but its end is not a size.
     if (S_ISDIR(info.st_mode)) {
         errno = EISDIR;
         return -1;
@@ -30,7 +30,7 @@ off_t sizeOf(const FileDescriptor& file) {
     return size;
 }
 
-/// A block of `size` + 1 bytes; null, with errno set, when there is none.
+/// Allocates `size` + 1 bytes; null, with errno set, when out of memory.
 MallocedText allocate(off_t size) {
     if (static_cast<std::uintmax_t>(size) >= PTRDIFF_MAX) {
         errno = ENOMEM;
@@ -39,7 +39,7 @@ MallocedText allocate(off_t size) {
     return MallocedText(static_cast<char*>(std::malloc(static_cast<std::size_t>(size) + 1)));
 }
 
-/// Reads up to `size` bytes and ends them with a 0; the file may have shrunk meanwhile.
+/// Reads up to `size` bytes, fewer when the file has shrunk meanwhile, and appends a 0.
 int fill(const FileDescriptor& file, char* buffer, std::size_t size) {
     std::size_t filled = 0;
     while (filled < size) {

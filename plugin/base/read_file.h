@@ -1,4 +1,4 @@
-/// Reading a whole file at once.
+/// Reads a whole file at once.
 #pragma once
 
 #include <cstdlib>
@@ -10,13 +10,13 @@ struct FreeDeleter {
     void operator()(void* memory) const { std::free(memory); }
 };
 
-/// Owns a text from malloc.
+/// Owns a text that was allocated with malloc.
 using MallocedText = std::unique_ptr<char, FreeDeleter>;
 
-/// Reads a whole file. On 0 `*buf` is a malloc'ed buffer that holds the bytes and a terminating 0,
-/// which the caller frees, or null when the file is empty. Any other result is an errno value, and
-/// `*buf` is null. A path of null sets errno to EINVAL and gives that. What cannot tell its size, a
-/// pipe say, and what cannot be read, such as a directory, fails.
+/// Reads a whole file. Returns 0 and sets `*buf` to a malloc'ed buffer with the bytes and a
+/// terminating 0, which the caller frees, or to null when the file is empty. On failure returns an
+/// errno value and sets `*buf` to null. A null path gives EINVAL, and sets errno to it. Files
+/// without a size, such as pipes, and directories cannot be read.
 int readFile(const char* path, char** buf);
 
 }  // namespace ZAV

@@ -15,8 +15,8 @@ Block load(const unsigned short* units) {
     return block;
 }
 
-/// The index of the first unit in a word of four, in the order of memory, whose bits are set; some
-/// unit's are.
+/// The index of the first unit, in memory order, whose bits are set in a word of four units. The
+/// word must not be 0.
 unsigned firstSet(std::uint64_t word) {
     constexpr unsigned kUnitBits = 16;
 #if __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__

@@ -1,4 +1,4 @@
-/// The growable array of this library; a String keeps its code units in one.
+/// The growable array of this library. A String stores its code units in one.
 #pragma once
 
 #include <algorithm>
@@ -11,21 +11,21 @@
 
 namespace ZAV {
 
-/// Copies `count` elements by assignment, first to last. The ranges do not overlap.
+/// Copies `count` elements by assignment, from first to last. The ranges must not overlap.
 template <typename T>
 void CopyMem(T* dest, const T* src, std::uint32_t count) {
     std::copy_n(src, count, dest);
 }
 
-/// Says on standard output that an array was asked for a range it does not have, then throws.
+/// Reports on standard output that a range is out of bounds, then throws.
 [[noreturn]] void throwArrayIndexError(int line);
-/// Throws std::length_error: an array cannot hold that many elements.
+/// Throws std::length_error, because an array cannot hold that many elements.
 [[noreturn]] void throwArrayTooLong();
 
-/// A growable array. It grows to exactly what is asked for, never beyond; whoever appends much asks
-/// for the room first. Elements are default-constructible and copied by assignment. A bad range
-/// leaves the array as it is and throws IndexOutOfBoundsException; so does a failing allocation,
-/// with std::bad_alloc. Sources may lie in the array itself. One thread at a time.
+/// A growable array. It grows to exactly the size that is needed; callers that append many elements
+/// reserve room first. Elements must be default-constructible and are copied by assignment. A range
+/// out of bounds throws IndexOutOfBoundsException and a failed allocation std::bad_alloc; both
+/// leave the array unchanged. Sources may lie in the array itself. One thread at a time.
 template <typename T>
 class Array {
 public:
@@ -36,12 +36,11 @@ public:
         data = new T[capacity];
     }
     Array(const Array& other) : data(nullptr), size(0), capacity(0) { init(other); }
-    /// Leaves `other` empty and without a block; it may be used like any other array.
+    /// Leaves `other` empty and without a block. It can still be used.
     Array(Array&& other) noexcept : data(nullptr), size(0), capacity(0) { swap(other); }
     ~Array() { delete[] data; }
 
-    /// Takes a copy; the new block has the other's capacity. Nothing happens when both already
-    /// share a block, that is when `other` is this array.
+    /// Copies `other`; the new block has its capacity. Does nothing on self-assignment.
     Array& operator=(const Array& other) {
         if (data != other.data) init(other);
         return *this;
@@ -52,7 +51,7 @@ public:
         return *this;
     }
 
-    /// Replaces this array by a copy of `other` in a new block of the other's capacity.
+    /// Replaces the content by a copy of `other`, in a new block of the same capacity.
     void init(const Array& other) {
         Block block(other.capacity != 0 ? new T[other.capacity] : nullptr);
         CopyMem(block.get(), other.data, other.size);
@@ -67,9 +66,9 @@ public:
     }
 
     std::uint32_t getSize() const { return size; }
-    /// The number of elements that fit before the array reallocates.
+    /// The number of elements for which there is room without reallocating.
     std::uint32_t getCapacity() const { return capacity; }
-    /// The first element; valid until the array next grows, is cleared or assigned.
+    /// The first element. Valid until the array grows, is cleared or is assigned to.
     T* getData() { return data; }
     const T* getData() const { return data; }
 
@@ -83,11 +82,11 @@ public:
     }
 
     void append(const T& value) { append(&value, 1); }
-    /// Appends `n` elements that begin at `p`.
+    /// Appends the `n` elements at `p`.
     void append(const T* p, std::uint32_t n) {
         const std::uint32_t newSize = sizeWith(n);
         if (newSize > capacity) {
-            // The old block goes last: `p` may point into it.
+            // Frees the old block last, because `p` may point into it.
             Block block(new T[newSize]);
             CopyMem(block.get() + size, p, n);
             relocate(block.get());
@@ -99,8 +98,7 @@ public:
     }
 
     void insert(std::uint32_t pos, const T& value) { insert(pos, &value, 1); }
-    /// Inserts `n` elements that begin at `p` before the one at `pos`; at the end when `pos` is the
-    /// size.
+    /// Inserts the `n` elements at `p` before position `pos`, or at the end when `pos` is the size.
     void insert(std::uint32_t pos, const T* p, std::uint32_t n) {
         if (pos > size) throwArrayIndexError(__LINE__);
         const std::uint32_t newSize = sizeWith(n);
@@ -113,21 +111,21 @@ public:
     }
 
     void remove(std::uint32_t pos) { remove(pos, 1); }
-    /// Removes `n` elements from `pos` on; the block keeps its size.
+    /// Removes `n` elements, starting at `pos`. The capacity stays.
     void remove(std::uint32_t pos, std::uint32_t n) {
         if (pos > size || n > size - pos) throwArrayIndexError(__LINE__);
         shift(pos, pos + n, size - pos - n);
         size -= n;
     }
 
-    /// Makes the array `n` elements longer; the new ones are left as they are.
+    /// Makes the array `n` elements longer, without initialising them.
     void grow(std::uint32_t n) {
         const std::uint32_t newSize = sizeWith(n);
         if (newSize >= capacity) reserveCapacity(newSize);
         size = newSize;
     }
 
-    /// Makes room for exactly `n` elements in all; does nothing when there is that much.
+    /// Makes room for exactly `n` elements in total. Does nothing when there is enough.
     void reserveCapacity(std::uint32_t n) {
         if (n <= capacity) return;
         Block block(new T[n]);
@@ -135,14 +133,14 @@ public:
         adopt(std::move(block), n);
     }
 
-    /// Back to an empty array of the initial capacity.
+    /// Makes the array empty again, with the initial capacity.
     void clear() {
         adopt(Block(new T[kInitialCapacity]), kInitialCapacity);
         size = 0;
     }
 
-    /// Moves `count` elements from index `from` to index `to` within the block, in the order that
-    /// keeps overlapping ranges whole. The size stays.
+    /// Moves `count` elements within the block from index `from` to index `to`. The ranges may
+    /// overlap. The size stays.
     void shift(std::uint32_t to, std::uint32_t from, std::uint32_t count) {
         if (count > capacity || to > capacity - count || from > capacity - count) {
             throwArrayIndexError(__LINE__);
@@ -163,8 +161,8 @@ private:
         return size + n;
     }
 
-    /// Gives the elements to a new block. The old one is freed next, so they may be moved, unless
-    /// a move could fail half way.
+    /// Transfers the elements to a new block before the old one is freed. Moves them, unless a move
+    /// could throw half way.
     void relocate(T* block) {
         if constexpr (std::is_nothrow_move_assignable_v<T>) {
             std::move(data, data + size, block);
@@ -179,7 +177,7 @@ private:
         capacity = newCapacity;
     }
 
-    /// A copy of a source that lies in this array's own block, which is about to move.
+    /// Copies a source that lies in this array's own block, whose elements are about to move.
     Block copyIfOwn(const T* p, std::uint32_t n) const {
         const std::less<const T*> before;
         if (before(p, data) || !before(p, data + size)) return nullptr;

@@ -1,5 +1,5 @@
-/// Hash maps keyed by text. The order in which they list their keys is fixed: callers write files
-/// and tables from it.
+/// Hash maps keyed by text. The order in which they list their keys is part of their interface,
+/// because callers write files and tables in that order.
 #pragma once
 
 #include <cstdint>
@@ -10,38 +10,38 @@
 
 namespace ZAV {
 
-/// What both maps share: a table of chains whose entries are linked at the head. `Entry` has the
-/// fields `hash` (the key's full hash code), `key`, `value` and `next`. Keys compare
-/// case-sensitively. One thread at a time.
+/// The base of both maps: a table of chains; new entries go to the head of their chain. `Entry` has
+/// the fields `hash` (the key's full hash code), `key`, `value` and `next`. Keys are
+/// case-sensitive. One thread at a time.
 template <typename Entry>
 class ChainTable {
 public:
     virtual ~ChainTable() { dropEntries(); }
     ChainTable& operator=(const ChainTable&) = delete;
 
-    /// The keys, bucket by bucket, within a bucket from its newest entry on.
+    /// The keys, bucket by bucket, and within a bucket from the newest entry to the oldest.
     Array<String> getKeys() const;
     std::uint32_t getSize() const { return count; }
     /// The number of buckets.
     std::uint32_t getCapacity() const { return capacity; }
-    /// The number of entries that makes the next new key enlarge the table.
+    /// The number of entries from which on a new key enlarges the table.
     std::uint32_t getThreshold() const { return threshold; }
-    /// Whether there is a table yet: the first entry makes it.
+    /// Whether there is a table; the first entry creates it.
     bool hasTable() const { return table != nullptr; }
 
-    /// h * 33 + unit over the key's units in 32 bits, modulo 2147483647.
+    /// Computes h * 33 + unit over the key's units in 32 bits, modulo 2147483647.
     static std::uint32_t hashCode(const String& key);
 
 protected:
     ChainTable() = default;
-    /// Takes the sizes only; the entries are put by the map, which knows who owns their values.
+    /// Copies the sizes only. The maps copy the entries, because they know who owns the values.
     ChainTable(const ChainTable& other)
         : capacity(other.capacity), threshold(other.threshold), loadFactor(other.loadFactor) {}
 
     Entry* lookUp(const String& key, std::uint32_t hash) const;
-    /// Adds an entry whose key is not in the map yet; enlarges the table first when it is due.
+    /// Adds an entry whose key is not in the map yet. Enlarges the table first if necessary.
     void link(std::unique_ptr<Entry> added);
-    /// Takes the entry of `key` out; null when there is none.
+    /// Removes the entry of `key` and returns it; null when there is none.
     std::unique_ptr<Entry> unlink(const String& key);
     /// Deletes all entries and the table.
     void dropEntries();
@@ -55,7 +55,7 @@ private:
     }
     void rehash();
 
-    std::unique_ptr<Entry*[]> table;  // chain heads, which own their chains; null until needed
+    std::unique_ptr<Entry*[]> table;  // heads of the chains, which it owns; null until needed
     std::uint32_t capacity = 11;
     std::uint32_t count = 0;
     std::uint32_t threshold = 8;
@@ -85,41 +85,41 @@ public:
     using entry = StrStrEntry;
 
     StrStrMap() = default;
-    /// Puts the other's entries in its order, so entries of one bucket change places.
+    /// Adds the other's entries in the order of its keys, which reverses the order in a bucket.
     StrStrMap(const StrStrMap& other);
 
     /// Adds the key or overwrites its value.
     void put(const String& key, const String& value);
-    /// Assigns the key's value to `value` and returns true; false when the key is not there.
+    /// Stores the key's value in `value` and returns true; false when the key is missing.
     bool get(const String& key, String& value) const;
     void remove(const String& key) { unlink(key); }
-    /// Empties the map; the number of buckets stays for the next entries.
+    /// Empties the map; keeps the number of buckets.
     void removeAll() { dropEntries(); }
 };
 
-/// A map from text to untyped pointers. With auto-delete on, it owns the values and frees one
-/// whenever it discards it: with the free-value function, else with scalar delete, which runs no
+/// A map from text to untyped pointers. With auto-delete on, the map owns the values and frees each
+/// that it discards: with the free-value function, or without one with scalar delete, which runs no
 /// destructor. Null values are never freed.
 class StrPtrMap : public ChainTable<StrPtrEntry> {
 public:
     using entry = StrPtrEntry;
 
     StrPtrMap() = default;
-    /// Shares the other's values without owning them: auto-delete is off in the copy. Entries of
-    /// one bucket change places, as in StrStrMap.
+    /// Shares the other's values without owning them; auto-delete is off in the copy. The order in
+    /// a bucket is reversed, as in StrStrMap.
     StrPtrMap(const StrPtrMap& other);
     ~StrPtrMap() override { removeAll(); }
 
-    /// Adds the key or overwrites its value. The old value is freed under auto-delete even when it
-    /// is the new one too, so an owned pointer must not be put twice.
+    /// Adds the key or overwrites its value. With auto-delete the old value is freed even when it
+    /// is the same pointer as the new one, so never put an owned pointer twice.
     void put(const String& key, void* value);
-    /// Stores the key's value in `*value` and returns true; false when the key is not there.
+    /// Stores the key's value in `*value` and returns true; false when the key is missing.
     bool get(const String& key, void** value) const;
     void remove(const String& key);
     void removeAll();
 
     void setAutoDeleteValues(bool on) { autoDeleteValues = on; }
-    /// `fn` is a function that takes the value pointer, `void (*)(void*)`, or null.
+    /// `fn` is null or a function of type `void (*)(void*)` that takes the value pointer.
     void setFreeValueFunc(void* fn);
 
 private:

@@ -13,7 +13,7 @@ String* trimmedCopy(const char* text) {
     return copy.release();
 }
 
-/// The end of the line that starts at `line`: its line feed, or the carriage return before that, or
+/// The end of the line that starts at `line`: its line feed, the carriage return before that, or
 /// the terminating 0.
 char* endOfLine(char* line) {
     char* const feed = std::strchr(line, '\n');

@@ -9,7 +9,7 @@
 
 namespace ZAV {
 
-/// A property file cannot be read.
+/// Thrown when a property file cannot be read.
 class ResourceBundleException {
 public:
     explicit ResourceBundleException(const String& message) : message_(message) {}
@@ -22,28 +22,29 @@ private:
     String message_;
 };
 
-/// Deletes the String at `p`; null is ignored. For maps whose values are Strings.
+/// Deletes the String at `p`; does nothing for null. For maps whose values are Strings.
 void freeValueFunc(void* p);
 
 /// The values of one property file, read once.
 ///
-/// A line is "KEY=value", white space around either not counting; every "=" after the first belongs
-/// to the value. Lines end in a line feed, with or without a carriage return before it. A line
-/// whose first byte is the comment character is left out, and so is one without "=". Of several
-/// lines with one key the last counts. There are no escapes, quotes or continued lines.
+/// A line is "KEY=value". White space around key and value is ignored; each "=" after the first
+/// belongs to the value. Lines end in a line feed, with or without a carriage return before it.
+/// Lines that begin with the comment character and lines without "=" are skipped. When a key
+/// appears twice, the last line wins. There are no escapes, quotes or continuation lines.
 ///
-/// Copies share the values, which go with the last of them. Bundles may be read by several threads.
+/// Copies share the values, which are deleted with the last copy. Several threads may read a
+/// bundle.
 class ResourceBundle {
 public:
-    /// Reads the file; throws ResourceBundleException when that fails.
+    /// Reads the file. Throws ResourceBundleException when that fails.
     ResourceBundle(const String& path, char commentChar);
     ResourceBundle(const ResourceBundle& other);
     ResourceBundle& operator=(const ResourceBundle&) = delete;
     virtual ~ResourceBundle() {}
 
-    /// The value, which stays the bundle's; null when the key is absent.
+    /// The value, which the bundle owns; null when the key is missing.
     String* getValue(const String& key) const;
-    /// All keys, in no order to rely on.
+    /// All keys, in no particular order.
     Array<String> getKeys() const { return values_->getKeys(); }
 
 private:

@@ -1,4 +1,4 @@
-// String: what needs no code page. The conversions are in zavstr_conv.cpp.
+// String without the conversions, which are in zavstr_conv.cpp.
 
 #include "base/zavstr.h"
 
@@ -21,7 +21,7 @@ RAS1_UNIT traceUnit{"zavstr"};
     throw IndexOutOfBoundsException(line, traceUnit.name);
 }
 
-/// Whether `n` units, at least one, stand at `pos` in a text of `length` units.
+/// Whether a text of `length` units has `n` units at `pos`, and `n` is not 0.
 bool isRange(std::uint32_t pos, std::uint32_t n, std::uint32_t length) {
     return n != 0 && n <= length && pos <= length - n;
 }
@@ -29,7 +29,7 @@ bool isRange(std::uint32_t pos, std::uint32_t n, std::uint32_t length) {
 using UnitBlock = unsigned short __attribute__((vector_size(16)));
 constexpr std::uint32_t kBlock = sizeof(UnitBlock) / sizeof(unsigned short);
 
-/// Whether one of the units of a block is `ch`.
+/// Whether a block contains `ch`.
 bool blockHolds(const unsigned short* units, unsigned short ch) {
     UnitBlock block;
     std::memcpy(&block, units, sizeof block);
@@ -40,7 +40,7 @@ bool blockHolds(const unsigned short* units, unsigned short ch) {
     return (words[0] | words[1]) != 0;
 }
 
-/// The index of the first `ch` in [start, end), else `end`.
+/// The index of the first `ch` in [start, end), or `end`.
 std::uint32_t indexOf(const unsigned short* units, std::uint32_t start, std::uint32_t end,
                       unsigned short ch) {
     while (end - start >= kBlock && !blockHolds(units + start, ch))
@@ -148,7 +148,7 @@ String& String::operator=(const String& other) {
 String& String::operator=(String&& other) noexcept {
     if (this == &other) return *this;
     units_.swap(other.units_);
-    // What it holds now is no use to anybody; cutting it off needs no memory.
+    // `other` holds this text's former units. Truncating it needs no memory.
     other.units_.getData()[0] = 0;
     other.units_.remove(1, other.units_.getSize() - 1);
     return *this;
@@ -176,8 +176,8 @@ void String::clear() {
     terminate();
 }
 
-/// Makes room for `n` more units, and for as much again as half the text: texts are put together
-/// from many small pieces, and copying all of it for each would take time quadratic in its length.
+/// Makes room for `n` more units, and for half as many as the text has. Texts are often built from
+/// many small pieces; reallocating for each would take quadratic time.
 void String::reserveMore(std::uint32_t n) {
     const std::uint32_t size = units_.getSize();
     const std::uint32_t capacity = units_.getCapacity();
@@ -268,7 +268,7 @@ String& String::removeEscapes(unsigned short esc) {
     const std::uint32_t end = length();
     std::uint32_t kept = 0;
     for (std::uint32_t i = 0; i < end; ++i) {
-        // What follows a removed escape is kept unexamined.
+        // The unit after a removed escape is kept without looking at it.
         if (units[i] == esc && isSpecial(units[i + 1])) ++i;
         units[kept++] = units[i];
     }
@@ -278,7 +278,7 @@ String& String::removeEscapes(unsigned short esc) {
 
 String& String::insertEscapes(unsigned short esc, const String& special) {
     const Trace trace(traceUnit);
-    // The terminator takes part: a special set that holds 0 gets it escaped like any other unit.
+    // Includes the terminator: when the special set contains 0, it is escaped like any other unit.
     const unsigned short* const units = getData();
     const std::uint32_t end = units_.getSize();
     std::uint32_t escapes = 0;
@@ -331,7 +331,7 @@ std::uint32_t String::find(unsigned short ch, unsigned short esc, std::uint32_t 
     Trace trace(traceUnit);
     if (start >= length()) throwOutOfBounds(trace);
     const unsigned short* const units = getData();
-    std::uint32_t escapes = 0;  // that stand right before i, also where they precede the start
+    std::uint32_t escapes = 0;  // directly before i, including those before the start
     while (escapes < start && units[start - 1 - escapes] == esc)
         ++escapes;
     for (std::uint32_t i = start; i < length(); ++i) {

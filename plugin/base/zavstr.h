@@ -1,5 +1,5 @@
-/// The text type of this library. Text is kept as UTF-16 and converted from and to the process's
-/// code page only where it comes in as `char*` and where c_str() hands it out.
+/// The text type of this library. Text is stored as UTF-16. It is converted from the process's code
+/// page where it comes in as `char*`, and to it where c_str() returns it.
 #pragma once
 
 #include <atomic>
@@ -13,11 +13,11 @@
 
 namespace ZAV {
 
-/// An owned, 0-terminated narrow text. What its conversions yield lives as long as the CharStar:
-/// use it within the full expression or keep the CharStar in a local.
+/// An owned, 0-terminated narrow text. The pointers that it converts to are valid as long as the
+/// CharStar lives: use them within the same full expression, or keep the CharStar in a variable.
 class CharStar {
 public:
-    /// Copies `text`; a null pointer is kept as one.
+    /// Copies `text`; a null pointer stays null.
     CharStar(const char* text);
     CharStar(const CharStar& other);
     CharStar(CharStar&& other) noexcept : text_(other.text_) { other.text_ = nullptr; }
@@ -35,28 +35,29 @@ private:
     char* text_;  // from array new
 };
 
-/// UTF-16 text. Lengths and positions count code units: a surrogate pair counts as two. After every
-/// operation the units are followed by exactly one terminating 0.
+/// UTF-16 text. Lengths and positions count code units, so a surrogate pair counts as two. The
+/// units are always followed by exactly one terminating 0.
 ///
-/// A position or count that the text does not have is traced and throws IndexOutOfBoundsException;
-/// the String is unchanged then. Conversions never fail: whatever could be converted is used. A
-/// String belongs to one thread at a time; conversions run on any number of threads.
+/// A position or count out of range is traced and throws IndexOutOfBoundsException; the String is
+/// unchanged then. Conversions never fail; they return what could be converted. Use a String on one
+/// thread at a time; several threads may convert at once.
 class String {
 public:
-    /// What searches return when nothing is found.
+    /// The result of a search that finds nothing.
     static constexpr std::uint32_t NPOS = 0xFFFFFFFFu;
 
     String() { terminate(); }
     String(const String& other);
-    /// Leaves `other` empty. May run out of memory, since `other` needs a block for its terminator.
+    /// Leaves `other` empty. May throw std::bad_alloc, because `other` needs a block for its
+    /// terminator.
     String(String&& other);
-    /// The first `n` units of `other`, which is trusted to have them.
+    /// The first `n` units of `other`. Does not check that there are as many.
     String(const String& other, std::uint32_t n);
-    /// From the local code page; a null pointer yields an empty text.
+    /// From the local code page; a null pointer gives an empty text.
     String(const char* text);
-    /// From the first `n` bytes of `text`, or from what stands before an earlier 0.
+    /// From the first `n` bytes of `text`, or fewer when there is a 0 before that.
     String(const char* text, std::uint32_t n);
-    /// From 0-terminated units; a null pointer yields an empty text.
+    /// From 0-terminated units; a null pointer gives an empty text.
     String(const unsigned short* units);
     virtual ~String() {}
 
@@ -68,7 +69,7 @@ public:
     String& assign(const char* text);
     String& assign(const char* text, std::uint32_t n);
     String& assign(const unsigned short* units);
-    /// Takes `n` units, a 0 among them too.
+    /// Assigns `n` units, which may include a 0.
     String& assign(const unsigned short* units, std::uint32_t n);
     String& assign(const String& other);
     String& assign(const String& other, std::uint32_t n);
@@ -76,26 +77,26 @@ public:
 
     String& append(unsigned short ch);
     String& append(const String& other) { return append(other, other.length()); }
-    /// Appends the first `n` units of `other`; throws when it has fewer.
+    /// Appends the first `n` units of `other`. Throws when it has fewer.
     String& append(const String& other, std::uint32_t n);
-    /// Erases from `pos` to the end; throws when that is nothing.
+    /// Erases the text from `pos` to the end. Throws when there is nothing to erase.
     String& erase(std::uint32_t pos);
-    /// Erases `n` units from `pos` on; throws when `n` is 0.
+    /// Erases `n` units, starting at `pos`. Throws when `n` is 0.
     String& erase(std::uint32_t pos, std::uint32_t n);
-    /// Removes white space (isWhiteSpace) at both ends.
+    /// Removes white space (see isWhiteSpace) at both ends.
     String& trim();
     String& toUpper();
     String& toLower();
-    /// Removes each `esc` that stands before one of the special characters [ ] { } = \ .
+    /// Removes each `esc` that precedes one of the special characters [ ] { } = \ .
     String& removeEscapes(unsigned short esc);
-    /// Puts `esc` before every unit that occurs in `special`.
+    /// Inserts `esc` before every unit that occurs in `special`.
     String& insertEscapes(unsigned short esc, const String& special);
 
     std::uint32_t length() const { return units_.getSize() - 1; }
     std::uint32_t size() const { return length(); }
-    /// The 0-terminated units; valid until the text is next changed.
+    /// The 0-terminated units; valid until the text changes.
     const unsigned short* getData() const { return units_.getData(); }
-    /// The unit at `i`; the terminator when `i` is the length.
+    /// The unit at `i`, or the terminator when `i` is the length.
     unsigned short& operator[](std::uint32_t i) {
         if (i > length()) throwBadSubscript();
         return units_.getData()[i];
@@ -105,9 +106,9 @@ public:
         return units_.getData()[i];
     }
 
-    /// From `pos` to the end; throws when that is nothing.
+    /// The text from `pos` to the end. Throws when that would be empty.
     String substr(std::uint32_t pos) const;
-    /// `n` units from `pos` on; throws when `n` is 0.
+    /// `n` units, starting at `pos`. Throws when `n` is 0.
     String substr(std::uint32_t pos, std::uint32_t n) const;
 
     /// The first index at or after `start` that holds `ch`, or NPOS. Throws when `start` is not
@@ -115,37 +116,38 @@ public:
     std::uint32_t find(unsigned short ch, std::uint32_t start = 0) const;
     /// The same for a byte value.
     std::uint32_t find(char ch, std::uint32_t start) const;
-    /// The first `ch` at or after `start` that is not escaped: it stands at `start` itself or
-    /// behind an even number of `esc` units. Throws as find(ch, start) does.
+    /// The first `ch` at or after `start` that is not escaped, which means that it is at `start` or
+    /// follows an even number of `esc` units. Throws like find(ch, start).
     std::uint32_t find(unsigned short ch, unsigned short esc, std::uint32_t start) const;
-    /// The first index at or after `start` at which `other` occurs, or NPOS; an empty text occurs
-    /// nowhere. Never throws.
+    /// The first index at or after `start` at which `other` occurs, or NPOS. An empty text is never
+    /// found. Does not throw.
     std::uint32_t find(const String& other, std::uint32_t start) const;
-    /// The last index that holds `ch`, the terminator's included and index 0 left out, or NPOS.
+    /// The last index that holds `ch`, or NPOS. Includes the terminator's index, but not index 0.
     std::uint32_t rfind(unsigned short ch) const;
 
-    /// The text in the local code page, cut to as many bytes as the text and its terminator have
-    /// code units.
+    /// The text in the local code page, truncated to as many bytes as the text with its terminator
+    /// has code units.
     CharStar c_str() const;
 
-    /// Opens the process's locale anew, in place of the one held; true when there is one. Called by
-    /// the first conversion. Threads may race for it; but whoever calls it once conversions run
-    /// must know that the platform lets a locale be released while another thread converts.
+    /// Opens the process's locale again and replaces the current one. Returns whether there is one.
+    /// The first conversion calls it; several threads may do so at once. Calling it later is safe
+    /// only when the platform allows releasing a locale while another thread converts with it.
     static bool initialize();
 
-    /// Compares unit by unit up to the terminator: 0 when equal, -1 when `a` is the beginning of
-    /// `b`, 1 the other way round, else the difference of the first two units that differ.
+    /// Compares unit by unit up to the terminator. Returns 0 when equal, -1 when `a` is a prefix of
+    /// `b`, 1 when `b` is a prefix of `a`, otherwise the difference of the first units that differ.
     static int compare(const String& a, const String& b);
     static int compare(const unsigned short* a, const unsigned short* b);
-    /// `str` with every `what` in it replaced by `with`.
+    /// Returns `str` with every `what` replaced by `with`.
     static String replace(const String& str, const String& what, const String& with);
-    /// The decimal number that `s` is as a whole, blanks before it allowed; an empty text is 0. On
-    /// failure `*out` is 0: not a number, not within 32 bits, or one of the two extreme values.
+    /// Converts a decimal number, which must be the whole of `s` except for leading blanks. An
+    /// empty text is 0. Returns false and sets `*out` to 0 when `s` is not a number, does not fit
+    /// into 32 bits, or is one of the two extreme values.
     static bool convertToInt(const String& s, int* out);
     static bool isWhiteSpace(unsigned short ch);
 
-    /// New 0-terminated units from text in the local code page; null for a null pointer. The caller
-    /// frees them with releaseUnicodeString.
+    /// Converts text in the local code page to new 0-terminated units. Returns null for a null
+    /// pointer. The caller frees the result with releaseUnicodeString.
     static unsigned short* createUnicodeString(const char* text);
     static unsigned short* createUnicodeString(const char* text, std::uint32_t n);
     static unsigned short* copyUnicodeString(const unsigned short* units);
@@ -186,7 +188,7 @@ inline bool operator==(const String& a, const char* b) {
     return a == String(b);
 }
 
-/// Writes ASCII as it is and every other unit, 0 included, as "\x" and four hexadecimal digits.
+/// Writes ASCII unchanged and every other unit, 0 included, as "\x" and four hexadecimal digits.
 std::ostream& operator<<(std::ostream& out, const String& text);
 
 }  // namespace ZAV

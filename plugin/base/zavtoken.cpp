@@ -22,7 +22,7 @@ StringTokenizer::StringTokenizer(String textToSplit, String delimiterCharacters)
       delimiterSet(delimiters.getData(), delimiters.length()),
       position(skipDelimiters(0)) {}
 
-/// The first index at or after `p` that holds no delimiter, else the length.
+/// The first index at or after `p` that holds no delimiter, or the length.
 inline std::uint32_t StringTokenizer::skipDelimiters(std::uint32_t p) const {
     const unsigned short* const units = text.getData();
     return static_cast<std::uint32_t>(delimiterSet.findOther(units + p, units + text.length()) -
@@ -36,8 +36,8 @@ inline std::uint32_t StringTokenizer::readToken(std::uint32_t p) const {
                                       units);
 }
 
-/// Whether there is a token at the position. Throws when there are no delimiters, as a search among
-/// none does.
+/// Whether there is a token at the position. Throws when there are no delimiters, like a search in
+/// an empty text.
 inline bool StringTokenizer::isAtToken() const {
     if (position >= text.length()) return false;
     if (delimiters.length() == 0) delimiters.find(text.getData()[position], 0);
@@ -61,7 +61,7 @@ int StringTokenizer::countTokens() const {
 
 String StringTokenizer::nextToken() {
     const Trace trace(traceUnit);
-    // Where there is no token, substr is asked for nothing and throws.
+    // Without a token the length is 0, and substr throws.
     const std::uint32_t start = position;
     const std::uint32_t end = isAtToken() ? readToken(start) : start;
     position = skipDelimiters(end);

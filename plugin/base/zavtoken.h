@@ -5,8 +5,8 @@
 #include "base/unit_set.h"
 #include "base/zavstr.h"
 
-/// Splits a text at delimiter characters; runs of them count as one, and those at the ends as none.
-/// Without delimiters, every operation on a text that is not empty throws
+/// Splits a text at delimiter characters. A run of delimiters counts as one; those at either end
+/// are ignored. When `delimiters` is empty, every operation on a text that is not empty throws
 /// ZAV::IndexOutOfBoundsException. One thread at a time.
 class StringTokenizer {
 public:
@@ -16,9 +16,9 @@ public:
 
     /// Whether nextToken has something to return.
     bool hasMoreTokens() const;
-    /// How many tokens are still to come; the position stays.
+    /// The number of tokens that are left. Does not move on.
     int countTokens() const;
-    /// The next token; throws ZAV::IndexOutOfBoundsException when there is none.
+    /// Returns the next token. Throws ZAV::IndexOutOfBoundsException when there is none.
     ZAV::String nextToken();
 
 private:

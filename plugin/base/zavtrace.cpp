@@ -16,8 +16,8 @@ constexpr const char* kDigits = "0123456789";
 constexpr const char* kLengths = "hljztL";
 constexpr const char* kConversions = "diuxXocsp";
 
-/// The conversion that begins at the "%" in `format`, without its length modifiers; empty when
-/// printf knows none of that form. `end` is set behind it.
+/// Returns the conversion that begins at the "%" at `format`, without its length modifiers; empty
+/// when it is not one of printf's. Sets `end` to the position after it.
 std::string conversionAt(const char* format, const char*& end) {
     const char* at = format + 1;
     at += std::strspn(at, kFlags);
@@ -38,7 +38,7 @@ void appendFormatted(const std::string& conversion, T value, std::string& out) {
     char buffer[64];
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
-    // The caller made the conversion for exactly this type.
+    // The caller has built the conversion for exactly this type.
     const int length = std::snprintf(buffer, sizeof buffer, conversion.c_str(), value);
 #pragma GCC diagnostic pop
     if (length > 0) {
@@ -50,8 +50,8 @@ std::size_t numberAt(const std::string& conversion, std::size_t at) {
     return static_cast<std::size_t>(std::strtoul(conversion.c_str() + at, nullptr, 10));
 }
 
-/// Appends a text as "%s" of that width and precision does; the text need not be terminated before
-/// the precision is reached.
+/// Appends a text like "%s" with the given width and precision. The text need not be terminated
+/// when it is as long as the precision.
 void appendText(const std::string& conversion, const char* text, std::string& out) {
     const std::size_t flagsEnd = conversion.find_first_not_of(kFlags, 1);
     const bool leftAligned = conversion.find('-') < flagsEnd;
@@ -89,7 +89,7 @@ void TraceArgument::format(const std::string& conversion, std::string& out) cons
     } else if (isNumber && (letter == 'd' || letter == 'i')) {
         appendFormatted(head + "lld", number_, out);
     } else if (isNumber) {
-        // Hexadecimal digits of a negative int are those of its own 32 bits.
+        // A negative int is printed in hexadecimal as 32 bits, not as 64.
         const long long value = kind_ == Kind::Signed && number_ < 0 && number_ >= INT32_MIN
                                     ? static_cast<long long>(static_cast<std::uint32_t>(number_))
                                     : number_;

@@ -1,5 +1,5 @@
-/// Tracing for the functions of this library: one line per function gives it its trace block, with
-/// entry and exit events, and writes lines at detail or error level.
+/// Tracing for the functions of this library. One line at the start of a function creates its trace
+/// block, which writes entry and exit events, and lines at detail or error level.
 ///
 ///     RAS1_UNIT traceUnit{"zavutil"};                       // once per source file
 ///
@@ -10,9 +10,9 @@
 ///         return trace.exit(true);
 ///     }
 ///
-/// The format is printf's, but every argument carries its own type: a conversion that does not
-/// match its argument still prints something sensible, and one that printf does not know is
-/// written as it stands. Arguments are converted only when the line is wanted.
+/// Formats are printf's, but every argument knows its own type: a conversion that does not match
+/// its argument still prints something sensible, and an unknown conversion is written literally.
+/// Arguments are converted only when the line is enabled.
 #pragma once
 
 #include <initializer_list>
@@ -30,7 +30,7 @@ class String;
 /// declaration is all that the trace knows of it.
 std::string localText(const String& text);
 
-/// One argument of a trace line. Borrows what it is made from.
+/// One argument of a trace line. Borrows the value that it is made from.
 class TraceArgument {
 public:
     template <typename T, std::enable_if_t<std::is_integral_v<T> || std::is_enum_v<T>, int> = 0>
@@ -43,8 +43,8 @@ public:
     TraceArgument(const String& text) : kind_(Kind::Wide), pointer_(&text) {}
     TraceArgument(const CharStar& text);  ///< defined with CharStar
 
-    /// Appends the argument to `out` under a conversion such as "%-5d" or "%.64s". A text is read
-    /// up to its terminating 0 or the conversion's precision, whichever comes first.
+    /// Appends the argument to `out`, formatted by a conversion such as "%-5d" or "%.64s". A text
+    /// is read up to its terminating 0 or the conversion's precision, whichever comes first.
     void format(const std::string& conversion, std::string& out) const;
 
 private:
@@ -58,10 +58,10 @@ private:
     };
 };
 
-/// The text that a trace line has.
+/// Formats the text of a trace line.
 std::string formatTrace(const char* format, std::initializer_list<TraceArgument> arguments);
 
-/// The trace block of one function call. Lives on the stack, first in the function.
+/// The trace block of one function call: the first local variable of the function.
 class Trace {
 public:
     explicit Trace(RAS1_UNIT& unit, const char* function = __builtin_FUNCTION(),
@@ -75,8 +75,8 @@ public:
     Trace(const Trace&) = delete;
     Trace& operator=(const Trace&) = delete;
 
-    /// A place in the source from which lines are written. Without memory for a line its format
-    /// alone is written.
+    /// Writes lines on behalf of one place in the source. When out of memory, it writes the format
+    /// without its arguments.
     class Place {
     public:
         Place(const Trace& trace, int line) : trace_(trace), line_(line) {}
@@ -97,10 +97,10 @@ public:
         int line_;
     };
 
-    /// Lines are written from the place of the call: trace().error("...").
+    /// The place of the call, for a line: trace().error("...").
     Place operator()(int line = __builtin_LINE()) const { return Place(*this, line); }
 
-    /// Gives the exit event the function's result; returns it.
+    /// Records the function's result for the exit event, and returns it.
     template <typename T>
     T exit(T result, int line = __builtin_LINE()) {
         static_assert(std::is_integral_v<T> || std::is_enum_v<T>, "only numbers are traced");
@@ -110,7 +110,7 @@ public:
         return result;
     }
 
-    /// Whether detail lines are wanted; ask before working something out only for a trace.
+    /// Whether detail lines are enabled. Check this before computing something just for a trace.
     bool detailed() const { return (flags_ & RAS1_DETAIL) != 0; }
     bool erroneous() const { return (flags_ & RAS1_ERROR) != 0; }
 

@@ -53,8 +53,8 @@ std::string allBytes(const String& text) {
     return std::string(static_cast<const char*>(padded.c_str()));
 }
 
-/// Reads to the end of the stream. After an error returns nothing, unless there was nothing left to
-/// read.
+/// Reads to the end of the stream. When a read returns data and an error, drops everything; an
+/// error without data counts as the end.
 std::string readAll(std::FILE* stream, const String& path, const Trace& trace) {
     std::string bytes;
     char chunk[kChunk];
