@@ -118,14 +118,14 @@ std::string local(const std::vector<unsigned short>& units) {
 void overridesTheDocumentsEncoding(Bench&) {
     inBothLocales([] {
         requireEqual(eventsOf("<a>\xC3\xA4</a>", "UTF-8"), Events{"<a", "\"" + local({0xE4}), ">a"},
-                     "the events");
+                     "the list of events");
     });
 }
 
 void handsElementsOver(Bench&) {
     inBothLocales([] {
         requireEqual(eventsOf("<a x='1' y='2'><b></b><c/></a>"),
-                     Events{"<a x=1 y=2", "<b", ">b", "<c", ">c", ">a"}, "the events");
+                     Events{"<a x=1 y=2", "<b", ">b", "<c", ">c", ">a"}, "the list of events");
     });
 }
 
@@ -134,14 +134,14 @@ void letsElementHandlersBeMissing(Bench&) {
         Recorder recorder;
         XML1_SetElementHandler(recorder.parser(), nullptr, nullptr);
         requireEqual(recorder.push("<a>t</a>", true), 1, "the result");
-        requireEqual(recorder.events, Events{"\"t"}, "the events");
+        requireEqual(recorder.events, Events{"\"t"}, "the list of events");
     });
 }
 
 void handsTextOverInOrder(Bench&) {
     inBothLocales([] {
         requireEqual(eventsOf("<a>t<b>u</b>v &lt; w</a>"),
-                     Events{"<a", "\"t", "<b", "\"u", ">b", "\"v < w", ">a"}, "the events");
+                     Events{"<a", "\"t", "<b", "\"u", ">b", "\"v < w", ">a"}, "the list of events");
     });
 }
 
@@ -150,7 +150,7 @@ void letsTheDataHandlerBeMissing(Bench&) {
         Recorder recorder;
         XML1_SetCharacterDataHandler(recorder.parser(), nullptr);
         requireEqual(recorder.push("<a>t</a>", true), 1, "the result");
-        requireEqual(recorder.events, Events{"<a", ">a"}, "the events");
+        requireEqual(recorder.events, Events{"<a", ">a"}, "the list of events");
     });
 }
 
@@ -216,7 +216,7 @@ void convertsToTheLocalCodePage(Bench&) {
                               "<\xC3\xA4 k='\xC3\xBC'>\xC3\x9F 1\xE2\x82\xAC</\xC3\xA4>"),
                      Events{"<" + local({0xE4}) + " k=" + local({0xFC}),
                             "\"" + local({0xDF, ' ', '1', 0x20AC}), ">" + local({0xE4})},
-                     "the events");
+                     "the list of events");
     });
 }
 
@@ -236,14 +236,14 @@ void readsUndeclaredTextAsLocal(Bench&) {
     inBothLocales([] {
         const std::string text = local({0xE4});
         requireEqual(eventsOf("<a k='" + text + "'>" + text + "</a>"),
-                     Events{"<a k=" + text, "\"" + text, ">a"}, "the events");
+                     Events{"<a k=" + text, "\"" + text, ">a"}, "the list of events");
     });
 }
 
 void acceptsADocumentThatEndsWithinAnElement(Bench&) {
     inBothLocales([] {
         requireEqual(eventsOf("<a>t<b>u</b>"), Events{"<a", "\"t", "<b", "\"u", ">b"},
-                     "the events");
+                     "the list of events");
         Recorder cut;
         requireEqual(cut.pushInPieces("<a>t<b>u</b>", 1), 1, "the result byte by byte");
         Recorder deaf;
@@ -279,7 +279,7 @@ void takesEmptyPieces(Bench&) {
         requireEqual(XML1_ParseBuffer(recorder.parser(), 0, 0), 1, "the result without a buffer");
         requireEqual(recorder.push("", false), 1, "the result with a buffer");
         requireEqual(recorder.push("<a/>", true), 1, "the result of the rest");
-        requireEqual(recorder.events, Events{"<a", ">a"}, "the events");
+        requireEqual(recorder.events, Events{"<a", ">a"}, "the list of events");
     });
 }
 
