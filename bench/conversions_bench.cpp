@@ -27,18 +27,26 @@ struct Kind {
     const char* codeset;
     const char* locale;   ///< a process's locale that has this code page
     const char* pattern;  ///< what the text consists of
+    bool cut;             ///< at any byte, as each is a character
 };
 
 constexpr const char* kAscii = "The quick brown fox, 0123456789 ";
 constexpr Kind kKinds[] = {
-    {"utf8_ascii", "UTF-8", "C.UTF-8", kAscii},
+    {"utf8_ascii", "UTF-8", "C.UTF-8", kAscii, true},
     {"utf8_mixed", "UTF-8", "C.UTF-8",
      "Gr\xC3\xB6\xC3\x9F"
-     "e \xE2\x82\xAC 12, "},
-    {"latin1_ascii", "ISO-8859-1", "C", kAscii},
+     "e \xE2\x82\xAC 12, ",
+     false},
+    // Latin, Greek, Cyrillic, Hebrew, Japanese, Korean and a character beyond 16 bits.
+    {"utf8_scripts", "UTF-8", "C.UTF-8",
+     "\u00E9t\u00E9, \u03A9\u03BC\u03AD\u03B3\u03B1, \u0440\u0430\u0437\u043C\u0435\u0440, "
+     "\u05E9\u05DC\u05D5\u05DD, \u30B5\u30A4\u30BA 12, \uD06C\uAE30, \U0001F600; ",
+     false},
+    {"latin1_ascii", "ISO-8859-1", "C", kAscii, true},
     {"latin1_mixed", "ISO-8859-1", "C",
      "Gr\xF6\xDF"
-     "e \xA3 12, "},
+     "e \xA3 12, ",
+     true},
 };
 
 /// `size` bytes of that kind, or a few more where a character would be cut.
@@ -46,7 +54,7 @@ std::string sample(const Kind& kind, std::size_t size) {
     std::string text;
     while (text.size() < size)
         text += kind.pattern;
-    if (std::string(kind.name) != "utf8_mixed") text.resize(size);
+    if (kind.cut) text.resize(size);
     return text;
 }
 

@@ -100,10 +100,10 @@ NLS2_LOCALE* String::localeForConversion() {
     return _locale.load(std::memory_order_acquire);
 }
 
-String::String(const char* text) {
+String::String(const char* text) : units_(text != nullptr ? countBytes(text) : 1) {
     const Trace trace(traceUnit);
     if (text == nullptr) {
-        terminate();
+        units_.getData()[0] = 0;
     } else {
         convertFrom(text);
     }
@@ -113,10 +113,9 @@ String::String(const char* text, std::uint32_t n) : String() {
     assign(text, n);
 }
 
-/// Fills an array that is still empty.
+/// Fills an array that has as many elements as the text has bytes with its terminator.
 void String::convertFrom(const char* text) {
-    const std::uint32_t n = countBytes(text);
-    units_.grow(n);
+    const std::uint32_t n = units_.getSize();
     const std::uint32_t count = convertToUnits(localeForConversion(), text, n, units_.getData());
     units_.remove(count + 1, n - count - 1);
 }

@@ -443,6 +443,136 @@ TEST(Nls2Utf8, ReplacesEachMalformedPart) {
     EXPECT_EQ(widen(locale, "\xEF\xBF\xBD", 1).status, NLS2_OK);
 }
 
+/// A piece of UTF-8 and what it is in UTF-16, either of which may be malformed: characters of every
+/// length, and what may not become part of one whatever follows.
+struct Utf8Piece {
+    std::string bytes;
+    Units units;
+};
+
+const std::vector<Utf8Piece>& wellFormedPieces() {
+    static const std::vector<Utf8Piece> pieces = {
+        {"a", {'a'}},
+        {"the quick ", {'t', 'h', 'e', ' ', 'q', 'u', 'i', 'c', 'k', ' '}},
+        {"\xC2\x80", {0x80}},
+        {"\xDF\xBF", {0x7FF}},
+        {"\xE0\xA0\x80", {0x800}},
+        {"\xED\x9F\xBF", {0xD7FF}},
+        {"\xEE\x80\x80", {0xE000}},
+        {"\xEF\xBF\xBF", {0xFFFF}},
+        {"\xF0\x90\x80\x80", {0xD800, 0xDC00}},
+        {"\xF4\x8F\xBF\xBF", {0xDBFF, 0xDFFF}},
+    };
+    return pieces;
+}
+
+const std::vector<Utf8Piece>& malformedBytes() {
+    static const std::vector<Utf8Piece> pieces = {
+        {"\xC0", {0xFFFD}},
+        {"\xFF", {0xFFFD}},
+        {"\xC3", {0xFFFD}},
+        {"\xE2\x82", {0xFFFD}},
+        {"\xF0\x9F\x98", {0xFFFD}},
+        {"\xE0\x9F\xBF", {0xFFFD, 0xFFFD, 0xFFFD}},
+        {"\xED\xA0\x80", {0xFFFD, 0xFFFD, 0xFFFD}},
+        {"\xF4\x90", {0xFFFD, 0xFFFD}},
+    };
+    return pieces;
+}
+
+const std::vector<Utf8Piece>& malformedUnits() {
+    static const std::vector<Utf8Piece> pieces = {
+        {"?x", {0xD800, 'x'}},
+        {"?x", {0xDBFF, 'x'}},
+        {"?x", {0xDC00, 'x'}},
+    };
+    return pieces;
+}
+
+/// The first whole characters of a text that have room.
+Units cut(const Units& units, std::size_t room) {
+    const bool splits = room > 0 && room < units.size() && (units[room - 1] & 0xFC00) == 0xD800;
+    const auto count = static_cast<std::ptrdiff_t>(std::min(units.size(), room - (splits ? 1 : 0)));
+    return Units(units.begin(), units.begin() + count);
+}
+
+std::string cut(const std::string& bytes, std::size_t room) {
+    if (room >= bytes.size()) return bytes;
+    while (room > 0 && (bytes[room] & 0xC0) == 0x80)
+        --room;
+    return bytes.substr(0, room);
+}
+
+/// Calls `check` with texts made of `pieces` and well-formed ones in many orders.
+template <typename Check>
+void forEachText(const std::vector<Utf8Piece>& pieces, Check check) {
+    Random random(7);
+    for (int turn = 0; turn < 400; ++turn) {
+        Utf8Piece text;
+        bool malformed = false;
+        while (text.bytes.size() < 30) {
+            const bool isOdd = turn % 2 == 1 && random() % 4 == 0;
+            const std::vector<Utf8Piece>& some = isOdd ? pieces : wellFormedPieces();
+            const Utf8Piece& piece = some[random() % some.size()];
+            text.bytes += piece.bytes;
+            text.units.insert(text.units.end(), piece.units.begin(), piece.units.end());
+            malformed = malformed || isOdd;
+        }
+        check(text, malformed ? NLS2_SUBSTITUTED : NLS2_OK);
+    }
+}
+
+TEST(Nls2Utf8, WidensWhateverStandsTogetherIntoAnyRoom) {
+    NLS2_LOCALE* const locale = openPage(NLS2_CP_UTF8);
+    forEachText(malformedBytes(), [locale](const Utf8Piece& text, int status) {
+        for (unsigned room = 0; room < text.units.size(); ++room) {
+            const Result<Units> result = widen(locale, text.bytes, room);
+            ASSERT_EQ(result.text, cut(text.units, room));
+            ASSERT_EQ(result.status, NLS2_TRUNCATED);
+        }
+        for (const unsigned more : {0u, 1u, 50u}) {
+            const auto room = static_cast<unsigned>(text.units.size()) + more;
+            const Result<Units> result = widen(locale, text.bytes, room);
+            ASSERT_EQ(result.text, text.units);
+            ASSERT_EQ(result.status, status);
+        }
+    });
+}
+
+TEST(Nls2Utf8, NarrowsWhateverStandsTogetherIntoAnyRoom) {
+    NLS2_LOCALE* const locale = openPage(NLS2_CP_UTF8);
+    forEachText(malformedUnits(), [locale](const Utf8Piece& text, int status) {
+        for (unsigned room = 0; room < text.bytes.size(); ++room) {
+            const Result<std::string> result = narrow(locale, text.units, room);
+            ASSERT_EQ(result.text, cut(text.bytes, room));
+            ASSERT_EQ(result.status, NLS2_TRUNCATED);
+        }
+        for (const unsigned more : {0u, 1u, 50u}) {
+            const auto room = static_cast<unsigned>(text.bytes.size()) + more;
+            const Result<std::string> result = narrow(locale, text.units, room);
+            ASSERT_EQ(result.text, text.bytes);
+            ASSERT_EQ(result.status, status);
+        }
+    });
+}
+
+TEST(Nls2Utf8, ReplacesACharacterThatTheTextEndsWithinWhereverThatIs) {
+    NLS2_LOCALE* const locale = openPage(NLS2_CP_UTF8);
+    for (const Utf8Piece& last : wellFormedPieces()) {
+        for (std::size_t before = 0; before < 20; ++before) {
+            for (std::size_t kept = 1; kept < last.bytes.size(); ++kept) {
+                if (last.bytes.size() > 4) continue;
+                Units expected(before, 'x');
+                expected.push_back(kReplacement);
+                const std::string text = std::string(before, 'x') + last.bytes.substr(0, kept);
+                const Result<Units> result = widen(locale, text, 40);
+                ASSERT_EQ(result.text, expected);
+                ASSERT_EQ(result.status, NLS2_SUBSTITUTED);
+            }
+        }
+    }
+}
+
 TEST(Nls2Utf8, AgreesWithTheCLibrary) {
     NLS2_LOCALE* const locale = openPage(NLS2_CP_UTF8);
     const iconv_t descriptor = ::iconv_open("UTF-8", "UTF-16LE");

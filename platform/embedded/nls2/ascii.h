@@ -40,6 +40,17 @@ bool hasBits(const void* block, std::uint64_t mask) {
     return (all & mask) != 0;
 }
 
+/// How many elements of `Bits` bits each lie before the first one of which a bit is set in `word`,
+/// in the order of memory; some bit is set.
+template <unsigned Bits>
+unsigned elementsBefore(std::uint64_t word) {
+#if __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
+    return static_cast<unsigned>(__builtin_ctzll(word)) / Bits;
+#else
+    return static_cast<unsigned>(__builtin_clzll(word)) / Bits;
+#endif
+}
+
 /// Copies the ASCII characters that `text` begins with, at most `count`; returns how many.
 inline unsigned widenAscii(const char* text, unsigned count, unsigned short* out) {
     unsigned i = 0;
