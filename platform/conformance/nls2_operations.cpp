@@ -48,12 +48,13 @@ struct Converted {
 /// Converts into a buffer of exactly that capacity, behind which nothing may change.
 Converted<Units> widen(NLS2_LOCALE* locale, const std::string& bytes, unsigned capacity) {
     constexpr unsigned short kGuard = 0x5A5A;
-    Units out(capacity + 4U, kGuard);
+    constexpr unsigned kGuards = 4;
+    Units out(capacity + kGuards, kGuard);
     int status = -1;
     const unsigned written = NLS2_toUTF16(locale, bytes.data(), static_cast<unsigned>(bytes.size()),
                                           out.data(), capacity, &status);
     require(written <= capacity, "says to have written more than fits");
-    require(std::all_of(out.begin() + capacity, out.end(), [](auto u) { return u == kGuard; }),
+    require(std::all_of(out.end() - kGuards, out.end(), [](auto u) { return u == kGuard; }),
             "wrote behind the output");
     out.resize(written);
     return {out, status};
