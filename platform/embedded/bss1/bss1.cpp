@@ -27,7 +27,7 @@ int BSS1_PutEnv(const char* setting) {
 void BSS1_Sleep(unsigned seconds) {
     timespec wakeUp{};
     ::clock_gettime(CLOCK_MONOTONIC, &wakeUp);
-    // Where times have 32 bits, the longest sleep ends with the clock's range.
+    // With 32-bit times, the sum may exceed the clock's range.
     constexpr time_t kLatest = std::numeric_limits<time_t>::max();
     const bool fits = seconds <= static_cast<unsigned long long>(kLatest - wakeUp.tv_sec);
     wakeUp.tv_sec = fits ? wakeUp.tv_sec + static_cast<time_t>(seconds) : kLatest;

@@ -5,13 +5,13 @@ namespace utf16 {
 
 constexpr char32_t kUnpaired = 0xFFFFFFFF;
 
-/// One character taken from text, or one surrogate without its partner (kUnpaired).
+/// One character of a text, or an unpaired surrogate (kUnpaired).
 struct Taken {
     char32_t character;
     unsigned units;
 };
 
-/// The character that `text`, of at least one unit, begins with.
+/// The first character of `text`, which has at least one unit.
 inline Taken take(const unsigned short* text, unsigned length) {
     const char32_t first = text[0];
     if (first < 0xD800 || first > 0xDFFF) return {first, 1};
@@ -25,7 +25,7 @@ inline unsigned unitsOf(char32_t character) {
     return character < 0x10000 ? 1 : 2;
 }
 
-/// Writes a character; returns its units.
+/// Writes a character and returns the number of its units.
 inline unsigned put(char32_t character, unsigned short* out) {
     if (character < 0x10000) {
         out[0] = static_cast<unsigned short>(character);

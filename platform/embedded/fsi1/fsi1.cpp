@@ -12,12 +12,12 @@
 
 struct FSI1_LIST {
     DIR* directory;
-    std::string prefix;  ///< what stands before a file name in a path
+    std::string prefix;  ///< of every path: the directory and a slash
 };
 
 namespace {
 
-/// An errno value as a result code: never one that says something else here.
+/// An errno value as a result code. The numbers that mean something else here become EIO.
 int resultOf(int error) {
     return error == FSI1_OK || error == FSI1_END_OF_LIST ? EIO : error;
 }
@@ -26,7 +26,7 @@ bool isDotOrDotDot(const char* name) {
     return name[0] == '.' && (name[1] == '\0' || (name[1] == '.' && name[2] == '\0'));
 }
 
-/// What a link points to, or the link itself when it leads nowhere. Returns 0 or an errno value.
+/// Examines an entry; of a dangling link, the link itself. Returns 0 or an errno value.
 int examine(int directory, const char* name, struct stat& found) {
     if (::fstatat(directory, name, &found, 0) == 0) return 0;
     return ::fstatat(directory, name, &found, AT_SYMLINK_NOFOLLOW) == 0 ? 0 : errno;

@@ -13,7 +13,7 @@ RAS1_UNIT traceUnit{"ncs"};
 
 /// Contexts that one association may have.
 constexpr std::size_t kMostContexts = 32;
-/// Unsent output beyond which no more requests are handled.
+/// With more unsent output than this, no further requests are handled.
 constexpr std::size_t kOutputPause = std::size_t{256} << 10;
 /// Length of the largest packet that is not a request.
 constexpr std::size_t kLargestControlPacket = 8192;
@@ -30,7 +30,7 @@ void traceDetail(const char* function, int line, const char* format, Arguments..
 #pragma GCC diagnostic pop
 }
 
-/// Groups have no meaning here beyond their number, which may not be 0.
+/// Groups have no meaning here except for their number, which must not be 0.
 std::uint32_t newAssociationGroup() {
     static std::atomic<std::uint32_t> last{0};
     const std::uint32_t group = ++last;
@@ -41,7 +41,7 @@ std::uint16_t commonMaximum(std::uint16_t clients) {
     return std::clamp(clients, kSmallestMaximum, kLargestFragment);
 }
 
-/// Calls a stub; what it throws against its contract becomes a fault.
+/// Calls a stub. If it throws, against its contract, that becomes a fault.
 std::uint32_t callStub(rpc__server_stub stub, const rpc__request& request, const void* manager,
                        rpc__reply& reply) {
     try {
@@ -66,8 +66,8 @@ int Association::windows(iovec (&ranges)[2]) {
         return 1;
     }
     ranges[0] = {stub_.end(), directLeft_};
-    // Behind the last fragment anything may come; behind another one comes the next, of which only
-    // the head is wanted here.
+    // Anything may follow the last fragment. Any other one is followed by the next fragment, of
+    // which only the head is to be read here.
     ranges[1] = {inbox_, lastFragment_ ? sizeof inbox_ : kRequestHeadSize};
     return 2;
 }
@@ -97,7 +97,7 @@ void Association::handle() {
     inboxStart_ = 0;
 }
 
-/// Handles one packet, or as much of a fragment as is there; false when more bytes are needed.
+/// Handles one packet, or as much of a fragment as has arrived. False if it needs more bytes.
 bool Association::handleNext() {
     const unsigned char* const pdu = inbox_ + inboxStart_;
     const std::size_t available = inboxEnd_ - inboxStart_;
@@ -147,7 +147,7 @@ bool Association::handleFragment(const unsigned char* pdu, std::size_t available
     return true;
 }
 
-/// Whether a fragment begins a call while none is under way, or goes on with the one that is.
+/// Whether a fragment is in order: it begins a call while none is active, or continues that one.
 bool Association::fits(const PduHeader& header, const RequestHead& head) const {
     if (header.has(kFirstFragment)) return !call_.active;
     return call_.active && call_.id == header.callId && call_.contextId == head.contextId &&
@@ -165,7 +165,7 @@ void Association::startCall(const PduHeader& header, const RequestHead& head) {
     call_.fault = resolve();
 }
 
-/// Finds what the call is for. Returns 0 or the fault to answer with.
+/// Looks up the call's interface and operation. Returns 0 or the fault to answer with.
 std::uint32_t Association::resolve() {
     const auto context = contexts_.find(call_.contextId);
     if (context == contexts_.end() ||
@@ -175,7 +175,7 @@ std::uint32_t Association::resolve() {
     return call_.operation < call_.interface.stubs->count ? rpc__s_ok : rpc__s_op_range;
 }
 
-/// Room for a fragment; when there is none, the call is answered with a fault once it is complete.
+/// Makes room for a fragment. Without memory, the call gets a fault once it is complete.
 void Association::makeRoom(std::size_t stubBytes, std::size_t hint) {
     if (call_.fault != 0) return;
     const bool isTooMuch = stubBytes > shared_.largestStub - stub_.size();
@@ -206,7 +206,7 @@ void Association::finishCall() {
     endCall();
 }
 
-/// Calls the stub and puts its reply into the output. Returns 0 or the fault to answer with.
+/// Calls the stub and appends its reply to the output. Returns 0 or the fault to answer with.
 std::uint32_t Association::execute() {
     ++shared_.calls;
     unsigned char replyBytes[kReplyCapacity];
@@ -298,7 +298,7 @@ void Association::refuseHeader(HeaderProblem problem, const PduHeader& header) {
         refuseBind(header, problem == HeaderProblem::Version ? BindRefusal::Version
                                                              : BindRefusal::Unspecified);
     } else if (problem == HeaderProblem::Version) {
-        open_ = false;  // whoever this is, it speaks something else
+        open_ = false;  // the peer speaks another protocol
     } else {
         protocolError(header);
     }

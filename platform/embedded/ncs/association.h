@@ -1,5 +1,5 @@
-/// One association: what a client and the runtime say to each other over one connection, without
-/// the connection itself. Bytes go in, calls are made, bytes come out.
+/// One association: the protocol between a client and the runtime, without the connection that
+/// carries it. Bytes go in, calls are made, bytes come out.
 #pragma once
 
 #include <sys/uio.h>
@@ -15,12 +15,12 @@
 #include "ncs/stub_buffer.h"
 #include "platform/ncs.h"
 
-/// Stands for a caller while its call runs; managers can ask nothing of it.
+/// Represents a caller while its call runs. It has no properties that a manager could ask for.
 struct rpc__binding {};
 
 namespace ncs {
 
-/// What all associations of a server share.
+/// Shared by all associations of a server.
 struct SharedState {
     SharedState(std::size_t stubLimit, std::size_t totalLimit)
         : largestStub(stubLimit), memory(totalLimit) {}
@@ -34,30 +34,30 @@ struct SharedState {
 /// Not thread-safe; one thread at a time feeds it.
 class Association {
 public:
-    /// `port` is what the client connected to in decimal digits, empty for a Unix socket.
+    /// `port` is the TCP port that the client connected to, in decimal; empty for a Unix socket.
     Association(SharedState& shared, std::string port);
     Association(const Association&) = delete;
     Association& operator=(const Association&) = delete;
 
-    /// Where the next bytes of the client go: one or two ranges, in that order. A fragment's stub
-    /// data goes straight to its place behind the fragments before it. To be called when handle()
-    /// has nothing left to do; at least one byte of room is offered.
+    /// Gives one or two ranges for the client's next bytes, to be filled in order, and returns
+    /// their number. A fragment's stub data goes straight to its place after the fragments before
+    /// it. To be called when handle() has nothing left to do. There is room for at least one byte.
     int windows(iovec (&ranges)[2]);
-    /// Takes over `count` bytes that were put there, and handles what is complete.
+    /// Accepts `count` bytes that were put there and handles everything that is complete.
     void received(std::size_t count);
-    /// Goes on with bytes that were left because output() had grown large. Does nothing when
-    /// there are none.
+    /// Resumes with bytes that were left over because output() had grown too large, if there are
+    /// any.
     void handle();
 
-    /// What is to be sent; the sender removes it.
+    /// Bytes to send; the sender removes them.
     std::string& output() { return output_; }
-    /// False when, after the output, the connection is to be closed.
+    /// False if the connection is to be closed after the output.
     bool isOpen() const { return open_; }
 
     bool isBound() const { return bound_; }
-    /// A packet or a request has begun and is not complete.
+    /// Whether a packet or a request has begun but is not complete.
     bool isMidRequest() const { return call_.active || directLeft_ > 0 || inboxEnd_ > 0; }
-    /// How many requests have been completed, answered or not.
+    /// The number of requests that are complete, answered or not.
     std::uint64_t requestsDone() const { return requestsDone_; }
 
 private:
@@ -73,7 +73,7 @@ private:
         bool littleEndian = true;
         RegisteredInterface interface;
         bool answered = true;     ///< false when the caller wants no answer
-        std::uint32_t fault = 0;  ///< decided already; the rest is thrown away
+        std::uint32_t fault = 0;  ///< if not 0, the answer; the rest of the request is discarded
     };
 
     bool handleNext();

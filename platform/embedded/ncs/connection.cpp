@@ -11,7 +11,7 @@
 namespace ncs {
 namespace {
 
-/// Reads after which others get their turn, if they wait.
+/// After so many reads other connections get their turn.
 constexpr int kReadsInARow = 64;
 
 }  // namespace
@@ -34,7 +34,7 @@ Connection::Next Connection::serve() {
     try {
         return transfer();
     } catch (const std::exception&) {
-        return Next::Close;  // no memory for what is to be answered
+        return Next::Close;  // no memory for the answer
     }
 }
 
@@ -51,7 +51,7 @@ Connection::Next Connection::transfer() {
     }
 }
 
-/// Sends what there is to send and handles what had to wait for that.
+/// Sends pending output and handles requests that had to wait for that.
 Connection::Transfer Connection::answer() {
     do {
         const Transfer sent = flush();
@@ -79,7 +79,7 @@ Connection::Transfer Connection::flush() {
     return Transfer::Done;
 }
 
-/// Takes one portion; `drained` tells that it was less than there was room for.
+/// Reads once. Sets `drained` if that was less than there was room for.
 Connection::Transfer Connection::read(bool& drained) {
     iovec ranges[2];
     const int count = association_.windows(ranges);

@@ -1,4 +1,4 @@
-/// A client's connection: an association and the socket that its bytes go through.
+/// A client's connection: an association and its socket.
 #pragma once
 
 #include <atomic>
@@ -17,29 +17,29 @@ using Milliseconds = std::int64_t;
 constexpr Milliseconds kNever = INT64_MAX;
 Milliseconds now();
 
-/// Served by one thread at a time, except where said otherwise.
+/// Used by one thread at a time, except where noted.
 class Connection : public Source {
 public:
-    /// The socket is non-blocking.
+    /// `socket` must be non-blocking.
     Connection(Descriptor socket, std::string port, SharedState& shared, const Limits& limits);
     Connection(const Connection&) = delete;
     Connection& operator=(const Connection&) = delete;
 
     enum class Next { Read, Write, Close };
-    /// Reads, calls and writes as long as the socket goes along, but not forever, and says what to
-    /// wait for. Does not throw.
+    /// Reads, makes calls and writes until the socket would block, or for a bounded number of reads
+    /// so that other connections get their turn. Returns what to wait for. Does not throw.
     Next serve();
 
     int socket() const { return socket_.get(); }
-    /// When waiting for `next` has been long enough. Waiting for the rest of one request, or for
-    /// the client to take one answer, is one wait however often some of it comes.
+    /// The time at which waiting for `next` ends. Waiting for the rest of one request, or for the
+    /// client to receive one answer, counts as one wait even if it proceeds in small steps.
     Milliseconds deadlineFor(Next next);
 
-    /// Held by the thread that serves the connection. Only one is woken at a time, so nobody waits
-    /// here for longer than the other one needs to leave; the lock is what orders the two.
+    /// Held by the thread that serves the connection. Only one thread is woken at a time, so the
+    /// next one waits at most until the previous one has left. The lock orders the two.
     std::mutex turn;
 
-    /// When the connection is to be cut; kNever while it is served. For all threads.
+    /// When the connection is to be closed; kNever while it is served. Any thread.
     std::atomic<Milliseconds> deadline{kNever};
 
 private:
@@ -57,7 +57,7 @@ private:
     std::size_t sent_ = 0;  ///< of the association's output
 
     Wait wait_ = Wait::Bind;
-    std::uint64_t waitsSince_ = 0;  ///< the number of requests done when the wait began
+    std::uint64_t waitsSince_ = 0;  ///< requestsDone() when the wait began
     Milliseconds waitsUntil_;
 };
 

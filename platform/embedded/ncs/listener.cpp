@@ -38,7 +38,7 @@ Listener::Listener(int listeningSocket, std::string portText)
 
 bool Listener::admits(int accepted) const {
     if (!isUnix) {
-        // Answers are small and waited for.
+        // Clients wait for answers, which are small.
         const int on = 1;
         ::setsockopt(accepted, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
         return true;

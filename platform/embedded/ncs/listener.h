@@ -1,4 +1,4 @@
-/// The sockets at which clients arrive.
+/// Listening sockets.
 #pragma once
 
 #include <unistd.h>
@@ -11,16 +11,16 @@
 
 namespace ncs {
 
-/// Passes on a system call's result; throws std::system_error if it failed.
+/// Returns a system call's result, or throws std::system_error if the call failed.
 int checked(int result, const char* what);
 
 struct Listener : Source {
-    /// Makes the listening socket non-blocking; it stays the caller's. `portText` is empty for a
-    /// Unix socket. Throws std::system_error.
+    /// Makes the listening socket non-blocking; it still belongs to the caller. `portText` is empty
+    /// for a Unix socket. Throws std::system_error.
     Listener(int listeningSocket, std::string portText);
 
-    /// Whether the peer of an accepted socket may be served: of a Unix socket's peers those of the
-    /// process's own user and root. Prepares the socket as well.
+    /// Sets up an accepted socket. Returns whether its peer may be served: on a Unix socket, only
+    /// the process's own user and root may.
     bool admits(int accepted) const;
 
     const int socket;
@@ -29,7 +29,7 @@ struct Listener : Source {
     bool paused = false;  ///< guarded by the server's lock
 };
 
-/// A socket that listens on 127.0.0.1. With port 0 a free one is taken and put into `port`. Throws
+/// Makes a socket that listens on 127.0.0.1. If `port` is 0, it is set to a free port. Throws
 /// std::system_error.
 Descriptor loopbackSocket(std::uint16_t& port);
 

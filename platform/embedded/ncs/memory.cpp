@@ -13,19 +13,19 @@
 namespace ncs {
 namespace {
 
-/// Kept blocks hold powers of two from 64 KiB to 8 MiB. What is much smaller comes from the
-/// allocator, what is larger from the system.
+/// The sizes of kept blocks are powers of two from 64 KiB to 8 MiB. Much smaller blocks come from
+/// the allocator, larger ones from the system.
 constexpr std::size_t kSmallest = std::size_t{64} << 10;
 constexpr std::size_t kClasses = 8;
 constexpr std::size_t kMostKept = std::size_t{16} << 20;
 constexpr std::size_t kSmall = kClasses;
 constexpr std::size_t kHuge = kClasses + 1;
 
-/// Stands before every block.
+/// Precedes every block.
 struct alignas(std::max_align_t) Head {
     std::size_t sizeClass;
     std::size_t capacity;
-    Head* next;  ///< among the kept blocks
+    Head* next;  ///< in the list of kept blocks
 };
 
 std::size_t sizeOf(std::size_t sizeClass) {
@@ -42,13 +42,13 @@ std::size_t classFor(std::size_t bytes) {
 
 struct Kept {
     embedded::Mutex lock;
-    /// The latest first, as its memory is warm.
+    /// Takes the latest one first, whose memory is still in the caches.
     std::array<Head*, kClasses> blocks ZAV_GUARDED_BY(lock){};
     std::size_t bytes ZAV_GUARDED_BY(lock) = 0;
 };
 
 Kept& kept() {
-    static Kept& instance = *new Kept;  // immortal: used by threads until the process ends
+    static Kept& instance = *new Kept;  // never destroyed: threads use it until the end
     return instance;
 }
 
@@ -62,7 +62,7 @@ Head* takeKept(std::size_t sizeClass) {
     return head;
 }
 
-/// False when enough is kept already.
+/// Keeps a block; false if enough blocks are kept already.
 bool keep(Head* head) {
     Kept& pool = kept();
     const embedded::MutexLock lock(pool.lock);

@@ -1,18 +1,18 @@
-/// Memory for requests: large blocks that are kept for the next call, so that a stream of large
-/// requests runs in memory that is there already.
+/// Memory for requests. Large blocks are kept for the next call, so that a stream of large requests
+/// needs no new memory.
 #pragma once
 
 #include <cstddef>
 
 namespace ncs {
 
-/// A block of at least `bytes` bytes, aligned for any type, not cleared; null when there is none.
-/// `*capacity` is what it really holds. Given back with giveBlock(), by any thread.
+/// Returns a block of at least `bytes` bytes, aligned for any type, not cleared; null when memory
+/// is short. Sets `*capacity` to its size. Any thread may return it with giveBlock().
 void* takeBlock(std::size_t bytes, std::size_t* capacity);
 /// Null is ignored.
 void giveBlock(void* block);
 
-/// Returns the kept blocks to the system; for when no caller is left.
+/// Returns the kept blocks to the system. Called when there are no more callers.
 void releaseKeptBlocks();
 /// Bytes in kept blocks.
 std::size_t keptBytes();

@@ -19,7 +19,7 @@ constexpr uuid__t kNdr = {
     0x8a885d04, 0x1ceb, 0x11c9, 0x9f, {0xe8, 0x08, 0x00, 0x2b, 0x10, 0x48, 0x60}};
 constexpr std::uint32_t kNdrVersion = 2;
 
-/// Takes numbers out of bytes whose number the caller has checked.
+/// Reads numbers from bytes. The caller has checked that there are enough.
 class Reader {
 public:
     Reader(const unsigned char* at, bool littleEndian) : at_(at), littleEndian_(littleEndian) {}
@@ -52,7 +52,7 @@ private:
     const bool littleEndian_;
 };
 
-/// Appends one packet; its length is put in when it is finished.
+/// Appends one packet, whose length is filled in at its end.
 class Writer {
 public:
     Writer(PduType type, std::uint8_t flags, std::uint32_t callId, std::string& out)
@@ -210,7 +210,7 @@ void encodeBindRefusal(std::uint32_t callId, BindRefusal reason, std::string& ou
 
 void encodeResponse(std::uint32_t callId, std::uint16_t contextId, const unsigned char* data,
                     std::size_t length, std::uint16_t largestFragment, std::string& out) {
-    // Only the last fragment may hold a number of bytes that is no multiple of 8.
+    // Except in the last fragment, the length of the data must be a multiple of 8.
     const std::size_t most = (largestFragment - kResponseHeadSize) / 8 * 8;
     std::size_t at = 0;
     do {

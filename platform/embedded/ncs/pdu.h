@@ -1,14 +1,14 @@
-/// The packets of connection-oriented DCE/RPC 5.0, between bytes and values.
+/// Encoding and decoding of the packets (PDUs) of connection-oriented DCE/RPC 5.0.
 ///
-/// Every packet (PDU) begins with 16 bytes; numbers are in the sender's byte order, which bits 4 to
-/// 7 of byte 4 tell (1 = little-endian):
+/// Every packet begins with 16 bytes. Numbers are in the sender's byte order, which bits 4 to 7 of
+/// byte 4 give (1 = little-endian):
 ///
 ///     0   version 5           4   data representation (4 bytes)    12  call id (32 bits)
 ///     1   minor version       8   length of the whole packet (16)
 ///     2   type                10  length of authentication data (16), none here
 ///     3   flags
 ///
-/// and goes on with
+/// It continues with
 ///
 ///     request      allocation hint (32), context id (16), operation (16), with flag 0x80 an object
 ///                  identifier (16 bytes), stub data
@@ -17,14 +17,14 @@
 ///     bind         largest fragment that the client sends (16) and takes (16), association group
 ///                  (32), number of contexts (8), 24 bits; each context: id (16), number of
 ///                  transfer syntaxes (8), 8 bits, abstract syntax (20 bytes), transfer syntaxes
-///                  (20 bytes each); a syntax is an identifier and a version (32)
+///                  (20 bytes each); a syntax is an identifier (16 bytes) and a version (32)
 ///     bind_ack     largest fragments (16, 16), association group (32), length (16) and text of the
-///                  port with its terminating 0, filled up to a multiple of 4, number of results
+///                  port with its terminating 0, padded to a multiple of 4, number of results
 ///                  (8), 24 bits; each result: result (16), reason (16), transfer syntax
 ///     bind_nak     reason (16), number of versions (8), each 8 bits major and 8 bits minor
 ///
 /// alter_context is like bind, its response like bind_ack. Decoding is a pure function of the bytes
-/// and never looks beyond the length that it is given.
+/// and never reads beyond the given length.
 #pragma once
 
 #include <cstddef>
@@ -61,9 +61,9 @@ constexpr std::size_t kHeaderSize = 16;
 constexpr std::size_t kRequestHeadSize = 24;
 constexpr std::size_t kObjectSize = 16;
 constexpr std::size_t kResponseHeadSize = 24;
-/// Every implementation takes fragments of this size.
+/// Every implementation must accept fragments of this size.
 constexpr std::uint16_t kSmallestMaximum = 1432;
-/// The largest fragment that is sent or offered to be taken; a multiple of 8.
+/// The largest fragment that is sent or accepted; a multiple of 8.
 constexpr std::uint16_t kLargestFragment = 65528;
 
 struct PduHeader {
@@ -82,15 +82,14 @@ enum class HeaderProblem {
     None,
     Incomplete,      ///< fewer than 16 bytes
     Version,         ///< not 5.0 or 5.1
-    Representation,  ///< neither byte order, or characters that are not ASCII
-    Length,          ///< shorter than itself
+    Representation,  ///< an unknown byte order, or characters that are not ASCII
+    Length,          ///< smaller than the header
 };
 
-/// Reads the first 16 bytes of a packet. With Version and the later problems the header holds what
-/// could be read.
+/// Decodes the first 16 bytes of a packet. The header is filled unless the bytes are incomplete.
 HeaderProblem decodeHeader(const unsigned char* bytes, std::size_t length, PduHeader& header);
 
-/// What stands between a request's header and its stub data.
+/// The part of a request between its header and its stub data.
 struct RequestHead {
     std::uint32_t allocationHint = 0;
     std::uint16_t contextId = 0;
@@ -98,9 +97,9 @@ struct RequestHead {
     std::size_t size = kRequestHeadSize;  ///< from the packet's start to the stub data
 };
 
-/// How many bytes decodeRequestHead() wants to see.
+/// The number of bytes that decodeRequestHead() needs.
 std::size_t requestHeadSize(const PduHeader& header);
-/// Reads a request's head from the packet's first requestHeadSize() bytes.
+/// Decodes a request's head from the packet's first requestHeadSize() bytes.
 RequestHead decodeRequestHead(const unsigned char* pdu, const PduHeader& header);
 
 struct PresentationContext {
@@ -117,14 +116,14 @@ struct BindRequest {
     std::vector<PresentationContext> contexts;
 };
 
-/// Reads a whole bind or alter_context packet; false when its counts and its length disagree.
+/// Decodes a complete bind or alter_context packet. False if its counts do not fit its length.
 bool decodeBind(const unsigned char* pdu, std::size_t length, const PduHeader& header,
                 BindRequest& bind);
 
-/// What becomes of a presentation context.
+/// The outcome for one presentation context.
 enum class ContextResult : std::uint16_t {
     Accepted = 0,
-    UnknownInterface = 1,  ///< sent as provider rejection with this reason, like the next two
+    UnknownInterface = 1,  ///< this and the following are reasons of a provider rejection
     UnknownTransferSyntax = 2,
     TooMany = 3,
 };
@@ -133,7 +132,7 @@ struct BindAnswer {
     std::uint16_t largestSent = 0;   ///< by the server
     std::uint16_t largestTaken = 0;  ///< by the server
     std::uint32_t associationGroup = 0;
-    std::string port;  ///< empty where there is none
+    std::string port;  ///< empty for a Unix socket
     std::vector<ContextResult> results;
 };
 
@@ -145,10 +144,10 @@ enum class BindRefusal : std::uint16_t { Unspecified = 0, Version = 4, Authentic
 void encodeBindAnswer(PduType type, std::uint32_t callId, const BindAnswer& answer,
                       std::string& out);
 void encodeBindRefusal(std::uint32_t callId, BindRefusal reason, std::string& out);
-/// Results in as many fragments as `largestFragment` makes necessary.
+/// Encodes results in as many fragments as `largestFragment` requires.
 void encodeResponse(std::uint32_t callId, std::uint16_t contextId, const unsigned char* data,
                     std::size_t length, std::uint16_t largestFragment, std::string& out);
-/// `flags` beyond those of an only fragment.
+/// `flags` are added to those of a single fragment.
 void encodeFault(std::uint32_t callId, std::uint16_t contextId, std::uint32_t status,
                  std::uint8_t flags, std::string& out);
 

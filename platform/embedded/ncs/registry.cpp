@@ -9,7 +9,7 @@ const uuid__t uuid__nil = {0, 0, 0, 0, {0, 0, 0, 0, 0, 0, 0}};
 
 namespace {
 
-/// Immortal: the runtime's threads may serve calls while the process ends.
+/// Never destroyed: the runtime's threads may serve calls while the process ends.
 struct Registry {
     std::mutex guard;
     std::vector<ncs::RegisteredInterface> interfaces;
@@ -53,7 +53,7 @@ unsigned registeredCount() {
 
 void rpc__register_mgr(const uuid__t* object, const rpc__if_spec* interface,
                        const rpc__server_epv* stubs, const void* manager, std::uint32_t* status) {
-    // Managers of particular objects have no caller here; every call is for no particular object.
+    // Calls never name an object, so a manager for a particular object would never be called.
     if (object == nullptr || !ncs::operator==(*object, uuid__nil) || !isUsable(interface, stubs)) {
         *status = rpc__s_unknown_if;
         return;

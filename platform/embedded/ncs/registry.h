@@ -11,10 +11,10 @@ struct RegisteredInterface {
     const void* manager = nullptr;
 };
 
-/// Looks an interface up by identifier and major version; false when there is none. Thread-safe.
+/// Finds an interface by identifier and major version; false if there is none. Any thread.
 bool findInterface(const uuid__t& id, std::uint32_t version, RegisteredInterface& found);
 
-/// How many interfaces there are.
+/// The number of registered interfaces.
 unsigned registeredCount();
 
 bool operator==(const uuid__t& a, const uuid__t& b);

@@ -1,6 +1,6 @@
-// The runtime's threads. All of them wait at one epoll descriptor; whoever is woken serves what
-// woke it, and each source wakes one thread at a time (EPOLLONESHOT). Nothing is polled: a timer
-// runs only while there is a connection whose wait may become too long.
+// The runtime's threads. All of them wait on one epoll descriptor. A thread that wakes up serves
+// the source that woke it, and each source wakes one thread at a time (EPOLLONESHOT). Nothing is
+// polled: a timer runs only while there is a connection with a deadline.
 
 #include <pthread.h>
 #include <sys/epoll.h>
@@ -28,10 +28,11 @@
 namespace ncs {
 namespace {
 
-/// How long accepting pauses when the process is out of descriptors or memory.
+/// How long accepting pauses if the process is out of descriptors or memory.
 constexpr Milliseconds kAcceptPause = 500;
 
-/// Blocks the signals that a thread made now shall leave to the process's other threads.
+/// Blocks all signals but faults while it exists, so that threads made meanwhile leave them to
+/// other threads.
 class SignalsBlocked {
 public:
     SignalsBlocked() {
@@ -120,7 +121,7 @@ int Server::Implementation::watch(int operation, int descriptor, Source& source,
     return ::epoll_ctl(poll_.get(), operation, descriptor, &event);
 }
 
-/// Lets a source that is watched already wake a thread once more; that needs no memory.
+/// Rearms a source that is registered already, which needs no memory.
 void Server::Implementation::rearm(int descriptor, Source& source, std::uint32_t event) const {
     watch(EPOLL_CTL_MOD, descriptor, source, event | EPOLLONESHOT);
 }
@@ -172,8 +173,8 @@ void Server::Implementation::accept(Listener& listener) {
         }
         if (errno == EINTR || errno == ECONNABORTED) continue;
         if (errno == EAGAIN || errno == EWOULDBLOCK) break;
-        // Out of descriptors or memory: the connection stays where it is, and asking again at
-        // once would keep this thread spinning.
+        // Out of descriptors or memory: the connection stays in the queue. Accepting again at once
+        // would make this thread spin.
         {
             const embedded::MutexLock lock(lock_);
             listener.paused = true;
@@ -184,7 +185,7 @@ void Server::Implementation::accept(Listener& listener) {
     rearm(listener.socket, listener, EPOLLIN);
 }
 
-/// Makes a connection of an accepted socket, or closes it.
+/// Makes a connection from an accepted socket, or closes the socket.
 void Server::Implementation::admit(int socket, const Listener& listener) {
     Descriptor accepted(socket);
     const bool isWelcome = listener.admits(socket);
@@ -215,7 +216,7 @@ void Server::Implementation::serve(Connection& connection) {
     connection.deadline = kNever;
     const Connection::Next next = connection.serve();
     if (next == Connection::Next::Close) {
-        turn.unlock();  // nobody else waits for it: the socket is not armed
+        turn.unlock();  // no other thread waits for it: the socket is not armed
         close(connection);
         return;
     }
@@ -223,7 +224,7 @@ void Server::Implementation::serve(Connection& connection) {
     connection.deadline = deadline;
     wakeBy(deadline);
     const std::uint32_t event = next == Connection::Next::Write ? EPOLLOUT : EPOLLIN;
-    // From here another thread may be woken for the connection; it waits for the end of this turn.
+    // From here on the connection may wake another thread, which waits for the end of this turn.
     rearm(connection.socket(), connection, event);
 }
 
@@ -247,13 +248,13 @@ void Server::Implementation::setTimer(Milliseconds deadline) {
     ::timerfd_settime(timer_.get(), TFD_TIMER_ABSTIME, &when, nullptr);
 }
 
-/// Cuts the connections that have waited too long; the thread that this wakes closes them.
+/// Shuts down the connections that have waited too long. The thread that this wakes closes them.
 void Server::Implementation::runTimer() {
     std::uint64_t expirations = 0;
     [[maybe_unused]] const ssize_t got = ::read(timer_.get(), &expirations, sizeof expirations);
     const embedded::MutexLock lock(lock_);
-    // First of all: whoever set a deadline before this is seen below, whoever comes later sets the
-    // timer itself.
+    // This comes first: a deadline that was set before is seen below, and a thread that sets one
+    // later also sets the timer.
     wakeUp_ = kNever;
     const Milliseconds time = now();
     Milliseconds next = kNever;

@@ -1,4 +1,4 @@
-/// What the runtime's threads wait for.
+/// What the runtime's threads wait for: sources of epoll events.
 #pragma once
 
 #include <unistd.h>
@@ -7,7 +7,7 @@
 
 namespace ncs {
 
-/// Closes its descriptor.
+/// Owns a file descriptor.
 class Descriptor {
 public:
     explicit Descriptor(int descriptor) : descriptor_(descriptor) {}
@@ -23,7 +23,7 @@ private:
     int descriptor_;
 };
 
-/// Something that the poll descriptor watches.
+/// Something that is registered with the epoll descriptor.
 struct Source {
     enum class Kind { Listener, Connection, Timer, Stop };
     explicit Source(Kind sourceKind) : kind(sourceKind) {}

@@ -1,4 +1,4 @@
-/// The memory in which a request's stub data is put together.
+/// The memory in which a request's stub data is assembled.
 #pragma once
 
 #include <atomic>
@@ -6,7 +6,7 @@
 
 namespace ncs {
 
-/// How much all requests in progress may hold together. Thread-safe.
+/// Limits the memory of all requests in progress together. Any thread.
 class MemoryBudget {
 public:
     explicit MemoryBudget(std::size_t limit) : left_(limit) {}
@@ -17,8 +17,8 @@ private:
     std::atomic<std::size_t> left_;
 };
 
-/// Grows while fragments come. Its memory counts against the budget as far as it is filled: room
-/// that a client only announces costs address space and nothing else.
+/// Grows as fragments arrive. Only the filled part counts against the budget: what a client merely
+/// announces costs address space and nothing else.
 class StubBuffer {
 public:
     explicit StubBuffer(MemoryBudget& budget) : budget_(budget) {}
@@ -26,8 +26,8 @@ public:
     StubBuffer(const StubBuffer&) = delete;
     StubBuffer& operator=(const StubBuffer&) = delete;
 
-    /// Makes sure that `bytes` more fit and may be filled; takes room for `expected` in all while
-    /// it is at it. False when there is no memory, with what is held as it was.
+    /// Makes sure that `bytes` more fit and are within the budget. When it has to grow, makes room
+    /// for `expected` bytes in all. False if memory is short; the content is then unchanged.
     bool reserve(std::size_t bytes, std::size_t expected);
     /// Where the next byte goes.
     unsigned char* end() { return data_ + size_; }

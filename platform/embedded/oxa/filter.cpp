@@ -1,4 +1,4 @@
-// Filters: which rows a request wants.
+// Filters: which rows a request selects.
 
 #include <algorithm>
 #include <cctype>
@@ -13,7 +13,7 @@
 
 namespace {
 
-/// Whether a comparison with this result (negative, 0, positive) satisfies the operator.
+/// Whether the operator holds for this result of a comparison (negative, 0 or positive).
 bool satisfies(_IntfOper op, int comparison) {
     switch (op) {
         case OPER_EQ:
@@ -39,7 +39,7 @@ std::string_view withoutTrailingBlanks(std::string_view text) {
     return text.substr(0, last == std::string_view::npos ? 0 : last + 1);
 }
 
-/// Compares a field with a value that is not longer, as if blanks followed the value.
+/// Compares a field with a value that is no longer than it, as if blanks followed the value.
 int comparePadded(std::string_view field, std::string_view value) {
     const int head = std::memcmp(field.data(), value.data(), value.size());
     if (head != 0) return head;
@@ -49,8 +49,7 @@ int comparePadded(std::string_view field, std::string_view value) {
     return 0;
 }
 
-/// The pattern up to where it holds `width` bytes besides its "*": what follows could only be
-/// there to be cut off.
+/// Cuts a pattern after `width` bytes, not counting its "*". A longer one could never match.
 std::string_view cutPattern(std::string_view pattern, std::size_t width) {
     std::size_t literals = 0;
     for (std::size_t i = 0; i < pattern.size(); ++i) {
@@ -59,8 +58,8 @@ std::string_view cutPattern(std::string_view pattern, std::size_t width) {
     return pattern;
 }
 
-/// Whether the text has the pattern's form. Going back to the latest "*" only is enough, since an
-/// earlier one could match nothing that this one cannot.
+/// Whether the text matches the pattern. Backtracking to the latest "*" is enough: an earlier one
+/// could match nothing that this one cannot.
 bool matches(std::string_view text, std::string_view pattern) {
     std::size_t at = 0, inPattern = 0;
     std::size_t afterStar = std::string_view::npos, starAt = 0;
@@ -81,7 +80,8 @@ bool matches(std::string_view text, std::string_view pattern) {
     return pattern.find_first_not_of('*', inPattern) == std::string_view::npos;
 }
 
-/// A whole decimal number with blanks around it; one that is too large becomes the nearest.
+/// Parses a decimal number, which may have blanks around it. One that is out of range becomes the
+/// nearest number in range.
 bool parseNumber(const char* text, long long& number) {
     char* end = nullptr;
     number = std::strtoll(text, &end, 10);

@@ -1,4 +1,4 @@
-/// What the sources of the embedded agent framework share.
+/// Shared by the sources of the embedded agent framework.
 #pragma once
 
 #include <atomic>
@@ -11,19 +11,19 @@
 #include "embedded/oxa_host.h"
 #include "platform/oxa.h"
 
-/// What a request asks, as the framework hands it through a table's classes to the base class.
+/// A request's filter, on its way through a table's classes to the base class.
 struct RequestDetail {
     const std::vector<oxa::Predicate>& where;
 };
 
-/// For whom it asks.
+/// How the request is to be answered.
 struct ContextInfo {
     int sampleType = 0;  ///< 0 = plain query, 1 = subscription
     int interval = 0;    ///< seconds
 };
 
-/// What the framework keeps of one table under its two names. Made when a manager of these names is
-/// first made and never destroyed: subscriptions may outlive a manager, and threads the statics.
+/// One table, known by its two names. Made together with the first manager of these names and never
+/// destroyed: subscriptions may outlive managers, and threads may outlive static objects.
 struct OxaTable {
     OxaTable(std::string applicationName, std::string tableName)
         : application(std::move(applicationName)), name(std::move(tableName)) {}
@@ -37,7 +37,7 @@ struct OxaTable {
 
     // Guarded by the registry's lock:
     TableManager* manager = nullptr;  ///< null while nobody offers the table
-    bool columnsKnown = false;        ///< of this manager
+    bool columnsKnown = false;        ///< `columns` are those of this manager
     std::vector<oxa::Column> columns;
 };
 
@@ -65,11 +65,11 @@ struct rtoxa::State {
     std::mutex sinkLock;  ///< guards the sink and is held while it runs
     oxa::Sink sink;       ///< empty for plain queries and when the requester has gone
 
-    /// Twice the number of uses, plus 1 while the framework keeps the object. 0 ends its life.
+    /// Twice the number of uses, plus 1 while the framework keeps the object. At 0 it is destroyed.
     std::atomic<unsigned> references{1};
 };
 
-/// The framework's way into the two classes.
+/// Gives the framework access to private members of the two classes.
 struct OxaAccess {
     using State = rtoxa::State;
     static rtoxa::State& state(rtoxa& object) { return *object.state_; }
@@ -78,31 +78,31 @@ struct OxaAccess {
 
 namespace oxa {
 
-/// Lets an object go that the framework has kept: it is destroyed now, or by its last Drop().
+/// Ends the framework's hold on an object, which is destroyed now or by its last Drop().
 struct Release {
     void operator()(rtoxa* object) const;
 };
 using OwnedObject = std::unique_ptr<rtoxa, Release>;
 
-/// The table of these names; made when there is none yet.
+/// The table of these names, which is made if there is none yet.
 OxaTable& tableNamed(const std::string& application, const std::string& table);
 
-/// A table that somebody offers, and its manager; both null when nobody does.
+/// A registered table and its manager; both null if there is none.
 struct Offer {
     OxaTable* table = nullptr;
     TableManager* manager = nullptr;
 };
 Offer offerOf(const std::string& table);
 
-/// All tables that are offered, in the order of their registration.
+/// All registered tables, in the order of their first registration.
 std::vector<Offer> offers();
 
-/// Keeps the columns of a table for the next asker, unless its manager has changed since.
+/// Stores the columns of a table, unless its manager has changed since.
 void rememberColumns(const Offer& offer, const std::vector<Column>& columns);
-/// True and the columns, if they are known.
+/// Fetches the stored columns; false if there are none.
 bool recallColumns(const Offer& offer, std::vector<Column>& columns);
 
-/// What an object says of its columns, names in upper case.
+/// The columns that an object describes, with names in upper case.
 std::vector<Column> columnsOf(rtoxa& object);
 
 }  // namespace oxa

@@ -1,6 +1,6 @@
-// Table managers, the tables that the framework knows, and the walk over live objects.
+// Table managers, the registry of tables, and iteration over live objects.
 //
-// The registry's lock is taken last of all and never held while anybody else's code runs.
+// The registry's lock comes last in the lock order and is never held while foreign code runs.
 
 #include <map>
 #include <utility>
@@ -16,7 +16,7 @@ struct Registry {
 };
 
 Registry& registry() {
-    static Registry& instance = *new Registry;  // immortal: used by threads until the process ends
+    static Registry& instance = *new Registry;  // never destroyed: threads use it until the end
     return instance;
 }
 

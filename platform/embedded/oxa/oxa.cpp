@@ -1,4 +1,4 @@
-// The base class of requests: filter entries, rows, uses and dispatch.
+// The base class of requests: filter entries, rows, uses of handles and dispatch.
 
 #include "platform/oxa.h"
 
@@ -16,10 +16,10 @@ RAS1_UNIT traceUnit{"oxa"};
 unsigned nextObjectNumber() {
     static std::atomic<unsigned> last{0};
     const unsigned number = ++last;
-    return number != 0 ? number : ++last;  // 0 is no handle, not even after a wrap
+    return number != 0 ? number : ++last;  // 0 is never a handle, not even after an overflow
 }
 
-/// Room for one more row; grows geometrically, by the default at least.
+/// Makes room for one more row. Room grows geometrically, by `step` rows at least.
 void makeRoom(oxa::Rows& rows, std::size_t count, std::size_t& allocated, unsigned step) {
     if (count < allocated) return;
     const std::size_t wanted = allocated + std::max<std::size_t>(step, allocated);

@@ -20,7 +20,7 @@ std::string hostName() {
     return std::string(name).substr(0, kOriginNodeLength);
 }
 
-/// The origin node. Names that were in force once are kept, because pointers to them are about.
+/// The origin node. Earlier names are kept, because callers may still hold pointers to them.
 class OriginNode {
 public:
     OriginNode() : current_(&*names_.insert(hostName()).first) {}
@@ -37,12 +37,12 @@ private:
 };
 
 OriginNode& node() {
-    static OriginNode& instance = *new OriginNode;  // immortal: requests run until the process ends
+    static OriginNode& instance = *new OriginNode;  // never destroyed: requests run until the end
     return instance;
 }
 
-/// Makes the object of a request; null when the table has no memory for one. What the table's code
-/// throws passes through.
+/// Makes the object of a request; null if the table is short of memory. Passes on whatever the
+/// table's code throws.
 OwnedObject createObject(const Offer& offer, const std::vector<Predicate>& where,
                          ContextInfo context) {
     RequestDetail detail{where};
@@ -51,7 +51,7 @@ OwnedObject createObject(const Offer& offer, const std::vector<Predicate>& where
 
 class LiveSubscription final : public Subscription {
 public:
-    /// Puts the object at the end of its table's list of live objects.
+    /// Appends the object to its table's list of live objects.
     explicit LiveSubscription(OwnedObject object) : object_(std::move(object)) {
         OxaAccess::State& state = OxaAccess::state(*object_);
         OxaTable& table = state.table;
@@ -75,7 +75,7 @@ private:
         (state.next != nullptr ? OxaAccess::state(*state.next).previous : table.last) =
             state.previous;
     }
-    /// A user of the handle may still be dispatching; afterwards the requester is gone for it.
+    /// Waits for a dispatch that is running. Later ones find no requester.
     void silence() {
         OxaAccess::State& state = OxaAccess::state(*object_);
         Sink gone;
@@ -114,7 +114,7 @@ std::vector<Table> tables() {
                     rememberColumns(offer, table.columns);
                 }
             } catch (...) {
-                // A table that cannot be asked now is listed without columns and asked again.
+                // A table that cannot answer now is listed without columns and asked again later.
                 table.columns.clear();
             }
         }

@@ -1,6 +1,7 @@
-// Trace lines. Each event becomes one line and one write, so that lines of several threads and
+// Trace lines. Each event is one line, written with one call, so that lines of several threads and
 // processes do not mix in an append-mode file. Nothing here takes a lock, and a line with the
-// format "%s" is written with async-signal-safe calls only: a child between fork and exec traces.
+// format
+// "%s" needs async-signal-safe calls only, so that a child can trace between fork and exec.
 //
 //   2026-01-31 12:34:56.123456 4711 E zavtasks:123 runTask: text
 
@@ -31,9 +32,9 @@ std::atomic<unsigned> RAS1_Generation{1};
 
 namespace {
 
-/// A descriptor of its own, outside the numbers of the standard streams, for what `descriptor` is
-/// open to; -1 when there is none. If the process closes descriptor 2 and a file or a pipe gets
-/// that number, traces must not end up there; nor must the log become a child's standard stream.
+/// Duplicates a descriptor to a number above those of the standard streams; -1 on failure. If the
+/// process closes descriptor 2 and a file or pipe gets that number, traces must not end up there.
+/// Nor may the log become a child's standard stream.
 int ownDescriptor(int descriptor) {
     return ::fcntl(descriptor, F_DUPFD_CLOEXEC, 3);
 }
@@ -53,8 +54,8 @@ bool hasReader(int descriptor) {
     return ::fstat(descriptor, &found) == 0 && (S_ISFIFO(found.st_mode) || S_ISSOCK(found.st_mode));
 }
 
-/// What is in force. Replaced by configure() only, one thread at a time, while others trace; never
-/// destroyed, because threads trace until the process is gone.
+/// The settings in force. Only configure() replaces them, on one thread at a time, while others may
+/// be tracing. Never destroyed, because threads trace until the process ends.
 class Facility {
 public:
     Facility() { configureFromEnvironment(); }
@@ -78,9 +79,9 @@ public:
     bool readerMayGo() const { return readerMayGo_.load(std::memory_order_relaxed); }
 
 private:
-    /// Sends lines to `log`, which is owned from here on, or to standard error when it is -1. The
-    /// number of the descriptor stays, so that a thread which is about to write meets no other
-    /// file than one of the two.
+    /// Sends lines to `log`, which it takes over, or to standard error if `log` is -1. The number
+    /// of the descriptor in use stays the same, so that a thread which is about to write finds one
+    /// of the two files and never a third.
     void redirect(int log) {
         const int target = log != -1 ? log : standardError_;
         const int current = descriptor();
@@ -96,12 +97,12 @@ private:
         }
     }
 
-    /// The one in force is the last; threads may still be looking at earlier ones.
+    /// The last one is in force; threads may still be reading earlier ones.
     std::vector<std::unique_ptr<const ras1::Selection>> selections_;
     std::atomic<const ras1::Selection*> selection_{nullptr};
     const int standardError_ = ownDescriptor(STDERR_FILENO);
     std::atomic<int> lines_{-1};            ///< where lines go
-    std::atomic<bool> readerMayGo_{false};  ///< that is a pipe or a socket
+    std::atomic<bool> readerMayGo_{false};  ///< lines go to a pipe or a socket
 };
 
 Facility& facility() {
@@ -109,15 +110,15 @@ Facility& facility() {
     return instance;
 }
 
-/// Opens the log and takes the copy of standard error while the process starts, before its files
-/// move.
+/// Opens the log and duplicates standard error at the start of the process, before it redirects
+/// anything.
 [[maybe_unused]] const Facility& startedEarly = facility();
 
 /// Appends a number in decimal, with at least `width` digits.
 char* putNumber(char* at, long long value, int width) {
     char digits[24];
     int count = 0;
-    // The most negative value has no positive counterpart in its own type.
+    // The negation of the most negative value does not fit its type.
     unsigned long long rest = static_cast<unsigned long long>(value);
     if (value < 0) {
         *at++ = '-';
@@ -176,7 +177,7 @@ char* putTime(char* at) {
     return putNumber(at, now.tv_nsec / 1000, 6);
 }
 
-/// Everything of a line that stands before its text.
+/// Writes everything that precedes a line's text; returns its length.
 std::size_t putHead(char (&head)[256], const RAS1_BLOCK& block, char letter, int line) {
     const char* const end = head + sizeof head - 32;
     char* at = putTime(head);
@@ -195,15 +196,15 @@ std::size_t putHead(char (&head)[256], const RAS1_BLOCK& block, char letter, int
     return static_cast<std::size_t>(at - head);
 }
 
-/// Text that holds line ends would make a line look like several (and let a caller's data forge
-/// some), so they and the backslash are written as escapes. The trailing line feeds that some texts
-/// have are dropped.
+/// A text with line ends would look like several lines, and data could forge some. Line ends and
+/// backslashes are therefore written as escapes. Trailing line feeds, which some texts have, are
+/// dropped.
 bool needsEscapes(const char* text, std::size_t length) {
     return std::memchr(text, '\n', length) != nullptr ||
            std::memchr(text, '\r', length) != nullptr || std::memchr(text, '\\', length) != nullptr;
 }
 
-/// Room for an escaped text that needs no allocator: a child after fork must not call one.
+/// Memory for an escaped text, not from the allocator, which a child must not call after fork.
 class Scratch {
 public:
     explicit Scratch(std::size_t size) : size_(size) {
@@ -236,8 +237,8 @@ std::size_t putEscaped(char* out, const char* text, std::size_t length) {
     return static_cast<std::size_t>(at - out);
 }
 
-/// While it exists, a write to a pipe without a reader costs the process nothing: SIGPIPE is
-/// blocked in this thread and taken back if it came.
+/// Keeps a write to a pipe without a reader from ending the process: blocks SIGPIPE in this thread
+/// and discards one that arrived.
 class SigpipeShield {
 public:
     explicit SigpipeShield(bool wanted) : wanted_(wanted) {

@@ -31,7 +31,7 @@ std::vector<std::string> words(const std::string& text) {
     return found;
 }
 
-/// "UNIT:name LEVEL ..." without its parentheses; other kinds of groups select nothing.
+/// Adds the rule of a group, "UNIT:name LEVEL ..." without its parentheses. Ignores other groups.
 void addGroup(const std::string& group, Selection& selection) {
     std::string unit;
     unsigned flags = 0;

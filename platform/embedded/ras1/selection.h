@@ -1,4 +1,4 @@
-/// Which source units trace what.
+/// Selects what each source unit traces.
 #pragma once
 
 #include <string>
@@ -6,8 +6,8 @@
 
 namespace ras1 {
 
-/// A level for all units and exceptions by the beginning of a unit's name; the first that fits
-/// counts.
+/// A general level, and rules for units whose names have a prefix. The first rule that matches
+/// applies.
 struct Selection {
     struct Rule {
         std::string unitPrefix;
@@ -19,8 +19,8 @@ struct Selection {
     unsigned flagsOf(const char* unit) const;
 };
 
-/// Understands "ALL" or "ERROR (UNIT:zavtasks ALL) (UNIT:zavu DETAIL)"; words and groups that say
-/// nothing are passed over, and without a general level errors are traced.
+/// Parses texts such as "ALL" or "ERROR (UNIT:zavtasks ALL) (UNIT:zavu DETAIL)". Ignores words and
+/// groups that it does not know. The general level is ERROR unless the text gives one.
 Selection parseSelection(const std::string& text);
 
 }  // namespace ras1

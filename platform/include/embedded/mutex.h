@@ -1,20 +1,20 @@
-/// A mutex that clang watches: members that it guards say so, and -Wthread-safety refuses code that
-/// uses them without it. The standard library's mutex carries no such marks. For other compilers
-/// this is std::mutex and nothing more.
+/// A mutex for clang's thread safety analysis: members name the mutex that guards them, and
+/// -Wthread-safety rejects code that uses them without it. The standard library's mutex has no such
+/// annotations. With other compilers this is just std::mutex.
 #pragma once
 
 #include <condition_variable>
 #include <mutex>
 
-// Attributes cannot be made by functions; these are all the macros there are for them.
+// Only a macro can stand for an attribute.
 #if defined(__clang__)
 #define ZAV_THREAD_SAFETY(attribute) __attribute__((attribute))
 #else
 #define ZAV_THREAD_SAFETY(attribute)
 #endif
-/// Behind a member: to be read and written only with the mutex held.
+/// After a member: read and written only with the mutex held.
 #define ZAV_GUARDED_BY(mutex) ZAV_THREAD_SAFETY(guarded_by(mutex))
-/// Behind a function: to be called only with the mutex held.
+/// After a function: called only with the mutex held.
 #define ZAV_REQUIRES(mutex) ZAV_THREAD_SAFETY(requires_capability(mutex))
 
 namespace embedded {
@@ -30,7 +30,7 @@ private:
     std::mutex mutex_;
 };
 
-/// Holds a mutex from its construction to its end, but for what lies between unlock() and lock().
+/// Holds a mutex during its lifetime, except between unlock() and lock().
 class ZAV_THREAD_SAFETY(scoped_lockable) MutexLock {
 public:
     explicit MutexLock(Mutex& mutex) ZAV_THREAD_SAFETY(acquire_capability(mutex))
@@ -41,7 +41,8 @@ public:
 
     void unlock() ZAV_THREAD_SAFETY(release_capability()) { lock_.unlock(); }
     void lock() ZAV_THREAD_SAFETY(acquire_capability()) { lock_.lock(); }
-    /// Lets the mutex go until the condition is notified, or for no reason at all; so callers loop.
+    /// Releases the mutex until the condition is notified. Wake-ups may be spurious, so callers
+    /// loop.
     void wait(std::condition_variable& condition) { condition.wait(lock_); }
 
 private:

@@ -1,5 +1,5 @@
-/// The framework seen from the process that serves requesters: which tables there are, queries on
-/// them and live subscriptions. A host includes this header; a table's own library never does.
+/// The agent framework as the host process sees it: the registered tables, queries and live
+/// subscriptions. A library that offers tables never includes this header.
 #pragma once
 
 #include <cstddef>
@@ -12,7 +12,7 @@
 
 namespace oxa {
 
-/// One column as requesters know it.
+/// One column of a table.
 struct Column {
     std::string name;  ///< upper case
     int offset = 0;
@@ -25,18 +25,18 @@ struct Table {
     std::string application;
     std::string name;
     std::vector<Column> columns;
-    /// The column of that exact name, or null.
+    /// The column of exactly this name, or null. Owned by the table.
     const Column* find(const std::string& column) const;
 };
 
-/// One condition; conditions of a request are combined with AND.
+/// One condition. The conditions of a request are combined with AND.
 struct Predicate {
     std::string column;
     _IntfOper op = OPER_EQ;
     std::string value;
 };
 
-/// Rows of one table, one behind the other, `rowSize` bytes each.
+/// Rows of one table, `rowSize` bytes each, without gaps.
 struct Rows {
     std::string bytes;
     unsigned rowSize = 0;
@@ -44,37 +44,37 @@ struct Rows {
     const char* row(std::size_t index) const { return bytes.data() + index * rowSize; }
 };
 
-/// Names the node that this process stands for, until then the machine's host name. Longer than 64
-/// bytes is cut. Requests that are being served meanwhile may see either name.
+/// Sets the name of the node that this process represents; it is the host name until then. Names
+/// are cut to 64 bytes. Requests that are running meanwhile may see either name. Any thread.
 void setOriginNode(const std::string& name);
 std::string originNode();
 
-/// The registered tables in the order of their registration, with their columns. A table is asked
-/// for its columns once, by way of an object that is never sampled.
+/// The registered tables with their columns, in the order of their first registration. A table is
+/// asked for its columns once, through an object that is never sampled.
 std::vector<Table> tables();
 
-/// Runs one plain query on the calling thread, for as long as the table takes. Predicates are
-/// handed on as they are, unknown columns included. Returns 0, or a status: OXA_GONE when there is
-/// no such table, OXA_NO_MEMORY, OXA_FAILED when the table's code threw, or what the table said.
-/// `rows` holds what was collected up to then.
+/// Runs one plain query on the calling thread and blocks until the table has answered. Predicates
+/// are passed on unchanged, even on unknown columns. Returns 0 or a status: OXA_GONE if there is no
+/// such table, OXA_NO_MEMORY, OXA_FAILED if the table's code threw, or the table's own status.
+/// `rows` holds what was collected until then. Any thread.
 int query(const std::string& table, const std::vector<Predicate>& where, Rows& rows);
 
-/// Takes rows as they come, on the thread that dispatches them and under the table's lock: it must
-/// return at once and must not call back into the framework. Returns 0, OXA_OVERFLOW or OXA_GONE.
-/// A sink that throws counts as one that answered OXA_OVERFLOW: these rows are lost, later ones
-/// reach it again.
+/// Receives the rows of a subscription, on the thread that dispatches them and under the table's
+/// lock. It must return quickly and must not call the framework. Returns 0, OXA_OVERFLOW or
+/// OXA_GONE. If it throws, that counts as OXA_OVERFLOW: these rows are lost, later ones are still
+/// delivered.
 using Sink = std::function<int(const Rows& rows)>;
 
-/// A live subscription. While it exists its sink may be called; once the destructor has returned
-/// it is not called any more and has been destroyed. The destructor waits for a walk over the
-/// table's live objects: it must not run under a lock that a sink takes, nor in a sink.
+/// A live subscription. Its sink may be called as long as it exists; when the destructor returns,
+/// the sink has been destroyed. The destructor waits for the table's lock: do not destroy a
+/// subscription in a sink, nor while holding a lock that a sink takes.
 class Subscription {
 public:
     virtual ~Subscription() = default;
 };
 
-/// Opens a subscription; it is live when the function returns. Null when there is no such table or
-/// it could not make an object.
+/// Opens a subscription, which is live when the function returns. Returns null if there is no such
+/// table or if the table could not make an object. Any thread.
 std::unique_ptr<Subscription> subscribe(const std::string& table,
                                         const std::vector<Predicate>& where, Sink sink);
 

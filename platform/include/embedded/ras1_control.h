@@ -1,19 +1,19 @@
-/// Control of the embedded trace facility by the process it runs in; tests capture traces with it.
+/// Lets the host process configure the embedded trace. Tests capture traces with it.
 #pragma once
 
 #include <string>
 
 namespace ras1 {
 
-/// Replaces what KBB_RAS1 and KBB_RAS1_LOG said at the start. `selection` has the form of KBB_RAS1:
-/// "ALL", "ERROR", or a level followed by groups such as "ERROR (UNIT:zavtasks ALL)", in which a
-/// unit is selected by the beginning of its name. Lines are appended to the file `logPath`, or go
-/// to standard error when it is empty or cannot be opened. The environment is left alone. One
-/// thread at a time; a line that another thread is writing meanwhile goes to the old or to the new
-/// place.
+/// Replaces the settings that KBB_RAS1 and KBB_RAS1_LOG gave at the start. `selection` has the form
+/// of KBB_RAS1: "ALL", "ERROR", or a level followed by groups such as "ERROR (UNIT:zavtasks ALL)".
+/// A group selects units by the beginning of their names. Lines are appended to the file `logPath`;
+/// they go to standard error if it is empty or the file cannot be opened. Does not change the
+/// environment. To be called by one thread at a time; lines that other threads write meanwhile go
+/// to the old or the new place.
 void configure(const std::string& selection, const std::string& logPath);
 
-/// Goes back to what the environment says now.
+/// Returns to the settings of the environment as it is now.
 void configureFromEnvironment();
 
 }  // namespace ras1

@@ -1,24 +1,24 @@
 /// The agent framework: tables, the requests on them and the rows that answer.
 ///
-/// A table is offered by a TableManager, of which an agent library registers one per table. For
-/// each query or subscription the framework asks the manager for an rtoxa, which works out rows and
-/// hands them back. A plain query makes an object, calls TakeSample() once, takes its rows and
-/// destroys it. A subscription makes an object that stays on its manager's list of live objects, so
-/// that rows which arrive later reach it.
+/// An agent library registers one TableManager for each table that it offers. For each query or
+/// subscription the framework asks the manager for an rtoxa, which produces the rows. For a plain
+/// query the framework makes an object, calls TakeSample() once, takes the rows and destroys the
+/// object. The object of a subscription stays on its manager's list of live objects, so that later
+/// rows reach it.
 ///
-/// Threads: CreateRtoxa() and TakeSample() run on the framework's own threads, several at a time
-/// for different objects, never two for one object. The list of live objects is walked and changed
-/// under the manager's lock only, and a live object is destroyed only when it is off the list and
-/// no handle to it is in use.
+/// Threads: CreateRtoxa() and TakeSample() run on the framework's threads, several at a time for
+/// different objects, but never two for one object. The list of live objects is read and changed
+/// under the manager's lock only. A live object is destroyed once it is off the list and none of
+/// its handles is in use.
 ///
-/// Order of locks: a manager's lock, then the lock of one of its live objects (held while its rows
-/// are handed to the requester), then whatever the requester's sink takes. CreateRtoxa() and
-/// TakeSample() are called without any of them.
+/// Lock order: a manager's lock, then the lock of one of its live objects (held while its rows go
+/// to the requester), then whatever the requester's sink locks. None of them is held during
+/// CreateRtoxa() and TakeSample().
 #pragma once
 
 #include <memory>
 
-/// What was asked and for whom; the framework's own, passed through by a table's classes.
+/// The request and its context. They belong to the framework; a table's classes pass them through.
 struct RequestDetail;
 struct ContextInfo;
 struct RtoxaAutomationCapsule;
@@ -33,9 +33,9 @@ enum : int {
     OXA_NO_MEMORY = 0x21060002,
     OXA_END_OF_FILTER = 0x21060005,  ///< GetFilterInfo has handed out every entry
     OXA_BAD_COLUMN = 0x21060007,     ///< a column number that the table does not have
-    OXA_OVERFLOW = 0x21060009,       ///< the requester does not take rows as fast as they come
-    OXA_GONE = 0x2106000A,           ///< the requester, or what was asked for, is not there
-    OXA_FAILED = 0x2106000B,         ///< the table could not do what was asked
+    OXA_OVERFLOW = 0x21060009,       ///< the requester takes rows too slowly
+    OXA_GONE = 0x2106000A,           ///< the requester or the requested table no longer exists
+    OXA_FAILED = 0x2106000B,         ///< the table could not carry out the request
 };
 
 /// Type codes of columns.
@@ -44,8 +44,8 @@ enum : int {
     OXA_TYPE_CHARACTER = 9,  ///< blank-padded to the column's length, not 0-terminated
 };
 
-/// Comparison operators: field OPERATOR value. LIKE compares with a pattern in which "*" stands for
-/// any run of characters, the empty one among them.
+/// Comparison operators: field OPERATOR value. For LIKE the value is a pattern, in which "*" stands
+/// for any number of characters.
 enum _IntfOper {
     OPER_EQ,
     OPER_NE,
@@ -61,7 +61,7 @@ enum _IntfOper {
 struct FLT1_FILTERINFO {
     const char* columnName;  ///< 0-terminated, as the requester wrote it
     _IntfOper op;
-    const char* value;  ///< `valueLength` bytes, and a terminating 0 behind them
+    const char* value;  ///< `valueLength` bytes, followed by a terminating 0
     unsigned valueLength;
 };
 
@@ -73,53 +73,53 @@ struct ColumnInfo {
     int type;          ///< OXA_TYPE_...
 };
 
-/// One query or subscription, and the rows that are to answer it.
+/// One query or subscription, with the rows that answer it.
 class rtoxa {
 public:
-    /// All three belong to the caller; the manager outlives the object's construction, the other
-    /// two need to live only until the constructor has returned. A null `detail` is a request
-    /// without a filter, a null `context` that of a plain query.
+    /// All three belong to the caller and must live until the constructor returns. A null `detail`
+    /// stands for a request without a filter, a null `context` for a plain query.
     rtoxa(RequestDetail* detail, ContextInfo* context, TableManager* manager);
     rtoxa(const rtoxa&) = delete;
     rtoxa& operator=(const rtoxa&) = delete;
 
     /// Traces the object and its rows.
     virtual void PrintSelf();
-    /// Works out the rows of a plain query. Returns 0 or a status.
+    /// Produces the rows of a plain query. Returns 0 or a status.
     virtual int TakeSample() = 0;
     virtual int NumColumns();
-    /// Describes column `index`. Returns 0 or OXA_BAD_COLUMN; `*info` is untouched when there is
-    /// nothing to say.
+    /// Describes column `index` in `*info`. Returns 0 or OXA_BAD_COLUMN. Callers must expect 0 with
+    /// `*info` unchanged, which means that there is no such column.
     virtual int GetColumnInfo(ColumnInfo* info, int index);
-    /// Runs a command for an automation; the base has none and answers OXA_FAILED.
+    /// Runs a command for an automation. The base class has no commands and returns OXA_FAILED.
     virtual int ExecuteCommand(char* command, int length, char* result);
     virtual ~rtoxa();
     /// Appends a copy of one row. Returns 0 or OXA_NO_MEMORY.
     virtual int InsertRow(char* row);
-    /// 1 when the row satisfies every entry of the filter, else 0. An entry whose name no column
-    /// of the table has (names are compared exactly, in upper case) restricts nothing.
+    /// Returns 1 if the row satisfies every entry of the filter, else 0. Entries on columns that
+    /// the table does not have are ignored; names are compared exactly, in upper case.
     virtual int CheckForException(char* row);
-    /// 1 when the named column of `row` compares with the 0-terminated `value` as `op` says, else
-    /// 0; 0 for an unknown column. The base knows no column.
+    /// Returns 1 if the comparison of the named column of `row` with the 0-terminated `value`
+    /// holds, else 0; 0 for an unknown column. The base class knows no columns.
     virtual int ColumnIsException(char* column, char* row, _IntfOper op, char* value);
     virtual void CommandCompleted(RtoxaAutomationCapsule* capsule);
 
-    /// Hands out the filter's entries one after the other, in the request's order and unchanged.
-    /// Returns 0, then OXA_END_OF_FILTER.
+    /// Fetches the filter's entries one by one, in the request's order and unchanged. Returns 0,
+    /// and OXA_END_OF_FILTER after the last one.
     int GetFilterInfo(FLT1_FILTERINFO* entry);
 
-    /// Bytes per row; set once, before the first row.
+    /// Sets the number of bytes per row; to be called once, before the first InsertRow().
     void SetRowSize(unsigned bytes);
-    /// Rows to make room for at a time, at least; room grows geometrically beyond that.
+    /// Sets the least number of rows to make room for at a time. Beyond that, room grows
+    /// geometrically.
     void SetAllocationDefault(unsigned rows);
     unsigned AllocationDefault() const;
 
-    /// The rows that are held now.
+    /// Number of rows held now.
     int NumDataItems() const;
     int NumRowsAllocated() const;
-    /// Row `index`, which must be held; valid until the next InsertRow() or ClearCount().
+    /// Row `index`, which must exist; valid until the next InsertRow() or ClearCount().
     char* Data(int index) const;
-    /// Forgets the rows; their memory is kept for the next ones.
+    /// Removes all rows but keeps their memory for the next ones.
     void ClearCount();
 
     const char* ApplicationName() const;
@@ -128,31 +128,30 @@ public:
     int Interval() const;
     /// 0 = plain query, 1 = subscription.
     int SampleType() const;
-    /// Two numbers for traces: the object's own number, and how many handles to it are in use.
+    /// For traces: the object's number, and how often its handle is in use.
     unsigned ObjectNumber() const;
     unsigned UseCount() const;
 
-    /// The object's handle, the number by which the framework knows it; never 0.
+    /// The number by which the framework knows the object; never 0.
     unsigned long Handle() const;
-    /// Keeps this object from being destroyed until Drop(). `handle` is the object's own; any
-    /// other does nothing.
+    /// Keeps this object alive until Drop(). Does nothing if `handle` is not the object's own.
     void UseHandle(unsigned long handle);
-    /// Ends the use that UseHandle() began. The object may be gone afterwards, if it is no longer
-    /// live and this was its last use. Without a use it does nothing.
+    /// Ends a use that UseHandle() began. If the object is no longer live and this was its last
+    /// use, it is destroyed. Without a use it does nothing.
     void Drop();
-    /// Hands the rows that are held to a live object's requester without waiting for it; without
-    /// rows the requester is left alone. Returns 0, OXA_OVERFLOW or OXA_GONE. The rows of a plain
-    /// query stay for its end.
+    /// Passes the rows of a live object to its requester, without waiting for it. Without rows the
+    /// requester is not called. Returns 0, OXA_OVERFLOW or OXA_GONE. Does nothing for a plain
+    /// query, whose rows the framework takes at its end.
     int Dispatch();
 
 protected:
-    /// Compares a character field of `length` bytes with a 0-terminated value. Both are taken as
-    /// blank-padded to `length`, of the value at most `length` bytes count (of a pattern at most
-    /// `length` besides its "*"). LIKE ignores the trailing blanks of both. Bytes are compared as
-    /// unsigned numbers.
+    /// Compares a character field of `length` bytes with a 0-terminated value. Both count as padded
+    /// with blanks to `length`. A value is cut to `length` bytes, a pattern to `length` bytes
+    /// besides its "*". LIKE ignores trailing blanks on both sides. Bytes compare as unsigned
+    /// numbers.
     static int IsException(_IntfOper op, const char* field, const char* value, int length);
-    /// Compares an integer field with a value in decimal digits, with or without a sign and blanks
-    /// around it; 0 when the value is no number. LIKE compares the field's digits as a text.
+    /// Compares an integer field with a decimal value, which may have a sign and blanks around it.
+    /// 0 if the value is not a number. LIKE compares the field's digits as text.
     static int IsException(_IntfOper op, int field, const char* value);
 
 private:
@@ -165,21 +164,21 @@ private:
 /// One table of one application.
 class TableManager {
 public:
-    /// The names are constant texts that outlive the manager. Managers of the same names share
-    /// their live objects and the lock that guards them.
+    /// The names are texts that outlive the manager. Managers with the same names share their live
+    /// objects and the lock that guards them.
     TableManager(const char* application, const char* table);
     TableManager(const TableManager&) = delete;
     TableManager& operator=(const TableManager&) = delete;
-    /// Takes a registered table back; no request on it may be running.
+    /// Withdraws the table if it is registered. No request on it may be running.
     virtual ~TableManager();
 
-    /// Called by the framework when it stops serving the table through this manager, without locks.
+    /// The framework calls this, without holding locks, when it stops using this manager.
     virtual void Shutdown(unsigned long reason);
-    /// Makes the object of one request; the caller owns it. Null when memory is short.
+    /// Makes the object of one request; the caller owns it. Returns null when memory is short.
     virtual rtoxa* CreateRtoxa(RequestDetail* detail, ContextInfo* context) = 0;
 
-    /// Offers the table to requesters from now on. A manager that was registered earlier under the
-    /// same names is replaced and shut down, and its live objects move over. Returns 0 or a status.
+    /// Offers the table to requesters. Replaces and shuts down a manager that is registered under
+    /// the same names, and takes over its live objects. Returns 0 or a status.
     int RegisterWithManager();
 
     /// Guards the list of live objects. Not recursive.
@@ -193,11 +192,11 @@ private:
     friend class rtoxa;
     friend class RtoxaListIter;
     friend struct OxaAccess;
-    OxaTable& table_;  // what the framework keeps under the two names; never destroyed
+    OxaTable& table_;  // what the framework keeps for the two names; never destroyed
 };
 
-/// Walks a manager's live objects in the order in which they came. The manager's lock is held from
-/// before the iterator is made until after its last use.
+/// Iterates over a manager's live objects in the order in which they were added. The caller holds
+/// the manager's lock for as long as it uses the iterator.
 class RtoxaListIter {
 public:
     explicit RtoxaListIter(TableManager* manager);
@@ -208,5 +207,5 @@ private:
     rtoxa* next_;
 };
 
-/// The name of the node that this agent process stands for, 0-terminated; at most 64 bytes.
+/// The name of the node that this agent process represents: 0-terminated, at most 64 bytes.
 const char* OXA_GetOriginnode(const rtoxa* request);

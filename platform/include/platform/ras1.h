@@ -1,7 +1,7 @@
-/// The base services trace facility.
+/// Base services: trace.
 ///
 /// Every source unit has one RAS1_UNIT with static storage, every function call one RAS1_BLOCK on
-/// its stack. A caller reads the unit's flags first, so that a line which nobody wants costs one
+/// its stack. A caller reads the unit's flags first, so that a line which is not selected costs one
 /// comparison. All operations may be called from any thread and, with the format "%s", from a
 /// child between fork and exec.
 #pragma once
@@ -10,22 +10,21 @@
 
 /// Bits of a unit's flags and, one at a time, the level of a line.
 enum : unsigned {
-    RAS1_DETAIL = 1,   ///< what a function found out and did
+    RAS1_DETAIL = 1,   ///< what a function found and did
     RAS1_FLOW = 64,    ///< entry to and exit from functions
-    RAS1_ERROR = 128,  ///< failures; on unless the facility is told otherwise
+    RAS1_ERROR = 128,  ///< failures; on by default
 };
 
-/// One source unit as the facility sees it. Constant-initialised, so it may be used by static
-/// initialisers of other units.
+/// One source unit. Constant-initialised, so that static initialisers of other units may trace.
 struct RAS1_UNIT {
-    const char* name;                     ///< such as "zavtasks"; selected by this name
-    std::atomic<unsigned> flags{0};       ///< owned by the facility
-    std::atomic<unsigned> generation{0};  ///< owned by the facility; 0 = flags not worked out
+    const char* name;                     ///< such as "zavtasks"; units are selected by name
+    std::atomic<unsigned> flags{0};       ///< owned by the platform
+    std::atomic<unsigned> generation{0};  ///< owned by the platform; 0 = flags not known yet
 
     constexpr explicit RAS1_UNIT(const char* unitName) : name(unitName) {}
 };
 
-/// One function call as the facility sees it.
+/// One function call.
 struct RAS1_BLOCK {
     const RAS1_UNIT* unit;
     const char* function;
@@ -36,10 +35,10 @@ extern "C" {
 /// Grows by one whenever the selection of units changes; never 0. Read through RAS1_Flags.
 extern std::atomic<unsigned> RAS1_Generation;
 
-/// Works out the unit's flags from the selection in force, stores and returns them.
+/// Determines the unit's flags from the selection in force, stores and returns them.
 unsigned RAS1_Sync(RAS1_UNIT* unit);
 
-/// Writes an entry event. `line` is the line of the source unit that it stands for.
+/// Writes an entry event. `line` is the line number in the source unit.
 void RAS1_Entry(const RAS1_BLOCK* block, int line);
 
 /// Writes an exit event of a function without a result.
@@ -49,13 +48,13 @@ void RAS1_Exit(const RAS1_BLOCK* block, int line);
 void RAS1_ExitValue(const RAS1_BLOCK* block, int line, long value);
 
 /// Writes one line at `level` (RAS1_DETAIL or RAS1_ERROR). The caller has tested the unit's flags;
-/// they are not tested again. The text may be of any length.
+/// they are not tested again. The text may have any length.
 void RAS1_Printf(const RAS1_BLOCK* block, unsigned level, int line, const char* format, ...)
     __attribute__((format(printf, 4, 5)));
 
 }  // extern "C"
 
-/// The unit's flags as they are now.
+/// The unit's current flags.
 inline unsigned RAS1_Flags(RAS1_UNIT& unit) {
     const bool changed = unit.generation.load(std::memory_order_acquire) !=
                          RAS1_Generation.load(std::memory_order_relaxed);
