@@ -1,5 +1,4 @@
-// Start-up when its steps fail. The steps below take the place of the library's, in this program
-// only.
+// Start-up when its steps fail. The steps below replace the library's in this program.
 #include <gtest/gtest.h>
 
 #include <cstdlib>

@@ -1,4 +1,4 @@
-// Start-up. What only a fresh process can show is skipped in one that has started already.
+// Start-up. Cases that need a fresh process are skipped when start-up has run in this one.
 // ctest-label: threaded
 #include "mgmt/zavmgmt.h"
 
@@ -41,7 +41,7 @@ bool isStarted() {
     return zav_kagreqt_static_manager != nullptr;
 }
 
-/// The home of all cases of this process, since start-up keeps what it finds.
+/// One home for all cases of this process, because start-up keeps its directories.
 ScriptHome& home() {
     static ScriptHome& instance = *new ScriptHome;
     return instance;

@@ -1,4 +1,4 @@
-// The steps of the line-end conversion that fail, one after the other.
+// The line-end conversion when one of its steps fails.
 #include <dlfcn.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -14,8 +14,8 @@
 #include "support/trace_capture.h"
 #include "util/zavutil.h"
 
-// These definitions come before the C library's, so that each of the steps can be made to fail for
-// paths that end in a given text.
+// These definitions replace the C library's, so that each step can be made to fail for paths that
+// end in a given text.
 namespace {
 
 struct Failure {
@@ -96,7 +96,7 @@ protected:
         ZAV::Util::_agentDepotDir.clear();
     }
 
-    /// The error lines of a conversion that fails because one step does.
+    /// The error lines of a conversion in which one step fails.
     Texts errorsOf(const Failure& failure) {
         failing = failure;
         TraceCapture trace;

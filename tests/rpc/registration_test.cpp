@@ -1,4 +1,4 @@
-// What registering the file transfer interface asks of the runtime, and what becomes of the answer.
+// How the file transfer interface is registered with the runtime, and what happens to its answer.
 // ctest-label: threaded
 #include <cstdlib>
 #include <vector>
@@ -21,7 +21,7 @@ std::uint32_t answer = 0;
 
 }  // namespace
 
-// This definition comes before the embedded runtime's.
+// This definition replaces the embedded runtime's.
 extern "C" void rpc__register_mgr(const uuid__t* object, const rpc__if_spec* interface,
                                   const rpc__server_epv* stubs, const void* manager,
                                   std::uint32_t* status) {

@@ -13,7 +13,7 @@ namespace {
 
 using ZAV::DataChunk;
 
-/// What the manager was called with.
+/// The arguments of a call of the manager.
 struct Call {
     int count = 0;
     std::int32_t unused1 = 0;
@@ -40,7 +40,7 @@ extern "C" void recordCall(handle_t, std::int32_t unused1, const char* fileName,
 
 constexpr QVS_Agent_v1_mgr_epv kRecorder = {recordCall};
 
-/// Marshals requests in either byte order, right ones and wrong ones.
+/// Marshals requests, valid and invalid, in either byte order.
 class RequestBuilder {
 public:
     explicit RequestBuilder(bool littleEndian) : littleEndian_(littleEndian) {}
@@ -90,7 +90,7 @@ struct Result {
 };
 
 Result callStub(const std::string& bytes, bool littleEndian = true) {
-    // A block of exactly that size: the sanitizers see every byte read beyond it.
+    // A block of exactly this size, so that the sanitizers notice reads beyond it.
     const std::vector<unsigned char> data(bytes.begin(), bytes.end());
     unsigned char room[4096] = {};
     rpc__reply reply{room, sizeof room, 0};

@@ -25,7 +25,7 @@ std::vector<DataChunk> chunksOf(const std::vector<std::string>& texts) {
     return chunks;
 }
 
-/// A home with a depot of its own, from which the library has not read anything yet.
+/// A home with its own depot, which the library does not know yet.
 class BinaryDataTransferTest : public testing::Test {
 protected:
     BinaryDataTransferTest() {
@@ -122,7 +122,7 @@ TEST_F(BinaryDataTransferTest, OnlyOneLeadingSeparatorGoes) {
 }
 
 TEST_F(BinaryDataTransferTest, ANameOf1024CharactersIsAcceptedAndOneMoreIsNot) {
-    // Components of 200 characters, so that each can be made.
+    // Components of 200 characters, short enough for the file system.
     std::string name;
     while (depotPath().size() + name.size() + 201 < 1000)
         name += std::string(200, 'd') + "/";
@@ -182,7 +182,7 @@ TEST_F(BinaryDataTransferTest, AChunkThatClaimsTooMuchIsStatusFive) {
 }
 
 TEST_F(BinaryDataTransferTest, AModeThatCannotBeSetIsTracedAndNoMore) {
-    // A kernel's file that can be written, but neither removed nor given another mode.
+    // A file of the kernel that can be written, but not removed and not given another mode.
     ASSERT_EQ(::symlink("/proc/self", scratch_.path("depot/self").c_str()), 0);
     TraceCapture trace;
     EXPECT_EQ(send("self/comm", {"renamed"}), 0);

@@ -1,6 +1,6 @@
-// Requests about configurations and instances all the way: in by the request table, through the
-// executor and the real handlers, out by the request table's answer or the deploy status table.
-// ctest-label: threaded
+// Requests about configurations and instances from end to end: in through the request table,
+// through the executor and the real handlers, out through the request table's answer or the deploy
+// status table. ctest-label: threaded
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -33,7 +33,7 @@ Outcome outcomeIn(const Row& row) {
     return {row.retval, trimmedField(row.retmsgid), trimmedField(row.retmsgparm)};
 }
 
-/// What a failure looks like in a row: the parameter is cut to its column.
+/// A failure as a row shows it: the parameter is truncated to its column.
 Outcome failure(int code, const std::string& parameter) {
     return {code, "ZAV" + std::to_string(code) + "E", parameter.substr(0, 256)};
 }
@@ -56,7 +56,7 @@ protected:
         return predicates;
     }
 
-    /// The one row that answers a request at once.
+    /// The one row that answers a request.
     static Outcome answer(Values values) {
         values["TRANSID"] = "tx-1";
         oxa::Rows rows;
@@ -67,7 +67,7 @@ protected:
         return outcomeIn(row);
     }
 
-    /// The one row that reports how a request ended which was accepted before.
+    /// The one row that reports the outcome of an accepted request.
     static Outcome outcome(const Values& values) {
         Outcomes outcomes({{"TRANSID", OPER_EQ, "tx-1"}});
         EXPECT_EQ(kSuccess, answer(values));
@@ -179,7 +179,7 @@ public:
         }
         home_.dir().write("home/config/um.config", content);
     }
-    /// A console that does what `body` says; "$verb" is what it is to do.
+    /// Creates a console that runs `body` with its verb in "$verb".
     void console(const std::string& body) const {
         home_.program(kConsole, "verb=${4%% *}\n" + body);
     }

@@ -20,7 +20,7 @@ std::string narrow(const String& text) {
     return static_cast<const char*>(text.c_str());
 }
 
-/// The products, each as its fields with "|" between them.
+/// The products, each as its fields joined by "|".
 Texts productsOf(const std::string& inventory) {
     Texts found;
     EXPECT_EQ(0, forEachProduct(inventory.c_str(), [&found](const InstalledProduct& product) {

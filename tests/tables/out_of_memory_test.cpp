@@ -1,4 +1,4 @@
-// Tables when memory runs out: what is answered, and that nothing is thrown at the framework.
+// Tables when out of memory: what they return, and that no exception reaches the framework.
 #include <gtest/gtest.h>
 
 #include <cstdlib>
@@ -16,7 +16,7 @@
 
 namespace {
 
-/// How many allocations of this thread succeed before one fails; none fails while negative.
+/// How many allocations of this thread succeed before one fails. While negative, none fails.
 thread_local long allocationsLeft = -1;
 
 bool mayAllocate() {
@@ -32,8 +32,8 @@ void* memoryForNew(std::size_t size) noexcept {
 
 namespace {
 
-/// Runs `body` with one failing allocation after 0, 1, 2, ... others, until none fails any more;
-/// checks each result. Returns how many runs met a failure.
+/// Runs `body` again and again, letting its first allocation fail, then its second, and so on until
+/// none fails. Checks each result. Returns the number of runs with a failure.
 template <typename Body, typename Check>
 int withEveryFailure(const Body& body, const Check& check) {
     for (long count = 0; count < 10000; ++count) {
@@ -74,7 +74,7 @@ TEST(OutOfMemory, ARequestThatCannotBeMadeIsNone) {
             std::unique_ptr<rtoxa> made(zav_kagreqt_static_manager->CreateRtoxa(detail, context));
             return made != nullptr;
         };
-        ASSERT_TRUE(make());  // so that what is made once for all requests is there
+        ASSERT_TRUE(make());  // creates what all requests share
         failures = withEveryFailure(make, [](bool made) { EXPECT_FALSE(made); });
     });
     EXPECT_LT(10, failures);

@@ -1,4 +1,4 @@
-/// What is checked alike for every table.
+/// Checks that are the same for every table.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -12,7 +12,7 @@
 #include "platform/oxa.h"
 #include "support/request_lender.h"
 
-/// A column as requesters must find it.
+/// A column as requesters must see it.
 struct ExpectedColumn {
     const char* attribute;
     const char* name;
@@ -21,7 +21,7 @@ struct ExpectedColumn {
     int type;
 };
 
-/// A request made in the way in which the framework makes it, on a manager of its own.
+/// A request on a manager of its own, created in the same way as by the framework.
 template <typename Manager, typename Agent>
 class MadeRequest {
 public:
@@ -56,7 +56,7 @@ inline void expectColumns(rtoxa& request, const std::vector<ExpectedColumn>& exp
     }
 }
 
-/// The bounds of column numbers: one beyond the last is accepted and fills nothing.
+/// The bounds of column numbers: the one after the last is accepted and fills nothing.
 inline void expectColumnBounds(rtoxa& request) {
     const int count = request.NumColumns();
     ColumnInfo info{"untouched", 1, 2, 3};
@@ -75,7 +75,7 @@ inline int compareColumn(rtoxa& request, const char* column, const std::string& 
     return request.ColumnIsException(name.data(), bytes.data(), op, text.data());
 }
 
-/// Every column is found by its attribute name only, and compared at its own place and width.
+/// Every column is found only by its attribute name, and compared at its own offset and width.
 inline void expectComparisons(rtoxa& request, std::size_t rowSize,
                               const std::vector<ExpectedColumn>& columns) {
     for (const ExpectedColumn& column : columns) {
@@ -103,7 +103,7 @@ inline void expectComparisons(rtoxa& request, std::size_t rowSize,
     EXPECT_EQ(0, compareColumn(request, "NOSUCH", row, OPER_NE, "x"));
 }
 
-/// The place of a virtual function in its table; both of a class's destructors take one.
+/// The slot of a function in the table of virtual functions; a destructor takes two slots.
 template <typename Function>
 std::size_t slotOf(Function function) {
     std::ptrdiff_t offset = 0;

@@ -334,7 +334,7 @@ TEST_F(RequestTable, AValueThatWasCutStillGetsItsAnswer) {
     EXPECT_EQ(3073u, taskQueue.front().getContext().length());
 }
 
-/// The process's code page while it exists.
+/// Sets the process's code page while it exists.
 class CodePage {
 public:
     explicit CodePage(const char* locale) : former_(::setlocale(LC_CTYPE, nullptr)) {
@@ -359,7 +359,7 @@ TEST_F(RequestTable, ARequestWhoseTextTheCodePageCutsIsQueuedWithoutAnAnswer) {
                       {"TRANSID", OPER_EQ, "tx"},
                       {"PRODUCT", OPER_EQ, product}});
     };
-    // The row has room for one byte per character and one more, its filter for all of them.
+    // The row has room for one byte per character and one more; the filter holds all bytes.
     const auto answered = ask("u\u00E9");
     ASSERT_EQ(1u, answered.size());
     EXPECT_EQ(padded("u\u00E9", 32), fieldText(answered[0].product));
@@ -422,7 +422,7 @@ TEST_F(RequestEvents, ReachEverySubscriberWhoseFilterWantsThem) {
     EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(rows, 2));
     EXPECT_EQ(3u, delivered_);
     EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(rows, 1));
-    EXPECT_EQ(5u, delivered_);  // rows given once are not given again
+    EXPECT_EQ(5u, delivered_);  // rows are not delivered twice
 }
 
 TEST_F(RequestEvents, ReturnTheLastRefusal) {
@@ -434,7 +434,7 @@ TEST_F(RequestEvents, ReturnTheLastRefusal) {
     EXPECT_EQ(3u, delivered_);
 }
 
-/// A table whose requests tell how often they were in use when a row was inserted.
+/// A table whose requests record how often they were in use when a row was inserted.
 class WatchedManager : public zav_kagreqt_manager {
 public:
     WatchedManager() : zav_kagreqt_manager("ZAV", "KAGREQT") {}

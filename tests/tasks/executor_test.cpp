@@ -1,4 +1,4 @@
-// Start-up of the task manager, the queue and the thread that works it off.
+// Start-up of the task manager, the queue, and the thread that runs the queued tasks.
 // ctest-label: threaded
 #include <gtest/gtest.h>
 #include <pthread.h>
@@ -40,8 +40,8 @@ std::string newScratchDepot() {
     return scratch.makeDir("depot");
 }
 
-/// Start-up while `request` is made again and again on several threads, each of which ends when its
-/// request is accepted. Returns every result that was not TASK_NOT_SUPPORTED.
+/// Runs start-up while several threads repeat `request` until it is accepted. Returns each thread's
+/// first result other than TASK_NOT_SUPPORTED.
 std::vector<TASK_RC> resultsDuringStartUp(const std::function<TASK_RC()>& request) {
     constexpr unsigned count = 3;
     std::atomic<unsigned> refused{0};
@@ -140,7 +140,7 @@ TEST_F(Executor, IsStartedOnce) {
 TEST_F(Executor, RequestsThatArriveDuringItsStartUpAreRefusedOrRun) {
     if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
     offerDepot();
-    const TraceCapture trace("ERROR");  // which there are many of
+    const TraceCapture trace("ERROR");  // keeps the many refusals off standard error
     Outcomes outcomes;
     const auto results = resultsDuringStartUp([] {
         TaskQueueElem task = request("START", "tx");
@@ -153,7 +153,7 @@ TEST_F(Executor, RequestsThatArriveDuringItsStartUpAreRefusedOrRun) {
 TEST_F(Executor, RequestsFindAllCommandsAsSoonAsTheyFindOne) {
     if (initialized) GTEST_SKIP() << "started by an earlier case of this process";
     offerDepot();
-    const TraceCapture trace("ERROR");  // which there are many of
+    const TraceCapture trace("ERROR");  // keeps the many refusals off standard error
     const auto results = resultsDuringStartUp([] {
         if (!isSupportedTask("START")) return TASK_NOT_SUPPORTED;
         return isSupportedTask("REMOVEINSTANCE") ? TASK_OK : TASK_INFORMATION;
@@ -356,7 +356,7 @@ TEST_F(Executor, AnOutcomeWithoutSubscribersIsLost) {
     TraceCapture trace;
     queueTask(request("START", "first"));
     queueTask(request("START", "second"));
-    ASSERT_TRUE(gate.awaitArrival());  // so the first one's outcome is out
+    ASSERT_TRUE(gate.awaitArrival());  // so the first outcome has been published
     Outcomes outcomes;
     gate.open();
     EXPECT_EQ((Texts{"second"}), transids(outcomes.waitFor(1)));

@@ -1,5 +1,5 @@
-/// Takes the place of all task handlers, so that the task manager can be watched without them. The
-/// definitions come before the library's: include this in one source of a test program only.
+/// Replaces all task handlers, to test the task manager without them. The linker takes these
+/// definitions before the library's: include this in only one source of a test program.
 #pragma once
 
 #include <functional>
@@ -16,10 +16,10 @@
 
 namespace fake_handlers {
 
-/// What runs in place of every handler: gets the handler's name and the task.
+/// Runs in place of every handler; gets the handler's name and the task.
 using Behaviour = std::function<TASK_RC(const std::string& handler, TaskQueueElem& task)>;
 
-// Immortal: an executor may still be running when the program ends.
+// Never destroyed: an executor may still be running when the program exits.
 inline std::mutex& guard = *new std::mutex;
 inline Behaviour& behaviour = *new Behaviour;
 inline std::vector<std::string>& recorded = *new std::vector<std::string>;
@@ -28,7 +28,7 @@ inline std::string narrow(const ZAV::String& text) {
     return static_cast<const char*>(text.c_str());
 }
 
-/// Forgets all calls; every handler succeeds from now on.
+/// Forgets all calls and lets every handler succeed.
 inline void reset() {
     const std::lock_guard<std::mutex> lock(guard);
     recorded.clear();

@@ -35,7 +35,7 @@ protected:
         TaskQueueElem task = taskFor(context, optional, product);
         return outcomeOf(task, install(task));
     }
-    /// Makes the installer a program that writes down how it was called; returns its command.
+    /// Creates an installer that records its arguments. Returns its command.
     std::string installer(const std::string& body) const {
         return home_.program(kInstaller, body) + " -q";
     }
@@ -297,8 +297,8 @@ TEST_F(Install, OnlyPatchesOfTwoProductsAreReadWithoutBlocking) {
     }
 }
 
-/// An installer that leaves a process behind, which keeps the pipes open and writes nothing. The
-/// script's name in the arguments has the output read after the installer's end only.
+/// An installer that leaves a process behind, which keeps the pipes open and writes nothing. With
+/// the agent script's name in its arguments, its output is read only after it has ended.
 class InstallThatLeavesAProcess : public InstallTest {
 protected:
     using Clock = std::chrono::steady_clock;
@@ -348,7 +348,7 @@ TEST_F(InstallWithRestart, ReportsSuccessBeforeItRuns) {
     home_.dir().write("depot/rc.txt", "7\n");
     EXPECT_EQ(kSuccess, run(command, "REQUIRES_RESTART"));
 
-    // Five seconds for the restart to be told of, and the one that paces status rows.
+    // Five seconds before the outcome is published, and one that paces the rows.
     EXPECT_THAT(fake_sleep::slept(), ElementsAre(5u, 1u));
     const std::vector<std::string> details = trace_.details();
     const auto at = [&](const std::string& text) {

@@ -23,7 +23,7 @@ protected:
     static std::string line(const std::string& product, const std::string& platform) {
         return TaskHome::listLine(product, platform);
     }
-    /// What the command runner was asked to run.
+    /// The command lines that were run.
     std::vector<std::string> commands() const {
         const std::string begin = "Command to run is \"";
         std::vector<std::string> found;

@@ -1,5 +1,5 @@
-// What the task manager says and does when its lock, its condition or its thread fail. The
-// definitions below come before the C library's, in this program only.
+// What the task manager does and traces when its mutex, its condition or its thread fails. The
+// definitions below replace the C library's in this program.
 #include <dlfcn.h>
 #include <gtest/gtest.h>
 #include <pthread.h>
@@ -20,7 +20,7 @@
 
 namespace {
 
-/// The error that the next call of one function on the task manager's own objects returns, once.
+/// The error that the next call of a function on the task manager's objects returns, once.
 struct Failure {
     std::atomic<int> error{0};
     int take() { return error.exchange(0); }
@@ -28,7 +28,8 @@ struct Failure {
 
 Failure mutexInit, condInit, threadCreate, mutexLock, mutexUnlock, condSignal, condWait;
 
-/// Condition variables have an older version beside their own in 32-bit C libraries.
+/// 32-bit C libraries have two versions of the functions for condition variables; takes the new
+/// ones.
 template <typename Function>
 Function* original(const char* name) {
     void* found = ::dlvsym(RTLD_NEXT, name, "GLIBC_2.3.2");
@@ -69,7 +70,7 @@ int pthread_mutex_lock(pthread_mutex_t* mutex) noexcept {
     return error != 0 ? error : next(mutex);
 }
 
-/// A failing unlock unlocks nevertheless, since nothing could go on otherwise.
+/// A failing unlock unlocks all the same; otherwise nothing could go on.
 int pthread_mutex_unlock(pthread_mutex_t* mutex) noexcept {
     static auto* const next = original<decltype(pthread_mutex_unlock)>("pthread_mutex_unlock");
     const int error = isTheQueues(mutex) ? mutexUnlock.take() : 0;
@@ -108,7 +109,7 @@ protected:
         return TaskQueueElem("node", transid, "START", "ux", "", "INSTANCE", "", "", "", "i");
     }
 
-    /// Starts the executor and waits until it waits for work itself.
+    /// Starts the executor and waits until it is waiting for work.
     static void startExecutor() {
         zav_taskmgr_init();
         Outcomes outcomes;
@@ -184,7 +185,7 @@ TEST_F(QueueFailures, TheExecutorTriesAgainWhenItCannotLock) {
     Outcomes outcomes;
     TraceCapture trace;
     mutexLock.error = EINVAL;
-    // Whoever locks next gets the error: let that be the executor, woken for nothing.
+    // The next thread to lock gets the error. Wake the executor, so that it is the one.
     pthread_cond_broadcast(&worktodo);
     awaitError(trace, "Failed to lock queue mutex, return code 22");
     queueTask(request("tx"));
@@ -208,7 +209,7 @@ TEST_F(QueueFailures, ATaskWhoseUnlockFailsIsSkipped) {
     TraceCapture trace;
     pthread_mutex_lock(&queue_mutex);
     taskQueue.push(request("skipped"));
-    mutexUnlock.error = EPERM;  // for the executor: this thread's own unlock is the original one
+    mutexUnlock.error = EPERM;  // for the executor; this thread calls the original function
     static auto* const unlock = original<decltype(pthread_mutex_unlock)>("pthread_mutex_unlock");
     pthread_cond_signal(&worktodo);
     unlock(&queue_mutex);

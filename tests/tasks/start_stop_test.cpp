@@ -27,7 +27,7 @@ protected:
     StartStop() : path_(home_.path()) { ZAV_TOVRINHOME = path_.c_str(); }
     ~StartStop() override { ZAV_TOVRINHOME = nullptr; }
 
-    /// Records users in the run-as database; `agents` are its agent elements.
+    /// Writes the run-as database; `agents` are its agent elements.
     void runAs(const std::string& agents) {
         const std::string host = static_cast<const char*>(ZAV::Util::getHostName().c_str());
         home_.files().write("home/config/" + host + "_zavrunas.cfg",
@@ -41,7 +41,7 @@ protected:
                user + "</user>\n\t\t</instance>\n\t</agent>\n";
     }
 
-    /// The plain command line: `options` stand between the home and the verb.
+    /// The plain command line, with `options` between the home and the verb.
     std::string scriptLine(const std::string& options) const {
         return path_ + "/bin/TovrinAgent  -h " + path_ + " " + options;
     }

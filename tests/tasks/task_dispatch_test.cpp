@@ -1,5 +1,5 @@
-// Which requests are accepted, what they are answered and which handler gets them. No executor
-// runs here: what is queued stays in the queue.
+// Which requests are accepted, what the answers are and which handler is called. No executor runs
+// here, so queued tasks stay in the queue.
 #include <gtest/gtest.h>
 
 #include <stdexcept>

@@ -1,4 +1,4 @@
-/// A home and a depot of a test's own, with programs that write down how they were called.
+/// A scratch home and depot for one test, with programs that record how they were called.
 #pragma once
 
 #include <sys/stat.h>
@@ -21,7 +21,7 @@ inline std::string narrow(const ZAV::String& text) {
     return std::string(static_cast<const char*>(text.c_str()));
 }
 
-/// What a task's reply says about how it ended.
+/// The result in a task's reply.
 struct Outcome {
     int rc;
     std::string messageId;
@@ -50,12 +50,12 @@ inline Outcome outcomeOf(TaskQueueElem& task, int rc) {
 
 inline const Outcome kSuccess{0, "", ""};
 
-/// The number of descriptors that this process has open.
+/// The number of open descriptors of this process.
 inline std::ptrdiff_t openDescriptors() {
     return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
 }
 
-/// An environment variable that is set while this exists.
+/// Sets an environment variable while it exists.
 class ScopedEnv {
 public:
     ScopedEnv(const char* name, const char* value) : name_(name) {
@@ -94,8 +94,8 @@ public:
     const std::string& depot() const { return depot_; }
     const ScratchDir& dir() const { return dir_; }
 
-    /// A program of the home that writes down its arguments, its standard input and the settings
-    /// for consoles, and then does what `body` says. Returns its path.
+    /// Creates a program in the home that records its arguments, its standard input and the
+    /// settings for consoles, and then runs `body`. Returns its path.
     std::string program(const std::string& relative, const std::string& body) const {
         return dir_.script("home/" + relative,
                            "{ printf '[%s]' \"$@\"; echo; } >> \"$0.calls\"\n"
@@ -108,7 +108,7 @@ public:
         return dir_.write("home/" + relative, "#!/bin/sh\n", 0644);
     }
 
-    /// One text for each call of a program, such as "[-p][ux]".
+    /// The calls of a program, each as a text such as "[-p][ux]".
     std::vector<std::string> calls(const std::string& relative) const {
         std::vector<std::string> found;
         std::istringstream in(dir_.read("home/" + relative + ".calls"));
@@ -116,11 +116,11 @@ public:
             found.push_back(line);
         return found;
     }
-    /// What all calls of a program together read from their standard input.
+    /// Everything that all calls of a program have read from standard input.
     std::string input(const std::string& relative) const {
         return dir_.read("home/" + relative + ".input");
     }
-    /// The settings that the last call of a program was given.
+    /// The settings passed to the last call of a program.
     std::vector<std::string> environment(const std::string& relative) const {
         std::vector<std::string> found;
         std::istringstream in(dir_.read("home/" + relative + ".env"));
@@ -129,7 +129,7 @@ public:
         return found;
     }
 
-    /// An inventory program that prints `list` for "-d" and `report` for "-p".
+    /// Creates an inventory program that prints `list` for "-d" and `report` for "-p".
     void inventory(const std::string& list, const std::string& report = "") const {
         dir_.write("home/list.txt", list);
         dir_.write("home/report.txt", report);
@@ -145,7 +145,8 @@ public:
 
     static constexpr const char* kTranslator = "agtqvs6/li6263/bin/zav_xa";
 
-    /// An inventory with the shared component, and the translator in it. Returns its path.
+    /// Creates an inventory with the shared component, and a translator in that. Returns the
+    /// translator's path.
     std::string translator(const std::string& body) const {
         inventory(listHeader() + listLine("lz", "li6263") + listLine("ax", "li6263") +
                   listLine("ux", "li6263"));

@@ -14,7 +14,7 @@ using testing::IsEmpty;
 using testing::IsSupersetOf;
 using ZAV::String;
 
-// The definition in the program comes before the C library's, so that changing a mode can fail.
+// This definition replaces the C library's, so that changing a mode can fail.
 namespace {
 bool changingModesFails = false;
 }  // namespace
@@ -32,7 +32,7 @@ namespace {
 constexpr const char* kConsole = "bin/um_console";
 constexpr const char* kAgent = "bin/TovrinAgent";
 
-/// What a request asks for.
+/// The values of a request.
 struct Request {
     std::string metafile = "app.mdl";
     std::string scripts = "";
@@ -76,11 +76,11 @@ protected:
     void startupParameters(const std::string& content) const {
         home_.dir().write("home/config/.ConfigData/kumenv", content);
     }
-    /// A console that does what `body` says; "$verb" is what it is to do.
+    /// Creates a console that runs `body` with its verb in "$verb".
     void console(const std::string& body) const {
         home_.program(kConsole, "verb=${4%% *}\n" + body);
     }
-    /// A console whose metafiles are of one type.
+    /// Creates a console for which all metafiles are of one type.
     void consoleWithType(const std::string& type) const {
         console("[ $verb != getdptype ] || printf '" + type + "'");
     }

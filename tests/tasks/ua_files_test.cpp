@@ -16,7 +16,7 @@ using testing::SizeIs;
 using ZAV::String;
 using ZAV::StrStrMap;
 
-// The definition in the program comes before the C library's, so that removing a file can fail.
+// This definition replaces the C library's, so that removing a file can fail.
 namespace {
 bool removingFails = false;
 bool directoryTakesItsPlace = false;
@@ -138,7 +138,7 @@ TEST_F(PairsOfFile, AreNoneInAFileThatIsEmptyOrMissing) {
 
 class StartupParms : public UaFiles {
 protected:
-    /// Changes a file that holds `content`; returns what it holds then.
+    /// Changes a file with `content`. Returns its content afterwards.
     std::string changed(const std::string& content, const char* parms, const char* instance) {
         const std::string file = home_.dir().write("home/kumenv", content);
         EXPECT_EQ(1, changeUaStartupParms(file.c_str(), parms, instance));
@@ -212,7 +212,7 @@ TEST_F(StartupParms, AreLeftAloneWhenTheCopyCannotBeWritten) {
 }
 
 TEST_F(StartupParms, StayInTheCopyWhenThePathHasNoDirectory) {
-    // A relative path is the only one without a directory that a test may write to.
+    // Only a relative path has no directory part and is still writable for a test.
     const std::string before = std::filesystem::current_path();
     std::filesystem::current_path(home_.home());
     home_.dir().write("home/kumenv", "A|DATAPROVIDER|1|\n");

@@ -21,7 +21,7 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using ZAV::String;
 
-// The definitions in the program come before the C library's, so that streams can be made to fail.
+// These definitions replace the C library's, so that streams can be made to fail.
 namespace {
 int reportedStreamError = 0;
 bool closingFails = false;
@@ -262,7 +262,7 @@ TEST_F(WholeFile, AFileThatMayNotGrowIsReported) {
 TEST_F(WholeFile, CharactersOfSeveralBytesAreKeptWhole) {
     ::setenv("LC_ALL", "C.UTF-8", 1);
     ASSERT_TRUE(String::initialize());
-    // The two bytes of an umlaut lie on both sides of a block of 1024 bytes.
+    // A block of 1024 bytes ends between the two bytes of an umlaut.
     const std::string text = sampleText(1023) + "\xC3\xA4\xE2\x82\xAC\xF0\x9F\x98\x80 end\n";
     const String read = readFile(written("f", text));
     EXPECT_EQ(1023u + 2u + 2u + 5u, read.length());

@@ -1,4 +1,4 @@
-// Requests all the way through the executor, the real handlers and the programs of a scratch home.
+// Requests that pass through the executor, the real handlers and the programs of a scratch home.
 // ctest-label: threaded
 #include "tasks/zavtasks.h"
 
@@ -21,7 +21,7 @@ namespace {
 
 using Texts = std::vector<std::string>;
 
-/// One home for all cases of the process: what start-up finds out once stays.
+/// One home for all cases of the process, because start-up determines its directories only once.
 struct ManagedHome : ScriptHome {
     ManagedHome() {
         static std::string& kept = *new std::string(path());
@@ -54,7 +54,7 @@ protected:
                              "062000000", target);
     }
 
-    /// Runs an accepted request; its one outcome.
+    /// Runs a request that is accepted. Returns its one outcome.
     zav_kagdyst_data_t outcomeOf(TaskQueueElem task) {
         Outcomes outcomes(
             {{"TRANSID", OPER_EQ, static_cast<const char*>(task.getTransid().c_str())}});

@@ -28,7 +28,7 @@ TaskQueueElem sample() {
     return task;
 }
 
-/// The row's bytes as they lie in memory.
+/// The row's bytes in memory.
 template <typename Row>
 std::string bytes(const Row& row) {
     return std::string(reinterpret_cast<const char*>(&row), sizeof row);
@@ -38,7 +38,7 @@ std::string integerBytes(int value) {
     return std::string(reinterpret_cast<const char*>(&value), sizeof value);
 }
 
-/// The widths at which values were cut, in the order of the fields' writing.
+/// The widths to which values were truncated, in the order in which the fields are written.
 std::vector<int> widthsOfCuts(const TraceCapture& trace) {
     const std::string before = "exceeded the maximum size of ";
     std::vector<int> widths;

@@ -52,7 +52,7 @@ private:
     std::set<int> descriptors_ = child_role::openDescriptors();
 };
 
-/// Errors of a run that was killed; the ids of its process are left out.
+/// The error lines of a run that was killed, without process ids.
 std::vector<std::string> withoutNumbers(std::vector<std::string> texts) {
     for (std::string& text : texts)
         text.erase(text.find_last_not_of("0123456789-") + 1);
@@ -201,7 +201,7 @@ TEST_F(CommandRunner, EachChunkIsConvertedOnItsOwn) {
     const ScopedEnv locale("LC_ALL", "C.UTF-8");
     ASSERT_TRUE(String::initialize());
     const ScratchDir scratch;
-    // The two bytes of a character lie on both sides of the end of a chunk; neither is one alone.
+    // A chunk ends between the two bytes of a character; neither byte is a character by itself.
     const std::string before(16383, 'x');
     const Outcome outcome = run("/bin/cat " + scratch.write("f", before + "\xC3\xA9z"));
     ASSERT_EQ(16383u + 3u, outcome.out.length());
@@ -230,7 +230,7 @@ TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
     EXPECT_EQ("begun\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
-    // Also when the time was up while the output was read, and nobody had begun to wait.
+    // Also when the time-out passed while output was read, before waiting had begun.
     EXPECT_THAT(withoutNumbers(traces.details("zavprnix")),
                 testing::Contains("Waiting for process id: "));
 }

@@ -54,7 +54,7 @@ TEST(CommandThreads, ALongCommandHoldsNobodyUp) {
         String out, err;
         EXPECT_TRUE(Util::runCommand("/bin/echo x", rc, out, err, String(), false));
     }
-    // The pipes of the slow command's child are not held by these, nor theirs by it.
+    // These commands do not inherit the slow command's pipes, nor does it inherit theirs.
     EXPECT_LT(watch.seconds(), 1.8);
     slow.join();
 }

@@ -1,5 +1,5 @@
 // ctest-label: threaded
-// Making directory trees.
+// Creating directory trees.
 #include <dlfcn.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -24,7 +24,7 @@ constexpr bool kMallocIsOurs = true;
 
 /// The next allocation of exactly this many bytes fails.
 std::atomic<std::size_t> failingAllocation{0};
-/// The next mkdir finds that somebody else has just made the directory.
+/// The next mkdir finds that another process has just created the directory.
 std::atomic<bool> somebodyIsFaster{false};
 
 }  // namespace

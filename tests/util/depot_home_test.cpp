@@ -1,4 +1,4 @@
-// Where the central server keeps its package depot.
+// Finding the central server's package depot.
 
 #include <chrono>
 #include <string>
@@ -18,14 +18,14 @@ class DepotHome : public ::testing::Test {
 protected:
     DepotHome() { scratch.write("config/.ConfigData/kmsenv", "SRV|CELLNAME|x|\n"); }
 
-    /// Asks for the depot home of the scratch directory and keeps what it is.
+    /// Asks for the depot home of the scratch directory and stores the answer.
     int find(bool addPackages = false, bool create = false) {
         String dir((scratch.path() + "/").c_str());
         const int rc = Util::getDepotHome(dir, addPackages, create);
         found = static_cast<const char*>(dir.c_str());
         return rc;
     }
-    /// Traced by the search itself.
+    /// The lines traced by the search itself.
     std::vector<std::string> own(char level) const {
         std::vector<std::string> texts;
         for (const TraceLine& line : traces.lines()) {
@@ -151,7 +151,7 @@ TEST_F(DepotHome, MissingConfigurationIsReportedInTheCommandsWords) {
 }
 
 TEST_F(DepotHome, LongErrorMessageIsReadWhole) {
-    // Every word of a home with blanks in it is a file of its own to the command.
+    // To the command each word of a home with blanks is a separate file.
     std::string words;
     for (int i = 0; i < 200; ++i)
         words += "/none" + std::to_string(i) + " ";
@@ -165,7 +165,7 @@ TEST_F(DepotHome, LongErrorMessageIsReadWhole) {
 
 TEST_F(DepotHome, CommandThatRunsPastTheTimeOutGivesNoName) {
     const ScopedEnv noTime("TIMEOUT", "0");
-    // The home's text becomes part of the command, which keeps its pipes open for a while.
+    // The home becomes part of the shell command; this one keeps the pipes open for a while.
     String dir((scratch.path() + "/none; sleep 5 #").c_str());
     const auto start = std::chrono::steady_clock::now();
     EXPECT_EQ(Util::getDepotHome(dir, false, false), 2);

@@ -16,12 +16,12 @@
 
 namespace {
 
-/// Whether the base services know of no variable at all.
+/// While set, the base services report every variable as unset.
 std::atomic<bool> baseServicesAreBlind{false};
 
 }  // namespace
 
-// Stands in front of the platform's.
+// Replaces the platform's function.
 const char* BSS1_GetEnv(const char* name, const char* fallback) {
     const char* const value = baseServicesAreBlind ? nullptr : std::getenv(name);
     return value != nullptr ? value : fallback;

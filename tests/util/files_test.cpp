@@ -17,11 +17,11 @@
 
 namespace {
 
-/// What the next system calls of that kind report instead of doing their work; 0 = nothing.
+/// The errors that the next calls of each kind report without doing their work; 0 for none.
 struct Faults {
     int interruptedReads = 0;
     int interruptedWrites = 0;
-    int failingClose = 0;  ///< the one of that number fails, counting from 1
+    int failingClose = 0;  ///< the number of the close that fails, counting from 1
     bool shortWrites = false;
 };
 Faults faults;
@@ -337,7 +337,7 @@ TEST_F(Files, CopyThatCannotBeginReportsThatAndNotTheCloseAfterIt) {
     EXPECT_EQ(traces.errors("zavutil").size(), 2u);
 }
 
-// Without a capture, whose own writes would meet the faults first.
+// Without a trace capture, because its own writes would fail first.
 TEST(InterruptedFiles, CopyThatIsInterruptedOrTakesLittleAtATimeIsExact) {
     const ScratchDir scratch;
     const std::string content(20000, 'x');

@@ -1,4 +1,4 @@
-// Paths and values as they come out of scripts and environments.
+// Cleaning paths and values that come from scripts and the environment.
 #include <string>
 
 #include "support/scratch_dir.h"

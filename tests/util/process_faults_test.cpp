@@ -1,8 +1,7 @@
-// What becomes of a command when the system refuses what it takes to run it. The program's own
-// definitions below come before the C library's and the platform's; they fail on request and pass
-// everything else on.
+// Commands when the system calls that run them fail. The definitions below replace those of the C
+// library and the platform; they fail on request and otherwise call the original.
 //
-// vfork cannot be passed on from a function, so children are made with fork here.
+// A function cannot wrap vfork, so children are created with fork here.
 
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -33,9 +32,9 @@
 
 namespace {
 
-/// What fails next. Shared with the child, which is a copy.
+/// What fails next. The child inherits a copy.
 struct Faults {
-    int pipeCall = 0;  // this one of the coming calls fails
+    int pipeCall = 0;  // the number of the next call to fail, counting from 1
     bool vfork = false;
     int dup2Onto = -1;
     bool kill = false;
@@ -47,14 +46,14 @@ struct Faults {
     bool pidfd = false;
     int fetchError = 0;
     int deleteError = 0;
-    bool interruptions = false;  // every other call of what is interruptible
-    int allocation = 0;          // this one of the coming allocations fails
+    bool interruptions = false;  // every other interruptible call fails with EINTR
+    int allocation = 0;          // the number of the next allocation to fail, counting from 1
 };
 Faults faults;
 
 thread_local bool interruptedBefore = false;
 
-/// Whether this call is to be interrupted; never twice in a row.
+/// Whether to interrupt this call; never twice in a row.
 bool interrupted() {
     if (!faults.interruptions) return false;
     interruptedBefore = !interruptedBefore;
@@ -163,7 +162,7 @@ ssize_t write(int fd, const void* buffer, std::size_t size) {
     return interrupted() ? -1 : ::syscall(SYS_write, fd, buffer, size);
 }
 
-/// Only the close of a pipe may be tried again after an interruption.
+/// Only closing a pipe may be repeated after an interruption.
 int close(int fd) {
     struct stat info {};
     const bool isPipe = faults.interruptions && ::fstat(fd, &info) == 0 && S_ISFIFO(info.st_mode);

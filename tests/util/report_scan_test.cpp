@@ -79,7 +79,7 @@ TEST(SplitFields, BeginsWhereItIsTold) {
 }
 
 TEST(SplitFields, UnitsBeyondAsciiAreNeverDelimiters) {
-    // 0x012C ends in the byte of a comma.
+    // The low byte of 0x012C is a comma.
     const unsigned short units[] = {'a', 0x012C, 'b', ',', 'c', 0};
     const std::vector<String> fields = splitFields(String(units), ",");
     ASSERT_EQ(2u, fields.size());

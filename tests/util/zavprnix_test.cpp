@@ -1,4 +1,4 @@
-// A command's process: how it is started, what it finds, how it is waited for.
+// A command's process: starting it, its environment, and waiting for it.
 
 #include <fcntl.h>
 #include <signal.h>
@@ -380,7 +380,7 @@ TEST(ProcessWait, AChildThatLeadsAGroupTakesItAlong) {
     const TimeoutSetting timeout("1");
     const ScratchDir scratch;
     const std::string file = scratch.path("pid");
-    // setsid in a child that leads no group makes it the leader of its own.
+    // A child that leads no process group becomes the leader of its own by setsid.
     const std::string command =
         "/usr/bin/setsid /bin/sh -c 'sleep 60 & echo $! >" + file + "; wait'";
     Process process(String(command.c_str()));

@@ -139,7 +139,7 @@ TEST(UserToken, AnUnknownGroupIsTheUsersOwnOnlyWhereAGroupNobodyExists) {
     const bool hasNobody = ::getgrnam("nobody") != nullptr;
     const std::uint32_t primary = ::getpwnam("daemon")->pw_gid;
     EXPECT_EQ(hasNobody ? primary : 65533u, token("daemon", "no-such-group-here")->gid);
-    // Without a user there is no entry to take a group from.
+    // Without a user there is no entry that has a group.
     EXPECT_EQ(65533u, token(nullptr, "no-such-group-here")->gid);
 }
 
