@@ -140,14 +140,6 @@ TEST_F(TaskDispatch, ASupportedCommandIsTraced) {
     EXPECT_TRUE(trace.errors().empty());
 }
 
-TEST_F(TaskDispatch, SupportedTasksAreFoundInTheList) {
-    EXPECT_TRUE(isSupportedTask("REMOVEINSTANCE"));
-    EXPECT_FALSE(isSupportedTask("removeinstance"));
-    EXPECT_FALSE(isSupportedTask(""));
-    commands.push_back("EXTRA");
-    EXPECT_TRUE(isSupportedTask("EXTRA"));
-}
-
 // ---- Required parameters ------------------------------------------------------------------------
 
 struct Missing {
@@ -213,27 +205,6 @@ TEST_F(TaskDispatch, OnlyTheRequiredParametersAreRequired) {
     run("SETCONFIG", "um", "", "", "");
     run("SETCONFIG", "UM", "", "", "");
     run("REMOVEINSTANCE", "ux", "", "", "t");
-}
-
-TEST_F(TaskDispatch, RequiredParameterKeepsTheCurrentCode) {
-    TaskQueueElem task = complete("START");
-    task.setRetmsgid("kept");
-    TraceCapture trace;
-    EXPECT_EQ(TASK_NO_COMMAND,
-              requiredParameterOk("X", "value", task, TASK_NO_COMMAND, TASK_NO_TRANSID));
-    EXPECT_TRUE(trace.errors().empty());
-    task.ReturnStatus(0);
-    EXPECT_EQ("kept", trimmedField(answer(task).retmsgid));
-}
-
-TEST_F(TaskDispatch, RequiredParameterReplacesCodeAndMessage) {
-    TaskQueueElem task = complete("START");
-    task.setRetmsgid("old");
-    task.setRetmsgparm("old");
-    EXPECT_EQ(TASK_NO_TRANSID,
-              requiredParameterOk("X", "", task, TASK_NO_COMMAND, TASK_NO_TRANSID));
-    task.ReturnStatus(1002);
-    expectAnswer(task, 1002, "ZAV1002E", "");
 }
 
 // ---- The universal agent ------------------------------------------------------------------------
