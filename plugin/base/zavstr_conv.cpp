@@ -1,4 +1,4 @@
-// String: conversion from and to the process's code page, and what rests on it.
+// String: conversion from and to the process's code page, and the functions that depend on it.
 
 #include <algorithm>
 #include <cerrno>
@@ -16,22 +16,22 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavstr"};
 
-/// One thread at a time opens the locale. Never destroyed: texts are converted until the process
-/// is gone.
+/// Held while a thread opens the locale. Never destroyed, because texts are converted until the
+/// process has exited.
 std::mutex& localeMutex() {
     static std::mutex& mutex = *new std::mutex;
     return mutex;
 }
 
-/// The bytes of `text`, its terminator included.
+/// The number of bytes of `text`, including its terminator.
 std::uint32_t countBytes(const char* text) {
     const std::size_t count = std::strlen(text) + 1;
     if (count > UINT32_MAX) throwArrayTooLong();
     return static_cast<std::uint32_t>(count);
 }
 
-/// Converts `n` bytes, the last of them the terminator, to at most `n` units; returns how many
-/// there are before the terminator, which stands there whatever the conversion left.
+/// Converts `n` bytes, including the terminator, to at most `n` units. Returns the number of units
+/// before the terminator. The result is always terminated, whatever the conversion left.
 std::uint32_t convertToUnits(NLS2_LOCALE* locale, const char* text, std::uint32_t n,
                              unsigned short* out) {
     int status = NLS2_OK;
@@ -77,8 +77,8 @@ bool String::initializeLocked() {
     NLS2_LOCALE* locale = NLS2_GetLocale(NLS2_BY_DEFAULT, 0, 0, &status);
     const int codepage = NLS2_GetLocaleCodepageId(locale, &status);
     trace().detail("codepage=%d", codepage);
-    // Two code pages are widened to their supersets, on purpose without releasing the locale that
-    // the process has.
+    // Two code pages are replaced by their supersets. The locale opened first is not released, on
+    // purpose.
     if (codepage == NLS2_CP943) {
         trace().detail("codepage NLS2_CP943 detected, switching to NLS2_CP932");
         locale = NLS2_GetLocale(NLS2_BY_CODEPAGE, NLS2_CP932, 0, &status);
@@ -90,8 +90,8 @@ bool String::initializeLocked() {
     return trace.exit(locale != nullptr);
 }
 
-/// The locale to convert with, opened by the first thread that asks; null when there is none, and
-/// then the next conversion tries again.
+/// The locale for conversions. The first thread that asks opens it. Returns null when there is
+/// none; the next conversion then tries again.
 NLS2_LOCALE* String::localeForConversion() {
     if (!_initialized.load(std::memory_order_acquire)) {
         const std::lock_guard<std::mutex> lock(localeMutex());
@@ -132,8 +132,8 @@ String& String::assign(const char* text, std::uint32_t n) {
 
 CharStar String::c_str() const {
     const Trace trace(traceUnit);
-    // Room for one byte per unit, so text that needs more is cut; the byte beyond it holds the
-    // terminator when the text takes all of the room.
+    // Room for one byte per unit, so a text that needs more is truncated. One more byte holds the
+    // terminator when the text fills all of that.
     const std::uint32_t n = units_.getSize();
     std::unique_ptr<char[]> buffer(new char[std::size_t{n} + 1]);
     int status = NLS2_OK;
@@ -185,7 +185,7 @@ bool String::convertToInt(const String& s, int* out) {
         trace().error("Can't convert, buffer is not number: %s", digits);
         return trace.exit(false);
     }
-    // Both extremes are refused: strtol yields them for numbers beyond them too.
+    // Refuses both extremes, because strtol also returns them for numbers that are out of range.
     if (value >= INT_MAX || value <= INT_MIN) {
         trace().error("Can't convert, number is too large: %s", digits);
         return trace.exit(false);
