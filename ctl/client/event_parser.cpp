@@ -3,8 +3,8 @@
 namespace ctl {
 namespace {
 
-/// The value of "name: value" if the line's name is that; one blank after the colon is not part of
-/// the value.
+/// Takes the value of a line "name: value" if it has this name. A blank after the colon is not part
+/// of the value.
 bool takeField(const std::string& line, const std::string& name, std::string& value) {
     if (line.compare(0, name.size(), name) != 0) return false;
     if (line.size() == name.size()) {

@@ -11,10 +11,10 @@ struct ServerEvent {
     std::string data;
 };
 
-/// Takes the stream's bytes in pieces of any size.
 class EventParser {
 public:
-    /// The events that are complete with these bytes.
+    /// Takes the next bytes of the stream, as many or few as there are. Returns the events that are
+    /// complete with them.
     std::vector<ServerEvent> feed(const char* bytes, std::size_t length);
 
 private:

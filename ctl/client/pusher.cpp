@@ -5,6 +5,7 @@
 
 #include <cerrno>
 #include <cstring>
+#include <utility>
 
 #include "ctl/client/failure.h"
 
@@ -31,29 +32,8 @@ private:
 
 }  // namespace
 
-bool wasTaken(const PushedFile& file) {
-    return file.worst.fault == 0 && file.worst.status == 0;
-}
-
-std::string statusText(const TransferAnswer& answer) {
-    if (answer.fault != 0) return rpc::faultText(answer.fault);
-    switch (answer.status) {
-        case 0:
-            return "done";
-        case 1:
-            return "the host has no usable depot directory";
-        case 3:
-            return "the name is too long";
-        case 4:
-            return "the host could not open the file";
-        case 5:
-            return "the host could not write the file";
-        case 6:
-            return "the host could not make the file's directory";
-        default:
-            return "the host answered with status " + std::to_string(answer.status);
-    }
-}
+Pusher::Pusher(const HostAddress& host, OnAnswer onAnswer)
+    : client_(host.rpcSocket, host.timeout), onAnswer_(std::move(onAnswer)) {}
 
 void Pusher::push(PushedFile& file) {
     const OpenFile input(file.source);
@@ -65,10 +45,10 @@ void Pusher::push(PushedFile& file) {
         client_.send(file.name, first, batch_);
         onTheirWay_.push_back({&file, length});
         // A file whose beginning was refused must not be appended to.
-        awaitAnswers(first && length == kFull ? 0 : kMostOnTheirWay);
-        if (file.worst.fault != 0 || file.worst.status != 0) break;
+        awaitAnswers(first && length == ChunkBatch::kMostData ? 0 : kMostOnTheirWay);
+        if (!file.wasTaken()) break;
         first = false;
-    } while (length == kFull);
+    } while (length == ChunkBatch::kMostData);
 }
 
 void Pusher::awaitAnswers(std::size_t remaining) {
@@ -76,14 +56,13 @@ void Pusher::awaitAnswers(std::size_t remaining) {
         const TransferAnswer answer = client_.receive();
         const Sent sent = onTheirWay_.front();
         onTheirWay_.pop_front();
-        const bool taken = answer.fault == 0 && answer.status == 0;
         PushedFile& file = *sent.file;
-        if (taken) {
+        if (answer.isSuccess()) {
             file.sent += sent.length;
-        } else if (file.worst.fault == 0 && file.worst.status == 0) {
+        } else if (file.wasTaken()) {
             file.worst = answer;
         }
-        progress_.add(sent.length);
+        if (onAnswer_) onAnswer_(sent.length);
     }
 }
 

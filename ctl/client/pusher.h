@@ -3,45 +3,32 @@
 
 #include <cstdint>
 #include <deque>
-#include <filesystem>
-#include <string>
+#include <functional>
 
-#include "ctl/client/options.h"
+#include "ctl/client/host_address.h"
+#include "ctl/client/pushed_file.h"
 #include "ctl/client/transfer_client.h"
-#include "ctl/show/transfer_progress.h"
 
 namespace ctl {
 
-/// A file on its way, and what became of it.
-struct PushedFile {
-    std::filesystem::path source;
-    std::string name;  ///< relative to the depot
-    std::uintmax_t size = 0;
-    std::uintmax_t sent = 0;
-    TransferAnswer worst;  ///< the first batch that was not taken
-};
-
-/// Whether the host took all of it, as far as is known.
-bool wasTaken(const PushedFile& file);
-
-/// What the host says of a batch, in words.
-std::string statusText(const TransferAnswer& answer);
-
-/// Sends files one behind the other over one association. Several batches are on their way at a
-/// time, so that the host never waits for the next one.
+/// Sends files one after the other over one association. Several batches are on their way at a
+/// time, so that the host never waits for the next one. Operations throw Failure when a file cannot
+/// be read and as TransferClient does.
 class Pusher {
 public:
-    Pusher(const Options& options, Progress& progress)
-        : client_(options.rpcSocket, options.timeout()), progress_(progress) {}
+    /// Called with the number of bytes of each batch that the host has answered.
+    using OnAnswer = std::function<void(std::uintmax_t bytes)>;
 
-    /// Sends a file; what becomes of it is known after finish().
+    /// Connects to the host.
+    explicit Pusher(const HostAddress& host, OnAnswer onAnswer = {});
+
+    /// Sends a file. It must live until finish(): its result is filled in as answers come.
     void push(PushedFile& file);
     /// Waits for the answers that are still to come.
     void finish() { awaitAnswers(0); }
 
 private:
-    static constexpr std::size_t kFull = ChunkBatch::kMostChunks * 4096;
-    // Small enough that the answers of all of them fit into the socket's buffer.
+    // Small enough that the answers to all of them fit into the socket's buffer.
     static constexpr std::size_t kMostOnTheirWay = 64;
 
     struct Sent {
@@ -52,8 +39,8 @@ private:
     void awaitAnswers(std::size_t remaining);
 
     TransferClient client_;
+    OnAnswer onAnswer_;
     ChunkBatch batch_;
-    Progress& progress_;
     std::deque<Sent> onTheirWay_;
 };
 

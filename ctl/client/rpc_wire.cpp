@@ -1,7 +1,6 @@
 #include "ctl/client/rpc_wire.h"
 
 #include <algorithm>
-#include <cstdio>
 #include <utility>
 
 namespace ctl::rpc {
@@ -96,8 +95,8 @@ std::vector<unsigned char> bindPacket(std::uint32_t callId) {
 
 bool parseBindAck(const std::vector<unsigned char>& body, bool littleEndian,
                   std::uint16_t& largestFragment) {
-    // max_xmit, max_recv, group; the length of the secondary address and the address; aligned to 4
-    // (as is the header before it) the number of results, three reserved bytes, the result.
+    // max_xmit, max_recv, group; length of the secondary address and the address itself; aligned
+    // to 4 bytes: the number of results, three reserved bytes, the first result.
     if (body.size() < 10) return false;
     largestFragment = number16(body.data() + 2, littleEndian);
     const std::size_t address = number16(body.data() + 8, littleEndian);
@@ -128,24 +127,6 @@ std::vector<unsigned char> transferHead(const std::string& name, bool firstBatch
     out.number32(0).number32(firstBatch ? 1 : 0).number32(chunkCount - 1U);
     out.number16(chunkCount).align(4);
     return out.take();
-}
-
-std::string faultText(std::uint32_t code) {
-    switch (code) {
-        case 0x000006F7:
-            return "the host could not make sense of the request";
-        case 0x1C010002:
-            return "the host does not know the operation";
-        case 0x1C010003:
-            return "the host does not offer file transfer";
-        case 0x1C00001B:
-            return "the host is short of memory";
-        default:
-            break;
-    }
-    char text[48];
-    std::snprintf(text, sizeof text, "the host answered with fault 0x%08X", code);
-    return text;
 }
 
 }  // namespace ctl::rpc

@@ -12,8 +12,8 @@ namespace ctl::rpc {
 
 constexpr std::size_t kCommonHeader = 16;
 constexpr std::size_t kRequestHeader = 24;
-constexpr std::uint16_t kLargestFragment =
-    65528;  // the largest multiple of 8 that a length can say
+/// The largest multiple of 8 that fits into a packet's 16-bit length.
+constexpr std::uint16_t kLargestFragment = 65528;
 
 enum PacketType : std::uint8_t {
     kRequest = 0,
@@ -29,23 +29,23 @@ enum PacketFlag : std::uint8_t {
     kLastFragment = 0x02,
 };
 
-/// What stands at the beginning of every packet.
+/// The fields at the beginning of every packet that matter here.
 struct CommonHeader {
     std::uint8_t type = 0;
     std::uint8_t flags = 0;
     bool littleEndian = true;
-    std::uint16_t fragmentLength = 0;  ///< the whole packet's
+    std::uint16_t fragmentLength = 0;  ///< of the whole packet, this header included
     std::uint32_t callId = 0;
 };
 
-/// Reads a common header; false when it is none of version 5.0 or claims an impossible length.
+/// Reads a common header. Returns false when its version is not 5.0 or its length is impossible.
 bool parseCommonHeader(const unsigned char (&bytes)[kCommonHeader], CommonHeader& header);
 
 /// The packet that binds to the file transfer interface.
 std::vector<unsigned char> bindPacket(std::uint32_t callId);
 
-/// Whether a bind-ack accepts the one presentation context that bindPacket() offers, and the
-/// largest fragment that the host takes. `body` follows the common header.
+/// Whether a bind-ack accepts the one presentation context that bindPacket() offers. `body` is what
+/// follows the common header. `largestFragment` becomes the largest packet that the host takes.
 bool parseBindAck(const std::vector<unsigned char>& body, bool littleEndian,
                   std::uint16_t& largestFragment);
 
@@ -57,11 +57,9 @@ std::array<unsigned char, kRequestHeader> requestHeader(std::uint32_t callId, st
 /// A 32-bit number in either byte order; `bytes` has four.
 std::uint32_t number32(const unsigned char* bytes, bool littleEndian);
 
-/// What stands before the chunks of a transfer request.
+/// The data of a transfer request up to its chunks: the file's name in the depot and whether this
+/// is the file's first batch.
 std::vector<unsigned char> transferHead(const std::string& name, bool firstBatch,
                                         std::uint16_t chunkCount);
-
-/// A fault code in words.
-std::string faultText(std::uint32_t code);
 
 }  // namespace ctl::rpc

@@ -25,7 +25,7 @@ Failure broken() {
 }
 
 void setTimeout(int descriptor, std::chrono::milliseconds timeout) {
-    // Nothing at all would mean without end.
+    // A time-out of 0 would mean to wait without end.
     timeout = std::max(timeout, std::chrono::milliseconds(1));
     timeval limit{};
     limit.tv_sec = static_cast<time_t>(timeout.count() / 1000);
@@ -34,7 +34,7 @@ void setTimeout(int descriptor, std::chrono::milliseconds timeout) {
     ::setsockopt(descriptor, SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof limit);
 }
 
-/// Sends what the pieces hold, changing them on the way.
+/// Sends all bytes of the pieces. Changes the pieces on the way.
 void sendPieces(int descriptor, std::vector<iovec>& pieces) {
     std::size_t at = 0;
     while (at < pieces.size()) {
@@ -53,7 +53,7 @@ void sendPieces(int descriptor, std::vector<iovec>& pieces) {
     }
 }
 
-/// Walks over a request's data, which stands in two places.
+/// The data of a request, which stands in two places: its head and the chunks.
 class RequestData {
 public:
     RequestData(const std::vector<unsigned char>& head, const ChunkBatch& batch)
@@ -79,44 +79,6 @@ private:
 };
 
 }  // namespace
-
-ChunkBatch::ChunkBatch() : bytes_(kMostChunks * kChunkSize) {}
-
-std::size_t ChunkBatch::read(int descriptor, const std::string& name) {
-    std::size_t total = 0;
-    while (total < kMostChunks * kChunkData) {
-        iovec places[kMostChunks];
-        int count = 0;
-        for (std::size_t at = total; at < kMostChunks * kChunkData;) {
-            const std::size_t within = at % kChunkData;
-            unsigned char* const place = &bytes_[at / kChunkData * kChunkSize + 4 + within];
-            places[count++] = {place, kChunkData - within};
-            at += kChunkData - within;
-        }
-        const ssize_t length = ::readv(descriptor, places, count);
-        if (length == -1 && errno == EINTR) continue;
-        if (length == -1)
-            throw Failure(kWrongUsage, "cannot read " + name + ": " + std::strerror(errno));
-        if (length == 0) break;
-        total += static_cast<std::size_t>(length);
-    }
-    putLengths(total);
-    return total;
-}
-
-void ChunkBatch::putLengths(std::size_t total) {
-    count_ =
-        static_cast<std::uint16_t>(std::max<std::size_t>(1, (total + kChunkData - 1) / kChunkData));
-    for (std::size_t i = 0; i < count_; ++i) {
-        unsigned char* const chunk = &bytes_[i * kChunkSize];
-        const std::size_t length = std::min(kChunkData, total - std::min(total, i * kChunkData));
-        for (unsigned byte = 0; byte < 4; ++byte) {
-            chunk[byte] = static_cast<unsigned char>(length >> (8 * byte));
-        }
-        // What an earlier batch left there is nobody's business.
-        std::fill(chunk + 4 + length, chunk + kChunkSize, static_cast<unsigned char>(0));
-    }
-}
 
 TransferClient::TransferClient(const std::string& socketPath, std::chrono::milliseconds timeout)
     : descriptor_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
@@ -148,8 +110,9 @@ void TransferClient::connect(const std::string& path) {
 }
 
 void TransferClient::bind() {
-    const std::vector<unsigned char> request = rpc::bindPacket(nextCall_++);
-    sendAll(request.data(), request.size());
+    std::vector<unsigned char> request = rpc::bindPacket(nextCall_++);
+    std::vector<iovec> pieces = {{request.data(), request.size()}};
+    sendPieces(descriptor_, pieces);
     const Packet answer = readPacket();
     std::uint16_t largestFragment = 0;
     if (answer.header.type != rpc::kBindAck ||
@@ -196,11 +159,6 @@ TransferAnswer TransferClient::receive() {
         throw Failure(kNoHost, "the host's answer makes no sense");
     }
     return answer;
-}
-
-void TransferClient::sendAll(const unsigned char* data, std::size_t length) {
-    std::vector<iovec> pieces = {{const_cast<unsigned char*>(data), length}};
-    sendPieces(descriptor_, pieces);
 }
 
 TransferClient::Packet TransferClient::readPacket() {

@@ -6,40 +6,17 @@
 #include <string>
 #include <vector>
 
+#include "ctl/client/chunk_batch.h"
 #include "ctl/client/rpc_wire.h"
 
 namespace ctl {
 
-/// A batch of a file's content as it stands in a request: chunks of a 32-bit length and 4096 bytes.
-/// The content is read from the file straight to its place.
-class ChunkBatch {
-public:
-    /// Chunks per batch: large enough that calls cost nothing beside the data, small enough that
-    /// the data stays in the processor's caches on its way.
-    static constexpr std::size_t kMostChunks = 250;
-
-    ChunkBatch();
-    /// Reads the next part of a file; 0 bytes at its end, which make one empty chunk. Throws
-    /// Failure when reading fails.
-    std::size_t read(int descriptor, const std::string& name);
-
-    std::uint16_t count() const { return count_; }
-    const unsigned char* data() const { return bytes_.data(); }
-    std::size_t size() const { return count_ * kChunkSize; }
-
-private:
-    static constexpr std::size_t kChunkData = 4096;
-    static constexpr std::size_t kChunkSize = 4 + kChunkData;
-    void putLengths(std::size_t total);
-
-    std::vector<unsigned char> bytes_;
-    std::uint16_t count_ = 0;
-};
-
 /// What the host says of one batch.
 struct TransferAnswer {
-    std::int32_t status = 0;
+    std::int32_t status = 0;  ///< the operation's result; 0 for success
     std::uint32_t fault = 0;  ///< not 0: the call failed before there was a status
+
+    bool isSuccess() const { return status == 0 && fault == 0; }
 };
 
 /// One association with the host. Requests may be sent before earlier ones are answered; answers
@@ -47,12 +24,17 @@ struct TransferAnswer {
 /// connection breaks, kNoOutcome when the host takes longer than the time-out.
 class TransferClient {
 public:
+    /// Connects and binds to the file transfer interface. The time-out is that of each wait for
+    /// the host.
     TransferClient(const std::string& socketPath, std::chrono::milliseconds timeout);
     ~TransferClient();
     TransferClient(const TransferClient&) = delete;
     TransferClient& operator=(const TransferClient&) = delete;
 
+    /// Sends a batch of the file that becomes `name` in the depot. The first batch of a file
+    /// replaces what is there, later ones are appended.
     void send(const std::string& name, bool firstBatch, const ChunkBatch& batch);
+    /// Waits for the answer to the oldest request that has none yet.
     TransferAnswer receive();
 
 private:
@@ -62,7 +44,6 @@ private:
     };
     void connect(const std::string& path);
     void bind();
-    void sendAll(const unsigned char* data, std::size_t length);
     Packet readPacket();
     void readAll(unsigned char* data, std::size_t length);
 

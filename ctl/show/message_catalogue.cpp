@@ -1,7 +1,10 @@
 #include "ctl/show/message_catalogue.h"
 
 #include <array>
-#include <cstdio>
+#include <nlohmann/json.hpp>
+
+#include "ctl/client/row.h"
+#include "ctl/show/printable.h"
 
 namespace ctl {
 namespace {
@@ -58,26 +61,15 @@ std::string messageText(const std::string& id) {
     return {};
 }
 
-std::string printable(const std::string& text) {
-    std::string out;
-    for (const char c : text) {
-        const auto byte = static_cast<unsigned char>(c);
-        if (byte >= 0x20 && byte != 0x7f) {
-            out += c;
-            continue;
-        }
-        char escape[8];
-        std::snprintf(escape, sizeof escape, "\\x%02X", byte);
-        out += escape;
-    }
-    return out;
-}
-
 std::string describeResult(int returnCode, const std::string& id, const std::string& parameter) {
     std::string out = id.empty() ? "return code " + std::to_string(returnCode) : id;
     if (const std::string text = messageText(id); !text.empty()) out += ": " + text;
     if (!parameter.empty()) out += " [" + printable(parameter) + "]";
     return out;
+}
+
+std::string describeRow(const nlohmann::json& row) {
+    return describeResult(returnCodeOf(row), textOf(row, "RETMSGID"), textOf(row, "RETMSGPARM"));
 }
 
 }  // namespace ctl

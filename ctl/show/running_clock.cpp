@@ -7,6 +7,12 @@
 
 namespace ctl {
 
+std::string elapsedText(std::chrono::milliseconds time) {
+    const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(time).count();
+    if (seconds < 60) return std::to_string(seconds) + " s";
+    return std::to_string(seconds / 60) + " min " + std::to_string(seconds % 60) + " s";
+}
+
 RunningClock::RunningClock(std::string what, bool enabled)
     : what_(std::move(what)), enabled_(enabled && ::isatty(STDERR_FILENO) == 1) {}
 
@@ -16,7 +22,9 @@ RunningClock::~RunningClock() {
 
 void RunningClock::tick() {
     if (!enabled_) return;
-    std::fprintf(stderr, "\r%s: waiting, %s \033[K", what_.c_str(), elapsed().c_str());
+    const auto elapsed = std::chrono::duration_cast<std::chrono::milliseconds>(
+        std::chrono::steady_clock::now() - start_);
+    std::fprintf(stderr, "\r%s: waiting, %s \033[K", what_.c_str(), elapsedText(elapsed).c_str());
     std::fflush(stderr);
     shown_ = true;
 }
@@ -26,14 +34,6 @@ void RunningClock::erase() {
     std::fputs("\r\033[K", stderr);
     std::fflush(stderr);
     shown_ = false;
-}
-
-std::string RunningClock::elapsed() const {
-    const auto seconds =
-        std::chrono::duration_cast<std::chrono::seconds>(std::chrono::steady_clock::now() - start_)
-            .count();
-    if (seconds < 60) return std::to_string(seconds) + " s";
-    return std::to_string(seconds / 60) + " min " + std::to_string(seconds % 60) + " s";
 }
 
 }  // namespace ctl

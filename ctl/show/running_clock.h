@@ -1,4 +1,4 @@
-/// What a person at a terminal sees while a command runs.
+/// A clock on the terminal while a command runs.
 #pragma once
 
 #include <chrono>
@@ -6,20 +6,23 @@
 
 namespace ctl {
 
-/// A line on standard error that counts the seconds of a wait. Shows nothing when standard error is
-/// no terminal or the command's output is for a program. Erased when it ends.
+/// "3 s" or "2 min 5 s".
+std::string elapsedText(std::chrono::milliseconds time);
+
+/// A line on standard error that counts the seconds of a wait, and is erased at the end. Shows
+/// nothing when standard error is no terminal, or when it is not enabled.
 class RunningClock {
 public:
+    /// `what` says what is waited for, such as "start ux". The clock starts now.
     RunningClock(std::string what, bool enabled);
     ~RunningClock();
     RunningClock(const RunningClock&) = delete;
     RunningClock& operator=(const RunningClock&) = delete;
 
+    /// Draws the line anew.
     void tick();
-    /// Takes the line off the terminal before something else is printed.
+    /// Takes the line off the terminal, before something else is printed.
     void erase();
-    /// "3 s" or "2 min 5 s" since the clock was made.
-    std::string elapsed() const;
 
 private:
     std::string what_;

@@ -28,25 +28,25 @@ Progress::~Progress() {
 }
 
 void Progress::add(std::uintmax_t bytes) {
-    sent_ += bytes;
+    done_ += bytes;
+    if (!enabled_) return;
     const auto now = std::chrono::steady_clock::now();
-    if (!enabled_ || now - lastDrawn_ < std::chrono::milliseconds(100)) return;
+    if (now - lastDrawn_ < std::chrono::milliseconds(100)) return;
     lastDrawn_ = now;
     draw();
 }
 
-double Progress::seconds() const {
-    return std::chrono::duration<double>(std::chrono::steady_clock::now() - start_).count();
-}
-
 void Progress::draw() {
     constexpr int kWidth = 30;
-    const double share = total_ == 0 ? 1 : std::min(1.0, double(sent_) / double(total_));
-    const double rate = double(sent_) / std::max(seconds(), 1e-6);
-    const auto left = static_cast<long>((double(total_) - double(sent_)) / std::max(rate, 1.0));
+    const std::chrono::duration<double> elapsed = lastDrawn_ - start_;
+    const auto total = double(total_);
+    const auto done = double(done_);
+    const double share = total_ == 0 ? 1 : std::min(1.0, done / total);
+    const double rate = done / elapsed.count();  // at least 0.1 s have passed
+    const auto left = static_cast<long>((total - done) / std::max(rate, 1.0));
     const std::string bar(static_cast<std::size_t>(share * kWidth), '#');
     std::fprintf(stderr, "\r[%-*s] %3.0f %%  %s of %s  %s/s  %ld s left\033[K", kWidth, bar.c_str(),
-                 share * 100, bytesText(double(sent_)).c_str(), bytesText(double(total_)).c_str(),
+                 share * 100, bytesText(done).c_str(), bytesText(total).c_str(),
                  bytesText(rate).c_str(), left);
     std::fflush(stderr);
     drawn_ = true;

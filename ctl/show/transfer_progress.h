@@ -1,4 +1,4 @@
-/// What a person at a terminal sees while files are sent.
+/// A progress bar on the terminal while files are sent.
 #pragma once
 
 #include <chrono>
@@ -7,22 +7,21 @@
 
 namespace ctl {
 
-/// "12.3 MB" and the like.
+/// "12.3 MB" and the like; units are powers of 1000.
 std::string bytesText(double bytes);
 
-/// A bar on a terminal, redrawn a few times a second; nothing elsewhere.
+/// A bar on standard error, redrawn at most ten times a second, and erased at the end. Shows
+/// nothing when standard error is no terminal, or when it is not enabled.
 class Progress {
 public:
-    /// `total` bytes are to be sent.
+    /// `total` bytes are to be sent. The time counts from now.
     Progress(std::uintmax_t total, bool enabled);
     ~Progress();
     Progress(const Progress&) = delete;
     Progress& operator=(const Progress&) = delete;
 
+    /// So many more bytes are done.
     void add(std::uintmax_t bytes);
-    /// Since it was made.
-    double seconds() const;
-    std::uintmax_t sent() const { return sent_; }
 
 private:
     void draw();
@@ -30,7 +29,7 @@ private:
     std::uintmax_t total_;
     bool enabled_;
     bool drawn_ = false;
-    std::uintmax_t sent_ = 0;
+    std::uintmax_t done_ = 0;
     std::chrono::steady_clock::time_point start_ = std::chrono::steady_clock::now();
     std::chrono::steady_clock::time_point lastDrawn_ = start_;
 };

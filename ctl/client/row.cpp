@@ -1,0 +1,25 @@
+#include "ctl/client/row.h"
+
+#include <nlohmann/json.hpp>
+
+using nlohmann::json;
+
+namespace ctl {
+
+std::string valueText(const json& value) {
+    if (value.is_string()) return value.get<std::string>();
+    if (value.is_null()) return {};
+    return value.dump(-1, ' ', false, json::error_handler_t::replace);
+}
+
+std::string textOf(const json& row, const std::string& column) {
+    const auto found = row.find(column);
+    return found == row.end() ? std::string() : valueText(*found);
+}
+
+int returnCodeOf(const json& row) {
+    const auto found = row.find("RETVAL");
+    return found != row.end() && found->is_number_integer() ? found->get<int>() : 0;
+}
+
+}  // namespace ctl

@@ -1,0 +1,88 @@
+#include "ctl/client/task.h"
+
+#include <utility>
+
+#include "ctl/client/failure.h"
+#include "ctl/client/row.h"
+
+using nlohmann::json;
+
+namespace ctl {
+namespace {
+
+TaskResult::End endOf(EventStream::Result result) {
+    switch (result) {
+        case EventStream::Result::Event:
+            return TaskResult::End::Outcome;
+        case EventStream::Result::Ended:
+            return TaskResult::End::HostGone;
+        case EventStream::Result::TimedOut:
+            break;
+    }
+    return TaskResult::End::TimedOut;
+}
+
+}  // namespace
+
+Task::Task(const HostAddress& host, TaskRequest request, Ticker tick)
+    : socket_(host.socket),
+      deadline_(deadlineIn(host.timeout)),
+      request_(std::move(request)),
+      tick_(std::move(tick)) {
+    if (request_.transid.empty()) request_.transid = makeTransid();
+}
+
+json Task::askNow() {
+    json rows = HostClient(socket_).query("KAGREQT", request_.conditions(), deadline_, tick_);
+    if (rows.empty()) {
+        // The reply repeats the request's values and is filtered by them like any row.
+        throw Failure(kHostReportedFailure,
+                      "the host's reply holds another value than the request, so it is not known "
+                      "what became of it: the host cuts text with many characters beyond ASCII");
+    }
+    return std::move(rows.front());
+}
+
+bool Task::submit(bool subscribe) {
+    if (subscribe) {
+        stream_ = std::make_unique<EventStream>(
+            socket_, "KAGDYST",
+            std::vector<std::pair<std::string, std::string>>{{"TRANSID", request_.transid}},
+            deadline_);
+    }
+    reply_ = askNow();
+    return returnCodeOf(reply_) == 0;
+}
+
+EventStream::Result Task::awaitOutcome() {
+    ServerEvent event;
+    for (;;) {
+        const auto result = stream_->next(deadline_, event, tick_);
+        if (result != EventStream::Result::Event) return result;
+        json row = json::parse(event.data, nullptr, false);
+        if (event.type != "message" || !row.is_object()) continue;
+        events_.push_back(std::move(row));
+        return result;
+    }
+}
+
+std::chrono::milliseconds Task::elapsed() const {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now() -
+                                                                 begin_);
+}
+
+TaskResult runTask(const HostAddress& host, const TaskRequest& request, bool wait,
+                   const TaskWatch& watch) {
+    Task task(host, request, watch.tick);
+    const bool accepted = task.submit(wait);
+    if (watch.onReply) watch.onReply(task.reply());
+    TaskResult result;
+    result.end = accepted ? TaskResult::End::Accepted : TaskResult::End::Refused;
+    if (accepted && wait) result.end = endOf(task.awaitOutcome());
+    result.reply = task.reply();
+    result.events = task.events();
+    result.elapsed = task.elapsed();
+    return result;
+}
+
+}  // namespace ctl

@@ -1,0 +1,49 @@
+#include "ctl/client/transport.h"
+
+#include <nlohmann/json.hpp>
+
+using nlohmann::json;
+
+namespace ctl {
+namespace {
+
+ExitStatus statusOfRefusal(unsigned status) {
+    const bool forNow = status == 403 || status == 409 || status == 429 || status >= 500;
+    return forNow ? kHostReportedFailure : kWrongUsage;
+}
+
+}  // namespace
+
+Transport::Transport(const std::string& path) : path_(path), socket_(context_) {
+    Error error;
+    try {
+        socket_.connect(boost::asio::local::stream_protocol::endpoint(path), error);
+    } catch (const boost::system::system_error& tooLong) {
+        error = tooLong.code();
+    }
+    if (error) throw Failure(kNoHost, "no host reached at " + path + ": " + error.message());
+}
+
+/// The operation's handler refers to its caller's variables, so it is run before the caller
+/// returns.
+void Transport::abandon() {
+    Error ignored;
+    socket_.close(ignored);
+    context_.restart();
+    context_.run();
+}
+
+Failure Transport::broken(const Error& error) const {
+    return {kNoHost, "the connection to the host at " + path_ + " broke: " + error.message()};
+}
+
+Failure refusal(unsigned status, const std::string& body) {
+    const json parsed = json::parse(body, nullptr, false);
+    std::string text = "status " + std::to_string(status);
+    if (parsed.is_object() && parsed.contains("error") && parsed["error"].is_string()) {
+        text = parsed["error"].get<std::string>();
+    }
+    return {statusOfRefusal(status), "the host refused the request: " + text};
+}
+
+}  // namespace ctl

@@ -1,0 +1,27 @@
+/// From the words of the command line to the verb that they ask for.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "ctl/show/page.h"
+#include "ctl/verbs/values.h"
+#include "ctl/verbs/verb.h"
+
+namespace ctl {
+
+/// What a command line means.
+struct CommandLine {
+    const Verb* verb = nullptr;  ///< null if there is nothing to run: `page` says it all then
+    Values given;                ///< the values of the verb's arguments and of the global ones
+    Page page;                   ///< the help that was asked for, or what is wrong
+};
+
+/// Takes the words behind the program's name apart. Nothing is run.
+CommandLine parseCommandLine(const std::vector<std::string>& words);
+
+/// The help for a verb or a group, named by its words; for the program if there are none. Throws
+/// Failure(kWrongUsage) when there is no such verb.
+std::string helpText(const std::vector<std::string>& verb);
+
+}  // namespace ctl

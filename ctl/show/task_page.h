@@ -1,0 +1,34 @@
+/// How a queued command went, for people and as a document.
+#pragma once
+
+#include <chrono>
+#include <nlohmann/json_fwd.hpp>
+#include <string>
+
+#include "ctl/client/task.h"
+#include "ctl/show/page.h"
+
+namespace ctl {
+
+/// "start ux: accepted", or how the host refused it. `title` names the command here and below.
+std::string replyLine(const std::string& title, const nlohmann::json& reply);
+
+/// "start ux: done after 3 s", or how it failed.
+std::string outcomeLine(const std::string& title, const nlohmann::json& row,
+                        std::chrono::milliseconds elapsed);
+
+/// The exit status that a row of results means.
+ExitStatus statusOf(const nlohmann::json& row);
+
+/// How a command that is answered at once ended.
+Page showOutcome(const std::string& title, const nlohmann::json& row,
+                 std::chrono::milliseconds elapsed, Format format);
+
+/// {"reply": {...}, "events": [...]}
+nlohmann::json taskDocument(const TaskResult& result);
+
+/// How a queued command ended. As text it is what follows the reply line, which is printed as soon
+/// as the reply is there.
+Page showTask(const std::string& title, const TaskResult& result, Format format);
+
+}  // namespace ctl

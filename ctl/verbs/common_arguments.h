@@ -1,0 +1,18 @@
+/// Arguments that several verbs have in common.
+#pragma once
+
+#include "ctl/verbs/argument.h"
+
+namespace ctl {
+
+constexpr Argument kProduct =
+    positional("PRODUCT", "Product code").required().completedBy(Completion::Product);
+constexpr Argument kTarget =
+    textOption("--target", "Managed system name of the instance").completedBy(Completion::Instance);
+
+// Of the commands that the host queues.
+constexpr Argument kNoWait = flag("--no-wait", "Do not wait for the outcome");
+constexpr Argument kTransid = textOption("--transid", "The transaction identifier to use")
+                                  .completedBy(Completion::Transaction);
+
+}  // namespace ctl

@@ -1,0 +1,117 @@
+#include "ctl/verbs/events.h"
+
+#include <unistd.h>
+
+#include <csignal>
+#include <cstdio>
+#include <nlohmann/json.hpp>
+
+#include "ctl/client/event_stream.h"
+#include "ctl/client/row.h"
+#include "ctl/show/message_catalogue.h"
+#include "ctl/verbs/global_arguments.h"
+#include "ctl/verbs/invocation.h"
+#include "ctl/verbs/verb_table.h"
+
+using nlohmann::json;
+
+namespace ctl {
+namespace {
+
+constexpr Argument kOnlyTransid =
+    textOption("--transid", "Only this transaction").completedBy(Completion::Transaction);
+constexpr Argument kCount = numberOption("--count", "End after so many");
+constexpr Argument kArguments[] = {kOnlyTransid, kCount};
+
+/// An interrupted stream is a finished one: the document is closed and the status is success. Makes
+/// only async-signal-safe calls. Nothing waits in a buffer, because every event was flushed.
+void endDocument(int) {
+    static const char kEnd[] = "\n]}\n";
+    [[maybe_unused]] const ssize_t written = ::write(STDOUT_FILENO, kEnd, sizeof kEnd - 1);
+    ::_exit(kSuccess);
+}
+
+void endStream(int) {
+    ::_exit(kSuccess);
+}
+
+/// Prints events as they come. As JSON they are one document, which is whole however the stream
+/// ends.
+class EventPrinter {
+public:
+    explicit EventPrinter(Format format) : format_(format) {
+        if (format_ == Format::Json) print({"{\"events\": [", {}});
+    }
+    ~EventPrinter() {
+        if (format_ == Format::Json) print({count_ > 0 ? "\n]}\n" : "]}\n", {}});
+    }
+    EventPrinter(const EventPrinter&) = delete;
+    EventPrinter& operator=(const EventPrinter&) = delete;
+
+    /// Returns false when nobody reads the output any more.
+    bool add(const json& row) {
+        print({showEvent(row, count_ == 0, format_), {}});
+        ++count_;
+        return std::ferror(stdout) == 0;
+    }
+    unsigned count() const { return count_; }
+
+private:
+    Format format_;
+    unsigned count_ = 0;
+};
+
+/// Prints up to `wanted` events; without end if it is 0.
+ExitStatus streamEvents(EventStream& stream, unsigned wanted, Deadline end, Format format) {
+    EventPrinter printer(format);
+    while (wanted == 0 || printer.count() < wanted) {
+        ServerEvent event;
+        const auto result = stream.next(end, event);
+        if (result == EventStream::Result::TimedOut) return wanted == 0 ? kSuccess : kNoOutcome;
+        if (result == EventStream::Result::Ended) {
+            return print({{}, complaint("the host closed the stream"), kNoHost});
+        }
+        if (event.type != "message") {
+            print({{}, complaint(event.type + ": " + event.data)});
+            continue;
+        }
+        const json row = json::parse(event.data, nullptr, false);
+        if (row.is_object() && !printer.add(row)) break;
+    }
+    return kSuccess;
+}
+
+ExitStatus run(const Invocation& invocation) {
+    const Values& given = invocation.given;
+    std::vector<std::pair<std::string, std::string>> where;
+    if (!given.text(kOnlyTransid).empty()) where.emplace_back("TRANSID", given.text(kOnlyTransid));
+    EventStream stream(invocation.host.socket, "KAGDYST", where, invocation.deadline());
+    const bool isJson = invocation.format == Format::Json;
+    std::signal(SIGINT, isJson ? endDocument : endStream);
+    std::signal(SIGTERM, isJson ? endDocument : endStream);
+    // Only somebody who asks for an end gets one: the default time-out is that of a task.
+    const Deadline end = given.has(kTimeout) ? invocation.deadline() : Deadline::max();
+    return streamEvents(stream, given.number(kCount), end, invocation.format);
+}
+
+}  // namespace
+
+constexpr Verb kEventsVerb = {
+    "events",   "Show the outcomes of tasks as they come",
+    kArguments, {"zavctl events", "zavctl --json --timeout 60 events --transid deploy-7 --count 1"},
+    run,
+};
+
+std::string showEvent(const json& row, bool isFirst, Format format) {
+    if (format == Format::Json) {
+        return std::string(isFirst ? "" : ",") + "\n  " +
+               row.dump(-1, ' ', false, json::error_handler_t::replace);
+    }
+    std::string line = textOf(row, "TRANSID") + "  " + textOf(row, "COMMAND") + "  ";
+    line += returnCodeOf(row) == 0 ? "done" : "failed; " + describeRow(row);
+    const std::string target = textOf(row, "TARGETMSN");
+    if (!target.empty()) line += "  target " + target;
+    return line + "\n";
+}
+
+}  // namespace ctl

@@ -1,0 +1,16 @@
+/// events: the outcomes of tasks as they come.
+#pragma once
+
+#include <cstddef>
+#include <nlohmann/json_fwd.hpp>
+#include <string>
+
+#include "ctl/show/page.h"
+
+namespace ctl {
+
+/// One outcome as it is printed. As JSON it is an element of the list "events" of one document;
+/// `isFirst` says whether others stand before it.
+std::string showEvent(const nlohmann::json& row, bool isFirst, Format format);
+
+}  // namespace ctl

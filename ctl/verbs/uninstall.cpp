@@ -1,0 +1,28 @@
+// uninstall: removes a product.
+
+#include "ctl/verbs/common_arguments.h"
+#include "ctl/verbs/invocation.h"
+#include "ctl/verbs/queued.h"
+#include "ctl/verbs/verb_table.h"
+
+namespace ctl {
+namespace {
+
+constexpr Argument kArguments[] = {kProduct, kNoWait, kTransid};
+
+ExitStatus run(const Invocation& invocation) {
+    TaskRequest request;
+    request.command = "UNINSTALL";
+    request.product = invocation.given.text(kProduct);
+    return runQueued(invocation, request, "uninstall " + request.product);
+}
+
+}  // namespace
+
+constexpr Verb kUninstallVerb = {
+    "uninstall", "Remove a product",
+    kArguments,  {"zavctl uninstall ux", "zavctl uninstall ux --no-wait --transid cleanup-7"},
+    run,
+};
+
+}  // namespace ctl

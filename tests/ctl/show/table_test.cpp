@@ -1,0 +1,35 @@
+#include "ctl/show/table.h"
+
+#include <gtest/gtest.h>
+
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using nlohmann::json;
+
+TEST(Table, IsAlignedByCharactersNotBytes) {
+    const json rows = {{{"P", "ux"}, {"D", "gr\xc3\xbc\xc3\x9f"}, {"E", "1"}},
+                       {{"P", "longer"}, {"D", "x"}, {"E", "2"}}};
+    EXPECT_EQ(ctl::tableText(rows, {{"P", "PRODUCT"}, {"D", "DESC"}, {"E", "N"}}),
+              "PRODUCT  DESC  N\n"
+              "ux       gr\xc3\xbc\xc3\x9f  1\n"
+              "longer   x     2\n");
+}
+
+TEST(Table, HasNoBlanksAtTheEndsOfLinesAndNoControlCharacters) {
+    const json rows = {{{"A", "x\x1b"}}, {{"A", "y"}, {"B", "z"}}};
+    EXPECT_EQ(ctl::tableText(rows, {{"A", "A"}, {"B", "B"}}), "A      B\nx\\x1B\ny      z\n");
+}
+
+TEST(Table, OfNoRowsIsItsTitles) {
+    EXPECT_EQ(ctl::tableText(json::array(), {{"A", "FIRST"}, {"B", "SECOND"}}), "FIRST  SECOND\n");
+}
+
+TEST(Records, LeaveEmptyColumnsOut) {
+    const json rows = {{{"A", "1"}, {"BB", ""}, {"CCC", 3}}, {{"A", "x\ny"}}};
+    EXPECT_EQ(ctl::recordsText(rows), "A    1\nCCC  3\n\nA  x\\x0Ay\n");
+    EXPECT_EQ(ctl::recordsText(json::array()), "");
+}
+
+}  // namespace

@@ -1,0 +1,35 @@
+#include "ctl/verbs/events.h"
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <nlohmann/json.hpp>
+
+namespace {
+
+using ctl::Format;
+using ctl::showEvent;
+using nlohmann::json;
+
+const json kDone = {{"TRANSID", "T"}, {"COMMAND", "START"}, {"RETVAL", 0}};
+const json kFailed = {{"TRANSID", "T"},
+                      {"COMMAND", "STOP"},
+                      {"RETVAL", 1024},
+                      {"RETMSGID", "ZAV1024E"},
+                      {"TARGETMSN", "a:h:UX"}};
+
+TEST(Events, AreLinesThatSayHowTasksEnded) {
+    EXPECT_EQ(showEvent(kDone, true, Format::Text), "T  START  done\n");
+    EXPECT_EQ(showEvent(kFailed, false, Format::Text),
+              "T  STOP  failed; ZAV1024E: the start or stop command ended with a bad return code  "
+              "target a:h:UX\n");
+}
+
+TEST(Events, AreElementsOfOneListAsJson) {
+    const std::string list = "[" + showEvent(kDone, true, Format::Json) +
+                             showEvent(kFailed, false, Format::Json) + "\n]";
+    EXPECT_EQ(json::parse(list), (json{kDone, kFailed}));
+    EXPECT_EQ(std::count(list.begin(), list.end(), '\n'), 3) << "a line for each";
+}
+
+}  // namespace
