@@ -1,6 +1,7 @@
 /// Requests on the sample table, made through the driver.
 #pragma once
 
+#include <atomic>
 #include <memory>
 #include <mutex>
 #include <string>

@@ -7,6 +7,8 @@
 #include <cstring>
 #include <new>
 
+#include "common/utf16.h"
+
 namespace xml1 {
 namespace {
 
@@ -131,11 +133,8 @@ void appendWide(std::string_view utf8, std::vector<unsigned short>& out) {
         for (std::size_t i = 1; i < length; ++i) {
             point = point << 6 | (static_cast<unsigned char>(utf8[at + i]) & 0x3FU);
         }
-        if (point >= 0x10000) {
-            out.push_back(static_cast<unsigned short>(0xD7C0 + (point >> 10)));
-            point = 0xDC00 | (point & 0x3FF);
-        }
-        out.push_back(static_cast<unsigned short>(point));
+        unsigned short units[2];
+        out.insert(out.end(), units, units + utf16::put(point, units));
         at += length;
     }
 }
