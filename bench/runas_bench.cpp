@@ -4,6 +4,8 @@
 #include <benchmark/benchmark.h>
 #include <expat.h>
 
+#include <climits>
+#include <cstdint>
 #include <fstream>
 #include <iterator>
 #include <memory>
@@ -16,11 +18,16 @@
 
 namespace {
 
-/// A database of about that many bytes, and how many agents are in it.
+/// What a database is to have, whichever is reached first.
+struct Size {
+    std::size_t bytes;
+    unsigned agents;
+};
+
 struct Database {
-    explicit Database(std::size_t bytes) {
+    explicit Database(Size size) {
         text = "<runas>\n";
-        for (; text.size() < bytes; ++agents) {
+        for (; text.size() < size.bytes && agents < size.agents; ++agents) {
             const std::string number = std::to_string(agents);
             text += "    <agent>\n        <productCode>p" + number + "</productCode>\n";
             for (const char* instance : {"main", "second"}) {
@@ -76,8 +83,8 @@ void readWithExpat(const char* path, Element& root) {
     }
 }
 
-void runas(benchmark::State& state) {
-    const Database database(static_cast<std::size_t>(state.range(0)));
+void runas(benchmark::State& state, Size size) {
+    const Database database(size);
     const TemporaryFile file(database.text);
     for (auto _ : state) {
         const ZAV::StartupDB startup{ZAV::String(file.path())};
@@ -85,8 +92,8 @@ void runas(benchmark::State& state) {
     }
 }
 
-void expat(benchmark::State& state) {
-    const Database database(static_cast<std::size_t>(state.range(0)));
+void expat(benchmark::State& state, Size size) {
+    const Database database(size);
     const TemporaryFile file(database.text);
     for (auto _ : state) {
         Element root;
@@ -97,12 +104,20 @@ void expat(benchmark::State& state) {
     }
 }
 
-void everySize(benchmark::internal::Benchmark* bench) {
-    bench->RangeMultiplier(4)->Range(1 << 10, 1 << 20);
+void add(const std::string& size, Size limits) {
+    benchmark::RegisterBenchmark(("runas/" + size).c_str(), runas, limits);
+    benchmark::RegisterBenchmark(("expat/" + size).c_str(), expat, limits);
 }
-BENCHMARK(runas)->Apply(everySize);
-BENCHMARK(expat)->Apply(everySize);
 
 }  // namespace
 
-BENCHMARK_MAIN();
+int main(int argc, char** argv) {
+    benchmark::Initialize(&argc, argv);
+    for (std::size_t bytes = 1 << 10; bytes <= 1 << 20; bytes *= 4)
+        add(std::to_string(bytes), {bytes, UINT_MAX});
+    for (const unsigned agents : {10u, 1000u})
+        add("agents/" + std::to_string(agents), {SIZE_MAX, agents});
+    benchmark::RunSpecifiedBenchmarks();
+    benchmark::Shutdown();
+    return 0;
+}

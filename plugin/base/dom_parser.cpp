@@ -93,9 +93,7 @@ void DOMParser::startElement(const char* name, const char** atts) {
 
 void DOMParser::endElement() {
     if (current_ == nullptr) return;
-    String text;
-    text.assign(characterData_.data(), static_cast<unsigned>(characterData_.size()));
-    current_->setElementText(text.getData());
+    current_->setElementText(characterData_.c_str());
     current_ = current_->getParent();
     characterData_.clear();
 }

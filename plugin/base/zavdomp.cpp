@@ -1,5 +1,7 @@
 #include "base/zavdomp.h"
 
+#include <algorithm>
+#include <cstring>
 #include <typeinfo>
 
 namespace ZAV {
@@ -137,7 +139,10 @@ DOMNodeList::~DOMNodeList() {
 }
 
 void DOMNodeList::append(DOMNode* node) {
-    if (node != nullptr) nodes_.push_back(node);
+    if (node == nullptr) return;
+    // Few lists stay at one node; growing to two and then to four would cost two blocks more.
+    if (nodes_.empty()) nodes_.reserve(kFirstRoom);
+    nodes_.push_back(node);
 }
 
 DOMNode* DOMNodeList::takeLast() {
@@ -149,6 +154,30 @@ DOMNode* DOMNodeList::takeLast() {
 
 void freeDOMNodeListFunc(void* p) {
     delete static_cast<DOMNodeList*>(p);
+}
+
+DOMTagName::DOMTagName(const char* name) {
+    if (name == nullptr) return;
+    const std::size_t units = std::strlen(name) + 1;
+    unsigned short* const room = makeRoom(units);
+    String::convertToUnicode(name, room);
+    name_ = room;
+}
+
+DOMTagName::DOMTagName(const unsigned short* name) {
+    if (name == nullptr) return;
+    std::size_t units = 1;
+    while (name[units - 1] != 0)
+        ++units;
+    unsigned short* const room = makeRoom(units);
+    std::copy_n(name, units, room);
+    name_ = room;
+}
+
+unsigned short* DOMTagName::makeRoom(std::size_t units) {
+    if (units <= kShort) return short_;
+    long_.reset(new unsigned short[units]);
+    return long_.get();
 }
 
 DOMAttr::DOMAttr(const char* name, const char* value)
@@ -165,14 +194,18 @@ void DOMAttr::dump(String& out) {
     dump.appendTo(out);
 }
 
-DOMElement::DOMElement(const char* tagName) : tagName_(String::createUnicodeString(tagName)) {
-    tagLists_.setAutoDeleteValues(true);
-    tagLists_.setFreeValueFunc(reinterpret_cast<void*>(freeDOMNodeListFunc));
+DOMElement::DOMElement(const char* tagName) : tagName_(tagName) {
+    ownTagLists();
 }
 
-DOMElement::DOMElement(const DOMElement& other) : DOMElement(nullptr) {
-    if (other.tagName_) tagName_.reset(String::copyUnicodeString(other.tagName_.get()));
+DOMElement::DOMElement(const DOMElement& other) : DOMNode(other), tagName_(other.tagName_.get()) {
+    ownTagLists();
     setElementText(other.text_.get());
+}
+
+void DOMElement::ownTagLists() {
+    tagLists_.setAutoDeleteValues(true);
+    tagLists_.setFreeValueFunc(reinterpret_cast<void*>(freeDOMNodeListFunc));
 }
 
 DOMElement::~DOMElement() {

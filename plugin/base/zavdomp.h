@@ -48,6 +48,7 @@ public:
     DOMNode* takeLast();
 
 private:
+    static constexpr std::size_t kFirstRoom = 4;
     std::vector<DOMNode*> nodes_;
     bool owning_;
 };
@@ -60,6 +61,27 @@ struct UnicodeStringDeleter {
     void operator()(unsigned short* text) const { String::releaseUnicodeString(text); }
 };
 using UnicodeText = std::unique_ptr<unsigned short[], UnicodeStringDeleter>;
+
+/// The tag name of an element, or null. Most are short enough to lie within the element, which
+/// saves a block for each.
+class DOMTagName {
+public:
+    /// Converts from the local code page.
+    explicit DOMTagName(const char* name);
+    explicit DOMTagName(const unsigned short* name);
+    DOMTagName(const DOMTagName&) = delete;
+    DOMTagName& operator=(const DOMTagName&) = delete;
+
+    const unsigned short* get() const { return name_; }
+
+private:
+    unsigned short* makeRoom(std::size_t units);
+
+    static constexpr std::size_t kShort = 12;
+    unsigned short short_[kShort];
+    std::unique_ptr<unsigned short[]> long_;
+    const unsigned short* name_ = nullptr;  // one of the two above, or null
+};
 
 class DOMAttr : public DOMNode {
 public:
@@ -126,7 +148,9 @@ public:
     DOMNodeList* getElementsByTagName(const unsigned short* name) const;
 
 private:
-    UnicodeText tagName_;
+    void ownTagLists();
+
+    DOMTagName tagName_;
     mutable DOMNodeList attributes_{true};
     mutable DOMNodeList children_{true};
     DOMElement* parent_ = nullptr;

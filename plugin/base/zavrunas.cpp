@@ -84,6 +84,13 @@ void addAgentLines(std::string& text, const AgentEntry& agent) {
 
 }  // namespace
 
+InstanceEntry::InstanceEntry(const DOMElement* nameElement, const DOMElement* userElement)
+    : instanceName_(nameElement != nullptr ? trimmedText(*nameElement) : String()),
+      user_(userElement != nullptr ? trimmedText(*userElement) : String()) {}
+
+AgentEntry::AgentEntry(const DOMElement& productCodeElement)
+    : productCode_(trimmedText(productCodeElement)) {}
+
 void AgentEntry::addInstance(InstanceEntry* instance) {
     instances_.push_back(std::unique_ptr<InstanceEntry>(instance));
 }
@@ -191,7 +198,7 @@ AgentEntry* buildAgentEntry(const DOMElement* agentElement) {
         trace().error("Agent element missing <productCode> element");
         return nullptr;
     }
-    auto agent = std::make_unique<AgentEntry>(trimmedText(*productCode));
+    std::unique_ptr<AgentEntry> agent(new AgentEntry(*productCode));
     forEachChild(*agentElement, "instance", [&agent](const DOMElement& element) {
         agent->addInstance(buildInstanceEntry(&element));
         return true;
@@ -201,15 +208,9 @@ AgentEntry* buildAgentEntry(const DOMElement* agentElement) {
 
 InstanceEntry* buildInstanceEntry(const DOMElement* instanceElement) {
     Trace trace(traceUnit);
-    String instanceName;
-    String user;
     const DOMElement* const nameElement = firstChild(instanceElement, "name");
     const DOMElement* const userElement = firstChild(instanceElement, "user");
-    if (nameElement != nullptr) {
-        instanceName = trimmedText(*nameElement);
-        if (userElement != nullptr) user = trimmedText(*userElement);
-    }
-    return new InstanceEntry(instanceName, user);
+    return new InstanceEntry(nameElement, nameElement != nullptr ? userElement : nullptr);
 }
 
 }  // namespace ZAV

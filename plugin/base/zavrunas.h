@@ -36,6 +36,10 @@ public:
     void setUser(const String& user) { user_ = user; }
 
 private:
+    friend InstanceEntry* buildInstanceEntry(const DOMElement* instanceElement);
+    /// From the elements of its name and its user; null for an empty text.
+    InstanceEntry(const DOMElement* nameElement, const DOMElement* userElement);
+
     String instanceName_;
     String user_;
 };
@@ -61,6 +65,10 @@ public:
     unsigned getNumInstances() const { return static_cast<unsigned>(instances_.size()); }
 
 private:
+    friend AgentEntry* buildAgentEntry(const DOMElement* agentElement);
+    /// From the element of its product code.
+    explicit AgentEntry(const DOMElement& productCodeElement);
+
     String productCode_;
     std::vector<std::unique_ptr<InstanceEntry>> instances_;
 };

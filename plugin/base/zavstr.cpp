@@ -230,8 +230,12 @@ String& String::trim() {
     const Trace trace(traceUnit);
     const unsigned short* const units = getData();
     std::uint32_t begin = 0;
-    while (isWhiteSpace(units[begin]))
-        ++begin;
+    // The blanks of an indentation are all alike, and one question about them is enough.
+    while (isWhiteSpace(units[begin])) {
+        const unsigned short blank = units[begin];
+        while (units[begin] == blank)
+            ++begin;
+    }
     if (begin >= length()) {
         clear();
         return *this;

@@ -150,6 +150,9 @@ public:
     /// pointer. The caller frees the result with releaseUnicodeString.
     static unsigned short* createUnicodeString(const char* text);
     static unsigned short* createUnicodeString(const char* text, std::uint32_t n);
+    /// Converts text, which is not null, as createUnicodeString does into `out`, which has room for
+    /// as many units as the text has bytes with its terminator.
+    static void convertToUnicode(const char* text, unsigned short* out);
     static unsigned short* copyUnicodeString(const unsigned short* units);
     static void releaseUnicodeString(unsigned short* units);
 

@@ -152,6 +152,11 @@ unsigned short* String::createUnicodeString(const char* text) {
     return buffer.release();
 }
 
+void String::convertToUnicode(const char* text, unsigned short* out) {
+    const Trace trace(traceUnit, "createUnicodeString");
+    convertToUnits(localeForConversion(), text, countBytes(text), out);
+}
+
 unsigned short* String::createUnicodeString(const char* text, std::uint32_t n) {
     const Trace trace(traceUnit);
     if (text == nullptr) return nullptr;

@@ -139,6 +139,21 @@ TEST_F(Nls2Default, GoesByTheCodeset) {
     EXPECT_EQ(page("C.UTF-8"), 923);
 }
 
+TEST_F(Nls2Default, FollowsTheEnvironmentAndTheProcess) {
+    EXPECT_EQ(page("C.UTF-8"), 1208);
+    EXPECT_EQ(page("C"), 819);
+    EXPECT_EQ(page("C.UTF-8"), 1208);
+    ::setenv("LC_CTYPE", "C.UTF-8", 1);
+    EXPECT_EQ(page(""), 1208) << "an empty variable counts as none";
+    EXPECT_EQ(page("xx_YY.no-such-codeset"), 819);
+    EXPECT_EQ(page("POSIX"), 819);
+    ASSERT_NE(::setlocale(LC_ALL, "C.UTF-8"), nullptr);
+    EXPECT_EQ(page("POSIX"), 1208) << "what the process has set counts";
+    ::setlocale(LC_ALL, "C");
+    EXPECT_EQ(page("POSIX"), 819);
+    ::unsetenv("LC_CTYPE");
+}
+
 TEST_F(Nls2Default, WithACodesetThatHasNoNumberIsReplaced) {
     pretendedCodeset = "GEORGIAN-PS";
     EXPECT_EQ(page("C.UTF-8", NLS2_SUBSTITUTED), 819);

@@ -114,13 +114,22 @@ constexpr struct {
     {"CP936", 1386},
 };
 
-std::string normalized(const std::string& name) {
-    std::string plain;
-    for (const char c : name) {
-        const auto byte = static_cast<unsigned char>(c);
-        if (std::isalnum(byte) != 0) plain += static_cast<char>(std::tolower(byte));
+/// The next letter or digit from `at` on, which is moved behind it, as a small letter; 0 when there
+/// is none.
+int nextOf(const char*& at) {
+    while (*at != '\0') {
+        const int byte = static_cast<unsigned char>(*at++);
+        if (std::isalnum(byte) != 0) return std::tolower(byte);
     }
-    return plain;
+    return 0;
+}
+
+bool isSameCodeset(const char* a, const char* b) {
+    for (;;) {
+        const int one = nextOf(a);
+        if (one != nextOf(b)) return false;
+        if (one == 0) return true;
+    }
 }
 
 }  // namespace
@@ -133,12 +142,11 @@ const CodePage* codePageNumbered(int number) {
 }
 
 const CodePage* codePageOfCodeset(const std::string& codeset) {
-    const std::string wanted = normalized(codeset);
     for (const auto& alias : kAliases) {
-        if (normalized(alias.codeset) == wanted) return codePageNumbered(alias.number);
+        if (isSameCodeset(alias.codeset, codeset.c_str())) return codePageNumbered(alias.number);
     }
     for (const CodePage& page : kCodePages) {
-        if (normalized(page.iconvName) == wanted) return &page;
+        if (isSameCodeset(page.iconvName, codeset.c_str())) return &page;
     }
     return nullptr;
 }

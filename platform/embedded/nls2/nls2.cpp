@@ -5,6 +5,9 @@
 #include <langinfo.h>
 #include <locale.h>
 
+#include <algorithm>
+#include <array>
+#include <cstdlib>
 #include <cstring>
 #include <map>
 #include <mutex>
@@ -47,13 +50,52 @@ NLS2_LOCALE* open(const CodePage& page) {
     return locale.get();
 }
 
-/// The codeset of a locale by its name ("" is the environment's); empty when there is none such.
-std::string codesetOf(const char* localeName) {
-    const locale_t locale = ::newlocale(LC_CTYPE_MASK, localeName, locale_t{});
-    if (locale == locale_t{}) return {};
-    std::string codeset = ::nl_langinfo_l(CODESET, locale);
-    ::freelocale(locale);
-    return codeset;
+/// The locale that was last asked for its codeset. Opening one maps files, which takes longer than
+/// reading a small document, and most processes have the same one from start to end.
+class LastLocale {
+public:
+    /// The codeset of a locale by its name ("" is the environment's); empty when there is none
+    /// such.
+    std::string codesetOf(const char* localeName) {
+        const std::lock_guard<std::mutex> lock(mutex_);
+        const Key key = keyOf(localeName);
+        if (locale_ == locale_t{} || !std::equal(key.begin(), key.end(), key_.begin())) {
+            std::array<std::string, kKeyParts> kept;
+            std::copy(key.begin(), key.end(), kept.begin());
+            const locale_t opened = ::newlocale(LC_CTYPE_MASK, localeName, locale_t{});
+            if (opened == locale_t{}) return {};
+            if (locale_ != locale_t{}) ::freelocale(locale_);
+            locale_ = opened;
+            key_.swap(kept);
+        }
+        return ::nl_langinfo_l(CODESET, locale_);
+    }
+
+private:
+    /// All that decides which locale a name leads to: itself and variables of the environment.
+    static constexpr std::size_t kKeyParts = 5;
+    using Key = std::array<const char*, kKeyParts>;
+
+    static Key keyOf(const char* localeName) {
+        return {localeName, valueOf("LOCPATH"), valueOf("LC_ALL"), valueOf("LC_CTYPE"),
+                valueOf("LANG")};
+    }
+
+    /// A variable that is empty counts as one that is not set.
+    static const char* valueOf(const char* variable) {
+        const char* const value = std::getenv(variable);
+        return value != nullptr ? value : "";
+    }
+
+    std::mutex mutex_;
+    // Guarded by mutex_:
+    locale_t locale_{};
+    std::array<std::string, kKeyParts> key_;  // that locale_ was opened with
+};
+
+LastLocale& lastLocale() {
+    static LastLocale& instance = *new LastLocale;
+    return instance;
 }
 
 /// The codeset of the locale that the process has set. A process that has set none is taken to
@@ -62,7 +104,7 @@ std::string processCodeset() {
     const char* const set = ::setlocale(LC_CTYPE, nullptr);
     const bool isPlain =
         set == nullptr || std::strcmp(set, "C") == 0 || std::strcmp(set, "POSIX") == 0;
-    const std::string codeset = codesetOf(isPlain ? "" : set);
+    const std::string codeset = lastLocale().codesetOf(isPlain ? "" : set);
     return codeset.empty() ? "ASCII" : codeset;
 }
 
