@@ -186,18 +186,6 @@ bool takesValue(const std::string& option) {
     return false;
 }
 
-/// The verb that the words name, if that can be seen without parsing them.
-const Verb* namedVerb(const Words& words) {
-    std::string name;
-    for (std::size_t i = 0; i < words.size(); ++i) {
-        if (takesValue(words[i])) ++i;
-        if (i >= words.size() || words[i].front() == '-') continue;
-        name += (name.empty() ? "" : " ") + words[i];
-        if (findVerbGroup(name) == nullptr) break;
-    }
-    return findVerb(name);
-}
-
 Verbs allVerbs() {
     return {std::begin(kVerbs), std::end(kVerbs)};
 }
@@ -214,6 +202,18 @@ CommandLine parseWithAllVerbs(const Words& words) {
 }
 
 }  // namespace
+
+const Verb* namedVerb(const std::vector<std::string>& words) {
+    std::string name;
+    for (std::size_t i = 0; i < words.size(); ++i) {
+        const bool isOption = words[i].rfind('-', 0) == 0;
+        if (takesValue(words[i])) ++i;
+        if (isOption) continue;
+        name += (name.empty() ? "" : " ") + words[i];
+        if (findVerbGroup(name) == nullptr) break;
+    }
+    return findVerb(name);
+}
 
 CommandLine parseCommandLine(const std::vector<std::string>& words) {
     // To declare all verbs takes longer than most of them run. What goes wrong with one of them is

@@ -17,6 +17,9 @@ struct CommandLine {
     Page page;                   ///< the help that was asked for, or what is wrong
 };
 
+/// The verb that the words name, if that can be seen without parsing them; else null.
+const Verb* namedVerb(const std::vector<std::string>& words);
+
 /// Takes the words behind the program's name apart. Nothing is run.
 CommandLine parseCommandLine(const std::vector<std::string>& words);
 

@@ -3,7 +3,6 @@
 #include <poll.h>
 #include <unistd.h>
 
-#include <clocale>
 #include <csignal>
 #include <cstdio>
 #include <exception>
@@ -42,7 +41,6 @@ ctl::ExitStatus withOutputWritten(ctl::ExitStatus status) {
 }  // namespace
 
 int main(int argc, char** argv) {
-    std::setlocale(LC_CTYPE, "");
     std::signal(SIGPIPE, SIG_IGN);  // a host that goes away is an error of the write
     try {
         return withOutputWritten(run({argv + 1, argv + argc}));

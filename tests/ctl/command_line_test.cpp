@@ -78,6 +78,21 @@ TEST(CommandLine, TakesEveryExampleOfEveryVerb) {
     }
 }
 
+TEST(NamedVerb, IsSeenBetweenGlobalOptionsAndTheirValues) {
+    EXPECT_EQ(ctl::namedVerb({"status"}), &ctl::kStatusVerb);
+    EXPECT_EQ(ctl::namedVerb({"--json", "--socket", "stop", "start", "ux"}), &ctl::kStartVerb);
+    EXPECT_EQ(ctl::namedVerb({"--socket=/a", "--timeout", "1", "agents"}), &ctl::kAgentsVerb);
+    EXPECT_EQ(ctl::namedVerb({"config", "--json", "get", "ux"}), &ctl::kConfigGetVerb);
+}
+
+TEST(NamedVerb, IsNoneWithoutAVerbOrWithAnUnknownOne) {
+    for (const Words& words :
+         {Words{}, Words{""}, Words{"--json"}, Words{"--socket"}, Words{"--socket", "start"},
+          Words{"config"}, Words{"config", "frobnicate"}, Words{"frobnicate", "start"}}) {
+        EXPECT_EQ(ctl::namedVerb(words), nullptr);
+    }
+}
+
 struct Mistake {
     Words words;
     const char* says;
@@ -91,6 +106,7 @@ TEST(CommandLine, SaysWhatIsWrong) {
         {{"frobnicate"}, "The following argument was not expected: frobnicate"},
         {{"config", "frobnicate"}, "The following argument was not expected: frobnicate"},
         {{"start"}, "PRODUCT is required"},
+        {{""}, "The following argument was not expected: "},
         {{"start", "--frobnicate"}, "The following argument was not expected: --frobnicate"},
         {{"status", "start", "ux"}, "The following arguments were not expected: ux start"},
         {{"start", "ux", "--target"}, "--target: 1 required TEXT missing"},

@@ -1,6 +1,5 @@
-// zavctl as somebody at a terminal and a script meet it: what each command line asks of the host,
-// where the host is looked for, and what is said when it goes away.
-// ctest-label: threaded
+// zavctl as people and scripts use it: what each command line asks of the host, where it looks for
+// the host, and what it says when the host goes away. ctest-label: threaded
 
 #include <unistd.h>
 
@@ -19,7 +18,7 @@ using testing::ContainsRegex;
 using testing::HasSubstr;
 using Arguments = std::vector<std::string>;
 
-/// The columns of a request that a command line fills, as the reply repeats them.
+/// The columns of the request that a command line makes, taken from the reply, which repeats them.
 json requested(const ManagedHost& host, Arguments arguments) {
     const auto end = std::find(arguments.begin(), arguments.end(), "--");
     arguments.insert(end, {"--json", "--no-wait", "--transid", "T"});
@@ -159,7 +158,8 @@ TEST(ControlProgram, EveryCommandHasHelpThatNeedsNoHost) {
                                   {"ua-config"},
                                   {"events"},
                                   {"status"},
-                                  {"remove-instance"}};
+                                  {"remove-instance"},
+                                  {"help"}};
     for (const Arguments& command : commands) {
         Arguments line = {zavctlPath()};
         line.insert(line.end(), command.begin(), command.end());
@@ -172,6 +172,25 @@ TEST(ControlProgram, EveryCommandHasHelpThatNeedsNoHost) {
             usage += word + " ";
         EXPECT_THAT(result.out, HasSubstr(usage + "[OPTIONS]"));
     }
+}
+
+TEST(ControlProgram, TheVerbHelpSaysWhatTheOptionSays) {
+    const ProgramResult verb = runProgram({zavctlPath(), "help", "config", "set"});
+    EXPECT_EQ(verb.status, 0);
+    EXPECT_EQ(verb.err, "");
+    EXPECT_EQ(verb.out, runProgram({zavctlPath(), "config", "set", "--help"}).out);
+    EXPECT_EQ(runProgram({zavctlPath(), "help"}).out, runProgram({zavctlPath(), "--help"}).out);
+    const ProgramResult unknown = runProgram({zavctlPath(), "help", "frobnicate"});
+    EXPECT_EQ(unknown.status, 2);
+    EXPECT_EQ(unknown.out, "");
+    EXPECT_EQ(unknown.err, "zavctl: there is no command \"frobnicate\"\n");
+}
+
+TEST(ControlProgram, TellsItsVersion) {
+    const ProgramResult result = runProgram({zavctlPath(), "--version"});
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.err, "");
+    EXPECT_THAT(result.out, ContainsRegex("^zavctl [0-9]+[.][0-9]+[.][0-9]+\n$"));
 }
 
 // ---- Where the host is --------------------------------------------------------------------------
