@@ -1,4 +1,4 @@
-// Building the document model from the event parser's events.
+// Builds the document model from the event parser's events.
 #include <climits>
 #include <cstdio>
 #include <cstring>
@@ -27,7 +27,7 @@ DOMParser::DOMParser(const char* xmlText) : parser_(XML1_ParserCreate(nullptr)) 
     XML1_SetCharacterDataHandler(parser_.get(), charDataHandler);
     XML1_SetUserData(parser_.get(), this);
     const std::size_t length = std::strlen(xmlText);
-    // A text beyond what the event parser can count gets no buffer, which fails the parse.
+    // A text longer than the event parser can count gets no buffer, so parsing fails.
     length_ = length <= INT_MAX ? static_cast<unsigned>(length) : INT_MAX;
     if (length_ == length) buffer_ = XML1_GetBuffer(parser_.get(), static_cast<int>(length));
     if (buffer_ != nullptr) std::memcpy(buffer_, xmlText, length);
@@ -65,8 +65,8 @@ void DOMParser::setErrorMessage() {
     errorMessage_ = copyOf(message);
 }
 
-/// Runs a handler's work. The event parser is foreign code that no exception may cross: the first
-/// one waits until the parser returns, and the events after it change nothing.
+/// Runs the body of a handler. No exception may pass through the event parser: the first one is
+/// kept until the parser returns, and the events after it are ignored.
 template <typename Action>
 void DOMParser::handleEvent(Action action) {
     if (failure_) return;

@@ -7,7 +7,7 @@
 namespace ZAV {
 namespace {
 
-/// Collects the text of a dump, since a String reallocates with every append.
+/// Collects the text of a dump, because a String reallocates too often.
 class Dump {
 public:
     void add(const unsigned short* text) {
@@ -81,7 +81,7 @@ void addEndTag(Dump& dump, const DOMElement& element) {
     dump.add(">");
 }
 
-/// A child of a class of its own, or one that was put into the list without being an element.
+/// Adds a child of a derived class, or one that is not an element.
 void addOtherChild(Dump& dump, String indent, std::size_t level, DOMNode& child) {
     for (std::size_t tabs = 0; tabs < level; ++tabs)
         indent.append('\t');
@@ -95,7 +95,7 @@ void addOtherChild(Dump& dump, String indent, std::size_t level, DOMNode& child)
     dump.add("\n");
 }
 
-/// Writes the tree below `root`, without recursion: documents may be deep.
+/// Writes the tree below `root`. Does not recurse, because documents may be deep.
 void addTree(Dump& dump, const String& indent, const DOMElement& root) {
     struct Open {
         const DOMElement* element;
@@ -209,8 +209,8 @@ void DOMElement::ownTagLists() {
 }
 
 DOMElement::~DOMElement() {
-    // Every element below is taken out of its parent before it goes, from the leaves up, so that no
-    // destructor calls another one level deeper.
+    // Removes every element below from its parent before deleting it, from the leaves up, so that
+    // destructors do not recurse.
     DOMElement* at = this;
     for (;;) {
         if (DOMNode* const child = at->children_.takeLast(); child != nullptr) {

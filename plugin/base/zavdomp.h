@@ -1,8 +1,9 @@
-/// A small document model for XML: elements with their attributes and text, and the parser that
-/// builds it.
+/// A small document model for XML: elements with attributes and text, and the parser that builds
+/// it.
 ///
-/// Texts are 0-terminated UTF-16. A tree and its parser belong to one thread at a time, searches
-/// included, since an element remembers them. Documents may be nested as deep as memory allows.
+/// Texts are 0-terminated UTF-16. Use a tree and its parser on one thread at a time, even for
+/// searches, because elements cache their results. Documents may be nested as deep as memory
+/// allows.
 #pragma once
 
 #include <exception>
@@ -19,16 +20,16 @@ namespace ZAV {
 
 class DOMNode {
 public:
-    /// What getNodeType returns.
+    /// The result of getNodeType.
     enum NodeType : int { ELEMENT_NODE = 1, ATTRIBUTE_NODE = 2 };
 
     virtual ~DOMNode() {}
     virtual int getNodeType() const = 0;
-    /// Appends a readable form to `out`; nothing unless a class says otherwise.
+    /// Appends a readable form to `out`. By default there is none.
     virtual void dump(String& /*out*/) {}
 };
 
-/// Nodes in order. An owning list deletes its nodes with itself.
+/// An ordered list of nodes. An owning list deletes its nodes when it is destroyed.
 class DOMNodeList {
 public:
     explicit DOMNodeList(bool owning) : owning_(owning) {}
@@ -36,15 +37,15 @@ public:
     DOMNodeList(const DOMNodeList&) = delete;
     DOMNodeList& operator=(const DOMNodeList&) = delete;
 
-    /// Puts a node at the end, as its owner if the list owns; a null pointer is ignored.
+    /// Appends a node; an owning list takes ownership. Ignores a null pointer.
     void append(DOMNode* node);
     unsigned getLength() const { return static_cast<unsigned>(nodes_.size()); }
-    /// The node at `index`, which stays the list's or its owner's; null when there is none.
+    /// The node at `index`; null when there is none. Ownership does not change.
     DOMNode* item(unsigned index) const { return index < nodes_.size() ? nodes_[index] : nullptr; }
 
     const std::vector<DOMNode*>& nodes() const { return nodes_; }
-    /// Takes the last node out of the list and hands it, and its ownership, to the caller; null
-    /// when the list is empty.
+    /// Removes the last node and returns it; the caller gets the list's ownership. Null when the
+    /// list is empty.
     DOMNode* takeLast();
 
 private:
@@ -53,7 +54,7 @@ private:
     bool owning_;
 };
 
-/// Deletes the DOMNodeList at `p`; null is ignored. For maps whose values are lists.
+/// Deletes the DOMNodeList at `p`; does nothing for null. For maps whose values are lists.
 void freeDOMNodeListFunc(void* p);
 
 /// Owns a text from String::createUnicodeString or String::copyUnicodeString, or null.
@@ -85,7 +86,7 @@ private:
 
 class DOMAttr : public DOMNode {
 public:
-    /// Converts both from the local code page; a null pointer is kept as one.
+    /// Converts both from the local code page. A null pointer stays null.
     DOMAttr(const char* name, const char* value);
     DOMAttr(const DOMAttr& other);
     DOMAttr& operator=(const DOMAttr&) = delete;
@@ -94,7 +95,7 @@ public:
     /// Appends name="value".
     void dump(String& out) override;
 
-    /// The attribute's own texts; valid as long as it is.
+    /// The attribute's texts; valid as long as the attribute.
     const unsigned short* getName() const { return name_.get(); }
     const unsigned short* getValue() const { return value_.get(); }
 
@@ -103,20 +104,20 @@ private:
     UnicodeText value_;
 };
 
-/// An element owns its attributes and children. All pointers handed out stay the element's and are
-/// valid as long as it is.
+/// An element. It owns its attributes and children; all pointers that it returns are valid as long
+/// as the element.
 class DOMElement : public DOMNode {
 public:
     explicit DOMElement(const char* tagName);
-    /// Copies the tag name and the text only: the copy has no attributes, children or parent.
+    /// Copies only the tag name and the text: the copy has no attributes, children or parent.
     DOMElement(const DOMElement& other);
     DOMElement& operator=(const DOMElement&) = delete;
     ~DOMElement() override;
 
     int getNodeType() const override { return ELEMENT_NODE; }
-    /// Appends the element, its attributes and all below it, without text.
+    /// Appends the element, its attributes and everything below it, but no text.
     void dump(String& out) override;
-    /// The same with `indent` before each line of the element itself and a tab more for each level
+    /// The same, with `indent` before each line of the element, and one more tab for each level
     /// below it.
     virtual void dump(const String& indent, String& out);
 
@@ -128,22 +129,22 @@ public:
     DOMNodeList* getAttributes() const { return &attributes_; }
     DOMNodeList* getChildren() const { return &children_; }
 
-    /// Adds an attribute behind those there are, also when one has the same name; ignored when
-    /// either is null.
+    /// Adds an attribute after the existing ones, even when one of them has the same name. Does
+    /// nothing when either argument is null.
     void setAttribute(const char* name, const char* value);
-    /// The value of the first attribute of that name; null when there is none or `name` is null.
+    /// The value of the first attribute with this name; null when there is none or `name` is null.
     const unsigned short* getAttribute(const char* name) const;
     const unsigned short* getAttribute(const unsigned short* name) const;
 
-    /// Replaces the text by a copy; null takes it away.
+    /// Replaces the text by a copy; null removes it.
     void setElementText(const unsigned short* text);
     void setElementText(const char* text);
 
-    /// Takes a child over and becomes its parent; null is ignored.
+    /// Takes ownership of a child and becomes its parent. Ignores null.
     void addChild(DOMElement* child);
 
-    /// The direct children of that tag name, in order; null when `name` is null. The list is made
-    /// by the first search for a name and stays as it is, whatever is added afterwards.
+    /// The direct children with this tag name, in order; null when `name` is null. The first search
+    /// for a name creates the list; children added later do not appear in it.
     DOMNodeList* getElementsByTagName(const char* name) const;
     DOMNodeList* getElementsByTagName(const unsigned short* name) const;
 
@@ -158,28 +159,28 @@ private:
     UnicodeText text_;
 };
 
-/// Builds the tree of one document. Used once: construct, parse, read the tree, destroy.
+/// Builds the tree of one document. Use it once: construct, parse, read the tree, destroy.
 class DOMParser {
 public:
-    /// Copies the text, which is 0-terminated and in the encoding that it declares.
+    /// Copies the text, which must be 0-terminated and in the encoding that it declares.
     explicit DOMParser(const char* xmlText);
     virtual ~DOMParser();
     DOMParser(const DOMParser&) = delete;
     DOMParser& operator=(const DOMParser&) = delete;
 
-    /// 1 when a document was built; else 0, and getErrorMessage tells why, as far as that is known.
+    /// Builds the document. Returns 1, or 0 on failure; getErrorMessage then tells why, if known.
     ///
-    /// An element's text is everything since the previous end tag, white space included: text
-    /// before a first child is that child's, text behind the last child is the parent's.
+    /// An element's text is everything since the previous end tag, including white space: text
+    /// before a first child belongs to that child, text after the last child to the parent.
     int parse();
 
-    /// The root element, or null; it lives as long as the parser. After a failure it is what had
-    /// been built until then.
+    /// The root element, or null; valid as long as the parser. After a failure it holds what had
+    /// been built by then.
     DOMElement* getDocument() const { return root_.get(); }
-    /// Null when there was no error or nothing is known about it; lives as long as the parser.
+    /// Null when there was no error or its reason is not known. Valid as long as the parser.
     const char* getErrorMessage() const { return errorMessage_.get(); }
 
-    /// The event parser's handlers; `userData` is the DOMParser.
+    /// The handlers for the event parser; `userData` is the DOMParser.
     static void startXMLElement(void* userData, const char* name, const char** atts);
     static void endXMLElement(void* userData, const char* name);
     static void charDataHandler(void* userData, const char* text, int len);
@@ -200,9 +201,9 @@ private:
     std::unique_ptr<XML1_PARSER, ParserDeleter> parser_;
     std::unique_ptr<DOMElement> root_;
     DOMElement* current_ = nullptr;  // the innermost open element
-    std::string characterData_;      // since the previous end tag, as it came
+    std::string characterData_;      // everything since the previous end tag
     MallocedText errorMessage_;
-    std::exception_ptr failure_;  // what a handler could not let pass through the event parser
+    std::exception_ptr failure_;  // thrown in a handler; must not pass through the event parser
 };
 
 }  // namespace ZAV

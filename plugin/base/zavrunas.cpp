@@ -23,7 +23,7 @@ String trimmedText(const DOMElement& element) {
     return text;
 }
 
-/// Whether that is the element's tag name; `tagName` is ASCII.
+/// Whether the element has this tag name, which is ASCII.
 bool isNamed(const DOMElement& element, const char* tagName) {
     const unsigned short* name = element.getTagName();
     if (name == nullptr) return false;
@@ -34,8 +34,8 @@ bool isNamed(const DOMElement& element, const char* tagName) {
     return *name == static_cast<unsigned char>(*tagName);
 }
 
-/// Calls `use` with each direct child of that tag name, in order, until it returns false. Unlike a
-/// search by getElementsByTagName this leaves no list behind in the element.
+/// Calls `use` with each direct child that has this tag name, in order, until it returns false.
+/// Unlike getElementsByTagName it leaves no list in the element.
 template <typename Use>
 void forEachChild(const DOMElement& parent, const char* tagName, Use use) {
     for (const DOMNode* node : parent.getChildren()->nodes()) {
@@ -45,7 +45,7 @@ void forEachChild(const DOMElement& parent, const char* tagName, Use use) {
     }
 }
 
-/// The first direct child of that tag name, or null.
+/// The first direct child with this tag name, or null.
 const DOMElement* firstChild(const DOMElement* parent, const char* tagName) {
     const DOMElement* found = nullptr;
     if (parent != nullptr) {
@@ -57,7 +57,7 @@ const DOMElement* firstChild(const DOMElement* parent, const char* tagName) {
     return found;
 }
 
-/// One line of the file: `indent` tabs and a value between its tags.
+/// Adds one line of the file: `indent` tabs, and a value between its tags.
 void addLeaf(std::string& text, std::size_t indent, const char* tag, const String& value) {
     const CharStar narrow = value.c_str();
     text.append(indent, '\t').append("<").append(tag).append(">");
@@ -140,7 +140,7 @@ int StartupDB::save() {
     Trace trace(traceUnit);
     const FileDescriptor file = openFile(path_.c_str(), O_WRONLY | O_CREAT | O_TRUNC, kFileMode);
     if (!file.isOpen()) {
-        // The format ends in a lone percent sign, so the reason does not show.
+        // The format ends in a lone percent sign, so the reason is not printed.
         trace().error("Error opening file, %s, in write mode: %", path_, std::strerror(errno));
         return trace.exit(0);
     }

@@ -1,5 +1,4 @@
-/// The run-as database: for each agent product and instance the user under whose account it is
-/// started.
+/// The run-as database: the user account under which each instance of an agent is started.
 ///
 /// The file is XML, in the home's configuration directory:
 ///
@@ -13,7 +12,7 @@
 ///         </agent>
 ///     </runas>
 ///
-/// Objects here belong to one thread at a time.
+/// Use these objects on one thread at a time.
 #pragma once
 
 #include <memory>
@@ -24,7 +23,7 @@
 
 namespace ZAV {
 
-/// One instance of an agent and its user; no user is an empty text.
+/// One instance of an agent and its user, which is empty when there is none.
 class InstanceEntry {
 public:
     InstanceEntry(const String& instanceName, const String& user)
@@ -44,7 +43,7 @@ private:
     String user_;
 };
 
-/// One agent product and its instances, which it owns.
+/// One agent product. Owns its instances.
 class AgentEntry {
 public:
     explicit AgentEntry(const String& productCode) : productCode_(productCode) {}
@@ -53,14 +52,14 @@ public:
     AgentEntry& operator=(const AgentEntry&) = delete;
 
     String getProductCode() const { return productCode_; }
-    /// Puts an instance at the end and takes it over.
+    /// Appends an instance and takes ownership of it.
     void addInstance(InstanceEntry* instance);
-    /// Deletes the instance at `index`, if there is one. Its slot stays, empty: it counts, and
-    /// getInstance gives null for it.
+    /// Deletes the instance at `index`, if there is one. Its slot remains and still counts;
+    /// getInstance returns null for it.
     void removeInstance(unsigned index);
-    /// Null when `index` is out of range. The instance stays the agent's.
+    /// The instance at `index`, owned by the agent; null when `index` is out of range.
     InstanceEntry* getInstance(unsigned index) const;
-    /// The first instance of exactly that name, or null. The instance stays the agent's.
+    /// The first instance with exactly this name, owned by the agent; null when there is none.
     InstanceEntry* getInstance(const String& instanceName) const;
     unsigned getNumInstances() const { return static_cast<unsigned>(instances_.size()); }
 
@@ -73,33 +72,34 @@ private:
     std::vector<std::unique_ptr<InstanceEntry>> instances_;
 };
 
-/// The database of one file, read when it is constructed. Owns its agents.
+/// The database in one file, which the constructor reads. Owns its agents.
 class StartupDB {
 public:
-    /// Reads the file at `path`. A file that cannot be read or parsed is traced and leaves the
+    /// Reads the file at `path`. When the file cannot be read or parsed, traces that and leaves the
     /// database empty.
     explicit StartupDB(const String& path);
     virtual ~StartupDB() {}
     StartupDB(const StartupDB&) = delete;
     StartupDB& operator=(const StartupDB&) = delete;
 
-    /// Reads the file and adds its agents to those there are.
+    /// Reads the file and adds its agents to the existing ones.
     void initialize();
-    /// Writes the file in the form above, values as they are: they must not contain markup. Returns
-    /// 1, or 0 when the file could not be opened for writing.
+    /// Writes the file in the form shown above. Values are not escaped, so they must not contain
+    /// markup. Returns 1, or 0 when the file cannot be opened for writing.
     int save();
 
-    /// Puts an agent at the end and takes it over.
+    /// Appends an agent and takes ownership of it.
     void addAgent(AgentEntry* agent);
-    /// Deletes the agent at `index`, if there is one; those behind it move up.
+    /// Deletes the agent at `index`, if there is one. Those after it move up.
     void removeAgent(unsigned index);
-    /// Null when `index` is out of range. The agent stays the database's.
+    /// The agent at `index`, owned by the database; null when `index` is out of range.
     AgentEntry* getAgent(unsigned index) const;
-    /// The first agent of exactly that product code, or null. The agent stays the database's.
+    /// The first agent with exactly this product code, owned by the database; null when there is
+    /// none.
     AgentEntry* getAgent(const String& productCode) const;
     unsigned getNumAgents() const { return static_cast<unsigned>(agents_.size()); }
 
-    /// Adds the agents among the direct children of `root`, whatever `root` is called.
+    /// Adds the agents among the direct children of `root`, whatever its tag name.
     void buildModel(const DOMElement* root);
 
 private:
@@ -107,14 +107,14 @@ private:
     std::vector<std::unique_ptr<AgentEntry>> agents_;
 };
 
-/// The first direct child of that tag name; null when there is none or `parent` is null.
+/// The first direct child with this tag name; null when there is none or `parent` is null.
 DOMElement* getChildElement(const DOMElement* parent, const char* name);
 
-/// A new agent, which the caller owns, with its instances; null, and a trace line, when the element
-/// has no product code.
+/// Creates an agent with its instances; the caller owns it. Returns null, with a trace line, when
+/// the element has no product code.
 AgentEntry* buildAgentEntry(const DOMElement* agentElement);
 
-/// A new instance, which the caller owns. Without a name it has no user either.
+/// Creates an instance, which the caller owns. Without a name it gets no user either.
 InstanceEntry* buildInstanceEntry(const DOMElement* instanceElement);
 
 }  // namespace ZAV

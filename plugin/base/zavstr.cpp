@@ -230,7 +230,7 @@ String& String::trim() {
     const Trace trace(traceUnit);
     const unsigned short* const units = getData();
     std::uint32_t begin = 0;
-    // The blanks of an indentation are all alike, and one question about them is enough.
+    // The blanks of an indentation are all the same unit, so one test is enough.
     while (isWhiteSpace(units[begin])) {
         const unsigned short blank = units[begin];
         while (units[begin] == blank)
