@@ -157,6 +157,26 @@ TEST_F(Host, ASubscriptionWithoutASinkHasNoRequester) {
     EXPECT_EQ(OXA_GONE, manager.publish(sampleRow("a", 1)));
 }
 
+TEST_F(Host, AFilterJudgesRowsAsTheTableDoesAndIsNoLiveObject) {
+    const std::unique_ptr<oxa::Filter> filter =
+        oxa::makeFilter("SAMPLE", {{"NAME", OPER_EQ, "beta "}, {"VALUE", OPER_GT, "1"}});
+    ASSERT_NE(nullptr, filter);
+    EXPECT_THAT(manager.liveNumbers(), IsEmpty());
+    for (int turn = 0; turn < 2; ++turn) {
+        for (const SampleRow& row : manager.sample) {
+            const char* const bytes = reinterpret_cast<const char*>(&row);
+            EXPECT_EQ(row.value == 2, filter->takes(bytes)) << row.value;
+        }
+    }
+    EXPECT_EQ(0, manager.samples);
+}
+
+TEST_F(Host, AFilterOfAnUnknownTableOrOneThatFailsIsNone) {
+    EXPECT_EQ(nullptr, oxa::makeFilter("NOPE", {}));
+    manager.onCreate = [] { throw std::bad_alloc(); };
+    EXPECT_EQ(nullptr, oxa::makeFilter("SAMPLE", {}));
+}
+
 TEST_F(Host, ADroppedSubscriptionTakesItsObjectAndItsSinkAlong) {
     const auto token = std::make_shared<int>(0);
     auto live = oxa::subscribe("SAMPLE", {}, [token](const oxa::Rows&) { return 0; });

@@ -86,6 +86,21 @@ private:
     const OwnedObject object_;
 };
 
+/// Asks an object of the table that is never sampled and never on its list of live objects.
+class ObjectFilter final : public Filter {
+public:
+    ObjectFilter(OwnedObject object, unsigned rowSize)
+        : object_(std::move(object)), row_(rowSize, ' ') {}
+    bool takes(const char* row) override {
+        row_.assign(row, row_.size());  // tables are handed rows that they may write to
+        return object_->CheckForException(row_.data()) == 1;
+    }
+
+private:
+    const OwnedObject object_;
+    std::string row_;
+};
+
 }  // namespace
 
 const Column* Table::find(const std::string& column) const {
@@ -151,6 +166,21 @@ std::unique_ptr<Subscription> subscribe(const std::string& table,
         if (!object) return nullptr;
         OxaAccess::state(*object).sink = std::move(sink);
         return std::make_unique<LiveSubscription>(std::move(object));
+    } catch (...) {
+        return nullptr;
+    }
+}
+
+std::unique_ptr<Filter> makeFilter(const std::string& table, const std::vector<Predicate>& where) {
+    const Offer offer = offerOf(table);
+    if (offer.manager == nullptr) return nullptr;
+    try {
+        ContextInfo context;
+        context.sampleType = 1;
+        OwnedObject object = createObject(offer, where, context);
+        if (!object) return nullptr;
+        const unsigned rowSize = OxaAccess::state(*object).rows.rowSize;
+        return std::make_unique<ObjectFilter>(std::move(object), rowSize);
     } catch (...) {
         return nullptr;
     }

@@ -59,6 +59,21 @@ std::vector<Table> tables();
 /// `rows` holds what was collected until then. Any thread.
 int query(const std::string& table, const std::vector<Predicate>& where, Rows& rows);
 
+/// Judges rows by a request's conditions, exactly as the table itself does for its own requests.
+/// For those who take a table's rows through one subscription and hand them on. One thread at a
+/// time.
+class Filter {
+public:
+    virtual ~Filter() = default;
+    /// Whether the row, of the table's row size, satisfies every condition. Throws what the table's
+    /// code throws.
+    virtual bool takes(const char* row) = 0;
+};
+
+/// A filter on one table. Runs the table's code, but samples nothing. Null when there is no such
+/// table or it could not make an object.
+std::unique_ptr<Filter> makeFilter(const std::string& table, const std::vector<Predicate>& where);
+
 /// Receives the rows of a subscription, on the thread that dispatches them and under the table's
 /// lock. It must return quickly and must not call the framework. Returns 0, OXA_OVERFLOW or
 /// OXA_GONE. If it throws, that counts as OXA_OVERFLOW: these rows are lost, later ones are still
