@@ -9,6 +9,9 @@
 
 #include "embedded/ncs_host.h"
 #include "embedded/oxa_host.h"
+#include "host/api/api.h"
+#include "host/api/routes.h"
+#include "host/api/services.h"
 #include "host/http/server.h"
 #include "host/process/end_signals.h"
 #include "host/process/options.h"
@@ -16,7 +19,6 @@
 #include "host/process/setup.h"
 #include "host/process/socket_file.h"
 #include "host/process/start_error.h"
-#include "host/tables/code_page.h"
 
 namespace host {
 namespace {
@@ -24,7 +26,8 @@ namespace {
 /// How long the task in hand may take when the host is told to end.
 constexpr std::chrono::seconds kEndGrace{10};
 
-Router startPlugin(const HostOptions& options) {
+/// Starts the plug-in; returns its tables.
+std::vector<oxa::Table> startPlugin(const HostOptions& options) {
     const Plugin plugin(options.plugin);
     if (options.originNode) oxa::setOriginNode(*options.originNode);
     const int status = plugin.initialize();
@@ -35,7 +38,7 @@ Router startPlugin(const HostOptions& options) {
                      "zavhost: plug-in %s started with status %d; file transfers may fail\n",
                      plugin.file().c_str(), status);
     }
-    return Router(std::move(tables), CodePage::ofProcess());
+    return tables;
 }
 
 /// File transfers: on a socket of their own, and on a loopback port when one is asked for.
@@ -55,10 +58,11 @@ void run(const HostOptions& options) {
     SocketFile socket(options.socket);
     SocketFile transferSocket(options.rpcSocket);
     const int endDescriptor = catchEndSignals();
-    Router router = startPlugin(options);
+    Services services(startPlugin(options), CodePage::ofProcess(), options.home);
+    Api api(services, routes());
     ncs::Server transfers;
     serveTransfers(transfers, transferSocket, options);
-    HttpServer server(socket.listen(), std::move(router), options.home);
+    HttpServer server(socket.listen(), api, services.counts);
     server.endWhenReadable(endDescriptor, kEndGrace);
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);

@@ -1,119 +1,187 @@
 #include "host/api/router.h"
 
-#include <nlohmann/json.hpp>
+#include <algorithm>
+#include <optional>
+#include <stdexcept>
+#include <string_view>
 
-#include "host/tables/conditions.h"
+#include "host/tables/bad_request.h"
 
 namespace host {
 namespace {
 
-using nlohmann::json;
+constexpr std::size_t kMaxDigits = 18;
 
-/// Deeper documents than a request's are refused before they are built.
-constexpr int kMaxDepth = 4;
-
-Refusal unknownTable(std::string_view name) {
-    return {404, "there is no table \"" + std::string(name) + "\"", ""};
+bool isVariable(std::string_view segment) {
+    return segment.size() > 2 && segment.front() == '{' && segment.back() == '}';
 }
 
-json parseBody(std::string_view body) {
-    const auto limitDepth = [](int depth, json::parse_event_t, json&) {
-        if (depth > kMaxDepth) throw BadRequest("the body is nested too deeply");
-        return true;
-    };
-    try {
-        return json::parse(body.begin(), body.end(), limitDepth);
-    } catch (const json::parse_error& error) {
-        throw BadRequest("the body is not JSON: error at byte " + std::to_string(error.byte));
-    } catch (const json::exception&) {
-        throw BadRequest("the body is not JSON: a number is out of range");
+std::string_view variableName(std::string_view segment) {
+    return segment.substr(1, segment.size() - 2);
+}
+
+const Parameter* parameterOf(const Route& route, std::string_view name) {
+    const auto found =
+        std::find_if(route.parameters.begin(), route.parameters.end(),
+                     [name](const Parameter& parameter) { return name == parameter.name; });
+    return found == route.parameters.end() ? nullptr : &*found;
+}
+
+bool hasType(const std::string& value, Type type) {
+    switch (type) {
+        case Type::Text:
+            return true;
+        case Type::Number:
+            return !value.empty() && value.size() <= kMaxDigits &&
+                   value.find_first_not_of("0123456789") == std::string::npos;
+        case Type::Flag:
+            return value == "0" || value == "1";
+    }
+    return false;
+}
+
+const char* nameOf(Type type) {
+    switch (type) {
+        case Type::Text:
+            return "text";
+        case Type::Number:
+            return "a whole number";
+        case Type::Flag:
+            return "0 or 1";
+    }
+    return "";
+}
+
+bool fits(const std::string& segment, const std::string& pattern, const Route& route) {
+    if (!isVariable(pattern)) return segment == pattern;
+    const Parameter* const parameter = parameterOf(route, variableName(pattern));
+    return !segment.empty() && hasType(segment, parameter->type);
+}
+
+bool answers(const Route& route, std::string_view method) {
+    return method == route.method || (method == "HEAD" && std::string_view(route.method) == "GET");
+}
+
+/// The methods as a list for the header field. OPTIONS is known everywhere and not listed.
+std::string allowed(const std::vector<const Route*>& routes) {
+    std::string list;
+    for (const Route* route : routes) {
+        if (!list.empty()) list += ", ";
+        list += route->method;
+        if (std::string_view(route->method) == "GET") list += ", HEAD";
+    }
+    return list;
+}
+
+Reply wrongMethod(const std::string& path, const std::vector<const Route*>& routes) {
+    std::string text = path + (routes.size() == 1 ? " knows only the method " : " knows only ");
+    for (std::size_t i = 0; i < routes.size(); ++i) {
+        if (i > 0) text += i + 1 == routes.size() ? " and " : ", ";
+        text += routes[i]->method;
+    }
+    Reply reply = errorReply(405, text);
+    reply.fields.emplace_back("Allow", allowed(routes));
+    return reply;
+}
+
+void takeParameter(Match& match, const Parameter& parameter, const std::string& value) {
+    const std::string name = parameter.name;
+    for (const auto& taken : match.parameters) {
+        if (taken.first == name) throw BadRequest("the parameter \"" + name + "\" is given twice");
+    }
+    if (!hasType(value, parameter.type)) {
+        throw BadRequest("the parameter \"" + name + "\" is not " + nameOf(parameter.type));
+    }
+    match.parameters.emplace_back(name, value);
+}
+
+void takePath(Match& match, const std::vector<std::string>& pattern, const Target& target) {
+    for (std::size_t i = 0; i < pattern.size(); ++i) {
+        if (!isVariable(pattern[i])) continue;
+        match.parameters.emplace_back(variableName(pattern[i]), target.segments[i]);
     }
 }
 
-/// Checks the document's outer shape; returns its conditions, or null when it has none.
-const json* conditionsOf(const json& document) {
-    if (!document.is_object()) throw BadRequest("the body is not a JSON object");
-    for (const auto& member : document.items()) {
-        if (member.key() != "table" && member.key() != "where") {
-            throw BadRequest("unknown member \"" + member.key() + "\" in the body");
+void takeQuery(Match& match, const Target& target) {
+    for (const auto& [name, value] : target.parameters) {
+        if (const Parameter* const parameter = parameterOf(*match.route, name)) {
+            takeParameter(match, *parameter, value);
+        } else if (match.route->others == Others::Columns) {
+            match.others.emplace_back(name, value);
+        } else {
+            throw BadRequest(target.path + " takes no parameter \"" + name + "\"");
         }
     }
-    if (!document.contains("table")) throw BadRequest("the body lacks \"table\"");
-    if (!document.at("table").is_string()) throw BadRequest("\"table\" is not a string");
-    const auto where = document.find("where");
-    if (where == document.end()) return nullptr;
-    if (!where->is_array()) throw BadRequest("\"where\" is not an array");
-    return &*where;
+    for (const Parameter& parameter : match.route->parameters) {
+        const auto given =
+            std::find_if(match.parameters.begin(), match.parameters.end(),
+                         [&parameter](const auto& entry) { return entry.first == parameter.name; });
+        if (parameter.need == Need::Required && given == match.parameters.end()) {
+            throw BadRequest("the parameter \"" + std::string(parameter.name) + "\" is missing");
+        }
+    }
 }
 
 }  // namespace
 
-const oxa::Table* Router::find(std::string_view name) const {
-    for (const oxa::Table& table : tables_) {
-        if (table.name == name) return &table;
-    }
-    return nullptr;
-}
-
-Request Router::query(std::string_view body) const {
-    const json document = parseBody(body);
-    const json* const conditions = conditionsOf(document);
-    const auto& name = document.at("table").get_ref<const std::string&>();
-    const oxa::Table* const table = find(name);
-    if (table == nullptr) return unknownTable(name);
-    QueryRequest request{table, {}};
-    if (conditions != nullptr) {
-        const ConditionReader reader(*table, codePage_);
-        for (const json& condition : *conditions)
-            request.where.push_back(reader.fromJson(condition));
-    }
-    return request;
-}
-
-Request Router::events(const Target& target) const {
-    const std::string* name = nullptr;
-    for (const auto& [parameter, value] : target.parameters) {
-        if (parameter != "table") continue;
-        if (name != nullptr) throw BadRequest("the parameter \"table\" is given twice");
-        name = &value;
-    }
-    if (name == nullptr) throw BadRequest("the parameter \"table\" is missing");
-    const oxa::Table* const table = find(*name);
-    if (table == nullptr) return unknownTable(*name);
-    EventsRequest request{table, {}};
-    const ConditionReader reader(*table, codePage_);
-    for (const auto& [parameter, value] : target.parameters) {
-        if (parameter != "table") request.where.push_back(reader.equality(parameter, value));
-    }
-    return request;
-}
-
-Request Router::route(std::string_view method, std::string_view target,
-                      std::string_view body) const {
-    static constexpr std::pair<const char*, const char*> kMethods[] = {
-        {"/v1/tables", "GET"}, {"/v1/query", "POST"}, {"/v1/events", "GET"}, {"/v1/health", "GET"}};
-    const std::optional<Target> parsed = parseTarget(target);
-    if (!parsed) return Refusal{400, "the request's target has a malformed escape", ""};
-    const char* wanted = nullptr;
-    for (const auto& [path, name] : kMethods) {
-        if (parsed->path == path) wanted = name;
-    }
-    if (wanted == nullptr) return Refusal{404, "there is nothing at " + parsed->path, ""};
-    if (method != wanted) {
-        return Refusal{405, parsed->path + " knows only the method " + wanted, wanted};
-    }
-    try {
-        if (parsed->path == "/v1/events") return events(*parsed);
-        if (!parsed->parameters.empty()) {
-            throw BadRequest(parsed->path + " takes no parameter \"" +
-                             parsed->parameters.front().first + "\"");
+Router::Router(std::vector<Route> routes) : routes_(std::move(routes)) {
+    for (const Route& route : routes_) {
+        const std::optional<Target> pattern = parseTarget(route.path);
+        if (!pattern) throw std::logic_error(std::string("malformed path ") + route.path);
+        for (const std::string& segment : pattern->segments) {
+            if (isVariable(segment) && parameterOf(route, variableName(segment)) == nullptr) {
+                throw std::logic_error(std::string(route.path) + " does not describe " + segment);
+            }
         }
-        if (parsed->path == "/v1/query") return query(body);
-    } catch (const BadRequest& bad) {
-        return Refusal{400, bad.what(), ""};
+        for (const Entry& other : entries_) {
+            if (other.segments == pattern->segments &&
+                std::string_view(other.route->method) == route.method) {
+                throw std::logic_error(std::string("two routes for ") + route.path);
+            }
+        }
+        entries_.push_back({&route, pattern->segments});
     }
-    if (parsed->path == "/v1/tables") return TablesRequest{};
-    return HealthRequest{};
+}
+
+std::vector<const Router::Entry*> Router::atPath(const Target& target) const {
+    std::vector<const Entry*> found;
+    for (const Entry& entry : entries_) {
+        const Route& route = *entry.route;
+        if (std::equal(target.segments.begin(), target.segments.end(), entry.segments.begin(),
+                       entry.segments.end(),
+                       [&route](const std::string& segment, const std::string& pattern) {
+                           return fits(segment, pattern, route);
+                       })) {
+            found.push_back(&entry);
+        }
+    }
+    return found;
+}
+
+std::variant<Match, Reply> Router::find(const Request& request) const {
+    const std::optional<Target> target = parseTarget(request.target);
+    if (!target) return errorReply(400, "the request's target has a malformed escape");
+    const std::vector<const Entry*> entries = atPath(*target);
+    if (entries.empty()) return errorReply(404, "there is nothing at " + target->path);
+    std::vector<const Route*> here;
+    const Entry* wanted = nullptr;
+    for (const Entry* entry : entries) {
+        here.push_back(entry->route);
+        if (wanted == nullptr && answers(*entry->route, request.method)) wanted = entry;
+    }
+    if (request.method == "OPTIONS") return Reply{204, "", "", {{"Allow", allowed(here)}}};
+    if (wanted == nullptr) return wrongMethod(target->path, here);
+    if (request.peer.access < wanted->route->access) {
+        return errorReply(403, "you may only read from this host");
+    }
+    Match match{wanted->route, target->path, {}, {}};
+    takePath(match, wanted->segments, *target);
+    try {
+        takeQuery(match, *target);
+    } catch (const BadRequest& bad) {
+        return errorReply(400, bad.what());
+    }
+    return match;
 }
 
 }  // namespace host

@@ -1,59 +1,46 @@
-/// From an HTTP request to what it asks for, or to the reason why it is refused. Runs nothing.
+/// Finds the route of a request.
 #pragma once
 
 #include <string>
-#include <string_view>
+#include <utility>
 #include <variant>
 #include <vector>
 
-#include "embedded/oxa_host.h"
+#include "host/api/route.h"
 #include "host/http/url.h"
-#include "host/tables/code_page.h"
 
 namespace host {
 
-struct TablesRequest {};
-struct HealthRequest {};
-
-struct QueryRequest {
-    const oxa::Table* table = nullptr;  ///< the router's
-    std::vector<oxa::Predicate> where;
+/// A request's route and the values that it gives to the route's parameters.
+struct Match {
+    const Route* route = nullptr;  ///< the router's
+    std::string path;
+    std::vector<std::pair<std::string, std::string>> parameters;  ///< those that the route names
+    std::vector<std::pair<std::string, std::string>> others;      ///< in their order
 };
 
-struct EventsRequest {
-    const oxa::Table* table = nullptr;  ///< the router's
-    std::vector<oxa::Predicate> where;
-};
-
-struct Refusal {
-    unsigned status = 400;  ///< an HTTP status
-    std::string text;       ///< a sentence for the client, UTF-8 as far as the request was
-    std::string allow;      ///< with 405: the method that the path knows
-};
-
-using Request = std::variant<TablesRequest, HealthRequest, QueryRequest, EventsRequest, Refusal>;
-
-/// Immutable; may be used by several threads at once.
+/// Immutable; any thread.
 class Router {
 public:
-    /// The tables that are offered, and the code page that they speak.
-    Router(std::vector<oxa::Table> tables, CodePage codePage)
-        : tables_(std::move(tables)), codePage_(std::move(codePage)) {}
+    /// Throws std::logic_error when a row contradicts itself: a path that names a parameter which
+    /// the row does not describe, two rows for the same request.
+    explicit Router(std::vector<Route> routes);
 
-    /// `target` and `body` as they came.
-    Request route(std::string_view method, std::string_view target, std::string_view body) const;
+    /// The route, or the reply that says why there is none: 400, 403, 404, 405, and the reply to
+    /// OPTIONS. Looks at the method, the target and what the peer may do; not at the body.
+    std::variant<Match, Reply> find(const Request& request) const;
 
-    const std::vector<oxa::Table>& tables() const { return tables_; }
-    const CodePage& codePage() const { return codePage_; }
-    /// The table of that exact name, or null.
-    const oxa::Table* find(std::string_view name) const;
+    const std::vector<Route>& routes() const { return routes_; }
 
 private:
-    Request query(std::string_view body) const;
-    Request events(const Target& target) const;
+    struct Entry {
+        const Route* route;
+        std::vector<std::string> segments;  ///< of its path
+    };
+    std::vector<const Entry*> atPath(const Target& target) const;
 
-    const std::vector<oxa::Table> tables_;
-    const CodePage codePage_;
+    const std::vector<Route> routes_;
+    std::vector<Entry> entries_;
 };
 
 }  // namespace host

@@ -1,26 +1,24 @@
-/// An answer before it becomes HTTP.
+/// One complete HTTP response, before it becomes bytes.
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <utility>
-
-#include "host/api/router.h"
-#include "host/tables/json_documents.h"
+#include <vector>
 
 namespace host {
 
 struct Reply {
     unsigned status = 200;
-    std::string body;   ///< JSON
-    std::string allow;  ///< value of the Allow field; none when empty
+    std::string body;                       ///< bytes as they are sent
+    std::string type = "application/json";  ///< Content-Type; not sent with status 204
+    std::vector<std::pair<std::string, std::string>> fields{};  ///< further header fields
 };
 
-inline Reply errorReply(unsigned status, std::string_view text) {
-    return {status, errorDocument(text), ""};
-}
+/// A reply whose body is this JSON text and a line feed.
+Reply jsonReply(unsigned status, std::string document);
 
-inline Reply refusalReply(const Refusal& refusal) {
-    return {refusal.status, errorDocument(refusal.text), refusal.allow};
-}
+/// {"error": text}. Bytes of `text` that are not UTF-8 are replaced, so it may quote the client.
+Reply errorReply(unsigned status, std::string_view text);
 
 }  // namespace host

@@ -2,12 +2,10 @@
 
 #include <fcntl.h>
 #include <sys/socket.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <boost/asio/posix/stream_descriptor.hpp>
 #include <boost/asio/post.hpp>
-#include <boost/asio/steady_timer.hpp>
 #include <cerrno>
 #include <exception>
 #include <utility>
@@ -26,9 +24,9 @@ using Error = boost::system::error_code;
 
 /// How long accepting pauses when the process is out of descriptors.
 constexpr std::chrono::milliseconds kAcceptPause{100};
-/// How often a server that ends looks whether all is done.
+/// How often a server that is ending checks whether everything is done.
 constexpr std::chrono::milliseconds kEndPoll{10};
-/// How long clients have to take what is left for them once the task in hand has ended.
+/// How long clients have to take what is left for them once nothing else is under way.
 constexpr std::chrono::milliseconds kFlushTime{1'000};
 
 int duplicate(int descriptor) {
@@ -37,20 +35,12 @@ int duplicate(int descriptor) {
     return copy;
 }
 
-/// Processes of the own user and of root may connect, whatever became of the socket's mode.
-bool mayConnect(int connection) {
-    ucred peer{};
-    socklen_t length = sizeof peer;
-    if (::getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &length) != 0) return false;
-    return peer.uid == ::geteuid() || peer.uid == 0;
-}
-
 }  // namespace
 
 struct HttpServer::Implementation {
-    Implementation(int listenerDescriptor, Router router, std::string home,
+    Implementation(int listenerDescriptor, Handler& handler, ServerCounts& counts,
                    const ServerLimits& limits)
-        : core(std::move(router), std::move(home), limits),
+        : core(handler, counts, limits),
           listener(core.io, duplicate(listenerDescriptor)),
           signal(core.io),
           timer(core.io) {}
@@ -67,7 +57,7 @@ struct HttpServer::Implementation {
     ServerCore core;
     net::posix::basic_stream_descriptor<net::io_context::executor_type> listener;
     net::posix::basic_stream_descriptor<net::io_context::executor_type> signal;
-    net::basic_waitable_timer<Clock, net::wait_traits<Clock>, net::io_context::executor_type> timer;
+    Timer timer;
     Clock::time_point deadline;
 };
 
@@ -97,7 +87,8 @@ void HttpServer::Implementation::acceptAll() {
 }
 
 void HttpServer::Implementation::admit(FileDescriptor connection) {
-    const bool allowed = mayConnect(connection.get());
+    const Peer peer = peerOf(connection.get());
+    const bool allowed = peer.access != Access::None;
     const bool full = core.connections.size() - core.refusals >= core.limits.connections;
     if ((!allowed || full) && core.refusals >= core.limits.refusals) return;
     Stream stream(core.io.get_executor());
@@ -105,7 +96,7 @@ void HttpServer::Implementation::admit(FileDescriptor connection) {
     stream.socket().assign(net::local::stream_protocol(), connection.get(), error);
     if (error) return;
     connection.release();
-    const auto session = std::make_shared<HttpSession>(core, std::move(stream));
+    const auto session = std::make_shared<HttpSession>(core, std::move(stream), peer);
     if (!allowed) return session->refuse(403, "this host serves its own user only");
     if (full) return session->refuse(503, "too many connections are open");
     session->serve();
@@ -132,14 +123,13 @@ void HttpServer::Implementation::beginEnd(std::chrono::milliseconds grace) {
         open.push_back(entry.second);
     for (const auto& connection : open)
         connection->prepareForEnd();
-    // Waits for the table's lock, which a dispatch in progress holds for a moment.
-    core.watch.holdAfterTask();
+    core.handler.prepareForEnd();
     pollEnd();
 }
 
 void HttpServer::Implementation::pollEnd() {
     const auto now = Clock::now();
-    if (core.watch.quiet() || now >= deadline) {
+    if (core.handler.quiet() || now >= deadline) {
         return pollFlush(std::min(deadline, now + kFlushTime));
     }
     after(kEndPoll, [this] { pollEnd(); });
@@ -152,9 +142,9 @@ void HttpServer::Implementation::pollFlush(Clock::time_point flushDeadline) {
     after(kEndPoll, [this, flushDeadline] { pollFlush(flushDeadline); });
 }
 
-HttpServer::HttpServer(int listener, Router router, std::string home, const ServerLimits& limits)
-    : implementation_(
-          std::make_unique<Implementation>(listener, std::move(router), std::move(home), limits)) {
+HttpServer::HttpServer(int listener, Handler& handler, ServerCounts& counts,
+                       const ServerLimits& limits)
+    : implementation_(std::make_unique<Implementation>(listener, handler, counts, limits)) {
     implementation_->awaitConnection();
 }
 

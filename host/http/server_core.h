@@ -2,25 +2,30 @@
 /// a member says otherwise.
 #pragma once
 
+#include <boost/asio/basic_waitable_timer.hpp>
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/local/stream_protocol.hpp>
+#include <boost/asio/post.hpp>
 #include <boost/beast/core/basic_stream.hpp>
 #include <chrono>
 #include <memory>
-#include <string>
 #include <unordered_map>
-#include <vector>
+#include <utility>
 
-#include "host/api/router.h"
+#include "host/http/handler.h"
+#include "host/http/responder.h"
+#include "host/http/server_counts.h"
 #include "host/http/server_limits.h"
 #include "host/http/worker_pool.h"
-#include "host/outcomes/task_watch.h"
 
 namespace host {
 
 /// A client's connection, with time-outs.
 using Stream = boost::beast::basic_stream<boost::asio::local::stream_protocol,
                                           boost::asio::io_context::executor_type>;
+using Timer = boost::asio::basic_waitable_timer<std::chrono::steady_clock,
+                                                boost::asio::wait_traits<std::chrono::steady_clock>,
+                                                boost::asio::io_context::executor_type>;
 
 /// A connection in the server's books.
 class Connection {
@@ -28,19 +33,20 @@ public:
     virtual ~Connection() = default;
     /// True when nothing is under way that a client still waits for.
     virtual bool quiet() const = 0;
-    /// The server ends soon: a connection without a request is closed.
+    /// The server ends soon: a connection that does nothing closes, one that waits stops waiting.
     virtual void prepareForEnd() = 0;
 };
 
 struct ServerCore {
-    ServerCore(Router serverRouter, std::string serverHome, const ServerLimits& serverLimits)
+    /// Handler and counts outlive the server.
+    ServerCore(Handler& application, ServerCounts& serverCounts, const ServerLimits& serverLimits)
         : limits(serverLimits),
-          router(std::move(serverRouter)),
-          home(std::move(serverHome)),
-          watch(router.tables()),
+          handler(application),
+          counts(serverCounts),
+          mailbox(std::make_shared<Mailbox>(
+              [this](std::function<void()> run) { boost::asio::post(io, std::move(run)); })),
           pool(limits.workers, limits.waitingRequests) {}
-    /// What is torn down here may wait for the lock of a table whose executor is held.
-    ~ServerCore() { watch.release(); }
+    ~ServerCore() { mailbox->close(); }
     ServerCore(const ServerCore&) = delete;
     ServerCore& operator=(const ServerCore&) = delete;
 
@@ -52,17 +58,13 @@ struct ServerCore {
 
     boost::asio::io_context io{1};  // any thread may post
     const ServerLimits limits;
-    const Router router;
-    const std::string home;
-    const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
-    TaskWatch watch;  // any thread
+    Handler& handler;
+    ServerCounts& counts;                    // any thread
+    const std::shared_ptr<Mailbox> mailbox;  // any thread
 
     std::unordered_map<Connection*, std::shared_ptr<Connection>> connections;
     std::size_t refusals = 0;  ///< connections among them that are only told to go away
-    std::size_t streams = 0;   ///< connections among them that are event streams
     bool ending = false;
-    /// Subscriptions of streams that closed while the server ends, when their table may be locked.
-    std::vector<std::unique_ptr<oxa::Subscription>> retired;
 
     WorkerPool pool;  // any thread; last, so that its jobs end before what they use
 };

@@ -1,16 +1,16 @@
 #include "host/http/session.h"
 
 #include <boost/asio/buffer.hpp>
-#include <boost/asio/post.hpp>
 #include <boost/asio/write.hpp>
 #include <boost/beast/core/bind_handler.hpp>
 #include <boost/beast/core/string.hpp>
 #include <boost/beast/http/read.hpp>
 #include <boost/beast/http/write.hpp>
+#include <exception>
 #include <utility>
+#include <variant>
 
 #include "host/http/event_stream.h"
-#include "host/tables/query_job.h"
 
 namespace host {
 namespace {
@@ -19,6 +19,7 @@ namespace net = boost::asio;
 namespace beast = boost::beast;
 namespace http = beast::http;
 
+constexpr unsigned kNoContent = 204;
 constexpr std::size_t kReadBytes = 4096;
 constexpr std::size_t kBufferBytes = 64 * 1024;
 /// A client that goes on sending after the last answer is cut off at this.
@@ -32,10 +33,15 @@ bool wantsContinue(const http::request<http::string_body>& request) {
     return request.version() >= 11 && beast::iequals(request[http::field::expect], "100-continue");
 }
 
+/// Composes no text: memory may be what is missing.
+Reply failure() {
+    return {500, "{\"error\":\"the request failed for want of memory\"}\n"};
+}
+
 }  // namespace
 
-HttpSession::HttpSession(ServerCore& core, Stream stream)
-    : core_(core), stream_(std::move(stream)), buffer_(kBufferBytes) {}
+HttpSession::HttpSession(ServerCore& core, Stream stream, const Peer& peer)
+    : core_(core), stream_(std::move(stream)), peer_(peer), buffer_(kBufferBytes) {}
 
 void HttpSession::serve() {
     core_.add(shared_from_this());
@@ -55,6 +61,7 @@ bool HttpSession::quiet() const {
 
 void HttpSession::prepareForEnd() {
     if (state_ == State::Idle) close();
+    if (atLimit_) endWait();
 }
 
 void HttpSession::awaitRequest() {
@@ -129,70 +136,69 @@ void HttpSession::onReadError(Error error) {
 }
 
 void HttpSession::dispatch() {
-    const auto& request = parser_->get();
-    keepAlive_ = request.keep_alive() && !core_.ending;
-    isHead_ = request.method() == http::verb::head;
+    auto& message = parser_->get();
+    keepAlive_ = message.keep_alive() && !core_.ending;
+    isHead_ = message.method() == http::verb::head;
     state_ = State::Working;
+    ++exchange_;
     if (core_.ending) return respond(errorReply(503, "the host is about to end"));
-    const Request wanted =
-        core_.router.route(view(request.method_string()), view(request.target()), request.body());
-    parser_.reset();
-    std::visit([this](const auto& kind) { answer(kind); }, wanted);
-}
-
-void HttpSession::answer(const TablesRequest&) {
-    respond({200, tablesDocument(core_.router.tables()), ""});
-}
-
-void HttpSession::answer(const HealthRequest&) {
-    using std::chrono::duration_cast;
-    const auto uptime = std::chrono::steady_clock::now() - core_.started;
-    const Health health{core_.home, oxa::originNode(),
-                        duration_cast<std::chrono::seconds>(uptime).count(), core_.streams};
-    respond({200, healthDocument(health, core_.router.codePage()), ""});
-}
-
-void HttpSession::answer(const Refusal& refusal) {
-    respond(refusalReply(refusal));
-}
-
-void HttpSession::answerOverload() {
-    respond(errorReply(503, "too many requests are waiting"));
-}
-
-void HttpSession::answer(const QueryRequest& query) {
-    // The session is handed on, never kept: it ends on the I/O thread whoever is last.
-    auto job = [self = shared_from_this(), query]() mutable {
-        ServerCore& core = self->core_;
-        Reply reply = answerQuery(query, core.router.codePage(), core.watch);
-        net::post(core.io, [self = std::move(self), reply = std::move(reply)]() mutable {
-            self->respond(std::move(reply));
-        });
-    };
-    if (!core_.pool.submit(std::move(job))) answerOverload();
-}
-
-void HttpSession::answer(const EventsRequest& events) {
-    auto job = [self = shared_from_this(), where = events.where,
-                stream = std::make_shared<EventStream>(core_, *events.table)]() mutable {
-        const bool live = stream->subscribe(where);
-        ServerCore& core = self->core_;
-        net::post(core.io, [self = std::move(self), stream = std::move(stream), live] {
-            self->becomeStream(stream, live);
-        });
-    };
-    if (!core_.pool.submit(std::move(job))) answerOverload();
-}
-
-void HttpSession::becomeStream(const std::shared_ptr<EventStream>& events, bool live) {
-    if (!live) return respond(errorReply(500, "the table takes no subscription"));
-    if (core_.ending) {
-        events->retire();
-        return respond(errorReply(503, "the host is about to end"));
+    try {
+        Request request{std::string(view(message.method_string())),
+                        std::string(view(message.target())), std::move(message.body()), peer_};
+        parser_.reset();
+        std::variant<Answer, Job> wanted = core_.handler.handle(std::move(request));
+        if (auto* const job = std::get_if<Job>(&wanted)) return submit(std::move(*job));
+        answer(std::get<Answer>(std::move(wanted)));
+    } catch (const std::exception&) {
+        respond(failure());
     }
+}
+
+void HttpSession::submit(Job job) {
+    const Responder responder(core_.mailbox, weak_from_this(), exchange_);
+    const bool taken = core_.pool.submit([responder, job = std::move(job)] {
+        try {
+            responder(job());
+        } catch (...) {
+            responder(failure());
+        }
+    });
+    if (!taken) respond(errorReply(503, "too many requests are waiting"));
+}
+
+void HttpSession::take(unsigned exchange, Answer given) {
+    if (state_ == State::Working && exchange == exchange_) answer(std::move(given));
+}
+
+void HttpSession::answer(Answer given) {
+    atLimit_ = nullptr;
+    if (waitTimer_) waitTimer_->cancel();
+    std::visit([this](auto&& kind) { answer(std::move(kind)); }, std::move(given));
+}
+
+void HttpSession::answer(std::unique_ptr<EventSource> source) {
+    if (core_.ending) return respond(errorReply(503, "the host is about to end"));
+    if (isHead_) return respond({200, "", "text/event-stream"});
+    const auto self = shared_from_this();  // what the books hold may be all that holds it
     state_ = State::Closed;
     core_.remove(this);
-    events->start(std::move(stream_));
+    std::make_shared<EventStream>(core_, std::move(stream_), std::move(source))->start();
+}
+
+void HttpSession::answer(Later later) {
+    atLimit_ = std::move(later.atLimit);
+    if (core_.ending) return endWait();
+    if (!waitTimer_) waitTimer_.emplace(core_.io);
+    waitTimer_->expires_after(later.limit);
+    waitTimer_->async_wait([weak = weak_from_this(), exchange = exchange_](Error error) {
+        const auto self = weak.lock();
+        if (!error && self && self->exchange_ == exchange && self->atLimit_) self->endWait();
+    });
+    later.begin(Responder(core_.mailbox, weak_from_this(), exchange_));
+}
+
+void HttpSession::endWait() {
+    submit(std::exchange(atLimit_, nullptr));
 }
 
 void HttpSession::respond(Reply reply) {
@@ -201,11 +207,14 @@ void HttpSession::respond(Reply reply) {
     parser_.reset();
     keepAlive_ = keepAlive_ && !core_.ending;
     response_.emplace(static_cast<http::status>(reply.status), 11);
-    response_->set(http::field::content_type, "application/json");
-    if (!reply.allow.empty()) response_->set(http::field::allow, reply.allow);
+    for (const auto& [name, value] : reply.fields)
+        response_->set(name, value);
     response_->keep_alive(keepAlive_);
-    reply.body += '\n';
-    response_->content_length(reply.body.size());
+    if (reply.status != kNoContent) {
+        response_->set(http::field::content_type, reply.type);
+        // The head alone is also asked of streams, whose length nobody knows.
+        if (!isHead_ || !reply.body.empty()) response_->content_length(reply.body.size());
+    }
     if (!isHead_) response_->body() = std::move(reply.body);
     stream_.expires_after(core_.limits.answerTime);
     http::async_write(stream_, *response_, [self = shared_from_this()](Error error, std::size_t) {

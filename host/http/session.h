@@ -8,22 +8,24 @@
 #include <optional>
 #include <string>
 
-#include "host/http/reply.h"
 #include "host/http/server_core.h"
 
 namespace host {
 
-/// Lives on the I/O thread; queries and subscriptions are handed to the worker threads and come
-/// back. Requests that a client sends without waiting for answers are read and answered in order.
-class HttpSession final : public Connection, public std::enable_shared_from_this<HttpSession> {
+/// Lives on the I/O thread. Requests go to the server's handler, their jobs to the worker threads.
+/// When a client sends requests without waiting for the answers, they are answered in order.
+class HttpSession final : public Connection,
+                          public AnswerTaker,
+                          public std::enable_shared_from_this<HttpSession> {
 public:
-    HttpSession(ServerCore& core, Stream stream);
+    HttpSession(ServerCore& core, Stream stream, const Peer& peer);
 
     /// Enters the server's books and reads requests.
     void serve();
     /// Enters the server's books as a refusal: answers before anything is read, and closes.
     void refuse(unsigned status, std::string_view text);
 
+    void take(unsigned exchange, Answer answer) override;
     bool quiet() const override;
     void prepareForEnd() override;
 
@@ -39,13 +41,12 @@ private:
     void onReadError(Error error);
 
     void dispatch();
-    void answer(const TablesRequest&);
-    void answer(const HealthRequest&);
-    void answer(const QueryRequest& query);
-    void answer(const EventsRequest& events);
-    void answer(const Refusal& refusal);
-    void answerOverload();
-    void becomeStream(const std::shared_ptr<class EventStream>& events, bool live);
+    void submit(Job job);
+    void answer(Answer answer);
+    void answer(Reply reply) { respond(std::move(reply)); }
+    void answer(std::unique_ptr<EventSource> source);
+    void answer(Later later);
+    void endWait();
 
     void respond(Reply reply);
     void onWritten(Error error);
@@ -54,10 +55,14 @@ private:
 
     ServerCore& core_;
     Stream stream_;
+    const Peer peer_;
     boost::beast::flat_buffer buffer_;
     std::optional<boost::beast::http::request_parser<boost::beast::http::string_body>> parser_;
     std::optional<boost::beast::http::response<boost::beast::http::string_body>> response_;
     State state_ = State::Idle;
+    unsigned exchange_ = 0;           ///< counts requests; tells late answers from others
+    std::optional<Timer> waitTimer_;  ///< made by the first answer that comes later
+    Job atLimit_;                     ///< with State::Working: ends the wait
     bool refusal_ = false;
     bool keepAlive_ = false;
     bool isHead_ = false;

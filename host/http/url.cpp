@@ -28,6 +28,20 @@ std::optional<std::string> decode(std::string_view text, bool plusIsBlank) {
     return out;
 }
 
+/// The segments of a path whose escapes are well-formed. A path without a leading slash, such as
+/// "*", is one segment that no route has.
+std::vector<std::string> segmentsOf(std::string_view path) {
+    std::vector<std::string> segments;
+    if (path.empty() || path.front() != '/') return {std::string(path)};
+    while (!path.empty()) {
+        path.remove_prefix(1);
+        const std::string_view segment = path.substr(0, path.find('/'));
+        segments.push_back(decode(segment, false).value_or(""));
+        path.remove_prefix(segment.size());
+    }
+    return segments;
+}
+
 /// What follows scheme and host of an absolute target.
 std::string_view withoutOrigin(std::string_view target) {
     constexpr std::string_view scheme = "http://";
@@ -43,9 +57,10 @@ std::optional<Target> parseTarget(std::string_view target) {
     target = withoutOrigin(target);
     target = target.substr(0, target.find('#'));
     const std::size_t mark = target.find('?');
-    const std::optional<std::string> path = decode(target.substr(0, mark), false);
+    const std::string_view encoded = target.substr(0, mark);
+    const std::optional<std::string> path = decode(encoded, false);
     if (!path) return std::nullopt;
-    Target parsed{*path, {}};
+    Target parsed{*path, segmentsOf(encoded), {}};
     std::string_view rest =
         mark == std::string_view::npos ? std::string_view() : target.substr(mark + 1);
     while (!rest.empty()) {

@@ -1,29 +1,27 @@
-/// Knows whether the plug-in is at work, so that the host does not end in the middle of a task.
+/// Whether the plug-in is at work, so that the host does not end in the middle of a task.
 #pragma once
 
-#include <condition_variable>
 #include <map>
 #include <memory>
 #include <string>
-#include <vector>
 
 #include "embedded/mutex.h"
 #include "embedded/oxa_host.h"
+#include "host/outcomes/outcome_feed.h"
+#include "host/tables/table_set.h"
 
 namespace host {
 
-/// Two kinds of work are known: requests that a thread of the host is sampling now, and tasks that
-/// the request table accepted and whose outcome the deploy status table has not published yet.
+/// Knows two kinds of work: queries that a thread of the host is running now, and tasks that the
+/// request table has accepted and whose outcome has not been published yet.
 ///
-/// A task is counted when the reply to its request says so (RETVAL 0 of a queued command) and
-/// leaves the count with the outcome of its TRANSID. A request whose own conditions hide its reply
-/// row is not counted.
+/// A task counts from the reply that accepts it until an outcome with its TRANSID comes. A request
+/// whose own conditions hide its reply row is not counted.
 class TaskWatch {
 public:
-    /// `tables`: those of the plug-in, which outlive this object; without a request table or a
-    /// deploy status table nothing is ever queued.
-    explicit TaskWatch(const std::vector<oxa::Table>& tables);
-    ~TaskWatch();
+    /// Both outlive this object. Without a request table and an outcome table that have the columns
+    /// that matter, no task is ever counted.
+    TaskWatch(const TableSet& tables, OutcomeFeed& feed);
     TaskWatch(const TaskWatch&) = delete;
     TaskWatch& operator=(const TaskWatch&) = delete;
 
@@ -42,14 +40,8 @@ public:
         const oxa::Table& table_;
     };
 
-    /// From now on the executor is held when it publishes an outcome, after every other subscriber
-    /// has got it: the next task is not begun only to be cut off. Subscriptions on the deploy
-    /// status table must be neither opened nor closed afterwards, their table being locked while
-    /// the executor is held.
-    void holdAfterTask();
-    /// Lets a held executor go, and holds none any more.
-    void release();
-    /// No request runs, and no task is in hand: none is outstanding, or the executor is held.
+    /// Whether no query runs and no task is in hand: none is outstanding, or the feed holds the
+    /// executor. Any thread.
     bool quiet() const;
 
 private:
@@ -57,30 +49,27 @@ private:
         const oxa::Column* transid = nullptr;
         const oxa::Column* command = nullptr;
         const oxa::Column* retval = nullptr;
+        const oxa::Column* outcomeTransid = nullptr;
+        bool complete() const;
     };
-    static Columns columnsOf(const oxa::Table& table);
+    static Columns columnsOf(const oxa::Table& requests, const oxa::Table& outcomes);
 
     void began();
     void ended();
     void accepted(const std::string& transid);
     void published(const oxa::Rows& rows);
 
-    const oxa::Table* requests_ = nullptr;
-    const oxa::Table* outcomes_ = nullptr;
-    Columns requestColumns_;
-    Columns outcomeColumns_;
+    OutcomeFeed& feed_;
+    const oxa::Table* requests_ = nullptr;  ///< null: no task is counted
+    Columns columns_;
 
     mutable embedded::Mutex lock_;
-    std::condition_variable released_;
     unsigned running_ ZAV_GUARDED_BY(lock_) = 0;
-    /// Tasks accepted less outcomes published. Negative: the outcome came before the thread that
-    /// sampled the request got to say that it was accepted.
+    /// By TRANSID: tasks accepted less outcomes published. Negative when the outcome came before
+    /// the thread that ran the query got to report that the task was accepted.
     std::map<std::string, int> outstanding_ ZAV_GUARDED_BY(lock_);
-    bool held_ ZAV_GUARDED_BY(lock_) = false;
-    bool letGo_ ZAV_GUARDED_BY(lock_) = false;
 
-    std::unique_ptr<oxa::Subscription> counting_;
-    std::unique_ptr<oxa::Subscription> holding_;
+    std::unique_ptr<OutcomeFeed::Subscription> outcomes_;  ///< last, so that it ends first
 };
 
 }  // namespace host

@@ -4,9 +4,8 @@
 #include <langinfo.h>
 
 #include <cerrno>
+#include <stdexcept>
 #include <utility>
-
-#include "host/process/start_error.h"
 
 namespace host {
 namespace {
@@ -14,7 +13,7 @@ namespace {
 constexpr const char* kUtf8 = "UTF-8";
 constexpr std::string_view kReplacement = "\xEF\xBF\xBD";
 
-/// One conversion; the C library's converters keep a state and so serve one thread each.
+/// One conversion. The C library's converters keep state, so each serves one thread.
 class Converter {
 public:
     Converter(const char* to, const char* from) : handle_(::iconv_open(to, from)) {}
@@ -28,8 +27,8 @@ public:
         return handle_ != reinterpret_cast<iconv_t>(-1);  // NOLINT: iconv's own error value
     }
 
-    /// Converts from the front of `text`, which loses what was converted. Returns 0, or why it
-    /// stopped: EILSEQ (no such character) or EINVAL (the last character is incomplete).
+    /// Converts `text` and removes from its front what was converted. Returns 0, or why it stopped:
+    /// EILSEQ (no such character) or EINVAL (the last character is incomplete).
     int run(std::string_view& text, std::string& out) const {
         while (true) {
             char piece[512];
@@ -45,7 +44,7 @@ public:
         }
     }
 
-    /// Writes what returns a stateful code page to its initial state.
+    /// Appends the bytes that bring a stateful code page back to its initial state.
     void finish(std::string& out) const {
         char piece[16];
         char* to = piece;
@@ -65,8 +64,8 @@ bool isAscii(std::string_view text) {
     return true;
 }
 
-/// The position of the first sequence that would stand for a number beyond Unicode, or the text's
-/// length. The C library's converters take such sequences, up to six bytes long, for characters.
+/// The position of the first sequence that encodes a number beyond Unicode, or the text's length.
+/// The C library's converters take such sequences, up to six bytes long, for characters.
 std::size_t startBeyondUnicode(std::string_view text) {
     for (std::size_t i = 0; i < text.size(); ++i) {
         const auto lead = static_cast<unsigned char>(text[i]);
@@ -77,8 +76,8 @@ std::size_t startBeyondUnicode(std::string_view text) {
     return text.size();
 }
 
-/// Appends the whole text, with the replacement character in place of each byte that is no part of
-/// a character and of a cut sequence at the end.
+/// Appends the whole text. The replacement character stands for each byte that belongs to no
+/// character, and for a sequence that is cut at the end.
 void appendMended(const Converter& converter, std::string_view text, std::string& out) {
     while (const int error = converter.run(text, out)) {
         out += kReplacement;
@@ -90,7 +89,7 @@ void appendMended(const Converter& converter, std::string_view text, std::string
 
 CodePage::CodePage(std::string name) : name_(std::move(name)) {
     if (!Converter(kUtf8, name_.c_str()).usable() || !Converter(name_.c_str(), kUtf8).usable()) {
-        throw StartError("the C library has no converter for the code page " + name_);
+        throw std::runtime_error("the C library has no converter for the code page " + name_);
     }
 }
 

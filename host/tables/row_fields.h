@@ -1,4 +1,4 @@
-/// The columns of a row's bytes.
+/// Reads single columns from the bytes of a row.
 #pragma once
 
 #include <cstdint>
@@ -8,7 +8,7 @@
 
 namespace host {
 
-/// A row's bytes; borrowed.
+/// The bytes of one row, which belong to somebody else.
 using RowView = std::string_view;
 
 inline RowView rowOf(const oxa::Rows& rows, std::size_t index) {

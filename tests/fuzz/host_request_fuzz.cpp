@@ -1,11 +1,13 @@
-// Requests to the host: what is not refused names the table's columns and can be run, and every
-// answer is a JSON document. An input is a line "METHOD TARGET" and the body.
+// Requests to the host: whatever comes is answered, every answer is a JSON document with one of the
+// statuses that the interface knows, and events come only from streams that can be opened. An input
+// is a line "METHOD TARGET" and the body.
 
 #include <nlohmann/json.hpp>
 
-#include "host/api/router.h"
-#include "host/tables/json_documents.h"
 #include "conformance/sample_table.h"
+#include "host/api/api.h"
+#include "host/api/routes.h"
+#include "host/api/services.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;
@@ -15,38 +17,56 @@ namespace {
 
 constexpr std::size_t kRows = 4;
 
-/// The table and its rows; it lives as long as the process.
-const host::Router& router() {
+SampleManager& table() {
     static SampleManager& manager = *new SampleManager;
-    static const host::Router& made = *[] {
-        manager.sample = {sampleRow("one", 1, "first"), sampleRow("two", -2, "\xC3\xA9\xFF"),
+    return manager;
+}
+
+/// The interface on one table with a few rows; it lives as long as the process.
+host::Api& api() {
+    static host::Api& made = *[] {
+        table().sample = {sampleRow("one", 1, "first"), sampleRow("two", -2, "\xC3\xA9\xFF"),
                           sampleRow("", 0, "a*b"), sampleRow("three", 2147483647)};
-        require(manager.sample.size() == kRows, "all rows are there");
-        return new host::Router(oxa::tables(), host::CodePage("UTF-8"));
+        require(table().sample.size() == kRows, "all rows are there");
+        require(table().RegisterWithManager() == OXA_OK, "the table is offered");
+        auto& services = *new host::Services(oxa::tables(), host::CodePage("UTF-8"), "/home");
+        return new host::Api(services, host::routes());
     }();
     return made;
 }
 
-void checkQuery(const oxa::Table& table, const std::vector<oxa::Predicate>& where) {
-    for (const oxa::Predicate& predicate : where) {
-        require(table.find(predicate.column) != nullptr, "conditions are on columns of the table");
-        require(predicate.value.find('\0') == std::string::npos, "values have no terminator");
-    }
-    oxa::Rows rows;
-    require(oxa::query(table.name, where, rows) == OXA_OK, "every condition can be run");
-    require(rows.count() <= kRows && (!where.empty() || rows.count() == kRows),
-            "rows are those of the table");
-    const json document = json::parse(rowsDocument(table, rows, router().codePage()));
-    require(document.at("rows").size() == rows.count(), "every row is shown");
+host::Answer answerTo(host::Request request) {
+    auto handled = api().handle(std::move(request));
+    if (auto* const job = std::get_if<host::Job>(&handled)) return (*job)();
+    return std::get<host::Answer>(std::move(handled));
 }
 
-void checkRefusal(const host::Refusal& refusal) {
-    require(refusal.status == 400 || refusal.status == 404 || refusal.status == 405,
+void checkError(const host::Reply& reply, const json& document) {
+    require(reply.status == 400 || reply.status == 404 || reply.status == 405,
             "a refusal has one of three statuses");
-    require(!refusal.text.empty(), "a refusal says why");
-    require(refusal.allow.empty() == (refusal.status != 405), "a wrong method says the right one");
-    require(json::parse(host::errorDocument(refusal.text)).contains("error"),
-            "a refusal is a document");
+    require(!document.at("error").get<std::string>().empty(), "a refusal says why");
+    require(reply.fields.empty() == (reply.status != 405), "a wrong method says the right one");
+}
+
+void checkReply(const host::Reply& reply) {
+    if (reply.status == 204) {
+        require(reply.body.empty() && !reply.fields.empty(), "methods stand in the head alone");
+        return;
+    }
+    const json document = json::parse(reply.body);
+    if (reply.status != 200) return checkError(reply, document);
+    if (document.contains("rows"))
+        require(document.at("rows").size() <= kRows, "rows are those of the table");
+}
+
+/// A row that is published meanwhile is an event, or it is not what the stream is for.
+void checkStream(host::EventSource& source) {
+    require(source.empty(), "a stream begins with nothing");
+    require(table().publish(sampleRow("two", -2, "\xC3\xA9\xFF")) == OXA_OK, "streams take rows");
+    const std::string text = source.take();
+    require(text.empty() || text.find("data: {\"NAME\":\"two\",\"VALUE\":-2,") == 0,
+            "an event shows its row");
+    require(source.empty(), "what was taken is gone");
 }
 
 }  // namespace
@@ -56,13 +76,14 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::string_view line = input.line();
     const std::size_t blank = std::min(line.find(' '), line.size());
     const std::string_view target = line.substr(std::min(blank + 1, line.size()));
-    const host::Request request = router().route(line.substr(0, blank), target, input.rest());
-    if (const auto* const query = std::get_if<host::QueryRequest>(&request)) {
-        checkQuery(*query->table, query->where);
-    } else if (const auto* const events = std::get_if<host::EventsRequest>(&request)) {
-        checkQuery(*events->table, events->where);
-    } else if (const auto* const refusal = std::get_if<host::Refusal>(&request)) {
-        checkRefusal(*refusal);
+    const host::Answer answer = answerTo({std::string(line.substr(0, blank)),
+                                          std::string(target),
+                                          std::string(input.rest()),
+                                          {0, 0, 0, host::Access::Act}});
+    if (const auto* const reply = std::get_if<host::Reply>(&answer)) {
+        checkReply(*reply);
+    } else {
+        checkStream(*std::get<std::unique_ptr<host::EventSource>>(answer));
     }
     return 0;
 }

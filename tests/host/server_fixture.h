@@ -11,6 +11,9 @@
 #include <string>
 #include <thread>
 
+#include "host/api/api.h"
+#include "host/api/routes.h"
+#include "host/api/services.h"
 #include "host/http/server.h"
 #include "host/made_up_table.h"
 #include "host/process/socket_file.h"
@@ -40,9 +43,10 @@ protected:
 
     void start(const host::ServerLimits& limits = {}) {
         socket.emplace(scratch.path("s"));
-        server = std::make_unique<host::HttpServer>(
-            socket->listen(), host::Router(oxa::tables(), host::CodePage("UTF-8")), "/home/of/it",
-            limits);
+        services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+        api.emplace(*services, host::routes());
+        server =
+            std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts, limits);
         serving = std::thread([this] {
             server->run();
             ended = true;
@@ -53,6 +57,8 @@ protected:
         server->stop();
         serving.join();
         server.reset();
+        api.reset();
+        services.reset();
     }
 
     RawClient connect() { return RawClient(scratch.path("s")); }
@@ -75,6 +81,8 @@ protected:
     ScratchDir scratch;
     MadeUpTable table{"PLAIN", plainColumns()};
     std::optional<host::SocketFile> socket;
+    std::optional<host::Services> services;
+    std::optional<host::Api> api;
     std::unique_ptr<host::HttpServer> server;
     std::thread serving;
     std::atomic<bool> ended{false};

@@ -3,7 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <optional>
 #include <thread>
 
@@ -29,11 +28,12 @@ protected:
     Watch() {
         requests.RegisterWithManager();
         outcomes.RegisterWithManager();
-        tables = oxa::tables();
-        watch.emplace(tables);
+        tables.emplace(oxa::tables());
+        feed.emplace(*tables);
+        watch.emplace(*tables, *feed);
     }
 
-    const oxa::Table& requestTable() { return tables.at(0); }
+    const oxa::Table& requestTable() { return *tables->find("KAGREQT"); }
     /// A request that was answered with one row.
     void answer(const std::string& row) {
         TaskWatch::Request request(*watch, requestTable());
@@ -43,7 +43,8 @@ protected:
 
     MadeUpTable requests{"KAGREQT", taskColumns()};
     MadeUpTable outcomes{"KAGDYST", taskColumns()};
-    std::vector<oxa::Table> tables;
+    std::optional<host::TableSet> tables;
+    std::optional<host::OutcomeFeed> feed;
     std::optional<TaskWatch> watch;
 };
 
@@ -84,7 +85,7 @@ TEST_F(Watch, RefusedTasksAndThoseThatRanAtOnceDoNotCount) {
 TEST_F(Watch, RowsOfOtherTablesDoNotCount) {
     const std::string row = taskRow("t1", "START", 0);
     {
-        TaskWatch::Request request(*watch, tables.at(1));
+        TaskWatch::Request request(*watch, *tables->find("KAGDYST"));
         request.answered({row, static_cast<unsigned>(row.size())});
     }
     EXPECT_TRUE(watch->quiet());
@@ -109,39 +110,45 @@ TEST_F(Watch, AForeignOutcomeDoesNotHideALaterTask) {
     EXPECT_FALSE(watch->quiet());
 }
 
-TEST_F(Watch, HoldsTheExecutorAfterTheTaskInHandWhenAllOthersHaveItsOutcome) {
+TEST_F(Watch, IsQuietWhileTheExecutorIsHeldWhateverIsQueued) {
     answer(taskRow("t1", "START", 0));
     answer(taskRow("t2", "START", 0));
-    std::atomic<int> seen{0};
-    const auto subscriber = oxa::subscribe("KAGDYST", {}, [&](const oxa::Rows&) {
-        ++seen;
-        return static_cast<int>(OXA_OK);
-    });
-    watch->holdAfterTask();
-    EXPECT_FALSE(watch->quiet());
-    std::atomic<bool> next{false};
-    std::thread executor([&] {
-        publish("t1");
-        next = true;
-        publish("t2");
-    });
+    feed->holdAfterOutcome();
+    EXPECT_FALSE(watch->quiet()) << "the first task is in hand";
+    std::thread executor([&] { publish("t1"); });
     EXPECT_TRUE(eventually([&] { return watch->quiet(); }));
-    EXPECT_EQ(1, seen);
-    std::this_thread::sleep_for(std::chrono::milliseconds(50));
-    EXPECT_FALSE(next) << "the second task would have begun";
-    watch.reset();
+    TaskWatch::Request request(*watch, requestTable());
+    EXPECT_FALSE(watch->quiet()) << "a query still runs";
+    feed->release();
     executor.join();
-    EXPECT_EQ(2, seen);
 }
 
-TEST_F(Watch, WithoutATaskInHandTheEndIsNear) {
-    watch->holdAfterTask();
+TEST_F(Watch, WithoutATaskInHandIsQuietAtOnce) {
+    feed->holdAfterOutcome();
     EXPECT_TRUE(watch->quiet());
 }
 
 TEST(WatchWithoutTables, IsQuiet) {
-    TaskWatch watch({});
-    watch.holdAfterTask();
+    const host::TableSet none({});
+    host::OutcomeFeed feed(none);
+    TaskWatch watch(none, feed);
+    feed.holdAfterOutcome();
+    EXPECT_TRUE(watch.quiet());
+}
+
+TEST(WatchWithoutColumns, CountsNothing) {
+    MadeUpTable requests("KAGREQT", {{"transid", 0, 8, OXA_TYPE_CHARACTER}});
+    MadeUpTable outcomes("KAGDYST", {{"transid", 0, 8, OXA_TYPE_CHARACTER}});
+    requests.RegisterWithManager();
+    outcomes.RegisterWithManager();
+    const host::TableSet tables(oxa::tables());
+    host::OutcomeFeed feed(tables);
+    TaskWatch watch(tables, feed);
+    {
+        TaskWatch::Request request(watch, *tables.find("KAGREQT"));
+        request.answered({std::string(8, 'x'), 8});
+    }
+    outcomes.publish(std::string(8, 'x'));
     EXPECT_TRUE(watch.quiet());
 }
 

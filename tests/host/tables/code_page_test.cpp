@@ -79,7 +79,7 @@ TEST(CodePage, IsThatOfTheProcess) {
 }
 
 TEST(CodePage, MustBeKnown) {
-    EXPECT_THROW(CodePage("NO-SUCH-PAGE"), host::StartError);
+    EXPECT_THROW(CodePage("NO-SUCH-PAGE"), std::runtime_error);
 }
 
 }  // namespace

@@ -1,15 +1,13 @@
-#include "host/tables/json_documents.h"
+#include "host/tables/table_documents.h"
 
 #include <nlohmann/json.hpp>
-
-#include "host/process/version.h"
 
 namespace host {
 namespace {
 
 using Json = nlohmann::ordered_json;
 
-/// Whatever slipped through as text is replaced where it is no UTF-8 instead of thrown at.
+/// Replaces bytes that are not UTF-8, where the library would throw by default.
 std::string dump(const Json& document) {
     return document.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
@@ -56,19 +54,6 @@ std::string tablesDocument(const std::vector<oxa::Table>& tables) {
                         {"columns", std::move(columns)}});
     }
     return dump({{"tables", std::move(list)}});
-}
-
-std::string healthDocument(const Health& health, const CodePage& codePage) {
-    return dump({{"version", kVersion},
-                 {"width", static_cast<int>(sizeof(void*) * 8)},
-                 {"home", codePage.toUtf8(health.home)},
-                 {"origin_node", codePage.toUtf8(health.originNode)},
-                 {"uptime_seconds", health.uptimeSeconds},
-                 {"subscriptions", health.subscriptions}});
-}
-
-std::string errorDocument(std::string_view text) {
-    return dump({{"error", text}});
 }
 
 }  // namespace host

@@ -146,6 +146,46 @@ TEST_F(Events, ThatASlowReaderMissesAreCountedInTheirPlace) {
     EXPECT_EQ(77, numberOf(slow.readUntil("\n\n"))) << "the stream goes on";
 }
 
+TEST_F(Events, AreFollowedByASignOfLifeWhenThereAreNone) {
+    host::ServerLimits limits;
+    limits.heartbeat = milliseconds(20);
+    start(limits);
+    RawClient client = subscribe();
+    EXPECT_EQ(":\n\n", client.readUntil("\n\n"));
+    EXPECT_EQ(":\n\n", client.readUntil("\n\n"));
+    table.publish(plainRow("row", 1, ""));
+    std::string event;
+    while (event.empty() || event == ":\n\n")
+        event = client.readUntil("\n\n");
+    EXPECT_EQ(0U, event.find("data: {\"NAME\":\"row\""));
+}
+
+TEST_F(Events, OfTheOutcomeTableComeThroughOneSubscriptionHoweverManyFollow) {
+    MadeUpTable outcomes("KAGDYST", plainColumns());
+    outcomes.RegisterWithManager();
+    start();
+    EXPECT_EQ(1U, outcomes.liveObjects());
+    std::vector<RawClient> clients;
+    for (const char* rest : {"", "&NAME=a", "&NAME=b", "&NUMBER=2&NAME=b%20"}) {
+        clients.push_back(connect());
+        clients.back().send("GET /v1/events?table=KAGDYST" + std::string(rest) +
+                            " HTTP/1.1\r\n\r\n");
+        EXPECT_NE(std::string::npos, clients.back().readUntil("\r\n\r\n").find("200"));
+    }
+    EXPECT_EQ(1U, outcomes.liveObjects());
+    outcomes.publish(plainRow("a", 1, "first"));
+    outcomes.publish(plainRow("b", 2, "second"));
+    const std::string first = "data: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"first\"}\n\n";
+    const std::string second = "data: {\"NAME\":\"b\",\"NUMBER\":2,\"TEXT\":\"second\"}\n\n";
+    EXPECT_EQ(first, clients[0].readUntil("\n\n"));
+    EXPECT_EQ(second, clients[0].readUntil("\n\n"));
+    EXPECT_EQ(first, clients[1].readUntil("\n\n"));
+    EXPECT_EQ(second, clients[2].readUntil("\n\n"));
+    EXPECT_EQ(second, clients[3].readUntil("\n\n"));
+    stop();
+    EXPECT_EQ(0U, outcomes.liveObjects());
+}
+
 TEST_F(Events, NeverWaitForTheirReaders) {
     start();
     std::vector<RawClient> asleep;

@@ -1,4 +1,4 @@
-#include "host/outcomes/event_queue.h"
+#include "host/tables/row_queue.h"
 
 #include <algorithm>
 #include <exception>
@@ -6,10 +6,18 @@
 
 namespace host {
 
-EventQueue::EventQueue(Limits limits, std::function<void()> wake)
-    : limits_(limits), wake_(std::move(wake)) {}
+void RowQueue::onContent(Wake wake) {
+    auto shared = std::make_shared<const Wake>(std::move(wake));
+    bool first = false;
+    {
+        const embedded::MutexLock lock(lock_);
+        wake_ = shared;
+        first = !held_.empty();
+    }
+    if (first) (*shared)();
+}
 
-std::size_t EventQueue::room(std::size_t count, unsigned rowSize) const {
+std::size_t RowQueue::room(std::size_t count, unsigned rowSize) const {
     if (held_.lost > 0 || (held_.rows.rowSize != 0 && held_.rows.rowSize != rowSize)) return 0;
     const std::size_t heldBytes = held_.rows.bytes.size();
     const std::size_t byCount = limits_.rows - std::min(limits_.rows, held_.rows.count());
@@ -18,11 +26,8 @@ std::size_t EventQueue::room(std::size_t count, unsigned rowSize) const {
     return std::min({count, byCount, heldBytes == 0 ? std::max<std::size_t>(byBytes, 1) : byBytes});
 }
 
-int EventQueue::push(const oxa::Rows& rows) noexcept {
+std::size_t RowQueue::store(const oxa::Rows& rows) noexcept {
     const std::size_t count = rows.count();
-    if (count == 0) return OXA_OK;
-    const embedded::MutexLock lock(lock_);
-    const bool first = held_.empty();
     std::size_t taken = room(count, rows.rowSize);
     try {
         held_.rows.bytes.append(rows.bytes, 0, taken * rows.rowSize);
@@ -31,22 +36,35 @@ int EventQueue::push(const oxa::Rows& rows) noexcept {
         taken = 0;
     }
     held_.lost += count - taken;
+    return taken;
+}
+
+int RowQueue::push(const oxa::Rows& rows) noexcept {
+    if (rows.count() == 0) return OXA_OK;
+    std::shared_ptr<const Wake> wake;
+    std::size_t taken = 0;
+    {
+        const embedded::MutexLock lock(lock_);
+        if (held_.empty()) wake = wake_;
+        taken = store(rows);
+    }
     try {
-        if (first) wake_();
+        if (wake) (*wake)();
     } catch (const std::exception&) {
         // Without a wake-up the rows would stay for ever, and later ones would not wake either.
+        const embedded::MutexLock lock(lock_);
         held_ = {};
         return OXA_OVERFLOW;
     }
-    return taken == count ? OXA_OK : OXA_OVERFLOW;
+    return taken == rows.count() ? OXA_OK : OXA_OVERFLOW;
 }
 
-EventQueue::Batch EventQueue::take() {
+RowQueue::Batch RowQueue::take() {
     const embedded::MutexLock lock(lock_);
     return std::exchange(held_, {});
 }
 
-bool EventQueue::empty() const {
+bool RowQueue::empty() const {
     const embedded::MutexLock lock(lock_);
     return held_.empty();
 }

@@ -1,8 +1,7 @@
-/// The JSON documents that the host sends. All of them are valid UTF-8 whatever a table holds.
+/// Tables and rows as JSON. All documents are valid UTF-8, whatever a table holds.
 #pragma once
 
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "embedded/oxa_host.h"
@@ -11,24 +10,15 @@
 
 namespace host {
 
-/// What the host says about itself.
-struct Health {
-    std::string home;
-    std::string originNode;
-    long long uptimeSeconds = 0;
-    std::size_t subscriptions = 0;
-};
-
 /// One row: an object with the upper-case column names in the table's order; character values
 /// without trailing blanks, integers as numbers.
 std::string rowDocument(const oxa::Table& table, RowView row, const CodePage& codePage);
+
 /// {"rows": [...]}
 std::string rowsDocument(const oxa::Table& table, const oxa::Rows& rows, const CodePage& codePage);
+
 /// {"tables": [{"application", "name", "columns": [{"name", "offset", "length", "type"}]}]}; the
 /// type is the framework's code.
 std::string tablesDocument(const std::vector<oxa::Table>& tables);
-std::string healthDocument(const Health& health, const CodePage& codePage);
-/// {"error": text}
-std::string errorDocument(std::string_view text);
 
 }  // namespace host

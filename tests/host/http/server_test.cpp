@@ -141,12 +141,40 @@ TEST_F(BadRequests, GetAnErrorThatSaysWhatIsWrong) {
     EXPECT_EQ(200, client.get("/v1/health").status) << "the connection is still good";
 }
 
-TEST_F(BadRequests, AHeadRequestGetsNoBody) {
+TEST_F(Requests, ForAHeadGetTheFieldsOfTheWholeAnswerAndNoBody) {
     start();
     RawClient client = connect();
-    client.send("HEAD /v1/tables HTTP/1.1\r\n\r\nGET /v1/health HTTP/1.1\r\n\r\n");
+    const auto whole = client.get("/v1/tables");
+    client.send(
+        "HEAD /v1/tables HTTP/1.1\r\n\r\n"
+        "HEAD /v1/query HTTP/1.1\r\n\r\n"
+        "GET /v1/health HTTP/1.1\r\n\r\n");
+    EXPECT_EQ(whole.head, client.readUntil("\r\n\r\n"));
     EXPECT_NE(std::string::npos, client.readUntil("\r\n\r\n").find("405"));
     EXPECT_EQ(0U, client.readUntil("\r\n").find("HTTP/1.1 200 OK"));
+}
+
+TEST_F(Requests, ForTheHeadOfAStreamOpenNone) {
+    start();
+    RawClient client = connect();
+    client.send("HEAD /v1/events?table=PLAIN HTTP/1.1\r\n\r\n");
+    const std::string head = client.readUntil("\r\n\r\n");
+    EXPECT_EQ(0U, head.find("HTTP/1.1 200 OK"));
+    EXPECT_NE(std::string::npos, head.find("Content-Type: text/event-stream\r\n"));
+    EXPECT_EQ(std::string::npos, head.find("Content-Length"));
+    EXPECT_EQ(200, client.get("/v1/health").status) << "the connection goes on";
+    EXPECT_EQ(0U, table.liveObjects());
+}
+
+TEST_F(Requests, ForOptionsGetTheMethodsAndNothingElse) {
+    start();
+    RawClient client = connect();
+    client.send("OPTIONS /v1/tables HTTP/1.1\r\n\r\n");
+    const std::string head = client.readUntil("\r\n\r\n");
+    EXPECT_EQ(0U, head.find("HTTP/1.1 204 "));
+    EXPECT_NE(std::string::npos, head.find("Allow: GET, HEAD\r\n"));
+    EXPECT_EQ(std::string::npos, head.find("Content-"));
+    EXPECT_EQ(200, client.get("/v1/health").status);
 }
 
 TEST_F(BadRequests, ThatAreNotHttpGet400AndAreClosed) {

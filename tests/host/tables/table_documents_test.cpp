@@ -1,4 +1,4 @@
-#include "host/tables/json_documents.h"
+#include "host/tables/table_documents.h"
 
 #include <gtest/gtest.h>
 
@@ -21,41 +21,41 @@ std::string document(const std::string& row) {
     return host::rowDocument(plainTable(), row, CodePage("UTF-8"));
 }
 
-TEST(JsonDocuments, RowHasItsColumnsInOrderWithoutTrailingBlanks) {
+TEST(TableDocuments, RowHasItsColumnsInOrderWithoutTrailingBlanks) {
     EXPECT_EQ(R"({"NAME":"ux","NUMBER":-7,"TEXT":" a b"})", document(plainRow("ux", -7, " a b ")));
 }
 
-TEST(JsonDocuments, AllBlanksAreAnEmptyString) {
+TEST(TableDocuments, AllBlanksAreAnEmptyString) {
     EXPECT_EQ(R"({"NAME":"","NUMBER":0,"TEXT":""})", document(plainRow("", 0, "")));
 }
 
-TEST(JsonDocuments, AFieldOfFullWidthIsWhole) {
+TEST(TableDocuments, AFieldOfFullWidthIsWhole) {
     EXPECT_EQ(R"({"NAME":"12345678","NUMBER":2147483647,"TEXT":"1234567890123456"})",
               document(plainRow("123456789", 2147483647, "12345678901234567")));
 }
 
-TEST(JsonDocuments, ControlCharactersAndQuotesAreEscaped) {
+TEST(TableDocuments, ControlCharactersAndQuotesAreEscaped) {
     EXPECT_EQ(R"({"NAME":"\"\\","NUMBER":1,"TEXT":"a\nb\tc\u0001"})",
               document(plainRow("\"\\", 1, "a\nb\tc\x01")));
 }
 
-TEST(JsonDocuments, ACharacterCutAtTheColumnsEndIsReplaced) {
+TEST(TableDocuments, ACharacterCutAtTheColumnsEndIsReplaced) {
     EXPECT_EQ("{\"NAME\":\"1234567\xEF\xBF\xBD\",\"NUMBER\":1,\"TEXT\":\"\"}",
               document(plainRow("1234567\xC3\xA4", 1, "")));
 }
 
-TEST(JsonDocuments, CodesThatNoUnicodeCharacterHasAreReplaced) {
+TEST(TableDocuments, CodesThatNoUnicodeCharacterHasAreReplaced) {
     const std::string text = document(plainRow("\xF5\x80\x80\x80", 1, "\xED\xA0\x80"));
     EXPECT_NE(std::string::npos, text.find("\xEF\xBF\xBD"));
     EXPECT_EQ(std::string::npos, text.find('\xF5'));
     EXPECT_EQ(std::string::npos, text.find("\xED\xA0"));
 }
 
-TEST(JsonDocuments, ARowThatIsTooShortReadsAsEmpty) {
+TEST(TableDocuments, ARowThatIsTooShortReadsAsEmpty) {
     EXPECT_EQ(R"({"NAME":"","NUMBER":0,"TEXT":""})", document("short"));
 }
 
-TEST(JsonDocuments, RowsStandInAnArray) {
+TEST(TableDocuments, RowsStandInAnArray) {
     oxa::Rows rows;
     rows.rowSize = 28;
     EXPECT_EQ(R"({"rows":[]})", host::rowsDocument(plainTable(), rows, CodePage("UTF-8")));
@@ -64,24 +64,13 @@ TEST(JsonDocuments, RowsStandInAnArray) {
               host::rowsDocument(plainTable(), rows, CodePage("UTF-8")));
 }
 
-TEST(JsonDocuments, TablesAreListedWithTheirColumns) {
+TEST(TableDocuments, TablesAreListedWithTheirColumns) {
     EXPECT_EQ(R"({"tables":[{"application":"TEST","name":"PLAIN","columns":[)"
               R"({"name":"NAME","offset":0,"length":8,"type":9},)"
               R"({"name":"NUMBER","offset":8,"length":4,"type":3},)"
               R"({"name":"TEXT","offset":12,"length":16,"type":9}]}]})",
               host::tablesDocument({plainTable()}));
     EXPECT_EQ(R"({"tables":[]})", host::tablesDocument({}));
-}
-
-TEST(JsonDocuments, HealthSaysVersionAndWidth) {
-    const std::string width = std::to_string(sizeof(void*) * 8);
-    EXPECT_EQ(R"({"version":")" ZAV_VERSION R"(","width":)" + width +
-                  R"(,"home":"/h","origin_node":"n","uptime_seconds":5,"subscriptions":2})",
-              host::healthDocument({"/h", "n", 5, 2}, CodePage("UTF-8")));
-}
-
-TEST(JsonDocuments, AnErrorIsValidWhateverTheClientWrote) {
-    EXPECT_EQ("{\"error\":\"no \xEF\xBF\xBD\\n\"}", host::errorDocument("no \xFF\n"));
 }
 
 }  // namespace

@@ -1,0 +1,46 @@
+#include "host/api/api.h"
+
+#include <memory>
+#include <utility>
+
+#include "host/api/call.h"
+#include "host/api/services.h"
+#include "host/tables/bad_request.h"
+#include "host/tables/query.h"
+
+namespace host {
+namespace {
+
+Answer answerTo(Services& services, Call& call) {
+    try {
+        call.readBody();
+        return call.route().endpoint(services, call);
+    } catch (const BadRequest& bad) {
+        return errorReply(400, bad.what());
+    } catch (const QueryFailed& failed) {
+        return errorReply(failed.gone() ? 404 : 500, failed.what());
+    }
+}
+
+}  // namespace
+
+Api::Api(Services& services, std::vector<Route> routes)
+    : services_(services), router_(std::move(routes)) {}
+
+std::variant<Answer, Job> Api::handle(Request request) {
+    std::variant<Match, Reply> found = router_.find(request);
+    if (auto* const reply = std::get_if<Reply>(&found)) return Answer(std::move(*reply));
+    const auto call = std::make_shared<Call>(std::get<Match>(std::move(found)), std::move(request));
+    if (call->route().runs == Runs::AtOnce) return answerTo(services_, *call);
+    return Job([call, &services = services_] { return answerTo(services, *call); });
+}
+
+void Api::prepareForEnd() {
+    services_.outcomes.holdAfterOutcome();
+}
+
+bool Api::quiet() const {
+    return services_.watch.quiet();
+}
+
+}  // namespace host

@@ -1,0 +1,27 @@
+/// The host's interface: the application behind its HTTP server.
+#pragma once
+
+#include <vector>
+
+#include "host/api/router.h"
+#include "host/http/handler.h"
+
+namespace host {
+
+class Api final : public Handler {
+public:
+    /// The services outlive this object.
+    Api(Services& services, std::vector<Route> routes);
+
+    std::variant<Answer, Job> handle(Request request) override;
+    void prepareForEnd() override;
+    bool quiet() const override;
+
+    const Router& router() const { return router_; }
+
+private:
+    Services& services_;
+    const Router router_;
+};
+
+}  // namespace host

@@ -1,0 +1,113 @@
+#include "host/api/call.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <nlohmann/json.hpp>
+
+#include "host/tables/bad_request.h"
+
+namespace host {
+namespace {
+
+using nlohmann::json;
+
+/// Deeper documents than any request needs are refused before they are built.
+constexpr int kMaxDepth = 4;
+
+json parse(const std::string& body) {
+    const auto limitDepth = [](int depth, json::parse_event_t, json&) {
+        if (depth > kMaxDepth) throw BadRequest("the body is nested too deeply");
+        return true;
+    };
+    try {
+        return json::parse(body.begin(), body.end(), limitDepth);
+    } catch (const json::parse_error& error) {
+        throw BadRequest("the body is not JSON: error at byte " + std::to_string(error.byte));
+    } catch (const json::exception&) {
+        throw BadRequest("the body is not JSON: a number is out of range");
+    }
+}
+
+bool hasType(const json& value, Json type) {
+    switch (type) {
+        case Json::String:
+            return value.is_string();
+        case Json::Number:
+            return value.is_number();
+        case Json::Boolean:
+            return value.is_boolean();
+        case Json::Array:
+            return value.is_array();
+        case Json::Object:
+            return value.is_object();
+    }
+    return false;
+}
+
+const char* nameOf(Json type) {
+    switch (type) {
+        case Json::String:
+            return "a string";
+        case Json::Number:
+            return "a number";
+        case Json::Boolean:
+            return "true or false";
+        case Json::Array:
+            return "an array";
+        case Json::Object:
+            return "an object";
+    }
+    return "";
+}
+
+void checkNames(const json& document, const std::vector<Member>& members) {
+    for (const auto& given : document.items()) {
+        const bool known =
+            std::any_of(members.begin(), members.end(),
+                        [&given](const Member& member) { return given.key() == member.name; });
+        if (!known) throw BadRequest("unknown member \"" + given.key() + "\" in the body");
+    }
+}
+
+void checkMembers(const json& document, const std::vector<Member>& members) {
+    if (!document.is_object()) throw BadRequest("the body is not a JSON object");
+    checkNames(document, members);
+    for (const Member& member : members) {
+        const std::string quoted = '"' + std::string(member.name) + '"';
+        const auto given = document.find(member.name);
+        if (given == document.end()) {
+            if (member.need == Need::Required) throw BadRequest("the body lacks " + quoted);
+        } else if (!hasType(*given, member.type)) {
+            throw BadRequest(quoted + " is not " + nameOf(member.type));
+        }
+    }
+}
+
+}  // namespace
+
+void Call::readBody() {
+    if (route().body.empty()) return;
+    auto document = std::make_shared<const json>(parse(request_.body));
+    std::string().swap(request_.body);
+    checkMembers(*document, route().body);
+    body_ = std::move(document);
+}
+
+const std::string* Call::text(const char* name) const {
+    for (const auto& [known, value] : match_.parameters) {
+        if (known == name) return &value;
+    }
+    return nullptr;
+}
+
+long long Call::number(const char* name, long long otherwise) const {
+    const std::string* const value = text(name);
+    return value == nullptr ? otherwise : std::atoll(value->c_str());
+}
+
+bool Call::flag(const char* name) const {
+    const std::string* const value = text(name);
+    return value != nullptr && *value == "1";
+}
+
+}  // namespace host

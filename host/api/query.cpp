@@ -1,0 +1,50 @@
+// POST /v1/query
+
+#include "host/tables/query.h"
+
+#include <nlohmann/json.hpp>
+
+#include "host/api/call.h"
+#include "host/api/services.h"
+#include "host/tables/conditions.h"
+#include "host/tables/plugin_facts.h"
+#include "host/tables/table_documents.h"
+
+namespace host {
+namespace {
+
+std::vector<oxa::Predicate> conditionsOf(const nlohmann::json& body, const oxa::Table& table,
+                                         const CodePage& codePage) {
+    std::vector<oxa::Predicate> conditions;
+    const auto where = body.find("where");
+    if (where == body.end()) return conditions;
+    const ConditionReader reader(table, codePage);
+    for (const nlohmann::json& condition : *where)
+        conditions.push_back(reader.fromJson(condition));
+    return conditions;
+}
+
+oxa::Rows runWatched(const Query& query, TaskWatch& watch) {
+    TaskWatch::Request running(watch, *query.table);
+    oxa::Rows rows = run(query);
+    running.answered(rows);
+    return rows;
+}
+
+}  // namespace
+
+Endpoint postQuery;
+
+Answer postQuery(Services& services, const Call& call) {
+    const auto& name = call.body().at("table").get_ref<const std::string&>();
+    const oxa::Table* const table = services.tables.find(name);
+    if (table == nullptr) return errorReply(404, "there is no table \"" + name + "\"");
+    if (table->name == plugin::kRequestTable && call.peer().access < Access::Act) {
+        return errorReply(403, "you may only read from this host; a query on " + name + " acts");
+    }
+    const Query query{table, conditionsOf(call.body(), *table, services.codePage)};
+    const oxa::Rows rows = runWatched(query, services.watch);
+    return jsonReply(200, rowsDocument(*table, rows, services.codePage));
+}
+
+}  // namespace host

@@ -1,0 +1,71 @@
+/// A route: everything that the host knows about one request of its interface, as one row of data.
+/// Dispatching, checks of parameters and bodies, 405 with Allow, HEAD and OPTIONS all follow from
+/// it, and so does the documentation's check.
+#pragma once
+
+#include <vector>
+
+#include "host/http/handler.h"
+
+namespace host {
+
+class Call;
+struct Services;
+
+/// Answers one request that fits its route. What it throws as BadRequest is answered with 400, as
+/// QueryFailed with 404 or 500.
+using Endpoint = Answer(Services& services, const Call& call);
+
+/// Where an endpoint runs.
+enum class Runs {
+    AtOnce,    ///< on the I/O thread: it only looks at what is in memory
+    OnWorker,  ///< on a worker thread: it may take long, or run the plug-in's code
+};
+
+enum class Need { Optional, Required };
+
+/// The type of a parameter of the path or of the query.
+enum class Type {
+    Text,
+    Number,  ///< a whole number from 0 up, at most 18 digits
+    Flag,    ///< 0 or 1
+};
+
+struct Parameter {
+    const char* name;
+    Type type;
+    Need need;  ///< one of the path is always there
+    const char* doc;
+};
+
+/// The JSON type of a member of the body.
+enum class Json { String, Number, Boolean, Array, Object };
+
+struct Member {
+    const char* name;
+    Json type;
+    Need need;
+    const char* doc;
+};
+
+/// Whether a query may have parameters beyond those that the route names.
+enum class Others {
+    None,
+    Columns,  ///< names of columns of a table, whose values they are to equal
+};
+
+struct Route {
+    const char* method;  ///< with GET comes HEAD
+    /// Segments between slashes. "{name}" stands for one segment that is not empty: the parameter
+    /// of that name.
+    const char* path;
+    const char* doc;  ///< one line
+    Access access;    ///< what a client must at least be allowed to do
+    Runs runs;
+    Endpoint* endpoint;
+    std::vector<Parameter> parameters{};
+    Others others = Others::None;
+    std::vector<Member> body{};  ///< of a JSON object; empty: a body is not looked at
+};
+
+}  // namespace host

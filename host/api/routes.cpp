@@ -1,0 +1,29 @@
+#include "host/api/routes.h"
+
+namespace host {
+
+/// The endpoints. Each has a file of its own in this folder and a row below.
+Endpoint getTables, postQuery, getEvents, getHealth;
+
+// clang-format off
+std::vector<Route> routes() {
+    return {
+        {"GET", "/v1/tables", "The tables with their columns.",
+         Access::Read, Runs::AtOnce, getTables},
+
+        {"POST", "/v1/query", "Queries a table; on the request table, asks for a command.",
+         Access::Read, Runs::OnWorker, postQuery, {}, Others::None,
+         {{"table", Json::String, Need::Required, "the name of the table"},
+          {"where", Json::Array, Need::Optional, "conditions, all of which a row satisfies"}}},
+
+        {"GET", "/v1/events", "Streams the rows of a table as they come.",
+         Access::Read, Runs::OnWorker, getEvents,
+         {{"table", Type::Text, Need::Required, "the name of the table"}}, Others::Columns},
+
+        {"GET", "/v1/health", "What the host says about itself.",
+         Access::Read, Runs::AtOnce, getHealth},
+    };
+}
+// clang-format on
+
+}  // namespace host

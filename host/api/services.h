@@ -1,0 +1,37 @@
+/// What endpoints work with.
+#pragma once
+
+#include <chrono>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "host/http/server_counts.h"
+#include "host/outcomes/outcome_feed.h"
+#include "host/outcomes/task_watch.h"
+#include "host/tables/code_page.h"
+#include "host/tables/row_queue.h"
+#include "host/tables/table_set.h"
+
+namespace host {
+
+/// Made once, after the plug-in has started, and shared by all requests. Any thread.
+struct Services {
+    Services(std::vector<oxa::Table> offered, CodePage localCodePage, std::string homeDirectory,
+             RowQueue::Limits limits = {})
+        : tables(std::move(offered)),
+          codePage(std::move(localCodePage)),
+          home(std::move(homeDirectory)),
+          eventLimits(limits) {}
+
+    const TableSet tables;
+    const CodePage codePage;  ///< the one that tables speak
+    const std::string home;   ///< in that code page
+    const RowQueue::Limits eventLimits;
+    const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
+    ServerCounts counts;
+    OutcomeFeed outcomes{tables};
+    TaskWatch watch{tables, outcomes};
+};
+
+}  // namespace host

@@ -1,0 +1,77 @@
+// The route table and the endpoints that have little to say.
+#include "host/api_fixture.h"
+
+namespace {
+
+using host::Access;
+
+class Interface : public ApiTest {};
+
+TEST_F(Interface, RefusesOtherPaths) {
+    expectError(404, "there is nothing at /", ask("GET", "/"));
+    expectError(404, "there is nothing at /v1/tables/", ask("GET", "/v1/tables/"));
+    expectError(404, "there is nothing at *", ask("OPTIONS", "*"));
+    expectError(400, "the request's target has a malformed escape", ask("GET", "/v1/%zz"));
+}
+
+TEST_F(Interface, RefusesOtherMethodsAndNamesTheRightOne) {
+    const host::Reply query = ask("GET", "/v1/query");
+    expectError(405, "/v1/query knows only the method POST", query);
+    EXPECT_EQ("POST", query.fields.at(0).second);
+    for (const char* method : {"POST", "PUT", "DELETE", "get", "BREW"}) {
+        const host::Reply reply = ask(method, "/v1/tables");
+        expectError(405, "/v1/tables knows only the method GET", reply);
+        ASSERT_EQ(1U, reply.fields.size());
+        EXPECT_EQ("Allow", reply.fields[0].first);
+        EXPECT_EQ("GET, HEAD", reply.fields[0].second);
+    }
+}
+
+TEST_F(Interface, RefusesParametersThatMeanNothing) {
+    expectError(400, "/v1/tables takes no parameter \"x\"", ask("GET", "/v1/tables?x=1"));
+    expectError(400, "/v1/query takes no parameter \"table\"",
+                ask("POST", "/v1/query?table=PLAIN", "{}"));
+}
+
+TEST_F(Interface, RefusesEventsThatMakeNoSense) {
+    const auto events = [&](const std::string& rest) { return ask("GET", "/v1/events" + rest); };
+    expectError(400, "the parameter \"table\" is missing", events(""));
+    expectError(400, "the parameter \"table\" is missing", events("?NAME=x"));
+    expectError(400, "the parameter \"table\" is given twice", events("?table=PLAIN&table=X"));
+    expectError(404, "there is no table \"plain\"", events("?table=plain"));
+    expectError(400, "table PLAIN has no column \"name\"", events("?table=PLAIN&name=x"));
+    expectError(400, "the value of column NUMBER is not a whole number of 32 bits",
+                events("?table=PLAIN&NUMBER=x"));
+    expectError(400, "the value of column NAME holds what the host's code page UTF-8 lacks",
+                events("?table=PLAIN&NAME=%FF"));
+}
+
+TEST_F(Interface, EventsTakeEveryOtherParameterAsEquality) {
+    host::Answer answer = answerTo("GET", "/v1/events?NAME=a%20b&table=PLAIN&NUMBER=5&TEXT=");
+    const auto& source = std::get<std::unique_ptr<host::EventSource>>(answer);
+    table.publish(plainRow("a b", 5, "text"));
+    table.publish(plainRow("a b", 4, ""));
+    table.publish(plainRow("a", 5, ""));
+    EXPECT_TRUE(source->empty());
+    table.publish(plainRow("a b", 5, ""));
+    EXPECT_EQ("data: {\"NAME\":\"a b\",\"NUMBER\":5,\"TEXT\":\"\"}\n\n", source->take());
+}
+
+TEST_F(Interface, HealthSaysWhatThisHostIs) {
+    oxa::setOriginNode("node");
+    services->counts.streams = 2;
+    const std::string width = std::to_string(sizeof(void*) * 8);
+    const std::string body = ask("GET", "/v1/health").body;
+    EXPECT_EQ(0U, body.find(R"({"version":")" ZAV_VERSION R"(","width":)" + width +
+                            R"(,"home":"/home/of/it","origin_node":"node","uptime_seconds":)"))
+        << body;
+    EXPECT_NE(std::string::npos, body.find(R"(,"subscriptions":2})")) << body;
+}
+
+TEST_F(Interface, IsClosedToPeersWithoutAccess) {
+    for (const host::Route& route : api->router().routes()) {
+        EXPECT_EQ(403U, ask(route.method, route.path, "{}", Access::None).status) << route.path;
+    }
+}
+
+}  // namespace

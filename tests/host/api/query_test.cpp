@@ -1,0 +1,113 @@
+// POST /v1/query: bodies, good and bad.
+#include "host/api_fixture.h"
+
+namespace {
+
+class QueryEndpoint : public ApiTest {
+protected:
+    host::Reply post(const std::string& body) { return ask("POST", "/v1/query", body); }
+};
+
+TEST_F(QueryEndpoint, HandsTheConditionsOnInTheirOrder) {
+    std::string seen;
+    table.sampler = [&](rtoxa& request) {
+        FLT1_FILTERINFO entry{};
+        while (request.GetFilterInfo(&entry) == OXA_OK)
+            seen += std::string(entry.columnName) + "=" + entry.value + ";";
+        return static_cast<int>(OXA_OK);
+    };
+    EXPECT_EQ("{\"rows\":[]}\n", post(R"({"table":"PLAIN","where":[]})").body);
+    EXPECT_EQ("", seen);
+    EXPECT_EQ(200U, post(R"({"table":"PLAIN","where":[)"
+                         R"({"column":"NAME","op":"=","value":"ux"},)"
+                         R"({"value":3,"op":"=","column":"NUMBER"},)"
+                         R"({"column":"NAME","op":"=","value":""}]})")
+                        .status);
+    EXPECT_EQ("NAME=ux;NUMBER=3;NAME=;", seen);
+}
+
+TEST_F(QueryEndpoint, RefusesUnknownTables) {
+    expectError(404, "there is no table \"NOPE\"", post(R"({"table":"NOPE"})"));
+    expectError(404, "there is no table \"plain\"", post(R"({"table":"plain"})"));
+    expectError(404, "there is no table \"\"", post(R"({"table":""})"));
+}
+
+TEST_F(QueryEndpoint, RefusesConditionsThatMakeNoSense) {
+    expectError(400, "table PLAIN has no column \"NOPE\"",
+                post(R"({"table":"PLAIN","where":[{"column":"NOPE","op":"=","value":""}]})"));
+    expectError(400, "a condition is not an object", post(R"({"table":"PLAIN","where":[1]})"));
+}
+
+TEST_F(QueryEndpoint, RefusesBodiesOfTheWrongShape) {
+    expectError(400, "the body is not a JSON object", post("[]"));
+    expectError(400, "the body is not a JSON object", post("\"PLAIN\""));
+    expectError(400, "the body lacks \"table\"", post("{}"));
+    expectError(400, "\"table\" is not a string", post(R"({"table":1})"));
+    expectError(400, "\"where\" is not an array", post(R"({"table":"PLAIN","where":{}})"));
+    expectError(400, "\"where\" is not an array", post(R"({"table":"PLAIN","where":null})"));
+    expectError(400, "unknown member \"were\" in the body", post(R"({"table":"PLAIN","were":[]})"));
+}
+
+TEST_F(QueryEndpoint, RefusesWhatIsNotJson) {
+    expectError(400, "the body is not JSON: error at byte 1", post(""));
+    expectError(400, "the body is not JSON: error at byte 11", post(R"({"table": PLAIN})"));
+    expectError(400, "the body is not JSON: error at byte 18", post(R"({"table":"PLAIN"}x)"));
+    for (const std::string& body :
+         {std::string("{"), std::string("{'table':'PLAIN'}"), std::string("{\"table\":\"\xFF\"}"),
+          std::string("{\"table\":\"\\ud800\"}"), std::string("\0", 1), std::string("NaN"),
+          std::string("{\"table\":1e999}")}) {
+        const host::Reply reply = post(body);
+        EXPECT_EQ(400U, reply.status) << body;
+        EXPECT_EQ(0U, reply.body.find("{\"error\":\"the body is not JSON")) << reply.body;
+    }
+}
+
+TEST_F(QueryEndpoint, RefusesEveryTruncatedBody) {
+    const std::string whole =
+        R"({"table":"PLAIN","where":[{"column":"NAME","op":"=","value":"ux"}]})";
+    EXPECT_EQ(200U, post(whole).status);
+    for (std::size_t length = 0; length < whole.size(); ++length)
+        EXPECT_EQ(400U, post(whole.substr(0, length)).status) << length;
+}
+
+TEST_F(QueryEndpoint, RefusesDeepNestingBeforeItIsBuilt) {
+    expectError(400, "the body is nested too deeply", post(std::string(1'000'000, '[')));
+    std::string objects;
+    for (int i = 0; i < 100'000; ++i)
+        objects += R"({"a":)";
+    expectError(400, "the body is nested too deeply", post(objects));
+}
+
+TEST_F(QueryEndpoint, SaysThatATableIsNoLongerOffered) {
+    {
+        MadeUpTable passing("PASSING", plainColumns());
+        passing.RegisterWithManager();
+        api.reset();
+        services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+        api.emplace(*services, host::routes());
+    }
+    expectError(404, "table PASSING is no longer offered", post(R"({"table":"PASSING"})"));
+}
+
+TEST_F(QueryEndpoint, LetsReadersQueryAllTablesButTheOneThatActs) {
+    MadeUpTable requests("KAGREQT", plainColumns());
+    int samples = 0;
+    requests.sampler = [&](rtoxa&) {
+        ++samples;
+        return static_cast<int>(OXA_OK);
+    };
+    requests.RegisterWithManager();
+    api.reset();
+    services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+    api.emplace(*services, host::routes());
+    const auto query = [&](const char* name, host::Access access) {
+        return ask("POST", "/v1/query", R"({"table":")" + std::string(name) + "\"}", access).status;
+    };
+    EXPECT_EQ(200U, query("PLAIN", host::Access::Read));
+    EXPECT_EQ(403U, query("KAGREQT", host::Access::Read));
+    EXPECT_EQ(0, samples);
+    EXPECT_EQ(200U, query("KAGREQT", host::Access::Act));
+    EXPECT_EQ(1, samples);
+}
+
+}  // namespace

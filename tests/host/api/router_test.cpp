@@ -1,0 +1,199 @@
+// Routes of every kind, whether the host has one like it or not.
+#include "host/api/router.h"
+
+#include <gtest/gtest.h>
+
+#include <stdexcept>
+
+#include "host/api/call.h"
+#include "host/tables/bad_request.h"
+
+namespace {
+
+using host::Access;
+using host::Call;
+using host::Json;
+using host::Match;
+using host::Need;
+using host::Others;
+using host::Reply;
+using host::Route;
+using host::Router;
+using host::Runs;
+using host::Type;
+
+host::Answer nothing(host::Services&, const Call&) {
+    return Reply{};
+}
+
+const std::vector<host::Parameter> kId = {{"id", Type::Text, Need::Required, ""}};
+
+std::vector<Route> someRoutes() {
+    const std::vector<host::Parameter> list = {{"state", Type::Text, Need::Required, ""},
+                                               {"limit", Type::Number, Need::Optional, ""},
+                                               {"follow", Type::Flag, Need::Optional, ""}};
+    const std::vector<host::Parameter> page = {{"number", Type::Number, Need::Required, ""}};
+    return {
+        {"GET", "/v1/tasks", "", Access::Read, Runs::AtOnce, nothing, list},
+        {"POST",
+         "/v1/tasks",
+         "",
+         Access::Act,
+         Runs::AtOnce,
+         nothing,
+         {},
+         Others::None,
+         {{"name", Json::String, Need::Required, ""},
+          {"count", Json::Number, Need::Optional, ""},
+          {"once", Json::Boolean, Need::Optional, ""},
+          {"where", Json::Array, Need::Optional, ""},
+          {"more", Json::Object, Need::Optional, ""}}},
+        {"GET", "/v1/tasks/{id}", "", Access::Read, Runs::AtOnce, nothing, kId},
+        {"DELETE", "/v1/tasks/{id}", "", Access::Act, Runs::AtOnce, nothing, kId},
+        {"POST", "/v1/tasks/{id}/cancel", "", Access::Act, Runs::AtOnce, nothing, kId},
+        {"GET", "/v1/pages/{number}", "", Access::Read, Runs::AtOnce, nothing, page},
+    };
+}
+
+class Routes : public testing::Test {
+protected:
+    std::variant<Match, Reply> find(const std::string& method, const std::string& target,
+                                    Access access = Access::Act) const {
+        return router.find({method, target, "", {0, 0, 0, access}});
+    }
+    /// The route's method and path, and the parameters; or the reply's status and body.
+    std::string found(const std::string& method, const std::string& target,
+                      Access access = Access::Act) const {
+        const auto result = find(method, target, access);
+        if (const auto* const reply = std::get_if<Reply>(&result))
+            return std::to_string(reply->status) + " " + reply->body;
+        const auto& match = std::get<Match>(result);
+        std::string text = match.route->method + std::string(" ") + match.route->path;
+        for (const auto& [name, value] : match.parameters)
+            text += " " + name + "=" + value;
+        return text;
+    }
+    std::string allow(const std::string& method, const std::string& target) const {
+        return std::get<Reply>(find(method, target)).fields.at(0).second;
+    }
+    static std::string error(const std::string& status, const std::string& text) {
+        return status + " {\"error\":\"" + text + "\"}\n";
+    }
+
+    const Router router{someRoutes()};
+};
+
+TEST_F(Routes, AreFoundByMethodAndPath) {
+    EXPECT_EQ("GET /v1/tasks state=queued", found("GET", "/v1/tasks?state=queued"));
+    EXPECT_EQ("POST /v1/tasks", found("POST", "/v1/tasks"));
+    EXPECT_EQ("POST /v1/tasks/{id}/cancel id=7", found("POST", "/v1/tasks/7/cancel"));
+    EXPECT_EQ("DELETE /v1/tasks/{id} id=7", found("DELETE", "/v1/tasks/7"));
+    EXPECT_EQ("GET /v1/tasks/{id} id=7", found("HEAD", "/v1/tasks/7"));
+}
+
+TEST_F(Routes, TakeOneSegmentPerParameterOfThePath) {
+    EXPECT_EQ("GET /v1/tasks/{id} id=a b/c", found("GET", "/v1/tasks/a%20b%2Fc"));
+    EXPECT_EQ(error("404", "there is nothing at /v1/tasks/a/b"), found("GET", "/v1/tasks/a/b"));
+    EXPECT_EQ(error("404", "there is nothing at /v1/tasks/"), found("GET", "/v1/tasks/"));
+    EXPECT_EQ(error("404", "there is nothing at /v1"), found("GET", "/v1"));
+    EXPECT_EQ(error("404", "there is nothing at /v1/tasks"), found("GET", "/v1%2Ftasks"));
+    EXPECT_EQ(error("404", "there is nothing at "), found("GET", ""));
+}
+
+TEST_F(Routes, WithAParameterOfAnotherTypeAreNotThere) {
+    EXPECT_EQ("GET /v1/pages/{number} number=12", found("GET", "/v1/pages/12"));
+    EXPECT_EQ(error("404", "there is nothing at /v1/pages/x"), found("GET", "/v1/pages/x"));
+    EXPECT_EQ(error("404", "there is nothing at /v1/pages/-1"), found("GET", "/v1/pages/-1"));
+}
+
+TEST_F(Routes, WithOtherMethodsNameThoseThereAre) {
+    EXPECT_EQ(error("405", "/v1/tasks/7/cancel knows only the method POST"),
+              found("GET", "/v1/tasks/7/cancel"));
+    EXPECT_EQ(error("405", "/v1/tasks/7 knows only GET and DELETE"), found("PUT", "/v1/tasks/7"));
+    EXPECT_EQ("GET, HEAD, DELETE", allow("PUT", "/v1/tasks/7"));
+    EXPECT_EQ("POST", allow("HEAD", "/v1/tasks/7/cancel"));
+}
+
+TEST_F(Routes, AnswerOptionsWithTheirMethods) {
+    EXPECT_EQ("204 ", found("OPTIONS", "/v1/tasks?anything=1"));
+    EXPECT_EQ("GET, HEAD, POST", allow("OPTIONS", "/v1/tasks"));
+    EXPECT_EQ(error("404", "there is nothing at *"), found("OPTIONS", "*"));
+}
+
+TEST_F(Routes, CheckTheTypesOfTheirParameters) {
+    EXPECT_EQ("GET /v1/tasks state=a limit=5 follow=1",
+              found("GET", "/v1/tasks?state=a&limit=5&follow=1"));
+    for (const char* limit : {"", "x", "-1", "+1", "1.0", " 1", "1234567890123456789"}) {
+        EXPECT_EQ(error("400", "the parameter \\\"limit\\\" is not a whole number"),
+                  found("GET", "/v1/tasks?state=a&limit=" + std::string(limit)));
+    }
+    EXPECT_EQ(error("400", "the parameter \\\"follow\\\" is not 0 or 1"),
+              found("GET", "/v1/tasks?state=a&follow=yes"));
+    EXPECT_EQ(error("400", "the parameter \\\"state\\\" is missing"), found("GET", "/v1/tasks"));
+    EXPECT_EQ(error("400", "the parameter \\\"state\\\" is given twice"),
+              found("GET", "/v1/tasks?state=a&state=a"));
+    EXPECT_EQ(error("400", "/v1/tasks takes no parameter \\\"stat\\\""),
+              found("GET", "/v1/tasks?stat=a"));
+    EXPECT_EQ(error("400", "the parameter \\\"id\\\" is given twice"),
+              found("GET", "/v1/tasks/7?id=8"));
+}
+
+TEST_F(Routes, AreClosedToThoseWhoMayNotUseThem) {
+    const std::string refused = error("403", "you may only read from this host");
+    EXPECT_EQ(refused, found("DELETE", "/v1/tasks/7", Access::Read));
+    EXPECT_EQ(refused, found("POST", "/v1/tasks?odd=1", Access::Read)) << "before anything else";
+    EXPECT_EQ("GET /v1/tasks/{id} id=7", found("GET", "/v1/tasks/7", Access::Read));
+}
+
+TEST(RouteTable, ThatContradictsItselfIsRefused) {
+    const Route good{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, kId};
+    const Route lacking{"GET", "/b/{id}", "", Access::Read, Runs::AtOnce, nothing};
+    EXPECT_THROW(Router({lacking}), std::logic_error);
+    EXPECT_THROW(Router({good, good}), std::logic_error);
+    EXPECT_NO_THROW(Router({good}));
+}
+
+class Calls : public Routes {
+protected:
+    Call call(const std::string& method, const std::string& target, const std::string& body = "") {
+        return Call(std::get<Match>(find(method, target)), {method, target, body, {}});
+    }
+    /// Why the body is refused; empty when it is not.
+    std::string refusal(const std::string& body) {
+        try {
+            call("POST", "/v1/tasks", body).readBody();
+            return "";
+        } catch (const host::BadRequest& bad) {
+            return bad.what();
+        }
+    }
+};
+
+TEST_F(Calls, GiveParametersByName) {
+    const Call given = call("GET", "/v1/tasks?limit=12&state=&follow=1");
+    EXPECT_EQ("", given.required("state"));
+    EXPECT_EQ(12, given.number("limit", 5));
+    EXPECT_TRUE(given.flag("follow"));
+    const Call left = call("GET", "/v1/tasks?state=x&follow=0");
+    EXPECT_EQ(5, left.number("limit", 5));
+    EXPECT_EQ(nullptr, left.text("limit"));
+    EXPECT_FALSE(left.flag("follow"));
+    EXPECT_EQ("a", call("GET", "/v1/tasks/a").required("id"));
+}
+
+TEST_F(Calls, CheckTheTypesOfTheBodysMembers) {
+    EXPECT_EQ("", refusal(R"({"name":"x","count":1.5,"once":true,"where":[],"more":{}})"));
+    EXPECT_EQ("\"count\" is not a number", refusal(R"({"name":"x","count":"1"})"));
+    EXPECT_EQ("\"once\" is not true or false", refusal(R"({"name":"x","once":1})"));
+    EXPECT_EQ("\"where\" is not an array", refusal(R"({"name":"x","where":{}})"));
+    EXPECT_EQ("\"more\" is not an object", refusal(R"({"name":"x","more":[]})"));
+    EXPECT_EQ("the body lacks \"name\"", refusal(R"({"count":1})"));
+    EXPECT_EQ("unknown member \"nome\" in the body", refusal(R"({"nome":"x"})"));
+}
+
+TEST_F(Calls, IgnoreABodyThatTheRouteDoesNotDescribe) {
+    Call given = call("GET", "/v1/tasks?state=x", "nonsense");
+    EXPECT_NO_THROW(given.readBody());
+}
+
+}  // namespace

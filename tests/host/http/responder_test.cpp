@@ -1,0 +1,244 @@
+// ctest-label: threaded
+// A server with a handler of the test's: answers of every kind, and when they come.
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <future>
+#include <optional>
+#include <stdexcept>
+#include <thread>
+
+#include "host/http/responder.h"
+#include "host/http/server.h"
+#include "host/process/socket_file.h"
+#include "host/raw_client.h"
+#include "support/scratch_dir.h"
+
+namespace {
+
+using host::Answer;
+using host::Job;
+using host::Later;
+using host::Reply;
+using host::Request;
+using host::Responder;
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+class TestHandler final : public host::Handler {
+public:
+    std::function<std::variant<Answer, Job>(const Request&)> answer;
+    std::atomic<bool> isQuiet{true};
+
+    std::variant<Answer, Job> handle(Request request) override {
+        if (request.target == "/alive") return Answer(Reply{200, "alive"});
+        return answer(request);
+    }
+    void prepareForEnd() override {}
+    bool quiet() const override { return isQuiet; }
+};
+
+class Answers : public testing::Test {
+protected:
+    Answers() {
+        server.emplace(socket.listen(), handler, counts);
+        serving = std::thread([this] {
+            server->run();
+            ended = true;
+        });
+    }
+    ~Answers() override { stop(); }
+    void stop() {
+        if (!serving.joinable()) return;
+        server->stop();
+        serving.join();
+        server.reset();
+    }
+    RawClient connect() { return RawClient(scratch.path("s")); }
+    std::string aliveness() { return connect().get("/alive").body; }
+
+    /// Answers with `later`, and keeps the responder.
+    Later keepResponder(milliseconds limit, std::function<Answer()> atLimit) {
+        return {[this](const Responder& given) { responder.set_value(given); }, limit,
+                std::move(atLimit)};
+    }
+    static Answer inTime() { return Reply{200, "the time is over"}; }
+
+    ScratchDir scratch;
+    host::SocketFile socket{scratch.path("s")};
+    TestHandler handler;
+    host::ServerCounts counts;
+    std::promise<Responder> responder;
+    std::optional<host::HttpServer> server;
+    std::thread serving;
+    std::atomic<bool> ended{false};
+};
+
+TEST_F(Answers, CarryTypeAndFieldsOfTheirReply) {
+    handler.answer = [](const Request& request) {
+        return Answer(Reply{
+            201, request.method + request.target + request.body, "text/plain", {{"X-Odd", "yes"}}});
+    };
+    RawClient client = connect();
+    const auto answer = client.post("/a?b", "body");
+    EXPECT_EQ(201, answer.status);
+    EXPECT_NE(std::string::npos, answer.head.find("Content-Type: text/plain\r\n"));
+    EXPECT_NE(std::string::npos, answer.head.find("X-Odd: yes\r\n"));
+    EXPECT_EQ("POST/a?bbody", answer.body);
+}
+
+TEST_F(Answers, MayBeEmpty) {
+    handler.answer = [](const Request&) { return Answer(Reply{}); };
+    RawClient client = connect();
+    EXPECT_NE(std::string::npos, client.get("/").head.find("Content-Length: 0\r\n"));
+    EXPECT_EQ("alive", client.get("/alive").body);
+}
+
+TEST_F(Answers, TellTheHandlerWhoAsks) {
+    host::Peer peer;
+    handler.answer = [&](const Request& request) {
+        peer = request.peer;
+        return Answer(Reply{});
+    };
+    EXPECT_EQ(200, connect().get("/").status);
+    EXPECT_EQ(::getpid(), peer.process);
+    EXPECT_EQ(::geteuid(), peer.user);
+    EXPECT_EQ(::getegid(), peer.group);
+    EXPECT_EQ(host::Access::Act, peer.access);
+}
+
+TEST_F(Answers, OfAHandlerOrAJobThatThrowsAreErrors) {
+    handler.answer = [](const Request& request) -> std::variant<Answer, Job> {
+        if (request.target == "/handler") throw std::bad_alloc();
+        return Job([]() -> Answer { throw std::runtime_error("x"); });
+    };
+    RawClient client = connect();
+    for (const char* target : {"/handler", "/job"}) {
+        const auto answer = client.get(target);
+        EXPECT_EQ(500, answer.status);
+        EXPECT_EQ("{\"error\":\"the request failed for want of memory\"}\n", answer.body);
+    }
+}
+
+TEST_F(Answers, MayComeLaterWithoutAWorker) {
+    handler.answer = [&](const Request&) { return Answer(keepResponder(seconds(60), inTime)); };
+    RawClient client = connect();
+    client.send("GET /later HTTP/1.1\r\n\r\n");
+    const Responder respond = responder.get_future().get();
+    EXPECT_EQ("alive", aliveness());
+    respond(Reply{200, "late"});
+    respond(Reply{200, "too late"});
+    EXPECT_EQ("late", client.readAnswer().body);
+    EXPECT_EQ("alive", client.get("/alive").body) << "the second answer is dropped";
+}
+
+TEST_F(Answers, MayComeBeforeBeginReturns) {
+    handler.answer = [&](const Request&) {
+        return Answer(Later{[](const Responder& respond) {
+                                respond(Reply{200, "at once"});
+                            },
+                            seconds(60), inTime});
+    };
+    EXPECT_EQ("at once", connect().get("/").body);
+}
+
+TEST_F(Answers, MayComeLaterAfterAJob) {
+    handler.answer = [&](const Request&) {
+        return Job([&]() -> Answer { return keepResponder(seconds(60), inTime); });
+    };
+    RawClient client = connect();
+    client.send("GET /later HTTP/1.1\r\n\r\n");
+    responder.get_future().get()(Reply{200, "late"});
+    EXPECT_EQ("late", client.readAnswer().body);
+}
+
+TEST_F(Answers, ThatDoNotComeInTimeAreMadeAtTheLimit) {
+    handler.answer = [&](const Request&) {
+        return Answer(keepResponder(milliseconds(20), inTime));
+    };
+    RawClient client = connect();
+    EXPECT_EQ("the time is over", client.get("/later").body);
+    responder.get_future().get()(Reply{200, "late"});
+    EXPECT_EQ("alive", client.get("/alive").body) << "the late answer belongs to no request";
+}
+
+TEST_F(Answers, ThatNobodyGaveYetAreMadeWhenTheServerEnds) {
+    handler.answer = [&](const Request&) { return Answer(keepResponder(seconds(60), inTime)); };
+    RawClient client = connect();
+    client.send("GET /later HTTP/1.1\r\n\r\n");
+    responder.get_future().get();
+    server->end(seconds(60));
+    EXPECT_EQ("the time is over", client.readAnswer().body);
+    EXPECT_TRUE(eventually([&] { return ended.load(); }));
+}
+
+TEST_F(Answers, ForAClientOrAServerThatHasGoneAreDropped) {
+    handler.answer = [&](const Request&) { return Answer(keepResponder(seconds(60), inTime)); };
+    RawClient client = connect();
+    client.send("GET /later HTTP/1.1\r\n\r\n");
+    const Responder respond = responder.get_future().get();
+    client.close();
+    respond(Reply{200, "nobody reads this"});
+    EXPECT_EQ("alive", aliveness());
+    stop();
+    respond(Reply{200, "nobody sends this"});
+}
+
+TEST_F(Answers, OfAHandlerThatIsBusyDelayTheEnd) {
+    handler.isQuiet = false;
+    server->end(seconds(60));
+    ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
+    EXPECT_FALSE(ended);
+    handler.isQuiet = true;
+    EXPECT_TRUE(eventually([&] { return ended.load(); }));
+}
+
+/// Events that are the test's.
+class TestSource final : public host::EventSource {
+public:
+    explicit TestSource(std::string first, std::atomic<bool>& gone)
+        : text_(std::move(first)), gone_(gone) {}
+    ~TestSource() override { gone_ = true; }
+    void start(std::function<void()> wake) override { wake(); }
+    std::string take() override { return std::exchange(text_, ""); }
+    bool empty() const override { return text_.empty(); }
+
+private:
+    std::string text_;
+    std::atomic<bool>& gone_;
+};
+
+TEST_F(Answers, MayBeStreamsOfAnyKind) {
+    std::atomic<bool> gone{false};
+    handler.answer = [&](const Request&) -> std::variant<Answer, Job> {
+        std::string text;
+        host::appendEvent(text, {"7", "tick", "n-1"});
+        return Answer(std::make_unique<TestSource>(text, gone));
+    };
+    RawClient client = connect();
+    client.send("GET /ticks HTTP/1.1\r\n\r\n");
+    EXPECT_NE(std::string::npos,
+              client.readUntil("\r\n\r\n").find("Content-Type: text/event-stream\r\n"));
+    EXPECT_EQ("id: n-1\nevent: tick\ndata: 7\n\n", client.readUntil("\n\n"));
+    EXPECT_EQ(1U, counts.streams);
+    EXPECT_FALSE(gone);
+    client.close();
+    EXPECT_TRUE(eventually([&] { return gone.load(); }));
+    EXPECT_EQ(0U, counts.streams);
+}
+
+TEST_F(Answers, ThatAreStreamsEndWithTheServer) {
+    std::atomic<bool> gone{false};
+    handler.answer = [&](const Request&) -> std::variant<Answer, Job> {
+        return Answer(std::make_unique<TestSource>("data: x\n\n", gone));
+    };
+    RawClient client = connect();
+    client.send("GET /ticks HTTP/1.1\r\n\r\n");
+    EXPECT_NE(std::string::npos, client.readUntil("data: x\n\n").find("data: x"));
+    stop();
+    EXPECT_TRUE(gone);
+    EXPECT_EQ(0U, counts.streams);
+    EXPECT_TRUE(client.isClosed());
+}
+
+}  // namespace

@@ -1,0 +1,135 @@
+// ctest-label: threaded
+// Everything that the host knows about the plug-in, compared with the plug-in as it is shipped.
+#include "host/tables/plugin_facts.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <map>
+#include <mutex>
+
+#include "embedded/oxa_host.h"
+#include "host/process/plugin_loader.h"
+#include "host/tables/row_fields.h"
+#include "support/fake_sleep.h"
+#include "support/program.h"
+#include "support/script_home.h"
+
+namespace {
+
+namespace plugin = host::plugin;
+
+/// The plug-in on a home of scripts, started once: it cannot be unloaded, and its executor runs as
+/// long as the process.
+class Started {
+public:
+    static Started& once() {
+        static Started& instance = *new Started;
+        return instance;
+    }
+
+    const oxa::Table* find(std::string_view name) const {
+        for (const oxa::Table& table : tables_) {
+            if (table.name == name) return &table;
+        }
+        return nullptr;
+    }
+
+    /// Asks for the command with all that any queued command requires. Returns the answer.
+    oxa::Rows request(const std::string& command, const std::string& transid) const {
+        oxa::Rows rows;
+        std::vector<oxa::Predicate> where = {{"COMMAND", OPER_EQ, command},
+                                             {"PRODUCT", OPER_EQ, "ux"},
+                                             {"VERSION", OPER_EQ, "060100"},
+                                             {"TRANSID", OPER_EQ, transid},
+                                             {"TARGETMSN", OPER_EQ, "inst:host:UX"}};
+        // The other kind answers with a context of its own, which this would filter out.
+        if (!plugin::runsAtOnce(command)) where.push_back({"CONTEXT", OPER_EQ, "exit 0"});
+        EXPECT_EQ(OXA_OK, oxa::query(std::string(plugin::kRequestTable), where, rows));
+        return rows;
+    }
+    /// How many outcomes with this TRANSID have been published.
+    int outcomes(const std::string& transid) {
+        const std::lock_guard<std::mutex> guard(lock_);
+        return outcomes_[transid];
+    }
+
+private:
+    Started() {
+        home_.products({"ux"}, "exit 0");
+        fake_sleep::reset();
+        ::setenv("TOVRINHOME", home_.path().c_str(), 1);
+        ::setenv("QVSDEPLOY_AGENTDEPOT", home_.depot().c_str(), 1);
+        plugin_.initialize();
+        tables_ = oxa::tables();
+        live_ =
+            oxa::subscribe(std::string(plugin::kOutcomeTable), {}, [this](const oxa::Rows& rows) {
+                const oxa::Column& transid =
+                    *find(plugin::kOutcomeTable)->find(std::string(plugin::kTransidColumn));
+                const std::lock_guard<std::mutex> guard(lock_);
+                for (std::size_t i = 0; i < rows.count(); ++i)
+                    ++outcomes_[std::string(host::textField(transid, host::rowOf(rows, i)))];
+                return static_cast<int>(OXA_OK);
+            });
+    }
+
+    ScriptHome home_;
+    host::Plugin plugin_{std::string(ZAV_BUILD_DIR "/lib/libzavmgmt.so")};
+    std::vector<oxa::Table> tables_;
+    std::mutex lock_;
+    std::map<std::string, int> outcomes_;
+    std::unique_ptr<oxa::Subscription> live_;
+};
+
+void expectColumn(std::string_view tableName, std::string_view columnName, int type) {
+    const oxa::Table* const table = Started::once().find(tableName);
+    ASSERT_NE(nullptr, table) << tableName;
+    const oxa::Column* const column = table->find(std::string(columnName));
+    ASSERT_NE(nullptr, column) << columnName;
+    EXPECT_EQ(type, column->type) << columnName;
+}
+
+TEST(PluginFacts, NameTablesAndColumnsThatThereAre) {
+    expectColumn(plugin::kRequestTable, plugin::kTransidColumn, OXA_TYPE_CHARACTER);
+    expectColumn(plugin::kRequestTable, plugin::kCommandColumn, OXA_TYPE_CHARACTER);
+    expectColumn(plugin::kRequestTable, plugin::kRetvalColumn, OXA_TYPE_INTEGER);
+    expectColumn(plugin::kOutcomeTable, plugin::kTransidColumn, OXA_TYPE_CHARACTER);
+}
+
+/// What the answer to a request says about its acceptance.
+int retvalOf(const oxa::Rows& rows) {
+    const oxa::Table& table = *Started::once().find(plugin::kRequestTable);
+    const oxa::Column& retval = *table.find(std::string(plugin::kRetvalColumn));
+    EXPECT_EQ(1U, rows.count());
+    return rows.count() == 1 ? host::integerField(retval, host::rowOf(rows, 0)) : -1;
+}
+
+TEST(PluginFacts, TellQueuedCommandsFromThoseThatRunAtOnce) {
+    Started& started = Started::once();
+    int atOnce = 0;
+    for (const char* command : {"GETCONFIG", "COMPLETE_INSTALL", "START", "STOP", "RESTART",
+                                "INSTALL", "UNINSTALL", "SETCONFIG", "REMOVEINSTANCE"}) {
+        const std::string transid = std::string("is-") + command;
+        const int retval = retvalOf(started.request(command, transid));
+        if (plugin::runsAtOnce(command)) {
+            ++atOnce;
+            continue;
+        }
+        EXPECT_EQ(plugin::kAccepted, retval) << command;
+        EXPECT_TRUE(eventually([&] { return started.outcomes(transid) == 1; })) << command;
+    }
+    EXPECT_EQ(plugin::kCommandsAtOnce.size(), static_cast<std::size_t>(atOnce));
+    // Outcomes come in the order of the requests, so those of the first two would be there.
+    for (const std::string_view command : plugin::kCommandsAtOnce)
+        EXPECT_EQ(0, started.outcomes("is-" + std::string(command))) << command;
+}
+
+TEST(PluginFacts, TellAcceptedRequestsFromRefusedOnes) {
+    Started& started = Started::once();
+    EXPECT_NE(plugin::kAccepted, retvalOf(started.request("NOSUCH", "refused")));
+    EXPECT_EQ(plugin::kAccepted, retvalOf(started.request("STOP", "accepted")));
+    EXPECT_TRUE(eventually([&] { return started.outcomes("accepted") == 1; }));
+    EXPECT_EQ(0, started.outcomes("refused"));
+}
+
+}  // namespace
