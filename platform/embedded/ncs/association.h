@@ -111,7 +111,7 @@ private:
     /// Bytes that are not handled yet: heads, packets other than requests, and requests small
     /// enough that several come with one read. Untouched memory costs nothing, so it may be
     /// generous.
-    unsigned char inbox_[std::size_t{32} << 10];
+    unsigned char inbox_[std::size_t{64} << 10];
     std::size_t inboxStart_ = 0;
     std::size_t inboxEnd_ = 0;
 };
