@@ -12,25 +12,33 @@ namespace ctl {
 
 ChunkBatch::ChunkBatch() : bytes_(kMostChunks * kChunkSize) {}
 
-std::size_t ChunkBatch::read(int descriptor, const std::string& name) {
+std::size_t ChunkBatch::read(int descriptor, const std::string& name, std::uintmax_t expected) {
+    // With room for more than the file has, a read that ends where it should has met the end. Files
+    // whose size says nothing, such as those below /proc, are read until nothing comes.
+    std::size_t room = kMostData;
+    if (expected > 0 && expected < kMostData) room = static_cast<std::size_t>(expected) + 1;
     std::size_t total = 0;
     while (total < kMostData) {
-        const std::size_t length = readSome(descriptor, total, name);
+        const std::size_t length = readSome(descriptor, total, room, name);
         if (length == 0) break;
         total += length;
+        if (total == expected && total < room) break;
+        if (total == room) room = kMostData;
     }
     putLengths(total);
     return total;
 }
 
-/// Reads to the places behind the first `from` bytes; 0 at the end of the file.
-std::size_t ChunkBatch::readSome(int descriptor, std::size_t from, const std::string& name) {
+/// Reads to the places from byte `from` to byte `to` of the batch; 0 at the end of the file.
+std::size_t ChunkBatch::readSome(int descriptor, std::size_t from, std::size_t to,
+                                 const std::string& name) {
     iovec places[kMostChunks];
     int count = 0;
-    for (std::size_t at = from; at < kMostData;) {
+    for (std::size_t at = from; at < to;) {
         const std::size_t within = at % kChunkData;
-        places[count++] = {&bytes_[at / kChunkData * kChunkSize + 4 + within], kChunkData - within};
-        at += kChunkData - within;
+        const std::size_t length = std::min(kChunkData - within, to - at);
+        places[count++] = {&bytes_[at / kChunkData * kChunkSize + 4 + within], length};
+        at += length;
     }
     for (;;) {
         const ssize_t length = ::readv(descriptor, places, count);

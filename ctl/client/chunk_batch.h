@@ -23,8 +23,9 @@ public:
 
     /// Fills the batch with the next bytes of an open file and returns their number, which is less
     /// than kMostData only at the end of the file. No bytes make one empty chunk. `name` is for the
-    /// Failure that is thrown when reading fails.
-    std::size_t read(int descriptor, const std::string& name);
+    /// Failure that is thrown when reading fails. `expected` is how many bytes the file still has,
+    /// or 0 if that is not known: the right number saves a system call, a wrong one does no harm.
+    std::size_t read(int descriptor, const std::string& name, std::uintmax_t expected = 0);
 
     /// The number of chunks.
     std::uint16_t count() const { return count_; }
@@ -34,7 +35,7 @@ public:
 
 private:
     static constexpr std::size_t kChunkSize = 4 + kChunkData;
-    std::size_t readSome(int descriptor, std::size_t from, const std::string& name);
+    std::size_t readSome(int descriptor, std::size_t from, std::size_t to, const std::string& name);
     void putLengths(std::size_t total);
 
     std::vector<unsigned char> bytes_;

@@ -1,6 +1,7 @@
 #include "ctl/client/pushed_file.h"
 
 #include <algorithm>
+#include <filesystem>
 
 #include "ctl/client/failure.h"
 
@@ -27,13 +28,17 @@ std::string nameInDepot(const std::string& base, const std::string& destination)
     return destination.back() == '/' ? destination + base : destination;
 }
 
-std::vector<PushedFile> filesOfFolder(const fs::path& folder, const std::string& destination) {
+std::vector<PushedFile> filesOfFolder(const std::string& folder, const std::string& destination) {
+    // What the folder's path stands before; taken off as text, which is a tenth of the work of
+    // comparing paths.
+    const std::size_t prefix = folder == "/" ? 1 : folder.size() + 1;
     std::vector<PushedFile> files;
     for (const auto& entry : fs::recursive_directory_iterator(folder)) {
         if (!entry.is_regular_file()) continue;
-        const std::string relative = entry.path().lexically_relative(folder).generic_string();
+        const std::string& source = entry.path().native();
+        const std::string relative = source.substr(prefix);
         refuseBackslash(relative);
-        files.push_back({entry.path(), destination + "/" + relative, entry.file_size(), 0, {}});
+        files.push_back({source, destination + "/" + relative, entry.file_size(), 0, {}});
     }
     std::sort(files.begin(), files.end(),
               [](const PushedFile& a, const PushedFile& b) { return a.name < b.name; });
@@ -47,10 +52,10 @@ std::vector<PushedFile> filesOf(const std::string& source, const std::string& de
     if (!fs::exists(found)) throw Failure(kWrongUsage, "there is no " + source);
     const std::string base = fs::absolute(path).filename().string();
     const std::string name = nameInDepot(base, destination);
-    if (fs::is_directory(found)) return filesOfFolder(path, withoutTrailingSlashes(name));
+    if (fs::is_directory(found)) return filesOfFolder(path.native(), withoutTrailingSlashes(name));
     if (!fs::is_regular_file(found)) throw Failure(kWrongUsage, source + " is no regular file");
     refuseBackslash(base);
-    return {{path, name, fs::file_size(path), 0, {}}};
+    return {{path.native(), name, fs::file_size(path), 0, {}}};
 }
 
 }  // namespace

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <cstdint>
-#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -11,7 +10,7 @@
 namespace ctl {
 
 struct PushedFile {
-    std::filesystem::path source;
+    std::string source;       ///< where it stands here
     std::string name;         ///< relative to the depot
     std::uintmax_t size = 0;  ///< in bytes, before it is read
     std::uintmax_t sent = 0;  ///< bytes that the host took

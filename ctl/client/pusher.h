@@ -11,9 +11,10 @@
 
 namespace ctl {
 
-/// Sends files one after the other over one association. Several batches are on their way at a
-/// time, so that the host never waits for the next one. Operations throw Failure when a file cannot
-/// be read and as TransferClient does.
+/// Sends files to the host, several batches at a time on their way, so that the host never waits
+/// for the next one. Small files take turns on two associations, which the host serves side by
+/// side: most of their cost is that of making them. Operations throw Failure when a file cannot be
+/// read and as TransferClient does.
 class Pusher {
 public:
     /// Called with the number of bytes of each batch that the host has answered.
@@ -22,10 +23,11 @@ public:
     /// Connects to the host.
     explicit Pusher(const HostAddress& host, OnAnswer onAnswer = {});
 
-    /// Sends a file. It must live until finish(): its result is filled in as answers come.
+    /// Sends a file. It must live until finish(): its result is filled in as answers come. A file
+    /// that cannot be read does not keep those before it from arriving.
     void push(PushedFile& file);
     /// Waits for the answers that are still to come.
-    void finish() { awaitAnswers(0); }
+    void finish();
 
 private:
     // Small enough that the answers to all of them fit into the socket's buffer.
@@ -35,13 +37,23 @@ private:
         PushedFile* file;
         std::size_t length;
     };
+    /// An association and the batches that it has not answered yet.
+    struct Lane {
+        explicit Lane(const HostAddress& host) : client(host.rpcSocket, host.timeout) {}
+        TransferClient client;
+        std::deque<Sent> onTheirWay;
+    };
 
-    void awaitAnswers(std::size_t remaining);
+    void sendBatches(PushedFile& file);
+    Lane& laneFor(const PushedFile& file);
+    void openSecondLane();
+    void awaitAnswers(Lane& lane, std::size_t remaining);
 
-    TransferClient client_;
+    HostAddress host_;
     OnAnswer onAnswer_;
     ChunkBatch batch_;
-    std::deque<Sent> onTheirWay_;
+    std::deque<Lane> lanes_;
+    std::size_t turn_ = 0;
 };
 
 }  // namespace ctl

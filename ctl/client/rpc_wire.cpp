@@ -9,6 +9,9 @@ namespace {
 /// Appends numbers in little-endian byte order, each aligned to its own size.
 class Writer {
 public:
+    /// `expected` bytes come without another allocation.
+    explicit Writer(std::size_t expected = 128) { bytes_.reserve(expected); }
+
     Writer& number8(unsigned value) {
         bytes_.push_back(static_cast<unsigned char>(value));
         return *this;
@@ -121,7 +124,7 @@ std::array<unsigned char, kRequestHeader> requestHeader(std::uint32_t callId, st
 std::vector<unsigned char> transferHead(const std::string& name, bool firstBatch,
                                         std::uint16_t chunkCount) {
     const auto length = static_cast<std::uint32_t>(name.size() + 1);
-    Writer out;
+    Writer out(64 + length);
     out.number32(0).number32(length).number32(0).number32(length);
     out.raw(name.c_str(), length);
     out.number32(0).number32(firstBatch ? 1 : 0).number32(chunkCount - 1U);

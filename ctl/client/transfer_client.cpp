@@ -16,6 +16,12 @@ namespace ctl {
 namespace {
 
 constexpr int kFragmentsAtATime = 16;
+/// Requests up to this size wait for company: a system call and a wake-up of the host for each
+/// would cost as much as what the host does with it.
+constexpr std::size_t kHeldBack = std::size_t{64} << 10;
+/// Bytes on their way to the host. With the usual 208 KiB the client would stand still while the
+/// host writes what it has got of a batch; the kernel gives less if the system's limit is lower.
+constexpr int kSendBuffer = 2 << 20;
 
 Failure broken() {
     if (errno == EAGAIN || errno == EWOULDBLOCK) {
@@ -32,6 +38,10 @@ void setTimeout(int descriptor, std::chrono::milliseconds timeout) {
     limit.tv_usec = static_cast<suseconds_t>(timeout.count() % 1000 * 1000);
     ::setsockopt(descriptor, SOL_SOCKET, SO_RCVTIMEO, &limit, sizeof limit);
     ::setsockopt(descriptor, SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof limit);
+}
+
+void setSendBuffer(int descriptor) {
+    ::setsockopt(descriptor, SOL_SOCKET, SO_SNDBUF, &kSendBuffer, sizeof kSendBuffer);
 }
 
 /// Sends all bytes of the pieces. Changes the pieces on the way.
@@ -85,6 +95,7 @@ TransferClient::TransferClient(const std::string& socketPath, std::chrono::milli
     if (descriptor_ == -1) throw broken();
     try {
         setTimeout(descriptor_, timeout);
+        setSendBuffer(descriptor_);
         connect(socketPath);
         bind();
     } catch (...) {
@@ -124,6 +135,31 @@ void TransferClient::bind() {
 
 void TransferClient::send(const std::string& name, bool firstBatch, const ChunkBatch& batch) {
     const std::vector<unsigned char> head = rpc::transferHead(name, firstBatch, batch.count());
+    const std::size_t total = head.size() + batch.size();
+    const std::size_t whole = rpc::kRequestHeader + total;
+    const bool isLarge = total > largestData_ || whole > kHeldBack;
+    if (isLarge || heldBack_.size() + whole > kHeldBack) sendHeldBack();
+    if (isLarge) {
+        sendFragments(head, batch);
+        return;
+    }
+    const auto header =
+        rpc::requestHeader(nextCall_++, rpc::kFirstFragment | rpc::kLastFragment, total, total);
+    heldBack_.insert(heldBack_.end(), header.begin(), header.end());
+    heldBack_.insert(heldBack_.end(), head.begin(), head.end());
+    heldBack_.insert(heldBack_.end(), batch.data(), batch.data() + batch.size());
+}
+
+void TransferClient::sendHeldBack() {
+    if (heldBack_.empty()) return;
+    std::vector<iovec> pieces = {{heldBack_.data(), heldBack_.size()}};
+    sendPieces(descriptor_, pieces);
+    heldBack_.clear();
+}
+
+/// Sends a request in as many fragments as it needs.
+void TransferClient::sendFragments(const std::vector<unsigned char>& head,
+                                   const ChunkBatch& batch) {
     RequestData data(head, batch);
     const std::size_t total = data.total();
     const std::uint32_t call = nextCall_++;
@@ -145,6 +181,7 @@ void TransferClient::send(const std::string& name, bool firstBatch, const ChunkB
 }
 
 TransferAnswer TransferClient::receive() {
+    sendHeldBack();
     const Packet packet = readPacket();
     TransferAnswer answer;
     // Behind the common header stand the allocation hint, context and cancel count: 8 bytes; then
@@ -175,12 +212,25 @@ TransferClient::Packet TransferClient::readPacket() {
 
 void TransferClient::readAll(unsigned char* data, std::size_t length) {
     while (length > 0) {
-        const ssize_t got = ::recv(descriptor_, data, length, 0);
+        if (at_ == end_) readMore();
+        const std::size_t count = std::min(length, end_ - at_);
+        std::memcpy(data, received_ + at_, count);
+        at_ += count;
+        data += count;
+        length -= count;
+    }
+}
+
+/// Waits for bytes; takes all that have come.
+void TransferClient::readMore() {
+    for (;;) {
+        const ssize_t got = ::recv(descriptor_, received_, sizeof received_, 0);
         if (got == -1 && errno == EINTR) continue;
         if (got == -1) throw broken();
         if (got == 0) throw Failure(kNoHost, "the host closed the connection");
-        data += got;
-        length -= static_cast<std::size_t>(got);
+        at_ = 0;
+        end_ = static_cast<std::size_t>(got);
+        return;
     }
 }
 

@@ -32,7 +32,8 @@ public:
     TransferClient& operator=(const TransferClient&) = delete;
 
     /// Sends a batch of the file that becomes `name` in the depot. The first batch of a file
-    /// replaces what is there, later ones are appended.
+    /// replaces what is there, later ones are appended. A small batch may be held back until more
+    /// come or receive() waits for an answer.
     void send(const std::string& name, bool firstBatch, const ChunkBatch& batch);
     /// Waits for the answer to the oldest request that has none yet.
     TransferAnswer receive();
@@ -44,12 +45,21 @@ private:
     };
     void connect(const std::string& path);
     void bind();
+    void sendFragments(const std::vector<unsigned char>& head, const ChunkBatch& batch);
+    void sendHeldBack();
     Packet readPacket();
     void readAll(unsigned char* data, std::size_t length);
+    void readMore();
 
     int descriptor_ = -1;
     std::uint32_t nextCall_ = 1;
     std::size_t largestData_ = 0;
+    std::vector<unsigned char> heldBack_;  ///< whole requests that are to be sent
+
+    /// What came with one system call and is not looked at yet: the bytes from `at_` to `end_`.
+    unsigned char received_[4096];
+    std::size_t at_ = 0;
+    std::size_t end_ = 0;
 };
 
 }  // namespace ctl

@@ -54,6 +54,23 @@ TEST(ChunkBatch, GoesOnWhereTheLastOneEnded) {
     EXPECT_TRUE(read == content);
 }
 
+TEST(ChunkBatch, HoldsWhatIsThereWhateverWasExpected) {
+    const ScratchDir scratch;
+    for (const std::size_t size :
+         {std::size_t{0}, std::size_t{1}, std::size_t{4096}, std::size_t{10'000}, kBatchBytes}) {
+        const std::string content = pattern(size);
+        const std::string path = scratch.write("file", content);
+        for (const std::size_t expected :
+             {std::size_t{1}, std::size_t{4096}, size - std::min<std::size_t>(size, 1), size,
+              size + 1, kBatchBytes - 1, kBatchBytes, 3 * kBatchBytes}) {
+            const Descriptor file(::open(path.c_str(), O_RDONLY));
+            ChunkBatch batch;
+            EXPECT_EQ(batch.read(file.get(), "file", expected), size) << expected;
+            EXPECT_TRUE(contentOf(bytesOf(batch)) == content) << size << ' ' << expected;
+        }
+    }
+}
+
 TEST(ChunkBatch, LeavesNothingOfAnEarlierFileBehindTheContent) {
     const ScratchDir scratch;
     const Descriptor first(::open(scratch.write("first", pattern(9000)).c_str(), O_RDONLY));

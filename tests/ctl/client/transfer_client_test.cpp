@@ -2,18 +2,13 @@
 #include "ctl/client/transfer_client.h"
 
 #include <fcntl.h>
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/socket.h>
-#include <sys/un.h>
-#include <unistd.h>
 
-#include <cstring>
 #include <functional>
-#include <thread>
 
 #include "chunks.h"
 #include "ctl/client/failure.h"
+#include "made_up_host.h"
 #include "support/scratch_dir.h"
 
 namespace {
@@ -23,80 +18,10 @@ using ctl::Failure;
 using ctl::TransferClient;
 using ctl_test::contentOf;
 using ctl_test::Descriptor;
+using ctl_test::HostConnection;
+using ctl_test::MadeUpHost;
 using ctl_test::numberAt;
 using ctl_test::pattern;
-
-/// Plays the host for one connection.
-class MadeUpHost {
-public:
-    using Part = std::function<void(MadeUpHost&)>;
-
-    explicit MadeUpHost(Part part) : listener_(::socket(AF_UNIX, SOCK_STREAM, 0)) {
-        sockaddr_un address{};
-        address.sun_family = AF_UNIX;
-        std::strncpy(address.sun_path, path().c_str(), sizeof address.sun_path - 1);
-        EXPECT_EQ(::bind(listener_.get(), reinterpret_cast<sockaddr*>(&address), sizeof address),
-                  0);
-        EXPECT_EQ(::listen(listener_.get(), 1), 0);
-        thread_ = std::thread([this, part] {
-            const Descriptor accepted(::accept(listener_.get(), nullptr, nullptr));
-            connection_ = accepted.get();
-            part(*this);
-        });
-    }
-    ~MadeUpHost() { join(); }
-    MadeUpHost(const MadeUpHost&) = delete;
-    MadeUpHost& operator=(const MadeUpHost&) = delete;
-
-    std::string path() const { return scratch_.path("host.rpc"); }
-    void join() {
-        if (thread_.joinable()) thread_.join();
-    }
-
-    /// The next packet of the client; empty at the end.
-    std::string packet() const {
-        std::string bytes = take(16);
-        if (bytes.size() < 16) return "";
-        return bytes + take((numberAt(bytes, 8) & 0xFFFF) - 16);
-    }
-    void send(const std::string& bytes) const {
-        ::send(connection_, bytes.data(), bytes.size(), MSG_NOSIGNAL);
-    }
-    /// Takes a bind and accepts it, with the largest fragment that is taken.
-    void bind(unsigned largest) const {
-        packet();
-        std::string ack("\5\0\x0c\3\x10\0\0\0\x38\0\0\0\1\0\0\0\0\x10", 18);
-        ack += static_cast<char>(largest & 0xFFU);
-        ack += static_cast<char>(largest >> 8);
-        ack += std::string("\1\0\0\0\0\0\0\0\1\0\0\0\0\0\0\0", 16) + std::string(20, '\0');
-        send(ack);
-    }
-    void answer(unsigned type, std::uint32_t value) const {
-        std::string bytes("\5\0\0\3\x10\0\0\0\x1c\0\0\0\2\0\0\0\4\0\0\0\0\0\0\0", 24);
-        bytes[2] = static_cast<char>(type);
-        for (unsigned i = 0; i < 4; ++i)
-            bytes += static_cast<char>(value >> (8 * i) & 0xFFU);
-        send(bytes);
-    }
-
-private:
-    std::string take(std::size_t count) const {
-        std::string bytes(count, '\0');
-        std::size_t got = 0;
-        while (got < count) {
-            const ssize_t length = ::recv(connection_, &bytes[got], count - got, 0);
-            if (length <= 0) break;
-            got += static_cast<std::size_t>(length);
-        }
-        bytes.resize(got);
-        return bytes;
-    }
-
-    ScratchDir scratch_;
-    Descriptor listener_;
-    int connection_ = -1;
-    std::thread thread_;
-};
 
 constexpr std::chrono::seconds kLong{20};
 
@@ -121,7 +46,7 @@ ChunkBatch batchOf(const std::string& content) {
 TEST(TransferClient, KeepsToTheFragmentSizeOfTheHost) {
     const std::string content = pattern(30'000);
     std::vector<std::string> fragments;
-    MadeUpHost host([&](MadeUpHost& self) {
+    MadeUpHost host([&](HostConnection& self) {
         self.bind(1500);
         do {
             fragments.push_back(self.packet());
@@ -147,8 +72,44 @@ TEST(TransferClient, KeepsToTheFragmentSizeOfTheHost) {
     EXPECT_EQ(numberAt(fragments[0], 16), data.size()) << "the allocation hint";
 }
 
+TEST(TransferClient, SendsSmallAndLargeBatchesInTheirOrder) {
+    const std::vector<std::string> contents = {"a", pattern(5000),   pattern(ChunkBatch::kMostData),
+                                               "b", pattern(70'000), "c"};
+    const std::size_t headSize = ctl::rpc::transferHead("n", true, 1).size();
+    for (const unsigned largestFragment : {65528U, 5000U}) {
+        std::vector<std::string> arrived;
+        MadeUpHost host([&](HostConnection& self) {
+            self.bind(largestFragment);
+            for (std::size_t i = 0; i < contents.size(); ++i) {
+                arrived.push_back(contentOf(self.request().substr(headSize)));
+                self.answer(2, static_cast<std::uint32_t>(i));
+            }
+        });
+        TransferClient client(host.path(), kLong);
+        for (const std::string& content : contents)
+            client.send("n", true, batchOf(content));
+        for (std::size_t i = 0; i < contents.size(); ++i)
+            EXPECT_EQ(client.receive().status, static_cast<std::int32_t>(i));
+        host.join();
+        EXPECT_TRUE(arrived == contents) << largestFragment;
+    }
+}
+
+TEST(TransferClient, TakesAnswersOneByOneHoweverTheyCome) {
+    constexpr std::uint32_t kAnswers = 200;  // fit into the socket, but not into one read
+    MadeUpHost host([](HostConnection& self) {
+        self.bind(65528);
+        for (std::uint32_t i = 0; i < kAnswers; ++i)
+            self.answer(2, i);
+    });
+    TransferClient client(host.path(), kLong);
+    host.join();
+    for (std::uint32_t i = 0; i < kAnswers; ++i)
+        EXPECT_EQ(client.receive().status, static_cast<std::int32_t>(i));
+}
+
 TEST(TransferClient, ReportsStatusValuesAndFaults) {
-    MadeUpHost host([](MadeUpHost& self) {
+    MadeUpHost host([](HostConnection& self) {
         self.bind(65528);
         self.answer(2, 6);
         self.answer(2, 0xFFFFFFFF);
@@ -161,7 +122,7 @@ TEST(TransferClient, ReportsStatusValuesAndFaults) {
 }
 
 TEST(TransferClient, AHostThatHangsUpIsNoHost) {
-    MadeUpHost host([](MadeUpHost& self) { self.bind(65528); });
+    MadeUpHost host([](HostConnection& self) { self.bind(65528); });
     TransferClient client(host.path(), kLong);
     host.join();
     const auto failure = failureOf([&] { client.receive(); });
@@ -170,7 +131,7 @@ TEST(TransferClient, AHostThatHangsUpIsNoHost) {
 }
 
 TEST(TransferClient, AHostThatSaysNothingRunsIntoTheTimeOut) {
-    MadeUpHost host([](MadeUpHost& self) {
+    MadeUpHost host([](HostConnection& self) {
         self.bind(65528);
         self.packet();  // comes when the client has gone
     });
@@ -184,7 +145,7 @@ TEST(TransferClient, AHostThatSaysNothingRunsIntoTheTimeOut) {
 
 TEST(TransferClient, AHostThatRefusesTheBindOffersNoFileTransfer) {
     const std::string nak("\5\0\x0d\3\x10\0\0\0\x15\0\0\0\1\0\0\0\0\0\1\5\0", 21);
-    MadeUpHost host([&](MadeUpHost& self) {
+    MadeUpHost host([&](HostConnection& self) {
         self.packet();
         self.send(nak);
     });
@@ -198,7 +159,7 @@ TEST(TransferClient, AnswersThatMakeNoSenseAreSaid) {
          {std::string("HTTP/1.1 400 Bad Request\r\n\r\n"),
           std::string("\5\0\2\3\x10\0\0\0\x10\0\0\0\2\0\0\0", 16),
           std::string("\5\0\x0c\3\x10\0\0\0\x1c\0\0\0\2\0\0\0", 16) + std::string(12, '\0')}) {
-        MadeUpHost host([&](MadeUpHost& self) {
+        MadeUpHost host([&](HostConnection& self) {
             self.bind(65528);
             self.send(answer);
         });
