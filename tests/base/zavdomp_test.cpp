@@ -121,6 +121,20 @@ TEST(DOMElement, IsCreatedEmpty) {
     EXPECT_EQ(element.getChildren()->getLength(), 0u);
 }
 
+TEST(DOMElement, TagNamesOfEveryLengthAreKeptAndCopied) {
+    for (std::size_t length = 0; length <= 40; ++length) {
+        const std::string name(length, 'n');
+        const DOMElement element(name.c_str());
+        const DOMElement copy(element);
+        EXPECT_EQ(narrow(element.getTagName()), name);
+        EXPECT_EQ(narrow(copy.getTagName()), name);
+        EXPECT_NE(copy.getTagName(), element.getTagName());
+    }
+    const DOMElement nameless(nullptr);
+    EXPECT_EQ(nameless.getTagName(), nullptr);
+    EXPECT_EQ(DOMElement(nameless).getTagName(), nullptr);
+}
+
 TEST(DOMElement, CopyHasOnlyNameAndText) {
     DOMElement parent("parent");
     auto* original = new DOMElement("tag");

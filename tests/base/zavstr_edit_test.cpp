@@ -49,6 +49,7 @@ TEST(StringErase, RemovesARange) {
 
 TEST(StringTrim, RemovesWhiteSpaceAtBothEnds) {
     EXPECT_EQ(String(" a b ").trim(), "a b");
+    EXPECT_EQ(String("\n        \n\t\t a b        ").trim(), "a b");
     EXPECT_EQ(String(" \t \t").trim(), "");
     EXPECT_EQ(String("").trim(), "");
     EXPECT_EQ(String("a").trim(), "a");

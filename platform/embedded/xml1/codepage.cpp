@@ -139,11 +139,35 @@ void appendWide(std::string_view utf8, std::vector<unsigned short>& out) {
     }
 }
 
+bool isAscii(std::string_view text) {
+    unsigned bits = 0;
+    for (const char c : text)
+        bits |= static_cast<unsigned char>(c);
+    return bits < 0x80;
+}
+
+/// Whether every ASCII character is its own byte in the locale's code page.
+bool keepsAscii(NLS2_LOCALE* locale) {
+    std::array<unsigned short, 128> units;
+    std::array<char, 128> expected;
+    std::array<char, 128> bytes{};
+    for (unsigned i = 0; i < units.size(); ++i) {
+        units[i] = static_cast<unsigned short>(i);
+        expected[i] = static_cast<char>(i);
+    }
+    int status = NLS2_OK;
+    const unsigned written =
+        NLS2_fromUTF16(locale, units.data(), units.size(), bytes.data(), bytes.size(), &status);
+    return written == units.size() && bytes == expected;
+}
+
 }  // namespace
 
 LocalText::LocalText() : locale_(openDefaultLocale()) {
     int status = NLS2_OK;
-    if (locale_) codepage_ = NLS2_GetLocaleCodepageId(locale_.get(), &status);
+    if (!locale_) return;
+    codepage_ = NLS2_GetLocaleCodepageId(locale_.get(), &status);
+    keepsAscii_ = keepsAscii(locale_.get());
 }
 
 bool LocalText::readsItself() const {
@@ -151,6 +175,10 @@ bool LocalText::readsItself() const {
 }
 
 void LocalText::append(std::string_view utf8, std::string& out) {
+    if (keepsAscii_ && isAscii(utf8)) {
+        out.append(utf8);
+        return;
+    }
     wide_.clear();
     appendWide(utf8, wide_);
     const std::size_t before = out.size();

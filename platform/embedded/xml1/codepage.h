@@ -34,6 +34,7 @@ public:
 private:
     const DefaultLocale locale_;
     int codepage_ = NLS2_CP_UTF8;
+    bool keepsAscii_ = false;           ///< ASCII characters are the same bytes in the code page
     std::vector<unsigned short> wide_;  ///< scratch space, kept to save allocations
 };
 
