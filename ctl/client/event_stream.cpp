@@ -2,6 +2,8 @@
 
 #include <boost/beast/core/flat_buffer.hpp>
 #include <boost/beast/http.hpp>
+#include <cstdint>
+#include <limits>
 
 #include "ctl/client/percent_encoding.h"
 #include "ctl/client/transport.h"
@@ -12,7 +14,8 @@ namespace ctl {
 
 struct EventStream::Connection {
     explicit Connection(const std::string& path) : transport(path) {
-        parser.body_limit(boost::none);
+        // "No limit" would refuse every answer that gives its length, such as a refusal.
+        parser.body_limit(std::numeric_limits<std::uint64_t>::max());
     }
 
     void sendRequest(const std::string& target, Deadline deadline);

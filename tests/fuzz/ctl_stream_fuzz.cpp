@@ -1,5 +1,5 @@
-// What the control program reads from the host: streams of events, which mean the same in pieces of
-// any size, and the packets that answer a transfer.
+// What the control program reads from the host: the packets that answer a transfer, and streams of
+// events, which must give the same events whatever pieces they arrive in.
 
 #include <algorithm>
 #include <cstring>
@@ -27,8 +27,8 @@ Events parseInPieces(std::string_view stream, std::size_t piece) {
     return events;
 }
 
-/// The same a line at a time: "name: value", one blank after the colon being no part of the value;
-/// an event ends at an empty line and without data is none.
+/// A second parser to compare with. It takes a line at a time: "name: value", without the blank
+/// after the colon. An event ends at an empty line; without data it is ignored.
 Events parseByLines(std::string_view stream) {
     Events events;
     std::string type = "message";

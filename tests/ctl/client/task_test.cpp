@@ -1,0 +1,101 @@
+// ctest-label: threaded
+#include "ctl/client/task.h"
+
+#include <gtest/gtest.h>
+
+#include "canned_host.h"
+#include "ctl/client/failure.h"
+
+namespace {
+
+using ctl::runTask;
+using ctl::TaskResult;
+using ctl_test::CannedHost;
+using ctl_test::Peer;
+using nlohmann::json;
+
+constexpr const char* kAccepted = R"({"rows": [{"TRANSID": "T", "RETVAL": 0}]})";
+
+ctl::TaskRequest request() {
+    ctl::TaskRequest made;
+    made.command = "START";
+    made.transid = "T";
+    made.product = "ux";
+    return made;
+}
+
+ctl::HostAddress addressOf(const CannedHost& host) {
+    return {host.path(), host.path() + ".rpc", std::chrono::seconds(20)};
+}
+
+/// Runs a command to its outcome; the host answers the request and then streams `events`.
+TaskResult resultWith(const std::string& reply, const std::string& events) {
+    const CannedHost host([&](const CannedHost& self) {
+        const Peer stream = self.accept();
+        stream.request();
+        stream.beginStream();
+        {
+            const Peer peer = self.accept();
+            peer.request();
+            peer.answer(200, reply);
+        }
+        stream.send(events);
+    });
+    return runTask(addressOf(host), request(), true);
+}
+
+TEST(Task, SubscribesBeforeItAsksAndEndsWithTheOutcome) {
+    const TaskResult result = resultWith(kAccepted, "data: {\"RETVAL\": 1024}\n\n");
+    EXPECT_EQ(result.end, TaskResult::End::Outcome);
+    EXPECT_EQ(result.reply, (json{{"TRANSID", "T"}, {"RETVAL", 0}}));
+    EXPECT_EQ(result.events, (json{{{"RETVAL", 1024}}}));
+}
+
+TEST(Task, PassesOverEventsThatAreNoOutcome) {
+    const TaskResult result = resultWith(
+        kAccepted,
+        "event: overflow\ndata: {}\n\ndata: no JSON\n\ndata: [1]\n\ndata: {\"RETVAL\": 0}\n\n");
+    EXPECT_EQ(result.end, TaskResult::End::Outcome);
+    EXPECT_EQ(result.events, (json{{{"RETVAL", 0}}}));
+}
+
+TEST(Task, ThatIsRefusedWaitsForNothing) {
+    const TaskResult result = resultWith(R"({"rows": [{"RETVAL": 1003}]})", "");
+    EXPECT_EQ(result.end, TaskResult::End::Refused);
+    EXPECT_EQ(result.events, json::array());
+}
+
+TEST(Task, WhoseHostGoesAwayHasNoOutcome) {
+    const TaskResult result = resultWith(kAccepted, "");
+    EXPECT_EQ(result.end, TaskResult::End::HostGone);
+    EXPECT_EQ(result.reply["RETVAL"], 0);
+}
+
+TEST(Task, ThatNobodyWaitsForEndsWithItsReply) {
+    const CannedHost host([](const CannedHost& self) {
+        const Peer peer = self.accept();
+        peer.request();
+        peer.answer(200, kAccepted);
+    });
+    json seen;
+    const TaskResult result = runTask(addressOf(host), request(), false,
+                                      {{}, [&seen](const json& reply) { seen = reply; }});
+    EXPECT_EQ(result.end, TaskResult::End::Accepted);
+    EXPECT_EQ(seen, result.reply);
+}
+
+TEST(Task, WhoseReplyIsFilteredOutIsAFailure) {
+    const CannedHost host([](const CannedHost& self) {
+        const Peer peer = self.accept();
+        peer.request();
+        peer.answer(200, R"({"rows": []})");
+    });
+    try {
+        runTask(addressOf(host), request(), false);
+        FAIL();
+    } catch (const ctl::Failure& failure) {
+        EXPECT_EQ(failure.status(), ctl::kHostReportedFailure);
+    }
+}
+
+}  // namespace
