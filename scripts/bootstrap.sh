@@ -1,6 +1,9 @@
 #!/bin/sh
 # Installs what building and testing needs and this machine lacks, with the distribution's package
 # manager. Safe to run again: it says nothing and changes nothing when all is there.
+#
+#   scripts/bootstrap.sh            installs
+#   scripts/bootstrap.sh --list     prints the names of the packages, one a line, and installs nothing
 set -eu
 cd "$(dirname "$0")/.."
 
@@ -9,6 +12,19 @@ libboost-dev nlohmann-json3-dev libcli11-dev mksh curl pkgconf procps shellcheck
 libclang-rt-dev'
 # Programs that only judge the product from outside; their tests are skipped without them.
 judges='python3-impacket tshark'
+
+# shellcheck disable=SC2086
+case $#/${1-} in
+0/) ;;
+1/--list)
+    printf '%s\n' $packages $judges
+    exit
+    ;;
+*)
+    sed -n '5,6s/^# \{0,1\}//p' "$0" >&2
+    exit 2
+    ;;
+esac
 
 as_root() {
     if [ "$(id -u)" -eq 0 ]; then "$@"; else sudo "$@"; fi

@@ -13,12 +13,7 @@ run() { printf '$ %s\n' "$*"; "$@"; }
 
 scripts/bootstrap.sh
 say "Build"
-mkdir -p build
-cmake --preset native >build/demo.log 2>&1 || {
-    cat build/demo.log
-    exit 1
-}
-cmake --build --preset native --target zavmgmt zavhost zavctl -- --quiet
+scripts/build.sh native --target zavmgmt zavhost zavctl
 PATH=$PWD/build/native/bin:$PATH
 
 # ---- A home and its host -------------------------------------------------------------------------
@@ -84,7 +79,7 @@ first_lines() {
 
 say "Start the agent ux: its process and its first figures"
 run zavctl start ux --transid demo-start
-ps -eo pid,args | grep "[a]gtqvs6/.*/ux/bin/agent" | head -n 1
+pgrep -af "$home/agtqvs6/.*/ux/bin/agent" | head -n 1
 first_lines "$home/data/ux/figures.csv"
 say "Restart and stop it; the outcomes as the host gives them"
 run zavctl restart ux
@@ -177,9 +172,9 @@ say "End the host"
 kill "$host"
 wait "$host"
 host=
-if ps -eo args | grep -q "[${scratch%"${scratch#?}"}]${scratch#?}/home"; then
+if pgrep -f "$home" >/dev/null; then
     echo "A process was left behind:"
-    ps -eo pid,args | grep "${scratch#?}/home"
+    pgrep -af "$home"
     exit 1
 fi
 echo "Nothing is left running."

@@ -64,11 +64,7 @@ fi
 
 scripts/bootstrap.sh
 mkdir -p build/fuzz/log build/fuzz/findings
-cmake --preset fuzz >build/fuzz.configure.log 2>&1 || {
-    cat build/fuzz.configure.log
-    exit 1
-}
-cmake --build --preset fuzz -- --quiet
+scripts/build.sh fuzz
 
 if [ $# -eq 0 ]; then
     for source in tests/fuzz/*_fuzz.cpp; do

@@ -22,10 +22,5 @@ case "$*" in
 esac
 
 scripts/bootstrap.sh
-mkdir -p build
-cmake --preset "$preset" >"build/$preset.configure.log" 2>&1 || {
-    cat "build/$preset.configure.log"
-    exit 1
-}
-cmake --build --preset "$preset" --target zavsoak -- --quiet
+scripts/build.sh "$preset" --target zavsoak
 exec "build/$preset/bin/zavsoak" "$@"

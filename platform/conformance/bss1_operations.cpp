@@ -7,6 +7,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <chrono>
@@ -68,10 +69,16 @@ void refusesWhatIsNoSetting(Bench&) {
     require(BSS1_GetEnv(kName, nullptr) == nullptr, "set the variable all the same");
 }
 
-void returnsAtOnceForNoSeconds(Bench&) {
+Clock::duration timeOfSleep(unsigned seconds) {
     const auto start = Clock::now();
-    BSS1_Sleep(0);
-    require(Clock::now() - start < milliseconds(500), "took half a second and more");
+    BSS1_Sleep(seconds);
+    return Clock::now() - start;
+}
+
+void returnsAtOnceForNoSeconds(Bench&) {
+    // One in three is not held up by other programs.
+    const auto none = std::min({timeOfSleep(0), timeOfSleep(0), timeOfSleep(0)});
+    require(none < timeOfSleep(1) / 2, "took more than half as long as a second");
 }
 
 void sleepsThroughSignals(Bench&) {
@@ -81,9 +88,7 @@ void sleepsThroughSignals(Bench&) {
     std::atomic<bool> done{false};
     Clock::duration slept{};
     std::thread sleeper([&] {
-        const auto start = Clock::now();
-        BSS1_Sleep(1);
-        slept = Clock::now() - start;
+        slept = timeOfSleep(1);
         done = true;
     });
     while (!done) {

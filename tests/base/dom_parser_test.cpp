@@ -3,7 +3,6 @@
 #include <string>
 
 #include "base/zavdomp.h"
-#include "support/growth.h"
 
 using namespace ZAV;
 
@@ -125,29 +124,6 @@ TEST(DOMParser, DeepDocumentsDoNotExhaustTheStack) {
         text += "</a>";
     DOMParser parser(text.c_str());
     EXPECT_EQ(parser.parse(), 1);
-}
-
-TEST(DOMParser, ManyElementsAreParsedInProportion) {
-    const double growth = growthOverEightfold(2000, [](unsigned elements) {
-        std::string text = "<a>";
-        for (unsigned i = 0; i < elements; ++i)
-            text += "\n\t<b k='v'>text</b>";
-        DOMParser parser((text + "</a>").c_str());
-        EXPECT_EQ(parser.parse(), 1);
-    });
-    EXPECT_LT(growth, kProportionate);
-}
-
-TEST(DOMParser, LongTextIsParsedInProportion) {
-    const double growth = growthOverEightfold(20000, [](unsigned lines) {
-        std::string text = "<a>";
-        for (unsigned i = 0; i < lines; ++i)
-            text += "line\n";
-        DOMParser parser((text + "</a>").c_str());
-        EXPECT_EQ(parser.parse(), 1);
-        EXPECT_EQ(String(parser.getDocument()->getElementText()).length(), lines * 5);
-    });
-    EXPECT_LT(growth, kProportionate);
 }
 
 }  // namespace

@@ -7,8 +7,6 @@
 #include <memory>
 #include <string>
 
-#include "support/growth.h"
-
 using namespace ZAV;
 using ::testing::ElementsAre;
 
@@ -349,21 +347,6 @@ TEST(DOMElement, DeepDumpsDoNotExhaustTheStack) {
     onSmallStack([&out] { chain(kDepth)->dump(out); });
     // Each element has a start line of 5 units, an end line of 5, and its indent twice.
     EXPECT_EQ(out.length(), kDepth * 10 - 1 + kDepth * (kDepth - 1));
-}
-
-TEST(DOMElement, WideTreesAreBuiltSearchedAndDumpedInProportion) {
-    const double growth = growthOverEightfold(2000, [](unsigned children) {
-        DOMElement root("a");
-        for (unsigned i = 0; i < children; ++i)
-            root.addChild(new DOMElement("child"));
-        DOMNodeList* const found = root.getElementsByTagName("child");
-        for (unsigned i = 0; i < found->getLength(); ++i)
-            found->item(i);
-        String out;
-        root.dump(out);
-        EXPECT_EQ(found->getLength(), children);
-    });
-    EXPECT_LT(growth, kProportionate);
 }
 
 }  // namespace

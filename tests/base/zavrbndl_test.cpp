@@ -6,7 +6,6 @@
 #include <string>
 #include <vector>
 
-#include "support/growth.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 
@@ -144,16 +143,6 @@ TEST_F(Bundle, CopySharesTheValuesAndOutlivesItsSource) {
 TEST_F(Bundle, FreeFunctionDeletesAValue) {
     freeValueFunc(new String("x"));
     freeValueFunc(nullptr);
-}
-
-TEST_F(Bundle, LongFilesAreReadInProportion) {
-    const double growth = growthOverEightfold(3000, [this](unsigned lines) {
-        std::string text;
-        for (unsigned i = 0; i < lines; ++i)
-            text += "KEY" + std::to_string(i) + " = value\r\n";
-        EXPECT_EQ(keys(load(text)).size(), lines);
-    });
-    EXPECT_LT(growth, kProportionate);
 }
 
 }  // namespace

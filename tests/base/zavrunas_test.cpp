@@ -4,7 +4,6 @@
 #include <memory>
 #include <string>
 
-#include "support/growth.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 
@@ -270,32 +269,6 @@ TEST_F(RunAs, LeavesWithoutTextAreEmpty) {
     agent.addChild(new DOMElement("productCode"));
     const std::unique_ptr<AgentEntry> entry(buildAgentEntry(&agent));
     EXPECT_EQ(narrow(entry->getProductCode()), "");
-}
-
-/// A database of about `size` bytes: one agent for every 30 instances.
-std::string database(std::size_t size) {
-    std::string text = "<runas>\n";
-    for (int agent = 0; text.size() < size; ++agent) {
-        text += "\t<agent>\n\t\t<productCode>p" + std::to_string(agent) + "</productCode>\n";
-        for (int i = 0; i < 30; ++i) {
-            text += "\t\t<instance>\n\t\t\t<name>i" + std::to_string(i) +
-                    "</name>\n\t\t\t<user>monitor</user>\n\t\t</instance>\n";
-        }
-        text += "\t</agent>\n";
-    }
-    return text + "</runas>\n";
-}
-
-TEST_F(RunAs, LargeFilesAreReadAndWrittenInProportion) {
-    const TraceCapture quiet("ERROR");
-    const double growth = growthOverEightfold(1 << 17, [this](unsigned size) {
-        const std::string text = database(size);
-        const auto db = load(text);
-        EXPECT_EQ(userOf(*db, "p0", "i29"), "monitor");
-        EXPECT_EQ(db->save(), 1);
-        EXPECT_EQ(scratch.read("runas.cfg"), text);
-    });
-    EXPECT_LT(growth, kProportionate);
 }
 
 }  // namespace

@@ -197,8 +197,8 @@ TEST_F(Push, ATerminalSeesABarWithBytesRateAndTimeLeft) {
     const std::string command = zavctlPath() + " --socket " + host_->socket() + " push " + file;
     ::kill(host_->pid(), SIGSTOP);
     Program terminal({"/usr/bin/script", "-qec", command, "/dev/null"});
-    // Nothing is drawn in the first moments of a push.
-    ::usleep(300'000);
+    // Nothing is drawn in the first moments of a push. It has not begun before its program has.
+    ::usleep(2'000'000);
     ::kill(host_->pid(), SIGCONT);
     const ProgramResult result = terminal.wait();
     EXPECT_EQ(result.status, 0) << result.err;

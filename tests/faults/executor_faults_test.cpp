@@ -62,8 +62,7 @@ protected:
         const Fault fault(Call::kNew, nth, ENOMEM);
         pthread_cond_signal(&worktodo);
         pthread_mutex_unlock(&queue_mutex);
-        for (int i = 0; i < 5000 && published == before; ++i)
-            ::usleep(1000);
+        EXPECT_TRUE(eventually([before] { return published != before; }));
         happened = fault.happened();
         EXPECT_EQ(before + 1, published) << nth;
         return lastCode;
@@ -104,8 +103,7 @@ TEST_F(ExecutorFaults, WithoutAnyMemoryTheExecutorPausesAndRunsTheNextTaskAfterw
         const Fault fault(Call::kNew, 1, ENOMEM, Fault::Lasts::kOnwards);
         pthread_cond_signal(&worktodo);
         pthread_mutex_unlock(&queue_mutex);
-        for (int i = 0; i < 5000 && sleeps < sleptBefore + kPauses; ++i)
-            ::usleep(1000);
+        EXPECT_TRUE(eventually([&] { return sleeps >= sleptBefore + kPauses; }));
         EXPECT_TRUE(fault.happened());
         EXPECT_EQ(before, published);
     }

@@ -90,9 +90,7 @@ TEST_F(Inventory, FiveThousandEntriesAreListed) {
         const std::string code = "p" + std::to_string(i);
         write("registry/" + code + "lx8266.ver", entry(code, "lx8266"));
     }
-    const auto begin = std::chrono::steady_clock::now();
     const std::string listed = cinfo({"-d"}).out;
-    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(10));
     EXPECT_EQ(std::count(listed.begin(), listed.end(), '\n'), 5005);
 }
 

@@ -25,6 +25,7 @@
 #include "embedded/ncs_host.h"
 #include "ncs/memory.h"
 #include "platform/ncs_packets.h"
+#include "support/program.h"
 #include "support/scratch_dir.h"
 
 namespace {
@@ -50,7 +51,7 @@ struct Gate {
     }
     void await(int callers) {
         std::unique_lock<std::mutex> guard(lock);
-        EXPECT_TRUE(changed.wait_for(guard, 10s, [&] { return waiting == callers; }));
+        EXPECT_TRUE(changed.wait_for(guard, 20s, [&] { return waiting == callers; }));
     }
     void close() {
         const std::lock_guard<std::mutex> guard(lock);
@@ -193,11 +194,7 @@ protected:
     /// Waits until the counts are as wanted.
     template <typename Condition>
     bool becomes(Condition condition) {
-        for (int i = 0; i < 500; ++i) {
-            if (condition(server->counts())) return true;
-            std::this_thread::sleep_for(20ms);
-        }
-        return false;
+        return eventually([&] { return condition(server->counts()); });
     }
 
     ScratchDir scratch;
@@ -355,12 +352,12 @@ TEST_F(AServer, AClientThatTakesNoAnswersIsCutAndHoldsUpNobody) {
 
 TEST_F(AServer, WhoDoesNotBindInTimeIsCut) {
     ncs::Limits limits;
-    limits.bindTime = 200ms;
+    limits.bindTime = 2s;
     start(limits);
     Client silent = connect();
     Client talking = connect();
     ASSERT_TRUE(talking.bind());
-    EXPECT_TRUE(silent.isClosedWithin(5s));
+    EXPECT_TRUE(silent.isClosedWithin(20s));
     EXPECT_EQ("hello", talking.repeat("hello"));
     EXPECT_EQ(1U, server->counts().timedOut);
 }
@@ -372,42 +369,38 @@ TEST_F(AServer, WhoTricklesARequestIsCutHoweverBusyItLooks) {
     Client slow = connect();
     ASSERT_TRUE(slow.bind());
     slow.send(fragment(1, kRepeat, std::string(1000, 'x')).substr(0, 100));
-    const auto start = std::chrono::steady_clock::now();
-    bool closed = false;
-    while (!closed && std::chrono::steady_clock::now() - start < 10s) {
+    EXPECT_TRUE(eventually([&slow] {
         slow.send("x");
-        closed = slow.isClosedWithin(50ms);
-    }
-    EXPECT_TRUE(closed);
-    EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
+        return slow.isClosedWithin(50ms);
+    }));
 }
 
 TEST_F(AServer, WhoIsIdleTooLongIsCutButNotWhoWorks) {
     ncs::Limits limits;
-    limits.idleTime = 400ms;
+    limits.idleTime = 2s;
     start(limits);
     Client idle = connect();
     Client busy = connect();
     ASSERT_TRUE(idle.bind());
     ASSERT_TRUE(busy.bind());
-    for (int i = 0; i < 10; ++i) {
+    EXPECT_TRUE(eventually([&] {
         EXPECT_EQ("work", busy.repeat("work"));
-        std::this_thread::sleep_for(100ms);
-    }
-    EXPECT_TRUE(idle.isClosedWithin(5s));
+        return idle.isClosedWithin(50ms);
+    }));
+    EXPECT_EQ("work", busy.repeat("work"));
     EXPECT_EQ(1U, server->counts().timedOut);
 }
 
 TEST_F(AServer, ACallMayTakeLongerThanAnyWait) {
     registerClosedGate();
     ncs::Limits limits;
-    limits.idleTime = limits.requestTime = limits.answerTime = 100ms;
+    limits.idleTime = limits.requestTime = limits.answerTime = 500ms;
     start(limits);
     Client client = connect();
     ASSERT_TRUE(client.bind(kGate));
     client.send(fragment(3, 0, ""));
     gate().await(1);
-    std::this_thread::sleep_for(400ms);
+    std::this_thread::sleep_for(1s);
     gate().open();
     EXPECT_EQ(kResponse, client.receive().type);
 }
@@ -421,7 +414,7 @@ TEST_F(AServer, BeyondItsLimitConnectionsAreClosedAtOnce) {
     ASSERT_TRUE(first.bind());
     ASSERT_TRUE(second.bind());
     Client third = connect();
-    EXPECT_TRUE(third.isClosedWithin(5s));
+    EXPECT_TRUE(third.isClosedWithin(20s));
     EXPECT_EQ(1U, server->counts().refused);
     first.close();
     ASSERT_TRUE(becomes([](const ncs::Counts& counts) { return counts.connections == 1; }));
@@ -466,8 +459,8 @@ TEST_F(AServer, StopLetsRunningCallsEndAndClosesEverything) {
     server->stop();
     opener.join();
     EXPECT_EQ(kResponse, running.receive().type);
-    EXPECT_TRUE(running.isClosedWithin(1s));
-    EXPECT_TRUE(idle.isClosedWithin(1s));
+    EXPECT_TRUE(running.isClosedWithin(20s));
+    EXPECT_TRUE(idle.isClosedWithin(20s));
     EXPECT_EQ(0U, server->counts().connections);
     server->stop();
     ncs::Server other;
@@ -512,6 +505,10 @@ std::vector<std::string> statusOfThreads(const std::string& field) {
     return found;
 }
 
+std::vector<std::string> wakeUpsOfThreads() {
+    return statusOfThreads("voluntary_ctxt_switches:");
+}
+
 TEST_F(AServer, AtRestNoThreadIsWoken) {
     start();
     {
@@ -519,11 +516,19 @@ TEST_F(AServer, AtRestNoThreadIsWoken) {
         ASSERT_TRUE(client.bind());
     }
     ASSERT_TRUE(becomes([](const ncs::Counts& counts) { return counts.connections == 0; }));
-    std::this_thread::sleep_for(100ms);
-    const std::vector<std::string> before = statusOfThreads("voluntary_ctxt_switches:");
+    std::vector<std::string> before;
+    const auto isStill = [&before] {
+        const std::vector<std::string> last = std::exchange(before, wakeUpsOfThreads());
+        return before == last;
+    };
+    // The last connection's end may still be on its way through the threads.
+    ASSERT_TRUE(eventually([&isStill] {
+        std::this_thread::sleep_for(100ms);
+        return isStill();
+    }));
     EXPECT_EQ(8U, before.size());
     std::this_thread::sleep_for(500ms);
-    EXPECT_EQ(before, statusOfThreads("voluntary_ctxt_switches:"));
+    EXPECT_TRUE(isStill());
 }
 
 /// Of another user than this process; needs root.

@@ -1,8 +1,11 @@
-/// How long something took.
+/// How long something takes.
 #pragma once
 
+#include <algorithm>
 #include <chrono>
+#include <limits>
 
+/// Starts when it is made.
 class Stopwatch {
 public:
     double seconds() const {
@@ -12,3 +15,15 @@ public:
 private:
     std::chrono::steady_clock::time_point start_ = std::chrono::steady_clock::now();
 };
+
+/// The seconds that the shortest of several runs takes: the one that other programs disturb least.
+template <typename Work>
+double shortestOf(int runs, Work work) {
+    double shortest = std::numeric_limits<double>::max();
+    for (int run = 0; run < runs; ++run) {
+        const Stopwatch watch;
+        work();
+        shortest = std::min(shortest, watch.seconds());
+    }
+    return shortest;
+}

@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <string>
 #include <vector>
 
@@ -199,23 +198,6 @@ TEST(Inventory, EndsWithTheFirstRefusal) {
                   return ++taken == 2 ? 42 : 0;
               }));
     EXPECT_EQ(2, taken);
-}
-
-std::string manyLines(int count) {
-    std::string lines;
-    for (int i = 0; i < count; ++i) {
-        const std::string number = std::to_string(i);
-        lines += "\"p" + number + "\",\"Product number " + number +
-                 " with a description of some length\",\"lx8266\",\"06200000\",\"100\"\n";
-    }
-    return lines;
-}
-
-TEST(Inventory, ThousandsOfLinesAreListedFast) {
-    const std::string lines = manyLines(5000);
-    const auto begin = std::chrono::steady_clock::now();
-    EXPECT_EQ(5000u, productsOfLines(lines + lines).size());
-    EXPECT_GT(std::chrono::seconds(5), std::chrono::steady_clock::now() - begin);
 }
 
 }  // namespace

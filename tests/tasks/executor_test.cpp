@@ -4,7 +4,6 @@
 #include <pthread.h>
 
 #include <atomic>
-#include <chrono>
 #include <csignal>
 #include <cstdlib>
 #include <filesystem>
@@ -17,6 +16,7 @@
 #include "support/fake_sleep.h"
 #include "support/gate.h"
 #include "support/outcomes.h"
+#include "support/program.h"
 #include "support/row_text.h"
 #include "support/trace_capture.h"
 #include "tasks/fake_handlers.h"
@@ -287,11 +287,10 @@ TEST_F(Executor, SurvivesWakeUpsForNothing) {
     queueTask(request("START", "0"));
     ASSERT_EQ(1u, outcomes.waitFor(1).size());
     TraceCapture trace;
-    for (int i = 0; i < 1000 && trace.count('D', "Executor awoken by signal") < 3; ++i) {
+    EXPECT_TRUE(eventually([&trace] {
         pthread_cond_broadcast(&worktodo);
-        std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    }
-    EXPECT_LE(3, trace.count('D', "Executor awoken by signal"));
+        return trace.count('D', "Executor awoken by signal") >= 3;
+    }));
     queueTask(request("START", "1"));
     EXPECT_EQ((Texts{"0", "1"}), transids(outcomes.waitFor(2)));
 }
@@ -400,10 +399,8 @@ TEST_F(Executor, ManyTasksMayWait) {
     queueTask(request("INSTALL", "first"));
     ASSERT_TRUE(gate.awaitArrival());
     constexpr std::size_t count = 10000;
-    const auto begin = std::chrono::steady_clock::now();
     for (std::size_t i = 0; i < count; ++i)
         queueTask(request("START", std::to_string(i)));
-    EXPECT_GT(std::chrono::seconds(20), std::chrono::steady_clock::now() - begin);
     EXPECT_EQ(count, queueLength());
     gate.open();
     EXPECT_EQ(std::to_string(count - 1), transids(outcomes.waitFor(count + 1)).back());

@@ -8,11 +8,11 @@
 #include <cerrno>
 #include <cstdlib>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "support/fake_sleep.h"
 #include "support/outcomes.h"
+#include "support/program.h"
 #include "support/row_text.h"
 #include "support/trace_capture.h"
 #include "tasks/fake_handlers.h"
@@ -125,9 +125,7 @@ protected:
     }
 
     static void awaitError(const TraceCapture& trace, const std::string& text) {
-        for (int i = 0; i < 2000 && trace.count('E', text) == 0; ++i) {
-            std::this_thread::sleep_for(std::chrono::milliseconds(5));
-        }
+        EXPECT_TRUE(eventually([&] { return trace.count('E', text) > 0; }));
         EXPECT_EQ(1, trace.count('E', text));
     }
 };

@@ -7,6 +7,7 @@
 
 #include "support/child_role.h"
 #include "support/clock.h"
+#include "support/left_running.h"
 #include "support/program.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
@@ -158,13 +159,11 @@ TEST_F(CommandRunner, AChildThatDoesNotReadItsInputIsNoFailure) {
 }
 
 TEST_F(CommandRunner, AChildThatNeverTakesItsInputIsKilledAtTheTimeout) {
-    limit("1");
+    limit("3");
     TraceCapture traces;
-    const Stopwatch watch;
     const Outcome outcome =
         run("/bin/sh -c 'echo early; exec sleep 60'", String(std::string(300 * 1000, 'x').c_str()));
     EXPECT_FALSE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 5.0);
     EXPECT_EQ("early\n", outcome.text());
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }
@@ -219,13 +218,12 @@ TEST_F(CommandRunner, OneTextForBothGetsTheOutputThenTheErrors) {
 }
 
 TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
-    limit("1");
+    limit("3");
     TraceCapture traces;
     const Stopwatch watch;
     const Outcome outcome = run("/bin/sh -c 'echo begun; echo bad >&2; exec sleep 60'");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_GT(watch.seconds(), 0.9);
-    EXPECT_LT(watch.seconds(), 5.0);
+    EXPECT_GT(watch.seconds(), 2.9);
     EXPECT_EQ(0, outcome.rc);
     EXPECT_EQ("begun\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
@@ -235,47 +233,38 @@ TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
                 testing::Contains("Waiting for process id: "));
 }
 
-TEST_F(CommandRunner, AChildThatClosedItsOutputIsWaitedForUntilTheSameDeadline) {
-    limit("2");
+TEST_F(CommandRunner, AChildThatClosedItsOutputIsKilledAtTheTimeout) {
+    limit("1");
     TraceCapture traces;
-    const Stopwatch watch;
-    EXPECT_FALSE(run("/bin/sh -c 'sleep 1; exec >&- 2>&-; exec sleep 60'").ran);
-    EXPECT_GT(watch.seconds(), 1.9);
-    EXPECT_LT(watch.seconds(), 2.9);
+    EXPECT_FALSE(run("/bin/sh -c 'exec >&- 2>&-; exec sleep 60'").ran);
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }
 
 TEST_F(CommandRunner, AnUnusableTimeoutLeavesNoTime) {
     limit("abc");
-    const Stopwatch watch;
     EXPECT_FALSE(run("/bin/sleep 60").ran);
-    EXPECT_LT(watch.seconds(), 5.0);
 }
 
 TEST_F(CommandRunner, OutputThatOthersKeepOpenEndsTheRunAtTheTimeout) {
-    limit("1");
+    limit("3");
     TraceCapture traces;
-    const Stopwatch watch;
-    const Outcome outcome = run("/bin/sh -c 'sleep 4 & echo started'");
+    LeftRunning other;
+    const Outcome outcome = run("/bin/sh -c '" + other.command() + " echo started'");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 3.5);
+    EXPECT_TRUE(other.isRunning());
     EXPECT_EQ("started\n", outcome.text());
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }
 
 TEST_F(CommandRunner, AChildThatNeverStopsWritingIsKilled) {
     limit("1");
-    const Stopwatch watch;
     EXPECT_FALSE(run("/bin/sh -c 'while :; do echo x; done'").ran);
-    EXPECT_LT(watch.seconds(), 10.0);
 }
 
 TEST_F(CommandRunner, AChildBlockedOnAFullErrorPipeIsKilled) {
-    limit("1");
-    const Stopwatch watch;
+    limit("3");
     const Outcome outcome = run("/bin/sh -c 'echo out; head -c 200000 /dev/zero >&2'");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 5.0);
     EXPECT_EQ("out\n", outcome.text());
 }
 
@@ -300,26 +289,29 @@ TEST_F(CommandRunner, AnAgentCommandIsReadOnceAfterItsEnd) {
 
 TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsNothingUpWhenReadWithoutBlocking) {
     const ScratchDir scratch;
-    const std::string script = scratch.script("TovrinAgent", "echo up\nsleep 3 &\nexit 0\n");
-    const Stopwatch watch;
+    LeftRunning agent;
+    const std::string script =
+        scratch.script("TovrinAgent", "echo up\n" + agent.command() + "\nexit 0\n");
     const Outcome outcome = run(script, String(), true);
     EXPECT_TRUE(outcome.ran);
-    EXPECT_LT(watch.seconds(), 2.8);
+    EXPECT_TRUE(agent.isRunning());
     EXPECT_EQ("up\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
 }
 
 TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsABlockingReadUpToTheTimeoutAtMost) {
-    limit("1");
+    limit("3");
     TraceCapture traces;
     const ScratchDir scratch;
-    const std::string script = scratch.script("TovrinAgent", "echo up\nsleep 4 &\nexit 6\n");
+    LeftRunning agent;
+    const std::string script =
+        scratch.script("TovrinAgent", "echo up\n" + agent.command() + "\nexit 6\n");
     const Stopwatch watch;
     const Outcome outcome = run(script);
     EXPECT_TRUE(outcome.ran);
+    EXPECT_TRUE(agent.isRunning());
     EXPECT_EQ(6, outcome.rc);
-    EXPECT_GT(watch.seconds(), 0.9);
-    EXPECT_LT(watch.seconds(), 3.5);
+    EXPECT_GT(watch.seconds(), 2.9);
     EXPECT_EQ("up\n", outcome.text());
     EXPECT_EQ("", outcome.errText());
     EXPECT_THAT(traces.errors(), Contains(StartsWith("Bad return code (6)")));
@@ -333,20 +325,4 @@ TEST_F(CommandRunner, AnAgentCommandThatHangsIsKilled) {
     EXPECT_FALSE(outcome.ran);
     EXPECT_EQ("", outcome.text());
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
-}
-
-TEST_F(CommandRunner, CostGrowsWithTheOutputOnly) {
-    const ScratchDir scratch;
-    const auto bestOf = [&](std::size_t bytes) {
-        const std::string file = scratch.write("data", std::string(bytes, 'x'));
-        double best = 1e9;
-        for (int i = 0; i < 3; ++i) {
-            const Stopwatch watch;
-            EXPECT_EQ(bytes, run("/bin/cat " + file).out.length());
-            best = std::min(best, watch.seconds());
-        }
-        return best;
-    };
-    // Copying everything for each chunk would make it 64 times.
-    EXPECT_LT(bestOf(32u << 20), 24 * bestOf(4u << 20));
 }

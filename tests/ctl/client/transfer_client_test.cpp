@@ -136,7 +136,7 @@ TEST(TransferClient, AHostThatSaysNothingRunsIntoTheTimeOut) {
         self.packet();  // comes when the client has gone
     });
     {
-        TransferClient client(host.path(), std::chrono::milliseconds(100));
+        TransferClient client(host.path(), std::chrono::seconds(1));
         const auto failure = failureOf([&] { client.receive(); });
         EXPECT_EQ(failure.first, ctl::kNoOutcome);
         EXPECT_EQ(failure.second, "the host did not take the file within the time-out");

@@ -276,16 +276,13 @@ TEST_F(Connections, ThatDripBytesEndTooBecauseTheTimeIsForTheWholeRequest) {
     limits.requestTime = milliseconds(300);
     start(limits);
     RawClient client = connect();
-    const auto begin = std::chrono::steady_clock::now();
     client.send("GET /v1/tables HTTP/1.1\r\nX: ");
-    while (client.send("x"))
-        std::this_thread::sleep_for(milliseconds(20));
-    EXPECT_LT(std::chrono::steady_clock::now() - begin, std::chrono::seconds(10));
+    EXPECT_TRUE(eventually([&client] { return !client.send("x"); }));
 }
 
 TEST_F(Connections, ThatAreIdleEnd) {
     host::ServerLimits limits;
-    limits.idleTime = milliseconds(100);
+    limits.idleTime = milliseconds(1000);
     start(limits);
     RawClient fresh = connect();
     RawClient used = connect();
