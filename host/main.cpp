@@ -23,7 +23,7 @@
 namespace host {
 namespace {
 
-/// How long the task in hand may take when the host is told to end.
+/// How long the host waits for the task in hand when it is told to end.
 constexpr std::chrono::seconds kEndGrace{10};
 
 /// Starts the plug-in; returns its tables.
@@ -41,7 +41,7 @@ std::vector<oxa::Table> startPlugin(const HostOptions& options) {
     return tables;
 }
 
-/// File transfers: on a socket of their own, and on a loopback port when one is asked for.
+/// Serves file transfers on a socket of their own, and on a loopback port if one was asked for.
 void serveTransfers(ncs::Server& transfers, SocketFile& socket, const HostOptions& options) {
     transfers.listen(socket.listen());
     if (!options.rpcPort) return;
@@ -70,7 +70,7 @@ void run(const HostOptions& options) {
     transfers.stop();
     transferSocket.remove();
     socket.remove();
-    // The plug-in's executor never ends and uses its globals to the last, so nothing is torn down.
+    // The plug-in's executor never ends and uses its globals to the last, so destroy nothing.
     ::_exit(0);
 }
 
@@ -93,5 +93,5 @@ int start(int argc, char** argv) {
 int main(int argc, char** argv) {
     const int status = host::start(argc, argv);
     std::fflush(stdout);
-    ::_exit(status);  // a plug-in that had been started has threads of its own
+    ::_exit(status);  // a plug-in that was started has threads of its own
 }

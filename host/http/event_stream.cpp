@@ -36,8 +36,8 @@ bool EventStream::quiet() const {
     return closed_ || (!writing_ && source_->empty());
 }
 
-/// Reading would not do: a client that has only ended its own side, having nothing more to say,
-/// still reads. Both sides closed is an error state of the socket.
+/// Does not wait for the end of input: a client that has shut down its sending side may still read.
+/// Only when both sides are closed is the socket in an error state.
 void EventStream::awaitHangUp() {
     stream_.socket().async_wait(net::socket_base::wait_error,
                                 [self = shared_from_this()](Error) { self->close(); });

@@ -67,7 +67,7 @@ void HttpServer::Implementation::awaitConnection() {
     });
 }
 
-/// Not the library's own accept, which makes descriptors that the plug-in's children inherit.
+/// Uses accept4, because the library's own accept makes descriptors that children inherit.
 void HttpServer::Implementation::acceptAll() {
     while (true) {
         FileDescriptor connection(
@@ -77,7 +77,7 @@ void HttpServer::Implementation::acceptAll() {
         } else if (errno == EAGAIN || errno == EWOULDBLOCK) {
             return awaitConnection();
         } else if (errno != EINTR && errno != ECONNABORTED) {
-            // Out of descriptors or memory: the connection stays readable, so waiting for it would
+            // Out of descriptors or memory. The listener stays readable, so waiting for it would
             // spin.
             return after(kAcceptPause, [this] {
                 if (!core.ending) acceptAll();
@@ -114,7 +114,7 @@ void HttpServer::Implementation::beginEnd(std::chrono::milliseconds grace) {
     if (core.ending) return;
     core.ending = true;
     deadline = Clock::now() + grace;
-    // Who comes now is turned away at once instead of waiting for nobody.
+    // A client that connects now is refused at once instead of waiting in vain.
     ::shutdown(listener.native_handle(), SHUT_RDWR);
     Error ignored;
     listener.close(ignored);
@@ -156,8 +156,7 @@ void HttpServer::run() {
         try {
             io.run();
         } catch (const std::exception&) {
-            // Memory ran out in one connection's handler, which ends that connection's chain of
-            // operations; the others are served on.
+            // Memory ran out in one connection's handler. Only that connection stops.
         }
     }
 }

@@ -22,7 +22,7 @@ namespace http = beast::http;
 constexpr unsigned kNoContent = 204;
 constexpr std::size_t kReadBytes = 4096;
 constexpr std::size_t kBufferBytes = 64 * 1024;
-/// A client that goes on sending after the last answer is cut off at this.
+/// A client that keeps sending after the last answer is cut off after this many bytes.
 constexpr std::size_t kDrainBytes = 4 * 1024 * 1024;
 
 std::string_view view(beast::string_view text) {
@@ -67,7 +67,7 @@ void HttpSession::prepareForEnd() {
 void HttpSession::awaitRequest() {
     state_ = State::Idle;
     if (core_.ending) return close();
-    if (buffer_.size() > 0) return readRequest();  // the next one came with the last
+    if (buffer_.size() > 0) return readRequest();  // it came together with the last one
     buffer_.shrink_to_fit();
     stream_.expires_after(core_.limits.idleTime);
     stream_.async_read_some(buffer_.prepare(kReadBytes),
@@ -212,7 +212,7 @@ void HttpSession::respond(Reply reply) {
     response_->keep_alive(keepAlive_);
     if (reply.status != kNoContent) {
         response_->set(http::field::content_type, reply.type);
-        // The head alone is also asked of streams, whose length nobody knows.
+        // HEAD may ask about a stream, which has no length.
         if (!isHead_ || !reply.body.empty()) response_->content_length(reply.body.size());
     }
     if (!isHead_) response_->body() = std::move(reply.body);
@@ -226,8 +226,8 @@ void HttpSession::onWritten(Error error) {
     response_.reset();
     if (error) return close();
     if (keepAlive_) return awaitRequest();
-    // A socket that is closed with unread bytes in it resets the connection, and the client might
-    // lose the answer: so it is read empty until the client has closed its side.
+    // Closing a socket with unread bytes resets the connection, and the client might lose the
+    // answer. So read until the client has closed its side.
     stream_.socket().shutdown(net::socket_base::shutdown_send, error);
     if (error) return close();
     state_ = State::Lingering;

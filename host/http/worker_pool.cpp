@@ -16,7 +16,8 @@ WorkerPool::WorkerPool(std::size_t threads, std::size_t queueLimit) : queueLimit
         stop();
         throw StartError(std::string("cannot start a thread: ") + error.what());
     }
-    // The threads count themselves as free; nobody is to find a pool without free threads.
+    // Each thread counts itself as free. Wait for all, so that nobody meets a pool without free
+    // ones.
     embedded::MutexLock lock(lock_);
     while (idle_ != threads)
         lock.wait(changed_);
@@ -42,7 +43,7 @@ void WorkerPool::stop() {
 bool WorkerPool::submit(Job job) {
     {
         const embedded::MutexLock lock(lock_);
-        // A job that a free thread is about to take does not count as waiting.
+        // A job that a free thread is about to take is not waiting.
         if (stopping_ || queue_.size() >= queueLimit_ + idle_) return false;
         queue_.push_back(std::move(job));
     }
@@ -65,9 +66,9 @@ void WorkerPool::work() {
         try {
             job();
         } catch (...) {
-            // Nothing is known about the job; whoever gave it hears about failures from itself.
+            // Jobs report their own failures.
         }
-        job = nullptr;  // releases what it holds before the thread waits again
+        job = nullptr;  // release what it holds before waiting again
         lock.lock();
         ++idle_;
     }

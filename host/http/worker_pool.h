@@ -1,4 +1,4 @@
-/// Threads for what may take long: samples that sleep or run children.
+/// Threads for work that may take long.
 #pragma once
 
 #include <condition_variable>
@@ -12,21 +12,21 @@
 
 namespace host {
 
-/// A fixed number of threads behind a bounded queue. All threads are there from the start, so that
-/// load changes neither their number nor what they occupy.
+/// A fixed number of threads behind a bounded queue. All threads exist from the start, so load
+/// changes neither their number nor their memory.
 class WorkerPool {
 public:
     using Job = std::function<void()>;
 
     /// Throws StartError when the system gives too few threads.
     WorkerPool(std::size_t threads, std::size_t queueLimit);
-    /// Drops the jobs that wait and returns when the running ones have ended.
+    /// Drops the waiting jobs and waits for the running ones.
     ~WorkerPool();
     WorkerPool(const WorkerPool&) = delete;
     WorkerPool& operator=(const WorkerPool&) = delete;
 
-    /// False when as many jobs wait as may wait; `job` has not been taken then. What a job throws
-    /// is dropped. Any thread.
+    /// Queues the job. Returns false, and drops it, when the queue is full. Exceptions of a job are
+    /// ignored. Any thread.
     bool submit(Job job);
 
 private:

@@ -67,7 +67,7 @@ void TaskWatch::began() {
 void TaskWatch::ended() {
     const embedded::MutexLock lock(lock_);
     if (--running_ > 0) return;
-    // Nobody is left who could still claim an outcome that came early.
+    // No query is left that could still claim an outcome that came early.
     for (auto entry = outstanding_.begin(); entry != outstanding_.end();) {
         entry = entry->second < 0 ? outstanding_.erase(entry) : std::next(entry);
     }

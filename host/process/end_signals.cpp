@@ -16,7 +16,7 @@ volatile int signalDescriptor = -1;
 volatile pid_t ownProcess = -1;
 
 extern "C" void onEndSignal(int) {
-    // A child between fork and exec shares the descriptor; its signals are not ours.
+    // A child between fork and exec shares the descriptor, but its signals are its own.
     if (::getpid() != ownProcess) return;
     const int error = errno;
     const std::uint64_t one = 1;

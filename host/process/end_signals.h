@@ -1,10 +1,10 @@
-/// SIGTERM and SIGINT as something to wait for.
+/// Turns SIGTERM and SIGINT into a descriptor to wait for.
 #pragma once
 
 namespace host {
 
 /// Catches both signals for the rest of the process's life. Returns a descriptor that becomes
-/// readable with the first of them. Call once; throws StartError.
+/// readable when the first one arrives; it stays open. Call it once. Throws StartError.
 int catchEndSignals();
 
 }  // namespace host

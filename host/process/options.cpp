@@ -24,7 +24,7 @@ std::string defaultSocket(const Environment& environment) {
     return (runtime.empty() ? "/run" : runtime) + "/zavhost.sock";
 }
 
-/// Children change their directory, so a relative name would mean something else to them.
+/// Children change their working directory, where a relative path would name something else.
 std::string usableHome(const std::string& given, const Environment& environment) {
     const std::string home = given.empty() ? valueOf(environment, "TOVRINHOME") : given;
     if (home.empty()) throw StartError("no home: give --home DIR or set TOVRINHOME");

@@ -1,4 +1,4 @@
-/// The command line, and what stands in for what it leaves out.
+/// The command line and its defaults.
 #pragma once
 
 #include <cstdint>
@@ -20,9 +20,9 @@ struct HostOptions {
 /// The value of an environment variable, or null.
 using Environment = std::function<const char*(const char* name)>;
 
-/// Reads the command line and completes it from the environment. Returns nothing when help or the
-/// version was asked for and has been printed; throws StartError for anything that makes no sense.
-/// The home is a directory and its path absolute, the sockets' names are not empty.
+/// Reads the command line and takes what it leaves out from the environment. Returns nothing after
+/// printing the help or the version. Throws StartError for anything that makes no sense: in the
+/// result the home is a directory with an absolute path, and both sockets have names.
 std::optional<HostOptions> readOptions(int argc, const char* const* argv,
                                        const Environment& environment);
 

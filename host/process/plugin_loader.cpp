@@ -13,8 +13,8 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// The plain name is for builds and for who links the plug-in; what a system only runs may bring no
-/// more than the name with the version.
+/// Builds and development packages have the plain name. A package for running alone may have only
+/// the name with the version.
 constexpr const char* kLibraries[] = {"libzavmgmt.so", "libzavmgmt.so.1"};
 constexpr const char* kStartFunction = "Initialize_Mgmt_Functions";
 
@@ -30,7 +30,7 @@ std::string defaultFile() {
     return kLibraries[1];
 }
 
-/// A name without a slash would be looked for in the loader's path instead of here.
+/// The loader searches its own path for a name without a slash; this makes it a file here.
 std::string asPath(const std::string& file) {
     return file.find('/') == std::string::npos ? "./" + file : file;
 }

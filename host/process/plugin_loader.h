@@ -6,7 +6,8 @@
 
 namespace host {
 
-/// A loaded plug-in. It is never unloaded: its threads and tables live as long as the process.
+/// A loaded plug-in. It is never unloaded, because its threads and tables live as long as the
+/// process.
 class Plugin {
 public:
     /// Loads `file`, or libzavmgmt.so or libzavmgmt.so.1 from ../lib beside the executable, else
@@ -14,7 +15,7 @@ public:
     /// start-up function.
     explicit Plugin(const std::optional<std::string>& file);
 
-    /// Runs the start-up function and returns its status, 0 for success. TOVRINHOME is set before.
+    /// Runs the start-up function and returns its status, 0 for success. Set TOVRINHOME before.
     int initialize() const { return start_(); }
     const std::string& file() const { return file_; }
 

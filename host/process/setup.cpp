@@ -14,7 +14,7 @@ namespace {
 
 extern "C" void onBrokenPipe(int) {}
 
-/// A socket that took the number 1 would get what is meant for standard output.
+/// Otherwise a socket could get the number 1 and receive what is meant for standard output.
 void openStandardDescriptors() {
     while (true) {
         const int descriptor = ::open("/dev/null", O_RDWR);
@@ -25,8 +25,8 @@ void openStandardDescriptors() {
     }
 }
 
-/// A handler instead of SIG_IGN, because exec puts a handler back to the default and passes on what
-/// is ignored: the programs that the plug-in runs expect to die of a broken pipe.
+/// Installs a handler rather than SIG_IGN: exec resets handlers to the default, but children
+/// inherit ignored signals. The programs that the plug-in runs expect to die of a broken pipe.
 void surviveBrokenPipes() {
     struct sigaction action {};
     action.sa_handler = onBrokenPipe;
@@ -35,18 +35,18 @@ void surviveBrokenPipes() {
     ::sigaction(SIGPIPE, &action, nullptr);
 }
 
-/// What a burst of large outputs took goes back to the system when it is over. By default the first
-/// large block that is freed raises both limits, and then the gaps between small blocks stay.
+/// Returns the memory of a burst of large outputs to the system once it is over. By default the
+/// first large block that is freed raises both thresholds, and the heap then keeps its gaps.
 void giveMemoryBack() {
     constexpr int kLargeBlock = 256 * 1024;
     ::mallopt(M_MMAP_THRESHOLD, kLargeBlock);
     ::mallopt(M_TRIM_THRESHOLD, kLargeBlock);
-    // One arena per thread would cost more than all that the host holds.
+    // One arena per thread would take more memory than everything else in the host.
     ::mallopt(M_ARENA_MAX, 2);
 }
 
-/// Services are often started without any locale, which would make everything beyond ASCII
-/// unspeakable; only in that case text is taken as UTF-8.
+/// Services are often started without a locale, and then no text outside ASCII could be converted.
+/// In that case, and only then, text is UTF-8.
 void chooseLocale() {
     for (const char* name : {"LC_ALL", "LC_CTYPE", "LANG"}) {
         const char* value = std::getenv(name);

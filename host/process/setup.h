@@ -1,10 +1,11 @@
-/// What the process does for itself before anything else.
+/// Process-wide settings.
 #pragma once
 
 namespace host {
 
-/// Descriptors 0 to 2 are open, no broken pipe ends the process, the locale is the environment's
-/// and the allocator keeps few arenas. For the start of main(), before there are threads.
+/// Opens descriptors 0 to 2 if they are closed, keeps broken pipes from ending the process, takes
+/// the locale from the environment, and limits what the allocator keeps. Call it first in main(),
+/// before any thread exists.
 void setUpProcess();
 
 }  // namespace host

@@ -44,8 +44,8 @@ FileDescriptor newSocket(const std::string& path) {
     return made;
 }
 
-/// True when the open file still stands under its name: its last holder removes it, and a lock on
-/// a file that others no longer find guards nothing.
+/// Whether the open file is still the one with this name. The last owner removes it, and a lock on
+/// a file that nobody else can find protects nothing.
 bool isStill(int descriptor, const std::string& name) {
     struct stat opened {};
     struct stat named {};
@@ -71,7 +71,7 @@ FileDescriptor takeLock(const std::string& path) {
 }  // namespace
 
 SocketFile::SocketFile(const std::string& path) : path_(path) {
-    addressOf(path_);  // before the lock file is made for a name that cannot be
+    addressOf(path_);  // throws before a lock file is made for an impossible name
     lock_ = takeLock(path_);
     try {
         replaceStale();
@@ -95,7 +95,7 @@ void SocketFile::replaceStale() const {
     if (!S_ISSOCK(found.st_mode)) throw StartError(path_ + " exists and is not a socket");
     const sockaddr_un address = addressOf(path_);
     const FileDescriptor probe = newSocket(path_);
-    // EAGAIN: somebody listens who is too busy to accept.
+    // EAGAIN: a process listens, but is too busy to accept.
     if (::connect(probe.get(), generic(address), sizeof address) == 0 || errno == EAGAIN) {
         failInUse(path_);
     }
@@ -109,8 +109,8 @@ void SocketFile::replaceStale() const {
 void SocketFile::bind() {
     const sockaddr_un address = addressOf(path_);
     socket_ = newSocket(path_);
-    // The file is made with the socket's own mode, so it is private from birth without a change of
-    // the process's mask, which other threads would see.
+    // bind() gives the file the mode of the socket. So the file is private from the start, without
+    // changing the process's umask, which other threads would see.
     if (::fchmod(socket_.get(), 0600) != 0) fail("socket " + path_, errno);
     if (::bind(socket_.get(), generic(address), sizeof address) != 0) {
         fail("cannot bind the socket " + path_, errno);
@@ -119,7 +119,7 @@ void SocketFile::bind() {
     if (::lstat(path_.c_str(), &made) != 0) fail("socket " + path_, errno);
     device_ = made.st_dev;
     inode_ = made.st_ino;
-    // The mask may have taken away more than was asked for.
+    // The umask may have removed bits that the owner needs.
     if (::chmod(path_.c_str(), 0600) != 0) fail("socket " + path_, errno);
 }
 

@@ -1,4 +1,4 @@
-/// A Unix stream socket in the file system, which belongs to one process at a time.
+/// A Unix stream socket in the file system that one process owns at a time.
 #pragma once
 
 #include <sys/types.h>
@@ -9,15 +9,15 @@
 
 namespace host {
 
-/// Binds a socket at a path and removes it again.
+/// Binds a socket at a path, and removes it in the end.
 ///
-/// Two processes that start at once cannot both find a dead socket and replace it: who serves a
-/// path holds a lock on the file PATH.lock beside it for as long as it lives.
+/// The owner of a path holds a lock on the file PATH.lock beside it. So when two processes start at
+/// once, they cannot both find a dead socket and replace it.
 class SocketFile {
 public:
-    /// Binds with mode 0600. A socket that nobody serves is replaced; one that is served, or
-    /// another kind of file, is left alone and StartError thrown, as for any other failure.
-    /// Nobody can connect before listen().
+    /// Binds with mode 0600. Replaces a socket that no process serves. Throws StartError when one
+    /// does, when another kind of file stands there, or when anything else fails. Nobody can
+    /// connect before listen().
     explicit SocketFile(const std::string& path);
     ~SocketFile();
     SocketFile(const SocketFile&) = delete;
@@ -26,7 +26,7 @@ public:
     /// Accepts connections from now on. Returns the descriptor: non-blocking, close-on-exec, owned
     /// by this object. Throws StartError.
     int listen();
-    /// Removes the socket, unless another file has taken its place, and gives up the path.
+    /// Gives up the path, and removes the socket unless another file has taken its place.
     void remove();
     const std::string& path() const { return path_; }
 

@@ -51,7 +51,7 @@ int RowQueue::push(const oxa::Rows& rows) noexcept {
     try {
         if (wake) (*wake)();
     } catch (const std::exception&) {
-        // Without a wake-up the rows would stay for ever, and later ones would not wake either.
+        // Nobody would ever take these rows, and later ones would not wake the reader either.
         const embedded::MutexLock lock(lock_);
         held_ = {};
         return OXA_OVERFLOW;
