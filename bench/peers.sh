@@ -5,6 +5,9 @@
 # sourced by a script that calls make_scratch first. What is started by them is ended, and the
 # scratch folder removed, when the script exits.
 
+# shellcheck source=bench/measure.sh
+. bench/measure.sh
+
 # make_scratch NAME: sets `scratch` to a new folder in memory, which other users may pass through.
 make_scratch() {
     scratch=$(mktemp -d "/dev/shm/$1.XXXXXX")
@@ -29,7 +32,9 @@ start() {
 }
 
 # path_of PROGRAM: where it is, also when that is not a user's directory for programs.
-path_of() { PATH=$PATH:/usr/sbin:/usr/lib/nagios/plugins command -v "$1"; }
+path_of() {
+    PATH=$PATH:/usr/sbin:/usr/lib/nagios/plugins:$PWD/build/peers/usr/bin command -v "$1"
+}
 
 free_port() {
     local port
@@ -99,15 +104,29 @@ start_rsync() {
     await answers "$rsync_port"
 }
 
-# have_pages MIB: lets the kernel have that much free memory at hand. A virtual machine may have given
-# it back to the machine below, and the first to write to it again would pay for that.
-have_pages() {
-    head -c "$1M" /dev/zero >"$scratch/pages"
-    rm "$scratch/pages"
+# start_nrpe PORT SCRIPT OPTION...: starts an NRPE server whose command "script" runs SCRIPT. It refuses
+# to run as root.
+start_nrpe() {
+    local port=$1 script=$2 user group
+    shift 2
+    user=$(id -un) group=$(id -gn)
+    [ "$(id -u)" -ne 0 ] || user=nobody group=nogroup
+    printf '%s\n' server_address=127.0.0.1 "server_port=$port" "nrpe_user=$user" \
+        "nrpe_group=$group" allowed_hosts=127.0.0.1 dont_blame_nrpe=0 disable_syslog=1 \
+        "log_file=$scratch/nrpe.$port.log" "pid_file=$scratch/nrpe.$port.pid" \
+        "command[script]=$script" >"$scratch/nrpe.$port.cfg"
+    start "$(path_of nrpe)" -f -c "$scratch/nrpe.$port.cfg" "$@"
+    await answers "$port"
 }
 
-# now: nanoseconds since 1970.
-now() { date +%s%N; }
-
-# write_result KEY VALUE: appends a figure to the file that the variable `out` names, if any.
-write_result() { [ -z "$out" ] || printf '%s\t%s\n' "$1" "$2" >>"$out"; }
+# start_zabbix: starts a Zabbix agent that may run any command; sets `zabbix_port`. Fails when there
+# is none.
+start_zabbix() {
+    path_of zabbix_agentd >/dev/null || return
+    zabbix_port=$(free_port)
+    printf '%s\n' LogType=file "LogFile=$scratch/zabbix.log" "PidFile=$scratch/zabbix.pid" \
+        Server=127.0.0.1 ListenIP=127.0.0.1 "ListenPort=$zabbix_port" AllowRoot=1 \
+        'AllowKey=system.run[*]' >"$scratch/zabbix.conf"
+    start "$(path_of zabbix_agentd)" -f -c "$scratch/zabbix.conf"
+    await answers "$zabbix_port"
+}

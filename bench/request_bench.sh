@@ -60,38 +60,18 @@ write_result request/children "$count"
 
 ways=()
 
-# start_nrpe PORT OPTION...: it refuses to run as root.
-start_nrpe() {
-    local port=$1 user group
-    shift
-    user=$(id -un) group=$(id -gn)
-    [ "$(id -u)" -ne 0 ] || user=nobody group=nogroup
-    printf '%s\n' server_address=127.0.0.1 "server_port=$port" "nrpe_user=$user" \
-        "nrpe_group=$group" allowed_hosts=127.0.0.1 dont_blame_nrpe=0 disable_syslog=1 \
-        "log_file=$scratch/nrpe.$port.log" "pid_file=$scratch/nrpe.$port.pid" \
-        "command[script]=$script" >"$scratch/nrpe.$port.cfg"
-    start "$(path_of nrpe)" -f -c "$scratch/nrpe.$port.cfg" "$@"
-    await answers "$port"
-}
 if path_of nrpe >/dev/null; then
     port=$(free_port)
-    if start_nrpe "$port" -n; then ways+=(--nrpe "$port"); fi
+    if start_nrpe "$port" "$script" -n; then ways+=(--nrpe "$port"); fi
     if path_of check_nrpe >/dev/null; then
         port=$(free_port)
-        if start_nrpe "$port"; then
+        if start_nrpe "$port" "$script"; then
             ways+=(--program "check_nrpe=$(path_of check_nrpe) -H 127.0.0.1 -p $port -c script")
         fi
     fi
 fi
 
-if path_of zabbix_agentd >/dev/null; then
-    port=$(free_port)
-    printf '%s\n' LogType=file "LogFile=$scratch/zabbix.log" "PidFile=$scratch/zabbix.pid" \
-        Server=127.0.0.1 ListenIP=127.0.0.1 "ListenPort=$port" AllowRoot=1 \
-        'AllowKey=system.run[*]' >"$scratch/zabbix.conf"
-    start "$(path_of zabbix_agentd)" -f -c "$scratch/zabbix.conf"
-    if await answers "$port"; then ways+=(--zabbix "$port"); fi
-fi
+if start_zabbix; then ways+=(--zabbix "$zabbix_port"); fi
 
 if start_sshd; then
     ssh="$(path_of ssh) -p $ssh_port ${ssh_options[*]}"
@@ -103,5 +83,7 @@ if start_sshd; then
     fi
 fi
 
+await_quiet
 "$build/bin/request_bench" --host "$host_socket" --script "$script" --expect INSTANCE=bench \
     --rounds "$rounds" ${out:+--out "$out"} "${ways[@]}"
+write_quiet request_bench

@@ -1,5 +1,5 @@
 // Searching, editing and splitting texts, beside the same done with the standard library's string
-// of 16-bit units; and how the cost of building long texts piece by piece grows with their length.
+// of 16-bit units.
 
 #include <benchmark/benchmark.h>
 
@@ -8,27 +8,14 @@
 
 #include "base/zavstr.h"
 #include "base/zavtoken.h"
+#include "texts.h"
 
 using ZAV::String;
 
 namespace {
 
-constexpr const char* kSentence = "The quick brown fox, 0123456789 ";
-
 std::size_t sizeOf(const benchmark::State& state) {
     return static_cast<std::size_t>(state.range(0));
-}
-
-std::string narrowText(std::size_t size) {
-    std::string text;
-    while (text.size() < size)
-        text += kSentence;
-    text.resize(size);
-    return text;
-}
-
-String ownText(std::size_t size) {
-    return String(narrowText(size).c_str());
 }
 
 std::u16string standardText(std::size_t size) {
@@ -131,38 +118,6 @@ void splitStandard(benchmark::State& state) {
     }
 }
 
-// ---- Growth -------------------------------------------------------------------------------------
-
-/// Unit by unit.
-void appendUnits(benchmark::State& state) {
-    for (auto _ : state) {
-        String text;
-        for (std::size_t i = 0; i < sizeOf(state); ++i)
-            text.append('x');
-        benchmark::DoNotOptimize(text.getData());
-    }
-}
-
-/// By a line's length at a time.
-void appendTexts(benchmark::State& state) {
-    const String line = ownText(64);
-    for (auto _ : state) {
-        String text;
-        for (std::size_t i = 0; i < sizeOf(state); i += 64)
-            text.append(line);
-        benchmark::DoNotOptimize(text.getData());
-    }
-}
-
-void insertEscapes(benchmark::State& state) {
-    const String text = ownText(sizeOf(state));
-    const String special(",");
-    for (auto _ : state) {
-        String escaped(text);
-        benchmark::DoNotOptimize(escaped.insertEscapes('\\', special).getData());
-    }
-}
-
 void addOperation(const std::string& name, void (*own)(benchmark::State&),
                   void (*standard)(benchmark::State&)) {
     for (const auto& [way, run] : {std::pair{"/string", own}, std::pair{"/standard", standard}}) {
@@ -174,12 +129,6 @@ void addOperation(const std::string& name, void (*own)(benchmark::State&),
     }
 }
 
-void addGrowth(const std::string& name, void (*run)(benchmark::State&)) {
-    benchmark::RegisterBenchmark(("growth/" + name).c_str(), run)
-        ->RangeMultiplier(4)
-        ->Range(1 << 10, 4 << 20);
-}
-
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -189,11 +138,6 @@ int main(int argc, char** argv) {
     addOperation("replace", replaceString, replaceStandard);
     addOperation("trim", trimString, trimStandard);
     addOperation("split", splitString, splitStandard);
-    addGrowth("append_units", appendUnits);
-    addGrowth("append_texts", appendTexts);
-    addGrowth("insert_escapes", insertEscapes);
-    addGrowth("replace", replaceString);
-    addGrowth("split", splitString);
     benchmark::RunSpecifiedBenchmarks();
     benchmark::Shutdown();
     return 0;

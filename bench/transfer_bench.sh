@@ -5,15 +5,17 @@
 #   bench/transfer_bench.sh [--mib N] [--files N] [--rounds N] [--build DIR] [--out FILE]
 #
 # Peers: cp, rsync with a daemon on loopback, scp and scp -r with a server on loopback that has
-# throw-away keys; what is not installed is left out. Each program runs --rounds times, in turn, and
-# its median time counts. Ends with status 1 when what arrived is not what was sent or the host's
-# memory grew by 32 MiB. --out FILE appends the figures: seconds, and MiB for the growth.
+# throw-away keys; what is not installed is left out. In each of --rounds rounds every program runs
+# once, each time another one first, on a quiet machine with free memory at hand; its time is compared
+# with that of the push in the same round, and the median of these ratios counts. Ends with status 1
+# when what arrived is not what was sent or the host's memory grew by 32 MiB. --out FILE appends the
+# figures: seconds, ratios, and MiB for the growth.
 set -eu
 cd "$(dirname "$0")/.."
 # shellcheck source=bench/peers.sh
 . bench/peers.sh
 
-mib=1024 files=10000 rounds=3 build=build/native out=
+mib=1024 files=10000 rounds=7 build=build/native out=
 while [ $# -gt 0 ]; do
     case $1 in
     --mib) mib=$2 ;;
@@ -22,7 +24,7 @@ while [ $# -gt 0 ]; do
     --build) build=$2 ;;
     --out) out=$2 ;;
     *)
-        sed -n '2,11s/^# \{0,1\}//p' "$0" >&2
+        sed -n '2,13s/^# \{0,1\}//p' "$0" >&2
         exit 2
         ;;
     esac
@@ -61,6 +63,7 @@ run() {          # WHAT WAY
     local from to where=target
     [ "$2" != push ] || where=depot
     rm -rf "$scratch/target/$1" "$scratch/depot/$1"
+    await_quiet
     have_pages "$mib"
     from=$(now)
     "$2" "$scratch/source/$1" >"$scratch/out" 2>&1 || { cat "$scratch/out" >&2; exit 1; }
@@ -70,30 +73,42 @@ run() {          # WHAT WAY
     rm -rf "$scratch/target/$1" "$scratch/depot/$1"
     times[$1 $2]+=$((to - from))$'\n'
 }
-median() { # WHAT WAY
-    printf %s "${times[$1 $2]}" | sort -n | awk '{ at[NR] = $1 } END { print at[int((NR + 1) / 2)] }'
+run_rounds() { # WHAT
+    local round way order
+    read -ra order <<<"$ways"
+    for ((round = 0; round < rounds; ++round)); do
+        for way in "${order[@]}"; do run "$1" "$way"; done
+        order=("${order[@]:1}" "${order[0]}")
+    done
+}
+median() { sort -g | awk '{ at[NR] = $1 } END { print at[int((NR + 1) / 2)] }'; }
+median_time() { printf %s "${times[$1 $2]}" | median; } # WHAT WAY
+median_ratio() { # WHAT WAY: the push's time by that of WAY
+    paste <(printf %s "${times[$1 push]}") <(printf %s "${times[$1 $2]}") |
+        awk '{ print $1 / $2 }' | median
 }
 
 before=$(memory)
-for ((round = 0; round < rounds; ++round)); do
-    for way in $ways; do run large "$way"; done
-done
+run_rounds large
 growth=$((($(memory) - before) / 1024))
-for ((round = 0; round < rounds; ++round)); do
-    for way in $ways; do run many "$way"; done
-done
+run_rounds many
 
 # --- what came out ------------------------------------------------------------------------------
 declare -A names=([push]='zavctl push' [copy]=cp [sync]='rsync --daemon' [secure]=scp)
 report() { # WHAT TITLE
+    local way ratio
     echo "$2"
     for way in $ways; do
-        awk -v name="${names[$way]}" -v time="$(median "$1" "$way")" -v own="$(median "$1" push)" \
-            'BEGIN { printf "  %-16s push is %6.2f times as fast\n", name, time / own }'
-        write_result "transfer/$1/$way" "$(median "$1" "$way")e-9"
+        ratio=$(median_ratio "$1" "$way")
+        printf '  %-16s %8.3f s; a push takes %5.2f times as long; by round:%s\n' "${names[$way]}" \
+            "$(median_time "$1" "$way")e-9" "$ratio" \
+            "$(printf %s "${times[$1 $way]}" | awk '{ printf " %.3f", $1 / 1e9 }')"
+        write_result "transfer/$1/$way" "$(median_time "$1" "$way")e-9"
+        write_result "transfer/$1/ratio/$way" "$ratio"
     done
 }
 report large "one file of $mib MiB; the host grew by $growth MiB"
 report many "a folder of $files files of 4 KiB"
+write_quiet transfer_bench
 write_result transfer/growth "$growth"
 [ "$growth" -lt 32 ] || { echo "the host grew by 32 MiB or more" >&2; exit 1; }

@@ -1,7 +1,8 @@
 #!/bin/sh
 # Measures this system beside others and writes what came out to docs/performance.md, with pictures
-# in docs/performance/; prints the table of ratios. Takes about ten minutes on a machine that
-# should do nothing else meanwhile.
+# in docs/performance/; prints the table of ratios. Takes about twenty minutes on a machine that
+# should do nothing else meanwhile: each measurement waits until it does not, for a while, and the
+# page says how many of them began all the same.
 #
 #   scripts/bench.sh [--results DIR]
 #
@@ -17,7 +18,7 @@ case $#/${1-} in
 0/) ;;
 2/--results) mkdir -p "$2" && results=$(CDPATH='' cd -- "$2" && pwd) ;;
 *)
-    sed -n '2,10s/^# \{0,1\}//p' "$0" >&2
+    sed -n '2,11s/^# \{0,1\}//p' "$0" >&2
     exit 2
     ;;
 esac
@@ -27,9 +28,14 @@ if [ -z "$results" ]; then
     trap 'exit 130' HUP INT TERM
 fi
 
+out=$results/shell.tsv
+: >"$out"
+# shellcheck source=bench/measure.sh
+. bench/measure.sh
+
 step() { echo "== $*"; }
 
-printf 'machine/load\t%s\n' "$(cut -d' ' -f1 /proc/loadavg)" >"$results/shell.tsv"
+write_result machine/load "$(cut -d' ' -f1 /proc/loadavg)"
 step what is needed
 scripts/bootstrap.sh
 bench/install_peers.sh
@@ -44,8 +50,9 @@ measure() {
     name=$1
     shift
     step "$name"
-    "$build/bin/${name}_bench" --benchmark_report_aggregates_only=true \
-        --benchmark_enable_random_interleaving=true --benchmark_out="$results/$name.json" "$@" >/dev/null 2>"$results/messages" || {
+    await_quiet
+    "$build/bin/${name}_bench" --benchmark_enable_random_interleaving=true \
+        --benchmark_out="$results/$name.json" "$@" >/dev/null 2>"$results/messages" || {
         cat "$results/messages" >&2
         exit 1
     }
@@ -55,8 +62,14 @@ measure() {
 # gives memory back and takes it again is none of the work that is measured.
 measure_inside() {
     GLIBC_TUNABLES=glibc.malloc.trim_threshold=4000000000:glibc.malloc.mmap_threshold=33554432 \
-        measure "$1" --benchmark_repetitions=7 --benchmark_min_time=0.05
+        measure "$@"
 }
+
+# For ratios of medians.
+measure_ratios() { measure_inside "$1" --benchmark_repetitions=7 --benchmark_min_time=0.05; }
+
+# For growth, where the least of many longer samples counts.
+measure_growth() { measure_inside "$1" --benchmark_repetitions=15 --benchmark_min_time=0.1; }
 
 # Whether an allocator has the memory at hand that a long output needs depends on what was there
 # before; here it comes from the kernel each time.
@@ -66,18 +79,20 @@ measure_output() {
 }
 
 step rest
-bench/rest_bench.sh --build "$build" --out "$results/shell.tsv"
+bench/rest_bench.sh --build "$build" --out "$out"
 measure command --benchmark_repetitions=5
 measure_output
-for name in conversions strings runas property inventory map queue subscription; do
-    measure_inside "$name"
-done
+for name in conversions strings runas; do measure_ratios "$name"; done
+for name in property inventory map queue subscription text_growth; do measure_growth "$name"; done
+step processes
+bench/process_bench.sh --build "$build" --out "$out"
 step requests
-bench/request_bench.sh --build "$build" --out "$results/shell.tsv"
+bench/request_bench.sh --build "$build" --out "$out"
 step transfers
-bench/transfer_bench.sh --build "$build" --out "$results/shell.tsv" ||
+bench/transfer_bench.sh --build "$build" --out "$out" ||
     echo "a transfer failed, see above; its rows are left out or not met" >&2
-bench/push_growth.sh --build "$build" --out "$results/shell.tsv"
+bench/push_growth.sh --build "$build" --out "$out"
 
+write_quiet programs
 step report
 bench/report/report.py "$results" docs

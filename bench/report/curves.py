@@ -14,8 +14,12 @@ class Curve:
     prefix: str  # of the names of its figures; what follows is the amount of work
 
     def points(self, figures):
-        """Pairs of work and seconds in the order of the work."""
-        return sorted((int(name[len(self.prefix):]), value) for name, value in figures.items()
+        """Pairs of work and seconds in the order of the work.
+
+        The least of the repetitions counts: what else the machine does only ever adds.
+        """
+        return sorted((int(name[len(self.prefix):]), figures.get(f"{name}:least", value))
+                      for name, value in figures.items()
                       if name.startswith(self.prefix) and name[len(self.prefix):].isdigit())
 
     def doublings(self, figures):

@@ -8,22 +8,28 @@ _SECONDS = {"ns": 1e-9, "us": 1e-6, "ms": 1e-3, "s": 1.0}
 
 
 def _benchmark_figures(path):
-    """Medians of a Google Benchmark file: NAME is in seconds, NAME:COUNTER as the program gave it.
+    """Figures of a Google Benchmark file: the median of the repetitions as NAME, the least of them as
+    NAME:least, both in seconds, and medians of counters as NAME:COUNTER, as the program gave them.
 
     Processor time counts, unless the benchmark says that its work is waited for.
     """
+    least = {}
     for entry in json.loads(path.read_text())["benchmarks"]:
         if entry.get("error_occurred"):
             raise SystemExit(f"{entry['name']}: {entry.get('error_message')}")
-        if entry.get("aggregate_name") != "median":
-            continue
         full_name = entry["run_name"]
         name = re.sub(r"/(iterations:\d+|real_time)", "", full_name)
         kind = "real_time" if full_name.endswith("/real_time") else "cpu_time"
-        yield name, entry[kind] * _SECONDS[entry["time_unit"]]
-        for counter, value in entry.items():
-            if isinstance(value, float) and counter not in ("real_time", "cpu_time"):
-                yield f"{name}:{counter}", value
+        seconds = entry[kind] * _SECONDS[entry["time_unit"]]
+        if entry["run_type"] == "iteration":
+            least[name] = min(seconds, least.get(name, seconds))
+        elif entry.get("aggregate_name") == "median":
+            yield name, seconds
+            for counter, value in entry.items():
+                if isinstance(value, float) and counter not in ("real_time", "cpu_time"):
+                    yield f"{name}:{counter}", value
+    for name, seconds in least.items():
+        yield f"{name}:least", seconds
 
 
 def read(folder):

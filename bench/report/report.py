@@ -58,7 +58,7 @@ def main():
     page = (Path(__file__).parent / "performance.md.in").read_text()
     for mark, text in {
             "DATE": datetime.datetime.now(datetime.timezone.utc).strftime("%Y-%m-%d"),
-            "MACHINE": machine.describe(figures.get("machine/load")),
+            "MACHINE": machine.describe(figures),
             "VERSIONS": ratios.markdown(["What", "Package", "Version"], machine.versions()),
             "SUMMARY": summary,
             "RATIOS": table,

@@ -10,30 +10,18 @@
 // seconds.
 
 #include <CLI/CLI.hpp>
-#include <algorithm>
-#include <chrono>
-#include <cstdio>
-#include <fstream>
+#include <cstdint>
+#include <exception>
 #include <iostream>
-#include <numeric>
-#include <random>
-#include <sstream>
-#include <stdexcept>
 #include <string>
 #include <vector>
 
 #include "request/clients.h"
+#include "request/turns.h"
 
 namespace {
 
-using request::Exchange;
-
-struct Way {
-    std::string name;
-    Exchange exchange;
-    std::string expected;  ///< what every answer holds
-    std::vector<double> seconds{};
-};
+using request::Way;
 
 struct Options {
     std::string host;
@@ -51,14 +39,6 @@ std::string requestQuery(const std::string& command) {
            command +
            R"("}, {"column": "PRODUCT", "op": "=", "value": "ax"},)"
            R"( {"column": "TRANSID", "op": "=", "value": "bench"}]})";
-}
-
-std::vector<std::string> splitAtBlanks(const std::string& line) {
-    std::istringstream in(line);
-    std::vector<std::string> words;
-    for (std::string word; in >> word;)
-        words.push_back(word);
-    return words;
 }
 
 std::vector<Way> waysOf(const Options& options) {
@@ -81,40 +61,9 @@ std::vector<Way> waysOf(const Options& options) {
         ways.push_back(
             {"zabbix", request::zabbix(options.zabbix, options.script), options.expected});
     }
-    for (const std::string& named : options.programs) {
-        const std::size_t equals = named.find('=');
-        if (equals == std::string::npos) throw std::runtime_error("not NAME=COMMAND: " + named);
-        ways.push_back({named.substr(0, equals),
-                        request::program(splitAtBlanks(named.substr(equals + 1))),
-                        options.expected});
-    }
+    for (const std::string& named : options.programs)
+        ways.push_back(request::programOf(named, options.expected));
     return ways;
-}
-
-void take(Way& way) {
-    const auto start = std::chrono::steady_clock::now();
-    const std::string answer = way.exchange();
-    const std::chrono::duration<double> taken = std::chrono::steady_clock::now() - start;
-    if (answer.find(way.expected) == std::string::npos) {
-        throw std::runtime_error("a wrong answer of " + way.name + ": " + answer);
-    }
-    way.seconds.push_back(taken.count());
-}
-
-double median(std::vector<double>& values) {
-    const auto middle = values.begin() + static_cast<std::ptrdiff_t>(values.size() / 2);
-    std::nth_element(values.begin(), middle, values.end());
-    return *middle;
-}
-
-void report(std::vector<Way>& ways, const std::string& out) {
-    std::ofstream file;
-    if (!out.empty()) file.open(out, std::ios::app);
-    for (Way& way : ways) {
-        const double seconds = median(way.seconds);
-        std::printf("%-22s %10.1f us\n", way.name.c_str(), seconds * 1e6);
-        file << "request/" << way.name << '\t' << seconds << '\n';
-    }
 }
 
 }  // namespace
@@ -133,17 +82,8 @@ int main(int argc, char** argv) {
     CLI11_PARSE(app, argc, argv);
     try {
         std::vector<Way> ways = waysOf(options);
-        // In another order each time: what a way leaves behind, cold caches for one, is then borne
-        // by all the others alike.
-        std::mt19937 random;
-        std::vector<std::size_t> order(ways.size());
-        std::iota(order.begin(), order.end(), 0);
-        for (int round = 0; round < options.rounds; ++round) {
-            std::shuffle(order.begin(), order.end(), random);
-            for (const std::size_t at : order)
-                take(ways[at]);
-        }
-        report(ways, options.out);
+        request::takeTurns(ways, options.rounds);
+        request::report(ways, "request/", options.out);
     } catch (const std::exception& error) {
         std::cerr << "request_bench: " << error.what() << '\n';
         return 1;
