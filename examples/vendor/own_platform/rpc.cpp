@@ -2,6 +2,7 @@
 // transport, so what is registered is kept and nobody can call it: files reach the depot by other
 // ways.
 
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 #include <map>
@@ -45,6 +46,8 @@ void rpc__register_mgr(const uuid__t*, const rpc__if_spec* interface, const rpc_
 }
 
 void* rpc__malloc(std::size_t bytes) {
+    // No object is larger than PTRDIFF_MAX, and allocators of debuggers end a process that asks.
+    if (bytes > PTRDIFF_MAX) return nullptr;
     return std::malloc(bytes > 0 ? bytes : 1);
 }
 
