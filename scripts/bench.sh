@@ -44,7 +44,7 @@ step building
 cmake --preset native -B "$build" -DZAV_BUILD_BENCH=ON -DZAV_BUILD_TESTS=OFF >/dev/null
 cmake --build "$build" >/dev/null
 
-# measure NAME OPTION...: runs NAME_bench, repetitions of its parts in turns; their medians go to the
+# measure NAME OPTION...: runs NAME_bench, repetitions of its parts in turns; all figures go to the
 # results.
 measure() {
     name=$1
