@@ -9,10 +9,9 @@ namespace {
 
 using Block = unsigned short __attribute__((vector_size(16)));
 
-Block load(const unsigned short* units) {
-    Block block;
+// By reference: how a block is returned depends on the processor that is compiled for.
+void load(const unsigned short* units, Block& block) {
     std::memcpy(&block, units, sizeof block);
-    return block;
 }
 
 /// The index of the first unit, in memory order, whose bits are set in a word of four units. The
@@ -50,10 +49,14 @@ bool UnitSet::holdsWide(unsigned short unit) const {
 const unsigned short* UnitSet::findMember(const unsigned short* begin,
                                           const unsigned short* end) const {
     if (few_) {
-        const Block first = load(blocks_[0]), second = load(blocks_[1]);
-        const Block third = load(blocks_[2]), fourth = load(blocks_[3]);
+        Block first, second, third, fourth;
+        load(blocks_[0], first);
+        load(blocks_[1], second);
+        load(blocks_[2], third);
+        load(blocks_[3], fourth);
         for (; end - begin >= std::ptrdiff_t{kBlock}; begin += kBlock) {
-            const Block block = load(begin);
+            Block block;
+            load(begin, block);
             const auto found =
                 (block == first) | (block == second) | (block == third) | (block == fourth);
             std::uint64_t words[2];
