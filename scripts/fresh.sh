@@ -64,7 +64,8 @@ apt-config dump | grep -E '^Acquire::(https?|Retries|Check-Valid-Until|Check-Dat
 echo "== a root file system with nothing but what bootstrap lists"
 # shellcheck source=/dev/null
 suite=$(. /etc/os-release && echo "$VERSION_CODENAME")
-mmdebstrap --quiet --variant=minbase --aptopt="$root.apt.conf" \
+unshare --mount --pid --fork --kill-child --mount-proc \
+    mmdebstrap --quiet --variant=minbase --aptopt="$root.apt.conf" \
     --include="$(scripts/bootstrap.sh --list | paste -sd, -)" "$suite" "$root" "$@"
 
 # ---- The checkout --------------------------------------------------------------------------------
