@@ -127,7 +127,9 @@ String::String(String&& other) : String() {
 }
 
 /// Takes `n` units in a block of just the size that they need.
-String::String(Counted, const unsigned short* units, std::uint32_t n) : units_(n + 1) {
+/// Part of its callers, since substr makes one for every token of a text.
+[[gnu::always_inline]] inline String::String(Counted, const unsigned short* units, std::uint32_t n)
+    : units_(n + 1) {
     unsigned short* const own = units_.getData();
     copyUnits(own, units, n);
     own[n] = 0;
