@@ -1,9 +1,10 @@
 #!/bin/sh
 # Builds and runs every test: on this machine's width, on 32-bit, and under the address and
-# undefined-behaviour sanitizers. Before them every fuzz target runs for a short time, and a host is
-# soaked for two minutes.
+# undefined-behaviour sanitizers. Before them every header is compiled on its own and every source
+# without precompiled headers, every fuzz target runs for a short time, and a host is soaked for two
+# minutes.
 #
-#   scripts/test.sh [PRESET ...]     only these presets, no fuzzing and no soak
+#   scripts/test.sh [PRESET ...]     only build and test these presets
 #   scripts/test.sh tsan             what starts threads, under the thread sanitizer
 set -eu
 cd "$(dirname "$0")/.."
@@ -20,6 +21,8 @@ for preset in "$@"; do
     scripts/build.sh "$preset"
 done
 if [ -n "$all" ]; then
+    echo "== native: headers on their own, sources without precompiled headers"
+    cmake --build --preset native --target verify -- --quiet
     echo "== fuzz: build and 20 seconds per target; native: soak for two minutes meanwhile"
     scripts/soak.sh 2 >build/soak.log 2>&1 &
     soak=$!

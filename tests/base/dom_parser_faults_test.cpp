@@ -1,4 +1,6 @@
 // The parser over an event parser that behaves as no well-kept one does.
+#include <gtest/gtest.h>
+
 #include <cstring>
 #include <functional>
 #include <string>

@@ -1,4 +1,6 @@
 // Building the document model from XML.
+#include <gtest/gtest.h>
+
 #include <memory>
 #include <string>
 

@@ -3,6 +3,7 @@
 #include "base/file_descriptor.h"
 
 #include <fcntl.h>
+#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

@@ -1,5 +1,7 @@
 #include "base/unit_set.h"
 
+#include <gtest/gtest.h>
+
 #include <algorithm>
 
 #include "support/units.h"

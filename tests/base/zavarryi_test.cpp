@@ -1,5 +1,7 @@
 #include "base/zavarryi.h"
 
+#include <gtest/gtest.h>
+
 #include <functional>
 #include <numeric>
 

@@ -2,6 +2,7 @@
 // The document model: attributes, elements, lists and their dump.
 #include "base/zavdomp.h"
 
+#include <gmock/gmock.h>
 #include <pthread.h>
 
 #include <memory>

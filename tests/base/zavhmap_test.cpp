@@ -1,5 +1,7 @@
 #include "base/zavhmap.h"
 
+#include <gtest/gtest.h>
+
 #include "support/units.h"
 
 using ZAV::Array;

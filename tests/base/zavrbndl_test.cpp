@@ -1,6 +1,8 @@
 // Property files.
 #include "base/zavrbndl.h"
 
+#include <gmock/gmock.h>
+
 #include <algorithm>
 #include <memory>
 #include <string>

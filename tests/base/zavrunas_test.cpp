@@ -1,6 +1,8 @@
 // The run-as database.
 #include "base/zavrunas.h"
 
+#include <gmock/gmock.h>
+
 #include <memory>
 #include <string>
 

@@ -1,5 +1,7 @@
 // String and CharStar: conversion from and to the code page, and numbers.
 
+#include <gtest/gtest.h>
+
 #include <cerrno>
 #include <climits>
 #include <cstdlib>

@@ -1,5 +1,7 @@
 // String: changing texts in place, searching, and what happens at positions they do not have.
 
+#include <gtest/gtest.h>
+
 #include <clocale>
 #include <functional>
 

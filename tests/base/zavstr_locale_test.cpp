@@ -5,6 +5,7 @@
 // process without a locale runs in a new one.
 
 #include <dlfcn.h>
+#include <gtest/gtest.h>
 
 #include <atomic>
 #include <mutex>

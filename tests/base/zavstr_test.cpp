@@ -2,6 +2,8 @@
 
 #include "base/zavstr.h"
 
+#include <gtest/gtest.h>
+
 #include <memory>
 #include <sstream>
 #include <type_traits>

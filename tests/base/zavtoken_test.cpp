@@ -1,5 +1,7 @@
 #include "base/zavtoken.h"
 
+#include <gtest/gtest.h>
+
 #include "support/trace_capture.h"
 #include "support/units.h"
 

@@ -1,5 +1,7 @@
 #include "base/zavtrace.h"
 
+#include <gtest/gtest.h>
+
 #include <cerrno>
 #include <climits>
 

@@ -1,6 +1,7 @@
 // What a host and its control program do with input that makes no sense.
 // ctest-label: threaded
 
+#include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>

@@ -2,6 +2,7 @@
 // console get to see, and what real agents make of it.
 // ctest-label: threaded
 
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 
 #include <filesystem>

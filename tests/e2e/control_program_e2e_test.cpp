@@ -1,6 +1,7 @@
 // zavctl as people and scripts use it: what each command line asks of the host, where it looks for
 // the host, and what it says when the host goes away. ctest-label: threaded
 
+#include <gmock/gmock.h>
 #include <unistd.h>
 
 #include <algorithm>

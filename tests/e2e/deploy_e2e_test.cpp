@@ -1,6 +1,7 @@
 // Products are installed and removed: what the host answers, and what is on the disk afterwards.
 // ctest-label: threaded
 
+#include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/mount.h>
 #include <unistd.h>

@@ -1,5 +1,7 @@
 // What the plug-in exports is a contract with those who load it.
 
+#include <gtest/gtest.h>
+
 #include <algorithm>
 #include <sstream>
 

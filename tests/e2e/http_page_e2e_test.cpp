@@ -1,6 +1,7 @@
 // docs/http.md against a real host: every command on the page runs and answers as the page says.
 // ctest-label: threaded
 
+#include <gtest/gtest.h>
 #include <signal.h>
 
 #include <fstream>

@@ -2,6 +2,7 @@
 // name means.
 // ctest-label: threaded
 
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

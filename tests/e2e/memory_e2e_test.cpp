@@ -1,5 +1,7 @@
 // What the host holds after a burst of work that needs a lot of memory.
 
+#include <gtest/gtest.h>
+
 #include <memory>
 #include <vector>
 

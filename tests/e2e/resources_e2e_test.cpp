@@ -1,6 +1,7 @@
 // A host that has done a lot of work holds no more than one that has done a little.
 // ctest-label: threaded
 
+#include <gtest/gtest.h>
 #include <unistd.h>
 
 #include <nlohmann/json.hpp>

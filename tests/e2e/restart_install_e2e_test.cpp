@@ -2,6 +2,7 @@
 // outcome fetched afterwards.
 // ctest-label: threaded
 
+#include <gtest/gtest.h>
 #include <signal.h>
 #include <unistd.h>
 

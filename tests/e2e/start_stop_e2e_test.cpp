@@ -1,6 +1,7 @@
 // START, STOP and RESTART from the command line to the agent script and back.
 // ctest-label: threaded
 
+#include <gmock/gmock.h>
 #include <unistd.h>
 
 #include <fstream>

@@ -1,4 +1,6 @@
 // A date that jumps to and fro while commands run: only the names of log files follow it.
+#include <gtest/gtest.h>
+
 #include "faults/scenario.h"
 #include "support/clock.h"
 #include "support/scoped_env.h"

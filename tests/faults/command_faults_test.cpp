@@ -1,4 +1,6 @@
 // A command whose calls of the system fail one after the other.
+#include <gmock/gmock.h>
+
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>

@@ -1,6 +1,7 @@
 // What is left to a host that may open fewer and fewer descriptors: each operation either succeeds
 // or fails as it is said, and none is left half open.
 #include <fcntl.h>
+#include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <unistd.h>
 

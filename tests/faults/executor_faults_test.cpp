@@ -1,5 +1,6 @@
 // The executor when memory runs out at any of its allocations: each task has one outcome all the
 // same. Outcomes and sleeps are taken over here, without a need for memory.
+#include <gtest/gtest.h>
 #include <unistd.h>
 
 #include <atomic>

@@ -1,5 +1,7 @@
 // Reading, writing and copying whole files, property files and directory trees, whose calls of the
 // system fail one after the other.
+#include <gmock/gmock.h>
+
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>

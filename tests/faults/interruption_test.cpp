@@ -1,4 +1,5 @@
 // Signals that interrupt whatever a thread is doing: all results are those without them.
+#include <gtest/gtest.h>
 #include <pthread.h>
 #include <signal.h>
 #include <sys/time.h>

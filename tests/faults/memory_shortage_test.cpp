@@ -1,5 +1,7 @@
 // Operations that run out of memory at each of their allocations: an exception at most, and nothing
 // left behind.
+#include <gtest/gtest.h>
+
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>

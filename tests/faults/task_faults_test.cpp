@@ -1,5 +1,7 @@
 // What requests end in when the system refuses what their commands take: return code, message id,
 // parameter and trace.
+#include <gmock/gmock.h>
+
 #include <cerrno>
 #include <new>
 #include <stdexcept>

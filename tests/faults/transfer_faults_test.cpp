@@ -1,5 +1,6 @@
 // The transfer of a file, with and without the conversion of its line ends, whose calls of the
 // system fail one after the other.
+#include <gmock/gmock.h>
 #include <sys/resource.h>
 #include <unistd.h>
 

@@ -1,5 +1,6 @@
 // Starting and stopping agents with TovrinAgent.
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <spawn.h>
 #include <sys/wait.h>
 

@@ -1,5 +1,6 @@
 // Bundles: making, installing and removing products.
 #include <arpa/inet.h>
+#include <gmock/gmock.h>
 #include <netinet/in.h>
 #include <sys/socket.h>
 

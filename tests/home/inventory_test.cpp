@@ -1,4 +1,6 @@
 // Making a home, what it says is installed, and what it knows of the machine.
+#include <gmock/gmock.h>
+
 #include <algorithm>
 #include <cstring>
 

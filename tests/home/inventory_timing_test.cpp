@@ -1,5 +1,7 @@
 // How long the inventory program takes.
 // ctest-label: timing
+#include <gtest/gtest.h>
+
 #include "home/home_fixture.h"
 #include "support/clock.h"
 

@@ -1,6 +1,8 @@
 // Every script of the starter home is sh that the strictest shells read.
 #include "home/home_fixture.h"
 
+#include <gtest/gtest.h>
+
 namespace {
 
 std::vector<std::string> scripts() {

@@ -1,6 +1,8 @@
 // The two-way translator: configuration as text, instances and managed system names.
 #include "home/home_fixture.h"
 
+#include <gmock/gmock.h>
+
 using ::testing::HasSubstr;
 using ::testing::Not;
 using ::testing::StartsWith;

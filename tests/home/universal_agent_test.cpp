@@ -1,4 +1,6 @@
 // The universal agent and its console.
+#include <gmock/gmock.h>
+
 #include <algorithm>
 
 #include "home/home_fixture.h"

@@ -1,5 +1,6 @@
 #include "platform/nls2.h"
 
+#include <gtest/gtest.h>
 #include <iconv.h>
 #include <langinfo.h>
 #include <locale.h>

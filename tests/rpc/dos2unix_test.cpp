@@ -1,5 +1,6 @@
 // The line-end conversion when one of its steps fails.
 #include <dlfcn.h>
+#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

@@ -1,5 +1,7 @@
 // How the file transfer interface is registered with the runtime, and what happens to its answer.
 // ctest-label: threaded
+#include <gmock/gmock.h>
+
 #include <cstdlib>
 #include <vector>
 

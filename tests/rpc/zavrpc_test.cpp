@@ -1,6 +1,7 @@
 // ctest-label: threaded
 #include "rpc/zavrpc.h"
 
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

@@ -1,5 +1,7 @@
 #include "tasks/agent_config.h"
 
+#include <gmock/gmock.h>
+
 #include "support/trace_capture.h"
 #include "tasks/task_home.h"
 

@@ -1,5 +1,7 @@
 #include "tasks/install.h"
 
+#include <gmock/gmock.h>
+
 #include "support/clock.h"
 #include "support/fake_sleep.h"
 #include "support/left_running.h"

@@ -1,5 +1,7 @@
 #include "tasks/product_arch.h"
 
+#include <gmock/gmock.h>
+
 #include "support/trace_capture.h"
 #include "tasks/task_home.h"
 

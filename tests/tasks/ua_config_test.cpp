@@ -1,6 +1,7 @@
 #include "tasks/ua_config.h"
 
 #include <dlfcn.h>
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 
 #include <cerrno>

@@ -1,6 +1,7 @@
 #include "tasks/ua_files.h"
 
 #include <dlfcn.h>
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

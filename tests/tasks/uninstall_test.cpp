@@ -1,5 +1,7 @@
 #include "tasks/uninstall.h"
 
+#include <gmock/gmock.h>
+
 #include "support/trace_capture.h"
 #include "tasks/task_home.h"
 

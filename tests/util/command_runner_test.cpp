@@ -1,3 +1,4 @@
+#include <gmock/gmock.h>
 #include <sys/wait.h>
 #include <unistd.h>
 

@@ -1,6 +1,7 @@
 // Commands on several threads at once.
 // ctest-label: threaded
 
+#include <gtest/gtest.h>
 #include <pthread.h>
 #include <sys/wait.h>
 

@@ -1,6 +1,7 @@
 // How long commands and the waiting for them take.
 // ctest-label: timing
 
+#include <gtest/gtest.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>

@@ -1,6 +1,7 @@
 // ctest-label: threaded
 // Creating directory trees.
 #include <dlfcn.h>
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

@@ -1,5 +1,7 @@
 // Finding the central server's package depot.
 
+#include <gmock/gmock.h>
+
 #include <string>
 
 #include "support/scoped_env.h"

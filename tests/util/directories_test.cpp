@@ -1,5 +1,6 @@
 // ctest-label: threaded
 // The directories that the library works in, and the host's name.
+#include <gmock/gmock.h>
 #include <sys/utsname.h>
 
 #include <atomic>

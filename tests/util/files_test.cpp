@@ -1,6 +1,7 @@
 // Reading, removing and copying whole files.
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>
 

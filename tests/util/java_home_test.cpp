@@ -1,4 +1,6 @@
 // The search for a Java installation.
+#include <gmock/gmock.h>
+
 #include <string>
 
 #include "support/scoped_env.h"

@@ -1,4 +1,6 @@
 // Cleaning paths and values that come from scripts and the environment.
+#include <gmock/gmock.h>
+
 #include <string>
 
 #include "support/scratch_dir.h"

@@ -5,6 +5,7 @@
 
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <poll.h>
 #include <pthread.h>
 #include <signal.h>

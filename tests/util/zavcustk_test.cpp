@@ -1,4 +1,6 @@
 // Splitting the RESERVED column.
+#include <gmock/gmock.h>
+
 #include <string>
 #include <vector>
 

@@ -1,6 +1,7 @@
 // A command's process: starting it, its environment, and waiting for it.
 
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <signal.h>
 #include <sys/resource.h>
 #include <sys/wait.h>

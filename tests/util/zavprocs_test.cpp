@@ -1,6 +1,7 @@
 #include "util/zavprocs.h"
 
 #include <fcntl.h>
+#include <gmock/gmock.h>
 #include <grp.h>
 #include <pwd.h>
 #include <signal.h>

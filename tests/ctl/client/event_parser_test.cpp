@@ -1,5 +1,7 @@
 #include "ctl/client/event_parser.h"
 
+#include <gtest/gtest.h>
+
 namespace {
 
 using ctl::EventParser;

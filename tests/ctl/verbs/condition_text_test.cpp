@@ -1,5 +1,7 @@
 #include "ctl/verbs/condition_text.h"
 
+#include <gtest/gtest.h>
+
 #include "ctl/client/failure.h"
 
 namespace {

@@ -1,6 +1,8 @@
 // The route table and the endpoints that have little to say.
 #include "host/api_fixture.h"
 
+#include <gtest/gtest.h>
+
 namespace {
 
 using host::Access;

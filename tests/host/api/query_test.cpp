@@ -1,6 +1,8 @@
 // POST /v1/query: bodies, good and bad.
 #include "host/api_fixture.h"
 
+#include <gtest/gtest.h>
+
 namespace {
 
 class QueryEndpoint : public ApiTest {

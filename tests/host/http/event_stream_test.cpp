@@ -1,5 +1,7 @@
 // ctest-label: threaded
 // Subscriptions, fast and slow readers, readers that vanish.
+#include <gtest/gtest.h>
+
 #include <atomic>
 #include <vector>
 

@@ -1,5 +1,7 @@
 // ctest-label: threaded
 // How a server ends: what is under way is finished, nothing new begins.
+#include <gtest/gtest.h>
+
 #include <atomic>
 #include <vector>
 

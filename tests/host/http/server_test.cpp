@@ -1,6 +1,7 @@
 // ctest-label: threaded
 // Requests, good and bad, and connections.
 #include <fcntl.h>
+#include <gtest/gtest.h>
 #include <sys/wait.h>
 
 #include <atomic>

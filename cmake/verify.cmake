@@ -1,0 +1,108 @@
+# The target "verify": every header compiles on its own, and every source compiles without the
+# precompiled header of its target. Nothing is linked, and no code is generated.
+#
+# Only what a precompiled header could hide is compiled here. The sources of the plug-in and the
+# platform have none, so the build itself checks them; it also checks a header that the source beside
+# it includes first.
+#
+# GoogleTest's headers take longer to read than most tests. A file that includes one of them gets
+# that header precompiled, which hides nothing that the file does not include itself. The files are
+# sorted at configure time; run cmake before the target when includes of these headers changed.
+add_custom_target(verify)
+
+# zav_verify(<name> LIBRARIES <lib>... [DEFINITIONS <definition>...]
+#            [SOURCES <file>...] [ROOT <folder> HEADERS <file>...])
+#
+# Adds files to the target "verify". They are compiled as users of the libraries are, and headers are
+# included by their path below `ROOT`.
+function(zav_verify name)
+  cmake_parse_arguments(PARSE_ARGV 1 arg "" "ROOT" "LIBRARIES;DEFINITIONS;SOURCES;HEADERS")
+  foreach(file ${arg_SOURCES})
+    zav_test_library_of(library ${file})
+    list(APPEND ${library}_files ${file})
+  endforeach()
+  foreach(header ${arg_HEADERS})
+    file(RELATIVE_PATH path ${arg_ROOT} ${header})
+    zav_checked_by_its_source(checked ${header} ${path})
+    if(checked)
+      continue()
+    endif()
+    zav_test_library_of(library ${header})
+    set(source ${CMAKE_BINARY_DIR}/verify/${name}/${path}.cpp)
+    file(CONFIGURE OUTPUT ${source} CONTENT "#include \"${path}\"\n")
+    list(APPEND ${library}_files ${source})
+  endforeach()
+
+  foreach(library gmock gtest no)
+    if(NOT ${library}_files)
+      continue()
+    endif()
+    set(target verify_${name}_${library}_library)
+    add_library(${target} OBJECT EXCLUDE_FROM_ALL ${${library}_files})
+    set_target_properties(${target} PROPERTIES
+      CXX_COMPILER_LAUNCHER ${CMAKE_SOURCE_DIR}/cmake/syntax-only.sh EXPORT_COMPILE_COMMANDS OFF)
+    target_link_libraries(${target} PRIVATE ${arg_LIBRARIES} zav_options)
+    target_compile_definitions(${target} PRIVATE ${arg_DEFINITIONS})
+    target_compile_options(${target} PRIVATE -O0 -g0)
+    if(NOT library STREQUAL "no")
+      target_precompile_headers(${target} PRIVATE <${library}/${library}.h>)
+    endif()
+    add_dependencies(verify ${target})
+  endforeach()
+endfunction()
+
+# Sets `variable` to gmock, gtest or no: the test library whose header the file includes. That of
+# gmock brings gtest's.
+function(zav_test_library_of variable file)
+  file(STRINGS ${file} lines REGEX "^#include <g(mock|test)/g(mock|test)\\.h>")
+  set(library no)
+  if(lines MATCHES "gmock")
+    set(library gmock)
+  elseif(lines MATCHES "gtest")
+    set(library gtest)
+  endif()
+  set(${variable} ${library} PARENT_SCOPE)
+endfunction()
+
+# Sets `variable` to whether the source beside a header includes it first.
+function(zav_checked_by_its_source variable header path)
+  set(${variable} FALSE PARENT_SCOPE)
+  string(REGEX REPLACE "\\.h$" ".cpp" source ${header})
+  if(EXISTS ${source})
+    file(STRINGS ${source} first REGEX "^#include" LIMIT_COUNT 1)
+    if(first STREQUAL "#include \"${path}\"")
+      set(${variable} TRUE PARENT_SCOPE)
+    endif()
+  endif()
+endfunction()
+
+file(GLOB_RECURSE headers plugin/*.h)
+zav_verify(plugin LIBRARIES zavmgmt_objects ROOT ${CMAKE_SOURCE_DIR}/plugin HEADERS ${headers})
+
+set(libraries zavplatform zavplatform_internals zav_expat)
+file(GLOB_RECURSE headers platform/include/*.h)
+zav_verify(seam LIBRARIES ${libraries} ROOT ${CMAKE_SOURCE_DIR}/platform/include HEADERS ${headers})
+file(GLOB_RECURSE headers platform/embedded/*.h)
+zav_verify(embedded LIBRARIES ${libraries} ROOT ${CMAKE_SOURCE_DIR}/platform/embedded
+  HEADERS ${headers})
+file(GLOB_RECURSE headers platform/conformance/*.h)
+zav_verify(conformance LIBRARIES ${libraries} ROOT ${CMAKE_SOURCE_DIR}/platform HEADERS ${headers})
+
+foreach(program host ctl)
+  file(GLOB_RECURSE sources ${program}/*.cpp)
+  file(GLOB_RECURSE headers ${program}/*.h)
+  zav_verify(${program} LIBRARIES zav${program}_core
+    DEFINITIONS $<TARGET_PROPERTY:zav${program}_core,COMPILE_DEFINITIONS>
+    SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
+endforeach()
+
+if(ZAV_BUILD_TESTS)
+  file(GLOB_RECURSE sources tests/*.cpp)
+  file(GLOB_RECURSE headers tests/*.h)
+  # These are built without precompiled headers, by builds of their own.
+  list(FILTER sources EXCLUDE REGEX "/tests/(fuzz|install/consumer)/")
+  list(FILTER headers EXCLUDE REGEX "/tests/(fuzz|install/consumer)/")
+  zav_verify(tests LIBRARIES zav_test_support zavhost_core zavctl_core zavconformance_objects
+    DEFINITIONS ZAV_EXAMPLE_DIR="" # of one test only
+    SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR}/tests HEADERS ${headers})
+endif()
