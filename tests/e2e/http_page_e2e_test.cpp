@@ -94,7 +94,7 @@ TEST_F(HttpPage, EveryCommandAnswersAsThePageSays) {
     EXPECT_GE(examples.size(), 7U);
     for (const Example& example : examples) {
         SCOPED_TRACE(example.command);
-        ASSERT_NE("", example.answer);
+        ASSERT_NE(example.answer, "");
         if (example.isStream()) {
             streams.emplace_back(
                 example, std::make_unique<Program>(shell(example.command), "", environment()));
@@ -102,10 +102,10 @@ TEST_F(HttpPage, EveryCommandAnswersAsThePageSays) {
             continue;
         }
         const ProgramResult result = runProgram(shell(example.command), "", environment());
-        EXPECT_EQ(0, result.status) << result.err;
+        EXPECT_EQ(result.status, 0) << result.err;
         EXPECT_TRUE(matches(result.out, example.answer)) << result.out;
     }
-    EXPECT_EQ(1U, streams.size());
+    EXPECT_EQ(streams.size(), 1U);
     for (const auto& [example, program] : streams) {
         EXPECT_TRUE(program->awaitOutput("\n\n", std::chrono::seconds(30))) << program->err();
         EXPECT_TRUE(matches(program->out(), example.answer + "\n")) << program->out();

@@ -44,7 +44,7 @@ TEST_F(ClockJump, ACommandInTimeStaysInTime) {
     for (const long step : {kDay, -kDay}) {
         const NothingLeft nothing;
         const JumpingDate jumping(step);
-        EXPECT_EQ("true 0 x\n", run("/bin/sh -c \"sleep 0.1; echo x\""));
+        EXPECT_EQ(run("/bin/sh -c \"sleep 0.1; echo x\""), "true 0 x\n");
     }
 }
 
@@ -53,7 +53,7 @@ TEST_F(ClockJump, ATimeoutComesWhenItIsDue) {
     const NothingLeft nothing;
     const JumpingDate jumping(kDay);
     const Stopwatch watch;
-    EXPECT_EQ("false 0 ", run("/bin/sleep 60"));
+    EXPECT_EQ(run("/bin/sleep 60"), "false 0 ");
     EXPECT_LE(0.99, watch.seconds());
 }
 
@@ -76,7 +76,7 @@ TEST_F(ClockJump, LogsAreNamedAfterTheDateAndPrunedAllTheSame) {
     Util::_homeDir.clear();
     {
         const JumpingDate jumping(kDay);
-        EXPECT_EQ("true 0 x\n", run("/bin/echo x"));
+        EXPECT_EQ(run("/bin/echo x"), "true 0 x\n");
         EXPECT_LT(0, jumping.looks());
     }
     Util::_homeDir.clear();

@@ -104,9 +104,9 @@ TEST_F(CommandFaults, PollThatKeepsFailingEndsAtTheTimeout) {
     const ScopedEnv timeout("TIMEOUT", "1");
     const End end = echo_.endWith(Call::kPoll, 1, ENOMEM, Fault::Lasts::kOnwards);
     EXPECT_TRUE(echo_.happened());
-    EXPECT_EQ("false 0 [] []", end.result);
+    EXPECT_EQ(end.result, "false 0 [] []");
     ASSERT_FALSE(end.errors.empty());
-    EXPECT_EQ("Failed to wait on process", end.errors.back());
+    EXPECT_EQ(end.errors.back(), "Failed to wait on process");
 }
 
 TEST_F(CommandFaults, OutputThatCannotBeSwitchedStillEndsAtTheTimeout) {
@@ -129,7 +129,7 @@ TEST_F(CommandFaults, AChildThatSomebodyElseReaped) {
         result = run("/bin/echo x", "", false);
         EXPECT_TRUE(fault.happened());
     }
-    EXPECT_EQ("true 0 [x\n] []", result);
+    EXPECT_EQ(result, "true 0 [x\n] []");
     EXPECT_THAT(traces.errors(),
                 testing::ElementsAre("Error occurred. ERRNO:10 No child processes"));
     EXPECT_LT(0, ::waitpid(-1, nullptr, 0));  // there was nobody else
@@ -148,8 +148,8 @@ TEST_F(CommandFaults, TheServersNameCannotBeFoundWithoutACommand) {
     Scenario scenario([] {}, run, {"2", {}});
     for (const Call call : {Call::kPipe2, Call::kVfork}) {
         const End end = scenario.endWith(call, 1, EAGAIN);
-        EXPECT_EQ("2", end.result);
-        EXPECT_EQ("Unable to determine CMS name, process failed to start", end.errors.back());
+        EXPECT_EQ(end.result, "2");
+        EXPECT_EQ(end.errors.back(), "Unable to determine CMS name, process failed to start");
     }
 }
 

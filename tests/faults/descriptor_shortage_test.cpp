@@ -83,13 +83,12 @@ TEST_F(DescriptorShortage, ACommandNeedsSixAndSaysWhichPipeItMisses) {
     const char* const missing[] = {"stdout", "stdout", "stderr", "stderr", "stdin", "stdin"};
     unsigned left = 0;
     for (const char* const pipe : missing) {
-        EXPECT_EQ((End{"false ",
-                       {std::string("failed to create ") + pipe + " pipe",
-                        "Failed to start process for cmd /bin/echo x"}}),
-                  with(left++, run));
+        EXPECT_EQ(with(left++, run), (End{"false ",
+                                          {std::string("failed to create ") + pipe + " pipe",
+                                           "Failed to start process for cmd /bin/echo x"}}));
     }
     for (; left < kEnough; ++left)
-        EXPECT_EQ((End{"true x\n", {}}), with(left, run)) << left;
+        EXPECT_EQ(with(left, run), (End{"true x\n", {}})) << left;
 }
 
 TEST_F(DescriptorShortage, ATransferNeedsOneAndItsConversionTwo) {
@@ -103,16 +102,17 @@ TEST_F(DescriptorShortage, ATransferNeedsOneAndItsConversionTwo) {
         BinaryDataTransfer(nullptr, 0, "install.sh", 0, 1, 0, &chunk, &status);
         return std::to_string(status);
     };
-    EXPECT_EQ("0", run());
-    EXPECT_EQ((End{"4", {"Failed to open file " + file + " using mode \"wb\", check permissions"}}),
-              with(0, run));
+    EXPECT_EQ(run(), "0");
     EXPECT_EQ(
-        (End{"0", {"Could not open [" + scratch_.path("home") + "//tmp/.zavtemp] for writing."}}),
-        with(1, run));
-    EXPECT_EQ("a\r\n", scratch_.read("depot/install.sh"));
+        with(0, run),
+        (End{"4", {"Failed to open file " + file + " using mode \"wb\", check permissions"}}));
+    EXPECT_EQ(
+        with(1, run),
+        (End{"0", {"Could not open [" + scratch_.path("home") + "//tmp/.zavtemp] for writing."}}));
+    EXPECT_EQ(scratch_.read("depot/install.sh"), "a\r\n");
     for (unsigned left = 2; left < kEnough; ++left)
-        EXPECT_EQ((End{"0", {}}), with(left, run)) << left;
-    EXPECT_EQ("a\n", scratch_.read("depot/install.sh"));
+        EXPECT_EQ(with(left, run), (End{"0", {}})) << left;
+    EXPECT_EQ(scratch_.read("depot/install.sh"), "a\n");
 }
 
 TEST_F(DescriptorShortage, WholeFilesNeedOne) {
@@ -121,10 +121,10 @@ TEST_F(DescriptorShortage, WholeFilesNeedOne) {
                      {"Failed to open file " + file + " using mode \"rb\", check permissions"}};
     const auto write = [&] { return std::to_string(writeFile(file.c_str(), "text")); };
     EXPECT_EQ(closed, with(0, write));
-    EXPECT_EQ((End{"1", {}}), with(1, write));
+    EXPECT_EQ(with(1, write), (End{"1", {}}));
     const auto read = [&] { return narrow(readFile(file.c_str())); };
-    EXPECT_EQ((End{"", closed.errors}), with(0, read));
-    EXPECT_EQ((End{"text", {}}), with(1, read));
+    EXPECT_EQ(with(0, read), (End{"", closed.errors}));
+    EXPECT_EQ(with(1, read), (End{"text", {}}));
 }
 
 }  // namespace

@@ -65,7 +65,7 @@ protected:
         pthread_mutex_unlock(&queue_mutex);
         EXPECT_TRUE(eventually([before] { return published != before; }));
         happened = fault.happened();
-        EXPECT_EQ(before + 1, published) << nth;
+        EXPECT_EQ(published, before + 1) << nth;
         return lastCode;
     }
 
@@ -84,12 +84,12 @@ protected:
 
 TEST_F(ExecutorFaults, ATaskHasOneOutcomeWhateverMemoryIsMissing) {
     // A handler that has no memory has not started its command.
-    EXPECT_EQ((std::set<int>{0, 1025}), codesWithEveryFault());
+    EXPECT_EQ(codesWithEveryFault(), (std::set<int>{0, 1025}));
 }
 
 TEST_F(ExecutorFaults, AHandlersExceptionIsItsOutcomeAlsoWithoutMemoryForTheMessage) {
     fake_handlers::behave([](const std::string&, TaskQueueElem&) -> TASK_RC { throw 42; });
-    EXPECT_EQ((std::set<int>{1025}), codesWithEveryFault());
+    EXPECT_EQ(codesWithEveryFault(), (std::set<int>{1025}));
 }
 
 /// What becomes of the task depends on where the executor was: one that had yet to look at the
@@ -106,7 +106,7 @@ TEST_F(ExecutorFaults, WithoutAnyMemoryTheExecutorPausesAndRunsTheNextTaskAfterw
         pthread_mutex_unlock(&queue_mutex);
         EXPECT_TRUE(eventually([&] { return sleeps >= sleptBefore + kPauses; }));
         EXPECT_TRUE(fault.happened());
-        EXPECT_EQ(before, published);
+        EXPECT_EQ(published, before);
     }
     pthread_mutex_lock(&queue_mutex);
     taskQueue.push(TaskQueueElem("node", "next", "START", "ux", "", "INSTANCE", "", "", "", "i"));
@@ -114,7 +114,7 @@ TEST_F(ExecutorFaults, WithoutAnyMemoryTheExecutorPausesAndRunsTheNextTaskAfterw
     pthread_mutex_unlock(&queue_mutex);
     EXPECT_TRUE(eventually([] { return nextIsDone.load(); }));
     EXPECT_LE(published, before + 2);
-    EXPECT_EQ(0, lastCode);
+    EXPECT_EQ(lastCode, 0);
     // Each attempt and each look at the queue says so, at the pace of the pauses.
     const int told = traces_.count('E', "Exception caught: %s");
     EXPECT_LE(kPauses, told);

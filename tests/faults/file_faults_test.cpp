@@ -158,7 +158,7 @@ TEST_F(FileFaults, CopyingNamesTheStepThatFailed) {
     }
     const End unread = copyFailure("Error reading from file " + source + ", error code: ", EIO);
     EXPECT_EQ(unread, scenario.endWith(Call::kRead, 1, EIO));
-    EXPECT_EQ((End{"5 5000", unread.errors}), scenario.endWith(Call::kRead, 6, EIO));
+    EXPECT_EQ(scenario.endWith(Call::kRead, 6, EIO), (End{"5 5000", unread.errors}));
     // What does not fit the buffer shows while writing, the rest when the file is closed.
     scenario.expectEach(Call::kWrite, ENOSPC,
                         {copyFailure("Error writing to file " + other_ + ", error code: ", ENOSPC),
@@ -189,8 +189,8 @@ TEST_F(FileFaults, DirectoriesWithoutMemoryAreTwo) {
     if (!kMemoryIsOurs) GTEST_SKIP() << "the sanitizer owns malloc";
     Scenario scenario = makingDirectories();
     const End end = scenario.endWith(Call::kMalloc, 1, ENOMEM);
-    EXPECT_EQ("2", end.result);
-    ASSERT_EQ(1u, end.errors.size());
+    EXPECT_EQ(end.result, "2");
+    ASSERT_EQ(end.errors.size(), 1u);
     EXPECT_THAT(end.errors[0], testing::MatchesRegex("Malloc of [0-9]+ bytes failed"));
 }
 

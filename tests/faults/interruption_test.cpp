@@ -171,7 +171,7 @@ TEST_F(Interruption, AStormNeitherShortensNorProlongsTheTimeout) {
     const NothingLeft nothing;
     const SignalStorm storm;
     const Stopwatch watch;
-    EXPECT_EQ("false 0|", run("/bin/sleep 60"));
+    EXPECT_EQ(run("/bin/sleep 60"), "false 0|");
     EXPECT_LE(0.99, watch.seconds());
 }
 

@@ -102,14 +102,14 @@ TEST_F(MemoryShortage, ATransferIsAFaultOrWhole) {
         return std::to_string(fault) + " " + std::to_string(reply.length) + " " +
                std::to_string(room[0]);
     };
-    EXPECT_EQ("0 4 0", withEveryFailure(failures_, transfer));
+    EXPECT_EQ(withEveryFailure(failures_, transfer), "0 4 0");
     EXPECT_LT(5, failures_);
-    EXPECT_EQ("a\nb\n", scratch_.read("depot/install.sh"));
+    EXPECT_EQ(scratch_.read("depot/install.sh"), "a\nb\n");
     // A file that could not be converted is one that arrived.
     const std::string fault = std::to_string(rpc__s_fault_unspec) + " 0 0";
     for (const std::string& result : results_)
         EXPECT_TRUE(result == fault || result == "0 4 0") << result;
-    EXPECT_EQ(1u, results_.count(fault));
+    EXPECT_EQ(results_.count(fault), 1u);
 }
 
 TEST_F(MemoryShortage, WholeFilesThrowAtMost) {
@@ -118,8 +118,8 @@ TEST_F(MemoryShortage, WholeFilesThrowAtMost) {
         const int written = writeFile(path.c_str(), "some text that is long enough");
         return std::to_string(written) + narrow(readFile(path.c_str()));
     };
-    EXPECT_EQ("1some text that is long enough", withEveryFailure(failures_, writeAndRead));
-    EXPECT_EQ((std::set<std::string>{"no memory"}), results_);
+    EXPECT_EQ(withEveryFailure(failures_, writeAndRead), "1some text that is long enough");
+    EXPECT_EQ(results_, (std::set<std::string>{"no memory"}));
 }
 
 TEST_F(MemoryShortage, PropertiesThrowAtMost) {
@@ -128,8 +128,8 @@ TEST_F(MemoryShortage, PropertiesThrowAtMost) {
         const ZAV::ResourceBundle bundle(path.c_str(), '*');
         return narrow(*bundle.getValue("key"));
     };
-    EXPECT_EQ("value", withEveryFailure(failures_, look));
-    EXPECT_EQ((std::set<std::string>{"no memory"}), results_);
+    EXPECT_EQ(withEveryFailure(failures_, look), "value");
+    EXPECT_EQ(results_, (std::set<std::string>{"no memory"}));
 }
 
 TEST_F(MemoryShortage, DocumentsThrowAtMost) {
@@ -140,10 +140,10 @@ TEST_F(MemoryShortage, DocumentsThrowAtMost) {
         return narrow(out);
     };
     const std::string whole = parse();
-    EXPECT_NE("", whole);
+    EXPECT_NE(whole, "");
     EXPECT_EQ(whole, withEveryFailure(failures_, parse));
     // Without an event parser there is no document.
-    EXPECT_EQ((std::set<std::string>{"", "no memory"}), results_);
+    EXPECT_EQ(results_, (std::set<std::string>{"", "no memory"}));
 }
 
 TEST_F(MemoryShortage, ACommandThrowsAtMost) {
@@ -154,9 +154,9 @@ TEST_F(MemoryShortage, ACommandThrowsAtMost) {
         const bool ran = Util::runCommand("/bin/cat", rc, out, err, "input", false);
         return std::string(ran ? "true " : "false ") + narrow(out);
     };
-    EXPECT_EQ("true input", withEveryFailure(failures_, command));
+    EXPECT_EQ(withEveryFailure(failures_, command), "true input");
     EXPECT_LT(10, failures_);
-    EXPECT_EQ((std::set<std::string>{"no memory"}), results_);
+    EXPECT_EQ(results_, (std::set<std::string>{"no memory"}));
 }
 
 TEST_F(MemoryShortage, PruningThrowsAtMost) {
@@ -168,8 +168,8 @@ TEST_F(MemoryShortage, PruningThrowsAtMost) {
                           scratch_.exists("logs/a_long_enough_prefix_2");
         return std::string(both ? "both" : "one");
     };
-    EXPECT_EQ("one", withEveryFailure(failures_, prune));
-    EXPECT_EQ(1u, results_.count("no memory"));
+    EXPECT_EQ(withEveryFailure(failures_, prune), "one");
+    EXPECT_EQ(results_.count("no memory"), 1u);
 }
 
 // The last one, because it leaves a thread behind.
@@ -177,12 +177,12 @@ TEST_F(MemoryShortage, AStartUpThatFailsSaysSoAndCanBeRepeated) {
     TraceCapture traces("ERROR");
     {
         const Fault fault(Call::kNew, 1, ENOMEM, Fault::Lasts::kOnwards);
-        EXPECT_EQ(OXA_FAILED, Initialize_Mgmt_Functions());
+        EXPECT_EQ(Initialize_Mgmt_Functions(), OXA_FAILED);
     }
     EXPECT_FALSE(initialized);
     // There was no memory for the reason.
-    EXPECT_EQ(1, traces.count('E', "Exception caught: %s"));
-    EXPECT_EQ(0, Initialize_Mgmt_Functions());
+    EXPECT_EQ(traces.count('E', "Exception caught: %s"), 1);
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
     EXPECT_TRUE(initialized);
 }
 

@@ -69,7 +69,7 @@ public:
                 << nameOf(call) << ' ' << i + 1;
             EXPECT_TRUE(happened_) << nameOf(call) << ' ' << i + 1;
         }
-        EXPECT_EQ(unharmed_, endWith(call, static_cast<int>(ends.size()) + 1, error))
+        EXPECT_EQ(endWith(call, static_cast<int>(ends.size()) + 1, error), unharmed_)
             << nameOf(call);
         EXPECT_FALSE(happened_) << "more calls of " << nameOf(call) << " than expected";
     }

@@ -84,24 +84,24 @@ protected:
 TEST_F(TaskFaults, AnInstallThatCannotStartIs1030) {
     Scenario scenario = queued(task("INSTALL", "/bin/echo x"));
     for (const Refusal& refusal : kRefusals) {
-        EXPECT_EQ((End{"1030 ZAV1030E /bin/echo x",
+        EXPECT_EQ(scenario.endWith(refusal.call, 1, refusal.error),
+                  (End{"1030 ZAV1030E /bin/echo x",
                        notStarted(refusal, "/bin/echo x",
-                                  "ZAV1030E Failed to start install command [/bin/echo x]")}),
-                  scenario.endWith(refusal.call, 1, refusal.error))
+                                  "ZAV1030E Failed to start install command [/bin/echo x]")}))
             << refusal.text;
     }
 }
 
 TEST_F(TaskFaults, AnInstallWhoseChildHasNoStreamsIs1031) {
     const End end = queued(task("INSTALL", "/bin/echo x")).endWith(Call::kDup2, 1, EBUSY);
-    EXPECT_EQ("1031 ZAV1031E /bin/echo x,1", end.result);
-    EXPECT_EQ("error on dup2 for stdout", end.errors.front());
-    EXPECT_EQ("ZAV1031E Bad return code [1] from install command [/bin/echo x]", end.errors.back());
+    EXPECT_EQ(end.result, "1031 ZAV1031E /bin/echo x,1");
+    EXPECT_EQ(end.errors.front(), "error on dup2 for stdout");
+    EXPECT_EQ(end.errors.back(), "ZAV1031E Bad return code [1] from install command [/bin/echo x]");
 }
 
 TEST_F(TaskFaults, ACommandThatCannotBeExecutedEndsLikeOneThatSucceeds) {
-    EXPECT_EQ((End{"0  ", {"Unable to launch the executable, rc=-1"}}),
-              queued(task("INSTALL", "/bin/echo x")).endWith(Call::kExecve, 1, ENOMEM));
+    EXPECT_EQ(queued(task("INSTALL", "/bin/echo x")).endWith(Call::kExecve, 1, ENOMEM),
+              (End{"0  ", {"Unable to launch the executable, rc=-1"}}));
 }
 
 TEST_F(TaskFaults, AWrapperScriptThatCannotBeWrittenFailsInTheShell) {
@@ -116,8 +116,8 @@ TEST_F(TaskFaults, AWrapperScriptThatCannotBeWrittenFailsInTheShell) {
                       {"0  ", {}});
     const End end = scenario.endWith(Call::kFdopen, 1, ENOMEM);
     EXPECT_TRUE(scenario.happened());
-    EXPECT_EQ("Failed to open file " + script + " using mode \"rb\", check permissions",
-              end.errors.front());
+    EXPECT_EQ(end.errors.front(),
+              "Failed to open file " + script + " using mode \"rb\", check permissions");
 }
 
 TEST_F(TaskFaults, AStartThatCannotStartIs1025) {
@@ -125,7 +125,7 @@ TEST_F(TaskFaults, AStartThatCannotStartIs1025) {
     const std::string command = home_ + "/bin/TovrinAgent  -h " + home_ + " start ux";
     for (const Refusal& refusal : kRefusals) {
         const End end = scenario.endWith(refusal.call, 1, refusal.error);
-        EXPECT_EQ("1025 ZAV1025E " + command, end.result);
+        EXPECT_EQ(end.result, "1025 ZAV1025E " + command);
         ASSERT_LE(2u, end.errors.size());
         EXPECT_THAT(end.errors, testing::Contains(refusal.text));
         EXPECT_THAT(end.errors, testing::Contains("Failed to start process for cmd " + command));
@@ -140,14 +140,14 @@ TEST_F(TaskFaults, AConfigurationThatCannotBeReadIs1009) {
     };
     Scenario scenario([] {}, run, {"0  ", {}});
     // The first run only tells which of several places is preferred.
-    EXPECT_EQ("0  ", scenario.endWith(Call::kVfork, 1, EAGAIN).result);
+    EXPECT_EQ(scenario.endWith(Call::kVfork, 1, EAGAIN).result, "0  ");
     const End homeless = scenario.endWith(Call::kVfork, 2, EAGAIN);
-    EXPECT_EQ("1007 ZAV1007E GETCONFIG,ux", homeless.result);
-    EXPECT_EQ("failed to fork child process", homeless.errors.front());
+    EXPECT_EQ(homeless.result, "1007 ZAV1007E GETCONFIG,ux");
+    EXPECT_EQ(homeless.errors.front(), "failed to fork child process");
     const End end = scenario.endWith(Call::kVfork, 3, EAGAIN);
-    EXPECT_EQ("1009 ZAV1009E GETCONFIG,ux," + translator + " -g  -pc ux", end.result);
-    ASSERT_EQ(3u, end.errors.size());
-    EXPECT_EQ("failed to fork child process", end.errors[0]);
+    EXPECT_EQ(end.result, "1009 ZAV1009E GETCONFIG,ux," + translator + " -g  -pc ux");
+    ASSERT_EQ(end.errors.size(), 3u);
+    EXPECT_EQ(end.errors[0], "failed to fork child process");
     EXPECT_THAT(end.errors[2], testing::StartsWith("ZAV1009E "));
     EXPECT_EQ(scenario.unharmed(), scenario.endWith(Call::kVfork, 4, EAGAIN));
 }
@@ -172,10 +172,10 @@ TEST_F(TaskFaults, NoExceptionReachesTheFrameworksThreads) {
     RAS1_UNIT unit{"zav01agt"};
     const ZAV::Trace trace(unit);
     TraceCapture traces("ERROR");
-    EXPECT_EQ(OXA_NO_MEMORY, guarded(trace, []() -> int { throw std::bad_alloc(); }));
-    EXPECT_EQ(OXA_FAILED, guarded(trace, []() -> int { throw std::runtime_error("broken"); }));
-    EXPECT_EQ(OXA_FAILED, guarded(trace, []() -> int { throw 42; }));
-    EXPECT_EQ(OXA_OK, guarded(trace, [] { return OXA_OK; }));
+    EXPECT_EQ(guarded(trace, []() -> int { throw std::bad_alloc(); }), OXA_NO_MEMORY);
+    EXPECT_EQ(guarded(trace, []() -> int { throw std::runtime_error("broken"); }), OXA_FAILED);
+    EXPECT_EQ(guarded(trace, []() -> int { throw 42; }), OXA_FAILED);
+    EXPECT_EQ(guarded(trace, [] { return OXA_OK; }), OXA_OK);
     EXPECT_THAT(traces.errors(),
                 testing::ElementsAre("Exception caught: std::bad_alloc", "Exception caught: broken",
                                      "Exception caught: an exception without a text"));

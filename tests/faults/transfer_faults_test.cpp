@@ -88,7 +88,7 @@ TEST_F(TransferFaults, AChunkThatFitsInPartIsStatusFive) {
     Scenario plain = transferOf("file", "ab\r\nab\r\n");
     plain.prepare();
     rlimit before{};
-    ASSERT_EQ(0, ::getrlimit(RLIMIT_FSIZE, &before));
+    ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &before), 0);
     auto* const handler = std::signal(SIGXFSZ, SIG_IGN);
     const rlimit small{6, before.rlim_max};
     std::int32_t status = -1;
@@ -101,14 +101,14 @@ TEST_F(TransferFaults, AChunkThatFitsInPartIsStatusFive) {
             std::memcpy(chunk.data, "abcd", 4);
         }
         ras1::configure("", "/dev/null");  // the trace must not be cut as well
-        ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &small));
+        ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &small), 0);
         BinaryDataTransfer(nullptr, 0, name.c_str(), 0, 1, 1, chunks, &status);
-        ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &before));
+        ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &before), 0);
         ras1::configureFromEnvironment();
     }
     std::signal(SIGXFSZ, handler);
-    EXPECT_EQ(5, status);
-    EXPECT_EQ("abcdab", scratch_.read("depot/file"));
+    EXPECT_EQ(status, 5);
+    EXPECT_EQ(scratch_.read("depot/file"), "abcdab");
 }
 
 TEST_F(TransferFaults, MakingTheDirectoryIsStatusSix) {
@@ -127,10 +127,10 @@ TEST_F(TransferFaults, MemoryForTheDirectoryIsStatusSix) {
     Scenario nested = transferOf("a/file", "ab\r\nab\r\n", false);
     TraceCapture traces("ERROR");
     const End end = nested.endWith(Call::kMalloc, 1, ENOMEM);
-    ASSERT_EQ(2u, end.errors.size());
+    ASSERT_EQ(end.errors.size(), 2u);
     EXPECT_THAT(end.errors[0], testing::MatchesRegex("Malloc of [0-9]+ bytes failed"));
-    EXPECT_EQ("Could not create destination directory " + inDepot("a"), end.errors[1]);
-    EXPECT_EQ("status 6 []", end.result);
+    EXPECT_EQ(end.errors[1], "Could not create destination directory " + inDepot("a"));
+    EXPECT_EQ(end.result, "status 6 []");
 }
 
 TEST_F(TransferFaults, OtherStepsDoNotMatter) {
@@ -186,9 +186,9 @@ TEST_F(TransferFaults, NoConversionLeavesATemporaryFileForTheNext) {
 TEST_F(TransferFaults, AFullDiskBelowTheHomeLeavesTheFileUnconverted) {
     Scenario script = transferOf("install.sh", "ab\nab\n");
     script.prepare();
-    ASSERT_EQ(0, ::symlink("/dev/full", temporary_.c_str()));
-    EXPECT_EQ((End{"status 0 [ab\r\nab\r\n]", {"Could not close [" + home_ + "//tmp/.zavtemp]."}}),
-              script.runOnce());
+    ASSERT_EQ(::symlink("/dev/full", temporary_.c_str()), 0);
+    EXPECT_EQ(script.runOnce(),
+              (End{"status 0 [ab\r\nab\r\n]", {"Could not close [" + home_ + "//tmp/.zavtemp]."}}));
 }
 
 }  // namespace

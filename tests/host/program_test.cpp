@@ -44,9 +44,9 @@ protected:
     static std::string complaint(const std::vector<std::string>& argv,
                                  const Environment& environment = {}) {
         const ProgramResult result = runProgram(argv, "", environment);
-        EXPECT_EQ(1, result.status);
-        EXPECT_EQ("", result.out);
-        EXPECT_EQ(1, std::count(result.err.begin(), result.err.end(), '\n')) << result.err;
+        EXPECT_EQ(result.status, 1);
+        EXPECT_EQ(result.out, "");
+        EXPECT_EQ(std::count(result.err.begin(), result.err.end(), '\n'), 1) << result.err;
         return result.err;
     }
     void request(const std::string& transid, int taskMilliseconds) const {
@@ -57,7 +57,7 @@ protected:
             R"({"column":"PRODUCT","op":"=","value":")" +
                 std::to_string(taskMilliseconds) + R"("},{"column":"TRANSID","op":"=","value":")" +
                 transid + "\"}]}");
-        EXPECT_EQ(200, answer.status) << answer.body;
+        EXPECT_EQ(answer.status, 200) << answer.body;
     }
     bool began(const std::string& transid) const {
         return eventually([&] { return scratch.exists("home/began-" + transid); });
@@ -76,23 +76,23 @@ protected:
 
 TEST_F(HostProgram, SaysThatItIsReadyAndNothingElse) {
     const auto program = start();
-    EXPECT_EQ("ready: " + socket + "\n", program->out());
-    EXPECT_EQ("", program->err());
+    EXPECT_EQ(program->out(), "ready: " + socket + "\n");
+    EXPECT_EQ(program->err(), "");
     for (const char* name : {"s", "s.rpc"}) {
         struct stat found {};
-        ASSERT_EQ(0, ::stat(scratch.path(name).c_str(), &found)) << name;
-        EXPECT_EQ(S_IFSOCK | 0600U, found.st_mode);
+        ASSERT_EQ(::stat(scratch.path(name).c_str(), &found), 0) << name;
+        EXPECT_EQ(found.st_mode, S_IFSOCK | 0600U);
         EXPECT_TRUE(RawClient(scratch.path(name)).connected());
     }
-    EXPECT_NE(std::string::npos,
-              RawClient(socket).get("/v1/health").body.find("\"home\":\"" + home + "\""));
+    EXPECT_NE(RawClient(socket).get("/v1/health").body.find("\"home\":\"" + home + "\""),
+              std::string::npos);
 }
 
 TEST_F(HostProgram, EndsWithStatus0OnBothSignals) {
     for (const int signal : {SIGTERM, SIGINT}) {
         const auto program = start();
         program->signal(signal);
-        EXPECT_EQ(0, program->wait().status);
+        EXPECT_EQ(program->wait().status, 0);
         expectNoFilesLeft();
     }
 }
@@ -104,42 +104,40 @@ TEST_F(HostProgram, TellsWhyItDoesNotStart) {
         argv.back() = plugin;
         return argv;
     };
-    EXPECT_EQ("zavhost: no home: give --home DIR or set TOVRINHOME\n",
-              complaint({program}, {{"TOVRINHOME", ""}}));
-    EXPECT_EQ("zavhost: home /nonexistent: No such file or directory\n",
-              complaint({program, "--home", "/nonexistent"}));
-    EXPECT_EQ(
-        "zavhost: plug-in cannot be loaded: /nonexistent.so: cannot open shared object "
-        "file: No such file or directory\n",
-        complaint(withPlugin("/nonexistent.so")));
+    EXPECT_EQ(complaint({program}, {{"TOVRINHOME", ""}}),
+              "zavhost: no home: give --home DIR or set TOVRINHOME\n");
+    EXPECT_EQ(complaint({program, "--home", "/nonexistent"}),
+              "zavhost: home /nonexistent: No such file or directory\n");
+    EXPECT_EQ(complaint(withPlugin("/nonexistent.so")),
+              "zavhost: plug-in cannot be loaded: /nonexistent.so: cannot open shared object "
+              "file: No such file or directory\n");
     const std::string platform = ZAV_BUILD_DIR "/lib/libzavplatform.so";
-    EXPECT_EQ("zavhost: plug-in " + platform + " has no function Initialize_Mgmt_Functions\n",
-              complaint(withPlugin(platform)));
-    EXPECT_EQ("zavhost: plug-in " + command().back() + " offers no tables\n",
-              complaint(command(), {{"MADE_UP_PLUGIN", "empty"}}));
+    EXPECT_EQ(complaint(withPlugin(platform)),
+              "zavhost: plug-in " + platform + " has no function Initialize_Mgmt_Functions\n");
+    EXPECT_EQ(complaint(command(), {{"MADE_UP_PLUGIN", "empty"}}),
+              "zavhost: plug-in " + command().back() + " offers no tables\n");
     std::vector<std::string> here = withPlugin("libm.so.6");
-    EXPECT_EQ(
-        "zavhost: plug-in cannot be loaded: ./libm.so.6: cannot open shared object file: No "
-        "such file or directory\n",
-        complaint(here))
+    EXPECT_EQ(complaint(here),
+              "zavhost: plug-in cannot be loaded: ./libm.so.6: cannot open shared object file: No "
+              "such file or directory\n")
         << "a file of that name, not a library of the system";
     std::vector<std::string> odd = command({"--odd"});
     EXPECT_EQ(
-        "zavhost: The following argument was not expected: --odd (--help shows the options)\n",
-        complaint(odd));
+        complaint(odd),
+        "zavhost: The following argument was not expected: --odd (--help shows the options)\n");
     expectNoFilesLeft();
 }
 
 TEST_F(HostProgram, LeavesALiveHostAlone) {
     const auto program = start();
-    EXPECT_EQ("zavhost: socket " + socket + " is in use by a live host\n", complaint(command()));
+    EXPECT_EQ(complaint(command()), "zavhost: socket " + socket + " is in use by a live host\n");
     // The same file transfer socket under another name of the first one.
     std::vector<std::string> other = command();
     other[4] = scratch.path("other");
     other.insert(other.end(), {"--rpc-socket", socket + ".rpc"});
-    EXPECT_EQ("zavhost: socket " + socket + ".rpc is in use by a live host\n", complaint(other));
+    EXPECT_EQ(complaint(other), "zavhost: socket " + socket + ".rpc is in use by a live host\n");
     EXPECT_FALSE(scratch.exists("other"));
-    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+    EXPECT_EQ(RawClient(socket).get("/v1/health").status, 200);
 }
 
 TEST_F(HostProgram, ReplacesTheSocketsOfOneThatWasKilled) {
@@ -149,7 +147,7 @@ TEST_F(HostProgram, ReplacesTheSocketsOfOneThatWasKilled) {
     ASSERT_TRUE(scratch.exists("s"));
     ASSERT_TRUE(scratch.exists("s.rpc"));
     const auto program = start();
-    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+    EXPECT_EQ(RawClient(socket).get("/v1/health").status, 200);
 }
 
 TEST_F(HostProgram, OfManyThatStartAtOnceExactlyOneServes) {
@@ -166,10 +164,10 @@ TEST_F(HostProgram, OfManyThatStartAtOnceExactlyOneServes) {
         if (program->running()) {
             EXPECT_TRUE(program->awaitOutput("ready: ", seconds(20)));
         } else {
-            EXPECT_EQ(1, program->wait().status);
+            EXPECT_EQ(program->wait().status, 1);
         }
     }
-    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+    EXPECT_EQ(RawClient(socket).get("/v1/health").status, 200);
 }
 
 TEST_F(HostProgram, ServesFileTransfersOnALoopbackPortWhenToldTo) {
@@ -179,40 +177,39 @@ TEST_F(HostProgram, ServesFileTransfersOnALoopbackPortWhenToldTo) {
     const int taken = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
     socklen_t length = sizeof address;
     auto* const generic = reinterpret_cast<sockaddr*>(&address);
-    ASSERT_EQ(0, ::bind(taken, generic, length));
-    ASSERT_EQ(0, ::listen(taken, 1));
-    ASSERT_EQ(0, ::getsockname(taken, generic, &length));
+    ASSERT_EQ(::bind(taken, generic, length), 0);
+    ASSERT_EQ(::listen(taken, 1), 0);
+    ASSERT_EQ(::getsockname(taken, generic, &length), 0);
     const std::string port = std::to_string(ntohs(address.sin_port));
-    EXPECT_EQ("zavhost: cannot listen on the loopback port " + port + ": Address already in use\n",
-              complaint(command({"--rpc-port", port})));
+    EXPECT_EQ(complaint(command({"--rpc-port", port})),
+              "zavhost: cannot listen on the loopback port " + port + ": Address already in use\n");
     ::close(taken);
     const auto program = start({"--rpc-port", port});
     const int client = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    EXPECT_EQ(0, ::connect(client, generic, length));
+    EXPECT_EQ(::connect(client, generic, length), 0);
     ::close(client);
 }
 
 TEST_F(HostProgram, GoesOnWhenOnlyFileTransfersFailToRegister) {
     Program program(command(), "", {{"MADE_UP_PLUGIN", "status"}});
     EXPECT_TRUE(program.awaitOutput("ready: ", seconds(30)));
-    EXPECT_EQ("zavhost: plug-in " + command().back() +
-                  " started with status 7; file transfers may fail\n",
-              program.err());
+    EXPECT_EQ(program.err(), "zavhost: plug-in " + command().back() +
+                                 " started with status 7; file transfers may fail\n");
 }
 
 TEST_F(HostProgram, EndsAfterTheTaskInHandAndBeginsNoOther) {
     const auto program = start();
     RawClient events(socket);
     events.send("GET /v1/events?table=KAGDYST HTTP/1.1\r\n\r\n");
-    ASSERT_NE(std::string::npos, events.readUntil("\r\n\r\n").find("200"));
+    ASSERT_NE(events.readUntil("\r\n\r\n").find("200"), std::string::npos);
     request("first", 3'000);  // time enough for the signal to arrive meanwhile
     request("second", 1);
     ASSERT_TRUE(began("first"));
     program->signal(SIGTERM);
-    EXPECT_EQ(0, program->wait().status);
+    EXPECT_EQ(program->wait().status, 0);
     EXPECT_TRUE(scratch.exists("home/ended-first"));
     EXPECT_FALSE(scratch.exists("home/began-second"));
-    EXPECT_NE(std::string::npos, events.readUntil("\n\n").find("\"TRANSID\":\"first\""));
+    EXPECT_NE(events.readUntil("\n\n").find("\"TRANSID\":\"first\""), std::string::npos);
     expectNoFilesLeft();
 }
 
@@ -222,7 +219,7 @@ TEST_F(HostProgram, EndsAfterTenSecondsWhateverItsTaskDoes) {
     ASSERT_TRUE(began("endless"));
     const auto begin = std::chrono::steady_clock::now();
     program->signal(SIGTERM);
-    EXPECT_EQ(0, program->wait().status);
+    EXPECT_EQ(program->wait().status, 0);
     EXPECT_GE(std::chrono::steady_clock::now() - begin, milliseconds(9'900));
     expectNoFilesLeft();
 }
@@ -240,25 +237,25 @@ TEST_F(HostProgram, WorksWithItsStandardDescriptorsClosed) {
     EXPECT_TRUE(eventually([&] { return RawClient(socket).get("/v1/health").status == 200; }));
     std::error_code error;
     const std::filesystem::path standard = "/proc/" + std::to_string(program.pid()) + "/fd/1";
-    EXPECT_EQ("/dev/null", std::filesystem::read_symlink(standard, error).string());
+    EXPECT_EQ(std::filesystem::read_symlink(standard, error).string(), "/dev/null");
     program.signal(SIGTERM);
-    EXPECT_EQ(0, program.wait().status);
+    EXPECT_EQ(program.wait().status, 0);
 }
 
 TEST_F(HostProgram, SurvivesWhenNobodyReadsItsOutput) {
     const std::string pipe = scratch.path("pipe");
-    ASSERT_EQ(0, ::mkfifo(pipe.c_str(), 0600));
+    ASSERT_EQ(::mkfifo(pipe.c_str(), 0600), 0);
     const int reader = ::open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
     const int writer = ::open(pipe.c_str(), O_WRONLY | O_CLOEXEC);
     ASSERT_GE(writer, 0);
     ::close(reader);
     // The shell finds a pipe whose reader has gone: its descriptor is inherited, not opened.
-    ASSERT_EQ(0, ::fcntl(writer, F_SETFD, 0));
+    ASSERT_EQ(::fcntl(writer, F_SETFD, 0), 0);
     const std::string number = std::to_string(writer);
     Program program(below(">&" + number + " 2>&" + number, command()));
     EXPECT_TRUE(eventually([&] { return RawClient(socket).get("/v1/health").status == 200; }));
     program.signal(SIGTERM);
-    EXPECT_EQ(0, program.wait().status);
+    EXPECT_EQ(program.wait().status, 0);
     ::close(writer);
 }
 
@@ -279,7 +276,7 @@ TEST_F(HostProgram, SurvivesWhenNobodyReadsItsOutput) {
 #ifndef __SANITIZE_THREAD__  // whose own thread is woken all the time
 TEST_F(HostProgram, SleepsWhenNobodyWantsAnything) {
     const auto program = start();
-    EXPECT_EQ(200, RawClient(socket).get("/v1/health").status);
+    EXPECT_EQ(RawClient(socket).get("/v1/health").status, 200);
     request("t", 1);
     ASSERT_TRUE(eventually([&] { return scratch.exists("home/ended-t"); }));
     long before = -1;

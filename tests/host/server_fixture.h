@@ -66,7 +66,7 @@ protected:
     RawClient subscribe(const std::string& rest = "") {
         RawClient client = connect();
         client.send("GET /v1/events?table=PLAIN" + rest + " HTTP/1.1\r\nHost: x\r\n\r\n");
-        EXPECT_EQ(0U, client.readUntil("\r\n\r\n").find("HTTP/1.1 200 OK\r\n"));
+        EXPECT_EQ(client.readUntil("\r\n\r\n").find("HTTP/1.1 200 OK\r\n"), 0U);
         return client;
     }
     static std::string plainQuery() { return R"({"table":"PLAIN"})"; }

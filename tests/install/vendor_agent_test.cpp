@@ -33,7 +33,7 @@ public:
         sockaddr_un address{};
         address.sun_family = AF_UNIX;
         std::strncpy(address.sun_path, path().c_str(), sizeof address.sun_path - 1);
-        EXPECT_EQ(0, ::bind(socket_, reinterpret_cast<const sockaddr*>(&address), sizeof address));
+        EXPECT_EQ(::bind(socket_, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
     }
     ~LogSocket() { ::close(socket_); }
     LogSocket(const LogSocket&) = delete;
@@ -65,17 +65,16 @@ protected:
 TEST_F(VendorAgent, StartsARealAgentAndPrintsItsOutcome) {
     const StarterHome home("ux");
     const ProgramResult result = start(home.path(), "ux");
-    EXPECT_EQ(0, result.status) << result.err;
-    EXPECT_EQ(
-        "reply: START VENDOR-1 RETVAL=0\n"
-        "outcome: START VENDOR-1 RETVAL=0\n",
-        result.out);
+    EXPECT_EQ(result.status, 0) << result.err;
+    EXPECT_EQ(result.out,
+              "reply: START VENDOR-1 RETVAL=0\n"
+              "outcome: START VENDOR-1 RETVAL=0\n");
     EXPECT_TRUE(home.runs("ux"));
 }
 
 TEST_F(VendorAgent, RunsTheHomesProgramsAsThePlugInDoesAnywhere) {
     const ScriptHome home;
-    EXPECT_EQ(0, start(home.path(), "ux").status);
+    EXPECT_EQ(start(home.path(), "ux").status, 0);
     EXPECT_THAT(home.agentCalls(), ElementsAre("-h " + home.path() + " start ux"));
 }
 
@@ -84,7 +83,7 @@ TEST_F(VendorAgent, SaysHowAFailedStartEndedAndTracesItToTheSystemsLog) {
     home.agentScript("exit 3");
     const std::string command = home.path() + "/bin/TovrinAgent  -h " + home.path() + " start ux";
     const ProgramResult result = start(home.path(), "ux");
-    EXPECT_EQ(1, result.status);
+    EXPECT_EQ(result.status, 1);
     EXPECT_THAT(result.out,
                 HasSubstr("outcome: START VENDOR-1 RETVAL=1024 ZAV1024E " + command + "\n"));
     EXPECT_THAT(
@@ -97,8 +96,8 @@ TEST_F(VendorAgent, SaysHowAFailedStartEndedAndTracesItToTheSystemsLog) {
 TEST_F(VendorAgent, SaysThatARequestWasRefused) {
     const ScriptHome home;
     const ProgramResult result = start(home.path(), "");
-    EXPECT_EQ(1, result.status);
-    EXPECT_EQ("reply: START VENDOR-1 RETVAL=1003 ZAV1003E\n", result.out);
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "reply: START VENDOR-1 RETVAL=1003 ZAV1003E\n");
     EXPECT_THAT(home.agentCalls(), testing::IsEmpty());
 }
 
@@ -113,7 +112,7 @@ std::vector<std::string> linesThatBeginWith(const std::string& text, const std::
 
 TEST(VendorConformance, NamesWhatTheExampleLeavesOutAndNothingElse) {
     const ProgramResult result = runProgram({kConformance}, "", {}, std::chrono::seconds(180));
-    EXPECT_EQ(1, result.status) << result.err;
+    EXPECT_EQ(result.status, 1) << result.err;
     EXPECT_THAT(
         linesThatBeginWith(result.out, "FAIL"),
         ElementsAre(
@@ -138,29 +137,27 @@ TEST(VendorConformance, NamesWhatTheExampleLeavesOutAndNothingElse) {
 
 TEST(VendorConformance, ChecksTheNamedOperationsOnly) {
     const ProgramResult result = runProgram({kConformance, "FSI1_", "rpc__free"});
-    EXPECT_EQ(0, result.status);
-    EXPECT_EQ(
-        "ok    FSI1_NewList\n"
-        "ok    FSI1_FetchList\n"
-        "ok    FSI1_DeleteList\n"
-        "ok    rpc__free\n"
-        "4 of 4 operations fulfilled\n",
-        result.out);
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.out,
+              "ok    FSI1_NewList\n"
+              "ok    FSI1_FetchList\n"
+              "ok    FSI1_DeleteList\n"
+              "ok    rpc__free\n"
+              "4 of 4 operations fulfilled\n");
 }
 
 TEST(VendorConformance, RefusesNamesOfNoOperationAndUnknownOptions) {
-    EXPECT_EQ(2, runProgram({kConformance, "nothing"}).status);
-    EXPECT_EQ(2, runProgram({kConformance, "--unknown"}).status);
+    EXPECT_EQ(runProgram({kConformance, "nothing"}).status, 2);
+    EXPECT_EQ(runProgram({kConformance, "--unknown"}).status, 2);
 }
 
 TEST(VendorConformance, ListsEveryPromise) {
     const ProgramResult result = runProgram({kConformance, "--list", "BSS1_PutEnv"});
-    EXPECT_EQ(0, result.status);
-    EXPECT_EQ(
-        "BSS1_PutEnv copies its text\n"
-        "BSS1_PutEnv replaces the value before, for everybody\n"
-        "BSS1_PutEnv refuses what is no setting\n",
-        result.out);
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.out,
+              "BSS1_PutEnv copies its text\n"
+              "BSS1_PutEnv replaces the value before, for everybody\n"
+              "BSS1_PutEnv refuses what is no setting\n");
 }
 
 }  // namespace

@@ -63,29 +63,29 @@ protected:
 
 TEST_F(StartUpSteps, AreNoneWithoutAHome) {
     ::unsetenv("TOVRINHOME");
-    EXPECT_EQ(0, Initialize_Mgmt_Functions());
-    EXPECT_EQ(Texts{}, steps);
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
+    EXPECT_EQ(steps, Texts{});
 }
 
 TEST_F(StartUpSteps, GoOnWhenTablesCannotBeRegistered) {
     tableStatus = OXA_NO_MEMORY;
-    EXPECT_EQ(0, Initialize_Mgmt_Functions());
-    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST", "task manager", "interface"}), steps);
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
+    EXPECT_EQ(steps, (Texts{"KAGREQT", "KINAGT", "KAGDYST", "task manager", "interface"}));
 }
 
 TEST_F(StartUpSteps, EndWithTheStatusOfTheInterface) {
     interfaceStatus = 4711;
     const TraceCapture trace;
-    EXPECT_EQ(4711, Initialize_Mgmt_Functions());
-    EXPECT_EQ(1, trace.count('D', "Done calling ZAV initialization routines"));
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 4711);
+    EXPECT_EQ(trace.count('D', "Done calling ZAV initialization routines"), 1);
 }
 
 TEST_F(StartUpSteps, ThrowNothingAtTheHost) {
     taskManagerThrows = true;
     const TraceCapture trace;
-    EXPECT_EQ(OXA_FAILED, Initialize_Mgmt_Functions());
-    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST", "task manager"}), steps);
-    EXPECT_EQ((Texts{"Exception caught: no task manager"}), trace.errors("zavmgmt"));
+    EXPECT_EQ(Initialize_Mgmt_Functions(), OXA_FAILED);
+    EXPECT_EQ(steps, (Texts{"KAGREQT", "KINAGT", "KAGDYST", "task manager"}));
+    EXPECT_EQ(trace.errors("zavmgmt"), (Texts{"Exception caught: no task manager"}));
 }
 
 }  // namespace

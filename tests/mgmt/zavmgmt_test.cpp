@@ -64,16 +64,16 @@ TEST_F(StartUp, WithoutAHomeTheLibraryStaysInert) {
     ::unsetenv("TOVRINHOME");
     const std::ptrdiff_t threads = threadCount();
     TraceCapture trace;
-    EXPECT_EQ(0, Initialize_Mgmt_Functions());
-    EXPECT_EQ((Texts{"No value for TOVRINHOME - MANAGEMENT FUNCTIONS DISABLED"}), trace.errors());
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
+    EXPECT_EQ(trace.errors(), (Texts{"No value for TOVRINHOME - MANAGEMENT FUNCTIONS DISABLED"}));
     EXPECT_TRUE(trace.details("zavmgmt").empty());
-    EXPECT_EQ(nullptr, ZAV_TOVRINHOME);
-    EXPECT_EQ(Texts{}, tableNames());
+    EXPECT_EQ(ZAV_TOVRINHOME, nullptr);
+    EXPECT_EQ(tableNames(), Texts{});
     oxa::Rows rows;
-    EXPECT_EQ(OXA_GONE, oxa::query("KAGREQT", {}, rows));
-    EXPECT_EQ(nullptr, zav_kagreqt_static_manager);
-    EXPECT_EQ(nullptr, zav_kinagt_static_manager);
-    EXPECT_EQ(nullptr, zav_kagdyst_static_manager);
+    EXPECT_EQ(oxa::query("KAGREQT", {}, rows), OXA_GONE);
+    EXPECT_EQ(zav_kagreqt_static_manager, nullptr);
+    EXPECT_EQ(zav_kinagt_static_manager, nullptr);
+    EXPECT_EQ(zav_kagdyst_static_manager, nullptr);
     EXPECT_FALSE(initialized);
     EXPECT_EQ(threads, threadCount());
 }
@@ -84,9 +84,9 @@ TEST_F(StartUp, TheHomeIsTheVariablesValueItself) {
     EXPECT_EQ(::getenv("TOVRINHOME"), ZAV_TOVRINHOME);
     ::unsetenv("TOVRINHOME");
     TraceCapture trace;
-    EXPECT_EQ(nullptr, Initialize_Tovrin_Home());
-    EXPECT_EQ(nullptr, ZAV_TOVRINHOME);
-    EXPECT_EQ((Texts{"No value for TOVRINHOME - MANAGEMENT FUNCTIONS DISABLED"}), trace.errors());
+    EXPECT_EQ(Initialize_Tovrin_Home(), nullptr);
+    EXPECT_EQ(ZAV_TOVRINHOME, nullptr);
+    EXPECT_EQ(trace.errors(), (Texts{"No value for TOVRINHOME - MANAGEMENT FUNCTIONS DISABLED"}));
 }
 
 TEST_F(StartUp, AnEmptyHomeCountsAsOne) {
@@ -94,22 +94,22 @@ TEST_F(StartUp, AnEmptyHomeCountsAsOne) {
     const ScopedEnv noDepot("QVSDEPLOY_AGENTDEPOT", nullptr);
     setHome("");
     TraceCapture trace;
-    EXPECT_EQ(0, Initialize_Mgmt_Functions());
-    ASSERT_NE(nullptr, ZAV_TOVRINHOME);
-    EXPECT_STREQ("", ZAV_TOVRINHOME);
-    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST"}), tableNames());
-    EXPECT_EQ(1, trace.count('E', "ZAV1010E No Agent Depot directory set"));
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
+    ASSERT_NE(ZAV_TOVRINHOME, nullptr);
+    EXPECT_STREQ(ZAV_TOVRINHOME, "");
+    EXPECT_EQ(tableNames(), (Texts{"KAGREQT", "KINAGT", "KAGDYST"}));
+    EXPECT_EQ(trace.count('E', "ZAV1010E No Agent Depot directory set"), 1);
     EXPECT_FALSE(initialized);
 }
 
 TEST_F(StartUp, RegistersEverythingInOrder) {
     setHome(home().path());
     TraceCapture trace;
-    EXPECT_EQ(0, Initialize_Mgmt_Functions());
-    EXPECT_EQ(
-        (Texts{"Calling ZAV Table initialization", "Calling ZAV Task Manager initialization",
-               "Calling ZAV RPC calls initialization", "Done calling ZAV initialization routines"}),
-        trace.details("zavmgmt"));
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
+    EXPECT_EQ(trace.details("zavmgmt"),
+              (Texts{"Calling ZAV Table initialization", "Calling ZAV Task Manager initialization",
+                     "Calling ZAV RPC calls initialization",
+                     "Done calling ZAV initialization routines"}));
     Texts initialisers;
     for (const TraceLine& line : trace.lines()) {
         const bool isEntry = line.level == 'F' && line.text.compare(0, 5, "Entry") == 0;
@@ -118,41 +118,41 @@ TEST_F(StartUp, RegistersEverythingInOrder) {
                                          line.function == "QVS_NCS_RegisterAgentInterface");
         if (isEntry && isOne) initialisers.push_back(line.function);
     }
-    EXPECT_EQ((Texts{"zav_kagreqt_init", "zav_kinagt_init", "zav_kagdyst_init", "zav_taskmgr_init",
-                     "QVS_NCS_RegisterAgentInterface"}),
-              initialisers);
-    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST"}), tableNames());
+    EXPECT_EQ(initialisers, (Texts{"zav_kagreqt_init", "zav_kinagt_init", "zav_kagdyst_init",
+                                   "zav_taskmgr_init", "QVS_NCS_RegisterAgentInterface"}));
+    EXPECT_EQ(tableNames(), (Texts{"KAGREQT", "KINAGT", "KAGDYST"}));
     EXPECT_TRUE(initialized);
-    EXPECT_EQ(9u, commands.size());
+    EXPECT_EQ(commands.size(), 9u);
 }
 
 TEST_F(StartUp, ASecondCallStartsNoSecondExecutor) {
     setHome(home().path());
-    ASSERT_EQ(0, Initialize_Mgmt_Functions());
+    ASSERT_EQ(Initialize_Mgmt_Functions(), 0);
     const std::ptrdiff_t threads = threadCount();
     zav_kagreqt_manager* const former = zav_kagreqt_static_manager;
-    EXPECT_EQ(0, Initialize_Mgmt_Functions());
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
     EXPECT_EQ(threads, threadCount());
-    EXPECT_NE(former, zav_kagreqt_static_manager);
-    EXPECT_EQ(9u, commands.size());
-    EXPECT_EQ((Texts{"KAGREQT", "KINAGT", "KAGDYST"}), tableNames());
+    EXPECT_NE(zav_kagreqt_static_manager, former);
+    EXPECT_EQ(commands.size(), 9u);
+    EXPECT_EQ(tableNames(), (Texts{"KAGREQT", "KINAGT", "KAGDYST"}));
 }
 
 TEST_F(StartUp, ARequestTravelsTheWholeWay) {
     setHome(home().path());
-    ASSERT_EQ(0, Initialize_Mgmt_Functions());
+    ASSERT_EQ(Initialize_Mgmt_Functions(), 0);
     Outcomes outcomes({{"TRANSID", OPER_EQ, "tx-1"}});
     oxa::Rows rows;
-    ASSERT_EQ(0, oxa::query("KAGREQT",
-                            {{"COMMAND", OPER_EQ, "START"},
-                             {"TRANSID", OPER_EQ, "tx-1"},
-                             {"PRODUCT", OPER_EQ, "ux"}},
-                            rows));
-    ASSERT_EQ(1u, rows.count());
+    ASSERT_EQ(oxa::query("KAGREQT",
+                         {{"COMMAND", OPER_EQ, "START"},
+                          {"TRANSID", OPER_EQ, "tx-1"},
+                          {"PRODUCT", OPER_EQ, "ux"}},
+                         rows),
+              0);
+    ASSERT_EQ(rows.count(), 1u);
     const auto found = outcomes.waitFor(1);
-    ASSERT_EQ(1u, found.size());
-    EXPECT_EQ(0, found[0].retval);
-    EXPECT_EQ("-h " + home().path() + " start ux", home().agentCalls().back());
+    ASSERT_EQ(found.size(), 1u);
+    EXPECT_EQ(found[0].retval, 0);
+    EXPECT_EQ(home().agentCalls().back(), "-h " + home().path() + " start ux");
 }
 
 }  // namespace

@@ -74,9 +74,9 @@ protected:
     }
     void bind() {
         const std::vector<Reply> answers = wire.ask(bindPacket());
-        ASSERT_EQ(1U, answers.size());
-        ASSERT_EQ(kBindAck, answers[0].type);
-        ASSERT_EQ(0U, answers[0].number(16, 2));
+        ASSERT_EQ(answers.size(), 1U);
+        ASSERT_EQ(answers[0].type, kBindAck);
+        ASSERT_EQ(answers[0].number(16, 2), 0U);
     }
     bool isOpen() const { return wire.association->isOpen(); }
 
@@ -94,22 +94,22 @@ TEST_F(AnAssociation, AcceptsAKnownInterfaceWithNdr) {
     for (const bool little : {true, false}) {
         Wire fresh;
         const std::vector<Reply> answers = fresh.ask(bindPacket({Context{}}, little, kBind, 4280));
-        ASSERT_EQ(1U, answers.size());
-        EXPECT_EQ(kBindAck, answers[0].type);
-        EXPECT_EQ(3, answers[0].flags);
-        EXPECT_EQ(7U, answers[0].callId);
-        EXPECT_EQ(4280U, answers[0].number(0, 2));
-        EXPECT_EQ(4280U, answers[0].number(2, 2));
-        EXPECT_NE(0U, answers[0].number(4, 4));
-        EXPECT_EQ(1U, answers[0].number(12, 1));
-        EXPECT_EQ(Result(0, 0), resultOf(answers[0], 0));
+        ASSERT_EQ(answers.size(), 1U);
+        EXPECT_EQ(answers[0].type, kBindAck);
+        EXPECT_EQ(answers[0].flags, 3);
+        EXPECT_EQ(answers[0].callId, 7U);
+        EXPECT_EQ(answers[0].number(0, 2), 4280U);
+        EXPECT_EQ(answers[0].number(2, 2), 4280U);
+        EXPECT_NE(answers[0].number(4, 4), 0U);
+        EXPECT_EQ(answers[0].number(12, 1), 1U);
+        EXPECT_EQ(resultOf(answers[0], 0), Result(0, 0));
         EXPECT_TRUE(fresh.association->isBound());
     }
 }
 
 TEST_F(AnAssociation, KeepsTheGroupThatAClientNames) {
-    EXPECT_EQ(0xABCDU,
-              wire.ask(bindPacket({Context{}}, true, kBind, 4280, 0xABCD))[0].number(4, 4));
+    EXPECT_EQ(wire.ask(bindPacket({Context{}}, true, kBind, 4280, 0xABCD))[0].number(4, 4),
+              0xABCDU);
 }
 
 TEST_F(AnAssociation, SaysWhyItRejectsAContext) {
@@ -121,13 +121,13 @@ TEST_F(AnAssociation, SaysWhyItRejectsAContext) {
     oldSyntax.syntaxVersion = 1;
     const std::vector<Reply> answers = wire.ask(
         bindPacket({unknown, wrongVersion, wrongMinor, wrongSyntax, oldSyntax, Context{}}));
-    ASSERT_EQ(1U, answers.size());
-    EXPECT_EQ(Result(2, 1), resultOf(answers[0], 0));
-    EXPECT_EQ(Result(2, 1), resultOf(answers[0], 1));
-    EXPECT_EQ(Result(2, 1), resultOf(answers[0], 2));
-    EXPECT_EQ(Result(2, 2), resultOf(answers[0], 3));
-    EXPECT_EQ(Result(2, 2), resultOf(answers[0], 4));
-    EXPECT_EQ(Result(0, 0), resultOf(answers[0], 5));
+    ASSERT_EQ(answers.size(), 1U);
+    EXPECT_EQ(resultOf(answers[0], 0), Result(2, 1));
+    EXPECT_EQ(resultOf(answers[0], 1), Result(2, 1));
+    EXPECT_EQ(resultOf(answers[0], 2), Result(2, 1));
+    EXPECT_EQ(resultOf(answers[0], 3), Result(2, 2));
+    EXPECT_EQ(resultOf(answers[0], 4), Result(2, 2));
+    EXPECT_EQ(resultOf(answers[0], 5), Result(0, 0));
     EXPECT_TRUE(isOpen());
 }
 
@@ -135,7 +135,7 @@ TEST_F(AnAssociation, FindsNdrAmongSeveralTransferSyntaxes) {
     Packet packet(kBind, 1);
     packet.u16(4280).u16(4280).u32(0).u8(1).u8(0).u16(0);
     packet.u16(0).u8(2).u8(0).id(kEcho).u32(1).id(kEcho).u32(1).id(kNdr).u32(2);
-    EXPECT_EQ(Result(0, 0), resultOf(wire.ask(packet.done())[0], 0));
+    EXPECT_EQ(resultOf(wire.ask(packet.done())[0], 0), Result(0, 0));
 }
 
 TEST_F(AnAssociation, HasALimitOfContexts) {
@@ -143,24 +143,24 @@ TEST_F(AnAssociation, HasALimitOfContexts) {
     for (std::uint16_t i = 0; i < 40; ++i)
         many[i].id = i;
     const std::vector<Reply> answers = wire.ask(bindPacket(many));
-    EXPECT_EQ(Result(0, 0), resultOf(answers[0], 31));
-    EXPECT_EQ(Result(2, 3), resultOf(answers[0], 32));
+    EXPECT_EQ(resultOf(answers[0], 31), Result(0, 0));
+    EXPECT_EQ(resultOf(answers[0], 32), Result(2, 3));
     EXPECT_TRUE(isOpen());
 }
 
 TEST_F(AnAssociation, KeepsFragmentsBetweenWhatAllTakeAndWhatFits) {
-    EXPECT_EQ(1432U, wire.ask(bindPacket({Context{}}, true, kBind, 10))[0].number(0, 2));
+    EXPECT_EQ(wire.ask(bindPacket({Context{}}, true, kBind, 10))[0].number(0, 2), 1432U);
     Wire other;
-    EXPECT_EQ(65528U, other.ask(bindPacket({Context{}}, true, kBind, 65535))[0].number(2, 2));
+    EXPECT_EQ(other.ask(bindPacket({Context{}}, true, kBind, 65535))[0].number(2, 2), 65528U);
 }
 
 TEST_F(AnAssociation, RefusesABindOfAnotherVersion) {
     std::string packet = bindPacket();
     packet[1] = 2;
     const std::vector<Reply> answers = wire.ask(packet);
-    ASSERT_EQ(1U, answers.size());
-    EXPECT_EQ(kBindNak, answers[0].type);
-    EXPECT_EQ(4U, answers[0].number(0, 2));
+    ASSERT_EQ(answers.size(), 1U);
+    EXPECT_EQ(answers[0].type, kBindNak);
+    EXPECT_EQ(answers[0].number(0, 2), 4U);
     EXPECT_FALSE(isOpen());
 }
 
@@ -168,26 +168,26 @@ TEST_F(AnAssociation, RefusesAuthentication) {
     std::string packet = Packet(kBind).raw(bindPacket().substr(16)).raw("12345678AUTH").done();
     packet[10] = 4;
     const std::vector<Reply> answers = wire.ask(packet);
-    ASSERT_EQ(1U, answers.size());
-    EXPECT_EQ(kBindNak, answers[0].type);
-    EXPECT_EQ(8U, answers[0].number(0, 2));
+    ASSERT_EQ(answers.size(), 1U);
+    EXPECT_EQ(answers[0].type, kBindNak);
+    EXPECT_EQ(answers[0].number(0, 2), 8U);
     EXPECT_FALSE(isOpen());
 }
 
 TEST_F(AnAssociation, RefusesABindInPiecesASecondBindAndOneThatHoldsTooLittle) {
     std::string first = bindPacket();
     first[3] = 1;
-    EXPECT_EQ(kBindNak, wire.ask(first)[0].type);
+    EXPECT_EQ(wire.ask(first)[0].type, kBindNak);
     EXPECT_FALSE(isOpen());
 
     Wire second;
     second.feed(bindPacket());
     second.answers();
-    EXPECT_EQ(kBindNak, second.ask(bindPacket())[0].type);
+    EXPECT_EQ(second.ask(bindPacket())[0].type, kBindNak);
     EXPECT_FALSE(second.association->isOpen());
 
     Wire third;
-    EXPECT_EQ(kBindNak, third.ask(Packet(kBind).u32(0).done())[0].type);
+    EXPECT_EQ(third.ask(Packet(kBind).u32(0).done())[0].type, kBindNak);
     EXPECT_FALSE(third.association->isOpen());
 }
 
@@ -196,26 +196,26 @@ TEST_F(AnAssociation, AnswersACall) {
     for (const bool little : {true, false}) {
         const std::vector<Reply> answers =
             wire.ask(requestPackets(kRepeat, "stub data", 65504, 0x01020304, little));
-        ASSERT_EQ(1U, answers.size());
-        EXPECT_EQ(kResponse, answers[0].type);
-        EXPECT_EQ(3, answers[0].flags);
-        EXPECT_EQ(0x01020304U, answers[0].callId);
-        EXPECT_EQ(9U, answers[0].number(0, 4));
-        EXPECT_EQ("stub data", answers[0].stub());
+        ASSERT_EQ(answers.size(), 1U);
+        EXPECT_EQ(answers[0].type, kResponse);
+        EXPECT_EQ(answers[0].flags, 3);
+        EXPECT_EQ(answers[0].callId, 0x01020304U);
+        EXPECT_EQ(answers[0].number(0, 4), 9U);
+        EXPECT_EQ(answers[0].stub(), "stub data");
     }
-    EXPECT_EQ(2U, wire.shared.calls);
-    EXPECT_EQ(2U, wire.association->requestsDone());
+    EXPECT_EQ(wire.shared.calls, 2U);
+    EXPECT_EQ(wire.association->requestsDone(), 2U);
 }
 
 TEST_F(AnAssociation, TellsTheStubTheCallersByteOrderManagerAndHandle) {
     bind();
-    EXPECT_EQ(std::string("\1\1\1"), wire.ask(fragment(3, kOrder, "", 1, true))[0].stub());
-    EXPECT_EQ(std::string("\0\1\1", 3), wire.ask(fragment(3, kOrder, "", 1, false))[0].stub());
+    EXPECT_EQ(wire.ask(fragment(3, kOrder, "", 1, true))[0].stub(), std::string("\1\1\1"));
+    EXPECT_EQ(wire.ask(fragment(3, kOrder, "", 1, false))[0].stub(), std::string("\0\1\1", 3));
 }
 
 TEST_F(AnAssociation, TakesNoNoticeOfAnObject) {
     bind();
-    EXPECT_EQ("abc", wire.ask(fragment(0x83, kRepeat, "abc"))[0].stub());
+    EXPECT_EQ(wire.ask(fragment(0x83, kRepeat, "abc"))[0].stub(), "abc");
 }
 
 TEST_F(AnAssociation, PutsFragmentsTogetherWhereverTheyAreCut) {
@@ -225,7 +225,7 @@ TEST_F(AnAssociation, PutsFragmentsTogetherWhereverTheyAreCut) {
         for (const std::size_t portion : {1U, 7U, 24U, 25U, 1000U}) {
             wire.feed(requestPackets(kRepeat, stub, part), portion);
             const std::vector<Reply> answers = wire.answers();
-            ASSERT_EQ(1U, answers.size()) << part << " " << portion;
+            ASSERT_EQ(answers.size(), 1U) << part << " " << portion;
             EXPECT_EQ(stub, answers[0].stub()) << part << " " << portion;
         }
     }
@@ -253,7 +253,7 @@ TEST_F(AnAssociation, AnswersRequestsThatComeOneBehindTheOther) {
     for (const std::size_t portion : {1U, 100U, 100'000U}) {
         wire.feed(packets, portion);
         const std::vector<Reply> answers = wire.answers();
-        ASSERT_EQ(500U, answers.size());
+        ASSERT_EQ(answers.size(), 500U);
         for (std::uint32_t i = 0; i < 500; ++i) {
             EXPECT_EQ(i, answers[i].callId);
             EXPECT_EQ(std::to_string(i), answers[i].stub());
@@ -263,18 +263,20 @@ TEST_F(AnAssociation, AnswersRequestsThatComeOneBehindTheOther) {
 
 TEST_F(AnAssociation, EmptyFragmentsAndAnEmptyRequestAreGood) {
     bind();
-    EXPECT_EQ("", wire.ask(fragment(3, kRepeat, ""))[0].stub());
-    EXPECT_EQ("ab", wire.ask(fragment(1, kRepeat, "") + fragment(0, kRepeat, "ab") +
-                             fragment(0, kRepeat, "") + fragment(2, kRepeat, ""))[0]
-                        .stub());
+    EXPECT_EQ(wire.ask(fragment(3, kRepeat, ""))[0].stub(), "");
+    EXPECT_EQ(wire.ask(fragment(1, kRepeat, "") + fragment(0, kRepeat, "ab") +
+                       fragment(0, kRepeat, "") + fragment(2, kRepeat, ""))[0]
+                  .stub(),
+              "ab");
 }
 
 TEST_F(AnAssociation, AnAllocationHintIsOnlyAHint) {
     bind();
     for (const std::uint32_t hint : {0U, 1U, 3U, 1000U, 0xFFFFFFFFU}) {
-        EXPECT_EQ("abc", wire.ask(fragment(1, kRepeat, "a", 1, true, 0, hint) +
-                                  fragment(2, kRepeat, "bc", 1, true, 0, hint))[0]
-                             .stub());
+        EXPECT_EQ(wire.ask(fragment(1, kRepeat, "a", 1, true, 0, hint) +
+                           fragment(2, kRepeat, "bc", 1, true, 0, hint))[0]
+                      .stub(),
+                  "abc");
     }
 }
 
@@ -287,7 +289,7 @@ TEST_F(AnAssociation, NoTruncatedRequestIsAnsweredOrCalled) {
         fresh.feed(request.substr(0, length));
         EXPECT_TRUE(fresh.answers().empty()) << length;
         EXPECT_EQ(length > 0, fresh.association->isMidRequest()) << length;
-        EXPECT_EQ(0, callsOfRepeat()) << length;
+        EXPECT_EQ(callsOfRepeat(), 0) << length;
     }
 }
 
@@ -303,23 +305,23 @@ TEST_F(AnAssociation, NoTruncatedBindIsAnswered) {
 
 TEST_F(AnAssociation, ARequestOfExactlyTheLimitPassesAndOneByteMoreIsAFault) {
     bind();
-    EXPECT_EQ(65'536U, stubOf(wire.ask(requestPackets(kRepeat, std::string(kLimit, 'x')))).size());
+    EXPECT_EQ(stubOf(wire.ask(requestPackets(kRepeat, std::string(kLimit, 'x')))).size(), 65'536U);
     const std::vector<Reply> answers =
         wire.ask(requestPackets(kRepeat, std::string(kLimit + 1, 'x')));
-    ASSERT_EQ(1U, answers.size());
-    EXPECT_EQ(kFault, answers[0].type);
-    EXPECT_EQ(0x1C00001BU, answers[0].fault());
-    EXPECT_EQ(0x23, answers[0].flags);
-    EXPECT_EQ(1, callsOfRepeat());
-    EXPECT_EQ("next", wire.ask(requestPackets(kRepeat, "next"))[0].stub());
+    ASSERT_EQ(answers.size(), 1U);
+    EXPECT_EQ(answers[0].type, kFault);
+    EXPECT_EQ(answers[0].fault(), 0x1C00001BU);
+    EXPECT_EQ(answers[0].flags, 0x23);
+    EXPECT_EQ(callsOfRepeat(), 1);
+    EXPECT_EQ(wire.ask(requestPackets(kRepeat, "next"))[0].stub(), "next");
 }
 
 TEST_F(AnAssociation, WithoutMemoryForAllACallIsAFaultAndLaterOnesPass) {
     Wire poor(kLimit, 50'000);
     poor.feed(bindPacket());
     poor.answers();
-    EXPECT_EQ(0x1C00001BU, poor.ask(requestPackets(kRepeat, std::string(50'001, 'x')))[0].fault());
-    EXPECT_EQ(50'000U, stubOf(poor.ask(requestPackets(kRepeat, std::string(50'000, 'x')))).size());
+    EXPECT_EQ(poor.ask(requestPackets(kRepeat, std::string(50'001, 'x')))[0].fault(), 0x1C00001BU);
+    EXPECT_EQ(stubOf(poor.ask(requestPackets(kRepeat, std::string(50'000, 'x')))).size(), 50'000U);
 }
 
 TEST_F(AnAssociation, GivesMemoryBackWhenItEndsInTheMiddleOfARequest) {
@@ -353,15 +355,15 @@ TEST_F(AnAssociation, FaultsLeaveTheAssociationUsable) {
         for (const std::size_t portion : {1U, 100'000U}) {
             wire.feed(c.request, portion);
             const std::vector<Reply> answers = wire.answers();
-            ASSERT_EQ(1U, answers.size());
-            EXPECT_EQ(kFault, answers[0].type);
-            EXPECT_EQ(c.fault, answers[0].fault());
-            EXPECT_EQ(c.flags, answers[0].flags);
-            EXPECT_EQ(5U, answers[0].callId);
+            ASSERT_EQ(answers.size(), 1U);
+            EXPECT_EQ(answers[0].type, kFault);
+            EXPECT_EQ(answers[0].fault(), c.fault);
+            EXPECT_EQ(answers[0].flags, c.flags);
+            EXPECT_EQ(answers[0].callId, 5U);
             EXPECT_TRUE(isOpen());
         }
     }
-    EXPECT_EQ("good", wire.ask(requestPackets(kRepeat, "good"))[0].stub());
+    EXPECT_EQ(wire.ask(requestPackets(kRepeat, "good"))[0].stub(), "good");
 }
 
 TEST_F(AnAssociation, RejectedContextsCannotBeCalled) {
@@ -369,20 +371,20 @@ TEST_F(AnAssociation, RejectedContextsCannotBeCalled) {
     unknown.interface = kUnknown;
     wire.feed(bindPacket({unknown}));
     wire.answers();
-    EXPECT_EQ(0x1C010003U, wire.ask(fragment(3, kRepeat, "x"))[0].fault());
+    EXPECT_EQ(wire.ask(fragment(3, kRepeat, "x"))[0].fault(), 0x1C010003U);
 }
 
 TEST_F(AnAssociation, AlterContextAddsContexts) {
     bind();
     Context second;
     second.id = 5;
-    EXPECT_EQ(0x1C010003U, wire.ask(fragment(3, kRepeat, "x", 1, true, 5))[0].fault());
+    EXPECT_EQ(wire.ask(fragment(3, kRepeat, "x", 1, true, 5))[0].fault(), 0x1C010003U);
     const std::vector<Reply> answers = wire.ask(bindPacket({second}, true, kAlter));
-    ASSERT_EQ(1U, answers.size());
-    EXPECT_EQ(kAlterResponse, answers[0].type);
-    EXPECT_EQ(Result(0, 0), resultOf(answers[0], 0));
-    EXPECT_EQ("x", wire.ask(fragment(3, kRepeat, "x", 1, true, 5))[0].stub());
-    EXPECT_EQ("y", wire.ask(fragment(3, kRepeat, "y"))[0].stub());
+    ASSERT_EQ(answers.size(), 1U);
+    EXPECT_EQ(answers[0].type, kAlterResponse);
+    EXPECT_EQ(resultOf(answers[0], 0), Result(0, 0));
+    EXPECT_EQ(wire.ask(fragment(3, kRepeat, "x", 1, true, 5))[0].stub(), "x");
+    EXPECT_EQ(wire.ask(fragment(3, kRepeat, "y"))[0].stub(), "y");
 }
 
 TEST_F(AnAssociation, LargeRepliesComeInFragments) {
@@ -390,7 +392,7 @@ TEST_F(AnAssociation, LargeRepliesComeInFragments) {
     wire.answers();
     const std::vector<Reply> answers = wire.ask(fragment(3, kFill, ""));
     EXPECT_EQ((65'536U + 1407) / 1408, answers.size());
-    EXPECT_EQ(std::string(65'536, 'f'), stubOf(answers));
+    EXPECT_EQ(stubOf(answers), std::string(65'536, 'f'));
 }
 
 TEST_F(AnAssociation, WaitsWithRequestsWhileItsAnswersAreNotTaken) {
@@ -412,13 +414,13 @@ TEST_F(AnAssociation, WaitsWithRequestsWhileItsAnswersAreNotTaken) {
         wire.association->output().clear();
         wire.association->handle();
     }
-    EXPECT_EQ(100U, answered);
+    EXPECT_EQ(answered, 100U);
 }
 
 TEST_F(AnAssociation, ACallerThatWantsNoAnswerGetsNone) {
     bind();
     EXPECT_TRUE(wire.ask(fragment(0x43, kRepeat, "x")).empty());
-    EXPECT_EQ(1, callsOfRepeat());
+    EXPECT_EQ(callsOfRepeat(), 1);
     EXPECT_TRUE(wire.ask(fragment(0x43, kRefuse, "x")).empty());
     EXPECT_TRUE(isOpen());
 }
@@ -426,20 +428,22 @@ TEST_F(AnAssociation, ACallerThatWantsNoAnswerGetsNone) {
 TEST_F(AnAssociation, CancelsComeTooLateAndAreIgnored) {
     bind();
     EXPECT_TRUE(wire.ask(Packet(kCancel).done()).empty());
-    EXPECT_EQ("ab", wire.ask(fragment(1, kRepeat, "a") + Packet(kCancel).done() +
-                             fragment(2, kRepeat, "b"))[0]
-                        .stub());
+    EXPECT_EQ(
+        wire.ask(fragment(1, kRepeat, "a") + Packet(kCancel).done() + fragment(2, kRepeat, "b"))[0]
+            .stub(),
+        "ab");
 }
 
 TEST_F(AnAssociation, AnOrphanedCallIsForgotten) {
     bind();
     EXPECT_TRUE(wire.ask(fragment(1, kRepeat, "a", 4) + Packet(kOrphaned, 4).done()).empty());
-    EXPECT_EQ(0, callsOfRepeat());
-    EXPECT_EQ("b", wire.ask(fragment(3, kRepeat, "b", 5))[0].stub());
+    EXPECT_EQ(callsOfRepeat(), 0);
+    EXPECT_EQ(wire.ask(fragment(3, kRepeat, "b", 5))[0].stub(), "b");
     EXPECT_TRUE(wire.ask(Packet(kOrphaned, 5).done()).empty());
-    EXPECT_EQ("ab", wire.ask(fragment(1, kRepeat, "a", 6) + Packet(kOrphaned, 5).done() +
-                             fragment(2, kRepeat, "b", 6))[0]
-                        .stub());
+    EXPECT_EQ(wire.ask(fragment(1, kRepeat, "a", 6) + Packet(kOrphaned, 5).done() +
+                       fragment(2, kRepeat, "b", 6))[0]
+                  .stub(),
+              "ab");
 }
 
 TEST_F(AnAssociation, WhatBreaksTheProtocolGetsAFaultAndTheEnd) {
@@ -490,13 +494,13 @@ TEST_F(AnAssociation, WhatBreaksTheProtocolGetsAFaultAndTheEnd) {
             fresh.feed(c, portion);
             const std::vector<Reply> answers = fresh.answers();
             ASSERT_FALSE(answers.empty()) << number;
-            EXPECT_EQ(kFault, answers.back().type) << number;
-            EXPECT_EQ(0x1C01000BU, answers.back().fault()) << number;
+            EXPECT_EQ(answers.back().type, kFault) << number;
+            EXPECT_EQ(answers.back().fault(), 0x1C01000BU) << number;
             EXPECT_FALSE(fresh.association->isOpen()) << number;
         }
         ++number;
     }
-    EXPECT_EQ(0, callsOfRepeat());
+    EXPECT_EQ(callsOfRepeat(), 0);
 }
 
 TEST_F(AnAssociation, WhatIsNoPacketAtAllGetsNothing) {
@@ -508,7 +512,7 @@ TEST_F(AnAssociation, ControlPacketsStandBetweenFragmentsOfACall) {
     bind();
     const std::string head(60'000, 'h');
     wire.feed(fragment(1, kRepeat, head) + Packet(kCancel).done() + fragment(2, kRepeat, "t"), 777);
-    EXPECT_EQ(head + "t", stubOf(wire.answers()));
+    EXPECT_EQ(stubOf(wire.answers()), head + "t");
 }
 
 TEST_F(AnAssociation, ALaterRegistrationServesBoundCallers) {
@@ -518,9 +522,9 @@ TEST_F(AnAssociation, ALaterRegistrationServesBoundCallers) {
     static constexpr rpc__if_spec kSmaller = {"echo", kEcho, 1, 1};
     std::uint32_t status = 1;
     rpc__register_mgr(&uuid__nil, &kSmaller, &kVector, nullptr, &status);
-    ASSERT_EQ(0U, status);
-    EXPECT_EQ(0x6F7U, wire.ask(fragment(3, kRepeat, "x"))[0].fault());
-    EXPECT_EQ(0x1C010002U, wire.ask(fragment(3, kOrder, "x"))[0].fault());
+    ASSERT_EQ(status, 0U);
+    EXPECT_EQ(wire.ask(fragment(3, kRepeat, "x"))[0].fault(), 0x6F7U);
+    EXPECT_EQ(wire.ask(fragment(3, kOrder, "x"))[0].fault(), 0x1C010002U);
     registerEcho();
 }
 

@@ -26,9 +26,9 @@ TEST_F(Blocks, HoldWhatWasAskedForAndAreAligned) {
                                    64 * kKiB, 4 * kMiB, 4 * kMiB + 1, 8 * kMiB, 9 * kMiB}) {
         std::size_t capacity = 0;
         void* const block = ncs::takeBlock(size, &capacity);
-        ASSERT_NE(nullptr, block);
+        ASSERT_NE(block, nullptr);
         EXPECT_GE(capacity, size);
-        EXPECT_EQ(0U, reinterpret_cast<std::uintptr_t>(block) % alignof(std::max_align_t));
+        EXPECT_EQ(reinterpret_cast<std::uintptr_t>(block) % alignof(std::max_align_t), 0U);
         std::memset(block, 'x', capacity);
         ncs::giveBlock(block);
     }
@@ -40,14 +40,14 @@ TEST_F(Blocks, TheLatestLargeOneIsUsedAgain) {
     EXPECT_EQ(4 * kMiB, ncs::keptBytes());
     void* const second = rpc__malloc(4 * kMiB);
     EXPECT_EQ(first, second);
-    EXPECT_EQ(0U, ncs::keptBytes());
+    EXPECT_EQ(ncs::keptBytes(), 0U);
     rpc__free(second);
 }
 
 TEST_F(Blocks, SmallOnesAreNotKept) {
     rpc__free(rpc__malloc(100));
     rpc__free(rpc__malloc(32 * kKiB));
-    EXPECT_EQ(0U, ncs::keptBytes());
+    EXPECT_EQ(ncs::keptBytes(), 0U);
 }
 
 TEST_F(Blocks, FewAreKeptAndReleasedOnDemand) {
@@ -58,7 +58,7 @@ TEST_F(Blocks, FewAreKeptAndReleasedOnDemand) {
         rpc__free(block);
     EXPECT_EQ(16 * kMiB, ncs::keptBytes());
     ncs::releaseKeptBlocks();
-    EXPECT_EQ(0U, ncs::keptBytes());
+    EXPECT_EQ(ncs::keptBytes(), 0U);
 }
 
 TEST(Buffer, KeepsItsContentWhileItGrows) {
@@ -69,9 +69,9 @@ TEST(Buffer, KeepsItsContentWhileItGrows) {
         std::memset(buffer.end(), static_cast<int>(i % 251), 1000);
         buffer.grow(1000);
     }
-    EXPECT_EQ(1'000'000U, buffer.size());
+    EXPECT_EQ(buffer.size(), 1'000'000U);
     for (std::size_t i = 0; i < 1'000'000; ++i) {
-        ASSERT_EQ(i / 1000 % 251, buffer.data()[i]);
+        ASSERT_EQ(buffer.data()[i], i / 1000 % 251);
     }
 }
 

@@ -32,11 +32,11 @@ TEST_P(BothOrders, AHeaderIsRead) {
     ncs::PduHeader header;
     ASSERT_EQ(ncs::HeaderProblem::None, decode(packet, header));
     EXPECT_TRUE(header.is(ncs::PduType::Request));
-    EXPECT_EQ(0x83, header.flags);
+    EXPECT_EQ(header.flags, 0x83);
     EXPECT_EQ(GetParam(), header.littleEndian);
-    EXPECT_EQ(20, header.fragmentLength);
-    EXPECT_EQ(0, header.authLength);
-    EXPECT_EQ(0x12345678U, header.callId);
+    EXPECT_EQ(header.fragmentLength, 20);
+    EXPECT_EQ(header.authLength, 0);
+    EXPECT_EQ(header.callId, 0x12345678U);
 }
 
 TEST_P(BothOrders, ARequestsHeadIsRead) {
@@ -47,10 +47,10 @@ TEST_P(BothOrders, ARequestsHeadIsRead) {
         ASSERT_EQ(ncs::HeaderProblem::None, decode(packet, header));
         EXPECT_EQ(hasObject ? 40U : 24U, ncs::requestHeadSize(header));
         const ncs::RequestHead head = ncs::decodeRequestHead(bytesOf(packet), header);
-        EXPECT_EQ(0x05060708U, head.allocationHint);
-        EXPECT_EQ(0x0304, head.contextId);
-        EXPECT_EQ(0x0102, head.operation);
-        EXPECT_EQ("stub", packet.substr(head.size));
+        EXPECT_EQ(head.allocationHint, 0x05060708U);
+        EXPECT_EQ(head.contextId, 0x0304);
+        EXPECT_EQ(head.operation, 0x0102);
+        EXPECT_EQ(packet.substr(head.size), "stub");
     }
 }
 
@@ -64,15 +64,15 @@ TEST_P(BothOrders, ABindIsRead) {
     ncs::BindRequest bind;
     ASSERT_EQ(ncs::HeaderProblem::None, decode(packet, header));
     ASSERT_TRUE(ncs::decodeBind(bytesOf(packet), packet.size(), header, bind));
-    EXPECT_EQ(4280, bind.largestSent);
-    EXPECT_EQ(4280, bind.largestTaken);
-    EXPECT_EQ(0x0A0B0C0DU, bind.associationGroup);
-    ASSERT_EQ(2U, bind.contexts.size());
+    EXPECT_EQ(bind.largestSent, 4280);
+    EXPECT_EQ(bind.largestTaken, 4280);
+    EXPECT_EQ(bind.associationGroup, 0x0A0B0C0DU);
+    ASSERT_EQ(bind.contexts.size(), 2U);
     EXPECT_TRUE(ncs::operator==(bind.contexts[0].interface, kEcho));
-    EXPECT_EQ(1U, bind.contexts[0].version);
+    EXPECT_EQ(bind.contexts[0].version, 1U);
     EXPECT_TRUE(bind.contexts[0].offersNdr);
-    EXPECT_EQ(0x0203, bind.contexts[1].id);
-    EXPECT_EQ(0x00010002U, bind.contexts[1].version);
+    EXPECT_EQ(bind.contexts[1].id, 0x0203);
+    EXPECT_EQ(bind.contexts[1].version, 0x00010002U);
     EXPECT_FALSE(bind.contexts[1].offersNdr);
 }
 
@@ -143,37 +143,35 @@ TEST(Encoding, ABindAnswerHasItsBytes) {
     std::string out = "before";
     ncs::encodeBindAnswer(ncs::PduType::BindAck, 0x01020304, answer, out);
     EXPECT_EQ(
+        out,
         "before" + bytes({5,    0,    12,   3,    0x10, 0,    0,    0,    84,   0,    0,    0,
                           4,    3,    2,    1,    0x22, 0x11, 0x44, 0x33, 0x88, 0x77, 0x66, 0x55,
                           5,    0,    '1',  '0',  '2',  '4',  0,    0,    2,    0,    0,    0,
                           0,    0,    0,    0,    0x04, 0x5d, 0x88, 0x8a, 0xeb, 0x1c, 0xc9, 0x11,
                           0x9f, 0xe8, 0x08, 0x00, 0x2b, 0x10, 0x48, 0x60, 2,    0,    0,    0,
                           2,    0,    1,    0,    0,    0,    0,    0,    0,    0,    0,    0,
-                          0,    0,    0,    0,    0,    0,    0,    0,    0,    0,    0,    0}),
-        out);
+                          0,    0,    0,    0,    0,    0,    0,    0,    0,    0,    0,    0}));
 }
 
 TEST(Encoding, WithoutAPortTheTextIsEmpty) {
     ncs::BindAnswer answer;
     std::string out;
     ncs::encodeBindAnswer(ncs::PduType::AlterContextResponse, 1, answer, out);
-    EXPECT_EQ(bytes({5, 0, 15, 3, 0x10, 0, 0, 0, 32, 0, 0, 0, 1, 0, 0, 0,
-                     0, 0, 0,  0, 0,    0, 0, 0, 0,  0, 0, 0, 0, 0, 0, 0}),
-              out);
+    EXPECT_EQ(out, bytes({5, 0, 15, 3, 0x10, 0, 0, 0, 32, 0, 0, 0, 1, 0, 0, 0,
+                          0, 0, 0,  0, 0,    0, 0, 0, 0,  0, 0, 0, 0, 0, 0, 0}));
 }
 
 TEST(Encoding, ARefusedBindHasItsBytes) {
     std::string out;
     ncs::encodeBindRefusal(1, ncs::BindRefusal::Version, out);
-    EXPECT_EQ(bytes({5, 0, 13, 3, 0x10, 0, 0, 0, 21, 0, 0, 0, 1, 0, 0, 0, 4, 0, 1, 5, 0}), out);
+    EXPECT_EQ(out, bytes({5, 0, 13, 3, 0x10, 0, 0, 0, 21, 0, 0, 0, 1, 0, 0, 0, 4, 0, 1, 5, 0}));
 }
 
 TEST(Encoding, AFaultHasItsBytes) {
     std::string out;
     ncs::encodeFault(1, 0x0203, 0x1C010003, ncs::kDidNotExecute, out);
-    EXPECT_EQ(bytes({5, 0, 3, 0x23, 0x10, 0, 0, 0, 32, 0, 0, 0,    1, 0, 0, 0,
-                     0, 0, 0, 0,    3,    2, 0, 0, 3,  0, 1, 0x1C, 0, 0, 0, 0}),
-              out);
+    EXPECT_EQ(out, bytes({5, 0, 3, 0x23, 0x10, 0, 0, 0, 32, 0, 0, 0,    1, 0, 0, 0,
+                          0, 0, 0, 0,    3,    2, 0, 0, 3,  0, 1, 0x1C, 0, 0, 0, 0}));
 }
 
 TEST(Encoding, AResponseIsCutAtMultiplesOfEight) {
@@ -189,7 +187,7 @@ TEST(Encoding, AResponseIsCutAtMultiplesOfEight) {
             EXPECT_EQ((i == 0 ? 1 : 0) | (isLast ? 2 : 0), fragments[i].flags);
             EXPECT_TRUE(isLast || fragments[i].stub().size() % 8 == 0);
             EXPECT_EQ(length - i * 1408, fragments[i].number(0, 4));
-            EXPECT_EQ(4U, fragments[i].number(4, 2));
+            EXPECT_EQ(fragments[i].number(4, 2), 4U);
         }
     }
 }

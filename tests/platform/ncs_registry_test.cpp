@@ -21,32 +21,32 @@ std::uint32_t registerWith(const void* manager, const uuid__t& object = uuid__ni
 
 TEST(Registry, FindsAnInterfaceByItsIdentifierAndVersion) {
     const int manager = 0;
-    ASSERT_EQ(rpc__s_ok, registerWith(&manager));
+    ASSERT_EQ(registerWith(&manager), rpc__s_ok);
     ncs::RegisteredInterface found;
     ASSERT_TRUE(ncs::findInterface(kId, 3, found));
-    EXPECT_EQ(&kInterface, found.interface);
-    EXPECT_EQ(&kStubs, found.stubs);
-    EXPECT_EQ(&manager, found.manager);
+    EXPECT_EQ(found.interface, &kInterface);
+    EXPECT_EQ(found.stubs, &kStubs);
+    EXPECT_EQ(found.manager, &manager);
 }
 
 TEST(Registry, FindsNoOtherVersionOrIdentifier) {
-    ASSERT_EQ(rpc__s_ok, registerWith(nullptr));
+    ASSERT_EQ(registerWith(nullptr), rpc__s_ok);
     ncs::RegisteredInterface found;
     EXPECT_FALSE(ncs::findInterface(kId, 2, found));
     EXPECT_FALSE(ncs::findInterface(kOtherId, 3, found));
-    EXPECT_EQ(nullptr, found.interface);
+    EXPECT_EQ(found.interface, nullptr);
 }
 
 TEST(Registry, ASecondRegistrationReplacesTheFirst) {
     const int first = 0;
     const int second = 0;
-    ASSERT_EQ(rpc__s_ok, registerWith(&first));
+    ASSERT_EQ(registerWith(&first), rpc__s_ok);
     const unsigned count = ncs::registeredCount();
-    ASSERT_EQ(rpc__s_ok, registerWith(&second));
+    ASSERT_EQ(registerWith(&second), rpc__s_ok);
     EXPECT_EQ(count, ncs::registeredCount());
     ncs::RegisteredInterface found;
     ASSERT_TRUE(ncs::findInterface(kId, 3, found));
-    EXPECT_EQ(&second, found.manager);
+    EXPECT_EQ(found.manager, &second);
 }
 
 TEST(Registry, TakesNoManagersOfObjectsNorStubsOfAnotherCount) {

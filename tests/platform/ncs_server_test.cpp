@@ -82,7 +82,7 @@ void registerClosedGate() {
     static constexpr rpc__if_spec kSpecification = {"gate", kGate, 1, 1};
     std::uint32_t status = 1;
     rpc__register_mgr(&uuid__nil, &kSpecification, &kVector, nullptr, &status);
-    ASSERT_EQ(0U, status);
+    ASSERT_EQ(status, 0U);
 }
 
 /// A blocking client.
@@ -172,8 +172,8 @@ protected:
         address.sun_family = AF_UNIX;
         scratch.path("rpc").copy(address.sun_path, sizeof address.sun_path - 1);
         listener = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-        EXPECT_EQ(0, ::bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address));
-        EXPECT_EQ(0, ::listen(listener, 128));
+        EXPECT_EQ(::bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+        EXPECT_EQ(::listen(listener, 128), 0);
     }
     ~AServer() override {
         server.reset();
@@ -188,7 +188,7 @@ protected:
         address.sun_family = AF_UNIX;
         scratch.path("rpc").copy(address.sun_path, sizeof address.sun_path - 1);
         const int made = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-        EXPECT_EQ(0, ::connect(made, reinterpret_cast<sockaddr*>(&address), sizeof address));
+        EXPECT_EQ(::connect(made, reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
         return Client(made);
     }
     /// Waits until the counts are as wanted.
@@ -215,27 +215,27 @@ TEST_F(AServer, AnswersOverAUnixSocket) {
     start();
     Client client = connect();
     ASSERT_TRUE(client.bind());
-    EXPECT_EQ("hello", client.repeat("hello"));
-    EXPECT_EQ(1U, server->counts().connections);
-    EXPECT_EQ(1U, server->counts().accepted);
-    EXPECT_EQ(1U, server->counts().calls);
+    EXPECT_EQ(client.repeat("hello"), "hello");
+    EXPECT_EQ(server->counts().connections, 1U);
+    EXPECT_EQ(server->counts().accepted, 1U);
+    EXPECT_EQ(server->counts().calls, 1U);
 }
 
 TEST_F(AServer, AnswersOverTcpOnLoopbackAndNamesItsPort) {
     start();
     const std::uint16_t port = server->listenOnLoopback(0);
-    ASSERT_NE(0, port);
+    ASSERT_NE(port, 0);
     sockaddr_in address{};
     address.sin_family = AF_INET;
     address.sin_port = htons(port);
     address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
     Client client(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-    ASSERT_EQ(0, ::connect(client.socket(), reinterpret_cast<sockaddr*>(&address), sizeof address));
+    ASSERT_EQ(::connect(client.socket(), reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
     client.send(bindPacket());
     const Reply answer = client.receive();
-    ASSERT_EQ(kBindAck, answer.type);
+    ASSERT_EQ(answer.type, kBindAck);
     EXPECT_EQ(std::to_string(port) + '\0', answer.body.substr(10, answer.number(8, 2)));
-    EXPECT_EQ("hello", client.repeat("hello"));
+    EXPECT_EQ(client.repeat("hello"), "hello");
 }
 
 TEST_F(AServer, ListensOnTcpOnLoopbackOnly) {
@@ -250,9 +250,9 @@ TEST_F(AServer, ListensOnTcpOnLoopbackOnly) {
             continue;
         }
         ++found;
-        EXPECT_NE(std::string::npos, line.find(" 0100007F" + std::string(hexadecimal))) << line;
+        EXPECT_NE(line.find(" 0100007F" + std::string(hexadecimal)), std::string::npos) << line;
     }
-    EXPECT_EQ(1, found);
+    EXPECT_EQ(found, 1);
 }
 
 TEST_F(AServer, APortInUseIsAnError) {
@@ -278,7 +278,7 @@ TEST_F(AServer, ServesSeveralAssociationsAtOnce) {
     }
     for (std::thread& thread : threads)
         thread.join();
-    EXPECT_EQ(600U, server->counts().calls);
+    EXPECT_EQ(server->counts().calls, 600U);
 }
 
 TEST_F(AServer, TakesRequestsOfSeveralMegabytes) {
@@ -286,9 +286,9 @@ TEST_F(AServer, TakesRequestsOfSeveralMegabytes) {
     Client client = connect();
     ASSERT_TRUE(client.bind());
     const std::string stub(std::size_t{4} << 20, 'm');
-    EXPECT_EQ(65'536U, client.repeat(stub).size());
-    EXPECT_EQ("type 3", client.repeat(stub + "x"));
-    EXPECT_EQ("small", client.repeat("small"));
+    EXPECT_EQ(client.repeat(stub).size(), 65'536U);
+    EXPECT_EQ(client.repeat(stub + "x"), "type 3");
+    EXPECT_EQ(client.repeat("small"), "small");
 }
 
 TEST_F(AServer, TakesBytesOneByOne) {
@@ -297,8 +297,8 @@ TEST_F(AServer, TakesBytesOneByOne) {
     for (const char c : bindPacket() + requestPackets(kRepeat, "slow", 3)) {
         client.send(std::string(1, c));
     }
-    EXPECT_EQ(kBindAck, client.receive().type);
-    EXPECT_EQ("slow", client.receive().stub());
+    EXPECT_EQ(client.receive().type, kBindAck);
+    EXPECT_EQ(client.receive().stub(), "slow");
 }
 
 TEST_F(AServer, AnswersWhatCameBeforeTheClientClosedItsSide) {
@@ -306,9 +306,9 @@ TEST_F(AServer, AnswersWhatCameBeforeTheClientClosedItsSide) {
     Client client = connect();
     client.send(bindPacket() + requestPackets(kRepeat, "last words"));
     ::shutdown(client.socket(), SHUT_WR);
-    EXPECT_EQ(kBindAck, client.receive().type);
-    EXPECT_EQ("last words", client.receive().stub());
-    EXPECT_EQ(255, client.receive().type);
+    EXPECT_EQ(client.receive().type, kBindAck);
+    EXPECT_EQ(client.receive().stub(), "last words");
+    EXPECT_EQ(client.receive().type, 255);
 }
 
 TEST_F(AServer, ClientsThatVanishLeaveNothingBehind) {
@@ -324,8 +324,8 @@ TEST_F(AServer, ClientsThatVanishLeaveNothingBehind) {
     EXPECT_TRUE(becomes([](const ncs::Counts& counts) {
         return counts.accepted == 100 && counts.connections == 0;
     }));
-    EXPECT_EQ(before, openDescriptors());
-    EXPECT_EQ(0U, ncs::keptBytes());
+    EXPECT_EQ(openDescriptors(), before);
+    EXPECT_EQ(ncs::keptBytes(), 0U);
 }
 
 TEST_F(AServer, AClientThatTakesNoAnswersIsCutAndHoldsUpNobody) {
@@ -344,10 +344,10 @@ TEST_F(AServer, AClientThatTakesNoAnswersIsCutAndHoldsUpNobody) {
     Client other = connect();
     ASSERT_TRUE(other.bind());
     for (int i = 0; i < 20; ++i)
-        EXPECT_EQ("quick", other.repeat("quick"));
+        EXPECT_EQ(other.repeat("quick"), "quick");
     EXPECT_TRUE(becomes([](const ncs::Counts& counts) { return counts.timedOut == 1; }));
     sender.join();
-    EXPECT_EQ("still here", other.repeat("still here"));
+    EXPECT_EQ(other.repeat("still here"), "still here");
 }
 
 TEST_F(AServer, WhoDoesNotBindInTimeIsCut) {
@@ -358,8 +358,8 @@ TEST_F(AServer, WhoDoesNotBindInTimeIsCut) {
     Client talking = connect();
     ASSERT_TRUE(talking.bind());
     EXPECT_TRUE(silent.isClosedWithin(20s));
-    EXPECT_EQ("hello", talking.repeat("hello"));
-    EXPECT_EQ(1U, server->counts().timedOut);
+    EXPECT_EQ(talking.repeat("hello"), "hello");
+    EXPECT_EQ(server->counts().timedOut, 1U);
 }
 
 TEST_F(AServer, WhoTricklesARequestIsCutHoweverBusyItLooks) {
@@ -384,11 +384,11 @@ TEST_F(AServer, WhoIsIdleTooLongIsCutButNotWhoWorks) {
     ASSERT_TRUE(idle.bind());
     ASSERT_TRUE(busy.bind());
     EXPECT_TRUE(eventually([&] {
-        EXPECT_EQ("work", busy.repeat("work"));
+        EXPECT_EQ(busy.repeat("work"), "work");
         return idle.isClosedWithin(50ms);
     }));
-    EXPECT_EQ("work", busy.repeat("work"));
-    EXPECT_EQ(1U, server->counts().timedOut);
+    EXPECT_EQ(busy.repeat("work"), "work");
+    EXPECT_EQ(server->counts().timedOut, 1U);
 }
 
 TEST_F(AServer, ACallMayTakeLongerThanAnyWait) {
@@ -402,7 +402,7 @@ TEST_F(AServer, ACallMayTakeLongerThanAnyWait) {
     gate().await(1);
     std::this_thread::sleep_for(1s);
     gate().open();
-    EXPECT_EQ(kResponse, client.receive().type);
+    EXPECT_EQ(client.receive().type, kResponse);
 }
 
 TEST_F(AServer, BeyondItsLimitConnectionsAreClosedAtOnce) {
@@ -415,7 +415,7 @@ TEST_F(AServer, BeyondItsLimitConnectionsAreClosedAtOnce) {
     ASSERT_TRUE(second.bind());
     Client third = connect();
     EXPECT_TRUE(third.isClosedWithin(20s));
-    EXPECT_EQ(1U, server->counts().refused);
+    EXPECT_EQ(server->counts().refused, 1U);
     first.close();
     ASSERT_TRUE(becomes([](const ncs::Counts& counts) { return counts.connections == 1; }));
     Client fourth = connect();
@@ -439,7 +439,7 @@ TEST_F(AServer, AsManyCallsRunAtATimeAsThereAreWorkers) {
     gate().await(3);
     gate().open();
     for (Client& client : clients)
-        EXPECT_EQ(kResponse, client.receive().type);
+        EXPECT_EQ(client.receive().type, kResponse);
 }
 
 TEST_F(AServer, StopLetsRunningCallsEndAndClosesEverything) {
@@ -458,10 +458,10 @@ TEST_F(AServer, StopLetsRunningCallsEndAndClosesEverything) {
     });
     server->stop();
     opener.join();
-    EXPECT_EQ(kResponse, running.receive().type);
+    EXPECT_EQ(running.receive().type, kResponse);
     EXPECT_TRUE(running.isClosedWithin(20s));
     EXPECT_TRUE(idle.isClosedWithin(20s));
-    EXPECT_EQ(0U, server->counts().connections);
+    EXPECT_EQ(server->counts().connections, 0U);
     server->stop();
     ncs::Server other;
     EXPECT_EQ(port, other.listenOnLoopback(port));
@@ -472,20 +472,20 @@ TEST_F(AServer, OutOfDescriptorsItWaitsAndGoesOn) {
     Client before = connect();
     ASSERT_TRUE(before.bind());
     rlimit old{};
-    ASSERT_EQ(0, ::getrlimit(RLIMIT_NOFILE, &old));
+    ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &old), 0);
     Client waiting(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
     rlimit none = old;
     none.rlim_cur = static_cast<rlim_t>(waiting.socket()) + 1;
-    ASSERT_EQ(0, ::setrlimit(RLIMIT_NOFILE, &none));
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     scratch.path("rpc").copy(address.sun_path, sizeof address.sun_path - 1);
-    ASSERT_EQ(0,
-              ::connect(waiting.socket(), reinterpret_cast<sockaddr*>(&address), sizeof address));
-    EXPECT_EQ("still served", before.repeat("still served"));
+    ASSERT_EQ(::connect(waiting.socket(), reinterpret_cast<sockaddr*>(&address), sizeof address),
+              0);
+    EXPECT_EQ(before.repeat("still served"), "still served");
     std::this_thread::sleep_for(100ms);
-    EXPECT_EQ(1U, server->counts().accepted);
-    ASSERT_EQ(0, ::setrlimit(RLIMIT_NOFILE, &old));
+    EXPECT_EQ(server->counts().accepted, 1U);
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &old), 0);
     EXPECT_TRUE(waiting.bind());
 }
 
@@ -526,7 +526,7 @@ TEST_F(AServer, AtRestNoThreadIsWoken) {
         std::this_thread::sleep_for(100ms);
         return isStill();
     }));
-    EXPECT_EQ(8U, before.size());
+    EXPECT_EQ(before.size(), 8U);
     std::this_thread::sleep_for(500ms);
     EXPECT_TRUE(isStill());
 }
@@ -535,8 +535,8 @@ TEST_F(AServer, AtRestNoThreadIsWoken) {
 TEST_F(AServer, PeersOfAnotherUserAreRefused) {
     if (::geteuid() != 0) GTEST_SKIP() << "only root can be another user";
     start();
-    ASSERT_EQ(0, ::chmod(scratch.path().c_str(), 0777));
-    ASSERT_EQ(0, ::chmod(scratch.path("rpc").c_str(), 0777));
+    ASSERT_EQ(::chmod(scratch.path().c_str(), 0777), 0);
+    ASSERT_EQ(::chmod(scratch.path("rpc").c_str(), 0777), 0);
     const pid_t child = ::fork();
     if (child == 0) {
         if (::setresuid(65534, 65534, 65534) != 0) ::_exit(2);
@@ -550,8 +550,8 @@ TEST_F(AServer, PeersOfAnotherUserAreRefused) {
     }
     int status = 0;
     ASSERT_EQ(child, ::waitpid(child, &status, 0));
-    EXPECT_EQ(0, WEXITSTATUS(status));
-    EXPECT_EQ(1U, server->counts().refused);
+    EXPECT_EQ(WEXITSTATUS(status), 0);
+    EXPECT_EQ(server->counts().refused, 1U);
     Client own = connect();
     EXPECT_TRUE(own.bind());
 }
@@ -562,8 +562,8 @@ TEST_F(AServer, ItsThreadsLeaveSignalsToTheOthers) {
     ASSERT_TRUE(becomes([](const ncs::Counts&) { return statusOfThreads("SigBlk:").size() == 8; }));
     for (const std::string& text : statusOfThreads("SigBlk:")) {
         const unsigned long long mask = std::stoull(text, nullptr, 16);
-        EXPECT_NE(0U, mask & 1ULL << (SIGTERM - 1));
-        EXPECT_NE(0U, mask & 1ULL << (SIGINT - 1));
+        EXPECT_NE(mask & 1ULL << (SIGTERM - 1), 0U);
+        EXPECT_NE(mask & 1ULL << (SIGINT - 1), 0U);
     }
 }
 

@@ -55,11 +55,11 @@ protected:
     Host() {
         manager.sample = {sampleRow("alpha", 1, "one"), sampleRow("beta", 2, "two"),
                           sampleRow("gamma", 3, "three")};
-        EXPECT_EQ(OXA_OK, manager.RegisterWithManager());
+        EXPECT_EQ(manager.RegisterWithManager(), OXA_OK);
     }
     std::vector<std::string> ask(const std::vector<oxa::Predicate>& where) {
         oxa::Rows rows;
-        EXPECT_EQ(OXA_OK, oxa::query("SAMPLE", where, rows));
+        EXPECT_EQ(oxa::query("SAMPLE", where, rows), OXA_OK);
         return names(rows);
     }
 
@@ -69,46 +69,46 @@ protected:
 TEST_F(Host, AQueryOnAnUnknownTableSaysSo) {
     oxa::Rows rows;
     rows.bytes = "left over";
-    EXPECT_EQ(OXA_GONE, oxa::query("NOSUCH", {}, rows));
-    EXPECT_EQ(0U, rows.count());
-    EXPECT_EQ(nullptr, oxa::subscribe("NOSUCH", {}, [](const oxa::Rows&) { return 0; }));
+    EXPECT_EQ(oxa::query("NOSUCH", {}, rows), OXA_GONE);
+    EXPECT_EQ(rows.count(), 0U);
+    EXPECT_EQ(oxa::subscribe("NOSUCH", {}, [](const oxa::Rows&) { return 0; }), nullptr);
 }
 
 TEST_F(Host, WhatATableThrowsBecomesAStatus) {
     oxa::Rows rows;
     manager.onSample = [] { throw std::runtime_error("sample"); };
-    EXPECT_EQ(OXA_FAILED, oxa::query("SAMPLE", {}, rows));
+    EXPECT_EQ(oxa::query("SAMPLE", {}, rows), OXA_FAILED);
     manager.onSample = [] { throw 1; };
-    EXPECT_EQ(OXA_FAILED, oxa::query("SAMPLE", {}, rows));
+    EXPECT_EQ(oxa::query("SAMPLE", {}, rows), OXA_FAILED);
     manager.onSample = [] { throw std::bad_alloc(); };
-    EXPECT_EQ(OXA_NO_MEMORY, oxa::query("SAMPLE", {}, rows));
+    EXPECT_EQ(oxa::query("SAMPLE", {}, rows), OXA_NO_MEMORY);
     manager.onCreate = [] { throw std::runtime_error("create"); };
-    EXPECT_EQ(OXA_FAILED, oxa::query("SAMPLE", {}, rows));
-    EXPECT_EQ(nullptr, oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; }));
-    EXPECT_EQ(0, manager.objects);
+    EXPECT_EQ(oxa::query("SAMPLE", {}, rows), OXA_FAILED);
+    EXPECT_EQ(oxa::subscribe("SAMPLE", {}, [](const oxa::Rows&) { return 0; }), nullptr);
+    EXPECT_EQ(manager.objects, 0);
 }
 
 TEST_F(Host, TablesAreListedWithTheirColumnsAndNeverSampled) {
     const std::vector<oxa::Table> tables = oxa::tables();
-    ASSERT_EQ(1U, tables.size());
-    EXPECT_EQ("TST", tables[0].application);
-    EXPECT_EQ("SAMPLE", tables[0].name);
-    ASSERT_EQ(3U, tables[0].columns.size());
-    ASSERT_NE(nullptr, tables[0].find("VALUE"));
-    EXPECT_EQ(8, tables[0].find("VALUE")->offset);
-    EXPECT_EQ(4, tables[0].find("VALUE")->length);
-    EXPECT_EQ(OXA_TYPE_INTEGER, tables[0].find("VALUE")->type);
-    EXPECT_EQ(nullptr, tables[0].find("value"));
-    EXPECT_EQ(0, manager.samples);
-    EXPECT_EQ(0, manager.objects);
+    ASSERT_EQ(tables.size(), 1U);
+    EXPECT_EQ(tables[0].application, "TST");
+    EXPECT_EQ(tables[0].name, "SAMPLE");
+    ASSERT_EQ(tables[0].columns.size(), 3U);
+    ASSERT_NE(tables[0].find("VALUE"), nullptr);
+    EXPECT_EQ(tables[0].find("VALUE")->offset, 8);
+    EXPECT_EQ(tables[0].find("VALUE")->length, 4);
+    EXPECT_EQ(tables[0].find("VALUE")->type, OXA_TYPE_INTEGER);
+    EXPECT_EQ(tables[0].find("value"), nullptr);
+    EXPECT_EQ(manager.samples, 0);
+    EXPECT_EQ(manager.objects, 0);
 }
 
 TEST_F(Host, ATableThatCannotBeAskedIsListedAndAskedAgain) {
     manager.onCreate = [] { throw std::runtime_error("not now"); };
-    ASSERT_EQ(1U, oxa::tables().size());
+    ASSERT_EQ(oxa::tables().size(), 1U);
     EXPECT_THAT(oxa::tables()[0].columns, IsEmpty());
     manager.onCreate = nullptr;
-    EXPECT_EQ(3U, oxa::tables()[0].columns.size());
+    EXPECT_EQ(oxa::tables()[0].columns.size(), 3U);
 }
 
 TEST_F(Host, TablesKeepTheOrderOfTheirRegistration) {
@@ -117,9 +117,9 @@ TEST_F(Host, TablesKeepTheOrderOfTheirRegistration) {
     SampleManager again;
     again.RegisterWithManager();
     const std::vector<oxa::Table> tables = oxa::tables();
-    ASSERT_EQ(2U, tables.size());
-    EXPECT_EQ("SAMPLE", tables[0].name);
-    EXPECT_EQ("AAA", tables[1].name);
+    ASSERT_EQ(tables.size(), 2U);
+    EXPECT_EQ(tables[0].name, "SAMPLE");
+    EXPECT_EQ(tables[1].name, "AAA");
 }
 
 TEST(Registration, EndsWithTheManager) {
@@ -127,10 +127,10 @@ TEST(Registration, EndsWithTheManager) {
         SampleManager manager("BRIEF");
         manager.RegisterWithManager();
         oxa::Rows rows;
-        EXPECT_EQ(OXA_OK, oxa::query("BRIEF", {}, rows));
+        EXPECT_EQ(oxa::query("BRIEF", {}, rows), OXA_OK);
     }
     oxa::Rows rows;
-    EXPECT_EQ(OXA_GONE, oxa::query("BRIEF", {}, rows));
+    EXPECT_EQ(oxa::query("BRIEF", {}, rows), OXA_GONE);
     EXPECT_THAT(oxa::tables(), IsEmpty());
 }
 
@@ -144,23 +144,23 @@ TEST_F(Host, ASinkThatThrowsLosesItsRowsAndDisturbsNobody) {
         return OXA_OK;
     });
     const auto good = oxa::subscribe("SAMPLE", {}, other.sink());
-    EXPECT_EQ(OXA_OVERFLOW, manager.publish(sampleRow("a", 1)));
+    EXPECT_EQ(manager.publish(sampleRow("a", 1)), OXA_OVERFLOW);
     failing = false;
-    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("b", 1)));
-    EXPECT_EQ(2, calls);
+    EXPECT_EQ(manager.publish(sampleRow("b", 1)), OXA_OK);
+    EXPECT_EQ(calls, 2);
     EXPECT_THAT(other.get(), ElementsAre("a", "b"));
 }
 
 TEST_F(Host, ASubscriptionWithoutASinkHasNoRequester) {
     const auto live = oxa::subscribe("SAMPLE", {}, nullptr);
-    ASSERT_NE(nullptr, live);
-    EXPECT_EQ(OXA_GONE, manager.publish(sampleRow("a", 1)));
+    ASSERT_NE(live, nullptr);
+    EXPECT_EQ(manager.publish(sampleRow("a", 1)), OXA_GONE);
 }
 
 TEST_F(Host, AFilterJudgesRowsAsTheTableDoesAndIsNoLiveObject) {
     const std::unique_ptr<oxa::Filter> filter =
         oxa::makeFilter("SAMPLE", {{"NAME", OPER_EQ, "beta "}, {"VALUE", OPER_GT, "1"}});
-    ASSERT_NE(nullptr, filter);
+    ASSERT_NE(filter, nullptr);
     EXPECT_THAT(manager.liveNumbers(), IsEmpty());
     for (int turn = 0; turn < 2; ++turn) {
         for (const SampleRow& row : manager.sample) {
@@ -168,30 +168,30 @@ TEST_F(Host, AFilterJudgesRowsAsTheTableDoesAndIsNoLiveObject) {
             EXPECT_EQ(row.value == 2, filter->takes(bytes)) << row.value;
         }
     }
-    EXPECT_EQ(0, manager.samples);
+    EXPECT_EQ(manager.samples, 0);
 }
 
 TEST_F(Host, AFilterOfAnUnknownTableOrOneThatFailsIsNone) {
-    EXPECT_EQ(nullptr, oxa::makeFilter("NOPE", {}));
+    EXPECT_EQ(oxa::makeFilter("NOPE", {}), nullptr);
     manager.onCreate = [] { throw std::bad_alloc(); };
-    EXPECT_EQ(nullptr, oxa::makeFilter("SAMPLE", {}));
+    EXPECT_EQ(oxa::makeFilter("SAMPLE", {}), nullptr);
 }
 
 TEST_F(Host, ADroppedSubscriptionTakesItsObjectAndItsSinkAlong) {
     const auto token = std::make_shared<int>(0);
     auto live = oxa::subscribe("SAMPLE", {}, [token](const oxa::Rows&) { return 0; });
-    EXPECT_EQ(2, token.use_count());
-    EXPECT_EQ(1, manager.objects);
+    EXPECT_EQ(token.use_count(), 2);
+    EXPECT_EQ(manager.objects, 1);
     live.reset();
-    EXPECT_EQ(1, token.use_count());
-    EXPECT_EQ(0, manager.objects);
-    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("a", 1)));
+    EXPECT_EQ(token.use_count(), 1);
+    EXPECT_EQ(manager.objects, 0);
+    EXPECT_EQ(manager.publish(sampleRow("a", 1)), OXA_OK);
 }
 
 TEST_F(Host, RegisteringTwiceShutsNobodyDown) {
-    EXPECT_EQ(OXA_OK, manager.RegisterWithManager());
-    EXPECT_EQ(0, manager.shutdowns);
-    EXPECT_EQ(1U, oxa::tables().size());
+    EXPECT_EQ(manager.RegisterWithManager(), OXA_OK);
+    EXPECT_EQ(manager.shutdowns, 0);
+    EXPECT_EQ(oxa::tables().size(), 1U);
 }
 
 TEST_F(Host, AThousandSubscriptionsComeAndGoWithoutATrace) {
@@ -200,10 +200,10 @@ TEST_F(Host, AThousandSubscriptionsComeAndGoWithoutATrace) {
     for (int i = 0; i < 1000; ++i) {
         live.push_back(oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) { return ++calls, 0; }));
     }
-    EXPECT_EQ(OXA_OK, manager.publish(sampleRow("a", 1)));
-    EXPECT_EQ(1000, calls);
+    EXPECT_EQ(manager.publish(sampleRow("a", 1)), OXA_OK);
+    EXPECT_EQ(calls, 1000);
     live.clear();
-    EXPECT_EQ(0, manager.objects);
+    EXPECT_EQ(manager.objects, 0);
     EXPECT_THAT(manager.liveNumbers(), IsEmpty());
 }
 
@@ -231,7 +231,7 @@ TEST_F(Host, NoSinkIsCalledOnceItsSubscriptionIsGone) {
         thread.join();
     publishing = false;
     publisher.join();
-    EXPECT_EQ(0, manager.objects);
+    EXPECT_EQ(manager.objects, 0);
 }
 
 TEST_F(Host, QueriesAndReRegistrationsRunSideBySide) {
@@ -249,7 +249,7 @@ TEST_F(Host, QueriesAndReRegistrationsRunSideBySide) {
     for (int t = 0; t < 4; ++t) {
         askers.emplace_back([&] {
             for (int i = 0; i < 200; ++i) {
-                EXPECT_EQ(1U, ask({{"VALUE", OPER_EQ, "2"}}).size());
+                EXPECT_EQ(ask({{"VALUE", OPER_EQ, "2"}}).size(), 1U);
             }
         });
     }
@@ -278,7 +278,7 @@ TEST_F(Host, AHandleInUseMayDispatchWhileTheSubscriptionEnds) {
         alive.reset();
         user.join();
     }
-    EXPECT_EQ(0, manager.objects);
+    EXPECT_EQ(manager.objects, 0);
 }
 
 }  // namespace

@@ -23,7 +23,7 @@ protected:
 
 TEST_F(Request, MakesRoomForOneRowWhenOneComes) {
     request.add(sampleRow("a", 1));
-    EXPECT_EQ(1, request.NumRowsAllocated());
+    EXPECT_EQ(request.NumRowsAllocated(), 1);
 }
 
 /// A table that overrides nothing it need not.
@@ -37,7 +37,7 @@ TEST_F(Request, TheBaseClassPrintsItselfAtDetailLevel) {
     BareRequest bare(nullptr, nullptr, &manager);
     const TraceCapture trace;
     bare.PrintSelf();
-    ASSERT_EQ(1U, trace.details("oxa").size());
+    ASSERT_EQ(trace.details("oxa").size(), 1U);
     EXPECT_THAT(
         trace.details("oxa")[0],
         testing::MatchesRegex("rtoxa @0x[0-9a-f]+ <[0-9]+,0> appl=TST,table=SAMPLE,count=0"));
@@ -52,7 +52,7 @@ TEST_F(Request, TheBaseClassPrintsNothingWhenDetailsAreOff) {
 
 TEST(OriginNode, IsTheHostNameUntilItIsSet) {
     char name[256] = "";
-    ASSERT_EQ(0, ::gethostname(name, sizeof name - 1));
+    ASSERT_EQ(::gethostname(name, sizeof name - 1), 0);
     EXPECT_EQ(std::string(name).substr(0, 64), OXA_GetOriginnode(nullptr));
 }
 
@@ -60,9 +60,9 @@ TEST(OriginNode, IsCutTo64BytesAndOldNamesStayReadable) {
     oxa::setOriginNode("first");
     const char* const first = OXA_GetOriginnode(nullptr);
     oxa::setOriginNode(std::string(100, 'n'));
-    EXPECT_EQ(std::string(64, 'n'), OXA_GetOriginnode(nullptr));
-    EXPECT_EQ(std::string(64, 'n'), oxa::originNode());
-    EXPECT_STREQ("first", first);
+    EXPECT_EQ(OXA_GetOriginnode(nullptr), std::string(64, 'n'));
+    EXPECT_EQ(oxa::originNode(), std::string(64, 'n'));
+    EXPECT_STREQ(first, "first");
 }
 
 }  // namespace

@@ -98,10 +98,10 @@ TEST(Line, EventsHaveTheirOwnLetter) {
     for (const TraceLine& line : trace.lines()) {
         letters += line.level;
         texts.push_back(line.text);
-        EXPECT_EQ("zavsample", line.unit);
-        EXPECT_EQ("doWork", line.function);
+        EXPECT_EQ(line.unit, "zavsample");
+        EXPECT_EQ(line.function, "doWork");
     }
-    EXPECT_EQ("FDFFFF", letters);
+    EXPECT_EQ(letters, "FDFFFF");
     EXPECT_THAT(texts, ElementsAre("Entry", "found", "Exit", "Exit 17", "Exit -17",
                                    "Exit " + std::to_string(LONG_MIN)));
 }
@@ -127,7 +127,7 @@ TEST(Line, TextsOfAnyLengthAreWrittenWhole) {
         RAS1_Printf(&block, RAS1_ERROR, 1, "%s", escaped.c_str());
         expected.insert(expected.end(), {plain, plain + ":", escaped});
     }
-    EXPECT_EQ(expected, trace.errors());
+    EXPECT_EQ(trace.errors(), expected);
 }
 
 TEST(Line, ANullTextIsSaidToBeOne) {
@@ -143,14 +143,14 @@ TEST(Line, LongNamesDoNotOverrunTheHead) {
     const RAS1_BLOCK longBlock{&longUnit, longName.c_str()};
     const TraceCapture trace;
     RAS1_Printf(&longBlock, RAS1_ERROR, INT_MAX, "%s", "text");
-    ASSERT_EQ(1U, trace.lines().size());
+    ASSERT_EQ(trace.lines().size(), 1U);
 }
 
 TEST(Line, LeavesErrnoAlone) {
     const TraceCapture trace;
     errno = EXDEV;
     RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "text");
-    EXPECT_EQ(EXDEV, errno);
+    EXPECT_EQ(errno, EXDEV);
 }
 
 TEST(Line, AChildBetweenForkAndExecTraces) {
@@ -167,21 +167,21 @@ TEST(Line, AChildBetweenForkAndExecTraces) {
 TEST(Flags, FollowTheSelectionInForce) {
     {
         const TraceCapture trace("ERROR (UNIT:zavsample DETAIL)");
-        EXPECT_EQ(RAS1_DETAIL | RAS1_ERROR, RAS1_Flags(unit));
+        EXPECT_EQ(RAS1_Flags(unit), RAS1_DETAIL | RAS1_ERROR);
     }
     {
         const TraceCapture trace("ALL");
-        EXPECT_EQ(kAll, RAS1_Flags(unit));
+        EXPECT_EQ(RAS1_Flags(unit), kAll);
     }
 }
 
 TEST(Flags, ErrorsAreOnUnlessTheEnvironmentSaysMore) {
     ::unsetenv("KBB_RAS1");
     ras1::configureFromEnvironment();
-    EXPECT_EQ(unsigned{RAS1_ERROR}, RAS1_Flags(unit));
+    EXPECT_EQ(RAS1_Flags(unit), unsigned{RAS1_ERROR});
     ::setenv("KBB_RAS1", "ALL", 1);
     ras1::configureFromEnvironment();
-    EXPECT_EQ(kAll, RAS1_Flags(unit));
+    EXPECT_EQ(RAS1_Flags(unit), kAll);
     ::unsetenv("KBB_RAS1");
     ras1::configureFromEnvironment();
 }
@@ -222,7 +222,7 @@ TEST(Log, NeverTakesTheNumberOfAStandardStream) {
                     ? 0
                     : 1);
     });
-    EXPECT_EQ(0, status);
+    EXPECT_EQ(status, 0);
     EXPECT_THAT(scratch.read("log"), MatchesRegex(".* doWork: written\n"));
 }
 
@@ -231,18 +231,19 @@ TEST(Log, IsNotInheritedByPrograms) {
     ras1::configure("ALL", scratch.path("log"));
     const std::string listing = scratch.script("list", "ls -l /proc/self/fd > \"$1\"");
     const std::string out = scratch.path("out");
-    EXPECT_EQ(0, inChild([&] {
+    EXPECT_EQ(inChild([&] {
                   ::execl(listing.c_str(), listing.c_str(), out.c_str(), nullptr);
                   ::_exit(1);
-              }));
+              }),
+              0);
     ras1::configureFromEnvironment();
-    EXPECT_EQ(std::string::npos, scratch.read("out").find(scratch.path("log")));
+    EXPECT_EQ(scratch.read("out").find(scratch.path("log")), std::string::npos);
 }
 
 TEST(Log, APipeWithoutAReaderCostsTheProcessNothing) {
     const ScratchDir scratch;
     const std::string fifo = scratch.path("fifo");
-    ASSERT_EQ(0, ::mkfifo(fifo.c_str(), 0600));
+    ASSERT_EQ(::mkfifo(fifo.c_str(), 0600), 0);
     const int status = inChild([&] {
         ::signal(SIGPIPE, SIG_DFL);
         const int reader = ::open(fifo.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
@@ -254,7 +255,7 @@ TEST(Log, APipeWithoutAReaderCostsTheProcessNothing) {
         ::_exit(::sigismember(&left, SIGPIPE));
     });
     EXPECT_TRUE(WIFEXITED(status));
-    EXPECT_EQ(0, WEXITSTATUS(status));
+    EXPECT_EQ(WEXITSTATUS(status), 0);
 }
 
 }  // namespace

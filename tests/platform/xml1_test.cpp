@@ -19,7 +19,7 @@ class Locale {
 public:
     explicit Locale(const char* name) {
         ::setenv("LC_ALL", name, 1);
-        EXPECT_NE(nullptr, std::setlocale(LC_ALL, name));
+        EXPECT_NE(std::setlocale(LC_ALL, name), nullptr);
     }
     ~Locale() {
         ::unsetenv("LC_ALL");
@@ -85,7 +85,7 @@ private:
 
 std::vector<std::string> eventsOf(const std::string& document) {
     Recorder recorder;
-    EXPECT_EQ(1, recorder.push(document, true)) << document;
+    EXPECT_EQ(recorder.push(document, true), 1) << document;
     return recorder.events;
 }
 
@@ -111,49 +111,49 @@ TEST(Xml, ACharacterOfSeveralBytesMayBeCutBetweenPieces) {
     Recorder recorder;
     const std::string document =
         "<?xml version='1.0' encoding='EUC-JP'?><a>\xC6\xFC\x8F\xB0\xA1</a>";
-    EXPECT_EQ(1, recorder.pushInPieces(document, 1));
+    EXPECT_EQ(recorder.pushInPieces(document, 1), 1);
     EXPECT_THAT(recorder.events, ElementsAre("<a", "\"\xE6\x97\xA5\xE4\xB8\x82", ">a"));
 }
 
 TEST(Xml, AnUnknownEncodingIsAnError) {
     const Locale locale(kUtf8);
     Recorder recorder;
-    EXPECT_EQ(0, recorder.push("<?xml version='1.0' encoding='no-such-code'?><a/>", true));
-    EXPECT_STREQ("unknown encoding", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+    EXPECT_EQ(recorder.push("<?xml version='1.0' encoding='no-such-code'?><a/>", true), 0);
+    EXPECT_STREQ(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())), "unknown encoding");
 }
 
 TEST(Xml, AnErrorHasACodeATextAndAPlace) {
     for (const char* const name : {kUtf8, kLatin1}) {
         const Locale locale(name);
         Recorder recorder;
-        EXPECT_EQ(0, recorder.push("<a>\n  <b></a>", true));
-        EXPECT_STREQ("mismatched tag", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
-        EXPECT_EQ(2, XML1_GetCurrentLineNumber(recorder.parser()));
-        EXPECT_EQ(7, XML1_GetCurrentColumnNumber(recorder.parser()));
+        EXPECT_EQ(recorder.push("<a>\n  <b></a>", true), 0);
+        EXPECT_STREQ(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())), "mismatched tag");
+        EXPECT_EQ(XML1_GetCurrentLineNumber(recorder.parser()), 2);
+        EXPECT_EQ(XML1_GetCurrentColumnNumber(recorder.parser()), 7);
     }
 }
 
 TEST(Xml, EveryErrorHasItsOwnText) {
-    EXPECT_STREQ("out of memory", XML1_ErrorString(1));
-    EXPECT_STREQ("mismatched tag", XML1_ErrorString(7));
-    EXPECT_STREQ("limit on input amplification factor (from DTD and entities) breached",
-                 XML1_ErrorString(43));
+    EXPECT_STREQ(XML1_ErrorString(1), "out of memory");
+    EXPECT_STREQ(XML1_ErrorString(7), "mismatched tag");
+    EXPECT_STREQ(XML1_ErrorString(43),
+                 "limit on input amplification factor (from DTD and entities) breached");
     std::set<std::string> texts;
     for (int code = 1; code <= 43; ++code) {
-        ASSERT_NE(nullptr, XML1_ErrorString(code)) << code;
+        ASSERT_NE(XML1_ErrorString(code), nullptr) << code;
         EXPECT_TRUE(texts.insert(XML1_ErrorString(code)).second) << code;
     }
-    EXPECT_EQ(nullptr, XML1_ErrorString(44));
+    EXPECT_EQ(XML1_ErrorString(44), nullptr);
 }
 
 TEST(Xml, AnEmptyDocumentIsAnError) {
     for (const char* const name : {kUtf8, kLatin1}) {
         const Locale locale(name);
         Recorder recorder;
-        EXPECT_EQ(0, recorder.push("", true));
-        EXPECT_STREQ("no element found", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
-        EXPECT_EQ(1, XML1_GetCurrentLineNumber(recorder.parser()));
-        EXPECT_EQ(0, XML1_GetCurrentColumnNumber(recorder.parser()));
+        EXPECT_EQ(recorder.push("", true), 0);
+        EXPECT_STREQ(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())), "no element found");
+        EXPECT_EQ(XML1_GetCurrentLineNumber(recorder.parser()), 1);
+        EXPECT_EQ(XML1_GetCurrentColumnNumber(recorder.parser()), 0);
     }
 }
 
@@ -161,12 +161,12 @@ TEST(Xml, AnEmptyPieceNeedsNoBuffer) {
     for (const char* const name : {kUtf8, kLatin1}) {
         const Locale locale(name);
         Recorder recorder;
-        EXPECT_EQ(1, XML1_ParseBuffer(recorder.parser(), 0, 0));
-        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), 0, 1));
-        EXPECT_STREQ("no element found", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        EXPECT_EQ(XML1_ParseBuffer(recorder.parser(), 0, 0), 1);
+        EXPECT_EQ(XML1_ParseBuffer(recorder.parser(), 0, 1), 0);
+        EXPECT_STREQ(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())), "no element found");
         Recorder whole;
-        EXPECT_EQ(1, whole.push("<a/>", false));
-        EXPECT_EQ(1, XML1_ParseBuffer(whole.parser(), 0, 1));
+        EXPECT_EQ(whole.push("<a/>", false), 1);
+        EXPECT_EQ(XML1_ParseBuffer(whole.parser(), 0, 1), 1);
     }
 }
 
@@ -174,12 +174,12 @@ TEST(Xml, NothingIsParsedAfterTheLastPiece) {
     for (const std::string document : {"<a/>", "<a>"}) {
         const Locale locale(kUtf8);
         Recorder recorder;
-        EXPECT_EQ(1, recorder.push(document, true));
-        EXPECT_EQ(0, XML1_GetErrorCode(recorder.parser())) << document;
+        EXPECT_EQ(recorder.push(document, true), 1);
+        EXPECT_EQ(XML1_GetErrorCode(recorder.parser()), 0) << document;
         const std::size_t events = recorder.events.size();
-        EXPECT_EQ(nullptr, XML1_GetBuffer(recorder.parser(), 1)) << document;
-        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), 0, 1)) << document;
-        EXPECT_STREQ("parsing finished", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        EXPECT_EQ(XML1_GetBuffer(recorder.parser(), 1), nullptr) << document;
+        EXPECT_EQ(XML1_ParseBuffer(recorder.parser(), 0, 1), 0) << document;
+        EXPECT_STREQ(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())), "parsing finished");
         EXPECT_EQ(events, recorder.events.size());
     }
 }
@@ -188,9 +188,9 @@ TEST(Xml, AnErrorStaysWhenMoreIsPushed) {
     for (const char* const name : {kUtf8, kLatin1}) {
         const Locale locale(name);
         Recorder recorder;
-        EXPECT_EQ(0, recorder.push("<a></b>", true));
-        EXPECT_EQ(0, XML1_ParseBuffer(recorder.parser(), 0, 1));
-        EXPECT_STREQ("mismatched tag", XML1_ErrorString(XML1_GetErrorCode(recorder.parser())));
+        EXPECT_EQ(recorder.push("<a></b>", true), 0);
+        EXPECT_EQ(XML1_ParseBuffer(recorder.parser(), 0, 1), 0);
+        EXPECT_STREQ(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())), "mismatched tag");
         EXPECT_THAT(recorder.events, ElementsAre("<a"));
     }
 }
@@ -205,7 +205,7 @@ TEST(Xml, ExpandingEntitiesIsBounded) {
         document += "'>";
     }
     Recorder recorder;
-    EXPECT_EQ(0, recorder.push(document + "]><a>&e12;</a>", true));
+    EXPECT_EQ(recorder.push(document + "]><a>&e12;</a>", true), 0);
     EXPECT_THAT(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())),
                 testing::HasSubstr("amplification"));
 }
@@ -216,7 +216,7 @@ TEST(Xml, ThousandsOfAttributesArriveInAnotherCodePage) {
     for (int i = 0; i < 5000; ++i)
         document += " k" + std::to_string(i) + "='\xE4'";
     const std::vector<std::string> events = eventsOf(document + "/>");
-    ASSERT_EQ(2U, events.size());
+    ASSERT_EQ(events.size(), 2U);
     EXPECT_THAT(events[0], testing::EndsWith(" k4999=\xE4"));
 }
 

@@ -101,7 +101,7 @@ protected:
     Texts errorsOf(const Failure& failure) {
         failing = failure;
         TraceCapture trace;
-        EXPECT_EQ(-1, convertDOS2Unix(file_.c_str()));
+        EXPECT_EQ(convertDOS2Unix(file_.c_str()), -1);
         failing = {};
         return trace.errors("zavrpc");
     }
@@ -120,50 +120,49 @@ protected:
 
 TEST_F(Dos2Unix, NamesItsTemporaryFileAndLeavesNone) {
     TraceCapture trace;
-    EXPECT_EQ(0, convertDOS2Unix(file_.c_str()));
-    EXPECT_EQ(1, trace.count('D', "tempfile name: [" + temporary() + "]"));
-    EXPECT_EQ(Texts{}, trace.errors("zavrpc"));
-    EXPECT_EQ("a\nb", original());
+    EXPECT_EQ(convertDOS2Unix(file_.c_str()), 0);
+    EXPECT_EQ(trace.count('D', "tempfile name: [" + temporary() + "]"), 1);
+    EXPECT_EQ(trace.errors("zavrpc"), Texts{});
+    EXPECT_EQ(original(), "a\nb");
     EXPECT_FALSE(scratch_.exists("home/tmp/.zavtemp"));
 }
 
 TEST_F(Dos2Unix, EitherFileMayFailToClose) {
-    EXPECT_EQ((Texts{"Could not close [" + file_ + "]."}), errorsOf({"close", "/install.sh"}));
-    EXPECT_EQ((Texts{"Could not close [" + temporary() + "]."}), errorsOf({"close", "/.zavtemp"}));
-    EXPECT_EQ("a\r\nb\x1a", original());
+    EXPECT_EQ(errorsOf({"close", "/install.sh"}), (Texts{"Could not close [" + file_ + "]."}));
+    EXPECT_EQ(errorsOf({"close", "/.zavtemp"}), (Texts{"Could not close [" + temporary() + "]."}));
+    EXPECT_EQ(original(), "a\r\nb\x1a");
 }
 
 TEST_F(Dos2Unix, AnInputMayFailToCloseWhenThereIsNoTemporaryFile) {
-    ASSERT_EQ(0, ::rmdir((scratch_.path("home") + "/tmp").c_str()));
-    EXPECT_EQ((Texts{"Could not open [" + temporary() + "] for writing.",
-                     "Could not close [" + file_ + "]."}),
-              errorsOf({"close", "/install.sh"}));
+    ASSERT_EQ(::rmdir((scratch_.path("home") + "/tmp").c_str()), 0);
+    EXPECT_EQ(errorsOf({"close", "/install.sh"}),
+              (Texts{"Could not open [" + temporary() + "] for writing.",
+                     "Could not close [" + file_ + "]."}));
 }
 
 TEST_F(Dos2Unix, PermissionsThatCannotBeSetLeaveTheOriginal) {
-    EXPECT_EQ((Texts{"Failed to set permissions on file [" + temporary() + "] to [504]"}),
-              errorsOf({"chmod", "/.zavtemp"}));
-    EXPECT_EQ("a\r\nb\x1a", original());
+    EXPECT_EQ(errorsOf({"chmod", "/.zavtemp"}),
+              (Texts{"Failed to set permissions on file [" + temporary() + "] to [504]"}));
+    EXPECT_EQ(original(), "a\r\nb\x1a");
 }
 
 TEST_F(Dos2Unix, AnOriginalThatCannotBeRemovedStays) {
-    EXPECT_EQ((Texts{"Failed to unlink file [" + file_ + "]. " + why(EACCES)}),
-              errorsOf({"unlink", "/install.sh"}));
-    EXPECT_EQ("a\r\nb\x1a", original());
+    EXPECT_EQ(errorsOf({"unlink", "/install.sh"}),
+              (Texts{"Failed to unlink file [" + file_ + "]. " + why(EACCES)}));
+    EXPECT_EQ(original(), "a\r\nb\x1a");
 }
 
 TEST_F(Dos2Unix, AResultThatCannotBeLinkedStaysInTheTemporaryFile) {
-    EXPECT_EQ(
-        (Texts{"Failed to link file [" + temporary() + "] to [" + file_ + "]. " + why(EXDEV)}),
-        errorsOf({"link", "/install.sh"}));
+    EXPECT_EQ(errorsOf({"link", "/install.sh"}), (Texts{"Failed to link file [" + temporary() +
+                                                        "] to [" + file_ + "]. " + why(EXDEV)}));
     EXPECT_FALSE(exists());
-    EXPECT_EQ("a\nb", converted());
+    EXPECT_EQ(converted(), "a\nb");
 }
 
 TEST_F(Dos2Unix, ATemporaryFileThatCannotBeRemovedIsAFailureAtTheEnd) {
-    EXPECT_EQ((Texts{"Failed to unlink temp file [" + temporary() + "]. " + why(EACCES)}),
-              errorsOf({"unlink", "/.zavtemp"}));
-    EXPECT_EQ("a\nb", original());
+    EXPECT_EQ(errorsOf({"unlink", "/.zavtemp"}),
+              (Texts{"Failed to unlink temp file [" + temporary() + "]. " + why(EACCES)}));
+    EXPECT_EQ(original(), "a\nb");
 }
 
 TEST_F(Dos2Unix, WithoutAHomeTheTemporaryFileIsInTheWorkingDirectory) {
@@ -171,9 +170,9 @@ TEST_F(Dos2Unix, WithoutAHomeTheTemporaryFileIsInTheWorkingDirectory) {
     forget();
     failing = {"unlink", "/install.sh"};
     TraceCapture trace;
-    EXPECT_EQ(-1, convertDOS2Unix(file_.c_str()));
-    EXPECT_EQ(1, trace.count('D', "tempfile name: [.zavtemp]"));
-    EXPECT_EQ(0, ::unlink(".zavtemp"));
+    EXPECT_EQ(convertDOS2Unix(file_.c_str()), -1);
+    EXPECT_EQ(trace.count('D', "tempfile name: [.zavtemp]"), 1);
+    EXPECT_EQ(::unlink(".zavtemp"), 0);
 }
 
 TEST_F(Dos2Unix, ATransferWhosePermissionsCannotBeSetCarriesOn) {
@@ -182,11 +181,11 @@ TEST_F(Dos2Unix, ATransferWhosePermissionsCannotBeSetCarriesOn) {
     std::int32_t status = -1;
     TraceCapture trace;
     BinaryDataTransfer(nullptr, 0, "install.sh", 0, 1, 0, &chunk, &status);
-    EXPECT_EQ(0, status);
-    EXPECT_EQ((Texts{"Failed to set permissions on file [" + file_ + "] to [504]"}),
-              trace.errors("zavrpc"));
-    EXPECT_EQ(1, trace.count('D', "Its a file we're interested in: " + file_));
-    EXPECT_EQ("x\n", original());
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(trace.errors("zavrpc"),
+              (Texts{"Failed to set permissions on file [" + file_ + "] to [504]"}));
+    EXPECT_EQ(trace.count('D', "Its a file we're interested in: " + file_), 1);
+    EXPECT_EQ(original(), "x\n");
 }
 
 }  // namespace

@@ -42,22 +42,22 @@ protected:
 };
 
 TEST_F(InterfaceRegistration, OffersTheInterfaceForTheNilObject) {
-    EXPECT_EQ(0, QVS_NCS_RegisterAgentInterface());
-    ASSERT_EQ(1u, registrations.size());
+    EXPECT_EQ(QVS_NCS_RegisterAgentInterface(), 0);
+    ASSERT_EQ(registrations.size(), 1u);
     const Registration& made = registrations[0];
-    EXPECT_EQ(&uuid__nil, made.object);
+    EXPECT_EQ(made.object, &uuid__nil);
     EXPECT_EQ(QVS_Agent_v1_server_epv_locator(), made.stubs);
-    EXPECT_EQ(&ZAV::BinaryDataTransfer,
-              static_cast<const QVS_Agent_v1_mgr_epv*>(made.manager)->BinaryDataTransfer);
-    EXPECT_STREQ("QVS_Agent_v1", made.interface->name);
-    EXPECT_EQ(1u, made.interface->version);
-    EXPECT_EQ(1u, made.interface->operations);
-    EXPECT_EQ(1u, made.stubs->count);
+    EXPECT_EQ(static_cast<const QVS_Agent_v1_mgr_epv*>(made.manager)->BinaryDataTransfer,
+              &ZAV::BinaryDataTransfer);
+    EXPECT_STREQ(made.interface->name, "QVS_Agent_v1");
+    EXPECT_EQ(made.interface->version, 1u);
+    EXPECT_EQ(made.interface->operations, 1u);
+    EXPECT_EQ(made.stubs->count, 1u);
     const uuid__t& id = made.interface->id;
-    EXPECT_EQ(0xb1fb0fb3u, id.time_high);
-    EXPECT_EQ(0x03c4u, id.time_low);
-    EXPECT_EQ(0u, id.reserved);
-    EXPECT_EQ(2u, id.family);
+    EXPECT_EQ(id.time_high, 0xb1fb0fb3u);
+    EXPECT_EQ(id.time_low, 0x03c4u);
+    EXPECT_EQ(id.reserved, 0u);
+    EXPECT_EQ(id.family, 2u);
     EXPECT_THAT(id.host, testing::ElementsAre(0x00, 0x00, 0x09, 0x35, 0x18, 0x3d, 0x00));
 }
 
@@ -67,7 +67,7 @@ TEST_F(InterfaceRegistration, ReturnsTheRuntimesStatusWithoutAWordOrASecondTry) 
         answer = status;
         EXPECT_EQ(static_cast<int>(status), QVS_NCS_RegisterAgentInterface());
     }
-    EXPECT_EQ(3u, registrations.size());
+    EXPECT_EQ(registrations.size(), 3u);
     EXPECT_THAT(trace.errors(), testing::IsEmpty());
     EXPECT_THAT(trace.details(), testing::IsEmpty());
 }
@@ -77,8 +77,8 @@ TEST_F(InterfaceRegistration, ItsStatusIsThatOfTheStartUp) {
     ::setenv("TOVRINHOME", scratch.makeDir("home").c_str(), 1);
     ::setenv("QVSDEPLOY_AGENTDEPOT", scratch.makeDir("depot").c_str(), 1);
     answer = 4711;
-    EXPECT_EQ(4711, Initialize_Mgmt_Functions());
-    EXPECT_EQ(1u, registrations.size());
+    EXPECT_EQ(Initialize_Mgmt_Functions(), 4711);
+    EXPECT_EQ(registrations.size(), 1u);
     ::unsetenv("TOVRINHOME");
     ::unsetenv("QVSDEPLOY_AGENTDEPOT");
 }

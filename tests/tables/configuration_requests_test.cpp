@@ -60,7 +60,7 @@ protected:
     static Outcome answer(Values values) {
         values["TRANSID"] = "tx-1";
         oxa::Rows rows;
-        EXPECT_EQ(0, oxa::query("KAGREQT", where(values), rows));
+        EXPECT_EQ(oxa::query("KAGREQT", where(values), rows), 0);
         if (rows.count() != 1) return {-1, "no answer", ""};
         zav_kagreqt_data_t row;
         std::memcpy(&row, rows.row(0), sizeof row);
@@ -70,7 +70,7 @@ protected:
     /// The one row that reports the outcome of an accepted request.
     static Outcome outcome(const Values& values) {
         Outcomes outcomes({{"TRANSID", OPER_EQ, "tx-1"}});
-        EXPECT_EQ(kSuccess, answer(values));
+        EXPECT_EQ(answer(values), kSuccess);
         const auto rows = outcomes.waitFor(1);
         return rows.size() == 1 ? outcomeIn(rows[0]) : Outcome{-1, "no outcome", ""};
     }
@@ -87,8 +87,8 @@ TEST_F(Requests, ActOnTheInstanceThatTheTranslatorNames) {
     home_.translator("echo ' inst1 '");
     for (const char* command : {"START", "STOP", "RESTART"}) {
         EXPECT_EQ(
-            kSuccess,
-            outcome({{"COMMAND", command}, {"PRODUCT", "ux"}, {"TARGETMSN", "inst1:hostA:UX"}}));
+            outcome({{"COMMAND", command}, {"PRODUCT", "ux"}, {"TARGETMSN", "inst1:hostA:UX"}}),
+            kSuccess);
     }
     const std::string start = "[-h][" + home_.home() + "][-o][inst1][start][ux]";
     const std::string stop = "[-h][" + home_.home() + "][-c][-o][inst1][stop][ux]";
@@ -103,15 +103,15 @@ TEST_F(Requests, ActOnNoInstanceWithoutATranslator) {
     home_.inventory(TaskHome::listHeader());
     for (const char* command : {"START", "STOP"}) {
         EXPECT_EQ(
-            kSuccess,
-            outcome({{"COMMAND", command}, {"PRODUCT", "ux"}, {"TARGETMSN", "inst1:hostA:UX"}}));
+            outcome({{"COMMAND", command}, {"PRODUCT", "ux"}, {"TARGETMSN", "inst1:hostA:UX"}}),
+            kSuccess);
     }
     EXPECT_THAT(home_.calls(kAgent),
                 testing::ElementsAre("[-h][" + home_.home() + "][start][ux]",
                                      "[-h][" + home_.home() + "][-c][stop][ux]"));
-    EXPECT_EQ(2, trace_.count('E', "No two-way translator found for product code [ux]"));
-    EXPECT_EQ(2,
-              trace_.count('D', "Returning instance [] for managed system name [inst1:hostA:UX]"));
+    EXPECT_EQ(trace_.count('E', "No two-way translator found for product code [ux]"), 2);
+    EXPECT_EQ(trace_.count('D', "Returning instance [] for managed system name [inst1:hostA:UX]"),
+              2);
 }
 
 // ---- The translator -----------------------------------------------------------------------------
@@ -129,25 +129,25 @@ protected:
 
 TEST_F(TranslatorRequests, NeedATranslator) {
     home_.inventory(TaskHome::listHeader());
-    EXPECT_EQ(failure(1007, "GETCONFIG,ux"), get());
-    EXPECT_EQ(failure(1007, "SETCONFIG,ux"), set());
-    EXPECT_EQ(failure(1007, "REMOVEINSTANCE,ux"), remove());
+    EXPECT_EQ(get(), failure(1007, "GETCONFIG,ux"));
+    EXPECT_EQ(set(), failure(1007, "SETCONFIG,ux"));
+    EXPECT_EQ(remove(), failure(1007, "REMOVEINSTANCE,ux"));
 }
 
 TEST_F(TranslatorRequests, ReportATranslatorThatFails) {
     home_.translator("echo wrong >&2; exit 3");
-    EXPECT_EQ(failure(1008, "GETCONFIG,ux,3," + translatorPath() + " -g  -pc ux"), get());
-    EXPECT_EQ(failure(1008, "SETCONFIG,ux,3," + translatorPath() + " -p  -pc ux,wrong\n"), set());
-    EXPECT_EQ(failure(1008, "REMOVEINSTANCE,ux,3," + translatorPath() + " -r i:UX -pc ux"),
-              remove());
+    EXPECT_EQ(get(), failure(1008, "GETCONFIG,ux,3," + translatorPath() + " -g  -pc ux"));
+    EXPECT_EQ(set(), failure(1008, "SETCONFIG,ux,3," + translatorPath() + " -p  -pc ux,wrong\n"));
+    EXPECT_EQ(remove(),
+              failure(1008, "REMOVEINSTANCE,ux,3," + translatorPath() + " -r i:UX -pc ux"));
 }
 
 TEST_F(TranslatorRequests, ReportATranslatorThatCannotRun) {
     home_.translator("true");
     home_.notExecutable(TaskHome::kTranslator);
-    EXPECT_EQ(failure(1009, "GETCONFIG,ux," + translatorPath() + " -g  -pc ux"), get());
-    EXPECT_EQ(failure(1009, "SETCONFIG,ux," + translatorPath() + " -p  -pc ux"), set());
-    EXPECT_EQ(failure(1009, "REMOVEINSTANCE,ux," + translatorPath() + " -r i:UX -pc ux"), remove());
+    EXPECT_EQ(get(), failure(1009, "GETCONFIG,ux," + translatorPath() + " -g  -pc ux"));
+    EXPECT_EQ(set(), failure(1009, "SETCONFIG,ux," + translatorPath() + " -p  -pc ux"));
+    EXPECT_EQ(remove(), failure(1009, "REMOVEINSTANCE,ux," + translatorPath() + " -r i:UX -pc ux"));
 }
 
 // ---- The universal agent ------------------------------------------------------------------------
@@ -204,8 +204,8 @@ protected:
 };
 
 TEST_F(UniversalAgentRequests, ImportAMetafile) {
-    EXPECT_EQ(kSuccess, importMetafile({{"CONTEXT", "restart=y"}}));
-    EXPECT_EQ("|DATAPROVIDER|SNMP,SOCK|\n", home_.dir().read("home/config/.ConfigData/kumenv"));
+    EXPECT_EQ(importMetafile({{"CONTEXT", "restart=y"}}), kSuccess);
+    EXPECT_EQ(home_.dir().read("home/config/.ConfigData/kumenv"), "|DATAPROVIDER|SNMP,SOCK|\n");
     EXPECT_THAT(home_.calls(kConsole), testing::SizeIs(3));
 }
 
@@ -291,8 +291,8 @@ class FailingRequests : public UniversalAgentRequests,
 
 TEST_P(FailingRequests, AreReportedWithTheirCodeAndParameter) {
     GetParam().arrange(*this);
-    EXPECT_EQ(failure(GetParam().code, GetParam().parameter(*this)),
-              importMetafile(GetParam().request));
+    EXPECT_EQ(importMetafile(GetParam().request),
+              failure(GetParam().code, GetParam().parameter(*this)));
 }
 
 INSTANTIATE_TEST_SUITE_P(AllCodes, FailingRequests, testing::ValuesIn(failures()),

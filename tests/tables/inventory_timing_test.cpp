@@ -28,7 +28,7 @@ TEST(InventoryTiming, ReadingGrowsInProportionToTheNumberOfProducts) {
             ++found;
             return 0;
         };
-        EXPECT_EQ(0, forEachProduct(inventoryOf(products).c_str(), count));
+        EXPECT_EQ(forEachProduct(inventoryOf(products).c_str(), count), 0);
         EXPECT_EQ(products, found);
     });
     EXPECT_LT(growth, kProportionate);

@@ -53,8 +53,8 @@ void expectInitFails(int (*init)(), Manager*& staticManager) {
     allocationsLeft = 0;
     const int status = init();
     allocationsLeft = -1;
-    EXPECT_EQ(0x21060002, status);
-    EXPECT_EQ(former, staticManager);
+    EXPECT_EQ(status, 0x21060002);
+    EXPECT_EQ(staticManager, former);
 }
 
 TEST(OutOfMemory, WithoutAManagerNothingIsRegistered) {
@@ -67,7 +67,7 @@ const std::vector<oxa::Predicate> startRequest = {{"COMMAND", OPER_EQ, "START"},
                                                   {"TRANSID", OPER_EQ, "tx"}};
 
 TEST(OutOfMemory, ARequestThatCannotBeMadeIsNone) {
-    ASSERT_EQ(0, zav_kagreqt_init());
+    ASSERT_EQ(zav_kagreqt_init(), 0);
     int failures = 0;
     lendQuery(startRequest, [&](RequestDetail* detail, ContextInfo* context) {
         const auto make = [&] {
@@ -81,7 +81,7 @@ TEST(OutOfMemory, ARequestThatCannotBeMadeIsNone) {
 }
 
 TEST(OutOfMemory, ASampleThatRunsOutOfMemorySaysSo) {
-    ASSERT_EQ(0, zav_kagreqt_init());
+    ASSERT_EQ(zav_kagreqt_init(), 0);
     int failures = 0;
     lendQuery(startRequest, [&](RequestDetail* detail, ContextInfo* context) {
         std::unique_ptr<rtoxa> request;
@@ -91,7 +91,7 @@ TEST(OutOfMemory, ASampleThatRunsOutOfMemorySaysSo) {
             allocationsLeft = kept;
         };
         remake();
-        ASSERT_EQ(0, request->TakeSample());
+        ASSERT_EQ(request->TakeSample(), 0);
         failures = withEveryFailure(
             [&] {
                 remake();
@@ -103,7 +103,7 @@ TEST(OutOfMemory, ASampleThatRunsOutOfMemorySaysSo) {
 }
 
 TEST(OutOfMemory, AnEventIsNotThrownBack) {
-    ASSERT_EQ(0, zav_kagdyst_init());
+    ASSERT_EQ(zav_kagdyst_init(), 0);
     std::size_t delivered = 0;
     const auto subscription = oxa::subscribe("KAGDYST", {}, [&](const oxa::Rows& rows) {
         delivered += rows.count();
@@ -113,8 +113,8 @@ TEST(OutOfMemory, AnEventIsNotThrownBack) {
     std::memset(&row, ' ', sizeof row);
     withEveryFailure([&] { return publishDeployStatus(&row, 1); }, [](int) {});
     delivered = 0;
-    EXPECT_EQ(0, publishDeployStatus(&row, 1));
-    EXPECT_EQ(1u, delivered);
+    EXPECT_EQ(publishDeployStatus(&row, 1), 0);
+    EXPECT_EQ(delivered, 1u);
 }
 
 }  // namespace

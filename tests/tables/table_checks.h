@@ -48,11 +48,11 @@ inline void expectColumns(rtoxa& request, const std::vector<ExpectedColumn>& exp
     for (int i = 0; i < count; ++i) {
         const ExpectedColumn& column = expected[static_cast<std::size_t>(i)];
         ColumnInfo info{};
-        EXPECT_EQ(0, request.GetColumnInfo(&info, i));
-        EXPECT_STREQ(column.name, info.name);
-        EXPECT_EQ(column.offset, info.offset) << column.name;
-        EXPECT_EQ(column.length, info.length) << column.name;
-        EXPECT_EQ(column.type, info.type) << column.name;
+        EXPECT_EQ(request.GetColumnInfo(&info, i), 0);
+        EXPECT_STREQ(info.name, column.name);
+        EXPECT_EQ(info.offset, column.offset) << column.name;
+        EXPECT_EQ(info.length, column.length) << column.name;
+        EXPECT_EQ(info.type, column.type) << column.name;
     }
 }
 
@@ -60,13 +60,13 @@ inline void expectColumns(rtoxa& request, const std::vector<ExpectedColumn>& exp
 inline void expectColumnBounds(rtoxa& request) {
     const int count = request.NumColumns();
     ColumnInfo info{"untouched", 1, 2, 3};
-    EXPECT_EQ(0x21060007, request.GetColumnInfo(&info, -1));
-    EXPECT_EQ(0x21060007, request.GetColumnInfo(&info, count + 1));
-    EXPECT_EQ(0, request.GetColumnInfo(&info, count));
-    EXPECT_STREQ("untouched", info.name);
-    EXPECT_EQ(1, info.offset);
-    EXPECT_EQ(2, info.length);
-    EXPECT_EQ(3, info.type);
+    EXPECT_EQ(request.GetColumnInfo(&info, -1), 0x21060007);
+    EXPECT_EQ(request.GetColumnInfo(&info, count + 1), 0x21060007);
+    EXPECT_EQ(request.GetColumnInfo(&info, count), 0);
+    EXPECT_STREQ(info.name, "untouched");
+    EXPECT_EQ(info.offset, 1);
+    EXPECT_EQ(info.length, 2);
+    EXPECT_EQ(info.type, 3);
 }
 
 inline int compareColumn(rtoxa& request, const char* column, const std::string& row, _IntfOper op,
@@ -90,17 +90,17 @@ inline void expectComparisons(rtoxa& request, std::size_t rowSize,
             row.replace(offset, length, length, ' ');
             row[offset] = '7';
         }
-        EXPECT_EQ(1, compareColumn(request, column.attribute, row, OPER_EQ, "7")) << column.name;
-        EXPECT_EQ(0, compareColumn(request, column.attribute, row, OPER_NE, "7")) << column.name;
-        EXPECT_EQ(0, compareColumn(request, column.attribute, row, OPER_EQ, "8")) << column.name;
-        EXPECT_EQ(1, compareColumn(request, column.attribute, row, OPER_LT, "8")) << column.name;
-        EXPECT_EQ(0, compareColumn(request, column.name, row, OPER_EQ, "7")) << column.name;
+        EXPECT_EQ(compareColumn(request, column.attribute, row, OPER_EQ, "7"), 1) << column.name;
+        EXPECT_EQ(compareColumn(request, column.attribute, row, OPER_NE, "7"), 0) << column.name;
+        EXPECT_EQ(compareColumn(request, column.attribute, row, OPER_EQ, "8"), 0) << column.name;
+        EXPECT_EQ(compareColumn(request, column.attribute, row, OPER_LT, "8"), 1) << column.name;
+        EXPECT_EQ(compareColumn(request, column.name, row, OPER_EQ, "7"), 0) << column.name;
     }
     const std::string row(rowSize, ' ');
     const std::string longer = std::string(columns[0].attribute) + "X";
-    EXPECT_EQ(0, compareColumn(request, longer.c_str(), row, OPER_EQ, ""));
-    EXPECT_EQ(0, compareColumn(request, "", row, OPER_EQ, ""));
-    EXPECT_EQ(0, compareColumn(request, "NOSUCH", row, OPER_NE, "x"));
+    EXPECT_EQ(compareColumn(request, longer.c_str(), row, OPER_EQ, ""), 0);
+    EXPECT_EQ(compareColumn(request, "", row, OPER_EQ, ""), 0);
+    EXPECT_EQ(compareColumn(request, "NOSUCH", row, OPER_NE, "x"), 0);
 }
 
 /// The slot of a function in the table of virtual functions; a destructor takes two slots.
@@ -115,20 +115,20 @@ std::size_t slotOf(Function function) {
 /// The order of the virtual functions that the framework calls.
 template <typename Base, typename Agent>
 void expectRequestSlots() {
-    EXPECT_EQ(0u, slotOf(&Base::PrintSelf));
-    EXPECT_EQ(1u, slotOf(&Agent::TakeSample));
-    EXPECT_EQ(2u, slotOf(&Base::NumColumns));
-    EXPECT_EQ(3u, slotOf(&Base::GetColumnInfo));
-    EXPECT_EQ(4u, slotOf(&Base::ExecuteCommand));
-    EXPECT_EQ(7u, slotOf(&Base::InsertRow));
-    EXPECT_EQ(8u, slotOf(&Base::CheckForException));
-    EXPECT_EQ(9u, slotOf(&Base::ColumnIsException));
-    EXPECT_EQ(10u, slotOf(&Base::CommandCompleted));
-    EXPECT_EQ(11u, slotOf(&Base::AddData));
+    EXPECT_EQ(slotOf(&Base::PrintSelf), 0u);
+    EXPECT_EQ(slotOf(&Agent::TakeSample), 1u);
+    EXPECT_EQ(slotOf(&Base::NumColumns), 2u);
+    EXPECT_EQ(slotOf(&Base::GetColumnInfo), 3u);
+    EXPECT_EQ(slotOf(&Base::ExecuteCommand), 4u);
+    EXPECT_EQ(slotOf(&Base::InsertRow), 7u);
+    EXPECT_EQ(slotOf(&Base::CheckForException), 8u);
+    EXPECT_EQ(slotOf(&Base::ColumnIsException), 9u);
+    EXPECT_EQ(slotOf(&Base::CommandCompleted), 10u);
+    EXPECT_EQ(slotOf(&Base::AddData), 11u);
 }
 
 template <typename Manager>
 void expectManagerSlots() {
-    EXPECT_EQ(2u, slotOf(&Manager::Shutdown));
-    EXPECT_EQ(3u, slotOf(&Manager::CreateRtoxa));
+    EXPECT_EQ(slotOf(&Manager::Shutdown), 2u);
+    EXPECT_EQ(slotOf(&Manager::CreateRtoxa), 3u);
 }

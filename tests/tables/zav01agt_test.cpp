@@ -59,7 +59,7 @@ protected:
 
     static std::vector<zav_kagreqt_data_t> query(const std::vector<oxa::Predicate>& where) {
         oxa::Rows rows;
-        EXPECT_EQ(0, oxa::query("KAGREQT", where, rows));
+        EXPECT_EQ(oxa::query("KAGREQT", where, rows), 0);
         std::vector<zav_kagreqt_data_t> found(rows.count());
         if (!found.empty()) std::memcpy(found.data(), rows.bytes.data(), rows.bytes.size());
         return found;
@@ -68,7 +68,7 @@ protected:
     /// The one row that answers a request.
     static zav_kagreqt_data_t answer(const std::vector<oxa::Predicate>& where) {
         const auto rows = query(where);
-        EXPECT_EQ(1u, rows.size());
+        EXPECT_EQ(rows.size(), 1u);
         return rows.empty() ? zav_kagreqt_data_t{} : rows[0];
     }
 };
@@ -94,24 +94,24 @@ TEST(RequestTableSchema, KeepsTheFrameworksOrderOfVirtualFunctions) {
 TEST(RequestTableSchema, AccessorsPointIntoTheRow) {
     Made request("KAGREQT");
     zav_kagreqt_data_t rows[] = {rowOf("tx-0", 10), rowOf("tx-1", 11)};
-    ASSERT_EQ(0, request->AddData(rows, 2));
-    ASSERT_EQ(2, request->NumDataItems());
+    ASSERT_EQ(request->AddData(rows, 2), 0);
+    ASSERT_EQ(request->NumDataItems(), 2);
     char* const base = request->Data(1);
-    EXPECT_EQ(base + 0, request->_get_value_originnode(1));
-    EXPECT_EQ(base + 64, request->_get_value_transid(1));
-    EXPECT_EQ(base + 148, request->_get_value_command(1));
-    EXPECT_EQ(base + 164, request->_get_value_product(1));
-    EXPECT_EQ(base + 196, request->_get_value_context(1));
-    EXPECT_EQ(base + 3268, request->_get_value_optional(1));
-    EXPECT_EQ(base + 3300, request->_get_value_uaconfig(1));
-    EXPECT_EQ(base + 3332, request->_get_value_uascript(1));
-    EXPECT_EQ(base + 3844, reinterpret_cast<char*>(request->_get_value_retval(1)));
-    EXPECT_EQ(base + 3848, request->_get_value_version(1));
-    EXPECT_EQ(base + 3860, request->_get_value_retmsgid(1));
-    EXPECT_EQ(base + 3876, request->_get_value_retmsgparm(1));
-    EXPECT_EQ(base + 4132, request->_get_value_targetmsn(1));
-    EXPECT_EQ(11, *request->_get_value_retval(1));
-    EXPECT_EQ(base, reinterpret_cast<char*>(request->GetRow(1)));
+    EXPECT_EQ(request->_get_value_originnode(1), base + 0);
+    EXPECT_EQ(request->_get_value_transid(1), base + 64);
+    EXPECT_EQ(request->_get_value_command(1), base + 148);
+    EXPECT_EQ(request->_get_value_product(1), base + 164);
+    EXPECT_EQ(request->_get_value_context(1), base + 196);
+    EXPECT_EQ(request->_get_value_optional(1), base + 3268);
+    EXPECT_EQ(request->_get_value_uaconfig(1), base + 3300);
+    EXPECT_EQ(request->_get_value_uascript(1), base + 3332);
+    EXPECT_EQ(reinterpret_cast<char*>(request->_get_value_retval(1)), base + 3844);
+    EXPECT_EQ(request->_get_value_version(1), base + 3848);
+    EXPECT_EQ(request->_get_value_retmsgid(1), base + 3860);
+    EXPECT_EQ(request->_get_value_retmsgparm(1), base + 3876);
+    EXPECT_EQ(request->_get_value_targetmsn(1), base + 4132);
+    EXPECT_EQ(*request->_get_value_retval(1), 11);
+    EXPECT_EQ(reinterpret_cast<char*>(request->GetRow(1)), base);
 }
 
 TEST(RequestTableSchema, DataIndexesAreThoseOfHeldRows) {
@@ -126,20 +126,20 @@ TEST(RequestTableSchema, DataIndexesAreThoseOfHeldRows) {
 
 TEST(RequestTableSchema, MakesRoomForOneRowAtATime) {
     Made request("KAGREQT");
-    EXPECT_EQ(1u, request->AllocationDefault());
+    EXPECT_EQ(request->AllocationDefault(), 1u);
 }
 
 TEST(RequestTableSchema, AddsOnlyRowsThatTheFilterWants) {
     Made request("KAGREQT", {{"TRANSID", OPER_EQ, "x"}});
     zav_kagreqt_data_t rows[] = {rowOf("x", 1), rowOf("y", 2), rowOf("x", 3)};
     TraceCapture trace;
-    EXPECT_EQ(0, request->AddData(rows, 3));
-    EXPECT_EQ((Texts{"Passing row 0 to InsertRow().", "Passing row 2 to InsertRow()."}),
-              trace.details("zav01agt"));
-    ASSERT_EQ(2, request->NumDataItems());
-    EXPECT_EQ(3, *request->_get_value_retval(1));
-    EXPECT_EQ(1, request->IsRowException(&rows[0]));
-    EXPECT_EQ(0, request->IsRowException(&rows[1]));
+    EXPECT_EQ(request->AddData(rows, 3), 0);
+    EXPECT_EQ(trace.details("zav01agt"),
+              (Texts{"Passing row 0 to InsertRow().", "Passing row 2 to InsertRow()."}));
+    ASSERT_EQ(request->NumDataItems(), 2);
+    EXPECT_EQ(*request->_get_value_retval(1), 3);
+    EXPECT_EQ(request->IsRowException(&rows[0]), 1);
+    EXPECT_EQ(request->IsRowException(&rows[1]), 0);
 }
 
 /// A request that has room for one row only.
@@ -157,16 +157,16 @@ TEST(RequestTableSchema, AFailedInsertIsTheLastOne) {
     zav_kagreqt_manager manager("ZAV", "KAGREQT");
     FullRequest request(&manager);
     zav_kagreqt_data_t rows[] = {rowOf("a"), rowOf("b"), rowOf("c")};
-    EXPECT_EQ(4711, request.AddData(rows, 3));
-    EXPECT_EQ(2, request.inserts);
-    EXPECT_EQ(1, request.NumDataItems());
-    EXPECT_EQ(4711, request.TakeSample()) << "a sample ends as its insert does";
+    EXPECT_EQ(request.AddData(rows, 3), 4711);
+    EXPECT_EQ(request.inserts, 2);
+    EXPECT_EQ(request.NumDataItems(), 1);
+    EXPECT_EQ(request.TakeSample(), 4711) << "a sample ends as its insert does";
 }
 
 TEST(RequestTableSchema, AddingNothingSucceeds) {
     Made request("KAGREQT");
-    EXPECT_EQ(0, request->AddData(nullptr, 0));
-    EXPECT_EQ(0, request->NumDataItems());
+    EXPECT_EQ(request->AddData(nullptr, 0), 0);
+    EXPECT_EQ(request->NumDataItems(), 0);
 }
 
 TEST(RequestTableSchema, PrintsItselfAndItsRows) {
@@ -207,7 +207,7 @@ TEST(RequestTableSchema, PrintsItselfAndItsRows) {
         "\t\t}",
         "\t}",
     };
-    EXPECT_EQ(expected, lines);
+    EXPECT_EQ(lines, expected);
 }
 
 TEST(RequestTableSchema, PrintsNothingWhenDetailIsOff) {
@@ -220,14 +220,14 @@ TEST(RequestTableSchema, PrintsNothingWhenDetailIsOff) {
 // ---- Start-up -----------------------------------------------------------------------------------
 
 TEST(RequestTableInit, RegistersTheTable) {
-    EXPECT_STREQ("ZAV", zav_kagreqt_application);
-    EXPECT_STREQ("KAGREQT", zav_kagreqt_table);
+    EXPECT_STREQ(zav_kagreqt_application, "ZAV");
+    EXPECT_STREQ(zav_kagreqt_table, "KAGREQT");
     zav_kagreqt_manager* const former = zav_kagreqt_static_manager;
-    EXPECT_EQ(0, zav_kagreqt_init());
-    ASSERT_NE(nullptr, zav_kagreqt_static_manager);
-    EXPECT_NE(former, zav_kagreqt_static_manager);
-    EXPECT_STREQ("ZAV", zav_kagreqt_static_manager->ApplicationName());
-    EXPECT_STREQ("KAGREQT", zav_kagreqt_static_manager->TableName());
+    EXPECT_EQ(zav_kagreqt_init(), 0);
+    ASSERT_NE(zav_kagreqt_static_manager, nullptr);
+    EXPECT_NE(zav_kagreqt_static_manager, former);
+    EXPECT_STREQ(zav_kagreqt_static_manager->ApplicationName(), "ZAV");
+    EXPECT_STREQ(zav_kagreqt_static_manager->TableName(), "KAGREQT");
     bool found = false;
     for (const oxa::Table& table : oxa::tables()) {
         found = found || (table.application == "ZAV" && table.name == "KAGREQT");
@@ -239,11 +239,11 @@ TEST(RequestTableInit, RegistersTheTable) {
 
 TEST_F(RequestTable, ARequestWithoutFilterIs1002) {
     const zav_kagreqt_data_t row = answer({});
-    EXPECT_EQ(1002, row.retval);
-    EXPECT_EQ(padded("ZAV1002E", 16), fieldText(row.retmsgid));
-    EXPECT_EQ(padded("", 256), fieldText(row.retmsgparm));
-    EXPECT_EQ(padded("this-node", 64), fieldText(row.originnode));
-    EXPECT_EQ(padded("", 84), fieldText(row.transid));
+    EXPECT_EQ(row.retval, 1002);
+    EXPECT_EQ(fieldText(row.retmsgid), padded("ZAV1002E", 16));
+    EXPECT_EQ(fieldText(row.retmsgparm), padded("", 256));
+    EXPECT_EQ(fieldText(row.originnode), padded("this-node", 64));
+    EXPECT_EQ(fieldText(row.transid), padded("", 84));
 }
 
 TEST_F(RequestTable, TheAnswerRepeatsTheRequest) {
@@ -256,27 +256,27 @@ TEST_F(RequestTable, TheAnswerRepeatsTheRequest) {
                                            {"UASCRIPT", OPER_EQ, "script"},
                                            {"VERSION", OPER_EQ, "0620"},
                                            {"TARGETMSN", OPER_EQ, "m:UX"}});
-    EXPECT_EQ("this-node", trimmedField(row.originnode));
-    EXPECT_EQ("tx-1", trimmedField(row.transid));
-    EXPECT_EQ("START", trimmedField(row.command));
-    EXPECT_EQ("ux", trimmedField(row.product));
-    EXPECT_EQ("ctx", trimmedField(row.context));
-    EXPECT_EQ("opt", trimmedField(row.optional));
-    EXPECT_EQ("conf", trimmedField(row.uaconfig));
-    EXPECT_EQ("script", trimmedField(row.uascript));
-    EXPECT_EQ("0620", trimmedField(row.version));
-    EXPECT_EQ("m:UX", trimmedField(row.targetmsn));
-    EXPECT_EQ(0, row.retval);
-    EXPECT_EQ("", trimmedField(row.retmsgid));
-    ASSERT_EQ(1u, taskQueue.size());
+    EXPECT_EQ(trimmedField(row.originnode), "this-node");
+    EXPECT_EQ(trimmedField(row.transid), "tx-1");
+    EXPECT_EQ(trimmedField(row.command), "START");
+    EXPECT_EQ(trimmedField(row.product), "ux");
+    EXPECT_EQ(trimmedField(row.context), "ctx");
+    EXPECT_EQ(trimmedField(row.optional), "opt");
+    EXPECT_EQ(trimmedField(row.uaconfig), "conf");
+    EXPECT_EQ(trimmedField(row.uascript), "script");
+    EXPECT_EQ(trimmedField(row.version), "0620");
+    EXPECT_EQ(trimmedField(row.targetmsn), "m:UX");
+    EXPECT_EQ(row.retval, 0);
+    EXPECT_EQ(trimmedField(row.retmsgid), "");
+    ASSERT_EQ(taskQueue.size(), 1u);
     EXPECT_TRUE(taskQueue.front().getTransid() == "tx-1");
 }
 
 TEST_F(RequestTable, LowerCaseNamesMatchNothing) {
     const zav_kagreqt_data_t row = answer(
         {{"transid", OPER_EQ, "tx"}, {"command", OPER_EQ, "START"}, {"product", OPER_EQ, "ux"}});
-    EXPECT_EQ(1002, row.retval);
-    EXPECT_EQ("ZAV1002E", trimmedField(row.retmsgid));
+    EXPECT_EQ(row.retval, 1002);
+    EXPECT_EQ(trimmedField(row.retmsgid), "ZAV1002E");
     EXPECT_TRUE(taskQueue.empty());
 }
 
@@ -287,7 +287,7 @@ TEST_F(RequestTable, AColumnNamedTwiceKeepsTheLastValue) {
     Made request("KAGREQT", where);
     TraceCapture trace;
     request->TakeSample();
-    EXPECT_EQ(1, trace.count('D', "Going to run command STOP"));
+    EXPECT_EQ(trace.count('D', "Going to run command STOP"), 1);
 }
 
 TEST_F(RequestTable, ColumnsOfTheOutcomeSayNothingAboutTheRequest) {
@@ -298,8 +298,8 @@ TEST_F(RequestTable, ColumnsOfTheOutcomeSayNothingAboutTheRequest) {
                                            {"RETVAL", OPER_LT, "5"},
                                            {"RETMSGID", OPER_NE, "x"},
                                            {"RETMSGPARM", OPER_NE, "x"}});
-    EXPECT_EQ("this-node", trimmedField(row.originnode));
-    EXPECT_EQ("", trimmedField(row.retmsgid));
+    EXPECT_EQ(trimmedField(row.originnode), "this-node");
+    EXPECT_EQ(trimmedField(row.retmsgid), "");
 }
 
 TEST_F(RequestTable, TheAnswerMustSatisfyTheFilterToo) {
@@ -308,15 +308,15 @@ TEST_F(RequestTable, TheAnswerMustSatisfyTheFilterToo) {
                        {"PRODUCT", OPER_EQ, "ux"},
                        {"RETVAL", OPER_EQ, "1003"}})
                     .empty());
-    EXPECT_EQ(1u, taskQueue.size());
+    EXPECT_EQ(taskQueue.size(), 1u);
 }
 
 TEST_F(RequestTable, ValuesAreTakenAsTheyAre) {
     const zav_kagreqt_data_t row = answer(
         {{"COMMAND", OPER_EQ, "START "}, {"TRANSID", OPER_EQ, " tx "}, {"PRODUCT", OPER_EQ, "ux"}});
-    EXPECT_EQ(1006, row.retval);
-    EXPECT_EQ(padded("START ", 256), fieldText(row.retmsgparm));
-    EXPECT_EQ(padded(" tx ", 84), fieldText(row.transid));
+    EXPECT_EQ(row.retval, 1006);
+    EXPECT_EQ(fieldText(row.retmsgparm), padded("START ", 256));
+    EXPECT_EQ(fieldText(row.transid), padded(" tx ", 84));
 }
 
 TEST_F(RequestTable, AValueThatWasCutStillGetsItsAnswer) {
@@ -327,11 +327,11 @@ TEST_F(RequestTable, AValueThatWasCutStillGetsItsAnswer) {
                                            {"PRODUCT", OPER_EQ, "ux"},
                                            {"VERSION", OPER_EQ, "0620"},
                                            {"CONTEXT", OPER_EQ, context}});
-    EXPECT_EQ(0, row.retval);
-    EXPECT_EQ(std::string(3072, 'c'), fieldText(row.context));
-    EXPECT_EQ(1u, trace.errors("zavtqelm").size());
-    ASSERT_EQ(1u, taskQueue.size());
-    EXPECT_EQ(3073u, taskQueue.front().getContext().length());
+    EXPECT_EQ(row.retval, 0);
+    EXPECT_EQ(fieldText(row.context), std::string(3072, 'c'));
+    EXPECT_EQ(trace.errors("zavtqelm").size(), 1u);
+    ASSERT_EQ(taskQueue.size(), 1u);
+    EXPECT_EQ(taskQueue.front().getContext().length(), 3073u);
 }
 
 /// Sets the process's code page while it exists.
@@ -361,17 +361,17 @@ TEST_F(RequestTable, ARequestWhoseTextTheCodePageCutsIsQueuedWithoutAnAnswer) {
     };
     // The row has room for one byte per character and one more; the filter holds all bytes.
     const auto answered = ask("u\u00E9");
-    ASSERT_EQ(1u, answered.size());
-    EXPECT_EQ(padded("u\u00E9", 32), fieldText(answered[0].product));
+    ASSERT_EQ(answered.size(), 1u);
+    EXPECT_EQ(fieldText(answered[0].product), padded("u\u00E9", 32));
     EXPECT_TRUE(ask("\u00E9\u00E9").empty());
-    ASSERT_EQ(2u, taskQueue.size());
-    EXPECT_EQ(2u, taskQueue.back().getProduct().length());
+    ASSERT_EQ(taskQueue.size(), 2u);
+    EXPECT_EQ(taskQueue.back().getProduct().length(), 2u);
 }
 
 TEST_F(RequestTable, AnAnswerIsTraced) {
     TraceCapture trace;
     answer({{"TRANSID", OPER_EQ, "tx"}});
-    EXPECT_EQ((Texts{"Passing row 0 to InsertRow()."}), trace.details("zav01agt"));
+    EXPECT_EQ(trace.details("zav01agt"), (Texts{"Passing row 0 to InsertRow()."}));
 }
 
 TEST_F(RequestTable, GetconfigIsAnsweredWithTheConfiguration) {
@@ -386,14 +386,14 @@ TEST_F(RequestTable, GetconfigIsAnsweredWithTheConfiguration) {
     const std::vector<oxa::Predicate> where = {
         {"COMMAND", OPER_EQ, "GETCONFIG"}, {"TRANSID", OPER_EQ, "tx"}, {"PRODUCT", OPER_EQ, "ux"}};
     const zav_kagreqt_data_t good = answer(where);
-    EXPECT_EQ(0, good.retval) << trimmedField(good.retmsgparm);
-    EXPECT_EQ("INSTANCE=-pc", trimmedField(good.context).substr(0, 12));
+    EXPECT_EQ(good.retval, 0) << trimmedField(good.retmsgparm);
+    EXPECT_EQ(trimmedField(good.context).substr(0, 12), "INSTANCE=-pc");
 
     const ScopedEnv failing("FAKE_EXIT", "3");
     const zav_kagreqt_data_t bad = answer(where);
-    EXPECT_EQ(1008, bad.retval);
-    EXPECT_EQ("ZAV1008E", trimmedField(bad.retmsgid));
-    EXPECT_EQ("GETCONFIG,ux,", trimmedField(bad.retmsgparm).substr(0, 13));
+    EXPECT_EQ(bad.retval, 1008);
+    EXPECT_EQ(trimmedField(bad.retmsgid), "ZAV1008E");
+    EXPECT_EQ(trimmedField(bad.retmsgparm).substr(0, 13), "GETCONFIG,ux,");
     ZAV_TOVRINHOME = nullptr;
 }
 
@@ -419,10 +419,10 @@ TEST_F(RequestEvents, ReachEverySubscriberWhoseFilterWantsThem) {
     const auto all = subscribe(0);
     const auto some = subscribe(0, {{"TRANSID", OPER_EQ, "x"}});
     zav_kagreqt_data_t rows[] = {rowOf("x"), rowOf("y")};
-    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(rows, 2));
-    EXPECT_EQ(3u, delivered_);
-    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(rows, 1));
-    EXPECT_EQ(5u, delivered_);  // rows are not delivered twice
+    EXPECT_EQ(zav_kagreqt_manager::EventArrived(rows, 2), 0);
+    EXPECT_EQ(delivered_, 3u);
+    EXPECT_EQ(zav_kagreqt_manager::EventArrived(rows, 1), 0);
+    EXPECT_EQ(delivered_, 5u);  // rows are not delivered twice
 }
 
 TEST_F(RequestEvents, ReturnTheLastRefusal) {
@@ -430,8 +430,8 @@ TEST_F(RequestEvents, ReturnTheLastRefusal) {
     const auto second = subscribe(OXA_GONE);
     const auto third = subscribe(0);
     zav_kagreqt_data_t row = rowOf("x");
-    EXPECT_EQ(OXA_GONE, zav_kagreqt_manager::EventArrived(&row, 1));
-    EXPECT_EQ(3u, delivered_);
+    EXPECT_EQ(zav_kagreqt_manager::EventArrived(&row, 1), OXA_GONE);
+    EXPECT_EQ(delivered_, 3u);
 }
 
 /// A table whose requests record how often they were in use when a row was inserted.
@@ -457,14 +457,14 @@ public:
 
 TEST_F(RequestEvents, KeepARequestInUseAndLeaveItEmpty) {
     WatchedManager manager;
-    ASSERT_EQ(0, manager.RegisterWithManager());
+    ASSERT_EQ(manager.RegisterWithManager(), 0);
     const auto subscription = subscribe(0);
     zav_kagreqt_data_t row = rowOf("x");
-    EXPECT_EQ(0, manager.AddDataToEvent(&row, 1));
-    EXPECT_EQ(1u, delivered_);
-    EXPECT_EQ(1u, manager.made->useAtInsert);
-    EXPECT_EQ(0u, manager.made->UseCount());
-    EXPECT_EQ(0, manager.made->NumDataItems());
+    EXPECT_EQ(manager.AddDataToEvent(&row, 1), 0);
+    EXPECT_EQ(delivered_, 1u);
+    EXPECT_EQ(manager.made->useAtInsert, 1u);
+    EXPECT_EQ(manager.made->UseCount(), 0u);
+    EXPECT_EQ(manager.made->NumDataItems(), 0);
 }
 
 TEST_F(RequestEvents, AreGivenUnderTheTablesLock) {
@@ -480,7 +480,7 @@ TEST_F(RequestEvents, AreGivenUnderTheTablesLock) {
         return locked ? OXA_GONE : OXA_OK;
     });
     zav_kagreqt_data_t row = rowOf("x");
-    EXPECT_EQ(OXA_OK, zav_kagreqt_manager::EventArrived(&row, 1));
+    EXPECT_EQ(zav_kagreqt_manager::EventArrived(&row, 1), OXA_OK);
     ASSERT_TRUE(other.joinable());
     other.join();
     EXPECT_TRUE(locked) << "the lock is given back";
@@ -488,13 +488,13 @@ TEST_F(RequestEvents, AreGivenUnderTheTablesLock) {
 
 TEST_F(RequestEvents, WithoutSubscribersNothingHappens) {
     zav_kagreqt_data_t row = rowOf("x");
-    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(&row, 1));
+    EXPECT_EQ(zav_kagreqt_manager::EventArrived(&row, 1), 0);
 }
 
 TEST_F(RequestEvents, WithoutManagerNothingHappens) {
     zav_kagreqt_manager* const kept = std::exchange(zav_kagreqt_static_manager, nullptr);
     zav_kagreqt_data_t row = rowOf("x");
-    EXPECT_EQ(0, zav_kagreqt_manager::EventArrived(&row, 1));
+    EXPECT_EQ(zav_kagreqt_manager::EventArrived(&row, 1), 0);
     zav_kagreqt_static_manager = kept;
 }
 

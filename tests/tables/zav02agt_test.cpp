@@ -54,19 +54,19 @@ TEST(StatusTableSchema, KeepsTheFrameworksOrderOfVirtualFunctions) {
 TEST(StatusTableSchema, AccessorsPointIntoTheRow) {
     Made request("KAGDYST");
     zav_kagdyst_data_t rows[] = {rowOf("tx-0"), rowOf("tx-1", 5)};
-    ASSERT_EQ(0, request->AddData(rows, 2));
+    ASSERT_EQ(request->AddData(rows, 2), 0);
     char* const base = request->Data(1);
-    EXPECT_EQ(base + 0, request->_get_value_originnode(1));
-    EXPECT_EQ(base + 64, request->_get_value_transid(1));
-    EXPECT_EQ(base + 148, request->_get_value_command(1));
-    EXPECT_EQ(base + 164, reinterpret_cast<char*>(request->_get_value_retval(1)));
-    EXPECT_EQ(base + 168, request->_get_value_retmsgid(1));
-    EXPECT_EQ(base + 184, request->_get_value_retmsgparm(1));
-    EXPECT_EQ(base + 440, request->_get_value_targetmsn(1));
-    EXPECT_EQ(5, *request->_get_value_retval(1));
+    EXPECT_EQ(request->_get_value_originnode(1), base + 0);
+    EXPECT_EQ(request->_get_value_transid(1), base + 64);
+    EXPECT_EQ(request->_get_value_command(1), base + 148);
+    EXPECT_EQ(reinterpret_cast<char*>(request->_get_value_retval(1)), base + 164);
+    EXPECT_EQ(request->_get_value_retmsgid(1), base + 168);
+    EXPECT_EQ(request->_get_value_retmsgparm(1), base + 184);
+    EXPECT_EQ(request->_get_value_targetmsn(1), base + 440);
+    EXPECT_EQ(*request->_get_value_retval(1), 5);
     EXPECT_TRUE(request->CheckDataIndex(1));
     EXPECT_FALSE(request->CheckDataIndex(2));
-    EXPECT_EQ(1u, request->AllocationDefault());
+    EXPECT_EQ(request->AllocationDefault(), 1u);
 }
 
 TEST(StatusTableSchema, PrintsItselfAndItsRows) {
@@ -95,24 +95,24 @@ TEST(StatusTableSchema, PrintsItselfAndItsRows) {
         "\t\t}",
         "\t}",
     };
-    EXPECT_EQ(expected, trace.details("zav02agt"));
+    EXPECT_EQ(trace.details("zav02agt"), expected);
 }
 
 TEST(StatusTable, IsRegisteredUnderItsNames) {
-    EXPECT_STREQ("ZAV", zav_kagdyst_application);
-    EXPECT_STREQ("KAGDYST", zav_kagdyst_table);
-    ASSERT_EQ(0, zav_kagdyst_init());
-    EXPECT_STREQ("ZAV", zav_kagdyst_static_manager->ApplicationName());
-    EXPECT_STREQ("KAGDYST", zav_kagdyst_static_manager->TableName());
+    EXPECT_STREQ(zav_kagdyst_application, "ZAV");
+    EXPECT_STREQ(zav_kagdyst_table, "KAGDYST");
+    ASSERT_EQ(zav_kagdyst_init(), 0);
+    EXPECT_STREQ(zav_kagdyst_static_manager->ApplicationName(), "ZAV");
+    EXPECT_STREQ(zav_kagdyst_static_manager->TableName(), "KAGDYST");
 }
 
 TEST(StatusTable, APlainQueryIsAnsweredWithoutRows) {
-    ASSERT_EQ(0, zav_kagdyst_init());
+    ASSERT_EQ(zav_kagdyst_init(), 0);
     zav_kagdyst_data_t row = rowOf("before");
     publishDeployStatus(&row, 1);
     oxa::Rows rows;
-    EXPECT_EQ(0, oxa::query("KAGDYST", {}, rows));
-    EXPECT_EQ(0u, rows.count());
+    EXPECT_EQ(oxa::query("KAGDYST", {}, rows), 0);
+    EXPECT_EQ(rows.count(), 0u);
 }
 
 TEST(StatusTable, EventsReachWhoeverWantsThem) {
@@ -121,16 +121,16 @@ TEST(StatusTable, EventsReachWhoeverWantsThem) {
     Outcomes failures({{"RETVAL", OPER_NE, "0"}});
     zav_kagdyst_data_t rows[] = {rowOf("x"), rowOf("y", 1024), rowOf("xx")};
     TraceCapture trace;
-    EXPECT_EQ(0, publishDeployStatus(rows, 3));
-    EXPECT_EQ(3u, all.rows().size());
-    ASSERT_EQ(1u, mine.rows().size());
-    EXPECT_EQ("x", trimmedField(mine.rows()[0].transid));
-    ASSERT_EQ(1u, failures.rows().size());
-    EXPECT_EQ(1024, failures.rows()[0].retval);
-    EXPECT_EQ((Texts{"Passing row 0 to InsertRow().", "Passing row 1 to InsertRow().",
+    EXPECT_EQ(publishDeployStatus(rows, 3), 0);
+    EXPECT_EQ(all.rows().size(), 3u);
+    ASSERT_EQ(mine.rows().size(), 1u);
+    EXPECT_EQ(trimmedField(mine.rows()[0].transid), "x");
+    ASSERT_EQ(failures.rows().size(), 1u);
+    EXPECT_EQ(failures.rows()[0].retval, 1024);
+    EXPECT_EQ(trace.details("zav02agt"),
+              (Texts{"Passing row 0 to InsertRow().", "Passing row 1 to InsertRow().",
                      "Passing row 2 to InsertRow().", "Passing row 0 to InsertRow().",
-                     "Passing row 1 to InsertRow()."}),
-              trace.details("zav02agt"));
+                     "Passing row 1 to InsertRow()."}));
 }
 
 TEST(StatusTable, EventsArePublishedByteForByte) {
@@ -141,42 +141,42 @@ TEST(StatusTable, EventsArePublishedByteForByte) {
     }
     publishDeployStatus(&row, 1);
     const auto rows = all.rows();
-    ASSERT_EQ(1u, rows.size());
-    EXPECT_EQ(0, std::memcmp(&row, &rows[0], sizeof row));
+    ASSERT_EQ(rows.size(), 1u);
+    EXPECT_EQ(std::memcmp(&row, &rows[0], sizeof row), 0);
 }
 
 TEST(StatusTable, ARefusalIsReturnedAndKeepsNothingFromTheOthers) {
-    ASSERT_EQ(0, zav_kagdyst_init());
+    ASSERT_EQ(zav_kagdyst_init(), 0);
     const auto slow =
         oxa::subscribe("KAGDYST", {}, [](const oxa::Rows&) -> int { return OXA_OVERFLOW; });
     Outcomes others;
     zav_kagdyst_data_t row = rowOf("x");
-    EXPECT_EQ(OXA_OVERFLOW, publishDeployStatus(&row, 1));
-    EXPECT_EQ(1u, others.rows().size());
+    EXPECT_EQ(publishDeployStatus(&row, 1), OXA_OVERFLOW);
+    EXPECT_EQ(others.rows().size(), 1u);
 }
 
 TEST(StatusTable, WithoutManagerTheStatusIsLost) {
     zav_kagdyst_manager* const kept = std::exchange(zav_kagdyst_static_manager, nullptr);
     zav_kagdyst_data_t row = rowOf("x");
-    EXPECT_EQ(0, publishDeployStatus(&row, 1));
+    EXPECT_EQ(publishDeployStatus(&row, 1), 0);
     zav_kagdyst_static_manager = kept;
 }
 
 TEST(StatusTable, SubscriptionsOutliveANewRegistration) {
     Outcomes outcomes;
-    ASSERT_EQ(0, zav_kagdyst_init());
+    ASSERT_EQ(zav_kagdyst_init(), 0);
     zav_kagdyst_data_t row = rowOf("x");
     publishDeployStatus(&row, 1);
-    EXPECT_EQ(1u, outcomes.rows().size());
+    EXPECT_EQ(outcomes.rows().size(), 1u);
 }
 
 TEST(StatusTable, SubscribersComeAndGoWhileEventsArrive) {
-    ASSERT_EQ(0, zav_kagdyst_init());
+    ASSERT_EQ(zav_kagdyst_init(), 0);
     std::atomic<bool> done{false};
     std::thread executor([&done] {
         zav_kagdyst_data_t row = rowOf("x");
         while (!done)
-            EXPECT_EQ(0, publishDeployStatus(&row, 1));
+            EXPECT_EQ(publishDeployStatus(&row, 1), 0);
     });
     std::vector<std::thread> subscribers;
     for (int i = 0; i < 3; ++i) {

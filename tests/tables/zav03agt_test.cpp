@@ -54,17 +54,17 @@ TEST(InstalledTableSchema, AccessorsPointIntoTheRow) {
     Made request("KINAGT");
     zav_kinagt_data_t rows[2];
     std::memset(rows, ' ', sizeof rows);
-    ASSERT_EQ(0, request->AddData(rows, 2));
+    ASSERT_EQ(request->AddData(rows, 2), 0);
     char* const base = request->Data(1);
-    EXPECT_EQ(base + 0, request->_get_value_originnode(1));
-    EXPECT_EQ(base + 64, request->_get_value_tovrinhome(1));
-    EXPECT_EQ(base + 576, request->_get_value_hosttype(1));
-    EXPECT_EQ(base + 581, request->_get_value_hostpc(1));
-    EXPECT_EQ(base + 591, request->_get_value_product(1));
-    EXPECT_EQ(base + 623, request->_get_value_version(1));
-    EXPECT_EQ(base + 635, request->_get_value_proddesc(1));
-    EXPECT_EQ(base + 715, request->_get_value_release(1));
-    EXPECT_EQ(base + 727, request->_get_value_platform(1));
+    EXPECT_EQ(request->_get_value_originnode(1), base + 0);
+    EXPECT_EQ(request->_get_value_tovrinhome(1), base + 64);
+    EXPECT_EQ(request->_get_value_hosttype(1), base + 576);
+    EXPECT_EQ(request->_get_value_hostpc(1), base + 581);
+    EXPECT_EQ(request->_get_value_product(1), base + 591);
+    EXPECT_EQ(request->_get_value_version(1), base + 623);
+    EXPECT_EQ(request->_get_value_proddesc(1), base + 635);
+    EXPECT_EQ(request->_get_value_release(1), base + 715);
+    EXPECT_EQ(request->_get_value_platform(1), base + 727);
 }
 
 TEST(InstalledTableSchema, PrintsItselfAndItsRows) {
@@ -98,7 +98,7 @@ TEST(InstalledTableSchema, PrintsItselfAndItsRows) {
         "\t\t}",
         "\t}",
     };
-    EXPECT_EQ(expected, trace.details("zav03agt"));
+    EXPECT_EQ(trace.details("zav03agt"), expected);
 }
 
 // ---- Samples ------------------------------------------------------------------------------------
@@ -132,7 +132,7 @@ protected:
     }
     static std::vector<zav_kinagt_data_t> rows(const std::vector<oxa::Predicate>& where = {}) {
         std::vector<zav_kinagt_data_t> found;
-        EXPECT_EQ(0, sample(found, where));
+        EXPECT_EQ(sample(found, where), 0);
         return found;
     }
 
@@ -141,22 +141,22 @@ protected:
 };
 
 TEST_F(InstalledTable, IsRegisteredUnderItsNames) {
-    EXPECT_STREQ("ZAV", zav_kinagt_application);
-    EXPECT_STREQ("KINAGT", zav_kinagt_table);
-    EXPECT_STREQ("ZAV", zav_kinagt_static_manager->ApplicationName());
-    EXPECT_STREQ("KINAGT", zav_kinagt_static_manager->TableName());
+    EXPECT_STREQ(zav_kinagt_application, "ZAV");
+    EXPECT_STREQ(zav_kinagt_table, "KINAGT");
+    EXPECT_STREQ(zav_kinagt_static_manager->ApplicationName(), "ZAV");
+    EXPECT_STREQ(zav_kinagt_static_manager->TableName(), "KINAGT");
 }
 
 TEST_F(InstalledTable, ListsAProductByteForByte) {
     inventory("\"ux\",\"Monitoring Agent\",\"lx8266\",\"06200000\",\"100\"\n");
     const auto found = rows();
-    ASSERT_EQ(1u, found.size());
+    ASSERT_EQ(found.size(), 1u);
     const std::string expected = padded("this-node", 64) + padded(home_, 512) + "Linux" +
                                  padded("lx8266", 10) + padded("ux", 32) + padded("062000000", 12) +
                                  padded("Monitoring Agent", 80) + padded("100", 12) +
                                  padded("lx8266", 20);
-    ASSERT_EQ(747u, expected.size());
-    EXPECT_EQ(expected, std::string(reinterpret_cast<const char*>(&found[0]), sizeof found[0]));
+    ASSERT_EQ(expected.size(), 747u);
+    EXPECT_EQ(std::string(reinterpret_cast<const char*>(&found[0]), sizeof found[0]), expected);
 }
 
 TEST_F(InstalledTable, RunsTheProbeAndThenTheInventory) {
@@ -167,39 +167,39 @@ TEST_F(InstalledTable, RunsTheProbeAndThenTheInventory) {
     for (const std::string& line : trace.details()) {
         if (line.compare(0, 15, "Command to run ") == 0) commandLines.push_back(line);
     }
-    EXPECT_EQ((Texts{"Command to run is \"/bin/ksh -c '. " + home_ + "/bin/dynarch.shl " + home_ +
+    EXPECT_EQ(commandLines,
+              (Texts{"Command to run is \"/bin/ksh -c '. " + home_ + "/bin/dynarch.shl " + home_ +
                          "/registry/archdsc.tbl >/dev/null 2>&1;echo ArchitectureHeader;echo "
                          "$os;echo $cArch'\"",
-                     "Command to run is \"" + home_ + "/bin/cinfo -d\""}),
-              commandLines);
+                     "Command to run is \"" + home_ + "/bin/cinfo -d\""}));
 }
 
 TEST_F(InstalledTable, TracesLineByLine) {
     inventory("a,b,c,d,e\na,b,c,d,e\n");
     TraceCapture trace;
     rows();
-    EXPECT_EQ((Texts{"$os = Linux, $cArch = lx8266", "Index of inventory header is 0",
+    EXPECT_EQ(trace.details("zav03agt"),
+              (Texts{"$os = Linux, $cArch = lx8266", "Index of inventory header is 0",
                      "Index of newline after inventory header is : 55",
                      "Found product line: a,b,c,d,e", "Passing row 0 to InsertRow().",
-                     "Found product line: a,b,c,d,e", "skipping duplicate info in this line"}),
-              trace.details("zav03agt"));
+                     "Found product line: a,b,c,d,e", "skipping duplicate info in this line"}));
 }
 
 TEST_F(InstalledTable, AQueryForOneProductGetsItsRow) {
     inventory("ux,b,c,d,e\nax,b,c,d,e\nuxx,b,c,d,e\n");
     const auto found = rows({{"PRODUCT", OPER_EQ, "ax"}});
-    ASSERT_EQ(1u, found.size());
-    EXPECT_EQ("ax", trimmedField(found[0].product));
-    EXPECT_EQ(2u, rows({{"PRODUCT", OPER_LIKE, "ux*"}}).size());
+    ASSERT_EQ(found.size(), 1u);
+    EXPECT_EQ(trimmedField(found[0].product), "ax");
+    EXPECT_EQ(rows({{"PRODUCT", OPER_LIKE, "ux*"}}).size(), 2u);
 }
 
 TEST_F(InstalledTable, EachSampleAsksAnew) {
     inventory("ux,b,c,d,e\n");
-    EXPECT_EQ(1u, rows().size());
+    EXPECT_EQ(rows().size(), 1u);
     inventory("ux,b,c,d,e\nax,b,c,d,e\n");
-    EXPECT_EQ(2u, rows().size());
+    EXPECT_EQ(rows().size(), 2u);
     inventory("");
-    EXPECT_EQ(0u, rows().size());
+    EXPECT_EQ(rows().size(), 0u);
 }
 
 TEST_F(InstalledTable, ValuesThatAreTooLongAreCut) {
@@ -208,32 +208,32 @@ TEST_F(InstalledTable, ValuesThatAreTooLongAreCut) {
     probe("os=SomeSystem\ncArch=architecture\n");
     TraceCapture trace;
     const auto found = rows();
-    ASSERT_EQ(1u, found.size());
-    EXPECT_EQ("SomeS", fieldText(found[0].hosttype));
-    EXPECT_EQ("architectu", fieldText(found[0].hostpc));
-    EXPECT_EQ(std::string(32, 'x'), fieldText(found[0].product));
-    EXPECT_EQ(std::string(12, 'x'), fieldText(found[0].version));
-    EXPECT_EQ(std::string(80, 'x'), fieldText(found[0].proddesc));
-    EXPECT_EQ(std::string(12, 'x'), fieldText(found[0].release));
-    EXPECT_EQ(std::string(20, 'x'), fieldText(found[0].platform));
+    ASSERT_EQ(found.size(), 1u);
+    EXPECT_EQ(fieldText(found[0].hosttype), "SomeS");
+    EXPECT_EQ(fieldText(found[0].hostpc), "architectu");
+    EXPECT_EQ(fieldText(found[0].product), std::string(32, 'x'));
+    EXPECT_EQ(fieldText(found[0].version), std::string(12, 'x'));
+    EXPECT_EQ(fieldText(found[0].proddesc), std::string(80, 'x'));
+    EXPECT_EQ(fieldText(found[0].release), std::string(12, 'x'));
+    EXPECT_EQ(fieldText(found[0].platform), std::string(20, 'x'));
     const std::string before = "exceeded the maximum size of ";
     Texts widths;  // in the order of writing
     for (const std::string& line : trace.errors("zavtqelm")) {
         const std::size_t at = line.find(before) + before.size();
         widths.push_back(line.substr(at, line.find(' ', at) - at));
     }
-    EXPECT_EQ((Texts{"5", "10", "32", "80", "20", "12", "12"}), widths);
+    EXPECT_EQ(widths, (Texts{"5", "10", "32", "80", "20", "12", "12"}));
 }
 
 TEST_F(InstalledTable, AShorterProductLeavesNothingOfTheOneBefore) {
     inventory("longcode,long description,longplatform,longversion,longrelease\na,b,c,d,e\n");
     const auto found = rows();
-    ASSERT_EQ(2u, found.size());
-    EXPECT_EQ(padded("a", 32), fieldText(found[1].product));
-    EXPECT_EQ(padded("b", 80), fieldText(found[1].proddesc));
-    EXPECT_EQ(padded("c", 20), fieldText(found[1].platform));
-    EXPECT_EQ(padded("d", 12), fieldText(found[1].version));
-    EXPECT_EQ(padded("e", 12), fieldText(found[1].release));
+    ASSERT_EQ(found.size(), 2u);
+    EXPECT_EQ(fieldText(found[1].product), padded("a", 32));
+    EXPECT_EQ(fieldText(found[1].proddesc), padded("b", 80));
+    EXPECT_EQ(fieldText(found[1].platform), padded("c", 20));
+    EXPECT_EQ(fieldText(found[1].version), padded("d", 12));
+    EXPECT_EQ(fieldText(found[1].release), padded("e", 12));
 }
 
 // ---- Failures -----------------------------------------------------------------------------------
@@ -243,10 +243,10 @@ protected:
     void expectBlankArchitecture() {
         inventory("ux,b,c,d,e\n");
         const auto found = rows();
-        ASSERT_EQ(1u, found.size());
-        EXPECT_EQ(padded("", 5), fieldText(found[0].hosttype));
-        EXPECT_EQ(padded("", 10), fieldText(found[0].hostpc));
-        EXPECT_EQ("ux", trimmedField(found[0].product));
+        ASSERT_EQ(found.size(), 1u);
+        EXPECT_EQ(fieldText(found[0].hosttype), padded("", 5));
+        EXPECT_EQ(fieldText(found[0].hostpc), padded("", 10));
+        EXPECT_EQ(trimmedField(found[0].product), "ux");
     }
 };
 
@@ -264,16 +264,16 @@ TEST_F(FailingProbe, ThatNamesNoArchitectureLeavesItBlank) {
     probe("os=Linux\n");
     TraceCapture trace;
     expectBlankArchitecture();
-    EXPECT_EQ((Texts{"Expected 3 tokens, Header and $os and $cArch, but we got 2 tokens",
-                     "Received token ***ArchitectureHeader***", "Received token ***Linux***"}),
-              trace.errors("zav03agt"));
+    EXPECT_EQ(trace.errors("zav03agt"),
+              (Texts{"Expected 3 tokens, Header and $os and $cArch, but we got 2 tokens",
+                     "Received token ***ArchitectureHeader***", "Received token ***Linux***"}));
 }
 
 TEST_F(FailingProbe, ThatNamesTooMuchLeavesTheArchitectureBlank) {
     probe("IFS=\nos='a\nb'\ncArch=c\n");  // without field separators the echo keeps the newline
     TraceCapture trace;
     expectBlankArchitecture();
-    EXPECT_EQ(5u, trace.errors("zav03agt").size());
+    EXPECT_EQ(trace.errors("zav03agt").size(), 5u);
 }
 
 TEST_F(FailingProbe, ThatTimesOutLeavesTheArchitectureBlank) {
@@ -307,8 +307,8 @@ TEST_F(InstalledTable, WithAnInventoryThatPrintsNothingThereAreNoRows) {
     scratch_.script("home/bin/cinfo", "exit 0\n");
     TraceCapture trace;
     EXPECT_TRUE(rows().empty());
-    EXPECT_EQ((Texts{"Inventory header string " + kHeader + ", not found"}),
-              trace.errors("zav03agt"));
+    EXPECT_EQ(trace.errors("zav03agt"),
+              (Texts{"Inventory header string " + kHeader + ", not found"}));
 }
 
 TEST_F(InstalledTable, WithAnEmptyInventoryThereAreNoRows) {
@@ -319,14 +319,14 @@ TEST_F(InstalledTable, WithAnEmptyInventoryThereAreNoRows) {
 TEST_F(InstalledTable, ALineWithFourFieldsIsPassedOver) {
     inventory("a,b,c,d,e\na,b,c,d\nf,g,h,i,j\n");
     TraceCapture trace;
-    EXPECT_EQ(2u, rows().size());
-    EXPECT_EQ((Texts{"Product line has 4 fields, expecting 5 fields.  Product line is: a,b,c,d"}),
-              trace.errors("zav03agt"));
+    EXPECT_EQ(rows().size(), 2u);
+    EXPECT_EQ(trace.errors("zav03agt"),
+              (Texts{"Product line has 4 fields, expecting 5 fields.  Product line is: a,b,c,d"}));
 }
 
 TEST_F(InstalledTable, TwoIdenticalLinesAreOneRow) {
     inventory("a,b,c,d,e\na,b,c,d,e\n");
-    EXPECT_EQ(1u, rows().size());
+    EXPECT_EQ(rows().size(), 1u);
 }
 
 // ---- Many lines, many queries -------------------------------------------------------------------
@@ -338,9 +338,9 @@ TEST_F(InstalledTable, ThousandsOfProductsAreListed) {
     }
     inventory(lines);
     const auto found = rows();
-    ASSERT_EQ(5000u, found.size());
-    EXPECT_EQ("p0", trimmedField(found.front().product));
-    EXPECT_EQ("p4999", trimmedField(found.back().product));
+    ASSERT_EQ(found.size(), 5000u);
+    EXPECT_EQ(trimmedField(found.front().product), "p0");
+    EXPECT_EQ(trimmedField(found.back().product), "p4999");
 }
 
 TEST_F(InstalledTable, QueriesDoNotDisturbEachOther) {
@@ -349,7 +349,7 @@ TEST_F(InstalledTable, QueriesDoNotDisturbEachOther) {
     for (int i = 0; i < 4; ++i) {
         queries.emplace_back([] {
             for (int n = 0; n < 5; ++n)
-                EXPECT_EQ(2u, rows().size());
+                EXPECT_EQ(rows().size(), 2u);
         });
     }
     for (std::thread& query : queries)
@@ -368,14 +368,14 @@ TEST_F(InstalledTable, EventsReachSubscribers) {
     zav_kinagt_data_t given[2];
     std::memset(given, ' ', sizeof given);
     std::memcpy(given[1].product, "ux", 2);
-    EXPECT_EQ(0, zav_kinagt_manager::EventArrived(given, 2));
-    EXPECT_EQ(1u, delivered);
+    EXPECT_EQ(zav_kinagt_manager::EventArrived(given, 2), 0);
+    EXPECT_EQ(delivered, 1u);
 }
 
 TEST_F(InstalledTable, EventsWithoutManagerAreLost) {
     zav_kinagt_manager* const kept = std::exchange(zav_kinagt_static_manager, nullptr);
     zav_kinagt_data_t given{};
-    EXPECT_EQ(0, zav_kinagt_manager::EventArrived(&given, 1));
+    EXPECT_EQ(zav_kinagt_manager::EventArrived(&given, 1), 0);
     zav_kinagt_static_manager = kept;
 }
 

@@ -46,24 +46,24 @@ protected:
     static void expectAnswer(const TaskQueueElem& task, int rc, const std::string& messageId,
                              const std::string& parameter) {
         EXPECT_EQ(rc, answer(task).retval);
-        EXPECT_EQ(padded(messageId, 16), fieldText(answer(task).retmsgid));
-        EXPECT_EQ(padded(parameter, 256), fieldText(answer(task).retmsgparm));
+        EXPECT_EQ(fieldText(answer(task).retmsgid), padded(messageId, 16));
+        EXPECT_EQ(fieldText(answer(task).retmsgparm), padded(parameter, 256));
     }
 
     static void expectRefused(TaskQueueElem task, int rc, const std::string& parameter = "") {
         EXPECT_EQ(rc, runTask(task));
         expectAnswer(task, rc, "ZAV" + std::to_string(rc) + "E", parameter);
         EXPECT_TRUE(taskQueue.empty());
-        EXPECT_EQ(Texts{}, fake_handlers::calls());
+        EXPECT_EQ(fake_handlers::calls(), Texts{});
     }
 
     static void expectQueued(TaskQueueElem task) {
-        EXPECT_EQ(0, runTask(task));
+        EXPECT_EQ(runTask(task), 0);
         expectAnswer(task, 0, "", "");
-        ASSERT_EQ(1u, taskQueue.size());
+        ASSERT_EQ(taskQueue.size(), 1u);
         EXPECT_EQ(narrow(task.getTransid()), narrow(taskQueue.front().getTransid()));
         EXPECT_EQ(narrow(task.getContext()), narrow(taskQueue.front().getContext()));
-        EXPECT_EQ(Texts{}, fake_handlers::calls());
+        EXPECT_EQ(fake_handlers::calls(), Texts{});
     }
 };
 
@@ -72,17 +72,17 @@ protected:
 TEST_F(TaskDispatch, WithoutCommandAndTransidTheLastMissingOneIsReported) {
     TraceCapture trace;
     expectRefused(TaskQueueElem(), 1002);
-    EXPECT_EQ((Texts{"ZAV1001E No [COMMAND] specified, it is a required parameter",
-                     "ZAV1002E No [TRANSID] specified, it is a required parameter"}),
-              trace.errors());
+    EXPECT_EQ(trace.errors(),
+              (Texts{"ZAV1001E No [COMMAND] specified, it is a required parameter",
+                     "ZAV1002E No [TRANSID] specified, it is a required parameter"}));
 }
 
 TEST_F(TaskDispatch, WithoutCommandItIs1001) {
     TaskQueueElem task = complete("");
     TraceCapture trace;
     expectRefused(task, 1001);
-    EXPECT_EQ((Texts{"ZAV1001E No [COMMAND] specified, it is a required parameter"}),
-              trace.errors());
+    EXPECT_EQ(trace.errors(),
+              (Texts{"ZAV1001E No [COMMAND] specified, it is a required parameter"}));
 }
 
 TEST_F(TaskDispatch, WithoutTransidItIs1002WhateverTheCommand) {
@@ -90,19 +90,18 @@ TEST_F(TaskDispatch, WithoutTransidItIs1002WhateverTheCommand) {
     task.setTransid("");
     TraceCapture trace;
     expectRefused(task, 1002);
-    EXPECT_EQ((Texts{"ZAV1002E No [TRANSID] specified, it is a required parameter"}),
-              trace.errors());
+    EXPECT_EQ(trace.errors(),
+              (Texts{"ZAV1002E No [TRANSID] specified, it is a required parameter"}));
 }
 
 TEST_F(TaskDispatch, AnUnknownCommandIsRefusedWithTheListOfThoseThatThereAre) {
     TraceCapture trace;
     expectRefused(complete("DANCE"), 1006, "DANCE");
-    EXPECT_EQ((Texts{"Command DANCE is NOT supported",
-                     "ZAV1006E Command [DANCE] is not a supported command"}),
-              trace.errors());
+    EXPECT_EQ(trace.errors(), (Texts{"Command DANCE is NOT supported",
+                                     "ZAV1006E Command [DANCE] is not a supported command"}));
     const Texts details = trace.details("zavtasks");
-    ASSERT_EQ(1u, details.size());
-    EXPECT_EQ(kSupported, details[0]);
+    ASSERT_EQ(details.size(), 1u);
+    EXPECT_EQ(details[0], kSupported);
 }
 
 TEST_F(TaskDispatch, TheListOfCommandsComesLastInTheTrace) {
@@ -113,9 +112,8 @@ TEST_F(TaskDispatch, TheListOfCommandsComesLastInTheTrace) {
     for (const TraceLine& line : trace.lines()) {
         if (line.level != 'F') texts.push_back(line.text);
     }
-    EXPECT_EQ((Texts{"Command DANCE is NOT supported",
-                     "ZAV1006E Command [DANCE] is not a supported command", kSupported}),
-              texts);
+    EXPECT_EQ(texts, (Texts{"Command DANCE is NOT supported",
+                            "ZAV1006E Command [DANCE] is not a supported command", kSupported}));
 }
 
 TEST_F(TaskDispatch, CommandsAreComparedExactly) {
@@ -128,15 +126,15 @@ TEST_F(TaskDispatch, WithoutCommandsEveryRequestIsRefused) {
     commands.clear();
     TraceCapture trace;
     expectRefused(complete("START"), 1006, "START");
-    EXPECT_EQ(1, trace.count('D', "Commands supported are: "));
+    EXPECT_EQ(trace.count('D', "Commands supported are: "), 1);
 }
 
 TEST_F(TaskDispatch, ASupportedCommandIsTraced) {
     TaskQueueElem task = complete("STOP");
     TraceCapture trace;
     runTask(task);
-    EXPECT_EQ((Texts{"Command STOP is supported", "Going to run command STOP"}),
-              trace.details("zavtasks"));
+    EXPECT_EQ(trace.details("zavtasks"),
+              (Texts{"Command STOP is supported", "Going to run command STOP"}));
     EXPECT_TRUE(trace.errors().empty());
 }
 
@@ -167,7 +165,7 @@ TEST_P(MissingParameter, IsAnsweredWithItsCode) {
     Texts actual;
     for (const std::string& line : trace.errors())
         actual.push_back(line.substr(line.find('[') + 1));
-    EXPECT_EQ(expected, actual);
+    EXPECT_EQ(actual, expected);
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -212,8 +210,8 @@ TEST_F(TaskDispatch, OnlyTheRequiredParametersAreRequired) {
 TEST_F(TaskDispatch, InstancesOfTheUniversalAgentAreNotRemoved) {
     TraceCapture trace;
     expectRefused(complete("REMOVEINSTANCE", "um"), 1006, "REMOVEINSTANCE");
-    EXPECT_EQ((Texts{"ZAV1006E Command [REMOVEINSTANCE] is not a supported command for UA"}),
-              trace.errors());
+    EXPECT_EQ(trace.errors(),
+              (Texts{"ZAV1006E Command [REMOVEINSTANCE] is not a supported command for UA"}));
 }
 
 TEST_F(TaskDispatch, TheUniversalAgentMayBeWrittenInCapitals) {
@@ -235,11 +233,11 @@ TEST_F(TaskDispatch, GetconfigRunsAtOnce) {
         return TASK_OK;
     });
     TaskQueueElem task = complete("GETCONFIG");
-    EXPECT_EQ(0, runTask(task));
-    EXPECT_EQ((Texts{"getConfig tx-1"}), fake_handlers::calls());
+    EXPECT_EQ(runTask(task), 0);
+    EXPECT_EQ(fake_handlers::calls(), (Texts{"getConfig tx-1"}));
     EXPECT_TRUE(taskQueue.empty());
     expectAnswer(task, 0, "", "");
-    EXPECT_EQ("INSTANCE=x", trimmedField(answer(task).context));
+    EXPECT_EQ(trimmedField(answer(task).context), "INSTANCE=x");
 }
 
 TEST_F(TaskDispatch, CompleteInstallRunsAtOnceAndRequiresNothing) {
@@ -249,8 +247,8 @@ TEST_F(TaskDispatch, CompleteInstallRunsAtOnceAndRequiresNothing) {
         return TASK_INSTALL_FAILED;
     });
     TaskQueueElem task("", "tx-1", "COMPLETE_INSTALL", "", "", "", "", "", "", "");
-    EXPECT_EQ(1031, runTask(task));
-    EXPECT_EQ((Texts{"completeInstallAfterRestart tx-1"}), fake_handlers::calls());
+    EXPECT_EQ(runTask(task), 1031);
+    EXPECT_EQ(fake_handlers::calls(), (Texts{"completeInstallAfterRestart tx-1"}));
     EXPECT_TRUE(taskQueue.empty());
     expectAnswer(task, 1031, "ZAV1031E", "rc.txt,3");
 }
@@ -261,7 +259,7 @@ TEST_F(TaskDispatch, TheQueueKeepsCopies) {
     TaskQueueElem task = complete("START");
     runTask(task);
     task.setTransid("changed");
-    EXPECT_EQ("tx-1", narrow(taskQueue.front().getTransid()));
+    EXPECT_EQ(narrow(taskQueue.front().getTransid()), "tx-1");
 }
 
 TEST_F(TaskDispatch, TheQueueKeepsTheOrder) {
@@ -273,7 +271,7 @@ TEST_F(TaskDispatch, TheQueueKeepsTheOrder) {
     std::string order;
     for (; !taskQueue.empty(); taskQueue.pop())
         order += narrow(taskQueue.front().getTransid());
-    EXPECT_EQ("123", order);
+    EXPECT_EQ(order, "123");
 }
 
 // ---- What the executor runs ---------------------------------------------------------------------
@@ -298,10 +296,10 @@ TEST_P(Dispatch, ReachesTheHandler) {
         return TASK_TRANSLATOR_FAILED;
     });
     TraceCapture trace;
-    EXPECT_EQ(TASK_TRANSLATOR_FAILED, processAsyncTask(task));
+    EXPECT_EQ(processAsyncTask(task), TASK_TRANSLATOR_FAILED);
     EXPECT_EQ(dispatched.calls, fake_handlers::calls());
-    EXPECT_EQ(&task, seen);
-    EXPECT_EQ((Texts{"Return code is 1008"}), trace.details("zavtasks"));
+    EXPECT_EQ(seen, &task);
+    EXPECT_EQ(trace.details("zavtasks"), (Texts{"Return code is 1008"}));
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -340,10 +338,10 @@ TEST_F(TaskDispatch, TheExecutorRunsNothingElse) {
     for (const char* command : {"GETCONFIG", "COMPLETE_INSTALL", "DANCE", ""}) {
         TaskQueueElem task = complete(command);
         TraceCapture trace;
-        EXPECT_EQ(TASK_OK, processAsyncTask(task));
-        EXPECT_EQ((Texts{"Return code is 0"}), trace.details("zavtasks"));
+        EXPECT_EQ(processAsyncTask(task), TASK_OK);
+        EXPECT_EQ(trace.details("zavtasks"), (Texts{"Return code is 0"}));
     }
-    EXPECT_EQ(Texts{}, fake_handlers::calls());
+    EXPECT_EQ(fake_handlers::calls(), Texts{});
 }
 
 // ---- Handlers that throw ------------------------------------------------------------------------
@@ -369,8 +367,8 @@ TEST_P(ThrowingHandler, EndsItsTaskWithTheCommandsOwnCode) {
     const bool atOnce = std::string(thrown.command) == "GETCONFIG" ||
                         std::string(thrown.command) == "COMPLETE_INSTALL";
     EXPECT_EQ(thrown.rc, atOnce ? runTask(task) : processAsyncTask(task));
-    EXPECT_EQ((Texts{id + " Command [" + thrown.command + "] ended by an exception: what it says"}),
-              trace.errors());
+    EXPECT_EQ(trace.errors(), (Texts{id + " Command [" + thrown.command +
+                                     "] ended by an exception: what it says"}));
     task.ReturnStatus(thrown.rc);
     expectAnswer(task, thrown.rc, id, thrown.command);
 }
@@ -389,9 +387,10 @@ TEST_F(TaskDispatch, BadPositionsAreTracedWithTheirPlace) {
     });
     TaskQueueElem task = complete("GETCONFIG");
     TraceCapture trace;
-    EXPECT_EQ(1009, runTask(task));
-    EXPECT_EQ((Texts{"ZAV1009E Command [GETCONFIG] ended by an exception: line: 12, file: zavstr"}),
-              trace.errors());
+    EXPECT_EQ(runTask(task), 1009);
+    EXPECT_EQ(
+        trace.errors(),
+        (Texts{"ZAV1009E Command [GETCONFIG] ended by an exception: line: 12, file: zavstr"}));
     expectAnswer(task, 1009, "ZAV1009E", "GETCONFIG");
 }
 
@@ -399,10 +398,10 @@ TEST_F(TaskDispatch, AnythingMayBeThrown) {
     fake_handlers::behave([](const std::string&, TaskQueueElem&) -> TASK_RC { throw 42; });
     TaskQueueElem task = complete("INSTALL");
     TraceCapture trace;
-    EXPECT_EQ(TASK_INSTALL_NOT_STARTED, processAsyncTask(task));
-    EXPECT_EQ((Texts{"ZAV1030E Command [INSTALL] ended by an exception: an exception without a "
-                     "text"}),
-              trace.errors());
+    EXPECT_EQ(processAsyncTask(task), TASK_INSTALL_NOT_STARTED);
+    EXPECT_EQ(trace.errors(),
+              (Texts{"ZAV1030E Command [INSTALL] ended by an exception: an exception without a "
+                     "text"}));
 }
 
 }  // namespace

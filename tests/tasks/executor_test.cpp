@@ -104,13 +104,13 @@ TEST_F(Executor, IsNotStartedWithoutADepot) {
     const std::size_t threads = threadCount();
     TraceCapture trace;
     zav_taskmgr_init();
-    EXPECT_EQ((Texts{"ZAV1010E No Agent Depot directory set"}), trace.errors("zavtasks"));
+    EXPECT_EQ(trace.errors("zavtasks"), (Texts{"ZAV1010E No Agent Depot directory set"}));
     EXPECT_FALSE(initialized);
     EXPECT_TRUE(commands.empty());
     EXPECT_EQ(threads, threadCount());
 
     TaskQueueElem task = request("START", "tx");
-    EXPECT_EQ(TASK_NOT_SUPPORTED, runTask(task));
+    EXPECT_EQ(runTask(task), TASK_NOT_SUPPORTED);
     EXPECT_TRUE(taskQueue.empty());
 }
 
@@ -120,21 +120,20 @@ TEST_F(Executor, IsStartedOnce) {
     const std::size_t threads = threadCount();
     TraceCapture trace;
     start();
-    EXPECT_EQ((Texts{"Command vector being initialized"}), trace.errors("zavtasks"));
+    EXPECT_EQ(trace.errors("zavtasks"), (Texts{"Command vector being initialized"}));
     EXPECT_TRUE(initialized);
     EXPECT_EQ(newScratchDepot() + "/", narrow(depotDir));
     Texts names;
     for (const String& command : commands)
         names.push_back(narrow(command));
-    EXPECT_EQ((Texts{"START", "STOP", "RESTART", "INSTALL", "UNINSTALL", "GETCONFIG", "SETCONFIG",
-                     "COMPLETE_INSTALL", "REMOVEINSTANCE"}),
-              names);
+    EXPECT_EQ(names, (Texts{"START", "STOP", "RESTART", "INSTALL", "UNINSTALL", "GETCONFIG",
+                            "SETCONFIG", "COMPLETE_INSTALL", "REMOVEINSTANCE"}));
     EXPECT_EQ(threads + 1, threadCount());
 
     zav_taskmgr_init();
-    EXPECT_EQ(9u, commands.size());
+    EXPECT_EQ(commands.size(), 9u);
     EXPECT_EQ(threads + 1, threadCount());
-    EXPECT_EQ(1u, trace.errors("zavtasks").size());
+    EXPECT_EQ(trace.errors("zavtasks").size(), 1u);
 }
 
 TEST_F(Executor, RequestsThatArriveDuringItsStartUpAreRefusedOrRun) {
@@ -146,8 +145,8 @@ TEST_F(Executor, RequestsThatArriveDuringItsStartUpAreRefusedOrRun) {
         TaskQueueElem task = request("START", "tx");
         return runTask(task);
     });
-    EXPECT_EQ(std::vector<TASK_RC>(3, TASK_OK), results);
-    EXPECT_EQ(3u, outcomes.waitFor(3).size());
+    EXPECT_EQ(results, std::vector<TASK_RC>(3, TASK_OK));
+    EXPECT_EQ(outcomes.waitFor(3).size(), 3u);
 }
 
 TEST_F(Executor, RequestsFindAllCommandsAsSoonAsTheyFindOne) {
@@ -158,7 +157,7 @@ TEST_F(Executor, RequestsFindAllCommandsAsSoonAsTheyFindOne) {
         if (!isSupportedTask("START")) return TASK_NOT_SUPPORTED;
         return isSupportedTask("REMOVEINSTANCE") ? TASK_OK : TASK_INFORMATION;
     });
-    EXPECT_EQ(std::vector<TASK_RC>(3, TASK_OK), results);
+    EXPECT_EQ(results, std::vector<TASK_RC>(3, TASK_OK));
 }
 
 // ---- Running tasks ------------------------------------------------------------------------------
@@ -172,16 +171,16 @@ TEST_F(Executor, AnAcceptedInstallIsAnsweredAtOnceAndReportedLater) {
         return TASK_OK;
     });
     TaskQueueElem task = request("INSTALL", "tx-1");
-    EXPECT_EQ(0, runTask(task));
-    EXPECT_EQ(0, task.getReturnResults().retval);
-    EXPECT_EQ(padded("", 16), fieldText(task.getReturnResults().retmsgid));
+    EXPECT_EQ(runTask(task), 0);
+    EXPECT_EQ(task.getReturnResults().retval, 0);
+    EXPECT_EQ(fieldText(task.getReturnResults().retmsgid), padded("", 16));
     ASSERT_TRUE(gate.awaitArrival());
     EXPECT_TRUE(outcomes.rows().empty());
     gate.open();
     const auto rows = outcomes.waitFor(1);
-    ASSERT_EQ(1u, rows.size());
-    EXPECT_EQ("INSTALL", trimmedField(rows[0].command));
-    EXPECT_EQ(0, rows[0].retval);
+    ASSERT_EQ(rows.size(), 1u);
+    EXPECT_EQ(trimmedField(rows[0].command), "INSTALL");
+    EXPECT_EQ(rows[0].retval, 0);
 }
 
 TEST_F(Executor, AFailureYieldsOneRowWithTheRequestsIdentity) {
@@ -193,18 +192,18 @@ TEST_F(Executor, AFailureYieldsOneRowWithTheRequestsIdentity) {
         return TASK_START_STOP_FAILED;
     });
     queueTask(request("START", "tx-1"));
-    ASSERT_EQ(1u, outcomes.waitFor(1).size());
+    ASSERT_EQ(outcomes.waitFor(1).size(), 1u);
     fake_handlers::reset();
     queueTask(request("START", "tx-2"));
     const auto rows = outcomes.waitFor(2);
-    EXPECT_EQ((Texts{"tx-1", "tx-2"}), transids(rows));
-    EXPECT_EQ("inst1", trimmedField(rows[0].targetmsn));
-    EXPECT_EQ("node", trimmedField(rows[0].originnode));
-    EXPECT_EQ(1024, rows[0].retval);
-    EXPECT_EQ("ZAV1024E", trimmedField(rows[0].retmsgid));
-    EXPECT_EQ("the command line", trimmedField(rows[0].retmsgparm));
-    EXPECT_EQ(0, rows[1].retval);
-    EXPECT_EQ("", trimmedField(rows[1].retmsgid));
+    EXPECT_EQ(transids(rows), (Texts{"tx-1", "tx-2"}));
+    EXPECT_EQ(trimmedField(rows[0].targetmsn), "inst1");
+    EXPECT_EQ(trimmedField(rows[0].originnode), "node");
+    EXPECT_EQ(rows[0].retval, 1024);
+    EXPECT_EQ(trimmedField(rows[0].retmsgid), "ZAV1024E");
+    EXPECT_EQ(trimmedField(rows[0].retmsgparm), "the command line");
+    EXPECT_EQ(rows[1].retval, 0);
+    EXPECT_EQ(trimmedField(rows[1].retmsgid), "");
 }
 
 TEST_F(Executor, RunsTasksOneAtATimeInTheirOrder) {
@@ -223,10 +222,10 @@ TEST_F(Executor, RunsTasksOneAtATimeInTheirOrder) {
     for (int i = 0; i < 50; ++i) {
         expected.push_back("tx-" + std::to_string(i));
         TaskQueueElem task = request(i % 2 == 0 ? "START" : "UNINSTALL", expected.back());
-        ASSERT_EQ(0, runTask(task));
+        ASSERT_EQ(runTask(task), 0);
     }
-    EXPECT_EQ(expected, transids(outcomes.waitFor(expected.size())));
-    EXPECT_EQ(1, most);
+    EXPECT_EQ(transids(outcomes.waitFor(expected.size())), expected);
+    EXPECT_EQ(most, 1);
 }
 
 TEST_F(Executor, TakesRequestsFromManyThreads) {
@@ -237,13 +236,13 @@ TEST_F(Executor, TakesRequestsFromManyThreads) {
         requesters.emplace_back([i] {
             for (int n = 0; n < 25; ++n) {
                 TaskQueueElem task = request("STOP", std::to_string(i));
-                EXPECT_EQ(0, runTask(task));
+                EXPECT_EQ(runTask(task), 0);
             }
         });
     }
     for (std::thread& requester : requesters)
         requester.join();
-    EXPECT_EQ(100u, outcomes.waitFor(100).size());
+    EXPECT_EQ(outcomes.waitFor(100).size(), 100u);
 }
 
 TEST_F(Executor, SleepsASecondForEachOutcome) {
@@ -252,8 +251,8 @@ TEST_F(Executor, SleepsASecondForEachOutcome) {
     fake_sleep::reset();
     for (const char* transid : {"1", "2", "3"})
         queueTask(request("START", transid));
-    ASSERT_EQ(3u, outcomes.waitFor(3).size());
-    EXPECT_EQ((std::vector<unsigned>{1, 1, 1}), fake_sleep::slept());
+    ASSERT_EQ(outcomes.waitFor(3).size(), 3u);
+    EXPECT_EQ(fake_sleep::slept(), (std::vector<unsigned>{1, 1, 1}));
 }
 
 TEST_F(Executor, TracesHowMuchIsQueued) {
@@ -268,31 +267,30 @@ TEST_F(Executor, TracesHowMuchIsQueued) {
     ASSERT_TRUE(gate.awaitArrival());
     for (const char* transid : {"1", "2", "3"})
         queueTask(request("START", transid));
-    EXPECT_EQ(3u, queueLength());
+    EXPECT_EQ(queueLength(), 3u);
     TraceCapture trace;
     gate.open();
-    ASSERT_EQ(4u, outcomes.waitFor(4).size());
+    ASSERT_EQ(outcomes.waitFor(4).size(), 4u);
     Texts lines;
     for (const std::string& line : trace.details("zavtasks")) {
         if (line.compare(0, 8, "Executor") == 0) lines.push_back(line);
     }
-    EXPECT_EQ((Texts{"Executor has 3 items on queue", "Executor has 2 items on queue",
-                     "Executor has 1 items on queue"}),
-              lines);
+    EXPECT_EQ(lines, (Texts{"Executor has 3 items on queue", "Executor has 2 items on queue",
+                            "Executor has 1 items on queue"}));
 }
 
 TEST_F(Executor, SurvivesWakeUpsForNothing) {
     start();
     Outcomes outcomes;
     queueTask(request("START", "0"));
-    ASSERT_EQ(1u, outcomes.waitFor(1).size());
+    ASSERT_EQ(outcomes.waitFor(1).size(), 1u);
     TraceCapture trace;
     EXPECT_TRUE(eventually([&trace] {
         pthread_cond_broadcast(&worktodo);
         return trace.count('D', "Executor awoken by signal") >= 3;
     }));
     queueTask(request("START", "1"));
-    EXPECT_EQ((Texts{"0", "1"}), transids(outcomes.waitFor(2)));
+    EXPECT_EQ(transids(outcomes.waitFor(2)), (Texts{"0", "1"}));
 }
 
 TEST_F(Executor, QuickCommandsDoNotWaitForIt) {
@@ -306,10 +304,10 @@ TEST_F(Executor, QuickCommandsDoNotWaitForIt) {
     queueTask(request("INSTALL", "slow"));
     ASSERT_TRUE(gate.awaitArrival());
     TaskQueueElem quick = request("GETCONFIG", "quick");
-    EXPECT_EQ(0, runTask(quick));
+    EXPECT_EQ(runTask(quick), 0);
     EXPECT_TRUE(outcomes.rows().empty());
     gate.open();
-    EXPECT_EQ((Texts{"slow"}), transids(outcomes.waitFor(1)));
+    EXPECT_EQ(transids(outcomes.waitFor(1)), (Texts{"slow"}));
 }
 
 TEST_F(Executor, SurvivesHandlersThatThrow) {
@@ -325,14 +323,14 @@ TEST_F(Executor, SurvivesHandlersThatThrow) {
     queueTask(request("UNINSTALL", "2"));
     queueTask(request("START", "3"));
     const auto rows = outcomes.waitFor(3);
-    ASSERT_EQ((Texts{"1", "2", "3"}), transids(rows));
-    EXPECT_EQ(1030, rows[0].retval);
-    EXPECT_EQ("ZAV1030E", trimmedField(rows[0].retmsgid));
-    EXPECT_EQ("INSTALL", trimmedField(rows[0].retmsgparm));
-    EXPECT_EQ(1033, rows[1].retval);
-    EXPECT_EQ("UNINSTALL", trimmedField(rows[1].retmsgparm));
-    EXPECT_EQ(0, rows[2].retval);
-    EXPECT_EQ(2u, trace.errors("zavtasks").size());
+    ASSERT_EQ(transids(rows), (Texts{"1", "2", "3"}));
+    EXPECT_EQ(rows[0].retval, 1030);
+    EXPECT_EQ(trimmedField(rows[0].retmsgid), "ZAV1030E");
+    EXPECT_EQ(trimmedField(rows[0].retmsgparm), "INSTALL");
+    EXPECT_EQ(rows[1].retval, 1033);
+    EXPECT_EQ(trimmedField(rows[1].retmsgparm), "UNINSTALL");
+    EXPECT_EQ(rows[2].retval, 0);
+    EXPECT_EQ(trace.errors("zavtasks").size(), 2u);
 }
 
 TEST_F(Executor, SubscribersGetTheRowsOfTheirTransactionOnly) {
@@ -341,8 +339,8 @@ TEST_F(Executor, SubscribersGetTheRowsOfTheirTransactionOnly) {
     Outcomes all;
     for (const char* transid : {"a", "x", "b", "x", "xx"})
         queueTask(request("START", transid));
-    ASSERT_EQ(5u, all.waitFor(5).size());
-    EXPECT_EQ((Texts{"x", "x"}), transids(mine.waitFor(2)));
+    ASSERT_EQ(all.waitFor(5).size(), 5u);
+    EXPECT_EQ(transids(mine.waitFor(2)), (Texts{"x", "x"}));
 }
 
 TEST_F(Executor, AnOutcomeWithoutSubscribersIsLost) {
@@ -358,7 +356,7 @@ TEST_F(Executor, AnOutcomeWithoutSubscribersIsLost) {
     ASSERT_TRUE(gate.awaitArrival());  // so the first outcome has been published
     Outcomes outcomes;
     gate.open();
-    EXPECT_EQ((Texts{"second"}), transids(outcomes.waitFor(1)));
+    EXPECT_EQ(transids(outcomes.waitFor(1)), (Texts{"second"}));
     EXPECT_TRUE(trace.errors().empty());
 }
 
@@ -378,13 +376,13 @@ TEST_F(Executor, LeavesSignalsToTheHost) {
     });
     Outcomes outcomes;
     queueTask(request("START", "1"));
-    ASSERT_EQ(1u, outcomes.waitFor(1).size());
+    ASSERT_EQ(outcomes.waitFor(1).size(), 1u);
     for (const int signal : {SIGTERM, SIGINT, SIGHUP, SIGCHLD, SIGPIPE, SIGALRM, SIGUSR1}) {
-        EXPECT_EQ(1, sigismember(&inside, signal)) << signal;
+        EXPECT_EQ(sigismember(&inside, signal), 1) << signal;
         EXPECT_EQ(sigismember(&before, signal), sigismember(&after, signal)) << signal;
     }
     for (const int fault : {SIGSEGV, SIGBUS, SIGFPE, SIGILL, SIGABRT}) {
-        EXPECT_EQ(0, sigismember(&inside, fault)) << fault;
+        EXPECT_EQ(sigismember(&inside, fault), 0) << fault;
     }
 }
 

@@ -24,36 +24,36 @@ zav_kagreqt_data_t rowOf(TaskQueueElem task) {
 }
 
 TEST(MessageParameters, AreJoinedByCommas) {
-    EXPECT_EQ("", narrow(joinValues({})));
-    EXPECT_EQ("a", narrow(joinValues({"a"})));
-    EXPECT_EQ("a,,b", narrow(joinValues({"a", "", "b"})));
+    EXPECT_EQ(narrow(joinValues({})), "");
+    EXPECT_EQ(narrow(joinValues({"a"})), "a");
+    EXPECT_EQ(narrow(joinValues({"a", "", "b"})), "a,,b");
 }
 
 TEST(MessageParameters, HoldNumbersInDecimal) {
-    EXPECT_EQ("0", narrow(decimal(0)));
-    EXPECT_EQ("-7", narrow(decimal(-7)));
-    EXPECT_EQ("2147483647", narrow(decimal(2147483647)));
+    EXPECT_EQ(narrow(decimal(0)), "0");
+    EXPECT_EQ(narrow(decimal(-7)), "-7");
+    EXPECT_EQ(narrow(decimal(2147483647)), "2147483647");
 }
 
 TEST(MessageParameters, HoldSomeExitCodesAsOneCharacter) {
-    EXPECT_EQ("A", narrow(asCharacter(65)));
-    ASSERT_EQ(1u, asCharacter(0x1234041).length());
-    EXPECT_EQ(0x4041, asCharacter(0x1234041)[0]);
+    EXPECT_EQ(narrow(asCharacter(65)), "A");
+    ASSERT_EQ(asCharacter(0x1234041).length(), 1u);
+    EXPECT_EQ(asCharacter(0x1234041)[0], 0x4041);
 }
 
 TEST(MessageParameters, BeginWithCommandAndProduct) {
     TaskQueueElem task;
     task.setCommand("SETCONFIG");
     task.setProduct("ux");
-    EXPECT_EQ("SETCONFIG,ux", narrow(commandAndProduct(task)));
+    EXPECT_EQ(narrow(commandAndProduct(task)), "SETCONFIG,ux");
 }
 
 TEST(SetFailure, PutsMessageIdAndParameterIntoTheTask) {
     TaskQueueElem task;
     const TraceCapture trace;
-    EXPECT_EQ(TASK_INSTALL_FAILED, setFailure(task, TASK_INSTALL_FAILED, "why"));
-    EXPECT_EQ("ZAV1031E", trimmedField(rowOf(task).retmsgid));
-    EXPECT_EQ("why", trimmedField(rowOf(task).retmsgparm));
+    EXPECT_EQ(setFailure(task, TASK_INSTALL_FAILED, "why"), TASK_INSTALL_FAILED);
+    EXPECT_EQ(trimmedField(rowOf(task).retmsgid), "ZAV1031E");
+    EXPECT_EQ(trimmedField(rowOf(task).retmsgparm), "why");
     EXPECT_TRUE(trace.errors().empty());
 }
 
@@ -61,12 +61,12 @@ TEST(FailTask, AlsoTracesAnErrorThatBeginsWithTheMessageId) {
     TaskQueueElem task;
     const TraceCapture capture;
     const ZAV::Trace trace(traceUnit);
-    EXPECT_EQ(TASK_NO_DPTYPE, failTask(trace(), task, TASK_NO_DPTYPE, "file",
-                                       "%s Bad code [%d] from [%s]", 3, "x"));
-    EXPECT_EQ((std::vector<std::string>{"ZAV1023E Bad code [3] from [x]"}),
-              capture.errors("failure_test"));
-    EXPECT_EQ("ZAV1023E", trimmedField(rowOf(task).retmsgid));
-    EXPECT_EQ("file", trimmedField(rowOf(task).retmsgparm));
+    EXPECT_EQ(failTask(trace(), task, TASK_NO_DPTYPE, "file", "%s Bad code [%d] from [%s]", 3, "x"),
+              TASK_NO_DPTYPE);
+    EXPECT_EQ(capture.errors("failure_test"),
+              (std::vector<std::string>{"ZAV1023E Bad code [3] from [x]"}));
+    EXPECT_EQ(trimmedField(rowOf(task).retmsgid), "ZAV1023E");
+    EXPECT_EQ(trimmedField(rowOf(task).retmsgparm), "file");
 }
 
 }  // namespace

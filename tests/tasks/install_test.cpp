@@ -122,8 +122,8 @@ TEST_F(SetupForRestart, WritesTheInstallOnlyScript) {
             EXPECT_EQ(filledIn(filledIn(kInstallOnlyScript, "DEPOT", directory), "PRODUCT", lower),
                       script);
             const std::string expected = "/bin/sh " + directory + "/runcmd.sh ./install.sh -q";
-            EXPECT_EQ(expected, narrow(command));
-            EXPECT_EQ(1, trace_.count('D', "Constructing install only script " + expected));
+            EXPECT_EQ(narrow(command), expected);
+            EXPECT_EQ(trace_.count('D', "Constructing install only script " + expected), 1);
             trace_.clear();
         }
     }
@@ -145,7 +145,7 @@ TEST_F(SetupForRestart, WritesTheInstallAndTwoWayScript) {
             EXPECT_EQ(filledIn(text, "PRODUCT", lower),
                       home_.dir().read(std::string(depot) + "/runcmd.sh"));
             const std::string expected = "/bin/sh " + directory + "/runcmd.sh ./install.sh -q";
-            EXPECT_EQ(expected, narrow(command));
+            EXPECT_EQ(narrow(command), expected);
             EXPECT_THAT(trace_.details("zavtasks"),
                         testing::IsSupersetOf(
                             {"Constructing install and two-way script " + expected,
@@ -161,8 +161,8 @@ TEST_F(SetupForRestart, MakesNothingExecutable) {
     String none;
     setupForRestart(command, none, task);
     struct stat status {};
-    ASSERT_EQ(0, ::stat((home_.depot() + "runcmd.sh").c_str(), &status));
-    EXPECT_EQ(0u, status.st_mode & 0111u);
+    ASSERT_EQ(::stat((home_.depot() + "runcmd.sh").c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode & 0111u, 0u);
 }
 
 TEST_F(SetupForRestart, AScriptThatCannotBeWrittenIsOnlyTraced) {
@@ -171,7 +171,7 @@ TEST_F(SetupForRestart, AScriptThatCannotBeWrittenIsOnlyTraced) {
     String command("x");
     String none;
     setupForRestart(command, none, task);
-    EXPECT_EQ("/bin/sh " + home_.depot() + "none/runcmd.sh x", narrow(command));
+    EXPECT_EQ(narrow(command), "/bin/sh " + home_.depot() + "none/runcmd.sh x");
     EXPECT_THAT(trace_.errors("zavtasks"),
                 ElementsAre("Failed to open file " + home_.depot() +
                             "none/runcmd.sh using mode \"rb\", check permissions"));
@@ -183,14 +183,14 @@ using Install = InstallTest;
 
 TEST_F(Install, RunsTheCommandInTheContext) {
     const std::string command = installer("echo installed; echo warned >&2");
-    EXPECT_EQ(kSuccess, run(command + " \"two words\""));
+    EXPECT_EQ(run(command + " \"two words\""), kSuccess);
     EXPECT_THAT(home_.calls(kInstaller), ElementsAre("[-q][two words]"));
-    EXPECT_EQ("", home_.input(kInstaller));
+    EXPECT_EQ(home_.input(kInstaller), "");
     EXPECT_THAT(home_.calls("bin/cinfo"), IsEmpty());
-    EXPECT_EQ(1, trace_.count('D', "Install command is [" + command + " \"two words\"]"));
-    EXPECT_EQ(1, trace_.count('D', "Executing install command " + command + " \"two words\""));
-    EXPECT_EQ(1, trace_.count('D', "Install returned 0 return code."));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 0"));
+    EXPECT_EQ(trace_.count('D', "Install command is [" + command + " \"two words\"]"), 1);
+    EXPECT_EQ(trace_.count('D', "Executing install command " + command + " \"two words\""), 1);
+    EXPECT_EQ(trace_.count('D', "Install returned 0 return code."), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 0"), 1);
     EXPECT_THAT(trace_.errors(), IsEmpty());
     EXPECT_THAT(fake_sleep::slept(), IsEmpty());
     EXPECT_FALSE(home_.dir().exists("depot/runcmd.sh"));
@@ -198,54 +198,55 @@ TEST_F(Install, RunsTheCommandInTheContext) {
 
 TEST_F(Install, ExpandsTheTokensOfTheContextFirst) {
     home_.dir().script("depot/ux/060100000/install.sh", "echo $1 > " + home_.home() + "/out");
-    EXPECT_EQ(kSuccess, run("|DEPLOYDIR|/install.sh |TOVRINHOME|"));
-    EXPECT_EQ(home_.home() + "\n", home_.dir().read("home/out"));
-    EXPECT_EQ((Outcome{1030, "ZAV1030E", home_.depot() + "none"}), run("|DEPOTDIR|none"));
+    EXPECT_EQ(run("|DEPLOYDIR|/install.sh |TOVRINHOME|"), kSuccess);
+    EXPECT_EQ(home_.dir().read("home/out"), home_.home() + "\n");
+    EXPECT_EQ(run("|DEPOTDIR|none"), (Outcome{1030, "ZAV1030E", home_.depot() + "none"}));
 }
 
 TEST_F(Install, ACommandThatCannotRunIsAFailure) {
     for (const char* optional : {"", "SETCMS"}) {
         trace_.clear();
         const std::string command = home_.home() + "/none -q";
-        EXPECT_EQ((Outcome{1030, "ZAV1030E", command}), run(command, optional));
-        EXPECT_EQ(1,
-                  trace_.count('E', "ZAV1030E Failed to start install command [" + command + "]"));
-        EXPECT_EQ(1, trace_.count('D', "Return code is 1030"));
+        EXPECT_EQ(run(command, optional), (Outcome{1030, "ZAV1030E", command}));
+        EXPECT_EQ(trace_.count('E', "ZAV1030E Failed to start install command [" + command + "]"),
+                  1);
+        EXPECT_EQ(trace_.count('D', "Return code is 1030"), 1);
     }
 }
 
 TEST_F(Install, ACommandThatHangsIsAFailure) {
     const ScopedEnv timeout("TIMEOUT", "1");
     const std::string command = installer("exec sleep 20");
-    EXPECT_EQ((Outcome{1030, "ZAV1030E", command}), run(command));
+    EXPECT_EQ(run(command), (Outcome{1030, "ZAV1030E", command}));
 }
 
 TEST_F(Install, AFailedInstallationIsReportedWithItsExitCode) {
     for (const int code : {1, 65, 255}) {
         trace_.clear();
         const std::string command = installer("exit " + std::to_string(code));
-        EXPECT_EQ((Outcome{1031, "ZAV1031E", command + "," + std::to_string(code)}),
-                  run(command, "SETCMS"));
-        EXPECT_EQ(1, trace_.count('E', "ZAV1031E Bad return code [" + std::to_string(code) +
-                                           "] from install command [" + command + "]"));
-        EXPECT_EQ(1, trace_.count('D', "Return code is 1031"));
+        EXPECT_EQ(run(command, "SETCMS"),
+                  (Outcome{1031, "ZAV1031E", command + "," + std::to_string(code)}));
+        EXPECT_EQ(trace_.count('E', "ZAV1031E Bad return code [" + std::to_string(code) +
+                                        "] from install command [" + command + "]"),
+                  1);
+        EXPECT_EQ(trace_.count('D', "Return code is 1031"), 1);
     }
     EXPECT_THAT(home_.calls("bin/cinfo"), IsEmpty());
 }
 
 TEST_F(Install, AnOptionalTextAsksForTheTranslator) {
     home_.translator("true");
-    EXPECT_EQ(kSuccess, run(installer("true"), "requires_restart"));
+    EXPECT_EQ(run(installer("true"), "requires_restart"), kSuccess);
     EXPECT_THAT(home_.calls(kTranslator), ElementsAre("[-setCMS][ux]"));
-    EXPECT_EQ("", home_.input(kTranslator));
-    EXPECT_EQ(1, trace_.count('D', "SetCMS for product [ux] was successfull."));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 0"));
+    EXPECT_EQ(home_.input(kTranslator), "");
+    EXPECT_EQ(trace_.count('D', "SetCMS for product [ux] was successfull."), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 0"), 1);
 }
 
 TEST_F(Install, AMissingTranslatorHasNoMessage) {
-    EXPECT_EQ((Outcome{1031, "", ""}), run(installer("true"), "SETCMS"));
-    EXPECT_EQ(1, trace_.count('E', "No default two way translator found"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1031"));
+    EXPECT_EQ(run(installer("true"), "SETCMS"), (Outcome{1031, "", ""}));
+    EXPECT_EQ(trace_.count('E', "No default two way translator found"), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1031"), 1);
 }
 
 TEST_F(Install, ATranslatorsExitCodeBecomesOneCharacter) {
@@ -256,29 +257,30 @@ TEST_F(Install, ATranslatorsExitCodeBecomesOneCharacter) {
         const String parameter = String("INSTALL,ux,")
                                      .append(static_cast<unsigned short>(code))
                                      .append(("," + setCms()).c_str());
-        EXPECT_EQ((Outcome{1008, "ZAV1008E", narrow(parameter)}), run(command, "SETCMS"));
-        EXPECT_EQ(1, trace_.count('E', "ZAV1008E Bad return code [" + std::to_string(code) +
-                                           "] from setCMS command [" + setCms() + "]"));
+        EXPECT_EQ(run(command, "SETCMS"), (Outcome{1008, "ZAV1008E", narrow(parameter)}));
+        EXPECT_EQ(trace_.count('E', "ZAV1008E Bad return code [" + std::to_string(code) +
+                                        "] from setCMS command [" + setCms() + "]"),
+                  1);
     }
     home_.translator("exit 65");
-    EXPECT_EQ((Outcome{1008, "ZAV1008E", "INSTALL,ux,A," + setCms()}), run(command, "SETCMS"));
+    EXPECT_EQ(run(command, "SETCMS"), (Outcome{1008, "ZAV1008E", "INSTALL,ux,A," + setCms()}));
 }
 
 TEST_F(Install, ATranslatorThatCannotRunIsAFailure) {
     home_.translator("true");
     home_.notExecutable(kTranslator);
-    EXPECT_EQ((Outcome{1009, "ZAV1009E", "INSTALL,ux," + setCms()}),
-              run(installer("true"), "SETCMS"));
-    EXPECT_EQ(1,
-              trace_.count('E', "ZAV1009E Failed to start two way translator [" + setCms() + "]"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1009"));
+    EXPECT_EQ(run(installer("true"), "SETCMS"),
+              (Outcome{1009, "ZAV1009E", "INSTALL,ux," + setCms()}));
+    EXPECT_EQ(trace_.count('E', "ZAV1009E Failed to start two way translator [" + setCms() + "]"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1009"), 1);
 }
 
 TEST_F(Install, ATranslatorThatHangsIsAFailure) {
     const ScopedEnv timeout("TIMEOUT", "1");
     home_.translator("exec sleep 20");
-    EXPECT_EQ((Outcome{1009, "ZAV1009E", "INSTALL,ux," + setCms()}),
-              run(installer("true"), "SETCMS"));
+    EXPECT_EQ(run(installer("true"), "SETCMS"),
+              (Outcome{1009, "ZAV1009E", "INSTALL,ux," + setCms()}));
 }
 
 TEST_F(Install, OnlyPatchesOfTwoProductsAreReadWithoutBlocking) {
@@ -294,8 +296,8 @@ TEST_F(Install, OnlyPatchesOfTwoProductsAreReadWithoutBlocking) {
           Case{"orx", patch, 0}, Case{"or", installer("true"), 0},
           Case{"or", installer("true") + " QVSPATCH", 0}}) {
         trace_.clear();
-        EXPECT_EQ(kSuccess, run(c.command, "", c.product));
-        EXPECT_EQ(c.expected, trace_.count('D', line)) << c.product << " " << c.command;
+        EXPECT_EQ(run(c.command, "", c.product), kSuccess);
+        EXPECT_EQ(trace_.count('D', line), c.expected) << c.product << " " << c.command;
     }
 }
 
@@ -305,7 +307,7 @@ class InstallThatLeavesAProcess : public InstallTest {
 protected:
     void install(const char* product) {
         const std::string command = installer(left_.command());
-        EXPECT_EQ(kSuccess, run(command + " qvspatch TovrinAgent", "", product));
+        EXPECT_EQ(run(command + " qvspatch TovrinAgent", "", product), kSuccess);
     }
 
     LeftRunning left_;
@@ -327,7 +329,7 @@ TEST_F(InstallThatLeavesAProcess, IsWaitedForToTheTimeoutOtherwise) {
 
 TEST_F(Install, AnInstallerMayPrintEightMegabytes) {
     const TraceCapture quiet("ERROR");
-    EXPECT_EQ(kSuccess, run(installer("head -c 8388608 /dev/zero | tr '\\0' x")));
+    EXPECT_EQ(run(installer("head -c 8388608 /dev/zero | tr '\\0' x")), kSuccess);
 }
 
 // ---- INSTALL that restarts the agent ------------------------------------------------------------
@@ -345,7 +347,7 @@ TEST_F(InstallWithRestart, ReportsSuccessBeforeItRuns) {
                                           "runcmd.sh\" $0.script; echo installed; echo warned >&2");
     home_.dir().write("depot/ux/file", "");
     home_.dir().write("depot/rc.txt", "7\n");
-    EXPECT_EQ(kSuccess, run(command, "REQUIRES_RESTART"));
+    EXPECT_EQ(run(command, "REQUIRES_RESTART"), kSuccess);
 
     // Five seconds before the outcome is published, and one that paces the rows.
     EXPECT_THAT(fake_sleep::slept(), ElementsAre(5u, 1u));
@@ -353,21 +355,21 @@ TEST_F(InstallWithRestart, ReportsSuccessBeforeItRuns) {
     const auto at = [&](const std::string& text) {
         return std::find(details.begin(), details.end(), text) - details.begin();
     };
-    EXPECT_EQ(1,
-              trace_.count('D', "Returning aysnc status return code [0], message id [] parms []"));
+    EXPECT_EQ(trace_.count('D', "Returning aysnc status return code [0], message id [] parms []"),
+              1);
     EXPECT_LT(at("Generating post install script"), at("Sleeping for 5 seconds..."));
     EXPECT_LT(at("Sleeping for 5 seconds..."),
               at("Returning aysnc status return code [0], message id [] parms []"));
     EXPECT_LT(at("Returning aysnc status return code [0], message id [] parms []"),
               at("Command to run is \"" + scripted(command) + "\""));
-    EXPECT_EQ(1, trace_.count('D', "Using Two-Way Translator " + setCms()));
-    EXPECT_EQ(1, trace_.count('D', "Install command is [" + scripted(command) + "]"));
+    EXPECT_EQ(trace_.count('D', "Using Two-Way Translator " + setCms()), 1);
+    EXPECT_EQ(trace_.count('D', "Install command is [" + scripted(command) + "]"), 1);
 
     EXPECT_THAT(home_.calls(kInstaller), ElementsAre("[-q]"));
     EXPECT_THAT(home_.calls(kTranslator), ElementsAre("[-setCMS][ux]"));
-    EXPECT_EQ("0\n", inDepot("rc.txt"));
-    EXPECT_EQ("installed\ntranslated\n", inDepot("stdout.txt"));
-    EXPECT_EQ("warned\ncomplained\n", inDepot("stderr.txt"));
+    EXPECT_EQ(inDepot("rc.txt"), "0\n");
+    EXPECT_EQ(inDepot("stdout.txt"), "installed\ntranslated\n");
+    EXPECT_EQ(inDepot("stderr.txt"), "warned\ncomplained\n");
     EXPECT_FALSE(home_.dir().exists("depot/ux"));
     EXPECT_TRUE(home_.dir().exists("depot/runcmd.sh"));
 }
@@ -376,7 +378,7 @@ TEST_F(InstallWithRestart, TheProductIsInLowerCaseForTheDepotOnly) {
     home_.translator("true");
     home_.dir().write("depot/ne/file", "");
     home_.dir().write("depot/NE/file", "");
-    EXPECT_EQ(kSuccess, run(installer("true"), "REQUIRES_RESTART", "NE"));
+    EXPECT_EQ(run(installer("true"), "REQUIRES_RESTART", "NE"), kSuccess);
     EXPECT_THAT(home_.calls(kTranslator), ElementsAre("[-setCMS][NE]"));
     EXPECT_FALSE(home_.dir().exists("depot/ne"));
     EXPECT_TRUE(home_.dir().exists("depot/NE"));
@@ -385,26 +387,26 @@ TEST_F(InstallWithRestart, TheProductIsInLowerCaseForTheDepotOnly) {
 TEST_F(InstallWithRestart, LeavesTheInstallersExitCodeInTheDepot) {
     home_.translator("true");
     const std::string command = installer("exit 9");
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", scripted(command) + ",9"}),
-              run(command, "REQUIRES_RESTART"));
-    EXPECT_EQ("9\n", inDepot("rc.txt"));
+    EXPECT_EQ(run(command, "REQUIRES_RESTART"),
+              (Outcome{1031, "ZAV1031E", scripted(command) + ",9"}));
+    EXPECT_EQ(inDepot("rc.txt"), "9\n");
     EXPECT_THAT(home_.calls(kTranslator), IsEmpty());
 }
 
 TEST_F(InstallWithRestart, LeavesTheTranslatorsExitCodeInTheDepot) {
     home_.translator("exit 4");
     const std::string command = installer("true");
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", scripted(command) + ",4"}),
-              run(command, "REQUIRES_RESTART"));
-    EXPECT_EQ("4\n", inDepot("rc.txt"));
+    EXPECT_EQ(run(command, "REQUIRES_RESTART"),
+              (Outcome{1031, "ZAV1031E", scripted(command) + ",4"}));
+    EXPECT_EQ(inDepot("rc.txt"), "4\n");
 }
 
 TEST_F(InstallWithRestart, NeedsATranslatorAndSaysSoWithAnotherMessage) {
     const std::string command = installer("true");
-    EXPECT_EQ((Outcome{1031, "ZAV1030E", command}), run(command, "REQUIRES_RESTART"));
-    EXPECT_EQ(1, trace_.count('E', "No default two way translator found"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1031"));
-    EXPECT_EQ(0, trace_.count('D', "Install command is [" + command + "]"));
+    EXPECT_EQ(run(command, "REQUIRES_RESTART"), (Outcome{1031, "ZAV1030E", command}));
+    EXPECT_EQ(trace_.count('E', "No default two way translator found"), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1031"), 1);
+    EXPECT_EQ(trace_.count('D', "Install command is [" + command + "]"), 0);
     EXPECT_THAT(home_.calls(kInstaller), IsEmpty());
     EXPECT_THAT(fake_sleep::slept(), IsEmpty());
     EXPECT_FALSE(home_.dir().exists("depot/runcmd.sh"));
@@ -414,8 +416,8 @@ TEST_F(InstallWithRestart, AScriptThatCouldNotBeWrittenFailsInTheShell) {
     home_.translator("true");
     depotDir = (home_.depot() + "none/").c_str();
     const Outcome outcome = run(installer("true"), "REQUIRES_RESTART");
-    EXPECT_EQ(1031, outcome.rc);
-    EXPECT_EQ("ZAV1031E", outcome.messageId);
+    EXPECT_EQ(outcome.rc, 1031);
+    EXPECT_EQ(outcome.messageId, "ZAV1031E");
     EXPECT_THAT(outcome.parameter, StartsWith("/bin/sh " + home_.depot() + "none/runcmd.sh " +
                                               home_.home() + "/install.sh -q,"));
     EXPECT_THAT(home_.calls(kInstaller), IsEmpty());
@@ -428,7 +430,7 @@ TEST_F(InstallWithRestart, LeavesNoDescriptorOpen) {
     run(installer("exit 1"), "REQUIRES_RESTART");
     run(home_.home() + "/none", "");
     run(installer("true"), "SETCMS");
-    EXPECT_EQ(before, openDescriptors());
+    EXPECT_EQ(openDescriptors(), before);
 }
 
 // ---- COMPLETE_INSTALL ---------------------------------------------------------------------------
@@ -452,26 +454,26 @@ protected:
 };
 
 TEST_F(CompleteInstall, ReportsSuccess) {
-    EXPECT_EQ(kSuccess, completeWith("0\n"));
-    EXPECT_EQ(kSuccess, completeWith("  0\r\n"));
+    EXPECT_EQ(completeWith("0\n"), kSuccess);
+    EXPECT_EQ(completeWith("  0\r\n"), kSuccess);
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(CompleteInstall, ReportsAnyOtherExitCode) {
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,3"}), completeWith("3"));
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,255"}), completeWith("\n255\n\n"));
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,-1"}), completeWith("-1\n"));
+    EXPECT_EQ(completeWith("3"), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,3"}));
+    EXPECT_EQ(completeWith("\n255\n\n"), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,255"}));
+    EXPECT_EQ(completeWith("-1\n"), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,-1"}));
 }
 
 TEST_F(CompleteInstall, TakesWhatIsNoNumberForSuccess) {
     for (const char* content : {"", "\n", "\n\n", "text", "3 4", "3x", "2147483647"}) {
-        EXPECT_EQ(kSuccess, completeWith(content)) << content;
+        EXPECT_EQ(completeWith(content), kSuccess) << content;
     }
 }
 
 TEST_F(CompleteInstall, NeedsTheScriptsResult) {
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,NOTFOUND"}), complete());
-    EXPECT_EQ(1, trace_.count('E', "Unable to read rc.txt for install's return code"));
+    EXPECT_EQ(complete(), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,NOTFOUND"}));
+    EXPECT_EQ(trace_.count('E', "Unable to read rc.txt for install's return code"), 1);
 }
 
 TEST_F(CompleteInstall, LooksForTheResultOnlyAfterItsSleep) {
@@ -479,16 +481,16 @@ TEST_F(CompleteInstall, LooksForTheResultOnlyAfterItsSleep) {
     fake_sleep::whileAsleep([this] { home_.dir().write("depot/rc.txt", "3\n"); });
     TaskQueueElem task;
     const TASK_RC rc = completeInstallAfterRestart(task);
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,3"}), outcomeOf(task, rc));
+    EXPECT_EQ(outcomeOf(task, rc), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,3"}));
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(CompleteInstall, ReportsWhatTheScriptLeft) {
     home_.translator("true");
     run(installer("exit 5"), "REQUIRES_RESTART");
-    EXPECT_EQ((Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,5"}), complete());
+    EXPECT_EQ(complete(), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,5"}));
     run(installer("true"), "REQUIRES_RESTART");
-    EXPECT_EQ(kSuccess, complete());
+    EXPECT_EQ(complete(), kSuccess);
 }
 
 }  // namespace

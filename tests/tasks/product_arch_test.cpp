@@ -47,7 +47,7 @@ TEST_F(ProductArch, IsTheFirstWordOfTheProductsLine) {
     home_.inventory("",
                     "some text\nPlatform codes:\nli6263 Product (lz)\n\nli6243: Product :(ux)\n"
                     "aix523 Product (ux)\n");
-    EXPECT_EQ("li6243", arch("ux"));
+    EXPECT_EQ(arch("ux"), "li6243");
     EXPECT_THAT(commands(), ElementsAre(home_.home() + "/bin/cinfo -p ux"));
     EXPECT_THAT(trace_.details("zavtasks"),
                 ElementsAre("Looking for product code ux", "Index of inventory header is 10",
@@ -62,16 +62,16 @@ TEST_F(ProductArch, IsNotFoundInLinesOfAnotherForm) {
     home_.inventory("",
                     "Platform codes: li1 Product (ux)\nli2 Product ux\nli3 product (ux)\n"
                     "li4 Product (ux) more\nProduct (ux)\nli5 Product (UX)\n(ux)\n   :\n");
-    EXPECT_EQ("", arch("ux"));
+    EXPECT_EQ(arch("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"), IsEmpty());
-    EXPECT_EQ(1, trace_.count('D', "Architecture for product code [ux] is []"));
+    EXPECT_EQ(trace_.count('D', "Architecture for product code [ux] is []"), 1);
 }
 
 TEST_F(ProductArch, NeedsTheReportsHeader) {
     for (const char* report : {"", "\n", "\n\n\n", "li6263 Product (ux)\n"}) {
         trace_.clear();
         home_.inventory("", report);
-        EXPECT_EQ("", arch("ux")) << report;
+        EXPECT_EQ(arch("ux"), "") << report;
         EXPECT_THAT(trace_.errors("zavtasks"),
                     ElementsAre("Product header string Platform codes:, not found"));
     }
@@ -79,31 +79,31 @@ TEST_F(ProductArch, NeedsTheReportsHeader) {
 
 TEST_F(ProductArch, NeedsANewlineBehindTheReportsHeader) {
     home_.inventory("", "\nPlatform codes: li6263 Product (ux)");
-    EXPECT_EQ("", arch("ux"));
+    EXPECT_EQ(arch("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"),
                 ElementsAre("No newline character '\n' found after Product header"));
 }
 
 TEST_F(ProductArch, MayHaveNoLinesToLookAt) {
     home_.inventory("", "Platform codes:\n");
-    EXPECT_EQ("", arch("ux"));
+    EXPECT_EQ(arch("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"), IsEmpty());
 }
 
 TEST_F(ProductArch, FailedReportsAreNotTraced) {
-    EXPECT_EQ("", arch("ux"));
+    EXPECT_EQ(arch("ux"), "");
     home_.notExecutable("bin/cinfo");
-    EXPECT_EQ("", arch("ux"));
+    EXPECT_EQ(arch("ux"), "");
     home_.program("bin/cinfo", "echo 'Platform codes:\nli6263 Product (ux)'; exit 3");
-    EXPECT_EQ("", arch("ux"));
+    EXPECT_EQ(arch("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"), IsEmpty());
-    EXPECT_EQ(3, trace_.count('D', "Architecture for product code [ux] is []"));
+    EXPECT_EQ(trace_.count('D', "Architecture for product code [ux] is []"), 3);
 }
 
 TEST_F(ProductArch, ReportsThatTakeTooLongAreFailures) {
     const ScopedEnv timeout("TIMEOUT", "1");
     home_.program("bin/cinfo", "exec sleep 20");
-    EXPECT_EQ("", arch("ux"));
+    EXPECT_EQ(arch("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"), IsEmpty());
 }
 
@@ -112,7 +112,7 @@ TEST_F(ProductArch, ReportsThatTakeTooLongAreFailures) {
 TEST_F(ProductArch, IsThatOfTheFirstLineWithoutAPreference) {
     home_.inventory("noise\n" + header() + line("lz", "li6263") + line("ux", "li6243") +
                     line("ux", "aix523"));
-    EXPECT_EQ("li6243", shared("ux"));
+    EXPECT_EQ(shared("ux"), "li6243");
     EXPECT_THAT(commands(), ElementsAre(home_.home() + "/bin/cinfo -d "));
     EXPECT_THAT(
         trace_.details("zavtasks"),
@@ -126,21 +126,21 @@ TEST_F(ProductArch, IsThatOfTheFirstLineWithoutAPreference) {
 
 TEST_F(ProductArch, PrefersAPlatformThatEndsAlike) {
     home_.inventory(header() + line("ax", "aix523") + line("ax", "li6243") + line("ax", "li6263"));
-    EXPECT_EQ("li6243", shared("ax", "li6243"));
-    EXPECT_EQ("li6243", shared("ax", "xy9943"));
+    EXPECT_EQ(shared("ax", "li6243"), "li6243");
+    EXPECT_EQ(shared("ax", "xy9943"), "li6243");
 }
 
 TEST_F(ProductArch, IsThatOfTheLastLineWhenNoneEndsAlike) {
     home_.inventory(header() + line("ax", "aix523") + line("ax", "li6263"));
-    EXPECT_EQ("li6263", shared("ax", "li6243"));
-    EXPECT_EQ("li6263", shared("ax", "li62433"));
-    EXPECT_EQ("li6263", shared("ax", "li624x"));
-    EXPECT_EQ("li6263", shared("ax", "3"));
+    EXPECT_EQ(shared("ax", "li6243"), "li6263");
+    EXPECT_EQ(shared("ax", "li62433"), "li6263");
+    EXPECT_EQ(shared("ax", "li624x"), "li6263");
+    EXPECT_EQ(shared("ax", "3"), "li6263");
 }
 
 TEST_F(ProductArch, PlatformsOfOneCharacterHaveNoEndsToCompare) {
     home_.inventory(header() + line("ax", "3") + line("ax", "li6263"));
-    EXPECT_EQ("li6263", shared("ax", "3"));
+    EXPECT_EQ(shared("ax", "3"), "li6263");
 }
 
 TEST_F(ProductArch, SixPlatformsAreNeverTakenForTheSharedComponent) {
@@ -149,20 +149,20 @@ TEST_F(ProductArch, SixPlatformsAreNeverTakenForTheSharedComponent) {
         list += line("ax", platform) + line("ux", platform);
     }
     home_.inventory(list);
-    EXPECT_EQ("", shared("ax"));
-    EXPECT_EQ("", shared("ax", "sol288"));
-    EXPECT_EQ("aix433", shared("ux"));
-    EXPECT_EQ("sol288", shared("ux", "xol288"));
+    EXPECT_EQ(shared("ax"), "");
+    EXPECT_EQ(shared("ax", "sol288"), "");
+    EXPECT_EQ(shared("ux"), "aix433");
+    EXPECT_EQ(shared("ux", "xol288"), "sol288");
     home_.inventory(list + line("ax", "li6263") + line("ax", "sol288"));
-    EXPECT_EQ("li6263", shared("ax"));
-    EXPECT_EQ("li6263", shared("ax", "sol288"));
+    EXPECT_EQ(shared("ax"), "li6263");
+    EXPECT_EQ(shared("ax", "sol288"), "li6263");
 }
 
 TEST_F(ProductArch, LinesOfAnotherLengthAreSkipped) {
     home_.inventory(header() + "\"ux\",\"One, two\",\"li1\",\"06\",\"1\"\n" +
                     "\"ux\",\"li2\"\n\r\n" + "\"ux\",\"\",\"li3\",\"06\",\"1\"\n" +
                     line("ux", "li6263"));
-    EXPECT_EQ("li6263", shared("ux"));
+    EXPECT_EQ(shared("ux"), "li6263");
     EXPECT_THAT(trace_.errors("zavtasks"),
                 ElementsAre("Product line has 6 fields, expecting 5 fields.  Product line is: "
                             "\"ux\",\"One, two\",\"li1\",\"06\",\"1\"",
@@ -176,16 +176,16 @@ TEST_F(ProductArch, LinesOfAnotherLengthAreSkipped) {
 TEST_F(ProductArch, LinesMayEndInCarriageReturnsOrWithoutANewline) {
     home_.inventory(std::string(kListHeader) + "\r\n\"ux\",\"A\",\"li6263\",\"06\",\"1\"\r\n" +
                     "\"lz\",\"A\",\"li6243\",\"06\",\"1\"");
-    EXPECT_EQ("li6263", shared("ux"));
-    EXPECT_EQ("li6243", shared("lz"));
+    EXPECT_EQ(shared("ux"), "li6263");
+    EXPECT_EQ(shared("lz"), "li6243");
     EXPECT_THAT(trace_.errors("zavtasks"), IsEmpty());
 }
 
 TEST_F(ProductArch, OfAProductThatIsNotListedIsEmpty) {
     home_.inventory(header() + line("uxx", "li6263") + line("UX", "li6263"));
-    EXPECT_EQ("", shared("ux"));
+    EXPECT_EQ(shared("ux"), "");
     home_.inventory(header());
-    EXPECT_EQ("", shared("ux"));
+    EXPECT_EQ(shared("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"), IsEmpty());
 }
 
@@ -193,7 +193,7 @@ TEST_F(ProductArch, NeedsTheListsHeader) {
     for (const std::string& list : {std::string(), std::string("\n\n"), line("ux", "li6263")}) {
         trace_.clear();
         home_.inventory(list);
-        EXPECT_EQ("", shared("ux")) << list;
+        EXPECT_EQ(shared("ux"), "") << list;
         EXPECT_THAT(
             trace_.errors("zavtasks"),
             ElementsAre("Inventory header string " + std::string(kListHeader) + ", not found"));
@@ -202,21 +202,21 @@ TEST_F(ProductArch, NeedsTheListsHeader) {
 
 TEST_F(ProductArch, NeedsANewlineBehindTheListsHeader) {
     home_.inventory(kListHeader);
-    EXPECT_EQ("", shared("ux"));
+    EXPECT_EQ(shared("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"),
                 ElementsAre("No newline character '\n' found after Inventory header"));
 }
 
 TEST_F(ProductArch, FailedListsAreTraced) {
-    EXPECT_EQ("", shared("ux"));
+    EXPECT_EQ(shared("ux"), "");
     home_.notExecutable("bin/cinfo");
-    EXPECT_EQ("", shared("ux"));
+    EXPECT_EQ(shared("ux"), "");
     home_.program("bin/cinfo", "exit 1");
-    EXPECT_EQ("", shared("ux"));
+    EXPECT_EQ(shared("ux"), "");
     EXPECT_THAT(trace_.errors("zavtasks"), ElementsAre("Bad return code from Util::runCommand",
                                                        "Bad return code from Util::runCommand",
                                                        "Bad return code from Util::runCommand"));
-    EXPECT_EQ(3, trace_.count('D', "Architecture for product code [ux] is []"));
+    EXPECT_EQ(trace_.count('D', "Architecture for product code [ux] is []"), 3);
 }
 
 TEST_F(ProductArch, IsFoundInAListOfEightMegabytes) {
@@ -225,15 +225,15 @@ TEST_F(ProductArch, IsFoundInAListOfEightMegabytes) {
         list += line("zz", "li6263");
     home_.inventory(list + line("ux", "li6243"));
     const TraceCapture quiet("ERROR");
-    EXPECT_EQ("li6243", shared("ux"));
+    EXPECT_EQ(shared("ux"), "li6243");
     EXPECT_THAT(quiet.errors(), IsEmpty());
 }
 
 // ---- Directories --------------------------------------------------------------------------------
 
 TEST_F(ProductArch, DirectoriesLieUnderTheHome) {
-    EXPECT_EQ(home_.home() + "/agtqvs6/aix523/ux", narrow(getProductArchDir("aix523", "ux")));
-    EXPECT_EQ(home_.home() + "/agtqvs6/aix523/bin", narrow(getProductArchDir("aix523", "ax")));
+    EXPECT_EQ(narrow(getProductArchDir("aix523", "ux")), home_.home() + "/agtqvs6/aix523/ux");
+    EXPECT_EQ(narrow(getProductArchDir("aix523", "ax")), home_.home() + "/agtqvs6/aix523/bin");
     EXPECT_THAT(trace_.details("zavtasks"),
                 ElementsAre("Architecture directory for architecture [aix523] product code [ux] is "
                             "[" +
@@ -244,31 +244,33 @@ TEST_F(ProductArch, DirectoriesLieUnderTheHome) {
 }
 
 TEST_F(ProductArch, DirectoriesNeedBothNames) {
-    EXPECT_EQ("", narrow(getProductArchDir("", "ux")));
-    EXPECT_EQ("", narrow(getProductArchDir("aix523", "")));
-    EXPECT_EQ("", narrow(getProductArchDir("", "")));
-    EXPECT_EQ(1, trace_.count('D',
-                              "Architecture directory for architecture [] product code [ux] "
-                              "is []"));
+    EXPECT_EQ(narrow(getProductArchDir("", "ux")), "");
+    EXPECT_EQ(narrow(getProductArchDir("aix523", "")), "");
+    EXPECT_EQ(narrow(getProductArchDir("", "")), "");
+    EXPECT_EQ(trace_.count('D',
+                           "Architecture directory for architecture [] product code [ux] "
+                           "is []"),
+              1);
 }
 
 TEST_F(ProductArch, TheSharedComponentGoesWithTheArchitectureOfLz) {
     home_.inventory(header() + line("lz", "li6243") + line("ax", "aix543") + line("ax", "li6263"));
-    EXPECT_EQ(home_.home() + "/agtqvs6/aix543/bin", narrow(getSharedLibArchDir()));
+    EXPECT_EQ(narrow(getSharedLibArchDir()), home_.home() + "/agtqvs6/aix543/bin");
     EXPECT_THAT(home_.calls("bin/cinfo"), testing::SizeIs(2));
-    EXPECT_EQ(1, trace_.count('D', "Architecture directory for Shared Lib [ax] is is [" +
-                                       home_.home() + "/agtqvs6/aix543/bin]"));
+    EXPECT_EQ(trace_.count('D', "Architecture directory for Shared Lib [ax] is is [" +
+                                    home_.home() + "/agtqvs6/aix543/bin]"),
+              1);
 }
 
 TEST_F(ProductArch, TheFirstSharedComponentIsTakenWithoutLz) {
     home_.inventory(header() + line("ax", "aix543") + line("ax", "li6263"));
-    EXPECT_EQ(home_.home() + "/agtqvs6/aix543/bin", narrow(getSharedLibArchDir()));
+    EXPECT_EQ(narrow(getSharedLibArchDir()), home_.home() + "/agtqvs6/aix543/bin");
 }
 
 TEST_F(ProductArch, WithoutASharedComponentThereIsNoDirectory) {
     home_.inventory(header() + line("lz", "li6263") + line("ax", "sol288"));
-    EXPECT_EQ("", narrow(getSharedLibArchDir()));
-    EXPECT_EQ(1, trace_.count('D', "Architecture directory for Shared Lib [ax] is is []"));
+    EXPECT_EQ(narrow(getSharedLibArchDir()), "");
+    EXPECT_EQ(trace_.count('D', "Architecture directory for Shared Lib [ax] is is []"), 1);
 }
 
 }  // namespace

@@ -114,7 +114,7 @@ protected:
         zav_taskmgr_init();
         Outcomes outcomes;
         queueTask(request("warm-up"));
-        ASSERT_EQ(1u, outcomes.waitFor(1).size());
+        ASSERT_EQ(outcomes.waitFor(1).size(), 1u);
     }
 
     static Texts transids(const std::vector<zav_kagdyst_data_t>& rows) {
@@ -126,7 +126,7 @@ protected:
 
     static void awaitError(const TraceCapture& trace, const std::string& text) {
         EXPECT_TRUE(eventually([&] { return trace.count('E', text) > 0; }));
-        EXPECT_EQ(1, trace.count('E', text));
+        EXPECT_EQ(trace.count('E', text), 1);
     }
 };
 
@@ -137,17 +137,17 @@ TEST_F(QueueFailures, StartUpGoesOnWhateverFails) {
     threadCreate.error = EPERM;
     TraceCapture trace;
     zav_taskmgr_init();
-    EXPECT_EQ((Texts{"Command vector being initialized",
+    EXPECT_EQ(trace.errors("zavtasks"),
+              (Texts{"Command vector being initialized",
                      "Unable to initialize queue mutex, return code 12",
                      "Unable to initialize condition variable, return code 11",
-                     "Unable to create executor thread, return code 1"}),
-              trace.errors("zavtasks"));
+                     "Unable to create executor thread, return code 1"}));
     EXPECT_TRUE(initialized);
-    EXPECT_EQ(9u, commands.size());
+    EXPECT_EQ(commands.size(), 9u);
 
     TaskQueueElem task = request("tx");
-    EXPECT_EQ(0, runTask(task));
-    EXPECT_EQ(1u, taskQueue.size());
+    EXPECT_EQ(runTask(task), 0);
+    EXPECT_EQ(taskQueue.size(), 1u);
     taskQueue = {};
     commands.clear();
     initialized = false;
@@ -159,11 +159,11 @@ TEST_F(QueueFailures, ATaskIsQueuedWhateverFails) {
     condSignal.error = EPERM;
     TraceCapture trace;
     queueTask(request("tx"));
-    EXPECT_EQ(1u, taskQueue.size());
+    EXPECT_EQ(taskQueue.size(), 1u);
     const Texts errors = trace.errors("zavtasks");
     ASSERT_LE(2u, errors.size());
-    EXPECT_EQ("Unable to get lock on queue mutex, return code 22", errors[0]);
-    EXPECT_EQ("Unable to signal executor thread, return code 1", errors[1]);
+    EXPECT_EQ(errors[0], "Unable to get lock on queue mutex, return code 22");
+    EXPECT_EQ(errors[1], "Unable to signal executor thread, return code 1");
     taskQueue = {};
     pthread_mutex_init(&queue_mutex, nullptr);  // it was unlocked without having been locked
 }
@@ -173,8 +173,8 @@ TEST_F(QueueFailures, AFailedUnlockOfTheQueueIsTraced) {
     mutexUnlock.error = EPERM;
     TraceCapture trace;
     queueTask(request("tx"));
-    EXPECT_EQ((Texts{"Unable to unlock queue mutex, return code 1"}), trace.errors("zavtasks"));
-    EXPECT_EQ(1u, taskQueue.size());
+    EXPECT_EQ(trace.errors("zavtasks"), (Texts{"Unable to unlock queue mutex, return code 1"}));
+    EXPECT_EQ(taskQueue.size(), 1u);
     taskQueue = {};
 }
 
@@ -187,7 +187,7 @@ TEST_F(QueueFailures, TheExecutorTriesAgainWhenItCannotLock) {
     pthread_cond_broadcast(&worktodo);
     awaitError(trace, "Failed to lock queue mutex, return code 22");
     queueTask(request("tx"));
-    EXPECT_EQ((Texts{"tx"}), transids(outcomes.waitFor(1)));
+    EXPECT_EQ(transids(outcomes.waitFor(1)), (Texts{"tx"}));
 }
 
 TEST_F(QueueFailures, TheExecutorTriesAgainWhenItCannotWait) {
@@ -198,7 +198,7 @@ TEST_F(QueueFailures, TheExecutorTriesAgainWhenItCannotWait) {
     pthread_cond_broadcast(&worktodo);
     awaitError(trace, "Failed to wait on condition, return code 22");
     queueTask(request("tx"));
-    EXPECT_EQ((Texts{"tx"}), transids(outcomes.waitFor(1)));
+    EXPECT_EQ(transids(outcomes.waitFor(1)), (Texts{"tx"}));
 }
 
 TEST_F(QueueFailures, ATaskWhoseUnlockFailsIsSkipped) {
@@ -213,7 +213,7 @@ TEST_F(QueueFailures, ATaskWhoseUnlockFailsIsSkipped) {
     unlock(&queue_mutex);
     awaitError(trace, "Failed to unlock queue mutex, return code 1");
     queueTask(request("tx"));
-    EXPECT_EQ((Texts{"tx"}), transids(outcomes.waitFor(1)));
+    EXPECT_EQ(transids(outcomes.waitFor(1)), (Texts{"tx"}));
 }
 
 }  // namespace

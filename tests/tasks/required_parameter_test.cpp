@@ -29,25 +29,25 @@ TaskQueueElem taskWithMessage() {
 TEST(RequiredParameterOk, KeepsCodeAndMessageWhenThereIsAValue) {
     TaskQueueElem task = taskWithMessage();
     const TraceCapture trace;
-    EXPECT_EQ(TASK_NO_COMMAND,
-              requiredParameterOk("X", "value", task, TASK_NO_COMMAND, TASK_NO_TRANSID));
+    EXPECT_EQ(requiredParameterOk("X", "value", task, TASK_NO_COMMAND, TASK_NO_TRANSID),
+              TASK_NO_COMMAND);
     EXPECT_TRUE(trace.errors().empty());
-    EXPECT_EQ("old|parameter", messageOf(task));
+    EXPECT_EQ(messageOf(task), "old|parameter");
 }
 
 TEST(RequiredParameterOk, ReplacesCodeAndMessageWhenThereIsNone) {
     TaskQueueElem task = taskWithMessage();
     const TraceCapture trace;
-    EXPECT_EQ(TASK_NO_TRANSID,
-              requiredParameterOk("X", "", task, TASK_NO_COMMAND, TASK_NO_TRANSID));
-    EXPECT_EQ((Texts{"ZAV1002E No [X] specified, it is a required parameter"}),
-              trace.errors("zavtasks"));
-    EXPECT_EQ("ZAV1002E|", messageOf(task));
+    EXPECT_EQ(requiredParameterOk("X", "", task, TASK_NO_COMMAND, TASK_NO_TRANSID),
+              TASK_NO_TRANSID);
+    EXPECT_EQ(trace.errors("zavtasks"),
+              (Texts{"ZAV1002E No [X] specified, it is a required parameter"}));
+    EXPECT_EQ(messageOf(task), "ZAV1002E|");
 }
 
 TEST(RequiredParameterOk, AcceptsAValueOfBlanks) {
     TaskQueueElem task;
-    EXPECT_EQ(TASK_OK, requiredParameterOk("X", " ", task, TASK_OK, TASK_NO_TRANSID));
+    EXPECT_EQ(requiredParameterOk("X", " ", task, TASK_OK, TASK_NO_TRANSID), TASK_OK);
 }
 
 }  // namespace

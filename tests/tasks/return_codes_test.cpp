@@ -7,26 +7,26 @@
 namespace {
 
 TEST(ReturnCodes, SuccessHasNoMessage) {
-    EXPECT_STREQ("", rcToMsgId(TASK_OK));
+    EXPECT_STREQ(rcToMsgId(TASK_OK), "");
     EXPECT_EQ(0, TASK_OK);
 }
 
 TEST(ReturnCodes, EveryFailureHasItsOwnMessage) {
     for (int code = 1001; code <= 1034; ++code) {
-        EXPECT_EQ("ZAV" + std::to_string(code) + "E", rcToMsgId(static_cast<TASK_RC>(code)));
+        EXPECT_EQ(rcToMsgId(static_cast<TASK_RC>(code)), "ZAV" + std::to_string(code) + "E");
     }
 }
 
 TEST(ReturnCodes, TheLastOneIsInformational) {
-    EXPECT_STREQ("ZAV1035I", rcToMsgId(static_cast<TASK_RC>(1035)));
+    EXPECT_STREQ(rcToMsgId(static_cast<TASK_RC>(1035)), "ZAV1035I");
     EXPECT_EQ(1035, TASK_INFORMATION);
 }
 
 TEST(ReturnCodes, TableIsIndexedByTheCodesLastDigits) {
-    EXPECT_EQ(36u, sizeof rc2MsgId / sizeof rc2MsgId[0]);
-    EXPECT_STREQ("", rc2MsgId[0]);
-    EXPECT_STREQ("ZAV1006E", rc2MsgId[6]);
-    EXPECT_STREQ("ZAV1035I", rc2MsgId[35]);
+    EXPECT_EQ(sizeof rc2MsgId / sizeof rc2MsgId[0], 36u);
+    EXPECT_STREQ(rc2MsgId[0], "");
+    EXPECT_STREQ(rc2MsgId[6], "ZAV1006E");
+    EXPECT_STREQ(rc2MsgId[35], "ZAV1035I");
 }
 
 TEST(ReturnCodes, NamesStandForTheCodesOfTheWire) {

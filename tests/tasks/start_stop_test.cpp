@@ -61,8 +61,8 @@ protected:
                               const std::string& parameter) {
         task.ReturnStatus(0);
         EXPECT_EQ(id, trimmedField(task.getReturnResults().retmsgid));
-        EXPECT_EQ(padded(parameter, 256).substr(0, 256),
-                  fieldText(task.getReturnResults().retmsgparm));
+        EXPECT_EQ(fieldText(task.getReturnResults().retmsgparm),
+                  padded(parameter, 256).substr(0, 256));
     }
 
     ScriptHome home_;
@@ -72,60 +72,60 @@ protected:
 
 TEST_F(StartStop, StartsAnAgentWithoutInstance) {
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, startAgent("ux", "", &task_));
-    EXPECT_EQ(Texts{scriptLine("start ux")}, commandLines(trace));
-    EXPECT_EQ(Texts{"-h " + path_ + " start ux"}, home_.agentCalls());
-    EXPECT_EQ(
-        (Texts{"Attempting to [START] product code [ux] instance []", "Exit with return code [0]"}),
-        trace.details("zavtasks"));
+    EXPECT_EQ(startAgent("ux", "", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("start ux")});
+    EXPECT_EQ(home_.agentCalls(), Texts{"-h " + path_ + " start ux"});
+    EXPECT_EQ(trace.details("zavtasks"),
+              (Texts{"Attempting to [START] product code [ux] instance []",
+                     "Exit with return code [0]"}));
     expectMessage(task_, "", "");
 }
 
 TEST_F(StartStop, StartsAnInstance) {
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, startAgent("ux", "inst1", &task_));
-    EXPECT_EQ(Texts{scriptLine("-o inst1 start ux")}, commandLines(trace));
-    EXPECT_EQ(1, trace.count('D', "Attempting to [START] product code [ux] instance [inst1]"));
+    EXPECT_EQ(startAgent("ux", "inst1", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("-o inst1 start ux")});
+    EXPECT_EQ(trace.count('D', "Attempting to [START] product code [ux] instance [inst1]"), 1);
 }
 
 TEST_F(StartStop, StopsAnAgentWithoutInstance) {
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, stopAgent("ux", "", &task_));
-    EXPECT_EQ(Texts{scriptLine("-c stop ux")}, commandLines(trace));
+    EXPECT_EQ(stopAgent("ux", "", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("-c stop ux")});
     EXPECT_EQ(
-        (Texts{"Attempting to [STOP] product code [ux] instance []", "Exit with return code [0]"}),
-        trace.details("zavtasks"));
+        trace.details("zavtasks"),
+        (Texts{"Attempting to [STOP] product code [ux] instance []", "Exit with return code [0]"}));
 }
 
 TEST_F(StartStop, StopsAnInstance) {
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, stopAgent("ux", "inst1", &task_));
-    EXPECT_EQ(Texts{scriptLine("-c -o inst1 stop ux")}, commandLines(trace));
-    EXPECT_EQ(Texts{"-h " + path_ + " -c -o inst1 stop ux"}, home_.agentCalls());
+    EXPECT_EQ(stopAgent("ux", "inst1", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("-c -o inst1 stop ux")});
+    EXPECT_EQ(home_.agentCalls(), Texts{"-h " + path_ + " -c -o inst1 stop ux"});
 }
 
 TEST_F(StartStop, AnyOtherActionGetsTheFallbackVerb) {
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, startstopAgent("start", "ux", "i", &task_));
-    EXPECT_EQ(Texts{scriptLine("-o i oh-oh-not-supported ux")}, commandLines(trace));
+    EXPECT_EQ(startstopAgent("start", "ux", "i", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("-o i oh-oh-not-supported ux")});
 }
 
 TEST_F(StartStop, OnlyAStartSilencesTheAgentsTraceLog) {
     const std::string found = home_.files().path("found");
     home_.agentScript("printf '%s\\n' \"${KBB_RAS1_LOG-unset}\" >>'" + found + "'");
     ::setenv("KBB_RAS1_LOG", "/dev/null", 1);
-    EXPECT_EQ(TASK_OK, startAgent("ux", "", nullptr));
-    EXPECT_EQ(TASK_OK, stopAgent("ux", "", nullptr));
-    EXPECT_STREQ("/dev/null", ::getenv("KBB_RAS1_LOG"));
+    EXPECT_EQ(startAgent("ux", "", nullptr), TASK_OK);
+    EXPECT_EQ(stopAgent("ux", "", nullptr), TASK_OK);
+    EXPECT_STREQ(::getenv("KBB_RAS1_LOG"), "/dev/null");
     ::unsetenv("KBB_RAS1_LOG");
-    EXPECT_EQ("\n/dev/null\n", home_.files().read("found"));
+    EXPECT_EQ(home_.files().read("found"), "\n/dev/null\n");
 }
 
 TEST_F(StartStop, TheScriptHasNothingToRead) {
     home_.agentScript("cat >'" + home_.files().path("input") + "'");
-    EXPECT_EQ(TASK_OK, startAgent("ux", "", nullptr));
-    EXPECT_EQ(TASK_OK, stopAgent("ux", "", nullptr));
-    EXPECT_EQ("", home_.files().read("input"));
+    EXPECT_EQ(startAgent("ux", "", nullptr), TASK_OK);
+    EXPECT_EQ(stopAgent("ux", "", nullptr), TASK_OK);
+    EXPECT_EQ(home_.files().read("input"), "");
 }
 
 TEST_F(StartStop, AnAgentThatKeepsTheScriptsOutputIsWaitedForToTheTimeout) {
@@ -133,7 +133,7 @@ TEST_F(StartStop, AnAgentThatKeepsTheScriptsOutputIsWaitedForToTheTimeout) {
                       "' ] || [ $n -gt 600 ]; do n=$((n + 1)); sleep 0.05; done) &");
     const ScopedEnv timeout("TIMEOUT", "1");
     const auto begin = std::chrono::steady_clock::now();
-    EXPECT_EQ(TASK_OK, startAgent("ux", "", &task_));
+    EXPECT_EQ(startAgent("ux", "", &task_), TASK_OK);
     EXPECT_LE(std::chrono::milliseconds(900), std::chrono::steady_clock::now() - begin);
     expectMessage(task_, "", "");
     home_.files().write("release", "");
@@ -142,61 +142,60 @@ TEST_F(StartStop, AnAgentThatKeepsTheScriptsOutputIsWaitedForToTheTimeout) {
 TEST_F(StartStop, AScriptThatFailsIs1024WithTheCommandLine) {
     home_.agentScript("exit 3");
     TraceCapture trace;
-    EXPECT_EQ(TASK_START_STOP_FAILED, startAgent("ux", "inst1", &task_));
+    EXPECT_EQ(startAgent("ux", "inst1", &task_), TASK_START_STOP_FAILED);
     const std::string line = scriptLine("-o inst1 start ux");
-    EXPECT_EQ(Texts{"ZAV1024E Bad return code from start/stop command [" + line + "]"},
-              trace.errors("zavtasks"));
-    EXPECT_EQ(1, trace.count('D', "Exit with return code [1024]"));
+    EXPECT_EQ(trace.errors("zavtasks"),
+              Texts{"ZAV1024E Bad return code from start/stop command [" + line + "]"});
+    EXPECT_EQ(trace.count('D', "Exit with return code [1024]"), 1);
     expectMessage(task_, "ZAV1024E", line);
 }
 
 TEST_F(StartStop, AScriptThatCannotRunIs1025WithTheCommandLine) {
     ::unlink((path_ + "/bin/TovrinAgent").c_str());
     TraceCapture trace;
-    EXPECT_EQ(TASK_START_STOP_NOT_STARTED, stopAgent("ux", "", &task_));
+    EXPECT_EQ(stopAgent("ux", "", &task_), TASK_START_STOP_NOT_STARTED);
     const std::string line = scriptLine("-c stop ux");
-    EXPECT_EQ(Texts{"ZAV1025E Failed to start command [" + line + "]"}, trace.errors("zavtasks"));
-    EXPECT_EQ(1, trace.count('D', "Exit with return code [1025]"));
+    EXPECT_EQ(trace.errors("zavtasks"), Texts{"ZAV1025E Failed to start command [" + line + "]"});
+    EXPECT_EQ(trace.count('D', "Exit with return code [1025]"), 1);
     expectMessage(task_, "ZAV1025E", line);
 }
 
 TEST_F(StartStop, WithoutATaskFailuresAreOnlyTraced) {
     home_.agentScript("exit 3");
     TraceCapture trace;
-    EXPECT_EQ(TASK_START_STOP_FAILED, startAgent("ux", "", nullptr));
-    EXPECT_EQ(
-        Texts{"ZAV1024E Bad return code from start/stop command [" + scriptLine("start ux") + "]"},
-        trace.errors("zavtasks"));
+    EXPECT_EQ(startAgent("ux", "", nullptr), TASK_START_STOP_FAILED);
+    EXPECT_EQ(trace.errors("zavtasks"), Texts{"ZAV1024E Bad return code from start/stop command [" +
+                                              scriptLine("start ux") + "]"});
 }
 
 // ---- Restart ------------------------------------------------------------------------------------
 
 TEST_F(StartStop, ARestartStopsAndStarts) {
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, restartAgent("ux", "inst1", &task_));
-    EXPECT_EQ((Texts{scriptLine("-c -o inst1 stop ux"), scriptLine("-o inst1 start ux")}),
-              commandLines(trace));
+    EXPECT_EQ(restartAgent("ux", "inst1", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace),
+              (Texts{scriptLine("-c -o inst1 stop ux"), scriptLine("-o inst1 start ux")}));
     expectMessage(task_, "", "");
 }
 
 TEST_F(StartStop, ARestartStartsEvenWhenTheStopFails) {
     home_.agentScript("[ $verb = start ]");
-    EXPECT_EQ(TASK_OK, restartAgent("ux", "", &task_));
-    EXPECT_EQ(2u, home_.agentCalls().size());
+    EXPECT_EQ(restartAgent("ux", "", &task_), TASK_OK);
+    EXPECT_EQ(home_.agentCalls().size(), 2u);
     expectMessage(task_, "ZAV1024E", scriptLine("-c stop ux"));
 }
 
 TEST_F(StartStop, ARestartHasTheOutcomeOfItsStart) {
     home_.agentScript("[ $verb = stop ]");
-    EXPECT_EQ(TASK_START_STOP_FAILED, restartAgent("ux", "", &task_));
+    EXPECT_EQ(restartAgent("ux", "", &task_), TASK_START_STOP_FAILED);
     expectMessage(task_, "ZAV1024E", scriptLine("start ux"));
 }
 
 TEST_F(StartStop, ARestartMayFailTwice) {
     home_.agentScript("exit 1");
     TraceCapture trace;
-    EXPECT_EQ(TASK_START_STOP_FAILED, restartAgent("ux", "", &task_));
-    EXPECT_EQ(2u, trace.errors("zavtasks").size());
+    EXPECT_EQ(restartAgent("ux", "", &task_), TASK_START_STOP_FAILED);
+    EXPECT_EQ(trace.errors("zavtasks").size(), 2u);
     expectMessage(task_, "ZAV1024E", scriptLine("start ux"));
 }
 
@@ -207,9 +206,9 @@ TEST_F(StartStop, ARecordedUserRunsTheCommand) {
     TraceCapture trace;
     const std::string line =
         "/bin/su - no-such-user -c \"" + scriptLine("-o inst1 start ux") + "\"";
-    EXPECT_EQ(TASK_START_STOP_FAILED, startAgent("ux", "inst1", &task_));
-    EXPECT_EQ(Texts{line}, commandLines(trace));
-    EXPECT_EQ(Texts{}, home_.agentCalls());
+    EXPECT_EQ(startAgent("ux", "inst1", &task_), TASK_START_STOP_FAILED);
+    EXPECT_EQ(commandLines(trace), Texts{line});
+    EXPECT_EQ(home_.agentCalls(), Texts{});
     expectMessage(task_, "ZAV1024E", line);
 }
 
@@ -217,46 +216,46 @@ TEST_F(StartStop, AUserMayBeRecordedForNoInstance) {
     runAs(agentEntry("ux", "", "no-such-user"));
     TraceCapture trace;
     stopAgent("ux", "", nullptr);
-    EXPECT_EQ(Texts{"/bin/su - no-such-user -c \"" + scriptLine("-c stop ux") + "\""},
-              commandLines(trace));
+    EXPECT_EQ(commandLines(trace),
+              Texts{"/bin/su - no-such-user -c \"" + scriptLine("-c stop ux") + "\""});
 }
 
 TEST_F(StartStop, TheUsersLoginShellGetsTheWholeCommand) {
     if (::geteuid() != 0) GTEST_SKIP() << "only root may become root without a password";
     runAs(agentEntry("ux", "inst1", "root"));
-    EXPECT_EQ(TASK_OK, startAgent("ux", "inst1", &task_));
-    EXPECT_EQ(Texts{"-h " + path_ + " -o inst1 start ux"}, home_.agentCalls());
+    EXPECT_EQ(startAgent("ux", "inst1", &task_), TASK_OK);
+    EXPECT_EQ(home_.agentCalls(), Texts{"-h " + path_ + " -o inst1 start ux"});
 }
 
 TEST_F(StartStop, AnEmptyUserLeavesTheCommandAsItIs) {
     runAs(agentEntry("ux", "inst1", ""));
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, startAgent("ux", "inst1", &task_));
-    EXPECT_EQ(Texts{scriptLine("-o inst1 start ux")}, commandLines(trace));
+    EXPECT_EQ(startAgent("ux", "inst1", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("-o inst1 start ux")});
 }
 
 TEST_F(StartStop, OtherProductsAndInstancesDoNotCount) {
     runAs(agentEntry("oq", "inst1", "no-such-user") + agentEntry("ux", "inst2", "no-such-user"));
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, startAgent("ux", "inst1", &task_));
-    EXPECT_EQ(Texts{scriptLine("-o inst1 start ux")}, commandLines(trace));
+    EXPECT_EQ(startAgent("ux", "inst1", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("-o inst1 start ux")});
 }
 
 TEST_F(StartStop, ABrokenDatabaseIsAnEmptyOne) {
     runAs("<agent><productCode>ux");
     TraceCapture trace;
-    EXPECT_EQ(TASK_OK, startAgent("ux", "inst1", &task_));
-    EXPECT_EQ(Texts{scriptLine("-o inst1 start ux")}, commandLines(trace));
+    EXPECT_EQ(startAgent("ux", "inst1", &task_), TASK_OK);
+    EXPECT_EQ(commandLines(trace), Texts{scriptLine("-o inst1 start ux")});
 }
 
 TEST_F(StartStop, TheDatabaseIsReadAnewEachTime) {
-    EXPECT_EQ(TASK_OK, startAgent("ux", "", nullptr));
+    EXPECT_EQ(startAgent("ux", "", nullptr), TASK_OK);
     runAs(agentEntry("ux", "", "no-such-user"));
-    EXPECT_EQ(TASK_START_STOP_FAILED, startAgent("ux", "", nullptr));
+    EXPECT_EQ(startAgent("ux", "", nullptr), TASK_START_STOP_FAILED);
     const std::string host = static_cast<const char*>(ZAV::Util::getHostName().c_str());
     TraceCapture trace;
     startAgent("ux", "", nullptr);
-    EXPECT_EQ(1, trace.count('D', "Parsing file: " + path_ + "/config/" + host + "_zavrunas.cfg"));
+    EXPECT_EQ(trace.count('D', "Parsing file: " + path_ + "/config/" + host + "_zavrunas.cfg"), 1);
 }
 
 }  // namespace

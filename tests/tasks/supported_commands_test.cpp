@@ -42,15 +42,15 @@ TEST_F(SupportedCommands, AreTracedAtDetailLevelAndOthersAsErrors) {
     const TraceCapture trace;
     isSupportedTask("START");
     isSupportedTask("DANCE");
-    EXPECT_EQ((Texts{"Command START is supported"}), trace.details("zavtasks"));
-    EXPECT_EQ((Texts{"Command DANCE is NOT supported"}), trace.errors("zavtasks"));
+    EXPECT_EQ(trace.details("zavtasks"), (Texts{"Command START is supported"}));
+    EXPECT_EQ(trace.errors("zavtasks"), (Texts{"Command DANCE is NOT supported"}));
 }
 
 TEST_F(SupportedCommands, AreListedInOrderWithCommasBetweenThem) {
     const TraceCapture trace;
     getSupportedTasks();
-    EXPECT_EQ((Texts{"Commands supported are: START,REMOVEINSTANCE,GETCONFIG"}),
-              trace.details("zavtasks"));
+    EXPECT_EQ(trace.details("zavtasks"),
+              (Texts{"Commands supported are: START,REMOVEINSTANCE,GETCONFIG"}));
 }
 
 TEST_F(SupportedCommands, AreNotListedWithoutDetailTraces) {

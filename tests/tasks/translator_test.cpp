@@ -26,8 +26,8 @@ TEST_F(Translator, LiesInTheSharedComponentsDirectory) {
     const std::string expected = home_.translator("true");
     String path;
     EXPECT_TRUE(getTwoWayTranslator(path));
-    EXPECT_EQ(expected, narrow(path));
-    EXPECT_EQ(1, trace_.count('D', "Using default two-way translator [" + expected + "]"));
+    EXPECT_EQ(narrow(path), expected);
+    EXPECT_EQ(trace_.count('D', "Using default two-way translator [" + expected + "]"), 1);
     EXPECT_THAT(home_.calls(TaskHome::kTranslator), IsEmpty());
 }
 
@@ -35,9 +35,10 @@ TEST_F(Translator, IsLookedForInTheRootWithoutASharedComponent) {
     String path("before");
     EXPECT_FALSE(getTwoWayTranslator(path));
     EXPECT_TRUE(path == "");
-    EXPECT_EQ(1, trace_.count('E',
-                              "No two-way translator found, default translator [/zav_xa] does "
-                              "not exist"));
+    EXPECT_EQ(trace_.count('E',
+                           "No two-way translator found, default translator [/zav_xa] does "
+                           "not exist"),
+              1);
 }
 
 TEST_F(Translator, MayBeMissingFromTheSharedComponent) {
@@ -46,47 +47,48 @@ TEST_F(Translator, MayBeMissingFromTheSharedComponent) {
     String path("before");
     EXPECT_FALSE(getTwoWayTranslator(path));
     EXPECT_TRUE(path == "");
-    EXPECT_EQ(1, trace_.count('E', "No two-way translator found, default translator [" + expected +
-                                       "] does not exist"));
+    EXPECT_EQ(trace_.count('E', "No two-way translator found, default translator [" + expected +
+                                    "] does not exist"),
+              1);
 }
 
 TEST_F(Translator, TextsWithoutTokensStayAsTheyAre) {
     for (const char* text :
          {"", "./install.sh -q", "|", "||", "|OTHER|", "|depotdir|", "|DEPOTDIR"}) {
-        EXPECT_EQ(text, replaced(text));
+        EXPECT_EQ(replaced(text), text);
     }
-    EXPECT_EQ(1, trace_.count('D', "Received String is [|OTHER|]"));
-    EXPECT_EQ(1, trace_.count('D', "Resolved String is [|OTHER|]"));
+    EXPECT_EQ(trace_.count('D', "Received String is [|OTHER|]"), 1);
+    EXPECT_EQ(trace_.count('D', "Resolved String is [|OTHER|]"), 1);
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(Translator, TokensBecomeDirectories) {
-    EXPECT_EQ(home_.depot() + "ux/060100000", replaced("|DEPLOYDIR|"));
+    EXPECT_EQ(replaced("|DEPLOYDIR|"), home_.depot() + "ux/060100000");
     EXPECT_EQ(home_.home(), replaced("|TOVRINHOME|"));
     EXPECT_EQ(home_.depot(), replaced("|DEPOTDIR|"));
 }
 
 TEST_F(Translator, EveryTokenIsReplaced) {
-    EXPECT_EQ(home_.depot() + "ux/060100000/i.sh -h " + home_.home() + " -d " + home_.depot() +
-                  " " + home_.home() + home_.home(),
-              replaced("|DEPLOYDIR|/i.sh -h |TOVRINHOME| -d |DEPOTDIR| |TOVRINHOME||TOVRINHOME|"));
+    EXPECT_EQ(replaced("|DEPLOYDIR|/i.sh -h |TOVRINHOME| -d |DEPOTDIR| |TOVRINHOME||TOVRINHOME|"),
+              home_.depot() + "ux/060100000/i.sh -h " + home_.home() + " -d " + home_.depot() +
+                  " " + home_.home() + home_.home());
 }
 
 TEST_F(Translator, TheCommonInstallerHasNoVersion) {
-    EXPECT_EQ(home_.depot() + "ci", replaced("|DEPLOYDIR|", "ci"));
-    EXPECT_EQ(home_.depot() + "CI/060100000", replaced("|DEPLOYDIR|", "CI"));
-    EXPECT_EQ(home_.depot() + "ux/", replaced("|DEPLOYDIR|", "ux", ""));
+    EXPECT_EQ(replaced("|DEPLOYDIR|", "ci"), home_.depot() + "ci");
+    EXPECT_EQ(replaced("|DEPLOYDIR|", "CI"), home_.depot() + "CI/060100000");
+    EXPECT_EQ(replaced("|DEPLOYDIR|", "ux", ""), home_.depot() + "ux/");
 }
 
 TEST_F(Translator, WhatIsPutInIsSearchedForTheLaterTokens) {
     depotDir = "/depot/|TOVRINHOME|/";
-    EXPECT_EQ("/depot/" + home_.home() + "/ux/1", replaced("|DEPLOYDIR|", "ux", "1"));
-    EXPECT_EQ("/depot/|TOVRINHOME|/", replaced("|DEPOTDIR|"));
+    EXPECT_EQ(replaced("|DEPLOYDIR|", "ux", "1"), "/depot/" + home_.home() + "/ux/1");
+    EXPECT_EQ(replaced("|DEPOTDIR|"), "/depot/|TOVRINHOME|/");
 }
 
 TEST_F(Translator, ProductsAndVersionsAreTakenAsTheyAre) {
-    EXPECT_EQ(home_.depot() + home_.depot() + "/" + home_.home(),
-              replaced("|DEPLOYDIR|", "|DEPOTDIR|", "|TOVRINHOME|"));
+    EXPECT_EQ(replaced("|DEPLOYDIR|", "|DEPOTDIR|", "|TOVRINHOME|"),
+              home_.depot() + home_.depot() + "/" + home_.home());
 }
 
 }  // namespace

@@ -121,7 +121,7 @@ protected:
     /// Stops, changes and starts nothing.
     void expectNoRestart(const std::string& before) const {
         EXPECT_THAT(agentCalls(), IsEmpty());
-        EXPECT_EQ(before, kumenvText());
+        EXPECT_EQ(kumenvText(), before);
     }
 
     TaskHome home_;
@@ -131,14 +131,14 @@ protected:
 // ---- Requests that succeed ----------------------------------------------------------------------
 
 TEST_F(UaConfig, ImportsTheMetafile) {
-    EXPECT_EQ(kSuccess, run({}));
-    EXPECT_EQ("//APPL\n", home_.dir().read("home/metafiles/app.mdl"));
+    EXPECT_EQ(run({}), kSuccess);
+    EXPECT_EQ(home_.dir().read("home/metafiles/app.mdl"), "//APPL\n");
     EXPECT_THAT(home_.calls(kConsole), ElementsAre(consoleCall("DELETE"), consoleCall("IMPORT")));
-    EXPECT_EQ("", home_.input(kConsole));
+    EXPECT_EQ(home_.input(kConsole), "");
     expectNoRestart("*kumenv\n|DATAPROVIDER|SNMP|\n");
-    EXPECT_EQ(1, trace_.count('D', "Context [] port (optional) [] restart (1=true) [0]"));
-    EXPECT_EQ(1, trace_.count('D', "Import of MDL file [app.mdl] successfull"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 0"));
+    EXPECT_EQ(trace_.count('D', "Context [] port (optional) [] restart (1=true) [0]"), 1);
+    EXPECT_EQ(trace_.count('D', "Import of MDL file [app.mdl] successfull"), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 0"), 1);
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
@@ -155,16 +155,16 @@ TEST_F(UaConfig, SaysWhichDirectoriesItUses) {
 TEST_F(UaConfig, MakesTheScriptsExecutable) {
     Request request;
     request.scripts = "one.sh,two.sh";
-    EXPECT_EQ(kSuccess, run(request));
+    EXPECT_EQ(run(request), kSuccess);
     for (const char* name : {"one", "two"}) {
         const std::string path = home_.home() + "/work/scripts/" + name + ".sh";
         struct stat status {};
-        ASSERT_EQ(0, ::stat(path.c_str(), &status));
-        EXPECT_EQ(0755u, status.st_mode & 07777u);
+        ASSERT_EQ(::stat(path.c_str(), &status), 0);
+        EXPECT_EQ(status.st_mode & 07777u, 0755u);
         EXPECT_EQ(std::string(name) + "\n",
                   home_.dir().read("home/work/scripts/" + std::string(name) + ".sh"));
-        EXPECT_EQ(1,
-                  trace_.count('D', "Settings permissions on script file [" + path + "] to [493]"));
+        EXPECT_EQ(trace_.count('D', "Settings permissions on script file [" + path + "] to [493]"),
+                  1);
     }
 }
 
@@ -174,9 +174,10 @@ TEST_F(UaConfig, AScriptsModeNeedNotChange) {
     changingModesFails = true;
     const Outcome outcome = run(request);
     changingModesFails = false;
-    EXPECT_EQ(kSuccess, outcome);
-    EXPECT_EQ(1, trace_.count('E', "Failed to set permissions on file [" + home_.home() +
-                                       "/work/scripts/one.sh] to [493]"));
+    EXPECT_EQ(outcome, kSuccess);
+    EXPECT_EQ(trace_.count('E', "Failed to set permissions on file [" + home_.home() +
+                                    "/work/scripts/one.sh] to [493]"),
+              1);
 }
 
 TEST_F(UaConfig, NamesMayHaveBlanks) {
@@ -185,7 +186,7 @@ TEST_F(UaConfig, NamesMayHaveBlanks) {
     Request request;
     request.metafile = "my app.mdl";
     request.scripts = "my script.sh";
-    EXPECT_EQ(kSuccess, run(request));
+    EXPECT_EQ(run(request), kSuccess);
     EXPECT_TRUE(home_.dir().exists("home/work/scripts/my script.sh"));
     EXPECT_THAT(home_.calls(kConsole), ElementsAre(consoleCall("DELETE", "my app.mdl"),
                                                    consoleCall("IMPORT", "my app.mdl")));
@@ -194,9 +195,9 @@ TEST_F(UaConfig, NamesMayHaveBlanks) {
 TEST_F(UaConfig, WithoutFilesThereIsNothingToDo) {
     Request request;
     request.metafile = "";
-    EXPECT_EQ(kSuccess, run(request));
-    EXPECT_EQ(1, trace_.count('E', "UA SetConfig called but no MDL or Script files specified"));
-    EXPECT_EQ(0, trace_.count('D', "Return code is 0"));
+    EXPECT_EQ(run(request), kSuccess);
+    EXPECT_EQ(trace_.count('E', "UA SetConfig called but no MDL or Script files specified"), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 0"), 0);
     EXPECT_THAT(home_.calls("bin/cinfo"), IsEmpty());
 }
 
@@ -204,15 +205,15 @@ TEST_F(UaConfig, ScriptsWithoutAMetafileAreNotCopied) {
     Request request;
     request.metafile = "";
     request.scripts = "one.sh";
-    EXPECT_EQ(kSuccess, run(request));
+    EXPECT_EQ(run(request), kSuccess);
     EXPECT_FALSE(home_.dir().exists("home/work/scripts/one.sh"));
     EXPECT_THAT(home_.calls(kConsole), IsEmpty());
-    EXPECT_EQ(1, trace_.count('D', "Return code is 0"));
+    EXPECT_EQ(trace_.count('D', "Return code is 0"), 1);
 }
 
 TEST_F(UaConfig, WhatTheConsoleSaysToADeletionDoesNotMatter) {
     console("[ $verb != DELETE ] || exit 8");
-    EXPECT_EQ(kSuccess, run({}));
+    EXPECT_EQ(run({}), kSuccess);
     EXPECT_THAT(home_.calls(kConsole), ElementsAre(consoleCall("DELETE"), consoleCall("IMPORT")));
 }
 
@@ -221,7 +222,7 @@ TEST_F(UaConfig, WhatTheConsoleSaysToADeletionDoesNotMatter) {
 TEST_F(UaConfig, TheConsoleIsGivenItsSettings) {
     Request request;
     request.context = "PORT=7700";
-    EXPECT_EQ(kSuccess, run(request));
+    EXPECT_EQ(run(request), kSuccess);
     EXPECT_THAT(home_.environment(kConsole),
                 testing::UnorderedElementsAre(
                     "KUM_PRODSPEC_PATH=" + workPath() + "/", "KUMP_RB_PATH=" + home_.home() + "/rb",
@@ -234,7 +235,7 @@ TEST_F(UaConfig, TheConsoleIsGivenItsSettings) {
 }
 
 TEST_F(UaConfig, WithoutAPortTheConsoleIsGivenNone) {
-    EXPECT_EQ(kSuccess, run({}));
+    EXPECT_EQ(run({}), kSuccess);
     EXPECT_THAT(home_.environment(kConsole), testing::SizeIs(3));
 }
 
@@ -262,8 +263,8 @@ TEST_F(UaConfig, OptionsAreReadInAnyCase) {
         consoleWithType("SNMP");
         Request request;
         request.context = c.context;
-        EXPECT_EQ(kSuccess, run(request)) << c.context;
-        EXPECT_EQ(1, trace_.count('D', std::string("Context ") + c.options)) << c.context;
+        EXPECT_EQ(run(request), kSuccess) << c.context;
+        EXPECT_EQ(trace_.count('D', std::string("Context ") + c.options), 1) << c.context;
     }
 }
 
@@ -273,14 +274,14 @@ TEST_F(UaConfig, AddsTheDataProviderOfTheMetafile) {
     consoleWithType(" sock \\n");
     Request request;
     request.context = "restart=y,port=7700";
-    EXPECT_EQ(kSuccess, run(request));
+    EXPECT_EQ(run(request), kSuccess);
     EXPECT_THAT(home_.calls(kConsole), ElementsAre(consoleCall("getdptype"), consoleCall("DELETE"),
                                                    consoleCall("IMPORT")));
     EXPECT_THAT(agentCalls(), ElementsAre("[-h][" + home_.home() + "][-c][stop][um]",
                                           "[-h][" + home_.home() + "][start][um]"));
-    EXPECT_EQ("*kumenv\n|DATAPROVIDER|SNMP,SOCK|\n", kumenvText());
-    EXPECT_EQ(1, trace_.count('D', "DPTYPE for metafile [app.mdl] is [SOCK]"));
-    EXPECT_EQ(1, trace_.count('D', "Adding [SOCK] to startup parms of [SNMP]"));
+    EXPECT_EQ(kumenvText(), "*kumenv\n|DATAPROVIDER|SNMP,SOCK|\n");
+    EXPECT_EQ(trace_.count('D', "DPTYPE for metafile [app.mdl] is [SOCK]"), 1);
+    EXPECT_EQ(trace_.count('D', "Adding [SOCK] to startup parms of [SNMP]"), 1);
     EXPECT_THAT(trace_.errors("zavtasks"), IsEmpty());
 }
 
@@ -291,8 +292,8 @@ TEST_F(UaConfig, AddsItForTheInstanceThatTheTargetNames) {
     Request request;
     request.context = "RESTART=Y";
     request.target = "inst1:hostA:UA";
-    EXPECT_EQ(kSuccess, run(request));
-    EXPECT_EQ("|DATAPROVIDER|ASFS|\ninst1|DATAPROVIDER|ASFS,SNMP,ODBC|\n", kumenvText());
+    EXPECT_EQ(run(request), kSuccess);
+    EXPECT_EQ(kumenvText(), "|DATAPROVIDER|ASFS|\ninst1|DATAPROVIDER|ASFS,SNMP,ODBC|\n");
     EXPECT_THAT(agentCalls(), ElementsAre("[-h][" + home_.home() + "][-c][-o][inst1][stop][um]",
                                           "[-h][" + home_.home() + "][-o][inst1][start][um]"));
 }
@@ -300,15 +301,15 @@ TEST_F(UaConfig, AddsItForTheInstanceThatTheTargetNames) {
 TEST_F(UaConfig, ReplacesEveryMarkedLine) {
     startupParameters("|DATAPROVIDER|1|\nx\n|DATAPROVIDER|2|");
     consoleWithType("ODBC");
-    EXPECT_EQ(kSuccess, runWithRestart());
-    EXPECT_EQ("|DATAPROVIDER|SNMP,ODBC|\nx\n|DATAPROVIDER|SNMP,ODBC|\n", kumenvText());
+    EXPECT_EQ(runWithRestart(), kSuccess);
+    EXPECT_EQ(kumenvText(), "|DATAPROVIDER|SNMP,ODBC|\nx\n|DATAPROVIDER|SNMP,ODBC|\n");
 }
 
 TEST_F(UaConfig, StartsAgainWithoutAMarkedLine) {
     startupParameters("x\n");
     consoleWithType("ODBC");
-    EXPECT_EQ(kSuccess, runWithRestart());
-    EXPECT_EQ("x\n", kumenvText());
+    EXPECT_EQ(runWithRestart(), kSuccess);
+    EXPECT_EQ(kumenvText(), "x\n");
     EXPECT_THAT(agentCalls(), testing::SizeIs(2));
 }
 
@@ -317,10 +318,10 @@ TEST_F(UaConfig, FourTypesArePartOfTheCombinedOne) {
     for (const char* type : {"APIS", "SOCK", "FILE", "SCRP"}) {
         trace_.clear();
         consoleWithType(type);
-        EXPECT_EQ(kSuccess, runWithRestart());
-        EXPECT_EQ(1,
-                  trace_.count('D', std::string("DPtype [") + type + "] is part of dptype [ASFS]"));
-        EXPECT_EQ(1, trace_.count('D', "DPtype [ASFS] already in startup parms list [SNMP,ASFS]"));
+        EXPECT_EQ(runWithRestart(), kSuccess);
+        EXPECT_EQ(trace_.count('D', std::string("DPtype [") + type + "] is part of dptype [ASFS]"),
+                  1);
+        EXPECT_EQ(trace_.count('D', "DPtype [ASFS] already in startup parms list [SNMP,ASFS]"), 1);
     }
     expectNoRestart("*kumenv\n|DATAPROVIDER|SNMP|\n");
 }
@@ -328,16 +329,16 @@ TEST_F(UaConfig, FourTypesArePartOfTheCombinedOne) {
 TEST_F(UaConfig, OtherTypesAreNotPartOfTheCombinedOne) {
     configure({{"KUMA_STARTUP_DP", "ASFS"}});
     consoleWithType("ODBC");
-    EXPECT_EQ(kSuccess, runWithRestart());
-    EXPECT_EQ("*kumenv\n|DATAPROVIDER|ASFS,ODBC|\n", kumenvText());
+    EXPECT_EQ(runWithRestart(), kSuccess);
+    EXPECT_EQ(kumenvText(), "*kumenv\n|DATAPROVIDER|ASFS,ODBC|\n");
 }
 
 TEST_F(UaConfig, ATypeInTheListCausesNoRestart) {
     configure({{"KUMA_STARTUP_DP", "'xsocky'"}});
     consoleWithType("sock");
-    EXPECT_EQ(kSuccess, runWithRestart());
+    EXPECT_EQ(runWithRestart(), kSuccess);
     expectNoRestart("*kumenv\n|DATAPROVIDER|SNMP|\n");
-    EXPECT_EQ(1, trace_.count('D', "DPtype [SOCK] already in startup parms list [XSOCKY]"));
+    EXPECT_EQ(trace_.count('D', "DPtype [SOCK] already in startup parms list [XSOCKY]"), 1);
     EXPECT_THAT(home_.calls(kConsole), testing::SizeIs(3));
 }
 
@@ -345,24 +346,24 @@ TEST_F(UaConfig, TheListMayBeMissing) {
     for (const char* value : {"", "''"}) {
         configure({{"KUMA_STARTUP_DP", value}});
         consoleWithType("SOCK");
-        EXPECT_EQ(kSuccess, runWithRestart()) << value;
-        EXPECT_EQ("*kumenv\n|DATAPROVIDER|,SOCK|\n", kumenvText());
+        EXPECT_EQ(runWithRestart(), kSuccess) << value;
+        EXPECT_EQ(kumenvText(), "*kumenv\n|DATAPROVIDER|,SOCK|\n");
     }
-    EXPECT_EQ(1, trace_.count('E', "No value found for KUMA_STARTUP_DP"));
+    EXPECT_EQ(trace_.count('E', "No value found for KUMA_STARTUP_DP"), 1);
 }
 
 TEST_F(UaConfig, TheTypeMayBeNothing) {
     for (const char* printed : {"", "\\n", "\\n\\n \\n"}) {
         consoleWithType(printed);
-        EXPECT_EQ(kSuccess, runWithRestart()) << printed;
-        EXPECT_EQ("*kumenv\n|DATAPROVIDER|SNMP,|\n", kumenvText());
+        EXPECT_EQ(runWithRestart(), kSuccess) << printed;
+        EXPECT_EQ(kumenvText(), "*kumenv\n|DATAPROVIDER|SNMP,|\n");
     }
 }
 
 TEST_F(UaConfig, TheConsoleMayPrintEightMegabytes) {
     console("head -c 8388608 /dev/zero | tr '\\0' x");
     const TraceCapture quiet("ERROR");
-    EXPECT_EQ(kSuccess, runWithRestart());
+    EXPECT_EQ(runWithRestart(), kSuccess);
     EXPECT_THAT(agentCalls(), testing::SizeIs(2));
 }
 
@@ -375,8 +376,8 @@ TEST_F(UaConfig, TheInstanceInLowerCaseIsTriedToo) {
     Request request;
     request.context = "RESTART=Y";
     request.target = "INST1:hostA:UA";
-    EXPECT_EQ(kSuccess, run(request));
-    EXPECT_EQ("inst1|DATAPROVIDER|SNMP,SOCK|\n", kumenvText());
+    EXPECT_EQ(run(request), kSuccess);
+    EXPECT_EQ(kumenvText(), "inst1|DATAPROVIDER|SNMP,SOCK|\n");
     EXPECT_THAT(agentCalls(),
                 testing::Contains("[-h][" + home_.home() + "][-o][inst1][start][um]"));
 }
@@ -386,22 +387,23 @@ TEST_F(UaConfig, TheInstanceAsItIsNamedComesFirst) {
     configure({{"KUMP_META_PATH", ""}}, "um_inst1.config");
     Request request;
     request.target = "INST1:hostA:UA";
-    EXPECT_EQ(kSuccess, run(request));
+    EXPECT_EQ(run(request), kSuccess);
 }
 
 TEST_F(UaConfig, TheInstanceInUpperCaseIsNotTried) {
     configure({}, "um_INST1.config");
     Request request;
     request.target = "Inst1:hostA:UA";
-    EXPECT_EQ((Outcome{1020, "ZAV1020E", configFile("um_inst1.config") + ",inst1"}), run(request));
-    EXPECT_EQ(1, trace_.count('E', "ZAV1020E Configuration file [" + configFile("um_inst1.config") +
-                                       "] for instance (optional) [inst1] does not exist"));
-    EXPECT_EQ(0, trace_.count('D', "Return code is 1020"));
+    EXPECT_EQ(run(request), (Outcome{1020, "ZAV1020E", configFile("um_inst1.config") + ",inst1"}));
+    EXPECT_EQ(trace_.count('E', "ZAV1020E Configuration file [" + configFile("um_inst1.config") +
+                                    "] for instance (optional) [inst1] does not exist"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1020"), 0);
 }
 
 TEST_F(UaConfig, TheDefaultInstanceNeedsItsFile) {
     std::filesystem::remove(configFile());
-    EXPECT_EQ((Outcome{1020, "ZAV1020E", configFile() + ","}), run({}));
+    EXPECT_EQ(run({}), (Outcome{1020, "ZAV1020E", configFile() + ","}));
 }
 
 TEST_F(UaConfig, ThreeKeysMustHaveValues) {
@@ -414,20 +416,21 @@ TEST_F(UaConfig, ThreeKeysMustHaveValues) {
           Case{"KUM_WORK_PATH", {1012, "ZAV1012E", "KUM_WORK_PATH," + configFile()}},
           Case{"KUMP_RB_PATH", {1013, "ZAV1013E", "KUMP_RB_PATH," + configFile()}}}) {
         configure({{c.key, ""}});
-        EXPECT_EQ(c.outcome, run({}));
-        EXPECT_EQ(1, trace_.count('E', c.outcome.messageId + " No value found for [" + c.key +
-                                           "] in config file [" + configFile() + "]"));
-        EXPECT_EQ(0, trace_.count('D', "Return code is " + std::to_string(c.outcome.rc)));
+        EXPECT_EQ(run({}), c.outcome);
+        EXPECT_EQ(trace_.count('E', c.outcome.messageId + " No value found for [" + c.key +
+                                        "] in config file [" + configFile() + "]"),
+                  1);
+        EXPECT_EQ(trace_.count('D', "Return code is " + std::to_string(c.outcome.rc)), 0);
     }
     configure({{"KUMP_META_PATH", ""}, {"KUM_WORK_PATH", ""}, {"KUMP_RB_PATH", ""}});
-    EXPECT_EQ(1011, run({}).rc);
+    EXPECT_EQ(run({}).rc, 1011);
     EXPECT_THAT(home_.calls("bin/cinfo"), IsEmpty());
 }
 
 TEST_F(UaConfig, TheLastOfSeveralValuesCounts) {
     home_.dir().makeDir("home/other");
     configure({{"LATER", "1\r\nKUMP_META_PATH=" + home_.home() + "/other"}});
-    EXPECT_EQ(kSuccess, run({}));
+    EXPECT_EQ(run({}), kSuccess);
     EXPECT_TRUE(home_.dir().exists("home/other/app.mdl"));
 }
 
@@ -435,13 +438,14 @@ TEST_F(UaConfig, TheWorkPathNeedsAParent) {
     for (const char* path : {"work", "/work", "''"}) {
         configure({{"KUM_WORK_PATH", path}});
         const std::string value = std::string(path) == "''" ? "" : path;
-        EXPECT_EQ((Outcome{1021, "ZAV1021E", "KUM_WORK_PATH," + value + "," + configFile()}),
-                  run({}));
-        EXPECT_EQ(1, trace_.count('E', "ZAV1021E Work directory [" + value +
-                                           "] from tag [%] in config file [" + configFile() +
-                                           "] cannot be parsed, no dir separator"));
+        EXPECT_EQ(run({}),
+                  (Outcome{1021, "ZAV1021E", "KUM_WORK_PATH," + value + "," + configFile()}));
+        EXPECT_EQ(trace_.count('E', "ZAV1021E Work directory [" + value +
+                                        "] from tag [%] in config file [" + configFile() +
+                                        "] cannot be parsed, no dir separator"),
+                  1);
     }
-    EXPECT_EQ(0, trace_.count('D', "Return code is 1021"));
+    EXPECT_EQ(trace_.count('D', "Return code is 1021"), 0);
 }
 
 TEST_F(UaConfig, TheProductMustBeInstalled) {
@@ -449,13 +453,13 @@ TEST_F(UaConfig, TheProductMustBeInstalled) {
          {"", "\n", "Platform codes:", "Platform codes:\nli6263 Product (ux)\n"}) {
         trace_.clear();
         home_.inventory("", report);
-        EXPECT_EQ((Outcome{1019, "ZAV1019E", "um"}), run({})) << report;
-        EXPECT_EQ(1, trace_.count('E', "ZAV1019E Supplied product code [um] is not installed"));
-        EXPECT_EQ(0, trace_.count('D', "Return code is 1019"));
+        EXPECT_EQ(run({}), (Outcome{1019, "ZAV1019E", "um"})) << report;
+        EXPECT_EQ(trace_.count('E', "ZAV1019E Supplied product code [um] is not installed"), 1);
+        EXPECT_EQ(trace_.count('D', "Return code is 1019"), 0);
     }
     Request request;
     request.product = "UM";
-    EXPECT_EQ((Outcome{1019, "ZAV1019E", "UM"}), run(request));
+    EXPECT_EQ(run(request), (Outcome{1019, "ZAV1019E", "UM"}));
 }
 
 // ---- Failures of copying ------------------------------------------------------------------------
@@ -464,32 +468,32 @@ TEST_F(UaConfig, AMetafileThatIsNotInTheDepotIsAFailure) {
     Request request;
     request.metafile = "none.mdl";
     request.scripts = "one.sh";
-    EXPECT_EQ(
-        (Outcome{1014, "ZAV1014E", home_.depot() + "none.mdl," + home_.home() + "/metafiles"}),
-        run(request));
-    EXPECT_EQ(1, trace_.count('E', "ZAV1014E Failed to copy MDL file " + home_.depot() +
-                                       "none.mdl to MDL directory " + home_.home() + "/metafiles"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1014"));
+    EXPECT_EQ(run(request), (Outcome{1014, "ZAV1014E",
+                                     home_.depot() + "none.mdl," + home_.home() + "/metafiles"}));
+    EXPECT_EQ(trace_.count('E', "ZAV1014E Failed to copy MDL file " + home_.depot() +
+                                    "none.mdl to MDL directory " + home_.home() + "/metafiles"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1014"), 1);
     EXPECT_TRUE(home_.dir().exists("home/work/scripts/one.sh"));
     EXPECT_THAT(home_.calls(kConsole), IsEmpty());
 }
 
 TEST_F(UaConfig, AMetafileDirectoryThatIsMissingIsAFailure) {
     configure({{"KUMP_META_PATH", home_.home() + "/none"}});
-    EXPECT_EQ((Outcome{1014, "ZAV1014E", home_.depot() + "app.mdl," + home_.home() + "/none"}),
-              run({}));
+    EXPECT_EQ(run({}),
+              (Outcome{1014, "ZAV1014E", home_.depot() + "app.mdl," + home_.home() + "/none"}));
 }
 
 TEST_F(UaConfig, TheFirstScriptThatFailsEndsTheCopying) {
     Request request;
     request.scripts = "one.sh,none.sh,two.sh";
+    EXPECT_EQ(run(request), (Outcome{1015, "ZAV1015E",
+                                     home_.depot() + "none.sh," + home_.home() + "/work/scripts"}));
     EXPECT_EQ(
-        (Outcome{1015, "ZAV1015E", home_.depot() + "none.sh," + home_.home() + "/work/scripts"}),
-        run(request));
-    EXPECT_EQ(
-        1, trace_.count('E', "ZAV1015E Failed to copy Script file " + home_.depot() +
-                                 "none.sh to scripts directory " + home_.home() + "/work/scripts"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1015"));
+        trace_.count('E', "ZAV1015E Failed to copy Script file " + home_.depot() +
+                              "none.sh to scripts directory " + home_.home() + "/work/scripts"),
+        1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1015"), 1);
     EXPECT_TRUE(home_.dir().exists("home/metafiles/app.mdl"));
     EXPECT_TRUE(home_.dir().exists("home/work/scripts/one.sh"));
     EXPECT_FALSE(home_.dir().exists("home/work/scripts/two.sh"));
@@ -500,9 +504,8 @@ TEST_F(UaConfig, AScriptsFailureIsReportedBeforeTheMetafiles) {
     Request request;
     request.metafile = "none.mdl";
     request.scripts = "none.sh";
-    EXPECT_EQ(
-        (Outcome{1015, "ZAV1015E", home_.depot() + "none.sh," + home_.home() + "/work/scripts"}),
-        run(request));
+    EXPECT_EQ(run(request), (Outcome{1015, "ZAV1015E",
+                                     home_.depot() + "none.sh," + home_.home() + "/work/scripts"}));
     EXPECT_THAT(trace_.errors("zavtasks"), testing::SizeIs(2));
 }
 
@@ -510,45 +513,48 @@ TEST_F(UaConfig, AScriptsFailureIsReportedBeforeTheMetafiles) {
 
 TEST_F(UaConfig, AConsoleThatCannotRunFailsAtTheFirstVerb) {
     home_.notExecutable(kConsole);
-    EXPECT_EQ((Outcome{1017, "ZAV1017E", consoleCommand("DELETE")}), run({}));
-    EXPECT_EQ(1, trace_.count('E', "ZAV1017E Failed to start DELETE command [" +
-                                       consoleCommand("DELETE") + "]"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1017"));
-    EXPECT_EQ((Outcome{1022, "ZAV1022E", consoleCommand("getdptype")}), runWithRestart());
-    EXPECT_EQ(1, trace_.count('E', "ZAV1022E Failed to start GETDPTYPE command [" +
-                                       consoleCommand("getdptype") + "]"));
-    EXPECT_EQ(0, trace_.count('D', "Return code is 1022"));
+    EXPECT_EQ(run({}), (Outcome{1017, "ZAV1017E", consoleCommand("DELETE")}));
+    EXPECT_EQ(trace_.count('E', "ZAV1017E Failed to start DELETE command [" +
+                                    consoleCommand("DELETE") + "]"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1017"), 1);
+    EXPECT_EQ(runWithRestart(), (Outcome{1022, "ZAV1022E", consoleCommand("getdptype")}));
+    EXPECT_EQ(trace_.count('E', "ZAV1022E Failed to start GETDPTYPE command [" +
+                                    consoleCommand("getdptype") + "]"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1022"), 0);
     EXPECT_TRUE(home_.dir().exists("home/metafiles/app.mdl"));
 }
 
 TEST_F(UaConfig, AConsoleThatIsMissingFailsAtTheFirstVerb) {
     std::filesystem::remove(home_.home() + "/" + kConsole);
-    EXPECT_EQ((Outcome{1017, "ZAV1017E", consoleCommand("DELETE")}), run({}));
-    EXPECT_EQ((Outcome{1022, "ZAV1022E", consoleCommand("getdptype")}), runWithRestart());
+    EXPECT_EQ(run({}), (Outcome{1017, "ZAV1017E", consoleCommand("DELETE")}));
+    EXPECT_EQ(runWithRestart(), (Outcome{1022, "ZAV1022E", consoleCommand("getdptype")}));
 }
 
 TEST_F(UaConfig, AConsoleMayBeGoneWhenItIsToImport) {
     console("chmod 644 $0");
-    EXPECT_EQ((Outcome{1018, "ZAV1018E", consoleCommand("IMPORT")}), run({}));
-    EXPECT_EQ(1, trace_.count('E', "ZAV1018E Failed to start IMPORT command [" +
-                                       consoleCommand("IMPORT") + "]"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1018"));
+    EXPECT_EQ(run({}), (Outcome{1018, "ZAV1018E", consoleCommand("IMPORT")}));
+    EXPECT_EQ(trace_.count('E', "ZAV1018E Failed to start IMPORT command [" +
+                                    consoleCommand("IMPORT") + "]"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1018"), 1);
 }
 
 TEST_F(UaConfig, AConsoleThatKnowsNoTypeIsAFailure) {
     console("[ $verb != getdptype ] || { echo SOCK; exit 2; }");
-    EXPECT_EQ((Outcome{1023, "ZAV1023E", "app.mdl"}), runWithRestart());
-    EXPECT_EQ(1, trace_.count('E', "ZAV1023E Could not get DPTYPE from metafile [app.mdl]"));
-    EXPECT_EQ(0, trace_.count('D', "Return code is 1023"));
+    EXPECT_EQ(runWithRestart(), (Outcome{1023, "ZAV1023E", "app.mdl"}));
+    EXPECT_EQ(trace_.count('E', "ZAV1023E Could not get DPTYPE from metafile [app.mdl]"), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1023"), 0);
     EXPECT_THAT(home_.calls(kConsole), ElementsAre(consoleCall("getdptype")));
     expectNoRestart("*kumenv\n|DATAPROVIDER|SNMP|\n");
 }
 
 TEST_F(UaConfig, AnImportThatFailsIsAFailure) {
     console("[ $verb != IMPORT ] || exit 1");
-    EXPECT_EQ((Outcome{1016, "ZAV1016E", "app.mdl"}), run({}));
-    EXPECT_EQ(1, trace_.count('E', "ZAV1016E Import of MDL file [app.mdl] failed"));
-    EXPECT_EQ(1, trace_.count('D', "Return code is 1016"));
+    EXPECT_EQ(run({}), (Outcome{1016, "ZAV1016E", "app.mdl"}));
+    EXPECT_EQ(trace_.count('E', "ZAV1016E Import of MDL file [app.mdl] failed"), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1016"), 1);
 }
 
 TEST_F(UaConfig, AConsoleThatHangsIsAFailureOfItsVerb) {
@@ -557,8 +563,8 @@ TEST_F(UaConfig, AConsoleThatHangsIsAFailureOfItsVerb) {
         {"getdptype", 1022}, {"DELETE", 1017}, {"IMPORT", 1018}};
     for (const auto& [verb, code] : verbs) {
         console("[ $verb != " + std::string(verb) + " ] || exec sleep 20\necho SNMP");
-        EXPECT_EQ((Outcome{code, "ZAV" + std::to_string(code) + "E", consoleCommand(verb)}),
-                  runWithRestart());
+        EXPECT_EQ(runWithRestart(),
+                  (Outcome{code, "ZAV" + std::to_string(code) + "E", consoleCommand(verb)}));
     }
 }
 
@@ -571,58 +577,59 @@ TEST_F(UaConfig, AnAgentThatDoesNotStopIsLeftAlone) {
     Request request;
     request.context = "RESTART=Y";
     request.target = "inst1:hostA:UA";
-    EXPECT_EQ((Outcome{1027, "ZAV1027E", "inst1"}), run(request));
-    EXPECT_EQ(1,
-              trace_.count('E', "ZAV1027E Failed to stop agent with instance (optional) [inst1]"));
-    EXPECT_EQ(0, trace_.count('D', "Return code is 1027"));
+    EXPECT_EQ(run(request), (Outcome{1027, "ZAV1027E", "inst1"}));
+    EXPECT_EQ(trace_.count('E', "ZAV1027E Failed to stop agent with instance (optional) [inst1]"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1027"), 0);
     EXPECT_THAT(agentCalls(), testing::SizeIs(1));
-    EXPECT_EQ("*kumenv\n|DATAPROVIDER|SNMP|\n", kumenvText());
+    EXPECT_EQ(kumenvText(), "*kumenv\n|DATAPROVIDER|SNMP|\n");
     EXPECT_THAT(home_.calls(kConsole), testing::SizeIs(1));
 
     std::filesystem::remove(home_.home() + "/" + kAgent);
-    EXPECT_EQ((Outcome{1027, "ZAV1027E", ""}), runWithRestart());
+    EXPECT_EQ(runWithRestart(), (Outcome{1027, "ZAV1027E", ""}));
 }
 
 TEST_F(UaConfig, StartupParametersThatCannotBeChangedLeaveTheAgentStopped) {
     consoleWithType("SOCK");
     startupParameters("");
-    EXPECT_EQ((Outcome{1028, "ZAV1028E", kumenv() + ",SNMP,SOCK"}), runWithRestart());
-    EXPECT_EQ(1, trace_.count('E', "ZAV1028E Failed to update the ua config file [" + kumenv() +
-                                       "] to have new startup parms of [SNMP,SOCK]"));
-    EXPECT_EQ(0, trace_.count('D', "Return code is 1028"));
+    EXPECT_EQ(runWithRestart(), (Outcome{1028, "ZAV1028E", kumenv() + ",SNMP,SOCK"}));
+    EXPECT_EQ(trace_.count('E', "ZAV1028E Failed to update the ua config file [" + kumenv() +
+                                    "] to have new startup parms of [SNMP,SOCK]"),
+              1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1028"), 0);
     EXPECT_THAT(agentCalls(), ElementsAre("[-h][" + home_.home() + "][-c][stop][um]"));
 
     std::filesystem::remove_all(home_.home() + "/config/.ConfigData");
-    EXPECT_EQ((Outcome{1028, "ZAV1028E", kumenv() + ",SNMP,SOCK"}), runWithRestart());
+    EXPECT_EQ(runWithRestart(), (Outcome{1028, "ZAV1028E", kumenv() + ",SNMP,SOCK"}));
 }
 
 TEST_F(UaConfig, ADirectoryInTheCopysPlaceIsAFailure) {
     consoleWithType("SOCK");
     std::filesystem::create_directory(kumenv() + ".copy");
-    EXPECT_EQ((Outcome{1028, "ZAV1028E", kumenv() + ",SNMP,SOCK"}), runWithRestart());
-    EXPECT_EQ("*kumenv\n|DATAPROVIDER|SNMP|\n", kumenvText());
+    EXPECT_EQ(runWithRestart(), (Outcome{1028, "ZAV1028E", kumenv() + ",SNMP,SOCK"}));
+    EXPECT_EQ(kumenvText(), "*kumenv\n|DATAPROVIDER|SNMP|\n");
 }
 
 TEST_F(UaConfig, AnAgentThatDoesNotStartIsAFailure) {
     consoleWithType("SOCK");
     home_.program(kAgent, "case \"$*\" in *start*) exit 1;; esac");
-    EXPECT_EQ((Outcome{1026, "ZAV1026E", ""}), runWithRestart());
-    EXPECT_EQ(1, trace_.count('E', "ZAV1026E Failed to start agent with instance (optional) []"));
-    EXPECT_EQ(0, trace_.count('D', "Return code is 1026"));
-    EXPECT_EQ("*kumenv\n|DATAPROVIDER|SNMP,SOCK|\n", kumenvText());
+    EXPECT_EQ(runWithRestart(), (Outcome{1026, "ZAV1026E", ""}));
+    EXPECT_EQ(trace_.count('E', "ZAV1026E Failed to start agent with instance (optional) []"), 1);
+    EXPECT_EQ(trace_.count('D', "Return code is 1026"), 0);
+    EXPECT_EQ(kumenvText(), "*kumenv\n|DATAPROVIDER|SNMP,SOCK|\n");
     EXPECT_THAT(home_.calls(kConsole), testing::SizeIs(1));
 }
 
 TEST_F(UaConfig, LeavesNothingOpenOrBehind) {
     consoleWithType("SOCK");
-    EXPECT_EQ(kSuccess, runWithRestart());
+    EXPECT_EQ(runWithRestart(), kSuccess);
     const auto before = openDescriptors();
-    EXPECT_EQ(kSuccess, runWithRestart());
+    EXPECT_EQ(runWithRestart(), kSuccess);
     startupParameters("");
-    EXPECT_EQ(1028, runWithRestart().rc);
+    EXPECT_EQ(runWithRestart().rc, 1028);
     home_.notExecutable(kConsole);
-    EXPECT_EQ(1017, run({}).rc);
-    EXPECT_EQ(before, openDescriptors());
+    EXPECT_EQ(run({}).rc, 1017);
+    EXPECT_EQ(openDescriptors(), before);
     EXPECT_FALSE(std::filesystem::exists(kumenv() + ".copy"));
 }
 

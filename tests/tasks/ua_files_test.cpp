@@ -43,14 +43,14 @@ protected:
 };
 
 TEST_F(UaFiles, TheDefaultInstanceHasTheFileWithoutAName) {
-    EXPECT_EQ(home_.home() + "/config/um.config", narrow(getUaConfigFileName("")));
+    EXPECT_EQ(narrow(getUaConfigFileName("")), home_.home() + "/config/um.config");
     EXPECT_THAT(trace_.details("zavtasks"),
                 ElementsAre("UA Configuration file is \"" + home_.home() +
                             "/config/um.config\", instance (optional) is \"\""));
 }
 
 TEST_F(UaFiles, AnInstanceHasAFileWithItsName) {
-    EXPECT_EQ(home_.home() + "/config/um_A.config", narrow(getUaConfigFileName("A")));
+    EXPECT_EQ(narrow(getUaConfigFileName("A")), home_.home() + "/config/um_A.config");
     EXPECT_THAT(trace_.details("zavtasks"),
                 ElementsAre("UA Configuration file is \"" + home_.home() +
                             "/config/um_A.config\", instance (optional) is \"A\""));
@@ -102,39 +102,39 @@ protected:
 };
 
 TEST_F(PairsOfFile, AreReadLineByLine) {
-    EXPECT_EQ((Pairs{{"A", "1"}, {"B", "2"}}), pairs("A=1\nB=2\n"));
-    EXPECT_EQ((Pairs{{"A", "1"}, {"B", "2"}}), pairs("\n\nA=1\n\n\nB=2"));
+    EXPECT_EQ(pairs("A=1\nB=2\n"), (Pairs{{"A", "1"}, {"B", "2"}}));
+    EXPECT_EQ(pairs("\n\nA=1\n\n\nB=2"), (Pairs{{"A", "1"}, {"B", "2"}}));
 }
 
 TEST_F(PairsOfFile, LeaveOutComments) {
-    EXPECT_EQ((Pairs{{"B", "2"}}), pairs("*A=1\n   * C=3\n\t*\nB=2\n"));
-    EXPECT_EQ((Pairs{{"*A", "1"}}), pairs("*A=1\n#B=2\n", '#'));
+    EXPECT_EQ(pairs("*A=1\n   * C=3\n\t*\nB=2\n"), (Pairs{{"B", "2"}}));
+    EXPECT_EQ(pairs("*A=1\n#B=2\n", '#'), (Pairs{{"*A", "1"}}));
 }
 
 TEST_F(PairsOfFile, SplitAtTheFirstEqualsSign) {
-    EXPECT_EQ((Pairs{{"A", "1=2"}, {"B", "="}}), pairs("A=1=2\nB==\n"));
+    EXPECT_EQ(pairs("A=1=2\nB==\n"), (Pairs{{"A", "1=2"}, {"B", "="}}));
 }
 
 TEST_F(PairsOfFile, NeedANameAndAValue) {
-    EXPECT_EQ(Pairs{}, pairs("A=\n=1\n=\nword\n   \nB=  \n"));
+    EXPECT_EQ(pairs("A=\n=1\n=\nword\n   \nB=  \n"), Pairs{});
 }
 
 TEST_F(PairsOfFile, KeepTheLastOfSeveralValues) {
-    EXPECT_EQ((Pairs{{"A", "2"}}), pairs("A=1\nA=2\nA=\n"));
+    EXPECT_EQ(pairs("A=1\nA=2\nA=\n"), (Pairs{{"A", "2"}}));
 }
 
 TEST_F(PairsOfFile, AreTrimmedAsLinesOnly) {
-    EXPECT_EQ((Pairs{{"A ", " 1 2"}}), pairs("  A = 1 2 \t\n"));
+    EXPECT_EQ(pairs("  A = 1 2 \t\n"), (Pairs{{"A ", " 1 2"}}));
 }
 
 TEST_F(PairsOfFile, MayHaveCarriageReturns) {
-    EXPECT_EQ((Pairs{{"A", "1"}, {"B", "2"}}), pairs("A=1\r\n\r\n*x\r\nB=2\r\n"));
+    EXPECT_EQ(pairs("A=1\r\n\r\n*x\r\nB=2\r\n"), (Pairs{{"A", "1"}, {"B", "2"}}));
 }
 
 TEST_F(PairsOfFile, AreNoneInAFileThatIsEmptyOrMissing) {
-    EXPECT_EQ(Pairs{}, pairs(""));
-    EXPECT_EQ(Pairs{}, pairs("\n\n"));
-    EXPECT_EQ(Pairs{}, pairsIn(populateHashMapFromFile(home_.dir().path("none").c_str(), '*')));
+    EXPECT_EQ(pairs(""), Pairs{});
+    EXPECT_EQ(pairs("\n\n"), Pairs{});
+    EXPECT_EQ(pairsIn(populateHashMapFromFile(home_.dir().path("none").c_str(), '*')), Pairs{});
 }
 
 class StartupParms : public UaFiles {
@@ -142,7 +142,7 @@ protected:
     /// Changes a file with `content`. Returns its content afterwards.
     std::string changed(const std::string& content, const char* parms, const char* instance) {
         const std::string file = home_.dir().write("home/kumenv", content);
-        EXPECT_EQ(1, changeUaStartupParms(file.c_str(), parms, instance));
+        EXPECT_EQ(changeUaStartupParms(file.c_str(), parms, instance), 1);
         EXPECT_FALSE(home_.dir().exists("home/kumenv.copy"));
         return home_.dir().read("home/kumenv");
     }
@@ -150,30 +150,31 @@ protected:
 };
 
 TEST_F(StartupParms, ReplaceTheInstancesLine) {
-    EXPECT_EQ("*x\nA|DATAPROVIDER|ASFS,SNMP|\nB|DATAPROVIDER|ASFS|\n",
-              changed("*x\nA|DATAPROVIDER|ASFS|\nB|DATAPROVIDER|ASFS|\n", "ASFS,SNMP", "A"));
-    EXPECT_EQ(1, trace_.count('D', "Writing startup parms [ASFS,SNMP] to config file [" + file() +
-                                       "] instance [A]"));
+    EXPECT_EQ(changed("*x\nA|DATAPROVIDER|ASFS|\nB|DATAPROVIDER|ASFS|\n", "ASFS,SNMP", "A"),
+              "*x\nA|DATAPROVIDER|ASFS,SNMP|\nB|DATAPROVIDER|ASFS|\n");
+    EXPECT_EQ(trace_.count('D', "Writing startup parms [ASFS,SNMP] to config file [" + file() +
+                                    "] instance [A]"),
+              1);
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(StartupParms, ReplaceEveryLineOfTheInstance) {
-    EXPECT_EQ("A|DATAPROVIDER|X|\nother\nA|DATAPROVIDER|X|\n",
-              changed("A|DATAPROVIDER|1|\nother\n  xA|DATAPROVIDER|2|tail", "X", "A"));
+    EXPECT_EQ(changed("A|DATAPROVIDER|1|\nother\n  xA|DATAPROVIDER|2|tail", "X", "A"),
+              "A|DATAPROVIDER|X|\nother\nA|DATAPROVIDER|X|\n");
 }
 
 TEST_F(StartupParms, OfTheDefaultInstanceHaveAMarkerThatBeginsWithABar) {
-    EXPECT_EQ("|DATAPROVIDER|X|\n*y\n", changed("|DATAPROVIDER|ASFS|\n*y\n", "X", ""));
+    EXPECT_EQ(changed("|DATAPROVIDER|ASFS|\n*y\n", "X", ""), "|DATAPROVIDER|X|\n*y\n");
 }
 
 TEST_F(StartupParms, AreOnlyRewrittenWithoutAMarker) {
-    EXPECT_EQ("a\nb\n", changed("a\n\n\nb", "X", "A"));
-    EXPECT_EQ("", changed("\n\n", "X", "A"));
+    EXPECT_EQ(changed("a\n\n\nb", "X", "A"), "a\nb\n");
+    EXPECT_EQ(changed("\n\n", "X", "A"), "");
 }
 
 TEST_F(StartupParms, KeepCarriageReturnsOfOtherLines) {
-    EXPECT_EQ("a\r\nA|DATAPROVIDER|X|\n\r\nb\r\n",
-              changed("a\r\nA|DATAPROVIDER|1|\r\n\r\nb\r\n", "X", "A"));
+    EXPECT_EQ(changed("a\r\nA|DATAPROVIDER|1|\r\n\r\nb\r\n", "X", "A"),
+              "a\r\nA|DATAPROVIDER|X|\n\r\nb\r\n");
 }
 
 TEST_F(StartupParms, OfALargeFileAreChanged) {
@@ -183,23 +184,23 @@ TEST_F(StartupParms, OfALargeFileAreChanged) {
         content += "A line of a large file\n";
         expected += "A line of a large file\n";
     }
-    EXPECT_EQ(expected + "A|DATAPROVIDER|X|\n", changed(content + "A|DATAPROVIDER|1|", "X", "A"));
+    EXPECT_EQ(changed(content + "A|DATAPROVIDER|1|", "X", "A"), expected + "A|DATAPROVIDER|X|\n");
 }
 
 TEST_F(StartupParms, OfAFileThatMayOnlyBeReadAreChanged) {
     home_.dir().write("home/kumenv", "A|DATAPROVIDER|1|\n", 0444);
-    EXPECT_EQ(1, changeUaStartupParms(file().c_str(), "X", "A"));
-    EXPECT_EQ("A|DATAPROVIDER|X|\n", home_.dir().read("home/kumenv"));
+    EXPECT_EQ(changeUaStartupParms(file().c_str(), "X", "A"), 1);
+    EXPECT_EQ(home_.dir().read("home/kumenv"), "A|DATAPROVIDER|X|\n");
     EXPECT_FALSE(home_.dir().exists("home/kumenv.copy"));
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(StartupParms, NeedAFileWithContent) {
     home_.dir().write("home/kumenv", "");
-    EXPECT_EQ(0, changeUaStartupParms(file().c_str(), "X", "A"));
-    EXPECT_EQ(0, changeUaStartupParms((file() + ".none").c_str(), "X", "A"));
-    EXPECT_EQ(1, trace_.count('E', "Contents of config file [" + file() + "] was empty"));
-    EXPECT_EQ(1, trace_.count('E', "Contents of config file [" + file() + ".none] was empty"));
+    EXPECT_EQ(changeUaStartupParms(file().c_str(), "X", "A"), 0);
+    EXPECT_EQ(changeUaStartupParms((file() + ".none").c_str(), "X", "A"), 0);
+    EXPECT_EQ(trace_.count('E', "Contents of config file [" + file() + "] was empty"), 1);
+    EXPECT_EQ(trace_.count('E', "Contents of config file [" + file() + ".none] was empty"), 1);
     EXPECT_TRUE(home_.dir().exists("home/kumenv"));
     EXPECT_FALSE(home_.dir().exists("home/kumenv.copy"));
 }
@@ -207,9 +208,9 @@ TEST_F(StartupParms, NeedAFileWithContent) {
 TEST_F(StartupParms, AreLeftAloneWhenTheCopyCannotBeWritten) {
     home_.dir().write("home/kumenv", "A|DATAPROVIDER|1|\n");
     home_.dir().makeDir("home/kumenv.copy");
-    EXPECT_EQ(0, changeUaStartupParms(file().c_str(), "X", "A"));
-    EXPECT_EQ("A|DATAPROVIDER|1|\n", home_.dir().read("home/kumenv"));
-    EXPECT_EQ(1, trace_.count('E', "Failed to write to file " + file()));
+    EXPECT_EQ(changeUaStartupParms(file().c_str(), "X", "A"), 0);
+    EXPECT_EQ(home_.dir().read("home/kumenv"), "A|DATAPROVIDER|1|\n");
+    EXPECT_EQ(trace_.count('E', "Failed to write to file " + file()), 1);
 }
 
 TEST_F(StartupParms, StayInTheCopyWhenThePathHasNoDirectory) {
@@ -217,30 +218,31 @@ TEST_F(StartupParms, StayInTheCopyWhenThePathHasNoDirectory) {
     const std::string before = std::filesystem::current_path();
     std::filesystem::current_path(home_.home());
     home_.dir().write("home/kumenv", "A|DATAPROVIDER|1|\n");
-    EXPECT_EQ(0, changeUaStartupParms("kumenv", "X", "A"));
+    EXPECT_EQ(changeUaStartupParms("kumenv", "X", "A"), 0);
     std::filesystem::current_path(before);
     EXPECT_FALSE(home_.dir().exists("home/kumenv"));
-    EXPECT_EQ("A|DATAPROVIDER|X|\n", home_.dir().read("home/kumenv.copy"));
-    EXPECT_EQ(1, trace_.count('E', "Directory [kumenv] cannot be parsed, no dir separator"));
+    EXPECT_EQ(home_.dir().read("home/kumenv.copy"), "A|DATAPROVIDER|X|\n");
+    EXPECT_EQ(trace_.count('E', "Directory [kumenv] cannot be parsed, no dir separator"), 1);
 }
 
 TEST_F(StartupParms, StayInTheCopyWhenTheFileCannotBeRemoved) {
     home_.dir().write("home/kumenv", "A|DATAPROVIDER|1|\n");
     removingFails = true;
-    EXPECT_EQ(0, changeUaStartupParms(file().c_str(), "X", "A"));
+    EXPECT_EQ(changeUaStartupParms(file().c_str(), "X", "A"), 0);
     removingFails = false;
-    EXPECT_EQ("A|DATAPROVIDER|1|\n", home_.dir().read("home/kumenv"));
-    EXPECT_EQ("A|DATAPROVIDER|X|\n", home_.dir().read("home/kumenv.copy"));
-    EXPECT_EQ(1, trace_.count('E', "Failed to delete file " + file() +
-                                       " error was: Device or resource busy"));
+    EXPECT_EQ(home_.dir().read("home/kumenv"), "A|DATAPROVIDER|1|\n");
+    EXPECT_EQ(home_.dir().read("home/kumenv.copy"), "A|DATAPROVIDER|X|\n");
+    EXPECT_EQ(trace_.count(
+                  'E', "Failed to delete file " + file() + " error was: Device or resource busy"),
+              1);
 }
 
 TEST_F(StartupParms, StayInTheCopyWhenItCannotBeCopiedBack) {
     home_.dir().write("home/kumenv", "A|DATAPROVIDER|1|\n");
     directoryTakesItsPlace = true;
-    EXPECT_EQ(0, changeUaStartupParms(file().c_str(), "X", "A"));
+    EXPECT_EQ(changeUaStartupParms(file().c_str(), "X", "A"), 0);
     directoryTakesItsPlace = false;
-    EXPECT_EQ("A|DATAPROVIDER|X|\n", home_.dir().read("home/kumenv.copy"));
+    EXPECT_EQ(home_.dir().read("home/kumenv.copy"), "A|DATAPROVIDER|X|\n");
 }
 
 TEST_F(StartupParms, LeaveNoDescriptorOpen) {
@@ -248,8 +250,8 @@ TEST_F(StartupParms, LeaveNoDescriptorOpen) {
     const auto before = openDescriptors();
     changed("A|DATAPROVIDER|1|\n", "X", "A");
     home_.dir().makeDir("home/kumenv.copy");
-    EXPECT_EQ(0, changeUaStartupParms(file().c_str(), "X", "A"));
-    EXPECT_EQ(before, openDescriptors());
+    EXPECT_EQ(changeUaStartupParms(file().c_str(), "X", "A"), 0);
+    EXPECT_EQ(openDescriptors(), before);
 }
 
 }  // namespace

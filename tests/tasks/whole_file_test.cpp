@@ -91,7 +91,7 @@ std::string sampleText(std::size_t length) {
 TEST_F(WholeFile, ReadsTextsOfAnyLength) {
     for (const unsigned length : {1u, 1023u, 1024u, 1025u, 2048u, 5000u}) {
         const std::string text = sampleText(length);
-        EXPECT_EQ(text, narrow(readFile(written("f", text)))) << length;
+        EXPECT_EQ(narrow(readFile(written("f", text))), text) << length;
     }
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
@@ -108,15 +108,15 @@ TEST_F(WholeFile, ReadsUntilAChunkIsEmpty) {
 }
 
 TEST_F(WholeFile, ReadsLineEndsAsTheyAre) {
-    EXPECT_EQ("a\r\nb\n\nc", narrow(readFile(written("f", "a\r\nb\n\nc"))));
+    EXPECT_EQ(narrow(readFile(written("f", "a\r\nb\n\nc"))), "a\r\nb\n\nc");
 }
 
 TEST_F(WholeFile, ReadsAndWritesMegabytes) {
     const std::string text = sampleText(8 << 20);
     const String read = readFile(written("f", text));
-    EXPECT_EQ(text, narrow(read));
-    EXPECT_EQ(1, writeFile(path("g"), read));
-    EXPECT_EQ(text, scratch_.read("g"));
+    EXPECT_EQ(narrow(read), text);
+    EXPECT_EQ(writeFile(path("g"), read), 1);
+    EXPECT_EQ(scratch_.read("g"), text);
 }
 
 TEST_F(WholeFile, MissingFilesAreEmpty) {
@@ -137,7 +137,7 @@ TEST_F(WholeFile, DirectoriesAreEmpty) {
 }
 
 TEST_F(WholeFile, NulBytesAreLeftOut) {
-    EXPECT_EQ("abc", narrow(readFile(written("f", std::string("a\0b\0c", 5)))));
+    EXPECT_EQ(narrow(readFile(written("f", std::string("a\0b\0c", 5)))), "abc");
 }
 
 TEST_F(WholeFile, AReadErrorDropsEverything) {
@@ -162,25 +162,25 @@ TEST_F(WholeFile, AFailedCloseDoesNotMatterToAReader) {
 
 TEST_F(WholeFile, WritesOverWhatWasThere) {
     const String file = written("f", "a longer text than the new one");
-    EXPECT_EQ(1, writeFile(file, "new\n"));
-    EXPECT_EQ("new\n", scratch_.read("f"));
+    EXPECT_EQ(writeFile(file, "new\n"), 1);
+    EXPECT_EQ(scratch_.read("f"), "new\n");
     EXPECT_FALSE(scratch_.exists("f.tmp"));
 }
 
 TEST_F(WholeFile, WritesOnAfterAWriteThatTookLittle) {
     const std::string text = sampleText(1050);
     writesAreShort = true;
-    EXPECT_EQ(1, writeFile(path("f"), text.c_str()));
-    EXPECT_EQ(text, scratch_.read("f"));
+    EXPECT_EQ(writeFile(path("f"), text.c_str()), 1);
+    EXPECT_EQ(scratch_.read("f"), text);
     EXPECT_THAT(trace_.errors(), IsEmpty());
 }
 
 TEST_F(WholeFile, AnEmptyTextMakesAnEmptyFile) {
-    EXPECT_EQ(1, writeFile(path("new"), ""));
-    EXPECT_EQ(1, writeFile(written("old", "text"), ""));
+    EXPECT_EQ(writeFile(path("new"), ""), 1);
+    EXPECT_EQ(writeFile(written("old", "text"), ""), 1);
     EXPECT_TRUE(scratch_.exists("new"));
-    EXPECT_EQ("", scratch_.read("new"));
-    EXPECT_EQ("", scratch_.read("old"));
+    EXPECT_EQ(scratch_.read("new"), "");
+    EXPECT_EQ(scratch_.read("old"), "");
 }
 
 TEST_F(WholeFile, AWrittenTextEndsAtItsFirstZero) {
@@ -188,19 +188,19 @@ TEST_F(WholeFile, AWrittenTextEndsAtItsFirstZero) {
         const unsigned short units[] = {'a', last, 0, last};
         String text;
         text.assign(units, 4);
-        EXPECT_EQ(1, writeFile(path("f"), text));
+        EXPECT_EQ(writeFile(path("f"), text), 1);
         text.assign(units, 2);
-        EXPECT_EQ(1, writeFile(path("g"), text));
+        EXPECT_EQ(writeFile(path("g"), text), 1);
         EXPECT_EQ(scratch_.read("g"), scratch_.read("f"));
         EXPECT_GE(scratch_.read("f").size(), 2u);
     }
 }
 
 TEST_F(WholeFile, WrittenFilesAreNotExecutable) {
-    EXPECT_EQ(1, writeFile(path("script.sh"), "#!/bin/sh\n"));
+    EXPECT_EQ(writeFile(path("script.sh"), "#!/bin/sh\n"), 1);
     struct stat status {};
-    ASSERT_EQ(0, ::stat(scratch_.path("script.sh").c_str(), &status));
-    EXPECT_EQ(0u, status.st_mode & 0111u);
+    ASSERT_EQ(::stat(scratch_.path("script.sh").c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode & 0111u, 0u);
 }
 
 TEST_F(WholeFile, FilesStayOffTheStandardDescriptors) {
@@ -214,7 +214,7 @@ TEST_F(WholeFile, FilesStayOffTheStandardDescriptors) {
         ::dup2(saved, STDIN_FILENO);
         ::close(saved);
     }
-    EXPECT_EQ(1, written);
+    EXPECT_EQ(written, 1);
     EXPECT_TRUE(text == "text");
     EXPECT_GT(writer, STDERR_FILENO);
     EXPECT_GT(reader, STDERR_FILENO);
@@ -222,8 +222,8 @@ TEST_F(WholeFile, FilesStayOffTheStandardDescriptors) {
 
 TEST_F(WholeFile, NothingIsWrittenWhereNoFileCanBe) {
     scratch_.makeDir("d");
-    EXPECT_EQ(0, writeFile(path("none/f"), "text"));
-    EXPECT_EQ(0, writeFile(path("d"), "text"));
+    EXPECT_EQ(writeFile(path("none/f"), "text"), 0);
+    EXPECT_EQ(writeFile(path("d"), "text"), 0);
     EXPECT_THAT(trace_.errors("zavtasks"),
                 ElementsAre("Failed to open file " + scratch_.path("none/f") +
                                 " using mode \"rb\", check permissions",
@@ -234,7 +234,7 @@ TEST_F(WholeFile, NothingIsWrittenWhereNoFileCanBe) {
 TEST_F(WholeFile, AWriteErrorIsReported) {
     const String file = path("f");
     reportedStreamError = 5;
-    EXPECT_EQ(0, writeFile(file, "text"));
+    EXPECT_EQ(writeFile(file, "text"), 0);
     reportedStreamError = 0;
     EXPECT_THAT(trace_.errors("zavtasks"),
                 ElementsAre("Error writing to file " + scratch_.path("f") +
@@ -242,22 +242,22 @@ TEST_F(WholeFile, AWriteErrorIsReported) {
 }
 
 TEST_F(WholeFile, AFailedCloseIsAFailureOfTheWriter) {
-    EXPECT_EQ(0, writeFile("/dev/full", "text"));
+    EXPECT_EQ(writeFile("/dev/full", "text"), 0);
     EXPECT_THAT(trace_.errors("zavtasks"),
                 ElementsAre("Failed to close stream for file /dev/full"));
 }
 
 TEST_F(WholeFile, AFileThatMayNotGrowIsReported) {
     struct rlimit before {};
-    ASSERT_EQ(0, ::getrlimit(RLIMIT_FSIZE, &before));
+    ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &before), 0);
     auto* const handler = std::signal(SIGXFSZ, SIG_IGN);
     const struct rlimit small { 8192, before.rlim_max };
-    ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &small));
+    ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &small), 0);
     const int result = writeFile(path("f"), sampleText(100000).c_str());
-    ASSERT_EQ(0, ::setrlimit(RLIMIT_FSIZE, &before));
+    ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &before), 0);
     std::signal(SIGXFSZ, handler);
-    EXPECT_EQ(0, result);
-    EXPECT_EQ(8192u, std::filesystem::file_size(scratch_.path("f")));
+    EXPECT_EQ(result, 0);
+    EXPECT_EQ(std::filesystem::file_size(scratch_.path("f")), 8192u);
 }
 
 TEST_F(WholeFile, CharactersOfSeveralBytesAreKeptWhole) {
@@ -266,15 +266,15 @@ TEST_F(WholeFile, CharactersOfSeveralBytesAreKeptWhole) {
     // A block of 1024 bytes ends between the two bytes of an umlaut.
     const std::string text = sampleText(1023) + "\xC3\xA4\xE2\x82\xAC\xF0\x9F\x98\x80 end\n";
     const String read = readFile(written("f", text));
-    EXPECT_EQ(1023u + 2u + 2u + 5u, read.length());
-    EXPECT_EQ(1, writeFile(path("g"), read));
-    EXPECT_EQ(text, scratch_.read("g"));
+    EXPECT_EQ(read.length(), 1023u + 2u + 2u + 5u);
+    EXPECT_EQ(writeFile(path("g"), read), 1);
+    EXPECT_EQ(scratch_.read("g"), text);
     ::unsetenv("LC_ALL");
     String::initialize();
 }
 
 TEST_F(WholeFile, DeletesFiles) {
-    EXPECT_EQ(1, deleteFile(written("f", "text")));
+    EXPECT_EQ(deleteFile(written("f", "text")), 1);
     EXPECT_FALSE(scratch_.exists("f"));
     EXPECT_THAT(trace_.details("zavtasks"),
                 ElementsAre("Successfully deleted file " + scratch_.path("f")));
@@ -283,8 +283,8 @@ TEST_F(WholeFile, DeletesFiles) {
 
 TEST_F(WholeFile, WhatCannotBeDeletedIsReported) {
     scratch_.makeDir("d");
-    EXPECT_EQ(0, deleteFile(path("none")));
-    EXPECT_EQ(0, deleteFile(path("d")));
+    EXPECT_EQ(deleteFile(path("none")), 0);
+    EXPECT_EQ(deleteFile(path("d")), 0);
     EXPECT_TRUE(scratch_.exists("d"));
     EXPECT_THAT(
         trace_.errors("zavtasks"),
@@ -295,17 +295,17 @@ TEST_F(WholeFile, WhatCannotBeDeletedIsReported) {
 
 TEST_F(WholeFile, SplitsPaths) {
     String directory("before");
-    EXPECT_EQ(1, getDirectoryFromPath("/a/b/file.txt", directory));
+    EXPECT_EQ(getDirectoryFromPath("/a/b/file.txt", directory), 1);
     EXPECT_TRUE(directory == "/a/b");
     EXPECT_TRUE(getFilenameFromPath("/a/b/file.txt") == "file.txt");
-    EXPECT_EQ(1, getDirectoryFromPath("a/b", directory));
+    EXPECT_EQ(getDirectoryFromPath("a/b", directory), 1);
     EXPECT_TRUE(directory == "a");
     EXPECT_TRUE(getFilenameFromPath("a/b") == "b");
 }
 
 TEST_F(WholeFile, APathThatEndsInASeparatorHasNoFileName) {
     String directory;
-    EXPECT_EQ(1, getDirectoryFromPath("/a/b/", directory));
+    EXPECT_EQ(getDirectoryFromPath("/a/b/", directory), 1);
     EXPECT_TRUE(directory == "/a/b");
     EXPECT_TRUE(getFilenameFromPath("/a/b/") == "");
 }
@@ -314,7 +314,7 @@ TEST_F(WholeFile, PathsWithoutADirectoryPartAreWholeFileNames) {
     for (const char* path : {"/file.txt", "file.txt", "/", ""}) {
         trace_.clear();
         String directory("before");
-        EXPECT_EQ(0, getDirectoryFromPath(path, directory));
+        EXPECT_EQ(getDirectoryFromPath(path, directory), 0);
         EXPECT_TRUE(directory == "before");
         EXPECT_TRUE(getFilenameFromPath(path) == path);
         EXPECT_THAT(trace_.errors("zavtasks"), ElementsAre("Directory [" + std::string(path) +
@@ -329,17 +329,17 @@ std::string without(const char* text, char c) {
 }
 
 TEST(RemoveChar, RemovesEveryOccurrence) {
-    EXPECT_EQ("abc", without("'a'b''c'", '\''));
+    EXPECT_EQ(without("'a'b''c'", '\''), "abc");
 }
 
 TEST(RemoveChar, LeavesOtherTextsAlone) {
-    EXPECT_EQ("abc", without("abc", '\''));
-    EXPECT_EQ("", without("", '\''));
+    EXPECT_EQ(without("abc", '\''), "abc");
+    EXPECT_EQ(without("", '\''), "");
 }
 
 TEST(RemoveChar, MayLeaveNothing) {
-    EXPECT_EQ("", without("'", '\''));
-    EXPECT_EQ("", without("''''", '\''));
+    EXPECT_EQ(without("'", '\''), "");
+    EXPECT_EQ(without("''''", '\''), "");
 }
 
 TEST(RemoveChar, TakesBytesAsUnsigned) {

@@ -58,8 +58,8 @@ protected:
     zav_kagdyst_data_t outcomeOf(TaskQueueElem task) {
         Outcomes outcomes(
             {{"TRANSID", OPER_EQ, static_cast<const char*>(task.getTransid().c_str())}});
-        EXPECT_EQ(0, runTask(task));
-        EXPECT_EQ("", trimmedField(task.getReturnResults().retmsgid));
+        EXPECT_EQ(runTask(task), 0);
+        EXPECT_EQ(trimmedField(task.getReturnResults().retmsgid), "");
         const auto rows = outcomes.waitFor(1);
         if (rows.empty()) throw std::runtime_error("no outcome");
         return rows[0];
@@ -75,44 +75,44 @@ protected:
 TEST_F(TaskManager, StartsAnAgentThroughTheScript) {
     const std::size_t before = home_.agentCalls().size();
     const zav_kagdyst_data_t row = outcomeOf(request("t1", "START", "ux"));
-    EXPECT_EQ(0, row.retval);
-    EXPECT_EQ("START", trimmedField(row.command));
-    EXPECT_EQ("node", trimmedField(row.originnode));
-    EXPECT_EQ("", trimmedField(row.retmsgparm));
+    EXPECT_EQ(row.retval, 0);
+    EXPECT_EQ(trimmedField(row.command), "START");
+    EXPECT_EQ(trimmedField(row.originnode), "node");
+    EXPECT_EQ(trimmedField(row.retmsgparm), "");
     const Texts calls = home_.agentCalls();
-    ASSERT_EQ(before + 1, calls.size());
-    EXPECT_EQ("-h " + home_.path() + " start ux", calls.back());
+    ASSERT_EQ(calls.size(), before + 1);
+    EXPECT_EQ(calls.back(), "-h " + home_.path() + " start ux");
 }
 
 TEST_F(TaskManager, TheTargetOfAStartMayBeTheInstance) {
     const zav_kagdyst_data_t row = outcomeOf(request("t2", "START", "ux", "", "INSTANCE", "inst1"));
-    EXPECT_EQ(0, row.retval);
-    EXPECT_EQ("inst1", trimmedField(row.targetmsn));
-    EXPECT_EQ("-h " + home_.path() + " -o inst1 start ux", home_.agentCalls().back());
+    EXPECT_EQ(row.retval, 0);
+    EXPECT_EQ(trimmedField(row.targetmsn), "inst1");
+    EXPECT_EQ(home_.agentCalls().back(), "-h " + home_.path() + " -o inst1 start ux");
 }
 
 TEST_F(TaskManager, AFailedStartIsReportedWithItsCommandLine) {
     home_.agentScript("exit 7");
     const zav_kagdyst_data_t row = outcomeOf(request("t3", "START", "nope"));
-    EXPECT_EQ(1024, row.retval);
-    EXPECT_EQ("ZAV1024E", trimmedField(row.retmsgid));
-    EXPECT_EQ(padded(scriptLine("start nope"), 256), fieldText(row.retmsgparm));
+    EXPECT_EQ(row.retval, 1024);
+    EXPECT_EQ(trimmedField(row.retmsgid), "ZAV1024E");
+    EXPECT_EQ(fieldText(row.retmsgparm), padded(scriptLine("start nope"), 256));
 }
 
 TEST_F(TaskManager, ARestartThatOnlyFailedToStopSucceedsWithTheStopsMessage) {
     home_.agentScript("[ $verb = start ]");
     const zav_kagdyst_data_t row = outcomeOf(request("t4", "RESTART", "ux"));
-    EXPECT_EQ(0, row.retval);
-    EXPECT_EQ("ZAV1024E", trimmedField(row.retmsgid));
-    EXPECT_EQ(padded(scriptLine("-c stop ux"), 256), fieldText(row.retmsgparm));
+    EXPECT_EQ(row.retval, 0);
+    EXPECT_EQ(trimmedField(row.retmsgid), "ZAV1024E");
+    EXPECT_EQ(fieldText(row.retmsgparm), padded(scriptLine("-c stop ux"), 256));
 }
 
 TEST_F(TaskManager, AnInstallRunsItsCommand) {
     const std::string made = home_.files().path("made");
     const std::string command = "/bin/sh -c 'echo done >" + made + "'";
     const zav_kagdyst_data_t row = outcomeOf(request("t5", "INSTALL", "ux", command.c_str()));
-    EXPECT_EQ(0, row.retval) << trimmedField(row.retmsgparm);
-    EXPECT_EQ("done\n", home_.files().read("made"));
+    EXPECT_EQ(row.retval, 0) << trimmedField(row.retmsgparm);
+    EXPECT_EQ(home_.files().read("made"), "done\n");
 }
 
 TEST_F(TaskManager, AnInstallThatRestartsTheAgentHasTwoOutcomes) {
@@ -121,23 +121,23 @@ TEST_F(TaskManager, AnInstallThatRestartsTheAgentHasTwoOutcomes) {
     Outcomes outcomes({{"TRANSID", OPER_EQ, "t7"}});
     TaskQueueElem task =
         request("t7", "INSTALL", "ux", command.c_str(), "REQUIRES_RESTART", "host:UX");
-    ASSERT_EQ(0, runTask(task));
+    ASSERT_EQ(runTask(task), 0);
     const auto rows = outcomes.waitFor(2);
-    ASSERT_EQ(2u, rows.size());
-    EXPECT_EQ(0, rows[0].retval);
-    EXPECT_EQ("", trimmedField(rows[0].retmsgid));
-    EXPECT_EQ("host:UX", trimmedField(rows[0].targetmsn));
-    EXPECT_EQ(1031, rows[1].retval);
-    EXPECT_EQ("ZAV1031E", trimmedField(rows[1].retmsgid));
+    ASSERT_EQ(rows.size(), 2u);
+    EXPECT_EQ(rows[0].retval, 0);
+    EXPECT_EQ(trimmedField(rows[0].retmsgid), "");
+    EXPECT_EQ(trimmedField(rows[0].targetmsn), "host:UX");
+    EXPECT_EQ(rows[1].retval, 1031);
+    EXPECT_EQ(trimmedField(rows[1].retmsgid), "ZAV1031E");
     const std::string run = "/bin/sh " + home_.depot() + "runcmd.sh " + command + ",9";
-    EXPECT_EQ(padded(run, 256), fieldText(rows[1].retmsgparm));
-    EXPECT_EQ("host:UX", trimmedField(rows[1].targetmsn));
+    EXPECT_EQ(fieldText(rows[1].retmsgparm), padded(run, 256));
+    EXPECT_EQ(trimmedField(rows[1].targetmsn), "host:UX");
 }
 
 TEST_F(TaskManager, ChildrenOfTheExecutorHaveNoSignalsBlocked) {
     home_.agentScript("grep SigBlk /proc/self/status >'" + home_.files().path("mask") + "'");
-    EXPECT_EQ(0, outcomeOf(request("t6", "START", "ux")).retval);
-    EXPECT_EQ("SigBlk:\t0000000000000000\n", home_.files().read("mask"));
+    EXPECT_EQ(outcomeOf(request("t6", "START", "ux")).retval, 0);
+    EXPECT_EQ(home_.files().read("mask"), "SigBlk:\t0000000000000000\n");
 }
 
 TEST_F(TaskManager, AQueryWhileATaskRunsIsAnsweredAtOnce) {
@@ -145,17 +145,17 @@ TEST_F(TaskManager, AQueryWhileATaskRunsIsAnsweredAtOnce) {
     home_.agentScript("while [ ! -e '" + release + "' ]; do sleep 0.02; done");
     Outcomes outcomes;
     TaskQueueElem slow = request("slow", "START", "ux");
-    ASSERT_EQ(0, runTask(slow));
+    ASSERT_EQ(runTask(slow), 0);
     TaskQueueElem quick = request("quick", "GETCONFIG", "ux");
-    EXPECT_EQ(TASK_NO_TRANSLATOR, runTask(quick));
-    EXPECT_EQ(1007, quick.getReturnResults().retval);
+    EXPECT_EQ(runTask(quick), TASK_NO_TRANSLATOR);
+    EXPECT_EQ(quick.getReturnResults().retval, 1007);
     TaskQueueElem refused = request("refused", "start", "ux");
-    EXPECT_EQ(TASK_NOT_SUPPORTED, runTask(refused));
+    EXPECT_EQ(runTask(refused), TASK_NOT_SUPPORTED);
     EXPECT_TRUE(outcomes.rows().empty());
     home_.files().write("release", "");
     const auto rows = outcomes.waitFor(1);
-    ASSERT_EQ(1u, rows.size());
-    EXPECT_EQ("slow", trimmedField(rows[0].transid));
+    ASSERT_EQ(rows.size(), 1u);
+    EXPECT_EQ(trimmedField(rows[0].transid), "slow");
 }
 
 }  // namespace

@@ -53,7 +53,7 @@ TEST(TaskRecord, IsEmptyAtFirst) {
     for (const String& value : {task.getCommand(), task.getTransid(), task.getProduct(),
                                 task.getContext(), task.getOptional(), task.getUaconfig(),
                                 task.getUascript(), task.getVersion(), task.getTargetmsn()}) {
-        EXPECT_EQ(0u, value.length());
+        EXPECT_EQ(value.length(), 0u);
     }
     EXPECT_EQ(std::string(4196, '\0'), bytes(task.getReturnResults()));
 }
@@ -61,20 +61,20 @@ TEST(TaskRecord, IsEmptyAtFirst) {
 TEST(TaskRecord, TakesItsTenValuesInOrder) {
     TaskQueueElem task("node", "tx-1", "START", "ux", "ctx", "opt", "uaconf", "script", "0620",
                        "host:UX");
-    EXPECT_EQ("tx-1", text(task.getTransid()));
-    EXPECT_EQ("START", text(task.getCommand()));
-    EXPECT_EQ("ux", text(task.getProduct()));
-    EXPECT_EQ("ctx", text(task.getContext()));
-    EXPECT_EQ("opt", text(task.getOptional()));
-    EXPECT_EQ("uaconf", text(task.getUaconfig()));
-    EXPECT_EQ("script", text(task.getUascript()));
-    EXPECT_EQ("0620", text(task.getVersion()));
-    EXPECT_EQ("host:UX", text(task.getTargetmsn()));
+    EXPECT_EQ(text(task.getTransid()), "tx-1");
+    EXPECT_EQ(text(task.getCommand()), "START");
+    EXPECT_EQ(text(task.getProduct()), "ux");
+    EXPECT_EQ(text(task.getContext()), "ctx");
+    EXPECT_EQ(text(task.getOptional()), "opt");
+    EXPECT_EQ(text(task.getUaconfig()), "uaconf");
+    EXPECT_EQ(text(task.getUascript()), "script");
+    EXPECT_EQ(text(task.getVersion()), "0620");
+    EXPECT_EQ(text(task.getTargetmsn()), "host:UX");
     task.ReturnStatus(0);
     const zav_kagreqt_data_t row = task.getReturnResults();
-    EXPECT_EQ(padded("node", 64), fieldText(row.originnode));
-    EXPECT_EQ(padded("", 16), fieldText(row.retmsgid));
-    EXPECT_EQ(padded("", 256), fieldText(row.retmsgparm));
+    EXPECT_EQ(fieldText(row.originnode), padded("node", 64));
+    EXPECT_EQ(fieldText(row.retmsgid), padded("", 16));
+    EXPECT_EQ(fieldText(row.retmsgparm), padded("", 256));
 }
 
 TEST(TaskRecord, SettersReplaceTheValuesOneByOne) {
@@ -93,21 +93,21 @@ TEST(TaskRecord, SettersReplaceTheValuesOneByOne) {
     task.setRetmsgparm("12");
     task.ReturnStatus(1);
     const zav_kagreqt_data_t row = task.getReturnResults();
-    EXPECT_EQ("1", trimmedField(row.originnode));
-    EXPECT_EQ("2", trimmedField(row.transid));
-    EXPECT_EQ("3", trimmedField(row.command));
-    EXPECT_EQ("4", trimmedField(row.product));
-    EXPECT_EQ("5", trimmedField(row.context));
-    EXPECT_EQ("6", trimmedField(row.optional));
-    EXPECT_EQ("7", trimmedField(row.uaconfig));
-    EXPECT_EQ("8", trimmedField(row.uascript));
-    EXPECT_EQ("9", trimmedField(row.version));
-    EXPECT_EQ("10", trimmedField(row.targetmsn));
-    EXPECT_EQ("11", trimmedField(row.retmsgid));
-    EXPECT_EQ("12", trimmedField(row.retmsgparm));
-    EXPECT_EQ("2", text(task.getTransid()));
-    EXPECT_EQ("3", text(task.getCommand()));
-    EXPECT_EQ("10", text(task.getTargetmsn()));
+    EXPECT_EQ(trimmedField(row.originnode), "1");
+    EXPECT_EQ(trimmedField(row.transid), "2");
+    EXPECT_EQ(trimmedField(row.command), "3");
+    EXPECT_EQ(trimmedField(row.product), "4");
+    EXPECT_EQ(trimmedField(row.context), "5");
+    EXPECT_EQ(trimmedField(row.optional), "6");
+    EXPECT_EQ(trimmedField(row.uaconfig), "7");
+    EXPECT_EQ(trimmedField(row.uascript), "8");
+    EXPECT_EQ(trimmedField(row.version), "9");
+    EXPECT_EQ(trimmedField(row.targetmsn), "10");
+    EXPECT_EQ(trimmedField(row.retmsgid), "11");
+    EXPECT_EQ(trimmedField(row.retmsgparm), "12");
+    EXPECT_EQ(text(task.getTransid()), "2");
+    EXPECT_EQ(text(task.getCommand()), "3");
+    EXPECT_EQ(text(task.getTargetmsn()), "10");
 }
 
 TEST(TaskRecord, ACopyHasTheValuesAndTheRow) {
@@ -115,12 +115,12 @@ TEST(TaskRecord, ACopyHasTheValuesAndTheRow) {
     task.ReturnStatus(1024);
     const TaskQueueElem copy(task);
     EXPECT_EQ(bytes(task.getReturnResults()), bytes(copy.getReturnResults()));
-    EXPECT_EQ("tx-1", text(copy.getTransid()));
+    EXPECT_EQ(text(copy.getTransid()), "tx-1");
 
     task.setTransid("other");
     task.ReturnStatus(0);
-    EXPECT_EQ("tx-1", text(copy.getTransid()));
-    EXPECT_EQ(1024, copy.getReturnResults().retval);
+    EXPECT_EQ(text(copy.getTransid()), "tx-1");
+    EXPECT_EQ(copy.getReturnResults().retval, 1024);
 }
 
 TEST(TaskRecord, AMovedRecordHasTheValuesAndTheRow) {
@@ -128,11 +128,11 @@ TEST(TaskRecord, AMovedRecordHasTheValuesAndTheRow) {
     task.ReturnStatus(1024);
     const std::string row = bytes(task.getReturnResults());
     TaskQueueElem moved(std::move(task));
-    EXPECT_EQ("tx-1", text(moved.getTransid()));
+    EXPECT_EQ(text(moved.getTransid()), "tx-1");
     EXPECT_EQ(row, bytes(moved.getReturnResults()));
     TaskQueueElem assigned;
     assigned = std::move(moved);
-    EXPECT_EQ("host:UX", text(assigned.getTargetmsn()));
+    EXPECT_EQ(text(assigned.getTargetmsn()), "host:UX");
     EXPECT_EQ(row, bytes(assigned.getReturnResults()));
 }
 
@@ -140,9 +140,9 @@ TEST(SetValueAndPad, PadsWithBlanks) {
     TraceCapture trace;
     char field[8] = "######";
     TaskQueueElem::SetValueAndPad(field, 6, "ab");
-    EXPECT_EQ(std::string("ab    \0\0", 8), std::string(field, 8));
+    EXPECT_EQ(std::string(field, 8), std::string("ab    \0\0", 8));
     TaskQueueElem::SetValueAndPad(field, 6, "");
-    EXPECT_EQ(std::string("      \0\0", 8), std::string(field, 8));
+    EXPECT_EQ(std::string(field, 8), std::string("      \0\0", 8));
     EXPECT_TRUE(trace.errors().empty());
 }
 
@@ -150,7 +150,7 @@ TEST(SetValueAndPad, AValueOfTheFieldsSizeFillsIt) {
     TraceCapture trace;
     char field[8] = "#######";
     TaskQueueElem::SetValueAndPad(field, 6, "abcdef");
-    EXPECT_STREQ("abcdef#", field);
+    EXPECT_STREQ(field, "abcdef#");
     EXPECT_TRUE(trace.errors().empty());
 }
 
@@ -158,12 +158,11 @@ TEST(SetValueAndPad, ALongerValueIsCutAndTraced) {
     TraceCapture trace;
     char field[8] = "#######";
     TaskQueueElem::SetValueAndPad(field, 6, "abcdefg");
-    EXPECT_STREQ("abcdef#", field);
-    EXPECT_EQ(
-        std::vector<std::string>{
-            "Result data \"abcdefg\" was truncated to \"abcdef\" because it exceeded the "
-            "maximum size of 6 characters"},
-        trace.errors("zavtqelm"));
+    EXPECT_STREQ(field, "abcdef#");
+    EXPECT_EQ(trace.errors("zavtqelm"),
+              std::vector<std::string>{
+                  "Result data \"abcdefg\" was truncated to \"abcdef\" because it exceeded the "
+                  "maximum size of 6 characters"});
 }
 
 TEST(ReturnStatus, FillsEveryByteOfTheRow) {
@@ -174,8 +173,8 @@ TEST(ReturnStatus, FillsEveryByteOfTheRow) {
                                  padded("uaconf", 32) + padded("script", 512) + integerBytes(1024) +
                                  padded("062000000", 12) + padded("ZAV1024E", 16) +
                                  padded("the command", 256) + padded("host:UX", 64);
-    ASSERT_EQ(4196u, expected.size());
-    EXPECT_EQ(expected, bytes(task.getReturnResults()));
+    ASSERT_EQ(expected.size(), 4196u);
+    EXPECT_EQ(bytes(task.getReturnResults()), expected);
 }
 
 TEST(ReturnStatus, EmptyFieldsBecomeBlanks) {
@@ -183,7 +182,7 @@ TEST(ReturnStatus, EmptyFieldsBecomeBlanks) {
     task.ReturnStatus(0);
     std::string expected(4196, ' ');
     expected.replace(3844, 4, 4, '\0');
-    EXPECT_EQ(expected, bytes(task.getReturnResults()));
+    EXPECT_EQ(bytes(task.getReturnResults()), expected);
 }
 
 TEST(ReturnStatus, IsTracedAndSendsNothing) {
@@ -192,9 +191,9 @@ TEST(ReturnStatus, IsTracedAndSendsNothing) {
     fake_sleep::reset();
     TraceCapture trace;
     task.ReturnStatus(1024);
-    EXPECT_EQ(std::vector<std::string>{"Returning status return code [1024], message id "
-                                       "[ZAV1024E] parms [the command]"},
-              trace.details("zavtqelm"));
+    EXPECT_EQ(trace.details("zavtqelm"),
+              std::vector<std::string>{"Returning status return code [1024], message id "
+                                       "[ZAV1024E] parms [the command]"});
     EXPECT_TRUE(outcomes.rows().empty());
     EXPECT_TRUE(fake_sleep::slept().empty());
 }
@@ -205,13 +204,12 @@ TEST(ReturnStatus, AContextOneTooLongIsCutWithOneTraceLine) {
     task.setContext(value.c_str());
     TraceCapture trace;
     task.ReturnStatus(0);
-    EXPECT_EQ(std::string(3072, 'x'), fieldText(task.getReturnResults().context));
-    EXPECT_EQ(padded("INSTANCE", 32), fieldText(task.getReturnResults().optional));
-    EXPECT_EQ(
-        std::vector<std::string>{"Result data \"" + value + "\" was truncated to \"" +
-                                 std::string(3072, 'x') +
-                                 "\" because it exceeded the maximum size of 3072 characters"},
-        trace.errors());
+    EXPECT_EQ(fieldText(task.getReturnResults().context), std::string(3072, 'x'));
+    EXPECT_EQ(fieldText(task.getReturnResults().optional), padded("INSTANCE", 32));
+    EXPECT_EQ(trace.errors(),
+              std::vector<std::string>{
+                  "Result data \"" + value + "\" was truncated to \"" + std::string(3072, 'x') +
+                  "\" because it exceeded the maximum size of 3072 characters"});
 }
 
 TEST(ReturnStatus, EveryFieldIsCutToItsOwnWidth) {
@@ -224,9 +222,9 @@ TEST(ReturnStatus, EveryFieldIsCutToItsOwnWidth) {
     task.ReturnStatus(7);
     std::string expected(4196, 'y');
     expected.replace(3844, 4, integerBytes(7));
-    EXPECT_EQ(expected, bytes(task.getReturnResults()));
-    EXPECT_EQ((std::vector<int>{64, 84, 16, 32, 3072, 32, 32, 512, 12, 16, 256, 64}),
-              widthsOfCuts(trace));
+    EXPECT_EQ(bytes(task.getReturnResults()), expected);
+    EXPECT_EQ(widthsOfCuts(trace),
+              (std::vector<int>{64, 84, 16, 32, 3072, 32, 32, 512, 12, 16, 256, 64}));
 }
 
 TEST(ReturnAsyncStatus, PublishesOneRow) {
@@ -234,18 +232,18 @@ TEST(ReturnAsyncStatus, PublishesOneRow) {
     Outcomes outcomes;
     task.returnAsyncStatus(1024);
     const auto rows = outcomes.rows();
-    ASSERT_EQ(1u, rows.size());
+    ASSERT_EQ(rows.size(), 1u);
     const std::string expected = padded("node", 64) + padded("tx-1", 84) + padded("START", 16) +
                                  integerBytes(1024) + padded("ZAV1024E", 16) +
                                  padded("the command", 256) + padded("host:UX", 64);
-    ASSERT_EQ(504u, expected.size());
-    EXPECT_EQ(expected, bytes(rows[0]));
+    ASSERT_EQ(expected.size(), 504u);
+    EXPECT_EQ(bytes(rows[0]), expected);
 }
 
 TEST(ReturnAsyncStatus, SleepsOneSecondBeforeTheRow) {
     static std::vector<unsigned> sleptBefore;
     sleptBefore.clear();
-    ASSERT_EQ(0, zav_kagdyst_init());
+    ASSERT_EQ(zav_kagdyst_init(), 0);
     fake_sleep::reset();
     const auto subscription = oxa::subscribe("KAGDYST", {}, [](const oxa::Rows&) {
         sleptBefore = fake_sleep::slept();
@@ -253,17 +251,17 @@ TEST(ReturnAsyncStatus, SleepsOneSecondBeforeTheRow) {
     });
     TaskQueueElem task = sample();
     task.returnAsyncStatus(0);
-    EXPECT_EQ(std::vector<unsigned>{1}, sleptBefore);
-    EXPECT_EQ(std::vector<unsigned>{1}, fake_sleep::slept());
+    EXPECT_EQ(sleptBefore, std::vector<unsigned>{1});
+    EXPECT_EQ(fake_sleep::slept(), std::vector<unsigned>{1});
 }
 
 TEST(ReturnAsyncStatus, IsTraced) {
     TaskQueueElem task = sample();
     TraceCapture trace;
     task.returnAsyncStatus(0);
-    EXPECT_EQ(std::vector<std::string>{"Returning aysnc status return code [0], message id "
-                                       "[ZAV1024E] parms [the command]"},
-              trace.details("zavtqelm"));
+    EXPECT_EQ(trace.details("zavtqelm"),
+              std::vector<std::string>{"Returning aysnc status return code [0], message id "
+                                       "[ZAV1024E] parms [the command]"});
 }
 
 TEST(ReturnAsyncStatus, LeavesTheRequestsRowAlone) {
@@ -283,10 +281,10 @@ TEST(ReturnAsyncStatus, CutsWhatIsTooLong) {
     TraceCapture trace;
     task.returnAsyncStatus(1024);
     const auto rows = outcomes.rows();
-    ASSERT_EQ(1u, rows.size());
-    EXPECT_EQ(std::string(256, 'z'), fieldText(rows[0].retmsgparm));
-    EXPECT_EQ(padded("host:UX", 64), fieldText(rows[0].targetmsn));
-    EXPECT_EQ(1u, trace.errors("zavtqelm").size());
+    ASSERT_EQ(rows.size(), 1u);
+    EXPECT_EQ(fieldText(rows[0].retmsgparm), std::string(256, 'z'));
+    EXPECT_EQ(fieldText(rows[0].targetmsn), padded("host:UX", 64));
+    EXPECT_EQ(trace.errors("zavtqelm").size(), 1u);
 }
 
 TEST(ReturnAsyncStatus, CutsEveryFieldToItsOwnWidth) {
@@ -298,11 +296,11 @@ TEST(ReturnAsyncStatus, CutsEveryFieldToItsOwnWidth) {
     TraceCapture trace;
     task.returnAsyncStatus(7);
     const auto rows = outcomes.rows();
-    ASSERT_EQ(1u, rows.size());
+    ASSERT_EQ(rows.size(), 1u);
     std::string expected(504, 'y');
     expected.replace(164, 4, integerBytes(7));
-    EXPECT_EQ(expected, bytes(rows[0]));
-    EXPECT_EQ((std::vector<int>{64, 84, 16, 64, 16, 256}), widthsOfCuts(trace));
+    EXPECT_EQ(bytes(rows[0]), expected);
+    EXPECT_EQ(widthsOfCuts(trace), (std::vector<int>{64, 84, 16, 64, 16, 256}));
 }
 
 }  // namespace

@@ -70,9 +70,9 @@ TEST_F(CommandRunner, HandsBackOutputAndExitCode) {
     TraceCapture traces;
     const Outcome outcome = run("/bin/sh -c 'echo out; echo err >&2'");
     EXPECT_TRUE(outcome.ran);
-    EXPECT_EQ(0, outcome.rc);
-    EXPECT_EQ("out\n", outcome.text());
-    EXPECT_EQ("err\n", outcome.errText());
+    EXPECT_EQ(outcome.rc, 0);
+    EXPECT_EQ(outcome.text(), "out\n");
+    EXPECT_EQ(outcome.errText(), "err\n");
     EXPECT_THAT(traces.details("zavutil"),
                 ElementsAre("Command to run is \"/bin/sh -c 'echo out; echo err >&2'\"",
                             "outbuf: out", "errbuf: err",
@@ -85,7 +85,7 @@ TEST_F(CommandRunner, ABadExitCodeIsNoFailureOfTheRun) {
     TraceCapture traces;
     const Outcome outcome = run("/bin/sh -c 'exit 3'");
     EXPECT_TRUE(outcome.ran);
-    EXPECT_EQ(3, outcome.rc);
+    EXPECT_EQ(outcome.rc, 3);
     EXPECT_THAT(traces.errors("zavutil"),
                 ElementsAre("Bad return code (3) from command \"/bin/sh -c 'exit 3'\"",
                             "STDOUT [0 characters] is: ", "STDERR [0 characters] is: "));
@@ -97,9 +97,9 @@ TEST_F(CommandRunner, ACommandThatCannotBeStartedChangesNothing) {
     TraceCapture traces;
     const Outcome outcome = run("/no/such/program x");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_EQ(-99, outcome.rc);
-    EXPECT_EQ("untouched", outcome.text());
-    EXPECT_EQ("untouched", outcome.errText());
+    EXPECT_EQ(outcome.rc, -99);
+    EXPECT_EQ(outcome.text(), "untouched");
+    EXPECT_EQ(outcome.errText(), "untouched");
     EXPECT_THAT(traces.errors(), ElementsAre("Unable to execute command: /no/such/program",
                                              "Failed to start process for cmd /no/such/program x"));
 }
@@ -109,9 +109,9 @@ TEST_F(CommandRunner, ACommandThatCannotBeExecutedEndsWithZero) {
     const ScratchDir scratch;
     const Outcome outcome = run(scratch.path());
     EXPECT_TRUE(outcome.ran);
-    EXPECT_EQ(0, outcome.rc);
-    EXPECT_EQ("", outcome.text());
-    EXPECT_EQ(1, traces.count('E', "Unable to launch the executable, rc=-1"));
+    EXPECT_EQ(outcome.rc, 0);
+    EXPECT_EQ(outcome.text(), "");
+    EXPECT_EQ(traces.count('E', "Unable to launch the executable, rc=-1"), 1);
 }
 
 TEST_F(CommandRunner, EnvironmentEntriesReachTheChild) {
@@ -121,21 +121,21 @@ TEST_F(CommandRunner, EnvironmentEntriesReachTheChild) {
     Outcome outcome;
     EXPECT_TRUE(Util::runCommandEnv("/bin/sh -c 'echo $ZAV_TEST_FIRST $ZAV_TEST_SECOND'", env,
                                     outcome.rc, outcome.out, outcome.err, String(), false));
-    EXPECT_EQ("1 and more 2\n", outcome.text());
+    EXPECT_EQ(outcome.text(), "1 and more 2\n");
     char* none[] = {nullptr};
     EXPECT_TRUE(Util::runCommandEnv("/bin/echo x", none, outcome.rc, outcome.out, outcome.err,
                                     String(), false));
-    EXPECT_EQ("x\n", outcome.text());
+    EXPECT_EQ(outcome.text(), "x\n");
 }
 
 TEST_F(CommandRunner, AChildWithoutInputSeesTheEndAtOnce) {
     const Outcome outcome = run("/bin/cat");
     EXPECT_TRUE(outcome.ran);
-    EXPECT_EQ("", outcome.text());
+    EXPECT_EQ(outcome.text(), "");
 }
 
 TEST_F(CommandRunner, InputReachesTheChild) {
-    EXPECT_EQ("a line\nand another", run("/bin/cat", "a line\nand another").text());
+    EXPECT_EQ(run("/bin/cat", "a line\nand another").text(), "a line\nand another");
 }
 
 TEST_F(CommandRunner, InputLargerThanThePipesPassesThroughAChildThatWritesAsItReads) {
@@ -154,8 +154,8 @@ TEST_F(CommandRunner, AChildThatDoesNotReadItsInputIsNoFailure) {
     for (int i = 0; i < 5; ++i) {
         const Outcome outcome = run("/bin/sh -c 'exec <&-; echo done; exit 2'", input);
         EXPECT_TRUE(outcome.ran);
-        EXPECT_EQ(2, outcome.rc);
-        EXPECT_EQ("done\n", outcome.text());
+        EXPECT_EQ(outcome.rc, 2);
+        EXPECT_EQ(outcome.text(), "done\n");
     }
 }
 
@@ -165,7 +165,7 @@ TEST_F(CommandRunner, AChildThatNeverTakesItsInputIsKilledAtTheTimeout) {
     const Outcome outcome =
         run("/bin/sh -c 'echo early; exec sleep 60'", String(std::string(300 * 1000, 'x').c_str()));
     EXPECT_FALSE(outcome.ran);
-    EXPECT_EQ("early\n", outcome.text());
+    EXPECT_EQ(outcome.text(), "early\n");
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }
 
@@ -175,26 +175,26 @@ TEST_F(CommandRunner, LargeOutputIsCollectedWhole) {
     for (int i = 1; i <= 100000; ++i)
         expected += std::to_string(i) + "\n";
     EXPECT_TRUE(outcome.text() == expected);
-    EXPECT_EQ(13893u, outcome.err.length());
+    EXPECT_EQ(outcome.err.length(), 13893u);
 }
 
 TEST_F(CommandRunner, OutputIsTracedAndCollectedInChunks) {
     TraceCapture traces("ERROR (UNIT:zavutil DETAIL)");
     const ScratchDir scratch;
     const Outcome outcome = run(scratch.script("write", "head -c 40000 /dev/zero | tr '\\0' x\n"));
-    EXPECT_EQ(40000u, outcome.out.length());
+    EXPECT_EQ(outcome.out.length(), 40000u);
     std::size_t traced = 0;
     for (const std::string& line : traces.details("zavutil")) {
         if (line.rfind("outbuf: ", 0) != 0) continue;
         EXPECT_LE(line.size(), 8u + 16384u);
         traced += line.size() - 8;
     }
-    EXPECT_EQ(40000u, traced);
+    EXPECT_EQ(traced, 40000u);
 }
 
 TEST_F(CommandRunner, AChunkIsATextUpToItsFirstZero) {
     const ScratchDir scratch;
-    EXPECT_EQ("a", run(scratch.script("write", "printf 'a\\000b'\n")).text());
+    EXPECT_EQ(run(scratch.script("write", "printf 'a\\000b'\n")).text(), "a");
 }
 
 TEST_F(CommandRunner, EachChunkIsConvertedOnItsOwn) {
@@ -204,10 +204,10 @@ TEST_F(CommandRunner, EachChunkIsConvertedOnItsOwn) {
     // A chunk ends between the two bytes of a character; neither byte is a character by itself.
     const std::string before(16383, 'x');
     const Outcome outcome = run("/bin/cat " + scratch.write("f", before + "\xC3\xA9z"));
-    ASSERT_EQ(16383u + 3u, outcome.out.length());
-    EXPECT_EQ(0xFFFD, outcome.out[16383]);
-    EXPECT_EQ(0xFFFD, outcome.out[16384]);
-    EXPECT_EQ('z', outcome.out[16385]);
+    ASSERT_EQ(outcome.out.length(), 16383u + 3u);
+    EXPECT_EQ(outcome.out[16383], 0xFFFD);
+    EXPECT_EQ(outcome.out[16384], 0xFFFD);
+    EXPECT_EQ(outcome.out[16385], 'z');
 }
 
 TEST_F(CommandRunner, OneTextForBothGetsTheOutputThenTheErrors) {
@@ -215,7 +215,7 @@ TEST_F(CommandRunner, OneTextForBothGetsTheOutputThenTheErrors) {
     String both("before");
     EXPECT_TRUE(
         Util::runCommand("/bin/sh -c 'echo err >&2; echo out'", rc, both, both, String(), false));
-    EXPECT_EQ(String("out\nerr\n"), both);
+    EXPECT_EQ(both, String("out\nerr\n"));
 }
 
 TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
@@ -225,9 +225,9 @@ TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
     const Outcome outcome = run("/bin/sh -c 'echo begun; echo bad >&2; exec sleep 60'");
     EXPECT_FALSE(outcome.ran);
     EXPECT_GT(watch.seconds(), 2.9);
-    EXPECT_EQ(0, outcome.rc);
-    EXPECT_EQ("begun\n", outcome.text());
-    EXPECT_EQ("", outcome.errText());
+    EXPECT_EQ(outcome.rc, 0);
+    EXPECT_EQ(outcome.text(), "begun\n");
+    EXPECT_EQ(outcome.errText(), "");
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
     // Also when the time-out passed while output was read, before waiting had begun.
     EXPECT_THAT(withoutNumbers(traces.details("zavprnix")),
@@ -253,7 +253,7 @@ TEST_F(CommandRunner, OutputThatOthersKeepOpenEndsTheRunAtTheTimeout) {
     const Outcome outcome = run("/bin/sh -c '" + other.command() + " echo started'");
     EXPECT_FALSE(outcome.ran);
     EXPECT_TRUE(other.isRunning());
-    EXPECT_EQ("started\n", outcome.text());
+    EXPECT_EQ(outcome.text(), "started\n");
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }
 
@@ -266,12 +266,12 @@ TEST_F(CommandRunner, AChildBlockedOnAFullErrorPipeIsKilled) {
     limit("3");
     const Outcome outcome = run("/bin/sh -c 'echo out; head -c 200000 /dev/zero >&2'");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_EQ("out\n", outcome.text());
+    EXPECT_EQ(outcome.text(), "out\n");
 }
 
 TEST_F(CommandRunner, ADateThatIsFarAwayIsFineAsATimeout) {
     limit("2000000000");
-    EXPECT_EQ("x\n", run("/bin/echo x").text());
+    EXPECT_EQ(run("/bin/echo x").text(), "x\n");
 }
 
 TEST_F(CommandRunner, AnAgentCommandIsReadOnceAfterItsEnd) {
@@ -282,9 +282,9 @@ TEST_F(CommandRunner, AnAgentCommandIsReadOnceAfterItsEnd) {
     for (const bool nonBlocking : {false, true}) {
         const Outcome outcome = run(script, String(), nonBlocking);
         EXPECT_TRUE(outcome.ran);
-        EXPECT_EQ(5, outcome.rc);
-        EXPECT_EQ(16384u, outcome.out.length());
-        EXPECT_EQ(16384u, outcome.err.length());
+        EXPECT_EQ(outcome.rc, 5);
+        EXPECT_EQ(outcome.out.length(), 16384u);
+        EXPECT_EQ(outcome.err.length(), 16384u);
     }
 }
 
@@ -296,8 +296,8 @@ TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsNothingUpWhenReadWithoutB
     const Outcome outcome = run(script, String(), true);
     EXPECT_TRUE(outcome.ran);
     EXPECT_TRUE(agent.isRunning());
-    EXPECT_EQ("up\n", outcome.text());
-    EXPECT_EQ("", outcome.errText());
+    EXPECT_EQ(outcome.text(), "up\n");
+    EXPECT_EQ(outcome.errText(), "");
 }
 
 TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsABlockingReadUpToTheTimeoutAtMost) {
@@ -311,10 +311,10 @@ TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsABlockingReadUpToTheTimeo
     const Outcome outcome = run(script);
     EXPECT_TRUE(outcome.ran);
     EXPECT_TRUE(agent.isRunning());
-    EXPECT_EQ(6, outcome.rc);
+    EXPECT_EQ(outcome.rc, 6);
     EXPECT_GT(watch.seconds(), 2.9);
-    EXPECT_EQ("up\n", outcome.text());
-    EXPECT_EQ("", outcome.errText());
+    EXPECT_EQ(outcome.text(), "up\n");
+    EXPECT_EQ(outcome.errText(), "");
     EXPECT_THAT(traces.errors(), Contains(StartsWith("Bad return code (6)")));
 }
 
@@ -324,6 +324,6 @@ TEST_F(CommandRunner, AnAgentCommandThatHangsIsKilled) {
     const ScratchDir scratch;
     const Outcome outcome = run(scratch.script("TovrinAgent", "echo lost\nexec sleep 60\n"));
     EXPECT_FALSE(outcome.ran);
-    EXPECT_EQ("", outcome.text());
+    EXPECT_EQ(outcome.text(), "");
     EXPECT_THAT(withoutNumbers(traces.errors()), kKilled);
 }

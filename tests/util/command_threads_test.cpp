@@ -39,8 +39,8 @@ TEST(CommandThreads, RunsDoNotMeet) {
         threads.emplace_back(work, i);
     for (std::thread& thread : threads)
         thread.join();
-    EXPECT_EQ(0, wrong);
-    EXPECT_EQ(before, child_role::openDescriptors());
+    EXPECT_EQ(wrong, 0);
+    EXPECT_EQ(child_role::openDescriptors(), before);
     EXPECT_TRUE(::waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD);
 }
 
@@ -79,5 +79,5 @@ TEST(CommandThreads, TracesOfAllChildrenArrive) {
     }
     for (std::thread& thread : threads)
         thread.join();
-    EXPECT_EQ(20, traces.count('D', "Calling execvp"));
+    EXPECT_EQ(traces.count('D', "Calling execvp"), 20);
 }

@@ -38,7 +38,7 @@ TEST(CommandTiming, AnEndIsNoticedAtOnce) {
         char sleep[] = "/bin/sleep", time[] = "0.2";
         char* const arguments[] = {sleep, time, nullptr};
         pid_t child = -1;
-        ASSERT_EQ(0, ::posix_spawn(&child, sleep, nullptr, nullptr, arguments, environ));
+        ASSERT_EQ(::posix_spawn(&child, sleep, nullptr, nullptr, arguments, environ), 0);
         EXPECT_EQ(child, ::waitpid(child, nullptr, 0));
     });
     const double withUs = shortestOf(5, [] {

@@ -240,9 +240,9 @@ TEST_F(Fault, APipeThatCannotBeMadeFailsTheStart) {
         EXPECT_FALSE(run("/bin/true"));
         EXPECT_THAT(traces.errors(),
                     ElementsAre(texts[call - 1], "Failed to start process for cmd /bin/true"));
-        EXPECT_EQ(-99, rc);
-        EXPECT_EQ("untouched", out);
-        EXPECT_EQ("untouched", err);
+        EXPECT_EQ(rc, -99);
+        EXPECT_EQ(out, "untouched");
+        EXPECT_EQ(err, "untouched");
     }
 }
 
@@ -252,7 +252,7 @@ TEST_F(Fault, AForkThatFailsFailsTheStart) {
     EXPECT_FALSE(run("/bin/true"));
     EXPECT_THAT(traces.errors(), ElementsAre("failed to fork child process",
                                              "Failed to start process for cmd /bin/true"));
-    EXPECT_EQ(-99, rc);
+    EXPECT_EQ(rc, -99);
 }
 
 TEST_F(Fault, AChildWithoutItsStreamsEndsWithAStatusOfItsOwn) {
@@ -262,11 +262,11 @@ TEST_F(Fault, AChildWithoutItsStreamsEndsWithAStatusOfItsOwn) {
         TraceCapture traces("ERROR (UNIT:zavprnix ALL)");
         faults.dup2Onto = onto;
         EXPECT_TRUE(run("/bin/echo x"));
-        EXPECT_NE(0, rc);
-        EXPECT_NE(-99, rc);
-        EXPECT_EQ("", out);
+        EXPECT_NE(rc, 0);
+        EXPECT_NE(rc, -99);
+        EXPECT_EQ(out, "");
         EXPECT_THAT(traces.errors("zavprnix"), ElementsAre(texts[onto]));
-        EXPECT_EQ(0, traces.count('D', "Calling execvp"));
+        EXPECT_EQ(traces.count('D', "Calling execvp"), 0);
     }
 }
 
@@ -293,9 +293,9 @@ TEST_F(Fault, AKillThatFailsIsTracedWithItsResult) {
     faults.kill = true;
     EXPECT_FALSE(run("/bin/sleep 60"));
     const auto errors = traces.errors();
-    ASSERT_EQ(4u, errors.size());
-    EXPECT_EQ("Error occurred. ERRNO:-1 Unknown error -1", errors[2]);
-    EXPECT_EQ("Failed to wait on process", errors[3]);
+    ASSERT_EQ(errors.size(), 4u);
+    EXPECT_EQ(errors[2], "Error occurred. ERRNO:-1 Unknown error -1");
+    EXPECT_EQ(errors[3], "Failed to wait on process");
 }
 
 TEST_F(Fault, WithoutHandlesForProcessesAnEndIsLookedForEveryFewMilliseconds) {
@@ -318,7 +318,7 @@ TEST_F(Fault, InterruptionsAreInvisible) {
     const bool ran = run("/bin/cat", input);
     faults.interruptions = false;
     EXPECT_TRUE(ran);
-    EXPECT_EQ(0, rc);
+    EXPECT_EQ(rc, 0);
     EXPECT_EQ(input, out);
 }
 
@@ -347,11 +347,11 @@ TEST_F(Fault, WithoutMemoryNeitherDescriptorsNorChildrenAreLeft) {
         }
         faults.allocation = 0;
         if (!ranThrough) ++failures;
-        ASSERT_EQ(before, child_role::openDescriptors()) << failures;
+        ASSERT_EQ(child_role::openDescriptors(), before) << failures;
         ASSERT_TRUE(::waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD) << failures;
     }
     EXPECT_GT(failures, 10);
-    EXPECT_EQ("some input", out);
+    EXPECT_EQ(out, "some input");
 }
 
 TEST_F(Fault, AWaitingThreadTracesWhatItsLockRefuses) {
@@ -362,7 +362,7 @@ TEST_F(Fault, AWaitingThreadTracesWhatItsLockRefuses) {
     faults.brokenMutex = &data.mutex;
     faults.brokenCondition = &data.waitCond;
     pthread_t thread;
-    ASSERT_EQ(0, ::pthread_create(&thread, nullptr, &ProcTerminateThreadFunc, &data));
+    ASSERT_EQ(::pthread_create(&thread, nullptr, &ProcTerminateThreadFunc, &data), 0);
     ::pthread_join(thread, nullptr);
     EXPECT_TRUE(data.exited);
     EXPECT_THAT(traces.errors(),

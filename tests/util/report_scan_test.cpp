@@ -28,63 +28,63 @@ using Tokens = std::vector<std::string>;
 
 TEST(ReportBody, FindsTheHeaderAndTheEndOfItsLine) {
     const ReportBody body = findReportBody("noise\nHEADER more\nline\n", "HEADER");
-    EXPECT_EQ(6u, body.header);
-    EXPECT_EQ(17u, body.newline);
+    EXPECT_EQ(body.header, 6u);
+    EXPECT_EQ(body.newline, 17u);
 }
 
 TEST(ReportBody, NewlinesBeforeTheHeaderDoNotCount) {
     const ReportBody body = findReportBody("\n\nHEADER\n", "HEADER");
-    EXPECT_EQ(2u, body.header);
-    EXPECT_EQ(8u, body.newline);
+    EXPECT_EQ(body.header, 2u);
+    EXPECT_EQ(body.newline, 8u);
 }
 
 TEST(ReportBody, TakesTheFirstOfSeveralHeaders) {
-    EXPECT_EQ(1u, findReportBody("xHEADER\nHEADER\n", "HEADER").header);
+    EXPECT_EQ(findReportBody("xHEADER\nHEADER\n", "HEADER").header, 1u);
 }
 
 TEST(ReportBody, WithoutAHeaderNothingIsFound) {
     const ReportBody body = findReportBody("some\ntext\n", "HEADER");
-    EXPECT_EQ(String::NPOS, body.header);
-    EXPECT_EQ(String::NPOS, body.newline);
+    EXPECT_EQ(body.header, String::NPOS);
+    EXPECT_EQ(body.newline, String::NPOS);
 }
 
 TEST(ReportBody, AnEmptyReportHasNoHeader) {
-    EXPECT_EQ(String::NPOS, findReportBody("", "HEADER").header);
+    EXPECT_EQ(findReportBody("", "HEADER").header, String::NPOS);
 }
 
 TEST(ReportBody, AHeaderMayBeAllThereIs) {
     const ReportBody body = findReportBody("HEADER", "HEADER");
-    EXPECT_EQ(0u, body.header);
-    EXPECT_EQ(String::NPOS, body.newline);
+    EXPECT_EQ(body.header, 0u);
+    EXPECT_EQ(body.newline, String::NPOS);
 }
 
 TEST(SplitFields, EmptyFieldsAreNotCounted) {
-    EXPECT_EQ((Tokens{"a", "b", "c"}), split("\"a\",\"\",\"b\",,\"c\"\r", "\n\r,\""));
+    EXPECT_EQ(split("\"a\",\"\",\"b\",,\"c\"\r", "\n\r,\""), (Tokens{"a", "b", "c"}));
 }
 
 TEST(SplitFields, EmptyTextsAndTextsOfDelimitersHaveNone) {
-    EXPECT_EQ(Tokens{}, split("", ","));
-    EXPECT_EQ(Tokens{}, split(",,,", ","));
+    EXPECT_EQ(split("", ","), Tokens{});
+    EXPECT_EQ(split(",,,", ","), Tokens{});
 }
 
 TEST(SplitFields, ATextWithoutDelimitersIsOneField) {
-    EXPECT_EQ(Tokens{"abc"}, split("abc", ","));
-    EXPECT_EQ(Tokens{"a,b"}, split("a,b", ""));
+    EXPECT_EQ(split("abc", ","), Tokens{"abc"});
+    EXPECT_EQ(split("a,b", ""), Tokens{"a,b"});
 }
 
 TEST(SplitFields, BeginsWhereItIsTold) {
-    EXPECT_EQ((Tokens{"c", "d"}), split("a\nbc\nd", "\n", 3));
-    EXPECT_EQ(Tokens{}, split("ab", "\n", 2));
-    EXPECT_EQ(Tokens{}, split("ab", "\n", 3000000000u));
+    EXPECT_EQ(split("a\nbc\nd", "\n", 3), (Tokens{"c", "d"}));
+    EXPECT_EQ(split("ab", "\n", 2), Tokens{});
+    EXPECT_EQ(split("ab", "\n", 3000000000u), Tokens{});
 }
 
 TEST(SplitFields, UnitsBeyondAsciiAreNeverDelimiters) {
     // The low byte of 0x012C is a comma.
     const unsigned short units[] = {'a', 0x012C, 'b', ',', 'c', 0};
     const std::vector<String> fields = splitFields(String(units), ",");
-    ASSERT_EQ(2u, fields.size());
-    EXPECT_EQ(3u, fields[0].length());
-    EXPECT_EQ(0x012C, fields[0][1]);
+    ASSERT_EQ(fields.size(), 2u);
+    EXPECT_EQ(fields[0].length(), 3u);
+    EXPECT_EQ(fields[0][1], 0x012C);
     EXPECT_TRUE(fields[1] == "c");
 }
 
@@ -109,7 +109,7 @@ TEST(TokenScanner, CutsAsTheTokenizerDoes) {
         while (tokenizer.hasMoreTokens()) {
             expected.emplace_back(static_cast<const char*>(tokenizer.nextToken().c_str()));
         }
-        EXPECT_EQ(expected, split(text, delimiters)) << text;
+        EXPECT_EQ(split(text, delimiters), expected) << text;
     }
 }
 

@@ -73,7 +73,7 @@ std::vector<int> numbersIn(const std::string& text) {
 /// Waits until a child has ended; it stays to be waited for.
 void awaitEndOfSomeChild() {
     siginfo_t ended{};
-    EXPECT_EQ(0, ::waitid(P_ALL, 0, &ended, WEXITED | WNOWAIT));
+    EXPECT_EQ(::waitid(P_ALL, 0, &ended, WEXITED | WNOWAIT), 0);
 }
 
 class TimeoutSetting {
@@ -97,12 +97,12 @@ std::string timeoutTraced(const char* value) {
 }  // namespace
 
 TEST(ProcessTimeout, ComesFromTheEnvironment) {
-    EXPECT_EQ("Set timeout to 300 seconds", timeoutTraced(nullptr));
-    EXPECT_EQ("Set timeout to 5 seconds", timeoutTraced("5"));
-    EXPECT_EQ("Set timeout to 0 seconds", timeoutTraced("abc"));
-    EXPECT_EQ("Set timeout to 0 seconds", timeoutTraced(""));
-    EXPECT_EQ("Set timeout to 0 seconds", timeoutTraced("99999999999"));
-    EXPECT_EQ("Set timeout to -7 seconds", timeoutTraced("-7"));
+    EXPECT_EQ(timeoutTraced(nullptr), "Set timeout to 300 seconds");
+    EXPECT_EQ(timeoutTraced("5"), "Set timeout to 5 seconds");
+    EXPECT_EQ(timeoutTraced("abc"), "Set timeout to 0 seconds");
+    EXPECT_EQ(timeoutTraced(""), "Set timeout to 0 seconds");
+    EXPECT_EQ(timeoutTraced("99999999999"), "Set timeout to 0 seconds");
+    EXPECT_EQ(timeoutTraced("-7"), "Set timeout to -7 seconds");
 }
 
 TEST(Process, ConnectsTheStandardStreams) {
@@ -110,11 +110,11 @@ TEST(Process, ConnectsTheStandardStreams) {
     ASSERT_TRUE(process.start());
     EXPECT_TRUE(process.getStdIn()->write("text\n", 5));
     EXPECT_TRUE(process.getStdIn()->close());
-    EXPECT_EQ("out text\n", readAll(process.getStdOut()));
-    EXPECT_EQ("err text\n", readAll(process.getStdErr()));
+    EXPECT_EQ(readAll(process.getStdOut()), "out text\n");
+    EXPECT_EQ(readAll(process.getStdErr()), "err text\n");
     int exitCode = -1;
     EXPECT_TRUE(process.wait(&exitCode));
-    EXPECT_EQ(7, exitCode);
+    EXPECT_EQ(exitCode, 7);
     EXPECT_FALSE(process.running());
     EXPECT_TRUE(noChildIsLeft());
 }
@@ -126,12 +126,12 @@ TEST(Process, TracesItsWayInOrder) {
     int exitCode = -1;
     EXPECT_TRUE(process.wait(&exitCode));
     const auto details = traces.details("zavprnix");
-    ASSERT_EQ(4u, details.size());
-    EXPECT_EQ("Set timeout to 300 seconds", details[0]);
+    ASSERT_EQ(details.size(), 4u);
+    EXPECT_EQ(details[0], "Set timeout to 300 seconds");
     const std::string start = "Entering child process to launch command. PID: ";
     ASSERT_EQ(start, details[1].substr(0, start.size()));
-    EXPECT_EQ("Calling execvp", details[2]);
-    EXPECT_EQ("Waiting for process id: " + details[1].substr(start.size()), details[3]);
+    EXPECT_EQ(details[2], "Calling execvp");
+    EXPECT_EQ(details[3], "Waiting for process id: " + details[1].substr(start.size()));
     EXPECT_NE(std::to_string(::getpid()), details[1].substr(start.size()));
     EXPECT_THAT(traces.errors(), IsEmpty());
 }
@@ -148,7 +148,7 @@ TEST(Process, AFirstWordThatCannotBeExecutedIsRefused) {
     EXPECT_THAT(traces.errors(),
                 ElementsAre("Unable to execute command: /no/such/program",
                             "Unable to execute command: " + plain, "Unable to execute command: "));
-    EXPECT_EQ(before, child_role::openDescriptors());
+    EXPECT_EQ(child_role::openDescriptors(), before);
     EXPECT_TRUE(noChildIsLeft());
 }
 
@@ -167,7 +167,7 @@ TEST(Process, AChildThatCannotExecuteEndsWithStatusZero) {
         ASSERT_TRUE(process.start());
         int exitCode = -1;
         EXPECT_TRUE(process.wait(&exitCode));
-        EXPECT_EQ(0, exitCode);
+        EXPECT_EQ(exitCode, 0);
         EXPECT_THAT(traces.errors(), ElementsAre("Unable to launch the executable, rc=-1"));
     }
 }
@@ -175,7 +175,7 @@ TEST(Process, AChildThatCannotExecuteEndsWithStatusZero) {
 TEST(Process, AScriptWithoutAnInterpreterLineRuns) {
     const ScratchDir scratch;
     const std::string script = scratch.write("script", "echo \"$0\" \"$1\" \"$2\"\n", 0755);
-    EXPECT_EQ(script + " a b c\n", outputOf(script + " a 'b c'"));
+    EXPECT_EQ(outputOf(script + " a 'b c'"), script + " a b c\n");
 }
 
 TEST(Process, ANameWithoutSlashIsExecutedFromTheChildsOwnPath) {
@@ -184,10 +184,10 @@ TEST(Process, ANameWithoutSlashIsExecutedFromTheChildsOwnPath) {
     scratch.script("here", "echo from the directory\n");
     const std::string path = "PATH=/no/such/directory:" + scratch.path("bin");
     char* const before = ::get_current_dir_name();
-    ASSERT_EQ(0, ::chdir(scratch.path().c_str()));
-    EXPECT_EQ("from the path\n", outputOf("here", {path.c_str()}));
-    EXPECT_EQ("from the directory\n", outputOf("here", {"PATH=/no/such/directory:"}));
-    ASSERT_EQ(0, ::chdir(before));
+    ASSERT_EQ(::chdir(scratch.path().c_str()), 0);
+    EXPECT_EQ(outputOf("here", {path.c_str()}), "from the path\n");
+    EXPECT_EQ(outputOf("here", {"PATH=/no/such/directory:"}), "from the directory\n");
+    ASSERT_EQ(::chdir(before), 0);
     std::free(before);
 }
 
@@ -195,13 +195,14 @@ TEST(ProcessEnvironment, EntriesReplaceAndAdd) {
     ::setenv("ZAV_TEST_KEPT", "kept", 1);
     ::setenv("ZAV_TEST_REPLACED", "old", 1);
     ::setenv("ZAV_TEST_REMOVED", "there", 1);
-    EXPECT_EQ("kept new - added=x\n", outputOf("/bin/sh -c 'echo $ZAV_TEST_KEPT $ZAV_TEST_REPLACED "
-                                               "${ZAV_TEST_REMOVED--} $ZAV_TEST_ADDED'",
-                                               {"ZAV_TEST_REPLACED=first", "ZAV_TEST_REPLACED=new",
-                                                "ZAV_TEST_REMOVED", "ZAV_TEST_ADDED=added=x", ""}));
-    EXPECT_STREQ("old", std::getenv("ZAV_TEST_REPLACED"));
-    EXPECT_STREQ("there", std::getenv("ZAV_TEST_REMOVED"));
-    EXPECT_EQ(nullptr, std::getenv("ZAV_TEST_ADDED"));
+    EXPECT_EQ(outputOf("/bin/sh -c 'echo $ZAV_TEST_KEPT $ZAV_TEST_REPLACED "
+                       "${ZAV_TEST_REMOVED--} $ZAV_TEST_ADDED'",
+                       {"ZAV_TEST_REPLACED=first", "ZAV_TEST_REPLACED=new", "ZAV_TEST_REMOVED",
+                        "ZAV_TEST_ADDED=added=x", ""}),
+              "kept new - added=x\n");
+    EXPECT_STREQ(std::getenv("ZAV_TEST_REPLACED"), "old");
+    EXPECT_STREQ(std::getenv("ZAV_TEST_REMOVED"), "there");
+    EXPECT_EQ(std::getenv("ZAV_TEST_ADDED"), nullptr);
 }
 
 TEST(ProcessEnvironment, TheCallersListMayGoAfterConstruction) {
@@ -210,7 +211,7 @@ TEST(ProcessEnvironment, TheCallersListMayGoAfterConstruction) {
     Process process(String("/bin/sh -c 'echo $ZAV_TEST_COPIED'"), env);
     entry = "ZAV_TEST_COPIED=other";
     env[0] = nullptr;
-    EXPECT_EQ("value\n", outputOf(process));
+    EXPECT_EQ(outputOf(process), "value\n");
 }
 
 TEST(ProcessTracing, AChildTracesIntoALogOfItsOwn) {
@@ -227,12 +228,12 @@ TEST(ProcessTracing, AChildTracesIntoALogOfItsOwn) {
     const std::string beginning = home.path() + "/logs/zavproc_ras1_";
     EXPECT_EQ(beginning, log.substr(0, beginning.size()));
     const std::string path = log.substr(0, log.size() - 1);
-    EXPECT_EQ(1, traces.count('D', "Sending child process RAS1 tracing to " + path));
+    EXPECT_EQ(traces.count('D', "Sending child process RAS1 tracing to " + path), 1);
     int kept = 0;
     for (int i = 0; i < 10; ++i) {
         kept += home.exists("logs/zavproc_ras1_" + std::to_string(i) + ".log") ? 1 : 0;
     }
-    EXPECT_EQ(9, kept);
+    EXPECT_EQ(kept, 9);
     const long stamp = std::atol(path.c_str() + beginning.size());
     EXPECT_NEAR(static_cast<double>(::time(nullptr)), static_cast<double>(stamp), 5.0);
 }
@@ -242,12 +243,12 @@ TEST(ProcessTracing, WithoutAHomeTheChildsLogIsSwitchedOff) {
     ::setenv("KBB_RAS1", "ERROR", 1);
     ::setenv("KBB_RAS1_LOG", "/somewhere", 1);
     TraceCapture traces;
-    EXPECT_EQ("[]\n", outputOf("/bin/sh -c 'echo [${KBB_RAS1_LOG-unset}]'"));
+    EXPECT_EQ(outputOf("/bin/sh -c 'echo [${KBB_RAS1_LOG-unset}]'"), "[]\n");
     ::unsetenv("KBB_RAS1");
-    EXPECT_EQ(1, traces.count('E', "Disabling RAS1 for child process"));
-    EXPECT_EQ("[/somewhere]\n", outputOf("/bin/sh -c 'echo [${KBB_RAS1_LOG-unset}]'"));
+    EXPECT_EQ(traces.count('E', "Disabling RAS1 for child process"), 1);
+    EXPECT_EQ(outputOf("/bin/sh -c 'echo [${KBB_RAS1_LOG-unset}]'"), "[/somewhere]\n");
     ::setenv("KBB_RAS1", "", 1);
-    EXPECT_EQ("[/somewhere]\n", outputOf("/bin/sh -c 'echo [${KBB_RAS1_LOG-unset}]'"));
+    EXPECT_EQ(outputOf("/bin/sh -c 'echo [${KBB_RAS1_LOG-unset}]'"), "[/somewhere]\n");
     ::unsetenv("KBB_RAS1");
     ::unsetenv("KBB_RAS1_LOG");
 }
@@ -258,7 +259,7 @@ TEST(ProcessDescriptors, AChildHoldsItsStandardStreamsOnly) {
     std::set<int> expected = child_role::openDescriptors(true);
     expected.insert({0, 1, 2});
     const std::vector<int> found = numbersIn(roleOutput("descriptors"));
-    EXPECT_EQ(expected, std::set<int>(found.begin(), found.end()));
+    EXPECT_EQ(std::set<int>(found.begin(), found.end()), expected);
     other.killUnlessEnded();
 }
 
@@ -266,7 +267,7 @@ TEST(ProcessDescriptors, ARunLeavesNoneBehind) {
     const auto before = child_role::openDescriptors();
     for (int i = 0; i < 20; ++i)
         outputOf("/bin/true");
-    EXPECT_EQ(before, child_role::openDescriptors());
+    EXPECT_EQ(child_role::openDescriptors(), before);
     EXPECT_TRUE(noChildIsLeft());
 }
 
@@ -296,9 +297,9 @@ TEST(ProcessDescriptors, TheHostsOwnStandardStreamsMayBeClosed) {
         ::dup2(saved[static_cast<std::size_t>(fd)], fd);
         ::close(saved[static_cast<std::size_t>(fd)]);
     }
-    EXPECT_EQ("spoken", heard);
-    EXPECT_EQ("complaint\n", complained);
-    EXPECT_EQ(4, exitCode);
+    EXPECT_EQ(heard, "spoken");
+    EXPECT_EQ(complained, "complaint\n");
+    EXPECT_EQ(exitCode, 4);
     EXPECT_THAT(stayedClosed, ElementsAre(true, true, true));
 }
 
@@ -307,12 +308,12 @@ TEST(ProcessDescriptors, MoreThanAThousandMayBeOpen) {
     ::getrlimit(RLIMIT_NOFILE, &before);
     rlimit wanted = before;
     wanted.rlim_cur = std::min<rlim_t>(4096, before.rlim_max);
-    ASSERT_EQ(0, ::setrlimit(RLIMIT_NOFILE, &wanted));
+    ASSERT_EQ(::setrlimit(RLIMIT_NOFILE, &wanted), 0);
     std::vector<FileDescriptor> open;
     for (int i = 0; i < 1100; ++i)
         open.push_back(openFile("/dev/null", O_RDONLY));
     ASSERT_GT(open.back().get(), 1024);
-    EXPECT_EQ("there\n", outputOf("/bin/echo there"));
+    EXPECT_EQ(outputOf("/bin/echo there"), "there\n");
     open.clear();
     ::setrlimit(RLIMIT_NOFILE, &before);
 }
@@ -329,14 +330,14 @@ TEST(ProcessSignals, AChildStartsWithDefaultDispositionsAndAnEmptyMask) {
     sigset_t before;
     ::pthread_sigmask(SIG_BLOCK, &blocked, &before);
 
-    EXPECT_EQ("", roleOutput("signals"));
+    EXPECT_EQ(roleOutput("signals"), "");
 
     sigset_t after;
     ::pthread_sigmask(SIG_SETMASK, &before, &after);
-    EXPECT_EQ(1, ::sigismember(&after, SIGTERM));
-    EXPECT_EQ(0, ::sigismember(&after, SIGINT));
-    EXPECT_EQ(SIG_IGN, ::signal(SIGPIPE, oldPipe));
-    EXPECT_EQ(SIG_IGN, ::signal(SIGINT, oldInt));
+    EXPECT_EQ(::sigismember(&after, SIGTERM), 1);
+    EXPECT_EQ(::sigismember(&after, SIGINT), 0);
+    EXPECT_EQ(::signal(SIGPIPE, oldPipe), SIG_IGN);
+    EXPECT_EQ(::signal(SIGINT, oldInt), SIG_IGN);
     EXPECT_EQ(+handler, ::signal(SIGUSR1, oldUsr));
 }
 
@@ -349,7 +350,7 @@ TEST(ProcessWait, KillsAChildThatRunsPastTheTimeout) {
     int exitCode = -1;
     EXPECT_FALSE(process.wait(&exitCode));
     EXPECT_GT(watch.seconds(), 0.9);
-    EXPECT_EQ(0, exitCode);
+    EXPECT_EQ(exitCode, 0);
     const std::string waiting = "Waiting for process id: ";
     const std::string pid = traces.details("zavprnix").at(0).substr(waiting.size());
     EXPECT_THAT(traces.errors(),
@@ -370,7 +371,7 @@ TEST(ProcessWait, WithoutTimeTheFirstLookDecides) {
     awaitEndOfSomeChild();
     int exitCode = -1;
     EXPECT_TRUE(ended.wait(&exitCode));
-    EXPECT_EQ(3, exitCode);
+    EXPECT_EQ(exitCode, 3);
 }
 
 TEST(ProcessWait, AChildThatLeadsAGroupTakesItAlong) {
@@ -400,7 +401,7 @@ TEST(ProcessWait, AKilledChildHasNoExitStatus) {
     ASSERT_TRUE(process.start());
     int exitCode = -1;
     EXPECT_TRUE(process.wait(&exitCode));
-    EXPECT_EQ(0, exitCode);
+    EXPECT_EQ(exitCode, 0);
 }
 
 TEST(ProcessWait, AHostThatReapsByItselfDoesNotHang) {
@@ -410,7 +411,7 @@ TEST(ProcessWait, AHostThatReapsByItselfDoesNotHang) {
     ASSERT_TRUE(process.start());
     int exitCode = -1;
     EXPECT_TRUE(process.wait(&exitCode));
-    EXPECT_EQ(0, exitCode);
+    EXPECT_EQ(exitCode, 0);
     EXPECT_THAT(traces.errors(), ElementsAre("Error occurred. ERRNO:10 No child processes"));
     ::signal(SIGCHLD, before);
 }
@@ -430,7 +431,7 @@ TEST(ProcessWait, LeavesOtherChildrenAlone) {
     outputOf("/bin/true");
     int status = 0;
     EXPECT_EQ(other, ::waitpid(other, &status, 0));
-    EXPECT_EQ(9, WEXITSTATUS(status));
+    EXPECT_EQ(WEXITSTATUS(status), 9);
 }
 
 TEST(ProcessDestruction, NeitherEndsTheChildNorWaitsForIt) {
@@ -459,18 +460,18 @@ TEST(ProcessDestruction, AChildThatNobodyWaitedForIsReapedLater) {
 
 TEST(ProcTerminateThread, StoresTheStatusAndSignals) {
     ProcessData data;
-    ASSERT_EQ(0, ::pthread_mutex_init(&data.mutex, nullptr));
-    ASSERT_EQ(0, ::pthread_cond_init(&data.waitCond, nullptr));
+    ASSERT_EQ(::pthread_mutex_init(&data.mutex, nullptr), 0);
+    ASSERT_EQ(::pthread_cond_init(&data.waitCond, nullptr), 0);
     data.pid = ::fork();
     if (data.pid == 0) ::_exit(6);
 
     TraceCapture traces;
     pthread_t thread;
-    ASSERT_EQ(0, ::pthread_create(&thread, nullptr, &ProcTerminateThreadFunc, &data));
+    ASSERT_EQ(::pthread_create(&thread, nullptr, &ProcTerminateThreadFunc, &data), 0);
     ::pthread_mutex_lock(&data.mutex);
     while (!data.exited)
         ::pthread_cond_wait(&data.waitCond, &data.mutex);
-    EXPECT_EQ(6, data.exitStatus);
+    EXPECT_EQ(data.exitStatus, 6);
     ::pthread_mutex_unlock(&data.mutex);
     ::pthread_join(thread, nullptr);
 

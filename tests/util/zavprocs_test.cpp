@@ -31,7 +31,7 @@ std::vector<std::string> split(const char* text) {
         result.emplace_back(arguments[i]);
         std::free(arguments[i]);
     }
-    EXPECT_EQ(nullptr, arguments[count]);
+    EXPECT_EQ(arguments[count], nullptr);
     std::free(arguments);
     return result;
 }
@@ -43,7 +43,7 @@ struct TwoEnds {
 
 TwoEnds makePipe() {
     int ends[2];
-    EXPECT_EQ(0, ::pipe2(ends, O_CLOEXEC));
+    EXPECT_EQ(::pipe2(ends, O_CLOEXEC), 0);
     return {FileDescriptor(ends[0]), FileDescriptor(ends[1])};
 }
 
@@ -104,9 +104,9 @@ TEST(MakeArgv, RefusesMissingArguments) {
     char** arguments = nullptr;
     const String command("a");
     errno = 0;
-    EXPECT_EQ(255, MakeArgv(nullptr, &arguments));
-    EXPECT_EQ(EINVAL, errno);
-    EXPECT_EQ(255, MakeArgv(&command, nullptr));
+    EXPECT_EQ(MakeArgv(nullptr, &arguments), 255);
+    EXPECT_EQ(errno, EINVAL);
+    EXPECT_EQ(MakeArgv(&command, nullptr), 255);
     EXPECT_THAT(traces.errors("zavprocs"),
                 ElementsAre("Error occurred. ERRNO:22 Invalid argument",
                             "Error occurred. ERRNO:22 Invalid argument"));
@@ -117,8 +117,9 @@ TEST(UserToken, IsTheCallersOwnByDefault) {
     const auto own = token(nullptr, nullptr);
     EXPECT_EQ(::getuid(), own->uid);
     EXPECT_EQ(::getgid(), own->gid);
-    EXPECT_EQ(1, traces.count('D', "User: (null) UID: " + std::to_string(::getuid()) +
-                                       " Group: (null) GID: " + std::to_string(::getgid())));
+    EXPECT_EQ(traces.count('D', "User: (null) UID: " + std::to_string(::getuid()) +
+                                    " Group: (null) GID: " + std::to_string(::getgid())),
+              1);
 }
 
 TEST(UserToken, LooksNamesUp) {
@@ -126,14 +127,15 @@ TEST(UserToken, LooksNamesUp) {
     const auto daemon = token("daemon", "sys");
     EXPECT_EQ(::getpwnam("daemon")->pw_uid, daemon->uid);
     EXPECT_EQ(::getgrnam("sys")->gr_gid, daemon->gid);
-    EXPECT_EQ(1, traces.count('D', "User: daemon UID: " + std::to_string(daemon->uid) +
-                                       " Group: sys GID: " + std::to_string(daemon->gid)));
+    EXPECT_EQ(traces.count('D', "User: daemon UID: " + std::to_string(daemon->uid) +
+                                    " Group: sys GID: " + std::to_string(daemon->gid)),
+              1);
 }
 
 TEST(UserToken, AnUnknownUserIsNobody) {
     const passwd* const nobody = ::getpwnam("nobody");
     const std::uint32_t expected = nobody != nullptr ? nobody->pw_uid : 65533;
-    EXPECT_EQ(expected, token("no-such-user-here", nullptr)->uid);
+    EXPECT_EQ(token("no-such-user-here", nullptr)->uid, expected);
 }
 
 TEST(UserToken, AnUnknownGroupIsTheUsersOwnOnlyWhereAGroupNobodyExists) {
@@ -141,12 +143,12 @@ TEST(UserToken, AnUnknownGroupIsTheUsersOwnOnlyWhereAGroupNobodyExists) {
     const std::uint32_t primary = ::getpwnam("daemon")->pw_gid;
     EXPECT_EQ(hasNobody ? primary : 65533u, token("daemon", "no-such-group-here")->gid);
     // Without a user there is no entry that has a group.
-    EXPECT_EQ(65533u, token(nullptr, "no-such-group-here")->gid);
+    EXPECT_EQ(token(nullptr, "no-such-group-here")->gid, 65533u);
 }
 
 TEST(ErrorMessage, HasNumberAndText) {
     const std::unique_ptr<char, decltype(&std::free)> message(getErrorMsg(ENOENT), &std::free);
-    EXPECT_STREQ("Error occurred: ERRNO:2 No such file or directory", message.get());
+    EXPECT_STREQ(message.get(), "Error occurred: ERRNO:2 No such file or directory");
 }
 
 TEST(PruneLogs, ElevenLogsLoseOnlyTheOldest) {
@@ -155,14 +157,14 @@ TEST(PruneLogs, ElevenLogsLoseOnlyTheOldest) {
     for (int i = 0; i < 11; ++i) {
         const std::string path = home.write("logs/zavproc_ras1_" + std::to_string(i) + ".log", "x");
         const timespec times[2] = {{5000 + (i + 4) % 11, 0}, {5000 + (i + 4) % 11, 0}};
-        ASSERT_EQ(0, ::utimensat(AT_FDCWD, path.c_str(), times, 0));
+        ASSERT_EQ(::utimensat(AT_FDCWD, path.c_str(), times, 0), 0);
     }
     pruneLogs(home.path("logs").c_str(), "zavproc_ras1", 10);
     for (int i = 0; i < 11; ++i) {
         const bool isOldest = i == 7;
         EXPECT_NE(isOldest, home.exists("logs/zavproc_ras1_" + std::to_string(i) + ".log")) << i;
     }
-    EXPECT_EQ(1, traces.count('D', "deleting file: " + home.path("logs/zavproc_ras1_7.log")));
+    EXPECT_EQ(traces.count('D', "deleting file: " + home.path("logs/zavproc_ras1_7.log")), 1);
     EXPECT_THAT(traces.errors(), IsEmpty());
 }
 
@@ -185,20 +187,20 @@ TEST(PruneLogs, OfSeveralOldestLogsTheFirstListedGoes) {
     const ScratchDir home;
     for (const char* name : {"a_1", "a_2", "a_3"}) {
         const timespec times[2] = {{5000, 0}, {5000, 0}};
-        ASSERT_EQ(0, ::utimensat(AT_FDCWD, home.write(name, "").c_str(), times, 0));
+        ASSERT_EQ(::utimensat(AT_FDCWD, home.write(name, "").c_str(), times, 0), 0);
     }
     FSI1_LIST* list = nullptr;
-    ASSERT_EQ(FSI1_OK, FSI1_NewList(home.path().c_str(), &list));
+    ASSERT_EQ(FSI1_NewList(home.path().c_str(), &list), FSI1_OK);
     std::vector<std::string> paths;
     FSI1_ENTRY entry;
     while (FSI1_FetchList(list, &entry) == FSI1_OK)
         paths.emplace_back(entry.path);
     FSI1_DeleteList(list);
-    ASSERT_EQ(3u, paths.size());
+    ASSERT_EQ(paths.size(), 3u);
     pruneLogs(home.path().c_str(), "a_", 3);
-    EXPECT_NE(0, ::access(paths[0].c_str(), F_OK));
-    EXPECT_EQ(0, ::access(paths[1].c_str(), F_OK));
-    EXPECT_EQ(0, ::access(paths[2].c_str(), F_OK));
+    EXPECT_NE(::access(paths[0].c_str(), F_OK), 0);
+    EXPECT_EQ(::access(paths[1].c_str(), F_OK), 0);
+    EXPECT_EQ(::access(paths[2].c_str(), F_OK), 0);
 }
 
 TEST(PruneLogs, AMissingDirectoryIsTraced) {
@@ -209,24 +211,25 @@ TEST(PruneLogs, AMissingDirectoryIsTraced) {
 
 TEST(InputStream, ReadsBytesAndBlocksUpToTheEnd) {
     auto [readEnd, writeEnd] = makePipe();
-    ASSERT_EQ(5, ::write(writeEnd.get(),
-                         "\xff"
-                         "abcd",
-                         5));
+    ASSERT_EQ(::write(writeEnd.get(),
+                      "\xff"
+                      "abcd",
+                      5),
+              5);
     writeEnd.close();
     ProcessInputStream stream;
     stream.attach(std::move(readEnd));
-    EXPECT_EQ(255, stream.read());
+    EXPECT_EQ(stream.read(), 255);
     char buffer[8] = "";
-    EXPECT_EQ(3, stream.read(buffer, 3));
-    EXPECT_STREQ("abc", buffer);
-    EXPECT_EQ(1, stream.read(buffer, 8));
-    EXPECT_EQ(0, stream.read(buffer, 8));
-    EXPECT_EQ(-1, stream.read());
+    EXPECT_EQ(stream.read(buffer, 3), 3);
+    EXPECT_STREQ(buffer, "abc");
+    EXPECT_EQ(stream.read(buffer, 8), 1);
+    EXPECT_EQ(stream.read(buffer, 8), 0);
+    EXPECT_EQ(stream.read(), -1);
     EXPECT_TRUE(stream.close());
     EXPECT_FALSE(stream.close());
-    EXPECT_EQ(-1, stream.read(buffer, 8));
-    EXPECT_EQ(-1, stream.setNonBlocking(true));
+    EXPECT_EQ(stream.read(buffer, 8), -1);
+    EXPECT_EQ(stream.setNonBlocking(true), -1);
 }
 
 TEST(InputStream, NonBlockingModeDoesNotWait) {
@@ -234,13 +237,13 @@ TEST(InputStream, NonBlockingModeDoesNotWait) {
     ProcessInputStream stream;
     stream.attach(std::move(readEnd));
     EXPECT_FALSE(stream.isNonBlocking());
-    EXPECT_EQ(0, stream.setNonBlocking(true));
+    EXPECT_EQ(stream.setNonBlocking(true), 0);
     EXPECT_TRUE(stream.isNonBlocking());
     char byte;
-    EXPECT_EQ(-1, stream.read(&byte, 1));
-    EXPECT_EQ(EAGAIN, errno);
-    EXPECT_EQ(0, stream.setNonBlocking(false));
-    EXPECT_EQ(0, ::fcntl(stream.descriptor(), F_GETFL) & O_NONBLOCK);
+    EXPECT_EQ(stream.read(&byte, 1), -1);
+    EXPECT_EQ(errno, EAGAIN);
+    EXPECT_EQ(stream.setNonBlocking(false), 0);
+    EXPECT_EQ(::fcntl(stream.descriptor(), F_GETFL) & O_NONBLOCK, 0);
 }
 
 TEST(OutputStream, WritesEverything) {
@@ -250,7 +253,7 @@ TEST(OutputStream, WritesEverything) {
     EXPECT_TRUE(stream.write("abc", 3));
     EXPECT_TRUE(stream.write("", 0));
     char buffer[8];
-    EXPECT_EQ(3, ::read(readEnd.get(), buffer, sizeof buffer));
+    EXPECT_EQ(::read(readEnd.get(), buffer, sizeof buffer), 3);
     EXPECT_TRUE(stream.close());
     EXPECT_FALSE(stream.close());
     EXPECT_FALSE(stream.write("abc", 3));
@@ -262,13 +265,13 @@ TEST(OutputStream, AVanishedReaderCostsNoSignal) {
     ProcessOutputStream stream;
     stream.attach(std::move(writeEnd));
     EXPECT_FALSE(stream.write("abc", 3));
-    EXPECT_EQ(EPIPE, errno);
+    EXPECT_EQ(errno, EPIPE);
     sigset_t pending;
     ::sigpending(&pending);
-    EXPECT_EQ(0, ::sigismember(&pending, SIGPIPE));
+    EXPECT_EQ(::sigismember(&pending, SIGPIPE), 0);
     sigset_t blocked;
     ::pthread_sigmask(SIG_BLOCK, nullptr, &blocked);
-    EXPECT_EQ(0, ::sigismember(&blocked, SIGPIPE));
+    EXPECT_EQ(::sigismember(&blocked, SIGPIPE), 0);
 }
 
 TEST(OutputStream, ASignalThatWasPendingStaysPending) {
@@ -286,6 +289,6 @@ TEST(OutputStream, ASignalThatWasPendingStaysPending) {
     EXPECT_FALSE(stream.write("abc", 3));
 
     const timespec now{};
-    EXPECT_EQ(SIGPIPE, ::sigtimedwait(&sigpipe, nullptr, &now));
+    EXPECT_EQ(::sigtimedwait(&sigpipe, nullptr, &now), SIGPIPE);
     ::pthread_sigmask(SIG_SETMASK, &before, nullptr);
 }

@@ -19,13 +19,13 @@ TEST_F(Interface, RefusesOtherPaths) {
 TEST_F(Interface, RefusesOtherMethodsAndNamesTheRightOne) {
     const host::Reply query = ask("GET", "/v1/query");
     expectError(405, "/v1/query knows only the method POST", query);
-    EXPECT_EQ("POST", query.fields.at(0).second);
+    EXPECT_EQ(query.fields.at(0).second, "POST");
     for (const char* method : {"POST", "PUT", "DELETE", "get", "BREW"}) {
         const host::Reply reply = ask(method, "/v1/tables");
         expectError(405, "/v1/tables knows only the method GET", reply);
-        ASSERT_EQ(1U, reply.fields.size());
-        EXPECT_EQ("Allow", reply.fields[0].first);
-        EXPECT_EQ("GET, HEAD", reply.fields[0].second);
+        ASSERT_EQ(reply.fields.size(), 1U);
+        EXPECT_EQ(reply.fields[0].first, "Allow");
+        EXPECT_EQ(reply.fields[0].second, "GET, HEAD");
     }
 }
 
@@ -56,7 +56,7 @@ TEST_F(Interface, EventsTakeEveryOtherParameterAsEquality) {
     table.publish(plainRow("a", 5, ""));
     EXPECT_TRUE(source->empty());
     table.publish(plainRow("a b", 5, ""));
-    EXPECT_EQ("data: {\"NAME\":\"a b\",\"NUMBER\":5,\"TEXT\":\"\"}\n\n", source->take());
+    EXPECT_EQ(source->take(), "data: {\"NAME\":\"a b\",\"NUMBER\":5,\"TEXT\":\"\"}\n\n");
 }
 
 TEST_F(Interface, HealthSaysWhatThisHostIs) {
@@ -64,15 +64,16 @@ TEST_F(Interface, HealthSaysWhatThisHostIs) {
     services->counts.streams = 2;
     const std::string width = std::to_string(sizeof(void*) * 8);
     const std::string body = ask("GET", "/v1/health").body;
-    EXPECT_EQ(0U, body.find(R"({"version":")" ZAV_VERSION R"(","width":)" + width +
-                            R"(,"home":"/home/of/it","origin_node":"node","uptime_seconds":)"))
+    EXPECT_EQ(body.find(R"({"version":")" ZAV_VERSION R"(","width":)" + width +
+                        R"(,"home":"/home/of/it","origin_node":"node","uptime_seconds":)"),
+              0U)
         << body;
-    EXPECT_NE(std::string::npos, body.find(R"(,"subscriptions":2})")) << body;
+    EXPECT_NE(body.find(R"(,"subscriptions":2})"), std::string::npos) << body;
 }
 
 TEST_F(Interface, IsClosedToPeersWithoutAccess) {
     for (const host::Route& route : api->router().routes()) {
-        EXPECT_EQ(403U, ask(route.method, route.path, "{}", Access::None).status) << route.path;
+        EXPECT_EQ(ask(route.method, route.path, "{}", Access::None).status, 403U) << route.path;
     }
 }
 

@@ -18,14 +18,15 @@ TEST_F(QueryEndpoint, HandsTheConditionsOnInTheirOrder) {
             seen += std::string(entry.columnName) + "=" + entry.value + ";";
         return static_cast<int>(OXA_OK);
     };
-    EXPECT_EQ("{\"rows\":[]}\n", post(R"({"table":"PLAIN","where":[]})").body);
-    EXPECT_EQ("", seen);
-    EXPECT_EQ(200U, post(R"({"table":"PLAIN","where":[)"
-                         R"({"column":"NAME","op":"=","value":"ux"},)"
-                         R"({"value":3,"op":"=","column":"NUMBER"},)"
-                         R"({"column":"NAME","op":"=","value":""}]})")
-                        .status);
-    EXPECT_EQ("NAME=ux;NUMBER=3;NAME=;", seen);
+    EXPECT_EQ(post(R"({"table":"PLAIN","where":[]})").body, "{\"rows\":[]}\n");
+    EXPECT_EQ(seen, "");
+    EXPECT_EQ(post(R"({"table":"PLAIN","where":[)"
+                   R"({"column":"NAME","op":"=","value":"ux"},)"
+                   R"({"value":3,"op":"=","column":"NUMBER"},)"
+                   R"({"column":"NAME","op":"=","value":""}]})")
+                  .status,
+              200U);
+    EXPECT_EQ(seen, "NAME=ux;NUMBER=3;NAME=;");
 }
 
 TEST_F(QueryEndpoint, RefusesUnknownTables) {
@@ -59,17 +60,17 @@ TEST_F(QueryEndpoint, RefusesWhatIsNotJson) {
           std::string("{\"table\":\"\\ud800\"}"), std::string("\0", 1), std::string("NaN"),
           std::string("{\"table\":1e999}")}) {
         const host::Reply reply = post(body);
-        EXPECT_EQ(400U, reply.status) << body;
-        EXPECT_EQ(0U, reply.body.find("{\"error\":\"the body is not JSON")) << reply.body;
+        EXPECT_EQ(reply.status, 400U) << body;
+        EXPECT_EQ(reply.body.find("{\"error\":\"the body is not JSON"), 0U) << reply.body;
     }
 }
 
 TEST_F(QueryEndpoint, RefusesEveryTruncatedBody) {
     const std::string whole =
         R"({"table":"PLAIN","where":[{"column":"NAME","op":"=","value":"ux"}]})";
-    EXPECT_EQ(200U, post(whole).status);
+    EXPECT_EQ(post(whole).status, 200U);
     for (std::size_t length = 0; length < whole.size(); ++length)
-        EXPECT_EQ(400U, post(whole.substr(0, length)).status) << length;
+        EXPECT_EQ(post(whole.substr(0, length)).status, 400U) << length;
 }
 
 TEST_F(QueryEndpoint, RefusesDeepNestingBeforeItIsBuilt) {
@@ -105,11 +106,11 @@ TEST_F(QueryEndpoint, LetsReadersQueryAllTablesButTheOneThatActs) {
     const auto query = [&](const char* name, host::Access access) {
         return ask("POST", "/v1/query", R"({"table":")" + std::string(name) + "\"}", access).status;
     };
-    EXPECT_EQ(200U, query("PLAIN", host::Access::Read));
-    EXPECT_EQ(403U, query("KAGREQT", host::Access::Read));
-    EXPECT_EQ(0, samples);
-    EXPECT_EQ(200U, query("KAGREQT", host::Access::Act));
-    EXPECT_EQ(1, samples);
+    EXPECT_EQ(query("PLAIN", host::Access::Read), 200U);
+    EXPECT_EQ(query("KAGREQT", host::Access::Read), 403U);
+    EXPECT_EQ(samples, 0);
+    EXPECT_EQ(query("KAGREQT", host::Access::Act), 200U);
+    EXPECT_EQ(samples, 1);
 }
 
 }  // namespace

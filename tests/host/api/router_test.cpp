@@ -84,15 +84,15 @@ protected:
 };
 
 TEST_F(Routes, AreFoundByMethodAndPath) {
-    EXPECT_EQ("GET /v1/tasks state=queued", found("GET", "/v1/tasks?state=queued"));
-    EXPECT_EQ("POST /v1/tasks", found("POST", "/v1/tasks"));
-    EXPECT_EQ("POST /v1/tasks/{id}/cancel id=7", found("POST", "/v1/tasks/7/cancel"));
-    EXPECT_EQ("DELETE /v1/tasks/{id} id=7", found("DELETE", "/v1/tasks/7"));
-    EXPECT_EQ("GET /v1/tasks/{id} id=7", found("HEAD", "/v1/tasks/7"));
+    EXPECT_EQ(found("GET", "/v1/tasks?state=queued"), "GET /v1/tasks state=queued");
+    EXPECT_EQ(found("POST", "/v1/tasks"), "POST /v1/tasks");
+    EXPECT_EQ(found("POST", "/v1/tasks/7/cancel"), "POST /v1/tasks/{id}/cancel id=7");
+    EXPECT_EQ(found("DELETE", "/v1/tasks/7"), "DELETE /v1/tasks/{id} id=7");
+    EXPECT_EQ(found("HEAD", "/v1/tasks/7"), "GET /v1/tasks/{id} id=7");
 }
 
 TEST_F(Routes, TakeOneSegmentPerParameterOfThePath) {
-    EXPECT_EQ("GET /v1/tasks/{id} id=a b/c", found("GET", "/v1/tasks/a%20b%2Fc"));
+    EXPECT_EQ(found("GET", "/v1/tasks/a%20b%2Fc"), "GET /v1/tasks/{id} id=a b/c");
     EXPECT_EQ(error("404", "there is nothing at /v1/tasks/a/b"), found("GET", "/v1/tasks/a/b"));
     EXPECT_EQ(error("404", "there is nothing at /v1/tasks/"), found("GET", "/v1/tasks/"));
     EXPECT_EQ(error("404", "there is nothing at /v1"), found("GET", "/v1"));
@@ -101,7 +101,7 @@ TEST_F(Routes, TakeOneSegmentPerParameterOfThePath) {
 }
 
 TEST_F(Routes, WithAParameterOfAnotherTypeAreNotThere) {
-    EXPECT_EQ("GET /v1/pages/{number} number=12", found("GET", "/v1/pages/12"));
+    EXPECT_EQ(found("GET", "/v1/pages/12"), "GET /v1/pages/{number} number=12");
     EXPECT_EQ(error("404", "there is nothing at /v1/pages/x"), found("GET", "/v1/pages/x"));
     EXPECT_EQ(error("404", "there is nothing at /v1/pages/-1"), found("GET", "/v1/pages/-1"));
 }
@@ -110,19 +110,19 @@ TEST_F(Routes, WithOtherMethodsNameThoseThereAre) {
     EXPECT_EQ(error("405", "/v1/tasks/7/cancel knows only the method POST"),
               found("GET", "/v1/tasks/7/cancel"));
     EXPECT_EQ(error("405", "/v1/tasks/7 knows only GET and DELETE"), found("PUT", "/v1/tasks/7"));
-    EXPECT_EQ("GET, HEAD, DELETE", allow("PUT", "/v1/tasks/7"));
-    EXPECT_EQ("POST", allow("HEAD", "/v1/tasks/7/cancel"));
+    EXPECT_EQ(allow("PUT", "/v1/tasks/7"), "GET, HEAD, DELETE");
+    EXPECT_EQ(allow("HEAD", "/v1/tasks/7/cancel"), "POST");
 }
 
 TEST_F(Routes, AnswerOptionsWithTheirMethods) {
-    EXPECT_EQ("204 ", found("OPTIONS", "/v1/tasks?anything=1"));
-    EXPECT_EQ("GET, HEAD, POST", allow("OPTIONS", "/v1/tasks"));
+    EXPECT_EQ(found("OPTIONS", "/v1/tasks?anything=1"), "204 ");
+    EXPECT_EQ(allow("OPTIONS", "/v1/tasks"), "GET, HEAD, POST");
     EXPECT_EQ(error("404", "there is nothing at *"), found("OPTIONS", "*"));
 }
 
 TEST_F(Routes, CheckTheTypesOfTheirParameters) {
-    EXPECT_EQ("GET /v1/tasks state=a limit=5 follow=1",
-              found("GET", "/v1/tasks?state=a&limit=5&follow=1"));
+    EXPECT_EQ(found("GET", "/v1/tasks?state=a&limit=5&follow=1"),
+              "GET /v1/tasks state=a limit=5 follow=1");
     for (const char* limit : {"", "x", "-1", "+1", "1.0", " 1", "1234567890123456789"}) {
         EXPECT_EQ(error("400", "the parameter \\\"limit\\\" is not a whole number"),
                   found("GET", "/v1/tasks?state=a&limit=" + std::string(limit)));
@@ -142,7 +142,7 @@ TEST_F(Routes, AreClosedToThoseWhoMayNotUseThem) {
     const std::string refused = error("403", "you may only read from this host");
     EXPECT_EQ(refused, found("DELETE", "/v1/tasks/7", Access::Read));
     EXPECT_EQ(refused, found("POST", "/v1/tasks?odd=1", Access::Read)) << "before anything else";
-    EXPECT_EQ("GET /v1/tasks/{id} id=7", found("GET", "/v1/tasks/7", Access::Read));
+    EXPECT_EQ(found("GET", "/v1/tasks/7", Access::Read), "GET /v1/tasks/{id} id=7");
 }
 
 TEST(RouteTable, ThatContradictsItselfIsRefused) {
@@ -171,24 +171,24 @@ protected:
 
 TEST_F(Calls, GiveParametersByName) {
     const Call given = call("GET", "/v1/tasks?limit=12&state=&follow=1");
-    EXPECT_EQ("", given.required("state"));
-    EXPECT_EQ(12, given.number("limit", 5));
+    EXPECT_EQ(given.required("state"), "");
+    EXPECT_EQ(given.number("limit", 5), 12);
     EXPECT_TRUE(given.flag("follow"));
     const Call left = call("GET", "/v1/tasks?state=x&follow=0");
-    EXPECT_EQ(5, left.number("limit", 5));
-    EXPECT_EQ(nullptr, left.text("limit"));
+    EXPECT_EQ(left.number("limit", 5), 5);
+    EXPECT_EQ(left.text("limit"), nullptr);
     EXPECT_FALSE(left.flag("follow"));
-    EXPECT_EQ("a", call("GET", "/v1/tasks/a").required("id"));
+    EXPECT_EQ(call("GET", "/v1/tasks/a").required("id"), "a");
 }
 
 TEST_F(Calls, CheckTheTypesOfTheBodysMembers) {
-    EXPECT_EQ("", refusal(R"({"name":"x","count":1.5,"once":true,"where":[],"more":{}})"));
-    EXPECT_EQ("\"count\" is not a number", refusal(R"({"name":"x","count":"1"})"));
-    EXPECT_EQ("\"once\" is not true or false", refusal(R"({"name":"x","once":1})"));
-    EXPECT_EQ("\"where\" is not an array", refusal(R"({"name":"x","where":{}})"));
-    EXPECT_EQ("\"more\" is not an object", refusal(R"({"name":"x","more":[]})"));
-    EXPECT_EQ("the body lacks \"name\"", refusal(R"({"count":1})"));
-    EXPECT_EQ("unknown member \"nome\" in the body", refusal(R"({"nome":"x"})"));
+    EXPECT_EQ(refusal(R"({"name":"x","count":1.5,"once":true,"where":[],"more":{}})"), "");
+    EXPECT_EQ(refusal(R"({"name":"x","count":"1"})"), "\"count\" is not a number");
+    EXPECT_EQ(refusal(R"({"name":"x","once":1})"), "\"once\" is not true or false");
+    EXPECT_EQ(refusal(R"({"name":"x","where":{}})"), "\"where\" is not an array");
+    EXPECT_EQ(refusal(R"({"name":"x","more":[]})"), "\"more\" is not an object");
+    EXPECT_EQ(refusal(R"({"count":1})"), "the body lacks \"name\"");
+    EXPECT_EQ(refusal(R"({"nome":"x"})"), "unknown member \"nome\" in the body");
 }
 
 TEST_F(Calls, IgnoreABodyThatTheRouteDoesNotDescribe) {

@@ -45,7 +45,7 @@ TEST_F(Page, ListsExactlyTheRoutesThatThereAre) {
     std::copy_if(lines.begin(), lines.end(), std::back_inserter(found), [](const auto& line) {
         return line.find(" /v1/") != std::string::npos && line.rfind("| `", 0) == 0;
     });
-    EXPECT_EQ(expected, found);
+    EXPECT_EQ(found, expected);
 }
 
 TEST_F(Page, DescribesEveryParameterAndEveryMember) {
@@ -71,7 +71,7 @@ TEST_F(Page, HasACommandForEveryRoute) {
 
 TEST(RouteRows, SayWhatTheyAreFor) {
     for (const Route& route : host::routes()) {
-        EXPECT_NE(nullptr, route.endpoint) << route.path;
+        EXPECT_NE(route.endpoint, nullptr) << route.path;
         EXPECT_NE(std::string(), route.doc) << route.path;
         for (const host::Parameter& parameter : route.parameters)
             EXPECT_NE(std::string(), parameter.doc) << parameter.name;

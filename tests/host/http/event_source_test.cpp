@@ -11,13 +11,13 @@ std::string text(const host::Event& event) {
 }
 
 TEST(EventText, HasOnlyTheFieldsThatAreGiven) {
-    EXPECT_EQ("data: {}\n\n", text({"{}", {}, {}}));
-    EXPECT_EQ("id: j-7\nevent: gap\ndata: {}\n\n", text({"{}", "gap", "j-7"}));
+    EXPECT_EQ(text({"{}", {}, {}}), "data: {}\n\n");
+    EXPECT_EQ(text({"{}", "gap", "j-7"}), "id: j-7\nevent: gap\ndata: {}\n\n");
 }
 
 TEST(EventText, HasOneFieldForEachLineOfItsData) {
-    EXPECT_EQ("data: a\ndata: \ndata: b\n\n", text({"a\n\nb", {}, {}}));
-    EXPECT_EQ("data: \n\n", text({"", {}, {}}));
+    EXPECT_EQ(text({"a\n\nb", {}, {}}), "data: a\ndata: \ndata: b\n\n");
+    EXPECT_EQ(text({"", {}, {}}), "data: \n\n");
 }
 
 }  // namespace

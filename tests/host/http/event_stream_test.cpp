@@ -25,13 +25,13 @@ TEST_F(Events, ComeAsOneServerSentEventPerRow) {
     RawClient client = connect();
     client.send("GET /v1/events?table=PLAIN HTTP/1.1\r\nHost: x\r\n\r\n");
     const std::string head = client.readUntil("\r\n\r\n");
-    EXPECT_NE(std::string::npos, head.find("Content-Type: text/event-stream\r\n"));
-    EXPECT_EQ(1U, table.liveObjects()) << "the subscription is live when the head has come";
-    EXPECT_EQ(OXA_OK, table.publish(plainRow("a", 1, "x")));
-    EXPECT_EQ(OXA_OK, table.publish(plainRow("b", -2, "line\nend")));
-    EXPECT_EQ("data: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"x\"}\n\n", client.readUntil("\n\n"));
-    EXPECT_EQ("data: {\"NAME\":\"b\",\"NUMBER\":-2,\"TEXT\":\"line\\nend\"}\n\n",
-              client.readUntil("\n\n"));
+    EXPECT_NE(head.find("Content-Type: text/event-stream\r\n"), std::string::npos);
+    EXPECT_EQ(table.liveObjects(), 1U) << "the subscription is live when the head has come";
+    EXPECT_EQ(table.publish(plainRow("a", 1, "x")), OXA_OK);
+    EXPECT_EQ(table.publish(plainRow("b", -2, "line\nend")), OXA_OK);
+    EXPECT_EQ(client.readUntil("\n\n"), "data: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"x\"}\n\n");
+    EXPECT_EQ(client.readUntil("\n\n"),
+              "data: {\"NAME\":\"b\",\"NUMBER\":-2,\"TEXT\":\"line\\nend\"}\n\n");
 }
 
 TEST_F(Events, AreThoseThatEveryParameterTakes) {
@@ -40,8 +40,8 @@ TEST_F(Events, AreThoseThatEveryParameterTakes) {
     table.publish(plainRow("x", 2, "other name"));
     table.publish(plainRow("x y", 1, "other number"));
     table.publish(plainRow("x y", 2, "this"));
-    EXPECT_EQ("data: {\"NAME\":\"x y\",\"NUMBER\":2,\"TEXT\":\"this\"}\n\n",
-              client.readUntil("\n\n"));
+    EXPECT_EQ(client.readUntil("\n\n"),
+              "data: {\"NAME\":\"x y\",\"NUMBER\":2,\"TEXT\":\"this\"}\n\n");
 }
 
 TEST_F(Events, ReachEverySubscriber) {
@@ -49,20 +49,20 @@ TEST_F(Events, ReachEverySubscriber) {
     std::vector<RawClient> clients;
     for (int i = 0; i < 50; ++i)
         clients.push_back(subscribe());
-    EXPECT_EQ("50", subscriptionsInHealth());
+    EXPECT_EQ(subscriptionsInHealth(), "50");
     table.publish(plainRow("all", 1, ""));
     for (RawClient& client : clients)
-        EXPECT_NE(std::string::npos, client.readUntil("\n\n").find("\"all\""));
+        EXPECT_NE(client.readUntil("\n\n").find("\"all\""), std::string::npos);
 }
 
 TEST_F(Events, StopWithTheClient) {
     start();
     RawClient client = subscribe();
-    EXPECT_EQ("1", subscriptionsInHealth());
+    EXPECT_EQ(subscriptionsInHealth(), "1");
     client.close();
     EXPECT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
-    EXPECT_EQ("0", subscriptionsInHealth());
-    EXPECT_EQ(OXA_OK, table.publish(plainRow("nobody", 1, "")));
+    EXPECT_EQ(subscriptionsInHealth(), "0");
+    EXPECT_EQ(table.publish(plainRow("nobody", 1, "")), OXA_OK);
 }
 
 TEST_F(Events, StopWithAClientThatLeftEverythingUnread) {
@@ -80,9 +80,9 @@ TEST_F(Events, StillReachAClientThatHasEndedItsSide) {
     RawClient client = subscribe();
     client.endSending();
     std::this_thread::sleep_for(milliseconds(50));
-    EXPECT_EQ(1U, table.liveObjects());
+    EXPECT_EQ(table.liveObjects(), 1U);
     table.publish(plainRow("still", 1, ""));
-    EXPECT_NE(std::string::npos, client.readUntil("\n\n").find("still"));
+    EXPECT_NE(client.readUntil("\n\n").find("still"), std::string::npos);
     client.close();
     EXPECT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
 }
@@ -105,7 +105,7 @@ TEST_F(Events, OfAThousandSubscribersThatComeAndGoLeaveNothingBehind) {
     }
     EXPECT_TRUE(eventually([&] { return table.liveObjects() == 0; }));
     EXPECT_TRUE(eventually([&] { return openDescriptors() == before; }));
-    EXPECT_EQ("0", subscriptionsInHealth());
+    EXPECT_EQ(subscriptionsInHealth(), "0");
 }
 
 /// NUMBER of a row's event, or how many an overflow event says were lost, as a negative number.
@@ -128,12 +128,12 @@ TEST_F(Events, ThatASlowReaderMissesAreCountedInTheirPlace) {
     for (int i = 0; i < 1000; ++i)
         table.publish(plainRow("row", published++, ""));
     table.publish(plainRow("mark", published++, ""));
-    EXPECT_NE(std::string::npos, quick.readUntil("\n\n").find("mark"));
+    EXPECT_NE(quick.readUntil("\n\n").find("mark"), std::string::npos);
 
     int position = 0, lost = 0;
     while (position < published) {
         const std::string event = slow.readUntil("\n\n");
-        ASSERT_NE("", event) << "after " << position << " of " << published;
+        ASSERT_NE(event, "") << "after " << position << " of " << published;
         const int number = numberOf(event);
         if (number < 0) {
             lost -= number;
@@ -145,7 +145,7 @@ TEST_F(Events, ThatASlowReaderMissesAreCountedInTheirPlace) {
     EXPECT_EQ(published, position);
     EXPECT_GT(lost, 0);
     table.publish(plainRow("row", 77, ""));
-    EXPECT_EQ(77, numberOf(slow.readUntil("\n\n"))) << "the stream goes on";
+    EXPECT_EQ(numberOf(slow.readUntil("\n\n")), 77) << "the stream goes on";
 }
 
 TEST_F(Events, AreFollowedByASignOfLifeWhenThereAreNone) {
@@ -153,28 +153,28 @@ TEST_F(Events, AreFollowedByASignOfLifeWhenThereAreNone) {
     limits.heartbeat = milliseconds(20);
     start(limits);
     RawClient client = subscribe();
-    EXPECT_EQ(":\n\n", client.readUntil("\n\n"));
-    EXPECT_EQ(":\n\n", client.readUntil("\n\n"));
+    EXPECT_EQ(client.readUntil("\n\n"), ":\n\n");
+    EXPECT_EQ(client.readUntil("\n\n"), ":\n\n");
     table.publish(plainRow("row", 1, ""));
     std::string event;
     while (event.empty() || event == ":\n\n")
         event = client.readUntil("\n\n");
-    EXPECT_EQ(0U, event.find("data: {\"NAME\":\"row\""));
+    EXPECT_EQ(event.find("data: {\"NAME\":\"row\""), 0U);
 }
 
 TEST_F(Events, OfTheOutcomeTableComeThroughOneSubscriptionHoweverManyFollow) {
     MadeUpTable outcomes("KAGDYST", plainColumns());
     outcomes.RegisterWithManager();
     start();
-    EXPECT_EQ(1U, outcomes.liveObjects());
+    EXPECT_EQ(outcomes.liveObjects(), 1U);
     std::vector<RawClient> clients;
     for (const char* rest : {"", "&NAME=a", "&NAME=b", "&NUMBER=2&NAME=b%20"}) {
         clients.push_back(connect());
         clients.back().send("GET /v1/events?table=KAGDYST" + std::string(rest) +
                             " HTTP/1.1\r\n\r\n");
-        EXPECT_NE(std::string::npos, clients.back().readUntil("\r\n\r\n").find("200"));
+        EXPECT_NE(clients.back().readUntil("\r\n\r\n").find("200"), std::string::npos);
     }
-    EXPECT_EQ(1U, outcomes.liveObjects());
+    EXPECT_EQ(outcomes.liveObjects(), 1U);
     outcomes.publish(plainRow("a", 1, "first"));
     outcomes.publish(plainRow("b", 2, "second"));
     const std::string first = "data: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"first\"}\n\n";
@@ -185,7 +185,7 @@ TEST_F(Events, OfTheOutcomeTableComeThroughOneSubscriptionHoweverManyFollow) {
     EXPECT_EQ(second, clients[2].readUntil("\n\n"));
     EXPECT_EQ(second, clients[3].readUntil("\n\n"));
     stop();
-    EXPECT_EQ(0U, outcomes.liveObjects());
+    EXPECT_EQ(outcomes.liveObjects(), 0U);
 }
 
 TEST_F(Events, NeverWaitForTheirReaders) {
@@ -195,7 +195,7 @@ TEST_F(Events, NeverWaitForTheirReaders) {
         asleep.push_back(subscribe());
     for (int i = 0; i < 2000; ++i)
         table.publish(plainRow("row", i, "filling text"));
-    EXPECT_EQ(200, connect().get("/v1/health").status);
+    EXPECT_EQ(connect().get("/v1/health").status, 200);
 }
 
 TEST_F(Events, OfManyPublishersAllArrive) {
@@ -216,7 +216,7 @@ TEST_F(Events, OfManyPublishersAllArrive) {
     }
     for (std::thread& publisher : publishers)
         publisher.join();
-    EXPECT_EQ(200, std::count(seen.begin(), seen.end(), true));
+    EXPECT_EQ(std::count(seen.begin(), seen.end(), true), 200);
 }
 
 }  // namespace

@@ -6,13 +6,13 @@ namespace {
 
 TEST(ErrorReply, IsValidJsonWhateverTheClientWrote) {
     const host::Reply reply = host::errorReply(400, "no \xFF\n");
-    EXPECT_EQ(400U, reply.status);
-    EXPECT_EQ("{\"error\":\"no \xEF\xBF\xBD\\n\"}\n", reply.body);
-    EXPECT_EQ("application/json", reply.type);
+    EXPECT_EQ(reply.status, 400U);
+    EXPECT_EQ(reply.body, "{\"error\":\"no \xEF\xBF\xBD\\n\"}\n");
+    EXPECT_EQ(reply.type, "application/json");
 }
 
 TEST(JsonReply, EndsItsLine) {
-    EXPECT_EQ("{}\n", host::jsonReply(200, "{}").body);
+    EXPECT_EQ(host::jsonReply(200, "{}").body, "{}\n");
 }
 
 }  // namespace

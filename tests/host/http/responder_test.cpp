@@ -81,17 +81,17 @@ TEST_F(Answers, CarryTypeAndFieldsOfTheirReply) {
     };
     RawClient client = connect();
     const auto answer = client.post("/a?b", "body");
-    EXPECT_EQ(201, answer.status);
-    EXPECT_NE(std::string::npos, answer.head.find("Content-Type: text/plain\r\n"));
-    EXPECT_NE(std::string::npos, answer.head.find("X-Odd: yes\r\n"));
-    EXPECT_EQ("POST/a?bbody", answer.body);
+    EXPECT_EQ(answer.status, 201);
+    EXPECT_NE(answer.head.find("Content-Type: text/plain\r\n"), std::string::npos);
+    EXPECT_NE(answer.head.find("X-Odd: yes\r\n"), std::string::npos);
+    EXPECT_EQ(answer.body, "POST/a?bbody");
 }
 
 TEST_F(Answers, MayBeEmpty) {
     handler.answer = [](const Request&) { return Answer(Reply{}); };
     RawClient client = connect();
-    EXPECT_NE(std::string::npos, client.get("/").head.find("Content-Length: 0\r\n"));
-    EXPECT_EQ("alive", client.get("/alive").body);
+    EXPECT_NE(client.get("/").head.find("Content-Length: 0\r\n"), std::string::npos);
+    EXPECT_EQ(client.get("/alive").body, "alive");
 }
 
 TEST_F(Answers, TellTheHandlerWhoAsks) {
@@ -100,7 +100,7 @@ TEST_F(Answers, TellTheHandlerWhoAsks) {
         peer = request.peer;
         return Answer(Reply{});
     };
-    EXPECT_EQ(200, connect().get("/").status);
+    EXPECT_EQ(connect().get("/").status, 200);
     EXPECT_EQ(::getpid(), peer.process);
     EXPECT_EQ(::geteuid(), peer.user);
     EXPECT_EQ(::getegid(), peer.group);
@@ -115,8 +115,8 @@ TEST_F(Answers, OfAHandlerOrAJobThatThrowsAreErrors) {
     RawClient client = connect();
     for (const char* target : {"/handler", "/job"}) {
         const auto answer = client.get(target);
-        EXPECT_EQ(500, answer.status);
-        EXPECT_EQ("{\"error\":\"the request failed for want of memory\"}\n", answer.body);
+        EXPECT_EQ(answer.status, 500);
+        EXPECT_EQ(answer.body, "{\"error\":\"the request failed for want of memory\"}\n");
     }
 }
 
@@ -125,11 +125,11 @@ TEST_F(Answers, MayComeLaterWithoutAWorker) {
     RawClient client = connect();
     client.send("GET /later HTTP/1.1\r\n\r\n");
     const Responder respond = responder.get_future().get();
-    EXPECT_EQ("alive", aliveness());
+    EXPECT_EQ(aliveness(), "alive");
     respond(Reply{200, "late"});
     respond(Reply{200, "too late"});
-    EXPECT_EQ("late", client.readAnswer().body);
-    EXPECT_EQ("alive", client.get("/alive").body) << "the second answer is dropped";
+    EXPECT_EQ(client.readAnswer().body, "late");
+    EXPECT_EQ(client.get("/alive").body, "alive") << "the second answer is dropped";
 }
 
 TEST_F(Answers, MayComeBeforeBeginReturns) {
@@ -139,7 +139,7 @@ TEST_F(Answers, MayComeBeforeBeginReturns) {
                             },
                             seconds(60), inTime});
     };
-    EXPECT_EQ("at once", connect().get("/").body);
+    EXPECT_EQ(connect().get("/").body, "at once");
 }
 
 TEST_F(Answers, MayComeLaterAfterAJob) {
@@ -149,7 +149,7 @@ TEST_F(Answers, MayComeLaterAfterAJob) {
     RawClient client = connect();
     client.send("GET /later HTTP/1.1\r\n\r\n");
     responder.get_future().get()(Reply{200, "late"});
-    EXPECT_EQ("late", client.readAnswer().body);
+    EXPECT_EQ(client.readAnswer().body, "late");
 }
 
 TEST_F(Answers, ThatDoNotComeInTimeAreMadeAtTheLimit) {
@@ -157,9 +157,9 @@ TEST_F(Answers, ThatDoNotComeInTimeAreMadeAtTheLimit) {
         return Answer(keepResponder(milliseconds(20), inTime));
     };
     RawClient client = connect();
-    EXPECT_EQ("the time is over", client.get("/later").body);
+    EXPECT_EQ(client.get("/later").body, "the time is over");
     responder.get_future().get()(Reply{200, "late"});
-    EXPECT_EQ("alive", client.get("/alive").body) << "the late answer belongs to no request";
+    EXPECT_EQ(client.get("/alive").body, "alive") << "the late answer belongs to no request";
 }
 
 TEST_F(Answers, ThatNobodyGaveYetAreMadeWhenTheServerEnds) {
@@ -168,7 +168,7 @@ TEST_F(Answers, ThatNobodyGaveYetAreMadeWhenTheServerEnds) {
     client.send("GET /later HTTP/1.1\r\n\r\n");
     responder.get_future().get();
     server->end(seconds(60));
-    EXPECT_EQ("the time is over", client.readAnswer().body);
+    EXPECT_EQ(client.readAnswer().body, "the time is over");
     EXPECT_TRUE(eventually([&] { return ended.load(); }));
 }
 
@@ -179,7 +179,7 @@ TEST_F(Answers, ForAClientOrAServerThatHasGoneAreDropped) {
     const Responder respond = responder.get_future().get();
     client.close();
     respond(Reply{200, "nobody reads this"});
-    EXPECT_EQ("alive", aliveness());
+    EXPECT_EQ(aliveness(), "alive");
     stop();
     respond(Reply{200, "nobody sends this"});
 }
@@ -217,14 +217,14 @@ TEST_F(Answers, MayBeStreamsOfAnyKind) {
     };
     RawClient client = connect();
     client.send("GET /ticks HTTP/1.1\r\n\r\n");
-    EXPECT_NE(std::string::npos,
-              client.readUntil("\r\n\r\n").find("Content-Type: text/event-stream\r\n"));
-    EXPECT_EQ("id: n-1\nevent: tick\ndata: 7\n\n", client.readUntil("\n\n"));
-    EXPECT_EQ(1U, counts.streams);
+    EXPECT_NE(client.readUntil("\r\n\r\n").find("Content-Type: text/event-stream\r\n"),
+              std::string::npos);
+    EXPECT_EQ(client.readUntil("\n\n"), "id: n-1\nevent: tick\ndata: 7\n\n");
+    EXPECT_EQ(counts.streams, 1U);
     EXPECT_FALSE(gone);
     client.close();
     EXPECT_TRUE(eventually([&] { return gone.load(); }));
-    EXPECT_EQ(0U, counts.streams);
+    EXPECT_EQ(counts.streams, 0U);
 }
 
 TEST_F(Answers, ThatAreStreamsEndWithTheServer) {
@@ -234,10 +234,10 @@ TEST_F(Answers, ThatAreStreamsEndWithTheServer) {
     };
     RawClient client = connect();
     client.send("GET /ticks HTTP/1.1\r\n\r\n");
-    EXPECT_NE(std::string::npos, client.readUntil("data: x\n\n").find("data: x"));
+    EXPECT_NE(client.readUntil("data: x\n\n").find("data: x"), std::string::npos);
     stop();
     EXPECT_TRUE(gone);
-    EXPECT_EQ(0U, counts.streams);
+    EXPECT_EQ(counts.streams, 0U);
     EXPECT_TRUE(client.isClosed());
 }
 

@@ -32,7 +32,7 @@ protected:
 TEST_F(End, IsAtOnceWhenNothingIsUnderWay) {
     start();
     RawClient idle = connect();
-    EXPECT_EQ(200, idle.get("/v1/health").status);
+    EXPECT_EQ(idle.get("/v1/health").status, 200);
     RawClient stream = subscribe();
     server->end(seconds(60));
     EXPECT_TRUE(hasEnded());
@@ -58,8 +58,8 @@ TEST_F(End, WaitsForASampleAndSendsItsAnswer) {
     EXPECT_FALSE(ended);
     gate.open();
     const auto answer = client.readAnswer();
-    EXPECT_NE(std::string::npos, answer.body.find("late"));
-    EXPECT_NE(std::string::npos, answer.head.find("Connection: close"));
+    EXPECT_NE(answer.body.find("late"), std::string::npos);
+    EXPECT_NE(answer.head.find("Connection: close"), std::string::npos);
     EXPECT_TRUE(hasEnded());
 }
 
@@ -83,12 +83,12 @@ TEST_F(End, TakesNoFurtherRequest) {
     server->end(seconds(60));
     ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
     half.send("\r\n");
-    EXPECT_EQ(503, half.readAnswer().status);
+    EXPECT_EQ(half.readAnswer().status, 503);
     gate.open();
-    EXPECT_EQ(200, busy.readAnswer().status);
-    EXPECT_EQ(200, both.readAnswer().status);
+    EXPECT_EQ(busy.readAnswer().status, 200);
+    EXPECT_EQ(both.readAnswer().status, 200);
     EXPECT_TRUE(hasEnded());
-    EXPECT_EQ(2, samples);
+    EXPECT_EQ(samples, 2);
 }
 
 TEST_F(End, ComesAfterTheGraceWhateverHangs) {
@@ -133,12 +133,12 @@ protected:
         const auto answer = connect().post(
             "/v1/query", R"({"table":"KAGREQT","where":[{"column":"TRANSID","op":"=","value":")" +
                              transid + "\"}]}");
-        EXPECT_NE(std::string::npos, answer.body.find(transid));
+        EXPECT_NE(answer.body.find(transid), std::string::npos);
     }
     RawClient subscribeToOutcomes() {
         RawClient client = connect();
         client.send("GET /v1/events?table=KAGDYST HTTP/1.1\r\n\r\n");
-        EXPECT_NE(std::string::npos, client.readUntil("\r\n\r\n").find("200"));
+        EXPECT_NE(client.readUntil("\r\n\r\n").find("200"), std::string::npos);
         return client;
     }
 
@@ -176,7 +176,7 @@ TEST_F(TaskEnd, FollowsTheTaskInHandWhoseOutcomeIsSentAndNoOtherBegins) {
     first.open();
     EXPECT_TRUE(hasEnded());
     EXPECT_FALSE(secondBegun);
-    EXPECT_NE(std::string::npos, events.readUntil("\n\n").find("t1"));
+    EXPECT_NE(events.readUntil("\n\n").find("t1"), std::string::npos);
     letExecutorGo();
 }
 

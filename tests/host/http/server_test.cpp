@@ -30,14 +30,15 @@ TEST_F(Requests, TablesAndHealth) {
     start();
     RawClient client = connect();
     const auto tables = client.get("/v1/tables");
-    EXPECT_EQ(200, tables.status);
-    EXPECT_NE(std::string::npos, tables.head.find("Content-Type: application/json\r\n"));
-    EXPECT_EQ(0U, tables.body.find(
-                      R"({"tables":[{"application":"TEST","name":"PLAIN","columns":[{"name":)"));
+    EXPECT_EQ(tables.status, 200);
+    EXPECT_NE(tables.head.find("Content-Type: application/json\r\n"), std::string::npos);
+    EXPECT_EQ(
+        tables.body.find(R"({"tables":[{"application":"TEST","name":"PLAIN","columns":[{"name":)"),
+        0U);
     const auto health = client.get("/v1/health");
-    EXPECT_EQ(200, health.status);
-    EXPECT_NE(std::string::npos, health.body.find(R"("home":"/home/of/it")"));
-    EXPECT_NE(std::string::npos, health.body.find(R"("subscriptions":0)"));
+    EXPECT_EQ(health.status, 200);
+    EXPECT_NE(health.body.find(R"("home":"/home/of/it")"), std::string::npos);
+    EXPECT_NE(health.body.find(R"("subscriptions":0)"), std::string::npos);
 }
 
 TEST_F(Requests, QueryAnswersTheRowsThatTheConditionsTake) {
@@ -51,8 +52,8 @@ TEST_F(Requests, QueryAnswersTheRowsThatTheConditionsTake) {
     const auto answer = client.post(
         "/v1/query", R"({"table":"PLAIN","where":[{"column":"NUMBER","op":">","value":1},)"
                      R"({"column":"NAME","op":"!=","value":"n3"}]})");
-    EXPECT_EQ(200, answer.status);
-    EXPECT_EQ("{\"rows\":[{\"NAME\":\"n2\",\"NUMBER\":2,\"TEXT\":\"\"}]}\n", answer.body);
+    EXPECT_EQ(answer.status, 200);
+    EXPECT_EQ(answer.body, "{\"rows\":[{\"NAME\":\"n2\",\"NUMBER\":2,\"TEXT\":\"\"}]}\n");
 }
 
 TEST_F(Requests, SentTogetherAreAnsweredInOrder) {
@@ -64,12 +65,12 @@ TEST_F(Requests, SentTogetherAreAnsweredInOrder) {
         "\r\n\r\n" + query;
     ASSERT_TRUE(client.send(one + "GET /v1/nothing HTTP/1.1\r\n\r\n" + one +
                             "GET /v1/health HTTP/1.1\r\nConnection: close\r\n\r\n"));
-    EXPECT_EQ(200, client.readAnswer().status);
-    EXPECT_EQ(404, client.readAnswer().status);
-    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_EQ(client.readAnswer().status, 200);
+    EXPECT_EQ(client.readAnswer().status, 404);
+    EXPECT_EQ(client.readAnswer().status, 200);
     const auto last = client.readAnswer();
-    EXPECT_NE(std::string::npos, last.body.find("uptime_seconds"));
-    EXPECT_NE(std::string::npos, last.head.find("Connection: close\r\n"));
+    EXPECT_NE(last.body.find("uptime_seconds"), std::string::npos);
+    EXPECT_NE(last.head.find("Connection: close\r\n"), std::string::npos);
     EXPECT_TRUE(client.isClosed());
 }
 
@@ -81,14 +82,14 @@ TEST_F(Requests, MayComeByteByByte) {
                                std::to_string(query.size()) + "\r\n\r\n" + query) {
         ASSERT_TRUE(client.send(std::string(1, byte)));
     }
-    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_EQ(client.readAnswer().status, 200);
 }
 
 TEST_F(Requests, OfHttp10AreAnsweredAndClosed) {
     start();
     RawClient client = connect();
     client.send("GET /v1/tables HTTP/1.0\r\n\r\n");
-    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_EQ(client.readAnswer().status, 200);
     EXPECT_TRUE(client.isClosed());
 }
 
@@ -98,7 +99,7 @@ TEST_F(Requests, MayBeChunked) {
     client.send(
         "POST /v1/query HTTP/1.1\r\nTransfer-Encoding: chunked\r\n\r\n"
         "8\r\n{\"table\"\r\n9\r\n:\"PLAIN\"}\r\n0\r\n\r\n");
-    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_EQ(client.readAnswer().status, 200);
 }
 
 TEST_F(Requests, OfAClientThatHasEndedItsSideAreAnswered) {
@@ -106,7 +107,7 @@ TEST_F(Requests, OfAClientThatHasEndedItsSideAreAnswered) {
     RawClient client = connect();
     client.sendPost("/v1/query", plainQuery());
     client.endSending();
-    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_EQ(client.readAnswer().status, 200);
     EXPECT_TRUE(client.isClosed());
 }
 
@@ -116,30 +117,30 @@ TEST_F(Requests, ThatWaitForLeaveToSendGetIt) {
     const std::string query = plainQuery();
     client.send("POST /v1/query HTTP/1.1\r\nExpect: 100-continue\r\nContent-Length: " +
                 std::to_string(query.size()) + "\r\n\r\n");
-    EXPECT_EQ("HTTP/1.1 100 Continue\r\n\r\n", client.readUntil("\r\n\r\n"));
+    EXPECT_EQ(client.readUntil("\r\n\r\n"), "HTTP/1.1 100 Continue\r\n\r\n");
     client.send(query);
-    EXPECT_EQ(200, client.readAnswer().status);
+    EXPECT_EQ(client.readAnswer().status, 200);
 }
 
 TEST_F(Requests, OfTheGreatestSizePass) {
     start();
     RawClient client = connect();
-    EXPECT_EQ(200, client.post("/v1/query", paddedQuery(1024 * 1024)).status);
-    EXPECT_EQ(200, client.get("/v1/health").status);
+    EXPECT_EQ(client.post("/v1/query", paddedQuery(1024 * 1024)).status, 200);
+    EXPECT_EQ(client.get("/v1/health").status, 200);
 }
 
 TEST_F(BadRequests, GetAnErrorThatSaysWhatIsWrong) {
     start();
     RawClient client = connect();
     const auto unknown = client.post("/v1/query", R"({"table":"NOPE"})");
-    EXPECT_EQ(404, unknown.status);
-    EXPECT_EQ("{\"error\":\"there is no table \\\"NOPE\\\"\"}\n", unknown.body);
+    EXPECT_EQ(unknown.status, 404);
+    EXPECT_EQ(unknown.body, "{\"error\":\"there is no table \\\"NOPE\\\"\"}\n");
     const auto method = client.get("/v1/query");
-    EXPECT_EQ(405, method.status);
-    EXPECT_NE(std::string::npos, method.head.find("Allow: POST\r\n"));
-    EXPECT_EQ(400, client.post("/v1/query", "nonsense").status);
-    EXPECT_EQ(400, client.get("/v1/events").status);
-    EXPECT_EQ(200, client.get("/v1/health").status) << "the connection is still good";
+    EXPECT_EQ(method.status, 405);
+    EXPECT_NE(method.head.find("Allow: POST\r\n"), std::string::npos);
+    EXPECT_EQ(client.post("/v1/query", "nonsense").status, 400);
+    EXPECT_EQ(client.get("/v1/events").status, 400);
+    EXPECT_EQ(client.get("/v1/health").status, 200) << "the connection is still good";
 }
 
 TEST_F(Requests, ForAHeadGetTheFieldsOfTheWholeAnswerAndNoBody) {
@@ -151,8 +152,8 @@ TEST_F(Requests, ForAHeadGetTheFieldsOfTheWholeAnswerAndNoBody) {
         "HEAD /v1/query HTTP/1.1\r\n\r\n"
         "GET /v1/health HTTP/1.1\r\n\r\n");
     EXPECT_EQ(whole.head, client.readUntil("\r\n\r\n"));
-    EXPECT_NE(std::string::npos, client.readUntil("\r\n\r\n").find("405"));
-    EXPECT_EQ(0U, client.readUntil("\r\n").find("HTTP/1.1 200 OK"));
+    EXPECT_NE(client.readUntil("\r\n\r\n").find("405"), std::string::npos);
+    EXPECT_EQ(client.readUntil("\r\n").find("HTTP/1.1 200 OK"), 0U);
 }
 
 TEST_F(Requests, ForTheHeadOfAStreamOpenNone) {
@@ -160,11 +161,11 @@ TEST_F(Requests, ForTheHeadOfAStreamOpenNone) {
     RawClient client = connect();
     client.send("HEAD /v1/events?table=PLAIN HTTP/1.1\r\n\r\n");
     const std::string head = client.readUntil("\r\n\r\n");
-    EXPECT_EQ(0U, head.find("HTTP/1.1 200 OK"));
-    EXPECT_NE(std::string::npos, head.find("Content-Type: text/event-stream\r\n"));
-    EXPECT_EQ(std::string::npos, head.find("Content-Length"));
-    EXPECT_EQ(200, client.get("/v1/health").status) << "the connection goes on";
-    EXPECT_EQ(0U, table.liveObjects());
+    EXPECT_EQ(head.find("HTTP/1.1 200 OK"), 0U);
+    EXPECT_NE(head.find("Content-Type: text/event-stream\r\n"), std::string::npos);
+    EXPECT_EQ(head.find("Content-Length"), std::string::npos);
+    EXPECT_EQ(client.get("/v1/health").status, 200) << "the connection goes on";
+    EXPECT_EQ(table.liveObjects(), 0U);
 }
 
 TEST_F(Requests, ForOptionsGetTheMethodsAndNothingElse) {
@@ -172,10 +173,10 @@ TEST_F(Requests, ForOptionsGetTheMethodsAndNothingElse) {
     RawClient client = connect();
     client.send("OPTIONS /v1/tables HTTP/1.1\r\n\r\n");
     const std::string head = client.readUntil("\r\n\r\n");
-    EXPECT_EQ(0U, head.find("HTTP/1.1 204 "));
-    EXPECT_NE(std::string::npos, head.find("Allow: GET, HEAD\r\n"));
-    EXPECT_EQ(std::string::npos, head.find("Content-"));
-    EXPECT_EQ(200, client.get("/v1/health").status);
+    EXPECT_EQ(head.find("HTTP/1.1 204 "), 0U);
+    EXPECT_NE(head.find("Allow: GET, HEAD\r\n"), std::string::npos);
+    EXPECT_EQ(head.find("Content-"), std::string::npos);
+    EXPECT_EQ(client.get("/v1/health").status, 200);
 }
 
 TEST_F(BadRequests, ThatAreNotHttpGet400AndAreClosed) {
@@ -192,11 +193,11 @@ TEST_F(BadRequests, ThatAreNotHttpGet400AndAreClosed) {
         RawClient client = connect();
         client.send(bytes);
         const auto answer = client.readAnswer();
-        EXPECT_EQ(400, answer.status) << bytes;
-        EXPECT_EQ(0U, answer.body.find("{\"error\":\"")) << bytes;
+        EXPECT_EQ(answer.status, 400) << bytes;
+        EXPECT_EQ(answer.body.find("{\"error\":\""), 0U) << bytes;
         EXPECT_TRUE(client.isClosed()) << bytes;
     }
-    EXPECT_EQ(200, connect().get("/v1/health").status);
+    EXPECT_EQ(connect().get("/v1/health").status, 200);
 }
 
 TEST_F(BadRequests, WithALongHeadAreRefused) {
@@ -204,8 +205,8 @@ TEST_F(BadRequests, WithALongHeadAreRefused) {
     RawClient client = connect();
     client.send("GET /v1/tables HTTP/1.1\r\nX: " + std::string(20'000, 'x') + "\r\n\r\n");
     const auto answer = client.readAnswer();
-    EXPECT_EQ(400, answer.status);
-    EXPECT_EQ("{\"error\":\"the request's head is larger than 16384 bytes\"}\n", answer.body);
+    EXPECT_EQ(answer.status, 400);
+    EXPECT_EQ(answer.body, "{\"error\":\"the request's head is larger than 16384 bytes\"}\n");
     EXPECT_TRUE(client.isClosed());
 }
 
@@ -214,15 +215,15 @@ TEST_F(BadRequests, WithAnEndlessHeadAreRefused) {
     RawClient client = connect();
     while (client.send(std::string(1000, 'x'))) {
     }
-    EXPECT_EQ(200, connect().get("/v1/health").status);
+    EXPECT_EQ(connect().get("/v1/health").status, 200);
 }
 
 TEST_F(BadRequests, WithALargeBodyAreRefused) {
     start();
     RawClient client = connect();
     const auto answer = client.post("/v1/query", paddedQuery(1024 * 1024 + 1));
-    EXPECT_EQ(413, answer.status);
-    EXPECT_EQ("{\"error\":\"the body is larger than 1048576 bytes\"}\n", answer.body);
+    EXPECT_EQ(answer.status, 413);
+    EXPECT_EQ(answer.body, "{\"error\":\"the body is larger than 1048576 bytes\"}\n");
 }
 
 TEST_F(BadRequests, ThatOnlyAnnounceALargeBodyAreRefusedAtOnce) {
@@ -231,7 +232,7 @@ TEST_F(BadRequests, ThatOnlyAnnounceALargeBodyAreRefusedAtOnce) {
         RawClient client = connect();
         client.send("POST /v1/query HTTP/1.1\r\nExpect: 100-continue\r\nContent-Length: " +
                     std::string(length) + "\r\n\r\n");
-        EXPECT_EQ(413, client.readAnswer().status);
+        EXPECT_EQ(client.readAnswer().status, 413);
     }
 }
 
@@ -242,7 +243,7 @@ TEST_F(BadRequests, WhoseChunksAddUpToALargeBodyAreRefused) {
     const std::string chunk = "10000\r\n" + std::string(65536, ' ') + "\r\n";
     for (int i = 0; i < 17; ++i)
         client.send(chunk);
-    EXPECT_EQ(413, client.readAnswer().status);
+    EXPECT_EQ(client.readAnswer().status, 413);
 }
 
 TEST_F(BadRequests, ThatEndEarlyAreRefused) {
@@ -253,8 +254,8 @@ TEST_F(BadRequests, ThatEndEarlyAreRefused) {
         client.send(bytes);
         client.endSending();
         const auto answer = client.readAnswer();
-        EXPECT_EQ(400, answer.status) << bytes;
-        EXPECT_EQ("{\"error\":\"the request ended before it was complete\"}\n", answer.body);
+        EXPECT_EQ(answer.status, 400) << bytes;
+        EXPECT_EQ(answer.body, "{\"error\":\"the request ended before it was complete\"}\n");
     }
 }
 
@@ -287,7 +288,7 @@ TEST_F(Connections, ThatAreIdleEnd) {
     start(limits);
     RawClient fresh = connect();
     RawClient used = connect();
-    EXPECT_EQ(200, used.get("/v1/health").status);
+    EXPECT_EQ(used.get("/v1/health").status, 200);
     EXPECT_TRUE(fresh.isClosed());
     EXPECT_TRUE(used.isClosed());
 }
@@ -314,13 +315,13 @@ TEST_F(Connections, BeyondTheLimitGet503UntilOneIsFree) {
         clients.push_back(connect());
         ASSERT_TRUE(clients.back().connected());
     }
-    EXPECT_EQ(200, clients.back().get("/v1/health").status);
+    EXPECT_EQ(clients.back().get("/v1/health").status, 200);
     RawClient refused = connect();
     const auto answer = refused.get("/v1/health");
-    EXPECT_EQ(503, answer.status);
-    EXPECT_EQ("{\"error\":\"too many connections are open\"}\n", answer.body);
+    EXPECT_EQ(answer.status, 503);
+    EXPECT_EQ(answer.body, "{\"error\":\"too many connections are open\"}\n");
     EXPECT_TRUE(refused.isClosed());
-    EXPECT_EQ(200, clients.front().get("/v1/health").status) << "the others go on";
+    EXPECT_EQ(clients.front().get("/v1/health").status, 200) << "the others go on";
     clients.front().close();
     EXPECT_TRUE(eventually([&] { return connect().get("/v1/health").status == 200; }));
 }
@@ -332,18 +333,18 @@ TEST_F(Connections, FarBeyondTheLimitCostNothing) {
     start(limits);
     RawClient first = connect();
     RawClient second = connect();
-    EXPECT_EQ(200, second.get("/v1/health").status);
+    EXPECT_EQ(second.get("/v1/health").status, 200);
     const std::size_t before = openDescriptors();
     std::vector<RawClient> flood;
     for (int i = 0; i < 500; ++i)
         flood.push_back(connect());
-    EXPECT_EQ(200, first.get("/v1/health").status);
+    EXPECT_EQ(first.get("/v1/health").status, 200);
     EXPECT_LE(openDescriptors(), before + 500 + 3);
 }
 
 TEST_F(Connections, LeaveNoDescriptorBehind) {
     start();
-    EXPECT_EQ(200, connect().get("/v1/health").status);
+    EXPECT_EQ(connect().get("/v1/health").status, 200);
     const auto settled = [&](std::size_t wanted) {
         return eventually([&] { return openDescriptors() == wanted; });
     };
@@ -364,7 +365,7 @@ TEST_F(Connections, LeaveNoDescriptorBehind) {
 TEST_F(Connections, AreNotInheritedByChildren) {
     start();
     RawClient client = connect();
-    EXPECT_EQ(200, client.get("/v1/health").status);
+    EXPECT_EQ(client.get("/v1/health").status, 200);
     int checked = 0;
     for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
         const int descriptor = std::stoi(entry.path().filename());
@@ -373,7 +374,7 @@ TEST_F(Connections, AreNotInheritedByChildren) {
         if (error || (target.find("socket:") != 0 && target.find("anon_inode:") != 0)) continue;
         // What the test program was started with is not ours.
         if (descriptor < 3) continue;
-        EXPECT_NE(0, ::fcntl(descriptor, F_GETFD) & FD_CLOEXEC) << target;
+        EXPECT_NE(::fcntl(descriptor, F_GETFD) & FD_CLOEXEC, 0) << target;
         ++checked;
     }
     EXPECT_GE(checked, 4) << "listener, both ends of the connection, event loop";
@@ -382,8 +383,8 @@ TEST_F(Connections, AreNotInheritedByChildren) {
 TEST_F(Connections, OfOtherUsersAreRefused) {
     if (::geteuid() != 0) GTEST_SKIP() << "only root can become another user";
     start();
-    ASSERT_EQ(0, ::chmod(scratch.path().c_str(), 0755));
-    ASSERT_EQ(0, ::chmod(scratch.path("s").c_str(), 0666));
+    ASSERT_EQ(::chmod(scratch.path().c_str(), 0755), 0);
+    ASSERT_EQ(::chmod(scratch.path("s").c_str(), 0666), 0);
     const pid_t child = ::fork();
     if (child == 0) {
         if (::setgid(65534) != 0 || ::setuid(65534) != 0) ::_exit(1);
@@ -395,7 +396,7 @@ TEST_F(Connections, OfOtherUsersAreRefused) {
     }
     int status = -1;
     ASSERT_EQ(child, ::waitpid(child, &status, 0));
-    EXPECT_EQ(0, status);
+    EXPECT_EQ(status, 0);
 }
 
 TEST_F(Samples, ThatTakeLongHoldUpNobodyElse) {
@@ -419,14 +420,14 @@ TEST_F(Samples, ThatTakeLongHoldUpNobodyElse) {
     }
     ASSERT_TRUE(eventually([&] { return running == 31; }));
     RawClient quick = connect();
-    EXPECT_EQ(200, quick.get("/v1/health").status);
-    EXPECT_EQ(200, quick.post("/v1/query", plainQuery()).status);
+    EXPECT_EQ(quick.get("/v1/health").status, 200);
+    EXPECT_EQ(quick.post("/v1/query", plainQuery()).status, 200);
     RawClient events = subscribe();
     table.publish(plainRow("event", 1, ""));
-    EXPECT_NE(std::string::npos, events.readUntil("\n\n").find("event"));
+    EXPECT_NE(events.readUntil("\n\n").find("event"), std::string::npos);
     gate.open();
     for (RawClient& client : slow)
-        EXPECT_NE(std::string::npos, client.readAnswer().body.find(R"("NAME":"slow")"));
+        EXPECT_NE(client.readAnswer().body.find(R"("NAME":"slow")"), std::string::npos);
 }
 
 TEST_F(Samples, BeyondThoseThatMayWaitGet503) {
@@ -457,12 +458,12 @@ TEST_F(Samples, BeyondThoseThatMayWaitGet503) {
         return probe.readAnswer(milliseconds(200)).status == 503;
     }));
     const auto answer = late.post("/v1/query", plainQuery());
-    EXPECT_EQ(503, answer.status);
-    EXPECT_EQ("{\"error\":\"too many requests are waiting\"}\n", answer.body);
-    EXPECT_EQ(200, late.get("/v1/health").status);
+    EXPECT_EQ(answer.status, 503);
+    EXPECT_EQ(answer.body, "{\"error\":\"too many requests are waiting\"}\n");
+    EXPECT_EQ(late.get("/v1/health").status, 200);
     gate.open();
     for (RawClient& client : clients)
-        EXPECT_EQ(200, client.readAnswer().status);
+        EXPECT_EQ(client.readAnswer().status, 200);
 }
 
 TEST_F(Samples, OfClientsThatVanishedHarmNobody) {
@@ -481,7 +482,7 @@ TEST_F(Samples, OfClientsThatVanishedHarmNobody) {
     std::this_thread::sleep_for(milliseconds(50));
     gate.open();
     EXPECT_TRUE(eventually([&] { return finished == 20; }));
-    EXPECT_EQ(200, connect().get("/v1/health").status);
+    EXPECT_EQ(connect().get("/v1/health").status, 200);
 }
 
 TEST_F(Samples, ThatFailGet500) {
@@ -493,10 +494,10 @@ TEST_F(Samples, ThatFailGet500) {
     };
     start();
     RawClient client = connect();
-    EXPECT_EQ("{\"error\":\"table PLAIN failed with status 0x21060099\"}\n",
-              client.post("/v1/query", plainQuery()).body);
+    EXPECT_EQ(client.post("/v1/query", plainQuery()).body,
+              "{\"error\":\"table PLAIN failed with status 0x21060099\"}\n");
     for (kind = 1; kind <= 2; ++kind)
-        EXPECT_EQ(500, client.post("/v1/query", plainQuery()).status);
+        EXPECT_EQ(client.post("/v1/query", plainQuery()).status, 500);
 }
 
 TEST_F(Samples, WithTextThatIsNoUtf8AreAnswered) {
@@ -507,8 +508,8 @@ TEST_F(Samples, WithTextThatIsNoUtf8AreAnswered) {
     start();
     RawClient client = connect();
     const auto answer = client.post("/v1/query", plainQuery());
-    EXPECT_EQ(200, answer.status);
-    EXPECT_NE(std::string::npos, answer.body.find("xxx\xEF\xBF\xBD\""));
+    EXPECT_EQ(answer.status, 200);
+    EXPECT_NE(answer.body.find("xxx\xEF\xBF\xBD\""), std::string::npos);
 }
 
 }  // namespace

@@ -13,7 +13,7 @@ using testing::Pair;
 TEST(Url, SplitsPathAndParametersInOrder) {
     const auto target = parseTarget("/v1/events?table=T&B=2&A=1&A=3");
     ASSERT_TRUE(target);
-    EXPECT_EQ("/v1/events", target->path);
+    EXPECT_EQ(target->path, "/v1/events");
     EXPECT_THAT(target->parameters,
                 ElementsAre(Pair("table", "T"), Pair("B", "2"), Pair("A", "1"), Pair("A", "3")));
 }
@@ -21,14 +21,14 @@ TEST(Url, SplitsPathAndParametersInOrder) {
 TEST(Url, DecodesEscapesOnlyOnce) {
     const auto target = parseTarget("/a%20b?n%3D=%2B%26%3d%2525");
     ASSERT_TRUE(target);
-    EXPECT_EQ("/a b", target->path);
+    EXPECT_EQ(target->path, "/a b");
     EXPECT_THAT(target->parameters, ElementsAre(Pair("n=", "+&=%25")));
 }
 
 TEST(Url, TakesPlusAsBlankInParametersOnly) {
     const auto target = parseTarget("/a+b?x=1+2");
     ASSERT_TRUE(target);
-    EXPECT_EQ("/a+b", target->path);
+    EXPECT_EQ(target->path, "/a+b");
     EXPECT_THAT(target->parameters, ElementsAre(Pair("x", "1 2")));
 }
 
@@ -39,8 +39,8 @@ TEST(Url, KeepsEqualsSignsInValuesAndAllowsEmptyOnes) {
 }
 
 TEST(Url, DropsSchemeHostAndFragment) {
-    EXPECT_EQ("/v1/tables", parseTarget("http://localhost/v1/tables#x")->path);
-    EXPECT_EQ("/", parseTarget("http://localhost")->path);
+    EXPECT_EQ(parseTarget("http://localhost/v1/tables#x")->path, "/v1/tables");
+    EXPECT_EQ(parseTarget("http://localhost")->path, "/");
     EXPECT_THAT(parseTarget("/x#?a=b")->parameters, IsEmpty());
 }
 

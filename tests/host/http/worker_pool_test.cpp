@@ -81,8 +81,8 @@ TEST(WorkerPool, ItsEndWaitsForRunningJobsAndDropsTheOthers) {
         EXPECT_TRUE(eventually([&] { return started.load(); }));
         EXPECT_TRUE(pool.submit([&done, held] { ++done; }));
     }
-    EXPECT_EQ(1, done);
-    EXPECT_EQ(1, held.use_count());
+    EXPECT_EQ(done, 1);
+    EXPECT_EQ(held.use_count(), 1);
 }
 
 }  // namespace

@@ -48,9 +48,9 @@ TEST_F(Feed, HandsEveryRowToEverySubscriberInOrder) {
     const auto two = feed->subscribe({}, into(second));
     publish("b");
     publish("c");
-    EXPECT_EQ("abc", first);
-    EXPECT_EQ("bc", second);
-    EXPECT_EQ(1U, outcomes.liveObjects());
+    EXPECT_EQ(first, "abc");
+    EXPECT_EQ(second, "bc");
+    EXPECT_EQ(outcomes.liveObjects(), 1U);
 }
 
 TEST_F(Feed, CallsSubscribersInTheOrderInWhichTheyCame) {
@@ -65,7 +65,7 @@ TEST_F(Feed, CallsSubscribersInTheOrderInWhichTheyCame) {
     publish("a");
     all[1].reset();
     publish("b");
-    EXPECT_EQ("1234134", calls);
+    EXPECT_EQ(calls, "1234134");
 }
 
 TEST_F(Feed, JudgesRowsAsTheTableDoes) {
@@ -78,11 +78,11 @@ TEST_F(Feed, JudgesRowsAsTheTableDoes) {
     publish("a", 1);
     publish("b", 1);
     publish("cx", 2);
-    EXPECT_EQ("b", padded);
-    EXPECT_EQ("ab", less);
-    EXPECT_EQ("c", pattern);
-    EXPECT_EQ("abc", unknown) << "a condition on an unknown column restricts nothing";
-    EXPECT_EQ("c", both);
+    EXPECT_EQ(padded, "b");
+    EXPECT_EQ(less, "ab");
+    EXPECT_EQ(pattern, "c");
+    EXPECT_EQ(unknown, "abc") << "a condition on an unknown column restricts nothing";
+    EXPECT_EQ(both, "c");
 }
 
 TEST_F(Feed, SubscribersThatFailDisturbNobodyElse) {
@@ -90,18 +90,18 @@ TEST_F(Feed, SubscribersThatFailDisturbNobodyElse) {
     const auto thrower =
         feed->subscribe({}, [](const oxa::Rows&) -> int { throw std::runtime_error("no memory"); });
     const auto other = feed->subscribe({}, into(seen));
-    EXPECT_EQ(OXA_OVERFLOW, publish("a"));
-    EXPECT_EQ(OXA_OVERFLOW, publish("b"));
-    EXPECT_EQ("ab", seen);
+    EXPECT_EQ(publish("a"), OXA_OVERFLOW);
+    EXPECT_EQ(publish("b"), OXA_OVERFLOW);
+    EXPECT_EQ(seen, "ab");
 }
 
 TEST_F(Feed, TellsThePublisherOfALoss) {
     std::string seen;
     auto full = feed->subscribe({}, into(seen, OXA_OVERFLOW));
     const auto other = feed->subscribe({}, into(seen));
-    EXPECT_EQ(OXA_OVERFLOW, publish("a"));
+    EXPECT_EQ(publish("a"), OXA_OVERFLOW);
     full.reset();
-    EXPECT_EQ(OXA_OK, publish("b"));
+    EXPECT_EQ(publish("b"), OXA_OK);
 }
 
 TEST_F(Feed, WaitsForACallInProgressBeforeASubscriptionEnds) {
@@ -122,7 +122,7 @@ TEST_F(Feed, WaitsForACallInProgressBeforeASubscriptionEnds) {
     leave.set_value();
     remover.join();
     publisher.join();
-    EXPECT_EQ(OXA_OK, publish("b")) << "nobody is called any more";
+    EXPECT_EQ(publish("b"), OXA_OK) << "nobody is called any more";
 }
 
 TEST_F(Feed, TakesSubscribersWhileOneIsBeingCalled) {
@@ -141,9 +141,9 @@ TEST_F(Feed, TakesSubscribersWhileOneIsBeingCalled) {
     gone.reset();
     leave.set_value();
     publisher.join();
-    EXPECT_EQ("", seen) << "the row was on its way before";
+    EXPECT_EQ(seen, "") << "the row was on its way before";
     publish("b");
-    EXPECT_EQ("b", seen);
+    EXPECT_EQ(seen, "b");
 }
 
 TEST_F(Feed, SurvivesSubscribersThatComeAndGoWhileRowsArePublished) {
@@ -161,7 +161,7 @@ TEST_F(Feed, SurvivesSubscribersThatComeAndGoWhileRowsArePublished) {
                     EXPECT_TRUE(alive);
                     return static_cast<int>(OXA_OK);
                 });
-                ASSERT_NE(nullptr, subscription);
+                ASSERT_NE(subscription, nullptr);
                 subscription.reset();
                 alive = false;
             }
@@ -186,14 +186,14 @@ TEST_F(Feed, HoldsTheExecutorWhenAllOthersHaveTheOutcome) {
         publish("c");
     });
     EXPECT_TRUE(eventually([&] { return feed->holding(); }));
-    EXPECT_EQ("ab", seen);
+    EXPECT_EQ(seen, "ab");
     EXPECT_FALSE(next) << "the second task would have begun";
     auto late = feed->subscribe({}, into(seen));
-    EXPECT_NE(nullptr, late) << "subscriptions open and close while the executor is held";
+    EXPECT_NE(late, nullptr) << "subscriptions open and close while the executor is held";
     late.reset();
     feed->release();
     executor.join();
-    EXPECT_EQ("abc", seen);
+    EXPECT_EQ(seen, "abc");
     EXPECT_FALSE(feed->holding());
 }
 
@@ -214,13 +214,13 @@ TEST_F(Feed, LetsAHeldExecutorGoWhenItEnds) {
     EXPECT_TRUE(eventually([&] { return feed->holding(); }));
     feed.reset();
     executor.join();
-    EXPECT_EQ(0U, outcomes.liveObjects());
+    EXPECT_EQ(outcomes.liveObjects(), 0U);
 }
 
 TEST(FeedWithoutATable, TakesNoSubscription) {
     const host::TableSet none({});
     OutcomeFeed feed(none);
-    EXPECT_EQ(nullptr, feed.subscribe({}, [](const oxa::Rows&) { return 0; }));
+    EXPECT_EQ(feed.subscribe({}, [](const oxa::Rows&) { return 0; }), nullptr);
     feed.holdAfterOutcome();
     EXPECT_FALSE(feed.holding());
 }

@@ -42,11 +42,11 @@ TEST_F(Options, AllAreTaken) {
                                "--rpc-port", "135", "--origin-node", "n", "--plugin", "p.so"});
     ASSERT_TRUE(options);
     EXPECT_EQ(home, options->home);
-    EXPECT_EQ("/s", options->socket);
-    EXPECT_EQ("/r", options->rpcSocket);
-    EXPECT_EQ(135, options->rpcPort);
-    EXPECT_EQ("n", options->originNode);
-    EXPECT_EQ("p.so", options->plugin);
+    EXPECT_EQ(options->socket, "/s");
+    EXPECT_EQ(options->rpcSocket, "/r");
+    EXPECT_EQ(options->rpcPort, 135);
+    EXPECT_EQ(options->originNode, "n");
+    EXPECT_EQ(options->plugin, "p.so");
 }
 
 TEST_F(Options, HomeComesFromTheEnvironmentWhenItIsNotGiven) {
@@ -63,36 +63,36 @@ TEST_F(Options, HomeMustBeADirectory) {
     EXPECT_EQ(complaint, errorOf({}));
     EXPECT_EQ(complaint, errorOf({"--home", ""}));
     const std::string lost = scratch.path("lost");
-    EXPECT_EQ("home " + lost + ": No such file or directory", errorOf({"--home", lost.c_str()}));
+    EXPECT_EQ(errorOf({"--home", lost.c_str()}), "home " + lost + ": No such file or directory");
     const std::string file = scratch.write("file", "");
-    EXPECT_EQ("home " + file + " is not a directory", errorOf({"--home", file.c_str()}));
+    EXPECT_EQ(errorOf({"--home", file.c_str()}), "home " + file + " is not a directory");
 }
 
 TEST_F(Options, ARelativeHomeBecomesAbsolute) {
     const std::string relative = std::filesystem::relative(home).string();
     const std::string absolute = read({"--home", relative.c_str()})->home;
-    EXPECT_EQ('/', absolute.at(0));
+    EXPECT_EQ(absolute.at(0), '/');
     EXPECT_TRUE(std::filesystem::equivalent(home, absolute));
 }
 
 TEST_F(Options, SocketsHaveDefaults) {
     environment["TOVRINHOME"] = home;
-    EXPECT_EQ("/run/zavhost.sock", read({})->socket);
-    EXPECT_EQ("/run/zavhost.sock.rpc", read({})->rpcSocket);
+    EXPECT_EQ(read({})->socket, "/run/zavhost.sock");
+    EXPECT_EQ(read({})->rpcSocket, "/run/zavhost.sock.rpc");
     environment["XDG_RUNTIME_DIR"] = "/run/user/1";
-    EXPECT_EQ("/run/user/1/zavhost.sock", read({})->socket);
+    EXPECT_EQ(read({})->socket, "/run/user/1/zavhost.sock");
     environment["ZAV_SOCKET"] = "/z";
-    EXPECT_EQ("/z", read({})->socket);
-    EXPECT_EQ("/z.rpc", read({})->rpcSocket);
-    EXPECT_EQ("/s.rpc", read({"--socket", "/s"})->rpcSocket);
+    EXPECT_EQ(read({})->socket, "/z");
+    EXPECT_EQ(read({})->rpcSocket, "/z.rpc");
+    EXPECT_EQ(read({"--socket", "/s"})->rpcSocket, "/s.rpc");
 }
 
 TEST_F(Options, EmptyOrEqualSocketsAreRefused) {
     environment["TOVRINHOME"] = home;
-    EXPECT_EQ("the name of a socket is empty", errorOf({"--socket", ""}));
-    EXPECT_EQ("the name of a socket is empty", errorOf({"--rpc-socket", ""}));
-    EXPECT_EQ("--socket and --rpc-socket name the same file /s",
-              errorOf({"--socket", "/s", "--rpc-socket", "/s"}));
+    EXPECT_EQ(errorOf({"--socket", ""}), "the name of a socket is empty");
+    EXPECT_EQ(errorOf({"--rpc-socket", ""}), "the name of a socket is empty");
+    EXPECT_EQ(errorOf({"--socket", "/s", "--rpc-socket", "/s"}),
+              "--socket and --rpc-socket name the same file /s");
 }
 
 TEST_F(Options, MistakesAreOneLine) {
@@ -105,8 +105,8 @@ TEST_F(Options, MistakesAreOneLine) {
                                                       {"--rpc-port", "x"},
                                                       {"--home"}}) {
         const std::string error = errorOf(arguments);
-        EXPECT_NE("", error) << arguments.front();
-        EXPECT_EQ(std::string::npos, error.find('\n')) << error;
+        EXPECT_NE(error, "") << arguments.front();
+        EXPECT_EQ(error.find('\n'), std::string::npos) << error;
     }
 }
 

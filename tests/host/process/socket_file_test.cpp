@@ -40,7 +40,7 @@ TEST_F(Socket, IsPrivateWhateverTheMask) {
         const mode_t before = ::umask(mask);
         const SocketFile socket(path);
         ::umask(before);
-        EXPECT_EQ(S_IFSOCK | 0600U, modeOf(path)) << mask;
+        EXPECT_EQ(modeOf(path), S_IFSOCK | 0600U) << mask;
     }
 }
 
@@ -49,8 +49,8 @@ TEST_F(Socket, IsConnectedToOnlyWhenItListens) {
     EXPECT_FALSE(RawClient(path).connected());
     const int descriptor = socket.listen();
     EXPECT_TRUE(RawClient(path).connected());
-    EXPECT_NE(0, ::fcntl(descriptor, F_GETFD) & FD_CLOEXEC);
-    EXPECT_NE(0, ::fcntl(descriptor, F_GETFL) & O_NONBLOCK);
+    EXPECT_NE(::fcntl(descriptor, F_GETFD) & FD_CLOEXEC, 0);
+    EXPECT_NE(::fcntl(descriptor, F_GETFL) & O_NONBLOCK, 0);
 }
 
 TEST_F(Socket, IsRemovedAtTheEndWithItsLock) {
@@ -60,14 +60,14 @@ TEST_F(Socket, IsRemovedAtTheEndWithItsLock) {
     }
     EXPECT_FALSE(scratch.exists("host.sock"));
     EXPECT_FALSE(scratch.exists("host.sock.lock"));
-    EXPECT_EQ("", errorOf(path)) << "the path is free again";
+    EXPECT_EQ(errorOf(path), "") << "the path is free again";
 }
 
 TEST_F(Socket, ThatIsServedIsLeftAlone) {
     SocketFile socket(path);
-    EXPECT_EQ("socket " + path + " is in use by a live host", errorOf(path)) << "not yet listening";
+    EXPECT_EQ(errorOf(path), "socket " + path + " is in use by a live host") << "not yet listening";
     socket.listen();
-    EXPECT_EQ("socket " + path + " is in use by a live host", errorOf(path));
+    EXPECT_EQ(errorOf(path), "socket " + path + " is in use by a live host");
     EXPECT_TRUE(RawClient(path).connected());
     EXPECT_TRUE(scratch.exists("host.sock.lock"));
 }
@@ -77,9 +77,9 @@ TEST_F(Socket, ThatAProgramWithoutLockServesIsLeftAloneToo) {
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     path.copy(address.sun_path, path.size());
-    ASSERT_EQ(0, ::bind(other.get(), reinterpret_cast<sockaddr*>(&address), sizeof address));
-    ASSERT_EQ(0, ::listen(other.get(), 1));
-    EXPECT_EQ("socket " + path + " is in use by a live host", errorOf(path));
+    ASSERT_EQ(::bind(other.get(), reinterpret_cast<sockaddr*>(&address), sizeof address), 0);
+    ASSERT_EQ(::listen(other.get(), 1), 0);
+    EXPECT_EQ(errorOf(path), "socket " + path + " is in use by a live host");
     EXPECT_TRUE(RawClient(path).connected());
     EXPECT_FALSE(scratch.exists("host.sock.lock"));
 }
@@ -102,37 +102,37 @@ TEST_F(Socket, OfAHostThatWasKilledIsReplaced) {
 
 TEST_F(Socket, NeverReplacesAnotherKindOfFile) {
     scratch.write("host.sock", "precious");
-    EXPECT_EQ(path + " exists and is not a socket", errorOf(path));
-    EXPECT_EQ("precious", scratch.read("host.sock"));
+    EXPECT_EQ(errorOf(path), path + " exists and is not a socket");
+    EXPECT_EQ(scratch.read("host.sock"), "precious");
     EXPECT_FALSE(scratch.exists("host.sock.lock"));
     const std::string directory = scratch.makeDir("dir");
-    EXPECT_EQ(directory + " exists and is not a socket", errorOf(directory));
+    EXPECT_EQ(errorOf(directory), directory + " exists and is not a socket");
     const std::string link = scratch.path("link");
-    ASSERT_EQ(0, ::symlink("nowhere", link.c_str()));
-    EXPECT_EQ(link + " exists and is not a socket", errorOf(link));
+    ASSERT_EQ(::symlink("nowhere", link.c_str()), 0);
+    EXPECT_EQ(errorOf(link), link + " exists and is not a socket");
     EXPECT_TRUE(S_ISLNK(modeOf(link)));
 }
 
 TEST_F(Socket, WhoseFileWasTakenByAnotherRemovesOnlyItsOwn) {
     std::optional<SocketFile> socket(path);
-    ASSERT_EQ(0, ::unlink(path.c_str()));
+    ASSERT_EQ(::unlink(path.c_str()), 0);
     scratch.write("host.sock", "another's");
     socket.reset();
-    EXPECT_EQ("another's", scratch.read("host.sock"));
+    EXPECT_EQ(scratch.read("host.sock"), "another's");
 }
 
 TEST_F(Socket, NameMayBeAsLongAsAnAddressHolds) {
     const std::size_t limit = sizeof sockaddr_un{}.sun_path - 1;
     const std::string longest = scratch.path(std::string(limit - scratch.path().size() - 1, 's'));
     ASSERT_EQ(limit, longest.size());
-    EXPECT_EQ("", errorOf(longest));
-    EXPECT_EQ("socket name " + longest + "s is longer than 107 bytes", errorOf(longest + "s"));
+    EXPECT_EQ(errorOf(longest), "");
+    EXPECT_EQ(errorOf(longest + "s"), "socket name " + longest + "s is longer than 107 bytes");
     EXPECT_FALSE(scratch.exists(longest.substr(scratch.path().size() + 1) + "s.lock"));
 }
 
 TEST_F(Socket, InADirectoryThatIsNotThereIsAnError) {
     const std::string lost = scratch.path("no/host.sock");
-    EXPECT_EQ("cannot make " + lost + ".lock: No such file or directory", errorOf(lost));
+    EXPECT_EQ(errorOf(lost), "cannot make " + lost + ".lock: No such file or directory");
 }
 
 }  // namespace

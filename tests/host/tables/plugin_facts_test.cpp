@@ -45,7 +45,7 @@ public:
                                              {"TARGETMSN", OPER_EQ, "inst:host:UX"}};
         // The other kind answers with a context of its own, which this would filter out.
         if (!plugin::runsAtOnce(command)) where.push_back({"CONTEXT", OPER_EQ, "exit 0"});
-        EXPECT_EQ(OXA_OK, oxa::query(std::string(plugin::kRequestTable), where, rows));
+        EXPECT_EQ(oxa::query(std::string(plugin::kRequestTable), where, rows), OXA_OK);
         return rows;
     }
     /// How many outcomes with this TRANSID have been published.
@@ -83,9 +83,9 @@ private:
 
 void expectColumn(std::string_view tableName, std::string_view columnName, int type) {
     const oxa::Table* const table = Started::once().find(tableName);
-    ASSERT_NE(nullptr, table) << tableName;
+    ASSERT_NE(table, nullptr) << tableName;
     const oxa::Column* const column = table->find(std::string(columnName));
-    ASSERT_NE(nullptr, column) << columnName;
+    ASSERT_NE(column, nullptr) << columnName;
     EXPECT_EQ(type, column->type) << columnName;
 }
 
@@ -100,7 +100,7 @@ TEST(PluginFacts, NameTablesAndColumnsThatThereAre) {
 int retvalOf(const oxa::Rows& rows) {
     const oxa::Table& table = *Started::once().find(plugin::kRequestTable);
     const oxa::Column& retval = *table.find(std::string(plugin::kRetvalColumn));
-    EXPECT_EQ(1U, rows.count());
+    EXPECT_EQ(rows.count(), 1U);
     return rows.count() == 1 ? host::integerField(retval, host::rowOf(rows, 0)) : -1;
 }
 
@@ -115,21 +115,21 @@ TEST(PluginFacts, TellQueuedCommandsFromThoseThatRunAtOnce) {
             ++atOnce;
             continue;
         }
-        EXPECT_EQ(plugin::kAccepted, retval) << command;
+        EXPECT_EQ(retval, plugin::kAccepted) << command;
         EXPECT_TRUE(eventually([&] { return started.outcomes(transid) == 1; })) << command;
     }
     EXPECT_EQ(plugin::kCommandsAtOnce.size(), static_cast<std::size_t>(atOnce));
     // Outcomes come in the order of the requests, so those of the first two would be there.
     for (const std::string_view command : plugin::kCommandsAtOnce)
-        EXPECT_EQ(0, started.outcomes("is-" + std::string(command))) << command;
+        EXPECT_EQ(started.outcomes("is-" + std::string(command)), 0) << command;
 }
 
 TEST(PluginFacts, TellAcceptedRequestsFromRefusedOnes) {
     Started& started = Started::once();
-    EXPECT_NE(plugin::kAccepted, retvalOf(started.request("NOSUCH", "refused")));
-    EXPECT_EQ(plugin::kAccepted, retvalOf(started.request("STOP", "accepted")));
+    EXPECT_NE(retvalOf(started.request("NOSUCH", "refused")), plugin::kAccepted);
+    EXPECT_EQ(retvalOf(started.request("STOP", "accepted")), plugin::kAccepted);
     EXPECT_TRUE(eventually([&] { return started.outcomes("accepted") == 1; }));
-    EXPECT_EQ(0, started.outcomes("refused"));
+    EXPECT_EQ(started.outcomes("refused"), 0);
 }
 
 }  // namespace

@@ -24,26 +24,26 @@ TEST(RowQueue, HandsRowsOnInOrderAndWakesOnce) {
     RowQueue queue({});
     queue.onContent(woken.counter());
     EXPECT_TRUE(queue.empty());
-    EXPECT_EQ(OXA_OK, queue.push(rows("a")));
-    EXPECT_EQ(OXA_OK, queue.push(rows("bc")));
-    EXPECT_EQ(1, woken.times);
+    EXPECT_EQ(queue.push(rows("a")), OXA_OK);
+    EXPECT_EQ(queue.push(rows("bc")), OXA_OK);
+    EXPECT_EQ(woken.times, 1);
     EXPECT_FALSE(queue.empty());
     const RowQueue::Batch batch = queue.take();
-    EXPECT_EQ("abc", batch.rows.bytes);
-    EXPECT_EQ(3U, batch.rows.count());
-    EXPECT_EQ(0U, batch.lost);
+    EXPECT_EQ(batch.rows.bytes, "abc");
+    EXPECT_EQ(batch.rows.count(), 3U);
+    EXPECT_EQ(batch.lost, 0U);
     EXPECT_TRUE(queue.take().empty());
-    EXPECT_EQ(OXA_OK, queue.push(rows("d")));
-    EXPECT_EQ(2, woken.times);
+    EXPECT_EQ(queue.push(rows("d")), OXA_OK);
+    EXPECT_EQ(woken.times, 2);
 }
 
 TEST(RowQueue, ADispatchWithoutRowsIsNothing) {
     Woken woken;
     RowQueue queue({});
     queue.onContent(woken.counter());
-    EXPECT_EQ(OXA_OK, queue.push(rows("")));
-    EXPECT_EQ(OXA_OK, queue.push(oxa::Rows{}));
-    EXPECT_EQ(0, woken.times);
+    EXPECT_EQ(queue.push(rows("")), OXA_OK);
+    EXPECT_EQ(queue.push(oxa::Rows{}), OXA_OK);
+    EXPECT_EQ(woken.times, 0);
     EXPECT_TRUE(queue.empty());
 }
 
@@ -52,10 +52,10 @@ TEST(RowQueue, WakesAReaderThatComesLaterThanItsRows) {
     RowQueue queue({});
     queue.push(rows("a"));
     queue.onContent(woken.counter());
-    EXPECT_EQ(1, woken.times);
+    EXPECT_EQ(woken.times, 1);
     queue.push(rows("b"));
-    EXPECT_EQ(1, woken.times) << "the reader knows already";
-    EXPECT_EQ("ab", queue.take().rows.bytes);
+    EXPECT_EQ(woken.times, 1) << "the reader knows already";
+    EXPECT_EQ(queue.take().rows.bytes, "ab");
 }
 
 TEST(RowQueue, MayBeReadFromItsWake) {
@@ -64,40 +64,40 @@ TEST(RowQueue, MayBeReadFromItsWake) {
     queue.onContent([&] { seen += queue.take().rows.bytes; });
     queue.push(rows("a"));
     queue.push(rows("b"));
-    EXPECT_EQ("ab", seen);
+    EXPECT_EQ(seen, "ab");
 }
 
 TEST(RowQueue, CountsWhatDoesNotFit) {
     RowQueue queue({4, 1000});
-    EXPECT_EQ(OXA_OK, queue.push(rows("abc")));
-    EXPECT_EQ(OXA_OVERFLOW, queue.push(rows("def")));
-    EXPECT_EQ(OXA_OVERFLOW, queue.push(rows("gh")));
+    EXPECT_EQ(queue.push(rows("abc")), OXA_OK);
+    EXPECT_EQ(queue.push(rows("def")), OXA_OVERFLOW);
+    EXPECT_EQ(queue.push(rows("gh")), OXA_OVERFLOW);
     const RowQueue::Batch batch = queue.take();
-    EXPECT_EQ("abcd", batch.rows.bytes);
-    EXPECT_EQ(4U, batch.lost);
-    EXPECT_EQ(OXA_OK, queue.push(rows("xyz"))) << "the reader has caught up";
-    EXPECT_EQ("xyz", queue.take().rows.bytes);
+    EXPECT_EQ(batch.rows.bytes, "abcd");
+    EXPECT_EQ(batch.lost, 4U);
+    EXPECT_EQ(queue.push(rows("xyz")), OXA_OK) << "the reader has caught up";
+    EXPECT_EQ(queue.take().rows.bytes, "xyz");
 }
 
 TEST(RowQueue, RowsAfterALossAreLostTooSoThatTheOrderHolds) {
     RowQueue queue({100, 10});
-    EXPECT_EQ(OXA_OK, queue.push(rows("12345678", 4)));
-    EXPECT_EQ(OXA_OVERFLOW, queue.push(rows("abcd", 4))) << "two bytes are left";
+    EXPECT_EQ(queue.push(rows("12345678", 4)), OXA_OK);
+    EXPECT_EQ(queue.push(rows("abcd", 4)), OXA_OVERFLOW) << "two bytes are left";
     const RowQueue::Batch batch = queue.take();
-    EXPECT_EQ("12345678", batch.rows.bytes);
-    EXPECT_EQ(1U, batch.lost);
+    EXPECT_EQ(batch.rows.bytes, "12345678");
+    EXPECT_EQ(batch.lost, 1U);
 }
 
 TEST(RowQueue, ARowWiderThanTheQueuePassesAlone) {
     RowQueue queue({100, 10});
     const std::string wide(50, 'w');
-    EXPECT_EQ(OXA_OK, queue.push(rows(wide, 50)));
-    EXPECT_EQ(OXA_OVERFLOW, queue.push(rows(wide, 50)));
-    EXPECT_EQ(wide, queue.take().rows.bytes);
-    EXPECT_EQ(OXA_OVERFLOW, queue.push(rows(wide + wide, 50)));
+    EXPECT_EQ(queue.push(rows(wide, 50)), OXA_OK);
+    EXPECT_EQ(queue.push(rows(wide, 50)), OXA_OVERFLOW);
+    EXPECT_EQ(queue.take().rows.bytes, wide);
+    EXPECT_EQ(queue.push(rows(wide + wide, 50)), OXA_OVERFLOW);
     const RowQueue::Batch batch = queue.take();
-    EXPECT_EQ(1U, batch.rows.count());
-    EXPECT_EQ(1U, batch.lost);
+    EXPECT_EQ(batch.rows.count(), 1U);
+    EXPECT_EQ(batch.lost, 1U);
 }
 
 TEST(RowQueue, AWakeThatFailsLeavesTheQueueUsable) {
@@ -106,10 +106,10 @@ TEST(RowQueue, AWakeThatFailsLeavesTheQueueUsable) {
     queue.onContent([&] {
         if (fail) throw std::bad_alloc();
     });
-    EXPECT_EQ(OXA_OVERFLOW, queue.push(rows("a")));
+    EXPECT_EQ(queue.push(rows("a")), OXA_OVERFLOW);
     fail = false;
-    EXPECT_EQ(OXA_OK, queue.push(rows("b")));
-    EXPECT_EQ("b", queue.take().rows.bytes);
+    EXPECT_EQ(queue.push(rows("b")), OXA_OK);
+    EXPECT_EQ(queue.take().rows.bytes, "b");
 }
 
 }  // namespace
