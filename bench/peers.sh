@@ -70,8 +70,8 @@ start_host() {
 }
 
 # start_sshd: starts a server with throw-away keys; sets `ssh_port` and `ssh_options` for its
-# clients. Fails when there is no server. Its shells take themselves for inner ones, so that the
-# user's own start-up file, which may do anything, does not count against ssh.
+# clients. Fails when there is no server. Its shells believe that they are nested, so that the
+# user's own start-up file is not run and does not count against ssh.
 start_sshd() {
     local sshd
     sshd=$(path_of sshd) && path_of ssh >/dev/null || return

@@ -68,9 +68,9 @@ void insertEscapes(benchmark::State& state) {
     }
 }
 
-/// The text is a tenth shorter than it is said to be. With a power of two it and its copy lie so to
-/// each other in memory that their lines compete for the same places in the processor's first
-/// cache; for some lengths, and for others not, that is a factor of 1.6.
+/// The text is a tenth shorter than its nominal length. At a power of two, the text and its copy
+/// compete for the same lines of the processor's first cache, which makes some lengths 1.6 times
+/// slower.
 void replaceWords(benchmark::State& state) {
     const String text = ownText(sizeOf(state) / 10 * 9);
     const String what("quick"), with("very slow");

@@ -133,8 +133,8 @@ public:
         return line;
     }
 
-    /// What is to be said after parse() has thrown. An unknown word also keeps a required one from
-    /// being found; it is what to say then.
+    /// The text to print after parse() has thrown. An unknown word hides a missing required one, so
+    /// the unknown word is reported.
     Page pageOf(const CLI::ParseError& error) const {
         const Words unknown = app_.remaining(true);
         const bool missing = dynamic_cast<const CLI::RequiredError*>(&error) != nullptr;
@@ -216,8 +216,8 @@ const Verb* namedVerb(const std::vector<std::string>& words) {
 }
 
 CommandLine parseCommandLine(const std::vector<std::string>& words) {
-    // To declare all verbs takes longer than most of them run. What goes wrong with one of them is
-    // looked at again by a parser that can say everything there is to say.
+    // Declaring all verbs takes longer than most of them run. On an error the line is parsed again
+    // with all of them, for a complete message.
     if (const Verb* const verb = namedVerb(words); verb != nullptr) {
         try {
             return Parser({verb}).parse(words);

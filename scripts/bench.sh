@@ -58,8 +58,8 @@ measure() {
     }
 }
 
-# measure_inside NAME: one that stays within its process. What the kernel does for an allocator that
-# gives memory back and takes it again is none of the work that is measured.
+# measure_inside NAME: a benchmark that stays within its process. The cost of memory that the allocator
+# returns to the kernel and requests again is not part of the measured work.
 measure_inside() {
     GLIBC_TUNABLES=glibc.malloc.trim_threshold=4000000000:glibc.malloc.mmap_threshold=33554432 \
         measure "$@"
@@ -71,8 +71,8 @@ measure_ratios() { measure_inside "$1" --benchmark_repetitions=7 --benchmark_min
 # For growth, where the least of many longer samples counts.
 measure_growth() { measure_inside "$1" --benchmark_repetitions=15 --benchmark_min_time=0.1; }
 
-# Whether an allocator has the memory at hand that a long output needs depends on what was there
-# before; here it comes from the kernel each time.
+# Whether the allocator already holds the memory for a long output depends on what ran before. Here it
+# always comes from the kernel.
 measure_output() {
     GLIBC_TUNABLES=glibc.malloc.trim_threshold=131072:glibc.malloc.mmap_threshold=131072 \
         measure output --benchmark_repetitions=7

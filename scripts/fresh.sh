@@ -31,6 +31,7 @@ commit=$(git rev-parse --verify --short HEAD) || fail "this is no checkout"
 scripts/bootstrap.sh
 if ! command -v mmdebstrap >/dev/null; then
     echo "fresh: installing mmdebstrap"
+    apt-get update -qq
     DEBIAN_FRONTEND=noninteractive apt-get install -y -qq --no-install-recommends mmdebstrap >/dev/null
 fi
 

@@ -48,8 +48,9 @@ while [ "$run" -le "$runs" ]; do
         result=passed
     else
         result=failed
-        # The list at the end of ctest's output: "<tab> 12 - name (Failed) <labels>".
-        sed -n 's/^[[:space:]]*[0-9]* - \([^ ]*\) (.*).*/\1/p' "$log" >"$logs/list"
+        # The list at the end of ctest's output: "<tab> 12 - name (Failed) <labels>". Before it
+        # stands one of the same form with the tests that were skipped.
+        sed -n '/tests FAILED:/,$s/^[[:space:]]*[0-9]* - \([^ ]*\) (.*).*/\1/p' "$log" >"$logs/list"
         [ -s "$logs/list" ] || echo "ctest itself" >"$logs/list"
         cat "$logs/list" >>"$failures"
     fi

@@ -11,7 +11,7 @@ cd "$(dirname "$0")/.."
 
 scripts/bootstrap.sh
 echo "== shellcheck"
-shellcheck scripts/*.sh .ci/run bench/*.sh tests/*/*.sh
+shellcheck scripts/*.sh cmake/*.sh .ci/run bench/*.sh tests/*/*.sh
 all=
 [ $# -gt 0 ] || all=1
 [ $# -gt 0 ] || set -- native i686 asan

@@ -1,5 +1,4 @@
-/// What a command has to say at its end. A value, so that what is said can be tested without a
-/// terminal.
+/// A command's final output, as a value, so that it can be tested without a terminal.
 #pragma once
 
 #include <nlohmann/json_fwd.hpp>

@@ -20,7 +20,7 @@ public:
     Progress(const Progress&) = delete;
     Progress& operator=(const Progress&) = delete;
 
-    /// So many more bytes are done.
+    /// Adds that many bytes to what has been sent.
     void add(std::uintmax_t bytes);
 
 private:

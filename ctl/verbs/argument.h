@@ -1,5 +1,5 @@
-/// The arguments of a command as data: the command line, the help, completion and the manual pages
-/// all follow from these declarations.
+/// The arguments of a command as data. The command line and the help follow from these
+/// declarations.
 #pragma once
 
 #include <cstddef>
@@ -38,7 +38,7 @@ struct Argument {
     Kind kind;
     Type type;
     const char* name;  ///< with its dashes if it is not a positional
-    const char* help;  ///< lines apart by line ends; no full stop
+    const char* help;  ///< may have several lines; no full stop
 
     const char* valueName = nullptr;  ///< in the help; that of the type if null
     const char* fallback = nullptr;   ///< the value when it is not given; none if null

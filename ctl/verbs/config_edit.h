@@ -8,7 +8,7 @@
 
 namespace ctl {
 
-/// What is said when the editor left the text as it was. `row` is the reply that held it.
+/// The output when the editor changed nothing. `row` is the reply with the text.
 Page showUnchanged(const std::string& product, const nlohmann::json& row, Format format);
 
 }  // namespace ctl

@@ -19,9 +19,9 @@ struct CompletedInstall {
 /// `title` names the command, such as "install ux".
 Page showCompletedInstall(const std::string& title, const CompletedInstall& install, Format format);
 
-/// The words as one command line, which the host takes apart again at the blanks outside quotes. A
-/// word with blanks gets quotes, unless it holds quotes already: those group what they are to
-/// group. A single word is taken as a whole command line.
+/// The words as one command line, which the host splits at blanks outside quotes. A word with
+/// blanks gets quotes; a word that contains quotes is kept as it is. A single word is a whole
+/// command line.
 std::string joinedCommand(const std::vector<std::string>& words);
 
 }  // namespace ctl

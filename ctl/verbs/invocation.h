@@ -1,4 +1,4 @@
-/// What a verb gets to know when it runs.
+/// What a verb receives when it runs.
 #pragma once
 
 #include <functional>

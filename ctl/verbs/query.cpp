@@ -27,7 +27,7 @@ ExitStatus run(const Invocation& invocation) {
 
 constexpr Verb kQueryVerb = {
     "query",    "Query a table",
-    kArguments, {"zavctl query KINAGT", "zavctl query KINAGT PRODUCT=ux 'VERSION>=06'"},
+    kArguments, {"zavctl query KINAGT", "zavctl query KINAGT PRODUCT=ux 'VERSION>=01'"},
     run,
 };
 

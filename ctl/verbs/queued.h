@@ -1,5 +1,5 @@
-/// What the verbs have in common whose command the host queues: they send it, wait for its outcome
-/// and show both.
+/// Shared by the verbs whose command the host queues: they send it, wait for its outcome and show
+/// both.
 #pragma once
 
 #include <string>
@@ -14,7 +14,7 @@ namespace ctl {
 /// shown as soon as it is there. The verb must declare kNoWait and kTransid.
 TaskResult askQueued(const Invocation& invocation, TaskRequest request, const std::string& title);
 
-/// The same without a look at the verb's arguments.
+/// The same, without reading the verb's arguments.
 TaskResult askQueued(const HostAddress& host, Format format, const TaskRequest& request,
                      const std::string& title, bool wait);
 

@@ -12,8 +12,10 @@ namespace {
 constexpr Argument kInstance = textOption("--instance", "Name of the instance itself")
                                    .without("--target")
                                    .completedBy(Completion::Instance);
-constexpr Argument kArguments[] = {kProduct, kTarget.without("--instance"), kInstance, kNoWait,
-                                   kTransid};
+constexpr Argument kStartArguments[] = {kProduct, kTarget.without("--instance"), kInstance, kNoWait,
+                                        kTransid};
+/// --instance is known only to say that --target takes its place.
+constexpr Argument kArguments[] = {kProduct, kTarget, kInstance.hidden(), kNoWait, kTransid};
 
 TaskRequest requestOf(const Values& given, const std::string& command) {
     TaskRequest request;
@@ -53,7 +55,8 @@ ExitStatus restart(const Invocation& invocation) {
 }  // namespace
 
 constexpr Verb kStartVerb = {
-    "start", "Start an agent", kArguments, {"zavctl start ux", "zavctl start ux --instance db1"},
+    "start",         "Start an agent",
+    kStartArguments, {"zavctl start ux", "zavctl start ux --instance db1"},
     start,
 };
 

@@ -34,7 +34,7 @@ enum class Type {
 struct Parameter {
     const char* name;
     Type type;
-    Need need;  ///< one of the path is always there
+    Need need;  ///< path parameters are always present
     const char* doc;
 };
 

@@ -22,7 +22,7 @@ using Answer = std::variant<Reply, std::unique_ptr<EventSource>, Later>;
 /// Makes an answer on a worker thread, where it may take as long as it needs.
 using Job = std::function<Answer()>;
 
-/// An answer that somebody else gives when there is something to say.
+/// An answer that comes later, from any thread.
 struct Later {
     /// Called once, on the I/O thread, so it must not block. Whoever keeps the responder answers
     /// with it.

@@ -40,8 +40,8 @@ public:
         const oxa::Table& table_;
     };
 
-    /// Whether no query runs and no task is in hand: none is outstanding, or the feed holds the
-    /// executor. Any thread.
+    /// True when no query runs and either no task is outstanding or the feed holds the executor.
+    /// Any thread.
     bool quiet() const;
 
 private:

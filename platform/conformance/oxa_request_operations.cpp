@@ -12,7 +12,7 @@
 namespace conformance {
 namespace {
 
-/// A request that nobody made, for what needs no framework around it.
+/// A request made outside any framework, for operations that need none.
 struct LooseRequest {
     SampleManager manager;
     SampleRequest request{nullptr, nullptr, &manager};

@@ -98,7 +98,7 @@ std::uint32_t lengthOf(const unsigned short* units) {
     return static_cast<std::uint32_t>(count);
 }
 
-/// `n`, of which a count that leaves no room for the terminator is refused: it must not wrap.
+/// Returns `n`. Throws when it leaves no room for the terminator, because the sum must not wrap.
 std::uint32_t withRoomForTerminator(std::uint32_t n) {
     if (n == UINT32_MAX) throwArrayTooLong();
     return n;
@@ -126,8 +126,8 @@ String::String(String&& other) : String() {
     units_.swap(other.units_);
 }
 
-/// Takes `n` units in a block of just the size that they need.
-/// Part of its callers, since substr makes one for every token of a text.
+/// Copies `n` units into a block of exactly the size they need. Always inlined, because substr
+/// calls it for every token of a text.
 [[gnu::always_inline]] inline String::String(Counted, const unsigned short* units, std::uint32_t n)
     : units_(n + 1) {
     unsigned short* const own = units_.getData();

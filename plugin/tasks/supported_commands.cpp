@@ -12,7 +12,7 @@ namespace {
 
 RAS1_UNIT traceUnit{"zavtasks"};
 
-// Nothing is traced under the lock, so that no request waits while another one traces.
+// No line is written under the lock, so that no request waits for the trace log of another one.
 
 bool isListed(const String& command) {
     const std::lock_guard<std::mutex> lock(ZAV::commandsMutex);

@@ -21,7 +21,8 @@
 
 namespace ZAV {
 
-/// Guards `commands`. Held for moments only, and nobody waits for another lock under it.
+/// Guards `commands`. Locks of the trace and of the locale may be taken under it, never the
+/// reverse.
 extern std::mutex commandsMutex;
 
 }  // namespace ZAV

@@ -160,8 +160,11 @@ TEST(Help, OfAVerbHasItsArgumentsAndTwoExamples) {
                                      : helpText({name.substr(0, blank), name.substr(blank + 1)});
         EXPECT_THAT(text, HasSubstr(verb->help));
         EXPECT_THAT(text, HasSubstr("Usage: zavctl " + name + " [OPTIONS]"));
-        for (const ctl::Argument& argument : verb->arguments)
-            EXPECT_THAT(text, HasSubstr(std::string("\n  ") + argument.name));
+        for (const ctl::Argument& argument : verb->arguments) {
+            const bool isShown =
+                text.find(std::string("\n  ") + argument.name) != std::string::npos;
+            EXPECT_EQ(isShown, !argument.isHidden) << name << " " << argument.name;
+        }
         for (const char* const example : verb->examples)
             EXPECT_THAT(text, HasSubstr(std::string("\n  ") + example + "\n"));
     }

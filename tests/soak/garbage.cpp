@@ -16,7 +16,7 @@ std::string mutated(Chance& chance, std::string bytes) {
     return bytes;
 }
 
-/// Nothing in here may come to be a command that the host accepts.
+/// None of these may turn into a command that the host accepts.
 std::string badRequest(Chance& chance) {
     const std::string valid = postRequest("/v1/query", queryBody("KAGDYST", {{"COMMAND", "x"}}));
     switch (chance.below(12)) {

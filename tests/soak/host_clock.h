@@ -1,4 +1,4 @@
-/// Time as the host lives it: it stands still while the host is stopped.
+/// Time as the host experiences it: it stands still while the host is stopped.
 #pragma once
 
 #include <chrono>

@@ -23,8 +23,8 @@ std::string postRequest(const std::string& target, const std::string& body);
 std::string queryBody(const std::string& table,
                       const std::vector<std::pair<std::string, std::string>>& where);
 
-/// Takes one complete answer out of `in`; nothing while it is not complete. An answer that is none
-/// has the status -1.
+/// Takes one complete answer out of `in`; nothing while it is incomplete. A malformed answer has
+/// the status -1.
 std::optional<Answer> takeAnswer(std::string& in);
 
 /// One message of an event stream: a row, or how many were lost.
@@ -34,7 +34,7 @@ struct EventMessage {
     OutcomeRow row;
 };
 
-/// Takes one complete message out of `in`. Throws std::runtime_error when it is none.
+/// Takes one complete message out of `in`. Throws std::runtime_error when it is malformed.
 std::optional<EventMessage> takeEvent(std::string& in);
 
 }  // namespace soak

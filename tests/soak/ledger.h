@@ -20,8 +20,8 @@ struct OutcomeRow {
     std::string target;
 };
 
-/// What is to come of a request that is accepted, unless somebody interferes: a child that is
-/// killed counts as one that ended with 0, and one that is stopped runs out of time.
+/// The expected outcome of an accepted request, unless its child is interfered with: a killed child
+/// counts as one that ended with 0, and a stopped one runs out of time.
 enum class Hope { Any, Success, Failure };
 
 class Ledger {

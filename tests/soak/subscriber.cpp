@@ -139,7 +139,7 @@ void Subscriber::takeRows() {
     }
 }
 
-/// Of a command that was not accepted nothing is to be waited for.
+/// A command that was not accepted has no outcome to wait for.
 void Subscriber::lookForAnswer() {
     const Ledger::State state = world_.ledger.entry(record_.filter.number).state;
     served_ = served_ || state == Ledger::State::Refused || state == Ledger::State::Unknown;

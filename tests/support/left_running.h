@@ -21,7 +21,7 @@ public:
 
     /// Starts the process when a shell runs it.
     std::string command() const { return "sleep 60 & echo $! >" + scratch_.path("pid") + ";"; }
-    /// False before a shell has run command() to its end, too.
+    /// Also false until a shell has run command() completely.
     bool isRunning() const { return pid() > 0 && ::kill(pid(), 0) == 0; }
 
 private:

@@ -17,7 +17,7 @@ struct ProgramResult {
 /// Environment variables to set for a program on top of the test's own; an empty value unsets.
 using Environment = std::vector<std::pair<std::string, std::string>>;
 
-/// A program on its way; killed if it still runs when the object goes.
+/// A running program; killed if it still runs when the object is destroyed.
 class Program {
 public:
     /// Starts argv[0] with `input` as its standard input and its outputs going to files.

@@ -40,8 +40,8 @@ bool hasBits(const void* block, std::uint64_t mask) {
     return (all & mask) != 0;
 }
 
-/// How many elements of `Bits` bits each lie before the first one of which a bit is set in `word`,
-/// in the order of memory; some bit is set.
+/// The index, in memory order, of the first element of `Bits` bits that has a bit set in `word`,
+/// which is not 0.
 template <unsigned Bits>
 unsigned elementsBefore(std::uint64_t word) {
 #if __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__

@@ -114,8 +114,8 @@ constexpr struct {
     {"CP936", 1386},
 };
 
-/// The next letter or digit from `at` on, which is moved behind it, as a small letter; 0 when there
-/// is none.
+/// Returns the next letter or digit, in lower case, and moves `at` past it; 0 at the end of the
+/// text.
 int nextOf(const char*& at) {
     while (*at != '\0') {
         const int byte = static_cast<unsigned char>(*at++);

@@ -74,8 +74,7 @@ void encode(char32_t character, unsigned bytes, char* out) {
     out[0] = static_cast<char>(marker | character);
 }
 
-/// Half a block, which is what lies between characters of several bytes more often than a whole
-/// one.
+/// Half a block: the ASCII text between multi-byte characters is often shorter than a whole one.
 constexpr unsigned kHalf = 8;
 using HalfBytes = unsigned char __attribute__((vector_size(kHalf)));
 using HalfUnits = unsigned short __attribute__((vector_size(kHalf * 2)));
@@ -98,7 +97,7 @@ struct Widening {
     }
 };
 
-/// Converts the next character whatever it is, or replaces what is none. False when it has no room.
+/// Converts the next character, or replaces malformed bytes. Returns false when there is no room.
 bool widenAny(Widening& at) {
     const Decoded next = decode(at.in, at.left());
     const bool malformed = next.character == kMalformed;
