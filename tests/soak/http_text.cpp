@@ -73,10 +73,13 @@ std::optional<Answer> takeAnswer(std::string& in) {
 }
 
 std::optional<EventMessage> takeEvent(std::string& in) {
-    const std::size_t end = in.find("\n\n");
-    if (end == std::string::npos) return std::nullopt;
-    const std::string text = in.substr(0, end);
-    in.erase(0, end + 2);
+    std::string text;
+    do {  // a message that begins with a colon is a comment, which an idle stream sends
+        const std::size_t end = in.find("\n\n");
+        if (end == std::string::npos) return std::nullopt;
+        text = in.substr(0, end);
+        in.erase(0, end + 2);
+    } while (text.rfind(':', 0) == 0);
     const std::string overflow = "event: overflow\ndata: ";
     const std::string data = "data: ";
     EventMessage message;
@@ -87,7 +90,7 @@ std::optional<EventMessage> takeEvent(std::string& in) {
         } else if (text.rfind(data, 0) == 0) {
             message.row = outcomeOf(json::parse(text.substr(data.size())));
         } else {
-            throw std::runtime_error("an event that is none: " + text);
+            throw std::runtime_error("malformed event: " + text);
         }
     } catch (const json::exception& error) {
         throw std::runtime_error(std::string(error.what()) + " in the event: " + text);
