@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "ctl/client/transfer_client.h"
+#include "ctl/client/transfer/transfer_client.h"
 
 namespace ctl {
 

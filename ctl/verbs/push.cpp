@@ -6,7 +6,7 @@
 #include <nlohmann/json.hpp>
 #include <numeric>
 
-#include "ctl/client/pusher.h"
+#include "ctl/client/transfer/pusher.h"
 #include "ctl/show/transfer_progress.h"
 #include "ctl/show/transfer_status.h"
 #include "ctl/verbs/invocation.h"

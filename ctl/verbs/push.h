@@ -3,7 +3,7 @@
 
 #include <vector>
 
-#include "ctl/client/pushed_file.h"
+#include "ctl/client/transfer/pushed_file.h"
 #include "ctl/show/page.h"
 
 namespace ctl {

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "base/zavtrace.h"
-#include "util/report_scan.h"
+#include "util/process/report_scan.h"
 
 using ZAV::String;
 using ZAV::Trace;

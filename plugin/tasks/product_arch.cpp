@@ -5,7 +5,7 @@
 
 #include "base/zavtrace.h"
 #include "tasks/home.h"
-#include "util/report_scan.h"
+#include "util/process/report_scan.h"
 #include "util/zavutil.h"
 
 using ZAV::ReportBody;

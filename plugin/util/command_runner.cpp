@@ -6,8 +6,8 @@
 #include <cstring>
 
 #include "base/zavtrace.h"
-#include "util/child_end.h"
-#include "util/unit_buffer.h"
+#include "util/process/child_end.h"
+#include "util/process/unit_buffer.h"
 #include "util/zavprocs.h"
 #include "util/zavutil.h"
 

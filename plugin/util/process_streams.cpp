@@ -8,7 +8,7 @@
 #include <ctime>
 
 #include "base/zavtrace.h"
-#include "util/pipes.h"
+#include "util/process/pipes.h"
 #include "util/zavprocs.h"
 
 namespace ZAV {

@@ -8,9 +8,9 @@
 
 #include "base/zavtrace.h"
 #include "platform/bss1.h"
-#include "util/child_end.h"
 #include "util/error_text.h"
-#include "util/launch.h"
+#include "util/process/child_end.h"
+#include "util/process/launch.h"
 #include "util/zavprocs.h"
 
 namespace ZAV {

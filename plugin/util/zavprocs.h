@@ -17,7 +17,7 @@
 
 #include "base/file_descriptor.h"
 #include "base/zavstr.h"
-#include "util/deadline.h"
+#include "util/process/deadline.h"
 
 namespace ZAV {
 

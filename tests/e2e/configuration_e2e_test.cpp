@@ -8,10 +8,10 @@
 #include <filesystem>
 #include <nlohmann/json.hpp>
 
-#include "support/managed_host.h"
-#include "support/script_home.h"
-#include "support/starter_home.h"
-#include "support/task_batch.h"
+#include "support/host/managed_host.h"
+#include "support/host/script_home.h"
+#include "support/host/starter_home.h"
+#include "support/host/task_batch.h"
 
 namespace fs = std::filesystem;
 

@@ -5,7 +5,7 @@
 #include <algorithm>
 #include <sstream>
 
-#include "support/program.h"
+#include "support/host/program.h"
 
 namespace {
 

@@ -9,8 +9,8 @@
 #include <sstream>
 #include <vector>
 
-#include "support/managed_host.h"
-#include "support/script_home.h"
+#include "support/host/managed_host.h"
+#include "support/host/script_home.h"
 
 namespace {
 

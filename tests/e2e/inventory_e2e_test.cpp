@@ -9,8 +9,8 @@
 #include <cstdio>
 #include <nlohmann/json.hpp>
 
-#include "support/managed_host.h"
-#include "support/starter_home.h"
+#include "support/host/managed_host.h"
+#include "support/host/starter_home.h"
 
 namespace {
 

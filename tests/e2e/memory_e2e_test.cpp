@@ -5,8 +5,8 @@
 #include <memory>
 #include <vector>
 
-#include "support/managed_host.h"
-#include "support/script_home.h"
+#include "support/host/managed_host.h"
+#include "support/host/script_home.h"
 
 namespace {
 

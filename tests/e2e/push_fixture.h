@@ -10,8 +10,8 @@
 #include <nlohmann/json.hpp>
 #include <random>
 
-#include "support/managed_host.h"
-#include "support/script_home.h"
+#include "support/host/managed_host.h"
+#include "support/host/script_home.h"
 
 /// Reproducible bytes without a pattern.
 inline std::string randomBytes(std::size_t length, unsigned seed = 1) {

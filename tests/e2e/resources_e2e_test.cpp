@@ -6,8 +6,8 @@
 
 #include <nlohmann/json.hpp>
 
-#include "support/managed_host.h"
-#include "support/script_home.h"
+#include "support/host/managed_host.h"
+#include "support/host/script_home.h"
 
 namespace {
 

@@ -10,7 +10,7 @@
 
 #include "faults/scenario.h"
 #include "platform/bss1.h"
-#include "support/program.h"
+#include "support/host/program.h"
 #include "support/scratch_dir.h"
 #include "tasks/deploy_status.h"
 #include "tasks/fake_handlers.h"

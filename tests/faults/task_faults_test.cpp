@@ -8,9 +8,9 @@
 
 #include "faults/scenario.h"
 #include "support/fake_sleep.h"
+#include "support/host/script_home.h"
 #include "support/row_text.h"
 #include "support/scoped_env.h"
-#include "support/script_home.h"
 #include "tables/table_request.h"
 #include "tasks/agent_config.h"
 #include "tasks/home.h"

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "ctl/client/event_parser.h"
-#include "ctl/client/rpc_wire.h"
+#include "ctl/client/transfer/rpc_wire.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;

@@ -8,7 +8,7 @@
 
 #include "base/zavtoken.h"
 #include "support/fuzz_support.h"
-#include "util/report_scan.h"
+#include "util/process/report_scan.h"
 #include "util/zavprocs.h"
 
 using fuzz::require;

@@ -14,7 +14,7 @@
 #include <string>
 #include <vector>
 
-#include "support/program.h"
+#include "support/host/program.h"
 #include "support/scratch_dir.h"
 
 using Outcome = ProgramResult;

@@ -14,7 +14,7 @@
 #include <utility>
 
 #include "host/raw_client.h"
-#include "support/program.h"
+#include "support/host/program.h"
 #include "support/scratch_dir.h"
 
 namespace {

@@ -12,7 +12,7 @@
 #include <string>
 #include <utility>
 
-#include "support/program.h"
+#include "support/host/program.h"
 
 class RawClient {
 public:

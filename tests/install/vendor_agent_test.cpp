@@ -12,10 +12,10 @@
 #include <string>
 #include <vector>
 
-#include "support/program.h"
+#include "support/host/program.h"
+#include "support/host/script_home.h"
+#include "support/host/starter_home.h"
 #include "support/scratch_dir.h"
-#include "support/script_home.h"
-#include "support/starter_home.h"
 
 namespace {
 

@@ -11,10 +11,10 @@
 
 #include "embedded/oxa_host.h"
 #include "support/fake_sleep.h"
-#include "support/outcomes.h"
+#include "support/host/outcomes.h"
+#include "support/host/script_home.h"
 #include "support/row_text.h"
 #include "support/scoped_env.h"
-#include "support/script_home.h"
 #include "support/trace_capture.h"
 #include "tables/zav01agt.h"
 #include "tables/zav02agt.h"

@@ -25,7 +25,7 @@
 #include "embedded/ncs_host.h"
 #include "ncs/memory.h"
 #include "platform/ncs_packets.h"
-#include "support/program.h"
+#include "support/host/program.h"
 #include "support/scratch_dir.h"
 
 namespace {

@@ -4,8 +4,8 @@
 #include <nlohmann/json.hpp>
 #include <string>
 
-#include "soak/client.h"
-#include "soak/http_text.h"
+#include "soak/load/client.h"
+#include "soak/load/http_text.h"
 
 namespace soak {
 

@@ -1,9 +1,9 @@
 #include "soak/mix.h"
 
-#include "soak/garbage.h"
-#include "soak/pusher.h"
-#include "soak/requester.h"
-#include "soak/subscriber.h"
+#include "soak/load/garbage.h"
+#include "soak/load/pusher.h"
+#include "soak/load/requester.h"
+#include "soak/load/subscriber.h"
 
 namespace soak {
 namespace {

@@ -1,8 +1,8 @@
 /// Which clients there are.
 #pragma once
 
-#include "soak/client.h"
-#include "soak/commands.h"
+#include "soak/load/client.h"
+#include "soak/load/commands.h"
 
 namespace soak {
 

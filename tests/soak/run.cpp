@@ -7,8 +7,8 @@
 #include <filesystem>
 #include <stdexcept>
 
-#include "soak/requester.h"
-#include "soak/subscriber.h"
+#include "soak/load/requester.h"
+#include "soak/load/subscriber.h"
 
 namespace soak {
 namespace {

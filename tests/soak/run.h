@@ -4,9 +4,9 @@
 #include <cstdint>
 #include <string>
 
-#include "soak/client.h"
 #include "soak/gauges.h"
 #include "soak/host_process.h"
+#include "soak/load/client.h"
 #include "soak/mix.h"
 #include "soak/weather.h"
 

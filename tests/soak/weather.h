@@ -1,8 +1,8 @@
 /// What happens around the host.
 #pragma once
 
-#include "soak/client.h"
 #include "soak/host_process.h"
+#include "soak/load/client.h"
 
 namespace soak {
 

@@ -14,7 +14,7 @@
 
 #include "embedded/oxa_host.h"
 #include "support/fake_sleep.h"
-#include "support/outcomes.h"
+#include "support/host/outcomes.h"
 #include "support/row_text.h"
 #include "support/trace_capture.h"
 #include "tables/zav01agt.h"

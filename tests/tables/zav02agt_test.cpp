@@ -9,7 +9,7 @@
 #include <thread>
 #include <vector>
 
-#include "support/outcomes.h"
+#include "support/host/outcomes.h"
 #include "support/row_text.h"
 #include "support/trace_capture.h"
 #include "tables/table_checks.h"

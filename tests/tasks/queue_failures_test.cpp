@@ -11,8 +11,8 @@
 #include <vector>
 
 #include "support/fake_sleep.h"
-#include "support/outcomes.h"
-#include "support/program.h"
+#include "support/host/outcomes.h"
+#include "support/host/program.h"
 #include "support/row_text.h"
 #include "support/trace_capture.h"
 #include "tasks/fake_handlers.h"

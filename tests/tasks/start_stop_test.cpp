@@ -8,9 +8,9 @@
 #include <string>
 #include <vector>
 
+#include "support/host/script_home.h"
 #include "support/row_text.h"
 #include "support/scoped_env.h"
-#include "support/script_home.h"
 #include "support/trace_capture.h"
 #include "tasks/home.h"
 #include "tasks/zavtqelm.h"

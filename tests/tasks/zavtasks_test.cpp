@@ -11,9 +11,9 @@
 #include <vector>
 
 #include "support/fake_sleep.h"
-#include "support/outcomes.h"
+#include "support/host/outcomes.h"
+#include "support/host/script_home.h"
 #include "support/row_text.h"
-#include "support/script_home.h"
 #include "support/trace_capture.h"
 #include "tasks/home.h"
 

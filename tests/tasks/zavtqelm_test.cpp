@@ -7,7 +7,7 @@
 #include <utility>
 
 #include "support/fake_sleep.h"
-#include "support/outcomes.h"
+#include "support/host/outcomes.h"
 #include "support/row_text.h"
 #include "support/trace_capture.h"
 #include "tables/zav02agt.h"

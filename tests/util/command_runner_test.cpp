@@ -8,8 +8,8 @@
 
 #include "support/child_role.h"
 #include "support/clock.h"
+#include "support/host/program.h"
 #include "support/left_running.h"
-#include "support/program.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"

@@ -10,7 +10,7 @@
 #include <thread>
 #include <utility>
 
-#include "chunks.h"
+#include "ctl/client/chunks.h"
 #include "support/scratch_dir.h"
 
 namespace ctl_test {

@@ -6,8 +6,8 @@
 #include <cstdint>
 #include <string>
 
-#include "ctl/client/chunk_batch.h"
-#include "ctl/client/rpc_wire.h"
+#include "ctl/client/transfer/chunk_batch.h"
+#include "ctl/client/transfer/rpc_wire.h"
 
 namespace ctl_test {
 

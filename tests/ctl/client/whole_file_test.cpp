@@ -3,7 +3,7 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 
-#include "chunks.h"
+#include "ctl/client/chunks.h"
 #include "ctl/client/failure.h"
 #include "support/scratch_dir.h"
 

@@ -8,7 +8,7 @@
 #include <memory>
 #include <stdexcept>
 
-#include "support/program.h"
+#include "support/host/program.h"
 
 namespace {
 

@@ -10,7 +10,7 @@
 #include <thread>
 
 #include "host/made_up_table.h"
-#include "support/program.h"
+#include "support/host/program.h"
 
 namespace {
 

@@ -12,8 +12,8 @@
 #include "host/process/plugin_loader.h"
 #include "host/tables/row_fields.h"
 #include "support/fake_sleep.h"
-#include "support/program.h"
-#include "support/script_home.h"
+#include "support/host/program.h"
+#include "support/host/script_home.h"
 
 namespace {
 
