@@ -58,7 +58,8 @@ void run(const HostOptions& options) {
     SocketFile socket(options.socket);
     SocketFile transferSocket(options.rpcSocket);
     const int endDescriptor = catchEndSignals();
-    Services services(startPlugin(options), CodePage::ofProcess(), options.home);
+    Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
+                      options.guarded);
     Api api(services, routes());
     ncs::Server transfers;
     serveTransfers(transfers, transferSocket, options);

@@ -5,6 +5,7 @@
 
 #include "host/api/call.h"
 #include "host/api/services.h"
+#include "host/guard/refusal.h"
 #include "host/tables/bad_request.h"
 #include "host/tables/query.h"
 
@@ -17,6 +18,8 @@ Answer answerTo(Services& services, Call& call) {
         return call.route().endpoint(services, call);
     } catch (const BadRequest& bad) {
         return errorReply(400, bad.what());
+    } catch (const Refusal& refused) {
+        return guardReply(refused.httpStatus(), refused.what(), refused.guard(), refused.hint());
     } catch (const QueryFailed& failed) {
         return errorReply(failed.gone() ? 404 : 500, failed.what());
     }

@@ -19,7 +19,8 @@ Answer getHealth(Services& services, const Call&) {
         {"home", services.codePage.toUtf8(services.home)},
         {"origin_node", services.codePage.toUtf8(oxa::originNode())},
         {"uptime_seconds", duration_cast<std::chrono::seconds>(uptime).count()},
-        {"subscriptions", services.counts.streams.load()}};
+        {"subscriptions", services.counts.streams.load()},
+        {"guarded", services.guarded}};
     return jsonReply(200, document.dump());
 }
 

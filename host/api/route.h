@@ -13,7 +13,7 @@ class Call;
 struct Services;
 
 /// Answers one request that fits its route. What it throws as BadRequest is answered with 400, as
-/// QueryFailed with 404 or 500.
+/// Refusal with 409 or 400, as QueryFailed with 404 or 500.
 using Endpoint = Answer(Services& services, const Call& call);
 
 /// Where an endpoint runs.

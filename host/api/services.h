@@ -18,16 +18,18 @@ namespace host {
 /// Made once, after the plug-in has started, and shared by all requests. Any thread.
 struct Services {
     Services(std::vector<oxa::Table> offered, CodePage localCodePage, std::string homeDirectory,
-             RowQueue::Limits limits = {})
+             RowQueue::Limits limits = {}, bool isGuarded = true)
         : tables(std::move(offered)),
           codePage(std::move(localCodePage)),
           home(std::move(homeDirectory)),
-          eventLimits(limits) {}
+          eventLimits(limits),
+          guarded(isGuarded) {}
 
     const TableSet tables;
     const CodePage codePage;  ///< the one that tables speak
     const std::string home;   ///< in that code page
     const RowQueue::Limits eventLimits;
+    const bool guarded;  ///< false: no guard looks at a request
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
     ServerCounts counts;
     OutcomeFeed outcomes{tables};

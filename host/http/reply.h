@@ -21,4 +21,9 @@ Reply jsonReply(unsigned status, std::string document);
 /// {"error": text}. Bytes of `text` that are not UTF-8 are replaced, so it may quote the client.
 Reply errorReply(unsigned status, std::string_view text);
 
+/// The same with "guard", the name of the guard that refused the request, and "hint", the way out,
+/// which is left out if it is empty.
+Reply guardReply(unsigned status, std::string_view text, std::string_view guard,
+                 std::string_view hint);
+
 }  // namespace host

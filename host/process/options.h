@@ -15,6 +15,7 @@ struct HostOptions {
     std::optional<std::uint16_t> rpcPort;   ///< absent: no TCP
     std::optional<std::string> originNode;  ///< absent: the platform's own choice
     std::optional<std::string> plugin;      ///< absent: searched for
+    bool guarded = true;                    ///< false: the plug-in's own behaviour is seen in full
 };
 
 /// The value of an environment variable, or null.

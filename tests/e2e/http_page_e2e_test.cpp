@@ -84,7 +84,8 @@ protected:
     }
 
     ScriptHome home;
-    ManagedHost host{home.path(), {{"QVSDEPLOY_AGENTDEPOT", home.depot()}}};
+    ManagedHost host{
+        home.path(), {{"QVSDEPLOY_AGENTDEPOT", home.depot()}}, {}, ManagedHost::Guards::On};
 };
 
 TEST_F(HttpPage, EveryCommandAnswersAsThePageSays) {

@@ -16,7 +16,7 @@ protected:
     std::string subscriptionsInHealth() {
         const std::string body = connect().get("/v1/health").body;
         const std::size_t at = body.find("\"subscriptions\":");
-        return at == std::string::npos ? body : body.substr(at + 16, body.find('}', at) - at - 16);
+        return at == std::string::npos ? body : body.substr(at + 16, body.find(',', at) - at - 16);
     }
 };
 

@@ -35,11 +35,12 @@ std::string zavctlPath() {
 }
 
 ManagedHost::ManagedHost(const std::string& home, const Environment& environment,
-                         const std::vector<std::string>& moreArguments)
+                         const std::vector<std::string>& moreArguments, Guards guards)
     : home_(home),
       environment_(environment),
       moreArguments_(moreArguments),
       socket_(scratch_.path("host.sock")) {
+    if (guards == Guards::Off) moreArguments_.emplace_back("--unguarded");
     start();
 }
 

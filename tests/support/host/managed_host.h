@@ -14,9 +14,13 @@ std::string zavctlPath();
 
 class ManagedHost {
 public:
+    /// Off: the plug-in's own behaviour is seen, on homes that lack most of their programs too.
+    enum class Guards { Off, On };
+
     /// Starts the host on `home` and returns when it is ready; throws when it does not get there.
     explicit ManagedHost(const std::string& home, const Environment& environment = {},
-                         const std::vector<std::string>& moreArguments = {});
+                         const std::vector<std::string>& moreArguments = {},
+                         Guards guards = Guards::Off);
     ~ManagedHost();
 
     const std::string& socket() const { return socket_; }
