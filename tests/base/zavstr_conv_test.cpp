@@ -91,7 +91,7 @@ TEST_F(StringLatin1, EveryByteSurvives) {
     const String text(bytes.c_str());
     ASSERT_EQ(text.length(), 255u);
     for (unsigned i = 0; i < 255; ++i)
-        ASSERT_EQ(i + 1, text[i]);
+        ASSERT_EQ(text[i], i + 1);
     EXPECT_EQ(narrow(text), bytes);
 }
 

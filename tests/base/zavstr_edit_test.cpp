@@ -36,7 +36,7 @@ TEST(StringAppend, KeepsTheTerminatorAtEveryLength) {
         text.append(static_cast<unsigned short>('a' + i % 26));
         ASSERT_EQ(text.length(), i + 1);
         ASSERT_TRUE(isTerminated(text));
-        ASSERT_EQ('a' + i % 26, text[i]);
+        ASSERT_EQ(text[i], 'a' + i % 26);
     }
 }
 
@@ -307,7 +307,7 @@ TEST_P(StringBounds, AreTracedAndThrown) {
     EXPECT_EQ(lines[0].text, "IndexOutOfBounds occurred, throwing exception");
     EXPECT_EQ(message, "line: " + std::to_string(lines[0].line) + ", file: zavstr");
     EXPECT_GT(lines[0].line, 0);
-    EXPECT_EQ(GetParam().text, text);
+    EXPECT_EQ(text, GetParam().text);
 }
 
 INSTANTIATE_TEST_SUITE_P(All, StringBounds, testing::ValuesIn(kBadCalls),

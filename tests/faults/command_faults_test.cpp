@@ -132,12 +132,12 @@ TEST_F(CommandFaults, AChildThatSomebodyElseReaped) {
     EXPECT_EQ(result, "true 0 [x\n] []");
     EXPECT_THAT(traces.errors(),
                 testing::ElementsAre("Error occurred. ERRNO:10 No child processes"));
-    EXPECT_LT(0, ::waitpid(-1, nullptr, 0));  // there was nobody else
+    EXPECT_GT(::waitpid(-1, nullptr, 0), 0);  // there was nobody else
 }
 
 TEST_F(CommandFaults, WithoutASearchPathTheCommandRunsAllTheSame) {
     const ScopedEnv path("PATH", nullptr);
-    EXPECT_EQ(echo_.unharmed(), echo_.runOnce());
+    EXPECT_EQ(echo_.runOnce(), echo_.unharmed());
 }
 
 TEST_F(CommandFaults, TheServersNameCannotBeFoundWithoutACommand) {

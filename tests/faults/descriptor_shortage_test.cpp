@@ -120,7 +120,7 @@ TEST_F(DescriptorShortage, WholeFilesNeedOne) {
     const End closed{"0",
                      {"Failed to open file " + file + " using mode \"rb\", check permissions"}};
     const auto write = [&] { return std::to_string(writeFile(file.c_str(), "text")); };
-    EXPECT_EQ(closed, with(0, write));
+    EXPECT_EQ(with(0, write), closed);
     EXPECT_EQ(with(1, write), (End{"1", {}}));
     const auto read = [&] { return narrow(readFile(file.c_str())); };
     EXPECT_EQ(with(0, read), (End{"", closed.errors}));

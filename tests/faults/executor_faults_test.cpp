@@ -117,8 +117,8 @@ TEST_F(ExecutorFaults, WithoutAnyMemoryTheExecutorPausesAndRunsTheNextTaskAfterw
     EXPECT_EQ(lastCode, 0);
     // Each attempt and each look at the queue says so, at the pace of the pauses.
     const int told = traces_.count('E', "Exception caught: %s");
-    EXPECT_LE(kPauses, told);
-    EXPECT_GE(sleeps - sleptBefore + 2, told);
+    EXPECT_GE(told, kPauses);
+    EXPECT_LE(told, sleeps - sleptBefore + 2);
 }
 
 }  // namespace

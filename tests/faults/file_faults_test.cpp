@@ -157,7 +157,7 @@ TEST_F(FileFaults, CopyingNamesTheStepThatFailed) {
                                          error)});
     }
     const End unread = copyFailure("Error reading from file " + source + ", error code: ", EIO);
-    EXPECT_EQ(unread, scenario.endWith(Call::kRead, 1, EIO));
+    EXPECT_EQ(scenario.endWith(Call::kRead, 1, EIO), unread);
     EXPECT_EQ(scenario.endWith(Call::kRead, 6, EIO), (End{"5 5000", unread.errors}));
     // What does not fit the buffer shows while writing, the rest when the file is closed.
     scenario.expectEach(Call::kWrite, ENOSPC,

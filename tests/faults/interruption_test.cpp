@@ -147,7 +147,7 @@ TEST_F(Interruption, EveryOtherCallChangesNothing) {
         }
         EXPECT_TRUE(expected == result) << operation.name << ": " << result.substr(0, 200);
         if (std::strcmp(operation.name, "directories") != 0) {
-            EXPECT_LT(0, interrupted) << operation.name;
+            EXPECT_GT(interrupted, 0) << operation.name;
         }
     }
 }
@@ -162,7 +162,7 @@ TEST_F(Interruption, AStormOfSignalsChangesNothing) {
             const std::string result = operation.run();
             ASSERT_TRUE(expected == result) << operation.name << ": " << result.substr(0, 200);
         } while (watch.seconds() < 0.1);
-        EXPECT_LT(0, signalsTaken) << operation.name;
+        EXPECT_GT(signalsTaken, 0) << operation.name;
     }
 }
 
@@ -172,7 +172,7 @@ TEST_F(Interruption, AStormNeitherShortensNorProlongsTheTimeout) {
     const SignalStorm storm;
     const Stopwatch watch;
     EXPECT_EQ(run("/bin/sleep 60"), "false 0|");
-    EXPECT_LE(0.99, watch.seconds());
+    EXPECT_GE(watch.seconds(), 0.99);
 }
 
 }  // namespace

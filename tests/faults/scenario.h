@@ -39,7 +39,7 @@ class NothingLeft {
 public:
     NothingLeft() = default;
     ~NothingLeft() {
-        EXPECT_EQ(descriptors_, child_role::openDescriptors());
+        EXPECT_EQ(child_role::openDescriptors(), descriptors_);
         EXPECT_TRUE(::waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD);
     }
     NothingLeft(const NothingLeft&) = delete;
@@ -65,7 +65,7 @@ public:
     /// and so on; there are no more such calls than that.
     void expectEach(Call call, int error, const std::vector<End>& ends) {
         for (std::size_t i = 0; i < ends.size(); ++i) {
-            EXPECT_EQ(ends[i], endWith(call, static_cast<int>(i) + 1, error))
+            EXPECT_EQ(endWith(call, static_cast<int>(i) + 1, error), ends[i])
                 << nameOf(call) << ' ' << i + 1;
             EXPECT_TRUE(happened_) << nameOf(call) << ' ' << i + 1;
         }

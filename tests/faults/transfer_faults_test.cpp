@@ -179,7 +179,7 @@ TEST_F(TransferFaults, NoConversionLeavesATemporaryFileForTheNext) {
     Scenario script = transferOf("install.sh", "ab\nab\n");
     script.endWith(Call::kWrite, 1, ENOSPC);
     EXPECT_TRUE(scratch_.exists("home/tmp/.zavtemp"));
-    EXPECT_EQ(script.unharmed().result, send("install.sh"));
+    EXPECT_EQ(send("install.sh"), script.unharmed().result);
     EXPECT_FALSE(scratch_.exists("home/tmp/.zavtemp"));
 }
 

@@ -35,8 +35,8 @@ protected:
         return {0, "not a reply"};
     }
     void expectError(unsigned status, const std::string& text, const host::Reply& reply) {
-        EXPECT_EQ(host::errorReply(status, text).body, reply.body);
-        EXPECT_EQ(status, reply.status) << text;
+        EXPECT_EQ(reply.body, host::errorReply(status, text).body);
+        EXPECT_EQ(reply.status, status) << text;
     }
 
     MadeUpTable table{"PLAIN", plainColumns()};

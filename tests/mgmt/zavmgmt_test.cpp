@@ -75,13 +75,13 @@ TEST_F(StartUp, WithoutAHomeTheLibraryStaysInert) {
     EXPECT_EQ(zav_kinagt_static_manager, nullptr);
     EXPECT_EQ(zav_kagdyst_static_manager, nullptr);
     EXPECT_FALSE(initialized);
-    EXPECT_EQ(threads, threadCount());
+    EXPECT_EQ(threadCount(), threads);
 }
 
 TEST_F(StartUp, TheHomeIsTheVariablesValueItself) {
     setHome("/opt/tovrin");
-    EXPECT_EQ(::getenv("TOVRINHOME"), Initialize_Tovrin_Home());
-    EXPECT_EQ(::getenv("TOVRINHOME"), ZAV_TOVRINHOME);
+    EXPECT_EQ(Initialize_Tovrin_Home(), ::getenv("TOVRINHOME"));
+    EXPECT_EQ(ZAV_TOVRINHOME, ::getenv("TOVRINHOME"));
     ::unsetenv("TOVRINHOME");
     TraceCapture trace;
     EXPECT_EQ(Initialize_Tovrin_Home(), nullptr);
@@ -131,7 +131,7 @@ TEST_F(StartUp, ASecondCallStartsNoSecondExecutor) {
     const std::ptrdiff_t threads = threadCount();
     zav_kagreqt_manager* const former = zav_kagreqt_static_manager;
     EXPECT_EQ(Initialize_Mgmt_Functions(), 0);
-    EXPECT_EQ(threads, threadCount());
+    EXPECT_EQ(threadCount(), threads);
     EXPECT_NE(zav_kagreqt_static_manager, former);
     EXPECT_EQ(commands.size(), 9u);
     EXPECT_EQ(tableNames(), (Texts{"KAGREQT", "KINAGT", "KAGDYST"}));

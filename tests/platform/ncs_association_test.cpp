@@ -226,7 +226,7 @@ TEST_F(AnAssociation, PutsFragmentsTogetherWhereverTheyAreCut) {
             wire.feed(requestPackets(kRepeat, stub, part), portion);
             const std::vector<Reply> answers = wire.answers();
             ASSERT_EQ(answers.size(), 1U) << part << " " << portion;
-            EXPECT_EQ(stub, answers[0].stub()) << part << " " << portion;
+            EXPECT_EQ(answers[0].stub(), stub) << part << " " << portion;
         }
     }
 }
@@ -239,7 +239,7 @@ TEST_F(AnAssociation, TakesLargeRequestsInPortionsOfAnySize) {
     for (const std::size_t part : {1408U, 5816U, 20'000U, 60'000U}) {
         for (const std::size_t portion : {999U, 8192U, 8193U, 65'536U, 1'000'000U}) {
             wire.feed(requestPackets(kRepeat, stub, part), portion);
-            EXPECT_EQ(stub, stubOf(wire.answers())) << part << " " << portion;
+            EXPECT_EQ(stubOf(wire.answers()), stub) << part << " " << portion;
         }
     }
 }
@@ -255,8 +255,8 @@ TEST_F(AnAssociation, AnswersRequestsThatComeOneBehindTheOther) {
         const std::vector<Reply> answers = wire.answers();
         ASSERT_EQ(answers.size(), 500U);
         for (std::uint32_t i = 0; i < 500; ++i) {
-            EXPECT_EQ(i, answers[i].callId);
-            EXPECT_EQ(std::to_string(i), answers[i].stub());
+            EXPECT_EQ(answers[i].callId, i);
+            EXPECT_EQ(answers[i].stub(), std::to_string(i));
         }
     }
 }
@@ -288,7 +288,7 @@ TEST_F(AnAssociation, NoTruncatedRequestIsAnsweredOrCalled) {
         fresh.answers();
         fresh.feed(request.substr(0, length));
         EXPECT_TRUE(fresh.answers().empty()) << length;
-        EXPECT_EQ(length > 0, fresh.association->isMidRequest()) << length;
+        EXPECT_EQ(fresh.association->isMidRequest(), length > 0) << length;
         EXPECT_EQ(callsOfRepeat(), 0) << length;
     }
 }
@@ -391,7 +391,7 @@ TEST_F(AnAssociation, LargeRepliesComeInFragments) {
     wire.feed(bindPacket({Context{}}, true, kBind, 1432));
     wire.answers();
     const std::vector<Reply> answers = wire.ask(fragment(3, kFill, ""));
-    EXPECT_EQ((65'536U + 1407) / 1408, answers.size());
+    EXPECT_EQ(answers.size(), (65'536U + 1407) / 1408);
     EXPECT_EQ(stubOf(answers), std::string(65'536, 'f'));
 }
 
@@ -402,7 +402,7 @@ TEST_F(AnAssociation, WaitsWithRequestsWhileItsAnswersAreNotTaken) {
         packets += fragment(3, kFill, "", i);
     iovec ranges[2];
     wire.association->windows(ranges);
-    ASSERT_LE(packets.size(), ranges[0].iov_len);
+    ASSERT_GE(ranges[0].iov_len, packets.size());
     std::memcpy(ranges[0].iov_base, packets.data(), packets.size());
     wire.association->received(packets.size());
     EXPECT_LT(wire.association->output().size(), 400'000U);

@@ -37,9 +37,9 @@ TEST_F(Blocks, HoldWhatWasAskedForAndAreAligned) {
 TEST_F(Blocks, TheLatestLargeOneIsUsedAgain) {
     void* const first = rpc__malloc(3 * kMiB);
     rpc__free(first);
-    EXPECT_EQ(4 * kMiB, ncs::keptBytes());
+    EXPECT_EQ(ncs::keptBytes(), 4 * kMiB);
     void* const second = rpc__malloc(4 * kMiB);
-    EXPECT_EQ(first, second);
+    EXPECT_EQ(second, first);
     EXPECT_EQ(ncs::keptBytes(), 0U);
     rpc__free(second);
 }
@@ -56,7 +56,7 @@ TEST_F(Blocks, FewAreKeptAndReleasedOnDemand) {
         blocks.push_back(rpc__malloc(4 * kMiB));
     for (void* block : blocks)
         rpc__free(block);
-    EXPECT_EQ(16 * kMiB, ncs::keptBytes());
+    EXPECT_EQ(ncs::keptBytes(), 16 * kMiB);
     ncs::releaseKeptBlocks();
     EXPECT_EQ(ncs::keptBytes(), 0U);
 }

@@ -30,10 +30,10 @@ INSTANTIATE_TEST_SUITE_P(Callers, BothOrders, testing::Values(true, false));
 TEST_P(BothOrders, AHeaderIsRead) {
     const std::string packet = Packet(kRequest, 0x12345678, GetParam(), 0x83).raw("0123").done();
     ncs::PduHeader header;
-    ASSERT_EQ(ncs::HeaderProblem::None, decode(packet, header));
+    ASSERT_EQ(decode(packet, header), ncs::HeaderProblem::None);
     EXPECT_TRUE(header.is(ncs::PduType::Request));
     EXPECT_EQ(header.flags, 0x83);
-    EXPECT_EQ(GetParam(), header.littleEndian);
+    EXPECT_EQ(header.littleEndian, GetParam());
     EXPECT_EQ(header.fragmentLength, 20);
     EXPECT_EQ(header.authLength, 0);
     EXPECT_EQ(header.callId, 0x12345678U);
@@ -44,8 +44,8 @@ TEST_P(BothOrders, ARequestsHeadIsRead) {
         const std::string packet =
             fragment(hasObject ? 0x83 : 3, 0x0102, "stub", 9, GetParam(), 0x0304, 0x05060708);
         ncs::PduHeader header;
-        ASSERT_EQ(ncs::HeaderProblem::None, decode(packet, header));
-        EXPECT_EQ(hasObject ? 40U : 24U, ncs::requestHeadSize(header));
+        ASSERT_EQ(decode(packet, header), ncs::HeaderProblem::None);
+        EXPECT_EQ(ncs::requestHeadSize(header), hasObject ? 40U : 24U);
         const ncs::RequestHead head = ncs::decodeRequestHead(bytesOf(packet), header);
         EXPECT_EQ(head.allocationHint, 0x05060708U);
         EXPECT_EQ(head.contextId, 0x0304);
@@ -62,7 +62,7 @@ TEST_P(BothOrders, ABindIsRead) {
     const std::string packet = bindPacket({Context{}, second}, GetParam(), kBind, 4280, 0x0A0B0C0D);
     ncs::PduHeader header;
     ncs::BindRequest bind;
-    ASSERT_EQ(ncs::HeaderProblem::None, decode(packet, header));
+    ASSERT_EQ(decode(packet, header), ncs::HeaderProblem::None);
     ASSERT_TRUE(ncs::decodeBind(bytesOf(packet), packet.size(), header, bind));
     EXPECT_EQ(bind.largestSent, 4280);
     EXPECT_EQ(bind.largestTaken, 4280);
@@ -79,7 +79,7 @@ TEST_P(BothOrders, ABindIsRead) {
 TEST_P(BothOrders, ABindThatEndsAnywhereBeforeItsEndIsRefused) {
     const std::string packet = bindPacket({Context{}, Context{}}, GetParam());
     ncs::PduHeader header;
-    ASSERT_EQ(ncs::HeaderProblem::None, decode(packet, header));
+    ASSERT_EQ(decode(packet, header), ncs::HeaderProblem::None);
     for (std::size_t length = 16; length < packet.size(); ++length) {
         // A block of exactly that length, so that the sanitizers see any look behind it.
         const std::vector<unsigned char> part(packet.begin(),
@@ -95,35 +95,35 @@ TEST(Header, FewerThanSixteenBytesAreIncomplete) {
         const std::vector<unsigned char> part(packet.begin(),
                                               packet.begin() + static_cast<long>(length));
         ncs::PduHeader header;
-        EXPECT_EQ(ncs::HeaderProblem::Incomplete,
-                  ncs::decodeHeader(part.data(), part.size(), header));
+        EXPECT_EQ(ncs::decodeHeader(part.data(), part.size(), header),
+                  ncs::HeaderProblem::Incomplete);
     }
 }
 
 TEST(Header, VersionsFiveZeroAndFiveOneAreUnderstood) {
-    EXPECT_EQ(ncs::HeaderProblem::None, problemOf(Packet(kBind).poke(1, 1).done()));
-    EXPECT_EQ(ncs::HeaderProblem::Version, problemOf(Packet(kBind).poke(1, 2).done()));
-    EXPECT_EQ(ncs::HeaderProblem::Version, problemOf(Packet(kBind).poke(0, 4).done()));
-    EXPECT_EQ(ncs::HeaderProblem::Version, problemOf(std::string(16, '\0')));
+    EXPECT_EQ(problemOf(Packet(kBind).poke(1, 1).done()), ncs::HeaderProblem::None);
+    EXPECT_EQ(problemOf(Packet(kBind).poke(1, 2).done()), ncs::HeaderProblem::Version);
+    EXPECT_EQ(problemOf(Packet(kBind).poke(0, 4).done()), ncs::HeaderProblem::Version);
+    EXPECT_EQ(problemOf(std::string(16, '\0')), ncs::HeaderProblem::Version);
 }
 
 TEST(Header, OnlyIntegersOfTwoOrdersAndAsciiAreUnderstood) {
-    EXPECT_EQ(ncs::HeaderProblem::Representation, problemOf(Packet(kBind).poke(4, 0x20).done()));
-    EXPECT_EQ(ncs::HeaderProblem::Representation, problemOf(Packet(kBind).poke(4, 0x11).done()));
-    EXPECT_EQ(ncs::HeaderProblem::None, problemOf(Packet(kBind).poke(5, 3).done()));
+    EXPECT_EQ(problemOf(Packet(kBind).poke(4, 0x20).done()), ncs::HeaderProblem::Representation);
+    EXPECT_EQ(problemOf(Packet(kBind).poke(4, 0x11).done()), ncs::HeaderProblem::Representation);
+    EXPECT_EQ(problemOf(Packet(kBind).poke(5, 3).done()), ncs::HeaderProblem::None);
 }
 
 TEST(Header, ALengthThatHoldsNotEvenTheHeaderIsRefused) {
     for (const unsigned length : {0U, 15U}) {
         std::string packet = Packet(kBind).done();
         packet[8] = static_cast<char>(length);
-        EXPECT_EQ(ncs::HeaderProblem::Length, problemOf(packet));
+        EXPECT_EQ(problemOf(packet), ncs::HeaderProblem::Length);
     }
     std::string packet = Packet(kBind).u32(0).done();
     packet[10] = 4;
-    EXPECT_EQ(ncs::HeaderProblem::None, problemOf(packet));
+    EXPECT_EQ(problemOf(packet), ncs::HeaderProblem::None);
     packet[10] = 5;
-    EXPECT_EQ(ncs::HeaderProblem::Length, problemOf(packet));
+    EXPECT_EQ(problemOf(packet), ncs::HeaderProblem::Length);
 }
 
 std::string bytes(std::initializer_list<int> values) {
@@ -180,13 +180,13 @@ TEST(Encoding, AResponseIsCutAtMultiplesOfEight) {
         std::string out;
         ncs::encodeResponse(3, 4, bytesOf(data), length, 1432, out);
         const std::vector<Reply> fragments = replies(out);
-        EXPECT_EQ(length == 0 ? 1 : (length + 1407) / 1408, fragments.size());
-        EXPECT_EQ(data.substr(0, length), stubOf(fragments));
+        EXPECT_EQ(fragments.size(), length == 0 ? 1 : (length + 1407) / 1408);
+        EXPECT_EQ(stubOf(fragments), data.substr(0, length));
         for (std::size_t i = 0; i < fragments.size(); ++i) {
             const bool isLast = i + 1 == fragments.size();
-            EXPECT_EQ((i == 0 ? 1 : 0) | (isLast ? 2 : 0), fragments[i].flags);
+            EXPECT_EQ(fragments[i].flags, (i == 0 ? 1 : 0) | (isLast ? 2 : 0));
             EXPECT_TRUE(isLast || fragments[i].stub().size() % 8 == 0);
-            EXPECT_EQ(length - i * 1408, fragments[i].number(0, 4));
+            EXPECT_EQ(fragments[i].number(0, 4), length - i * 1408);
             EXPECT_EQ(fragments[i].number(4, 2), 4U);
         }
     }

@@ -43,7 +43,7 @@ TEST(Registry, ASecondRegistrationReplacesTheFirst) {
     ASSERT_EQ(registerWith(&first), rpc__s_ok);
     const unsigned count = ncs::registeredCount();
     ASSERT_EQ(registerWith(&second), rpc__s_ok);
-    EXPECT_EQ(count, ncs::registeredCount());
+    EXPECT_EQ(ncs::registeredCount(), count);
     ncs::RegisteredInterface found;
     ASSERT_TRUE(ncs::findInterface(kId, 3, found));
     EXPECT_EQ(found.manager, &second);
@@ -51,9 +51,9 @@ TEST(Registry, ASecondRegistrationReplacesTheFirst) {
 
 TEST(Registry, TakesNoManagersOfObjectsNorStubsOfAnotherCount) {
     const unsigned count = ncs::registeredCount();
-    EXPECT_EQ(rpc__s_unknown_if, registerWith(nullptr, kOtherId));
-    EXPECT_EQ(rpc__s_unknown_if, registerWith(nullptr, uuid__nil, rpc__server_epv{nullptr, 1}));
-    EXPECT_EQ(count, ncs::registeredCount());
+    EXPECT_EQ(registerWith(nullptr, kOtherId), rpc__s_unknown_if);
+    EXPECT_EQ(registerWith(nullptr, uuid__nil, rpc__server_epv{nullptr, 1}), rpc__s_unknown_if);
+    EXPECT_EQ(ncs::registeredCount(), count);
 }
 
 }  // namespace

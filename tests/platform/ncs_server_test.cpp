@@ -234,7 +234,7 @@ TEST_F(AServer, AnswersOverTcpOnLoopbackAndNamesItsPort) {
     client.send(bindPacket());
     const Reply answer = client.receive();
     ASSERT_EQ(answer.type, kBindAck);
-    EXPECT_EQ(std::to_string(port) + '\0', answer.body.substr(10, answer.number(8, 2)));
+    EXPECT_EQ(answer.body.substr(10, answer.number(8, 2)), std::to_string(port) + '\0');
     EXPECT_EQ(client.repeat("hello"), "hello");
 }
 
@@ -272,7 +272,7 @@ TEST_F(AServer, ServesSeveralAssociationsAtOnce) {
             for (int i = 0; i < 50; ++i) {
                 const std::string stub(static_cast<std::size_t>(i * 997 + t),
                                        static_cast<char>('a' + t));
-                ASSERT_EQ(stub, client.repeat(stub));
+                ASSERT_EQ(client.repeat(stub), stub);
             }
         });
     }
@@ -464,7 +464,7 @@ TEST_F(AServer, StopLetsRunningCallsEndAndClosesEverything) {
     EXPECT_EQ(server->counts().connections, 0U);
     server->stop();
     ncs::Server other;
-    EXPECT_EQ(port, other.listenOnLoopback(port));
+    EXPECT_EQ(other.listenOnLoopback(port), port);
 }
 
 TEST_F(AServer, OutOfDescriptorsItWaitsAndGoesOn) {
@@ -549,7 +549,7 @@ TEST_F(AServer, PeersOfAnotherUserAreRefused) {
         ::_exit(::recv(made, &byte, 1, 0) <= 0 ? 0 : 4);
     }
     int status = 0;
-    ASSERT_EQ(child, ::waitpid(child, &status, 0));
+    ASSERT_EQ(::waitpid(child, &status, 0), child);
     EXPECT_EQ(WEXITSTATUS(status), 0);
     EXPECT_EQ(server->counts().refused, 1U);
     Client own = connect();

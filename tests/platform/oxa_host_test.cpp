@@ -165,7 +165,7 @@ TEST_F(Host, AFilterJudgesRowsAsTheTableDoesAndIsNoLiveObject) {
     for (int turn = 0; turn < 2; ++turn) {
         for (const SampleRow& row : manager.sample) {
             const char* const bytes = reinterpret_cast<const char*>(&row);
-            EXPECT_EQ(row.value == 2, filter->takes(bytes)) << row.value;
+            EXPECT_EQ(filter->takes(bytes), row.value == 2) << row.value;
         }
     }
     EXPECT_EQ(manager.samples, 0);

@@ -53,7 +53,7 @@ TEST_F(Request, TheBaseClassPrintsNothingWhenDetailsAreOff) {
 TEST(OriginNode, IsTheHostNameUntilItIsSet) {
     char name[256] = "";
     ASSERT_EQ(::gethostname(name, sizeof name - 1), 0);
-    EXPECT_EQ(std::string(name).substr(0, 64), OXA_GetOriginnode(nullptr));
+    EXPECT_EQ(OXA_GetOriginnode(nullptr), std::string(name).substr(0, 64));
 }
 
 TEST(OriginNode, IsCutTo64BytesAndOldNamesStayReadable) {

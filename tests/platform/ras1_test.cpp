@@ -38,8 +38,8 @@ class Selection : public testing::TestWithParam<SelectionCase> {};
 
 TEST_P(Selection, GivesEachUnitItsFlags) {
     const ras1::Selection selection = ras1::parseSelection(GetParam().text);
-    EXPECT_EQ(GetParam().sample, selection.flagsOf("zavsample")) << GetParam().text;
-    EXPECT_EQ(GetParam().other, selection.flagsOf("zavother")) << GetParam().text;
+    EXPECT_EQ(selection.flagsOf("zavsample"), GetParam().sample) << GetParam().text;
+    EXPECT_EQ(selection.flagsOf("zavother"), GetParam().other) << GetParam().text;
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -81,7 +81,7 @@ TEST(Line, ItsDateIsTheCalendars) {
     tm parts{};
     std::strftime(first, sizeof first, "%Y-%m-%d %H:%M:%S", ::gmtime_r(&before, &parts));
     std::strftime(last, sizeof last, "%Y-%m-%d %H:%M:%S", ::gmtime_r(&after, &parts));
-    EXPECT_LE(first, seconds);
+    EXPECT_GE(seconds, first);
     EXPECT_LE(seconds, last);
 }
 
@@ -160,7 +160,7 @@ TEST(Line, AChildBetweenForkAndExecTraces) {
         RAS1_Printf(&block, RAS1_DETAIL, 1, "%s", "in the\nchild");
         ::_exit(0);
     }
-    ASSERT_EQ(child, ::waitpid(child, nullptr, 0));
+    ASSERT_EQ(::waitpid(child, nullptr, 0), child);
     EXPECT_THAT(trace.details(), ElementsAre("in the\nchild"));
 }
 
@@ -206,7 +206,7 @@ int inChild(Body body) {
         ::_exit(0);
     }
     int status = 0;
-    EXPECT_EQ(child, ::waitpid(child, &status, 0));
+    EXPECT_EQ(::waitpid(child, &status, 0), child);
     return status;
 }
 

@@ -180,7 +180,7 @@ TEST(Xml, NothingIsParsedAfterTheLastPiece) {
         EXPECT_EQ(XML1_GetBuffer(recorder.parser(), 1), nullptr) << document;
         EXPECT_EQ(XML1_ParseBuffer(recorder.parser(), 0, 1), 0) << document;
         EXPECT_STREQ(XML1_ErrorString(XML1_GetErrorCode(recorder.parser())), "parsing finished");
-        EXPECT_EQ(events, recorder.events.size());
+        EXPECT_EQ(recorder.events.size(), events);
     }
 }
 

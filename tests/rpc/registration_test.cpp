@@ -65,7 +65,7 @@ TEST_F(InterfaceRegistration, ReturnsTheRuntimesStatusWithoutAWordOrASecondTry) 
     TraceCapture trace("ERROR DETAIL");
     for (const std::uint32_t status : {1u, 0x1C010003u, 0xFFFFFFFFu}) {
         answer = status;
-        EXPECT_EQ(static_cast<int>(status), QVS_NCS_RegisterAgentInterface());
+        EXPECT_EQ(QVS_NCS_RegisterAgentInterface(), static_cast<int>(status));
     }
     EXPECT_EQ(registrations.size(), 3u);
     EXPECT_THAT(trace.errors(), testing::IsEmpty());

@@ -29,7 +29,7 @@ TEST(InventoryTiming, ReadingGrowsInProportionToTheNumberOfProducts) {
             return 0;
         };
         EXPECT_EQ(forEachProduct(inventoryOf(products).c_str(), count), 0);
-        EXPECT_EQ(products, found);
+        EXPECT_EQ(found, products);
     });
     EXPECT_LT(growth, kProportionate);
 }

@@ -44,7 +44,7 @@ private:
 
 inline void expectColumns(rtoxa& request, const std::vector<ExpectedColumn>& expected) {
     const int count = static_cast<int>(expected.size());
-    EXPECT_EQ(count, request.NumColumns());
+    EXPECT_EQ(request.NumColumns(), count);
     for (int i = 0; i < count; ++i) {
         const ExpectedColumn& column = expected[static_cast<std::size_t>(i)];
         ColumnInfo info{};

@@ -183,7 +183,7 @@ TEST(StatusTable, SubscribersComeAndGoWhileEventsArrive) {
         subscribers.emplace_back([] {
             for (int n = 0; n < 50; ++n) {
                 Outcomes outcomes;
-                EXPECT_LE(1u, outcomes.waitFor(1).size());
+                EXPECT_GE(outcomes.waitFor(1).size(), 1u);
             }
         });
     }

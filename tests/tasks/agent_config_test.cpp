@@ -62,7 +62,7 @@ TEST_F(SetConfig, ContextsOfTheColumnsWidthAndMoreAreHandedOverWhole) {
         TaskQueueElem task = taskFor("SETCONFIG", "", context);
         EXPECT_EQ(setConfig(task), TASK_OK);
     }
-    EXPECT_EQ(all, home_.input(kTranslator));
+    EXPECT_EQ(home_.input(kTranslator), all);
 }
 
 TEST_F(SetConfig, WithoutATargetTheOptionsFollowEachOther) {
@@ -156,7 +156,7 @@ TEST_F(GetConfig, MayBeEightMegabytes) {
     EXPECT_EQ(
         [this] {
             TaskQueueElem task = taskFor("GETCONFIG", "", "");
-            EXPECT_EQ(TASK_OK, getConfig(task));
+            EXPECT_EQ(getConfig(task), TASK_OK);
             return narrow(task.getContext());
         }(),
         "INSTANCE=1\n" + std::string(8 << 20, 'x'));

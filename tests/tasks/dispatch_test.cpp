@@ -45,13 +45,13 @@ protected:
 
     static void expectAnswer(const TaskQueueElem& task, int rc, const std::string& messageId,
                              const std::string& parameter) {
-        EXPECT_EQ(rc, answer(task).retval);
+        EXPECT_EQ(answer(task).retval, rc);
         EXPECT_EQ(fieldText(answer(task).retmsgid), padded(messageId, 16));
         EXPECT_EQ(fieldText(answer(task).retmsgparm), padded(parameter, 256));
     }
 
     static void expectRefused(TaskQueueElem task, int rc, const std::string& parameter = "") {
-        EXPECT_EQ(rc, runTask(task));
+        EXPECT_EQ(runTask(task), rc);
         expectAnswer(task, rc, "ZAV" + std::to_string(rc) + "E", parameter);
         EXPECT_TRUE(taskQueue.empty());
         EXPECT_EQ(fake_handlers::calls(), Texts{});
@@ -61,8 +61,8 @@ protected:
         EXPECT_EQ(runTask(task), 0);
         expectAnswer(task, 0, "", "");
         ASSERT_EQ(taskQueue.size(), 1u);
-        EXPECT_EQ(narrow(task.getTransid()), narrow(taskQueue.front().getTransid()));
-        EXPECT_EQ(narrow(task.getContext()), narrow(taskQueue.front().getContext()));
+        EXPECT_EQ(narrow(taskQueue.front().getTransid()), narrow(task.getTransid()));
+        EXPECT_EQ(narrow(taskQueue.front().getContext()), narrow(task.getContext()));
         EXPECT_EQ(fake_handlers::calls(), Texts{});
     }
 };
@@ -297,7 +297,7 @@ TEST_P(Dispatch, ReachesTheHandler) {
     });
     TraceCapture trace;
     EXPECT_EQ(processAsyncTask(task), TASK_TRANSLATOR_FAILED);
-    EXPECT_EQ(dispatched.calls, fake_handlers::calls());
+    EXPECT_EQ(fake_handlers::calls(), dispatched.calls);
     EXPECT_EQ(seen, &task);
     EXPECT_EQ(trace.details("zavtasks"), (Texts{"Return code is 1008"}));
 }
@@ -366,7 +366,7 @@ TEST_P(ThrowingHandler, EndsItsTaskWithTheCommandsOwnCode) {
     TraceCapture trace;
     const bool atOnce = std::string(thrown.command) == "GETCONFIG" ||
                         std::string(thrown.command) == "COMPLETE_INSTALL";
-    EXPECT_EQ(thrown.rc, atOnce ? runTask(task) : processAsyncTask(task));
+    EXPECT_EQ(atOnce ? runTask(task) : processAsyncTask(task), thrown.rc);
     EXPECT_EQ(trace.errors(), (Texts{id + " Command [" + thrown.command +
                                      "] ended by an exception: what it says"}));
     task.ReturnStatus(thrown.rc);

@@ -107,7 +107,7 @@ TEST_F(Executor, IsNotStartedWithoutADepot) {
     EXPECT_EQ(trace.errors("zavtasks"), (Texts{"ZAV1010E No Agent Depot directory set"}));
     EXPECT_FALSE(initialized);
     EXPECT_TRUE(commands.empty());
-    EXPECT_EQ(threads, threadCount());
+    EXPECT_EQ(threadCount(), threads);
 
     TaskQueueElem task = request("START", "tx");
     EXPECT_EQ(runTask(task), TASK_NOT_SUPPORTED);
@@ -122,17 +122,17 @@ TEST_F(Executor, IsStartedOnce) {
     start();
     EXPECT_EQ(trace.errors("zavtasks"), (Texts{"Command vector being initialized"}));
     EXPECT_TRUE(initialized);
-    EXPECT_EQ(newScratchDepot() + "/", narrow(depotDir));
+    EXPECT_EQ(narrow(depotDir), newScratchDepot() + "/");
     Texts names;
     for (const String& command : commands)
         names.push_back(narrow(command));
     EXPECT_EQ(names, (Texts{"START", "STOP", "RESTART", "INSTALL", "UNINSTALL", "GETCONFIG",
                             "SETCONFIG", "COMPLETE_INSTALL", "REMOVEINSTANCE"}));
-    EXPECT_EQ(threads + 1, threadCount());
+    EXPECT_EQ(threadCount(), threads + 1);
 
     zav_taskmgr_init();
     EXPECT_EQ(commands.size(), 9u);
-    EXPECT_EQ(threads + 1, threadCount());
+    EXPECT_EQ(threadCount(), threads + 1);
     EXPECT_EQ(trace.errors("zavtasks").size(), 1u);
 }
 
@@ -379,7 +379,7 @@ TEST_F(Executor, LeavesSignalsToTheHost) {
     ASSERT_EQ(outcomes.waitFor(1).size(), 1u);
     for (const int signal : {SIGTERM, SIGINT, SIGHUP, SIGCHLD, SIGPIPE, SIGALRM, SIGUSR1}) {
         EXPECT_EQ(sigismember(&inside, signal), 1) << signal;
-        EXPECT_EQ(sigismember(&before, signal), sigismember(&after, signal)) << signal;
+        EXPECT_EQ(sigismember(&after, signal), sigismember(&before, signal)) << signal;
     }
     for (const int fault : {SIGSEGV, SIGBUS, SIGFPE, SIGILL, SIGABRT}) {
         EXPECT_EQ(sigismember(&inside, fault), 0) << fault;
@@ -399,9 +399,9 @@ TEST_F(Executor, ManyTasksMayWait) {
     constexpr std::size_t count = 10000;
     for (std::size_t i = 0; i < count; ++i)
         queueTask(request("START", std::to_string(i)));
-    EXPECT_EQ(count, queueLength());
+    EXPECT_EQ(queueLength(), count);
     gate.open();
-    EXPECT_EQ(std::to_string(count - 1), transids(outcomes.waitFor(count + 1)).back());
+    EXPECT_EQ(transids(outcomes.waitFor(count + 1)).back(), std::to_string(count - 1));
 }
 
 TEST_F(Executor, MayBeBusyWhileTheProcessEnds) {

@@ -119,8 +119,8 @@ TEST_F(SetupForRestart, WritesTheInstallOnlyScript) {
 
             const std::string lower = std::string(product) == "NE" ? "ne" : product;
             const std::string script = home_.dir().read(std::string(depot) + "/runcmd.sh");
-            EXPECT_EQ(filledIn(filledIn(kInstallOnlyScript, "DEPOT", directory), "PRODUCT", lower),
-                      script);
+            EXPECT_EQ(script,
+                      filledIn(filledIn(kInstallOnlyScript, "DEPOT", directory), "PRODUCT", lower));
             const std::string expected = "/bin/sh " + directory + "/runcmd.sh ./install.sh -q";
             EXPECT_EQ(narrow(command), expected);
             EXPECT_EQ(trace_.count('D', "Constructing install only script " + expected), 1);
@@ -142,8 +142,8 @@ TEST_F(SetupForRestart, WritesTheInstallAndTwoWayScript) {
             const std::string lower = std::string(product) == "NE" ? "ne" : product;
             std::string text = filledIn(kInstallAndTwoWayScript, "DEPOT", directory);
             text = filledIn(text, "TRANSLATOR", "/opt/bin/zav_xa -setCMS ux");
-            EXPECT_EQ(filledIn(text, "PRODUCT", lower),
-                      home_.dir().read(std::string(depot) + "/runcmd.sh"));
+            EXPECT_EQ(home_.dir().read(std::string(depot) + "/runcmd.sh"),
+                      filledIn(text, "PRODUCT", lower));
             const std::string expected = "/bin/sh " + directory + "/runcmd.sh ./install.sh -q";
             EXPECT_EQ(narrow(command), expected);
             EXPECT_THAT(trace_.details("zavtasks"),
@@ -323,7 +323,7 @@ TEST_F(InstallThatLeavesAProcess, IsWaitedForToTheTimeoutOtherwise) {
     const ScopedEnv timeout("TIMEOUT", "3");
     const Stopwatch watch;
     install("ux");
-    EXPECT_LE(2.9, watch.seconds());
+    EXPECT_GE(watch.seconds(), 2.9);
     EXPECT_TRUE(left_.isRunning());
 }
 
@@ -448,7 +448,7 @@ protected:
     Outcome completeWith(const std::string& content) {
         home_.dir().write("depot/rc.txt", content);
         const Outcome outcome = complete();
-        EXPECT_EQ(content, inDepot("rc.txt"));
+        EXPECT_EQ(inDepot("rc.txt"), content);
         return outcome;
     }
 };

@@ -161,7 +161,7 @@ TEST_F(QueueFailures, ATaskIsQueuedWhateverFails) {
     queueTask(request("tx"));
     EXPECT_EQ(taskQueue.size(), 1u);
     const Texts errors = trace.errors("zavtasks");
-    ASSERT_LE(2u, errors.size());
+    ASSERT_GE(errors.size(), 2u);
     EXPECT_EQ(errors[0], "Unable to get lock on queue mutex, return code 22");
     EXPECT_EQ(errors[1], "Unable to signal executor thread, return code 1");
     taskQueue = {};

@@ -64,8 +64,8 @@ TEST_F(Translator, TextsWithoutTokensStayAsTheyAre) {
 
 TEST_F(Translator, TokensBecomeDirectories) {
     EXPECT_EQ(replaced("|DEPLOYDIR|"), home_.depot() + "ux/060100000");
-    EXPECT_EQ(home_.home(), replaced("|TOVRINHOME|"));
-    EXPECT_EQ(home_.depot(), replaced("|DEPOTDIR|"));
+    EXPECT_EQ(replaced("|TOVRINHOME|"), home_.home());
+    EXPECT_EQ(replaced("|DEPOTDIR|"), home_.depot());
 }
 
 TEST_F(Translator, EveryTokenIsReplaced) {

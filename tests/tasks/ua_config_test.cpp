@@ -161,8 +161,8 @@ TEST_F(UaConfig, MakesTheScriptsExecutable) {
         struct stat status {};
         ASSERT_EQ(::stat(path.c_str(), &status), 0);
         EXPECT_EQ(status.st_mode & 07777u, 0755u);
-        EXPECT_EQ(std::string(name) + "\n",
-                  home_.dir().read("home/work/scripts/" + std::string(name) + ".sh"));
+        EXPECT_EQ(home_.dir().read("home/work/scripts/" + std::string(name) + ".sh"),
+                  std::string(name) + "\n");
         EXPECT_EQ(trace_.count('D', "Settings permissions on script file [" + path + "] to [493]"),
                   1);
     }

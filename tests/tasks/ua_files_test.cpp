@@ -73,7 +73,7 @@ TEST_F(UaFiles, TheInstanceStandsBeforeTheHost) {
     };
     for (const auto& [name, instance] : names) {
         trace_.clear();
-        EXPECT_EQ(instance, narrow(getUaInstanceName(name))) << name;
+        EXPECT_EQ(narrow(getUaInstanceName(name)), instance) << name;
         EXPECT_THAT(trace_.details("zavtasks"),
                     ElementsAre("Returning instance <" + std::string(instance) +
                                 "> for managed system name <" + name + ">"));

@@ -55,7 +55,7 @@ TEST(TaskRecord, IsEmptyAtFirst) {
                                 task.getUascript(), task.getVersion(), task.getTargetmsn()}) {
         EXPECT_EQ(value.length(), 0u);
     }
-    EXPECT_EQ(std::string(4196, '\0'), bytes(task.getReturnResults()));
+    EXPECT_EQ(bytes(task.getReturnResults()), std::string(4196, '\0'));
 }
 
 TEST(TaskRecord, TakesItsTenValuesInOrder) {
@@ -114,7 +114,7 @@ TEST(TaskRecord, ACopyHasTheValuesAndTheRow) {
     TaskQueueElem task = sample();
     task.ReturnStatus(1024);
     const TaskQueueElem copy(task);
-    EXPECT_EQ(bytes(task.getReturnResults()), bytes(copy.getReturnResults()));
+    EXPECT_EQ(bytes(copy.getReturnResults()), bytes(task.getReturnResults()));
     EXPECT_EQ(text(copy.getTransid()), "tx-1");
 
     task.setTransid("other");
@@ -129,11 +129,11 @@ TEST(TaskRecord, AMovedRecordHasTheValuesAndTheRow) {
     const std::string row = bytes(task.getReturnResults());
     TaskQueueElem moved(std::move(task));
     EXPECT_EQ(text(moved.getTransid()), "tx-1");
-    EXPECT_EQ(row, bytes(moved.getReturnResults()));
+    EXPECT_EQ(bytes(moved.getReturnResults()), row);
     TaskQueueElem assigned;
     assigned = std::move(moved);
     EXPECT_EQ(text(assigned.getTargetmsn()), "host:UX");
-    EXPECT_EQ(row, bytes(assigned.getReturnResults()));
+    EXPECT_EQ(bytes(assigned.getReturnResults()), row);
 }
 
 TEST(SetValueAndPad, PadsWithBlanks) {
@@ -270,7 +270,7 @@ TEST(ReturnAsyncStatus, LeavesTheRequestsRowAlone) {
     const std::string before = bytes(task.getReturnResults());
     task.setRetmsgid("ZAV1025E");
     task.returnAsyncStatus(1025);
-    EXPECT_EQ(before, bytes(task.getReturnResults()));
+    EXPECT_EQ(bytes(task.getReturnResults()), before);
 }
 
 TEST(ReturnAsyncStatus, CutsWhatIsTooLong) {

@@ -45,7 +45,7 @@ class CommandRunner : public testing::Test {
 protected:
     void TearDown() override {
         ::unsetenv("TIMEOUT");
-        EXPECT_EQ(descriptors_, child_role::openDescriptors());
+        EXPECT_EQ(child_role::openDescriptors(), descriptors_);
         EXPECT_TRUE(::waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD);
     }
     void limit(const char* seconds) { ::setenv("TIMEOUT", seconds, 1); }

@@ -39,7 +39,7 @@ TEST(CommandTiming, AnEndIsNoticedAtOnce) {
         char* const arguments[] = {sleep, time, nullptr};
         pid_t child = -1;
         ASSERT_EQ(::posix_spawn(&child, sleep, nullptr, nullptr, arguments, environ), 0);
-        EXPECT_EQ(child, ::waitpid(child, nullptr, 0));
+        EXPECT_EQ(::waitpid(child, nullptr, 0), child);
     });
     const double withUs = shortestOf(5, [] {
         Process process(String("/bin/sleep 0.2"));
@@ -65,7 +65,7 @@ TEST(CommandTiming, ReadingTheOutputGrowsInProportionToIt) {
         const std::string file = scratch.write("data", std::string(bytes, 'x'));
         String out;
         EXPECT_TRUE(runs("/bin/cat " + file, out));
-        EXPECT_EQ(bytes, out.length());
+        EXPECT_EQ(out.length(), bytes);
     });
     EXPECT_LT(growth, kProportionate);
 }

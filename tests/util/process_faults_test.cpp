@@ -213,7 +213,7 @@ protected:
     void TearDown() override {
         faults = Faults();
         ::unsetenv("TIMEOUT");
-        EXPECT_EQ(descriptors_, child_role::openDescriptors());
+        EXPECT_EQ(child_role::openDescriptors(), descriptors_);
         EXPECT_TRUE(::waitpid(-1, nullptr, WNOHANG) == -1 && errno == ECHILD);
     }
 
@@ -303,8 +303,8 @@ TEST_F(Fault, WithoutHandlesForProcessesAnEndIsLookedForEveryFewMilliseconds) {
     Process process(String("/bin/sleep 0.2"));
     ASSERT_TRUE(process.start());
     EXPECT_TRUE(process.wait(nullptr));
-    EXPECT_LT(0, longestPause);
-    EXPECT_GE(20 * 1000 * 1000, longestPause);
+    EXPECT_GT(longestPause, 0);
+    EXPECT_LE(longestPause, 20 * 1000 * 1000);
 
     ::setenv("TIMEOUT", "1", 1);
     Process hanging(String("/bin/sleep 60"));
@@ -319,7 +319,7 @@ TEST_F(Fault, InterruptionsAreInvisible) {
     faults.interruptions = false;
     EXPECT_TRUE(ran);
     EXPECT_EQ(rc, 0);
-    EXPECT_EQ(input, out);
+    EXPECT_EQ(out, input);
 }
 
 TEST_F(Fault, ListingsThatFailAreTraced) {

@@ -129,10 +129,10 @@ TEST(Process, TracesItsWayInOrder) {
     ASSERT_EQ(details.size(), 4u);
     EXPECT_EQ(details[0], "Set timeout to 300 seconds");
     const std::string start = "Entering child process to launch command. PID: ";
-    ASSERT_EQ(start, details[1].substr(0, start.size()));
+    ASSERT_EQ(details[1].substr(0, start.size()), start);
     EXPECT_EQ(details[2], "Calling execvp");
     EXPECT_EQ(details[3], "Waiting for process id: " + details[1].substr(start.size()));
-    EXPECT_NE(std::to_string(::getpid()), details[1].substr(start.size()));
+    EXPECT_NE(details[1].substr(start.size()), std::to_string(::getpid()));
     EXPECT_THAT(traces.errors(), IsEmpty());
 }
 
@@ -226,7 +226,7 @@ TEST(ProcessTracing, AChildTracesIntoALogOfItsOwn) {
     ::unsetenv("KBB_RAS1");
     ::unsetenv("TOVRINHOME");
     const std::string beginning = home.path() + "/logs/zavproc_ras1_";
-    EXPECT_EQ(beginning, log.substr(0, beginning.size()));
+    EXPECT_EQ(log.substr(0, beginning.size()), beginning);
     const std::string path = log.substr(0, log.size() - 1);
     EXPECT_EQ(traces.count('D', "Sending child process RAS1 tracing to " + path), 1);
     int kept = 0;
@@ -338,7 +338,7 @@ TEST(ProcessSignals, AChildStartsWithDefaultDispositionsAndAnEmptyMask) {
     EXPECT_EQ(::sigismember(&after, SIGINT), 0);
     EXPECT_EQ(::signal(SIGPIPE, oldPipe), SIG_IGN);
     EXPECT_EQ(::signal(SIGINT, oldInt), SIG_IGN);
-    EXPECT_EQ(+handler, ::signal(SIGUSR1, oldUsr));
+    EXPECT_EQ(::signal(SIGUSR1, oldUsr), +handler);
 }
 
 TEST(ProcessWait, KillsAChildThatRunsPastTheTimeout) {
@@ -430,7 +430,7 @@ TEST(ProcessWait, LeavesOtherChildrenAlone) {
     if (other == 0) ::_exit(9);
     outputOf("/bin/true");
     int status = 0;
-    EXPECT_EQ(other, ::waitpid(other, &status, 0));
+    EXPECT_EQ(::waitpid(other, &status, 0), other);
     EXPECT_EQ(WEXITSTATUS(status), 9);
 }
 

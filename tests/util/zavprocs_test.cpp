@@ -115,8 +115,8 @@ TEST(MakeArgv, RefusesMissingArguments) {
 TEST(UserToken, IsTheCallersOwnByDefault) {
     TraceCapture traces;
     const auto own = token(nullptr, nullptr);
-    EXPECT_EQ(::getuid(), own->uid);
-    EXPECT_EQ(::getgid(), own->gid);
+    EXPECT_EQ(own->uid, ::getuid());
+    EXPECT_EQ(own->gid, ::getgid());
     EXPECT_EQ(traces.count('D', "User: (null) UID: " + std::to_string(::getuid()) +
                                     " Group: (null) GID: " + std::to_string(::getgid())),
               1);
@@ -125,8 +125,8 @@ TEST(UserToken, IsTheCallersOwnByDefault) {
 TEST(UserToken, LooksNamesUp) {
     TraceCapture traces;
     const auto daemon = token("daemon", "sys");
-    EXPECT_EQ(::getpwnam("daemon")->pw_uid, daemon->uid);
-    EXPECT_EQ(::getgrnam("sys")->gr_gid, daemon->gid);
+    EXPECT_EQ(daemon->uid, ::getpwnam("daemon")->pw_uid);
+    EXPECT_EQ(daemon->gid, ::getgrnam("sys")->gr_gid);
     EXPECT_EQ(traces.count('D', "User: daemon UID: " + std::to_string(daemon->uid) +
                                     " Group: sys GID: " + std::to_string(daemon->gid)),
               1);
@@ -141,7 +141,7 @@ TEST(UserToken, AnUnknownUserIsNobody) {
 TEST(UserToken, AnUnknownGroupIsTheUsersOwnOnlyWhereAGroupNobodyExists) {
     const bool hasNobody = ::getgrnam("nobody") != nullptr;
     const std::uint32_t primary = ::getpwnam("daemon")->pw_gid;
-    EXPECT_EQ(hasNobody ? primary : 65533u, token("daemon", "no-such-group-here")->gid);
+    EXPECT_EQ(token("daemon", "no-such-group-here")->gid, hasNobody ? primary : 65533u);
     // Without a user there is no entry that has a group.
     EXPECT_EQ(token(nullptr, "no-such-group-here")->gid, 65533u);
 }
@@ -162,7 +162,7 @@ TEST(PruneLogs, ElevenLogsLoseOnlyTheOldest) {
     pruneLogs(home.path("logs").c_str(), "zavproc_ras1", 10);
     for (int i = 0; i < 11; ++i) {
         const bool isOldest = i == 7;
-        EXPECT_NE(isOldest, home.exists("logs/zavproc_ras1_" + std::to_string(i) + ".log")) << i;
+        EXPECT_NE(home.exists("logs/zavproc_ras1_" + std::to_string(i) + ".log"), isOldest) << i;
     }
     EXPECT_EQ(traces.count('D', "deleting file: " + home.path("logs/zavproc_ras1_7.log")), 1);
     EXPECT_THAT(traces.errors(), IsEmpty());

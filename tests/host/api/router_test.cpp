@@ -93,23 +93,23 @@ TEST_F(Routes, AreFoundByMethodAndPath) {
 
 TEST_F(Routes, TakeOneSegmentPerParameterOfThePath) {
     EXPECT_EQ(found("GET", "/v1/tasks/a%20b%2Fc"), "GET /v1/tasks/{id} id=a b/c");
-    EXPECT_EQ(error("404", "there is nothing at /v1/tasks/a/b"), found("GET", "/v1/tasks/a/b"));
-    EXPECT_EQ(error("404", "there is nothing at /v1/tasks/"), found("GET", "/v1/tasks/"));
-    EXPECT_EQ(error("404", "there is nothing at /v1"), found("GET", "/v1"));
-    EXPECT_EQ(error("404", "there is nothing at /v1/tasks"), found("GET", "/v1%2Ftasks"));
-    EXPECT_EQ(error("404", "there is nothing at "), found("GET", ""));
+    EXPECT_EQ(found("GET", "/v1/tasks/a/b"), error("404", "there is nothing at /v1/tasks/a/b"));
+    EXPECT_EQ(found("GET", "/v1/tasks/"), error("404", "there is nothing at /v1/tasks/"));
+    EXPECT_EQ(found("GET", "/v1"), error("404", "there is nothing at /v1"));
+    EXPECT_EQ(found("GET", "/v1%2Ftasks"), error("404", "there is nothing at /v1/tasks"));
+    EXPECT_EQ(found("GET", ""), error("404", "there is nothing at "));
 }
 
 TEST_F(Routes, WithAParameterOfAnotherTypeAreNotThere) {
     EXPECT_EQ(found("GET", "/v1/pages/12"), "GET /v1/pages/{number} number=12");
-    EXPECT_EQ(error("404", "there is nothing at /v1/pages/x"), found("GET", "/v1/pages/x"));
-    EXPECT_EQ(error("404", "there is nothing at /v1/pages/-1"), found("GET", "/v1/pages/-1"));
+    EXPECT_EQ(found("GET", "/v1/pages/x"), error("404", "there is nothing at /v1/pages/x"));
+    EXPECT_EQ(found("GET", "/v1/pages/-1"), error("404", "there is nothing at /v1/pages/-1"));
 }
 
 TEST_F(Routes, WithOtherMethodsNameThoseThereAre) {
-    EXPECT_EQ(error("405", "/v1/tasks/7/cancel knows only the method POST"),
-              found("GET", "/v1/tasks/7/cancel"));
-    EXPECT_EQ(error("405", "/v1/tasks/7 knows only GET and DELETE"), found("PUT", "/v1/tasks/7"));
+    EXPECT_EQ(found("GET", "/v1/tasks/7/cancel"),
+              error("405", "/v1/tasks/7/cancel knows only the method POST"));
+    EXPECT_EQ(found("PUT", "/v1/tasks/7"), error("405", "/v1/tasks/7 knows only GET and DELETE"));
     EXPECT_EQ(allow("PUT", "/v1/tasks/7"), "GET, HEAD, DELETE");
     EXPECT_EQ(allow("HEAD", "/v1/tasks/7/cancel"), "POST");
 }
@@ -117,31 +117,31 @@ TEST_F(Routes, WithOtherMethodsNameThoseThereAre) {
 TEST_F(Routes, AnswerOptionsWithTheirMethods) {
     EXPECT_EQ(found("OPTIONS", "/v1/tasks?anything=1"), "204 ");
     EXPECT_EQ(allow("OPTIONS", "/v1/tasks"), "GET, HEAD, POST");
-    EXPECT_EQ(error("404", "there is nothing at *"), found("OPTIONS", "*"));
+    EXPECT_EQ(found("OPTIONS", "*"), error("404", "there is nothing at *"));
 }
 
 TEST_F(Routes, CheckTheTypesOfTheirParameters) {
     EXPECT_EQ(found("GET", "/v1/tasks?state=a&limit=5&follow=1"),
               "GET /v1/tasks state=a limit=5 follow=1");
     for (const char* limit : {"", "x", "-1", "+1", "1.0", " 1", "1234567890123456789"}) {
-        EXPECT_EQ(error("400", "the parameter \\\"limit\\\" is not a whole number"),
-                  found("GET", "/v1/tasks?state=a&limit=" + std::string(limit)));
+        EXPECT_EQ(found("GET", "/v1/tasks?state=a&limit=" + std::string(limit)),
+                  error("400", "the parameter \\\"limit\\\" is not a whole number"));
     }
-    EXPECT_EQ(error("400", "the parameter \\\"follow\\\" is not 0 or 1"),
-              found("GET", "/v1/tasks?state=a&follow=yes"));
-    EXPECT_EQ(error("400", "the parameter \\\"state\\\" is missing"), found("GET", "/v1/tasks"));
-    EXPECT_EQ(error("400", "the parameter \\\"state\\\" is given twice"),
-              found("GET", "/v1/tasks?state=a&state=a"));
-    EXPECT_EQ(error("400", "/v1/tasks takes no parameter \\\"stat\\\""),
-              found("GET", "/v1/tasks?stat=a"));
-    EXPECT_EQ(error("400", "the parameter \\\"id\\\" is given twice"),
-              found("GET", "/v1/tasks/7?id=8"));
+    EXPECT_EQ(found("GET", "/v1/tasks?state=a&follow=yes"),
+              error("400", "the parameter \\\"follow\\\" is not 0 or 1"));
+    EXPECT_EQ(found("GET", "/v1/tasks"), error("400", "the parameter \\\"state\\\" is missing"));
+    EXPECT_EQ(found("GET", "/v1/tasks?state=a&state=a"),
+              error("400", "the parameter \\\"state\\\" is given twice"));
+    EXPECT_EQ(found("GET", "/v1/tasks?stat=a"),
+              error("400", "/v1/tasks takes no parameter \\\"stat\\\""));
+    EXPECT_EQ(found("GET", "/v1/tasks/7?id=8"),
+              error("400", "the parameter \\\"id\\\" is given twice"));
 }
 
 TEST_F(Routes, AreClosedToThoseWhoMayNotUseThem) {
     const std::string refused = error("403", "you may only read from this host");
-    EXPECT_EQ(refused, found("DELETE", "/v1/tasks/7", Access::Read));
-    EXPECT_EQ(refused, found("POST", "/v1/tasks?odd=1", Access::Read)) << "before anything else";
+    EXPECT_EQ(found("DELETE", "/v1/tasks/7", Access::Read), refused);
+    EXPECT_EQ(found("POST", "/v1/tasks?odd=1", Access::Read), refused) << "before anything else";
     EXPECT_EQ(found("GET", "/v1/tasks/7", Access::Read), "GET /v1/tasks/{id} id=7");
 }
 

@@ -72,11 +72,11 @@ TEST_F(Page, HasACommandForEveryRoute) {
 TEST(RouteRows, SayWhatTheyAreFor) {
     for (const Route& route : host::routes()) {
         EXPECT_NE(route.endpoint, nullptr) << route.path;
-        EXPECT_NE(std::string(), route.doc) << route.path;
+        EXPECT_NE(route.doc, std::string()) << route.path;
         for (const host::Parameter& parameter : route.parameters)
-            EXPECT_NE(std::string(), parameter.doc) << parameter.name;
+            EXPECT_NE(parameter.doc, std::string()) << parameter.name;
         for (const host::Member& member : route.body)
-            EXPECT_NE(std::string(), member.doc) << member.name;
+            EXPECT_NE(member.doc, std::string()) << member.name;
     }
 }
 

@@ -139,10 +139,10 @@ TEST_F(Events, ThatASlowReaderMissesAreCountedInTheirPlace) {
             lost -= number;
             position -= number;
         } else {
-            ASSERT_EQ(position++, number) << "every row has come or has been counted in its place";
+            ASSERT_EQ(number, position++) << "every row has come or has been counted in its place";
         }
     }
-    EXPECT_EQ(published, position);
+    EXPECT_EQ(position, published);
     EXPECT_GT(lost, 0);
     table.publish(plainRow("row", 77, ""));
     EXPECT_EQ(numberOf(slow.readUntil("\n\n")), 77) << "the stream goes on";
@@ -179,11 +179,11 @@ TEST_F(Events, OfTheOutcomeTableComeThroughOneSubscriptionHoweverManyFollow) {
     outcomes.publish(plainRow("b", 2, "second"));
     const std::string first = "data: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"first\"}\n\n";
     const std::string second = "data: {\"NAME\":\"b\",\"NUMBER\":2,\"TEXT\":\"second\"}\n\n";
-    EXPECT_EQ(first, clients[0].readUntil("\n\n"));
-    EXPECT_EQ(second, clients[0].readUntil("\n\n"));
-    EXPECT_EQ(first, clients[1].readUntil("\n\n"));
-    EXPECT_EQ(second, clients[2].readUntil("\n\n"));
-    EXPECT_EQ(second, clients[3].readUntil("\n\n"));
+    EXPECT_EQ(clients[0].readUntil("\n\n"), first);
+    EXPECT_EQ(clients[0].readUntil("\n\n"), second);
+    EXPECT_EQ(clients[1].readUntil("\n\n"), first);
+    EXPECT_EQ(clients[2].readUntil("\n\n"), second);
+    EXPECT_EQ(clients[3].readUntil("\n\n"), second);
     stop();
     EXPECT_EQ(outcomes.liveObjects(), 0U);
 }

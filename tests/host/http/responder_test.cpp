@@ -101,10 +101,10 @@ TEST_F(Answers, TellTheHandlerWhoAsks) {
         return Answer(Reply{});
     };
     EXPECT_EQ(connect().get("/").status, 200);
-    EXPECT_EQ(::getpid(), peer.process);
-    EXPECT_EQ(::geteuid(), peer.user);
-    EXPECT_EQ(::getegid(), peer.group);
-    EXPECT_EQ(host::Access::Act, peer.access);
+    EXPECT_EQ(peer.process, ::getpid());
+    EXPECT_EQ(peer.user, ::geteuid());
+    EXPECT_EQ(peer.group, ::getegid());
+    EXPECT_EQ(peer.access, host::Access::Act);
 }
 
 TEST_F(Answers, OfAHandlerOrAJobThatThrowsAreErrors) {

@@ -151,7 +151,7 @@ TEST_F(Requests, ForAHeadGetTheFieldsOfTheWholeAnswerAndNoBody) {
         "HEAD /v1/tables HTTP/1.1\r\n\r\n"
         "HEAD /v1/query HTTP/1.1\r\n\r\n"
         "GET /v1/health HTTP/1.1\r\n\r\n");
-    EXPECT_EQ(whole.head, client.readUntil("\r\n\r\n"));
+    EXPECT_EQ(client.readUntil("\r\n\r\n"), whole.head);
     EXPECT_NE(client.readUntil("\r\n\r\n").find("405"), std::string::npos);
     EXPECT_EQ(client.readUntil("\r\n").find("HTTP/1.1 200 OK"), 0U);
 }
@@ -395,7 +395,7 @@ TEST_F(Connections, OfOtherUsersAreRefused) {
         ::_exit(refused && client.isClosed() ? 0 : 2);
     }
     int status = -1;
-    ASSERT_EQ(child, ::waitpid(child, &status, 0));
+    ASSERT_EQ(::waitpid(child, &status, 0), child);
     EXPECT_EQ(status, 0);
 }
 

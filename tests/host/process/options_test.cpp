@@ -41,7 +41,7 @@ TEST_F(Options, AllAreTaken) {
     const auto options = read({"--home", home.c_str(), "--socket", "/s", "--rpc-socket", "/r",
                                "--rpc-port", "135", "--origin-node", "n", "--plugin", "p.so"});
     ASSERT_TRUE(options);
-    EXPECT_EQ(home, options->home);
+    EXPECT_EQ(options->home, home);
     EXPECT_EQ(options->socket, "/s");
     EXPECT_EQ(options->rpcSocket, "/r");
     EXPECT_EQ(options->rpcPort, 135);
@@ -51,17 +51,17 @@ TEST_F(Options, AllAreTaken) {
 
 TEST_F(Options, HomeComesFromTheEnvironmentWhenItIsNotGiven) {
     environment["TOVRINHOME"] = home;
-    EXPECT_EQ(home, read({})->home);
+    EXPECT_EQ(read({})->home, home);
     const std::string other = scratch.makeDir("other");
-    EXPECT_EQ(other, read({"--home", other.c_str()})->home);
+    EXPECT_EQ(read({"--home", other.c_str()})->home, other);
 }
 
 TEST_F(Options, HomeMustBeADirectory) {
     const std::string complaint = "no home: give --home DIR or set TOVRINHOME";
-    EXPECT_EQ(complaint, errorOf({}));
+    EXPECT_EQ(errorOf({}), complaint);
     environment["TOVRINHOME"] = "";
-    EXPECT_EQ(complaint, errorOf({}));
-    EXPECT_EQ(complaint, errorOf({"--home", ""}));
+    EXPECT_EQ(errorOf({}), complaint);
+    EXPECT_EQ(errorOf({"--home", ""}), complaint);
     const std::string lost = scratch.path("lost");
     EXPECT_EQ(errorOf({"--home", lost.c_str()}), "home " + lost + ": No such file or directory");
     const std::string file = scratch.write("file", "");

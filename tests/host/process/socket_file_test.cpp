@@ -92,7 +92,7 @@ TEST_F(Socket, OfAHostThatWasKilledIsReplaced) {
         ::_exit(0);  // leaves its files behind as a killed process does
     }
     int status = 0;
-    ASSERT_EQ(child, ::waitpid(child, &status, 0));
+    ASSERT_EQ(::waitpid(child, &status, 0), child);
     ASSERT_TRUE(scratch.exists("host.sock"));
     ASSERT_TRUE(scratch.exists("host.sock.lock"));
     SocketFile socket(path);
@@ -124,7 +124,7 @@ TEST_F(Socket, WhoseFileWasTakenByAnotherRemovesOnlyItsOwn) {
 TEST_F(Socket, NameMayBeAsLongAsAnAddressHolds) {
     const std::size_t limit = sizeof sockaddr_un{}.sun_path - 1;
     const std::string longest = scratch.path(std::string(limit - scratch.path().size() - 1, 's'));
-    ASSERT_EQ(limit, longest.size());
+    ASSERT_EQ(longest.size(), limit);
     EXPECT_EQ(errorOf(longest), "");
     EXPECT_EQ(errorOf(longest + "s"), "socket name " + longest + "s is longer than 107 bytes");
     EXPECT_FALSE(scratch.exists(longest.substr(scratch.path().size() + 1) + "s.lock"));

@@ -54,9 +54,9 @@ TEST(CodePage, TextLongerThanAnyBufferPasses) {
         latin += "\xE4x";
         utf8 += "\xC3\xA4x";
     }
-    EXPECT_EQ(utf8, CodePage("ISO-8859-1").toUtf8(latin));
-    EXPECT_EQ(latin, CodePage("ISO-8859-1").fromUtf8(utf8));
-    EXPECT_EQ(utf8, CodePage("UTF-8").toUtf8(utf8));
+    EXPECT_EQ(CodePage("ISO-8859-1").toUtf8(latin), utf8);
+    EXPECT_EQ(CodePage("ISO-8859-1").fromUtf8(utf8), latin);
+    EXPECT_EQ(CodePage("UTF-8").toUtf8(utf8), utf8);
 }
 
 TEST(CodePage, RefusesWhatTheCodePageLacks) {

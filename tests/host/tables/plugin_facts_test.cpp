@@ -86,7 +86,7 @@ void expectColumn(std::string_view tableName, std::string_view columnName, int t
     ASSERT_NE(table, nullptr) << tableName;
     const oxa::Column* const column = table->find(std::string(columnName));
     ASSERT_NE(column, nullptr) << columnName;
-    EXPECT_EQ(type, column->type) << columnName;
+    EXPECT_EQ(column->type, type) << columnName;
 }
 
 TEST(PluginFacts, NameTablesAndColumnsThatThereAre) {

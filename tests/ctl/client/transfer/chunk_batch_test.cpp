@@ -78,7 +78,7 @@ TEST(ChunkBatch, LeavesNothingOfAnEarlierFileBehindTheContent) {
     ChunkBatch batch;
     batch.read(first.get(), "first");
     batch.read(second.get(), "second");
-    EXPECT_EQ(std::string("\3\0\0\0abc", 7) + std::string(4093, '\0'), bytesOf(batch));
+    EXPECT_EQ(bytesOf(batch), std::string("\3\0\0\0abc", 7) + std::string(4093, '\0'));
 }
 
 TEST(ChunkBatch, IsFilledFromAPipeThatGivesLittleAtATime) {
