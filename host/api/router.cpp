@@ -58,6 +58,24 @@ bool fits(const std::string& segment, const std::string& pattern, const Route& r
     return !segment.empty() && hasType(segment, parameter->type);
 }
 
+using Segments = std::vector<std::string>;
+
+/// Whether the two paths stand for the same requests: the names of parameters do not matter.
+bool areAlike(const Segments& one, const Segments& other) {
+    return std::equal(one.begin(), one.end(), other.begin(), other.end(),
+                      [](const std::string& left, const std::string& right) {
+                          return left == right || (isVariable(left) && isVariable(right));
+                      });
+}
+
+/// Whether `one` has a literal segment where, for the first time, only one of the two has.
+bool isMoreExact(const Segments& one, const Segments& other) {
+    return std::lexicographical_compare(one.begin(), one.end(), other.begin(), other.end(),
+                                        [](const std::string& left, const std::string& right) {
+                                            return !isVariable(left) && isVariable(right);
+                                        });
+}
+
 bool answers(const Route& route, std::string_view method) {
     return method == route.method || (method == "HEAD" && std::string_view(route.method) == "GET");
 }
@@ -134,18 +152,25 @@ Router::Router(std::vector<Route> routes) : routes_(std::move(routes)) {
             }
         }
         for (const Entry& other : entries_) {
-            if (other.segments == pattern->segments &&
+            if (areAlike(other.segments, pattern->segments) &&
                 std::string_view(other.route->method) == route.method) {
                 throw std::logic_error(std::string("two routes for ") + route.path);
             }
         }
         entries_.push_back({&route, pattern->segments});
     }
+    // So that the order of the rows does not matter: "/v1/tasks/all" is found before
+    // "/v1/tasks/{id}".
+    std::stable_sort(entries_.begin(), entries_.end(), [](const Entry& one, const Entry& other) {
+        return isMoreExact(one.segments, other.segments);
+    });
 }
 
 std::vector<const Router::Entry*> Router::atPath(const Target& target) const {
     std::vector<const Entry*> found;
     for (const Entry& entry : entries_) {
+        // What a more exact path stands for is no longer looked for among the others.
+        if (!found.empty() && !areAlike(entry.segments, found.front()->segments)) continue;
         const Route& route = *entry.route;
         if (std::equal(target.segments.begin(), target.segments.end(), entry.segments.begin(),
                        entry.segments.end(),

@@ -145,11 +145,28 @@ TEST_F(Routes, AreClosedToThoseWhoMayNotUseThem) {
     EXPECT_EQ(found("GET", "/v1/tasks/7", Access::Read), "GET /v1/tasks/{id} id=7");
 }
 
+TEST(RouteTable, FindsLiteralSegmentsFirstWhateverTheOrderOfItsRows) {
+    const Route one{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, kId};
+    const Route removal{"DELETE", "/a/{id}", "", Access::Act, Runs::AtOnce, nothing, kId};
+    const Route all{"GET", "/a/all", "", Access::Read, Runs::AtOnce, nothing};
+    for (const Router& router : {Router({one, removal, all}), Router({all, removal, one})}) {
+        const auto find = [&router](const char* method, const char* target) {
+            return router.find({method, target, "", {0, 0, 0, Access::Act}});
+        };
+        EXPECT_STREQ(std::get<Match>(find("GET", "/a/all")).route->path, "/a/all");
+        EXPECT_STREQ(std::get<Match>(find("GET", "/a/7")).route->path, "/a/{id}");
+        EXPECT_EQ(std::get<Reply>(find("DELETE", "/a/all")).status, 405U);
+    }
+}
+
 TEST(RouteTable, ThatContradictsItselfIsRefused) {
+    const host::Parameter other{"other", host::Type::Text, host::Need::Required, ""};
+    const Route alike{"GET", "/a/{other}", "", Access::Read, Runs::AtOnce, nothing, {other}};
     const Route good{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, kId};
     const Route lacking{"GET", "/b/{id}", "", Access::Read, Runs::AtOnce, nothing};
     EXPECT_THROW(Router({lacking}), std::logic_error);
     EXPECT_THROW(Router({good, good}), std::logic_error);
+    EXPECT_THROW(Router({good, alike}), std::logic_error);
     EXPECT_NO_THROW(Router({good}));
 }
 
