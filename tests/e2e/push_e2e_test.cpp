@@ -7,6 +7,8 @@
 
 #include <algorithm>
 #include <csignal>
+#include <fstream>
+#include <iterator>
 
 #include "e2e/push_fixture.h"
 
@@ -35,6 +37,13 @@ protected:
                                {"fault", 0},
                                {"meaning", words}};
         EXPECT_EQ(document["files"], json::array({expected}));
+    }
+    /// The host's socket for transfers and its ends of connections, accepted or not.
+    std::size_t transferSockets() const {
+        const std::string path = host_->socket() + ".rpc";
+        std::ifstream table("/proc/net/unix");
+        const std::istream_iterator<std::string> words(table);
+        return static_cast<std::size_t>(std::count(words, {}, path));
     }
 };
 
@@ -195,10 +204,12 @@ TEST_F(Push, WhatIsNoFileIsWrongUsage) {
 TEST_F(Push, ATerminalSeesABarWithBytesRateAndTimeLeft) {
     const std::string file = files_.write("file", randomBytes(3 * kBatch));
     const std::string command = zavctlPath() + " --socket " + host_->socket() + " push " + file;
+    const std::size_t before = transferSockets();
     ::kill(host_->pid(), SIGSTOP);
     Program terminal({"/usr/bin/script", "-qec", command, "/dev/null"});
-    // Nothing is drawn in the first moments of a push. It has not begun before its program has.
-    ::usleep(2'000'000);
+    EXPECT_TRUE(eventually([&] { return transferSockets() > before; })) << "the push has begun";
+    // Nothing is drawn in the first tenth of a second. Only time brings that to an end.
+    ::usleep(150'000);
     ::kill(host_->pid(), SIGCONT);
     const ProgramResult result = terminal.wait();
     EXPECT_EQ(result.status, 0) << result.err;

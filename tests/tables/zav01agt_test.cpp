@@ -2,6 +2,7 @@
 #include "tables/zav01agt.h"
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <atomic>
 #include <chrono>
@@ -13,8 +14,10 @@
 #include <vector>
 
 #include "support/fake_sleep.h"
+#include "support/host/program.h"
 #include "support/row_text.h"
 #include "support/scoped_env.h"
+#include "support/thread_state.h"
 #include "support/trace_capture.h"
 #include "tables/table_checks.h"
 #include "tasks/home.h"
@@ -469,15 +472,18 @@ TEST_F(RequestEvents, KeepARequestInUseAndLeaveItEmpty) {
 
 TEST_F(RequestEvents, AreGivenUnderTheTablesLock) {
     std::atomic<bool> locked{false};
+    std::atomic<pid_t> otherId{0};
     std::thread other;
     const auto subscription = oxa::subscribe("KAGREQT", {}, [&](const oxa::Rows&) {
-        other = std::thread([&locked] {
+        other = std::thread([&] {
+            otherId = ::gettid();
             zav_kagreqt_static_manager->lock();
             locked = true;
             zav_kagreqt_static_manager->unlock();
         });
-        std::this_thread::sleep_for(std::chrono::milliseconds(100));
-        return locked ? OXA_GONE : OXA_OK;
+        const bool waits =
+            eventually([&] { return locked || (otherId != 0 && isAsleep(otherId)); });
+        return waits && !locked ? OXA_OK : OXA_GONE;
     });
     zav_kagreqt_data_t row = rowOf("x");
     EXPECT_EQ(zav_kagreqt_manager::EventArrived(&row, 1), OXA_OK);

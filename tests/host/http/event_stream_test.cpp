@@ -79,7 +79,8 @@ TEST_F(Events, StillReachAClientThatHasEndedItsSide) {
     start();
     RawClient client = subscribe();
     client.endSending();
-    std::this_thread::sleep_for(milliseconds(50));
+    // The server answers this after it has seen the end of the other client's side.
+    EXPECT_EQ(subscriptionsInHealth(), "1");
     EXPECT_EQ(table.liveObjects(), 1U);
     table.publish(plainRow("still", 1, ""));
     EXPECT_NE(client.readUntil("\n\n").find("still"), std::string::npos);

@@ -1,11 +1,13 @@
 // ctest-label: threaded
 // How a server ends: what is under way is finished, nothing new begins.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <atomic>
 #include <vector>
 
 #include "host/server_fixture.h"
+#include "support/thread_state.h"
 
 namespace {
 
@@ -171,8 +173,8 @@ TEST_F(TaskEnd, FollowsTheTaskInHandWhoseOutcomeIsSentAndNoOtherBegins) {
     });
     server->end(seconds(60));
     ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
-    std::this_thread::sleep_for(milliseconds(50));
-    EXPECT_FALSE(ended);
+    // That the server does not end shows only in time. It would look several times meanwhile.
+    EXPECT_FALSE(eventually([&] { return ended.load(); }, milliseconds(50)));
     first.open();
     EXPECT_TRUE(hasEnded());
     EXPECT_FALSE(secondBegun);
@@ -195,12 +197,20 @@ TEST_F(TaskEnd, SurvivesSubscribersThatLeaveWhileTheExecutorIsHeld) {
     std::vector<RawClient> subscribers;
     for (int i = 0; i < 20; ++i)
         subscribers.push_back(subscribeToOutcomes());
+    RawClient half = connect();
+    half.send("GET /v1/health HTTP/1.1\r\n");
     flood();
     accept("t1");
     server->end(seconds(60));
     ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
-    executor = std::thread([&] { outcomes.publish(taskRow("t1")); });
-    std::this_thread::sleep_for(milliseconds(100));
+    half.send("\r\n");
+    ASSERT_EQ(half.readAnswer().status, 503) << "everything is prepared for the end";
+    std::atomic<pid_t> executorId{0};
+    executor = std::thread([&] {
+        executorId = ::gettid();
+        outcomes.publish(taskRow("t1"));
+    });
+    ASSERT_TRUE(eventually([&] { return executorId != 0 && isAsleep(executorId); }));
     subscribers.clear();
     EXPECT_TRUE(hasEnded());
 }

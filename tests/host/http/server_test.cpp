@@ -468,8 +468,10 @@ TEST_F(Samples, BeyondThoseThatMayWaitGet503) {
 
 TEST_F(Samples, OfClientsThatVanishedHarmNobody) {
     OpeningGate gate;
+    std::atomic<int> begun{0};
     std::atomic<int> finished{0};
     table.sampler = [&](rtoxa& request) {
+        ++begun;
         gate.wait();
         for (int i = 0; i < 1000; ++i)
             insert(request, plainRow("row", i, ""));
@@ -479,7 +481,7 @@ TEST_F(Samples, OfClientsThatVanishedHarmNobody) {
     start();
     for (int i = 0; i < 20; ++i)
         connect().sendPost("/v1/query", plainQuery());
-    std::this_thread::sleep_for(milliseconds(50));
+    ASSERT_TRUE(eventually([&] { return begun == 20; }));
     gate.open();
     EXPECT_TRUE(eventually([&] { return finished == 20; }));
     EXPECT_EQ(connect().get("/v1/health").status, 200);

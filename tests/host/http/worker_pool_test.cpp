@@ -72,10 +72,11 @@ TEST(WorkerPool, ItsEndWaitsForRunningJobsAndDropsTheOthers) {
     std::atomic<int> done{0};
     const auto held = std::make_shared<int>(1);
     {
-        WorkerPool pool(1, 10);
+        WorkerPool pool(1, 1'000'000);
         EXPECT_TRUE(pool.submit([&] {
             started = true;
-            std::this_thread::sleep_for(std::chrono::milliseconds(50));
+            // A pool with that much room refuses a job only once its end has begun.
+            EXPECT_TRUE(eventually([&] { return !pool.submit([] {}); }));
             ++done;
         }));
         EXPECT_TRUE(eventually([&] { return started.load(); }));
