@@ -26,6 +26,7 @@
 #include <vector>
 
 #include "embedded/ras1_control.h"
+#include "ras1/ears.h"
 #include "ras1/selection.h"
 
 std::atomic<unsigned> RAS1_Generation{1};
@@ -113,6 +114,21 @@ Facility& facility() {
 /// Opens the log and duplicates standard error at the start of the process, before it redirects
 /// anything.
 [[maybe_unused]] const Facility& startedEarly = facility();
+
+// A unit that is heard traces more than is logged. Its flags then hold, above the bits that callers
+// test, which levels are logged and which are heard. The mark stays when nobody listens any more,
+// because a caller may have tested the old flags before.
+constexpr unsigned kLoggedShift = 8;
+constexpr unsigned kHeardShift = 16;
+constexpr unsigned kMarked = 1U << 24;
+
+unsigned flagsFor(const RAS1_UNIT& unit) {
+    const unsigned logged = facility().selection().flagsOf(unit.name);
+    const unsigned heard = ras1::Ears::ofProcess().levelsOf(unit.name);
+    const unsigned marked = unit.flags.load(std::memory_order_relaxed) & kMarked;
+    if (heard == 0 && marked == 0) return logged;
+    return logged | heard | logged << kLoggedShift | heard << kHeardShift | kMarked;
+}
 
 /// Appends a number in decimal, with at least `width` digits.
 char* putNumber(char* at, long long value, int width) {
@@ -297,11 +313,27 @@ void writeText(const RAS1_BLOCK& block, char letter, int line, const char* text,
     writeLine(block, letter, line, safe.get(), putEscaped(safe.get(), text, length));
 }
 
+void tell(const RAS1_BLOCK& block, unsigned level, const char* text, std::size_t length) {
+    const int savedErrno = errno;
+    ras1::Ears::ofProcess().tell({block.unit->name, block.function, level, text, length});
+    errno = savedErrno;
+}
+
+/// Takes a line to those who want it: the log, a listener, or both.
+void passOn(const RAS1_BLOCK& block, unsigned level, int line, const char* text,
+            std::size_t length) {
+    const unsigned flags = block.unit->flags.load(std::memory_order_relaxed);
+    const bool marked = (flags & kMarked) != 0;
+    if (marked && (flags >> kHeardShift & level) != 0) tell(block, level, text, length);
+    if (marked && (flags >> kLoggedShift & level) == 0) return;
+    writeText(block, level == RAS1_ERROR ? 'E' : 'D', line, text, length);
+}
+
 }  // namespace
 
 unsigned RAS1_Sync(RAS1_UNIT* unit) {
     const unsigned generation = RAS1_Generation.load(std::memory_order_acquire);
-    const unsigned flags = facility().selection().flagsOf(unit->name);
+    const unsigned flags = flagsFor(*unit);
     unit->flags.store(flags, std::memory_order_relaxed);
     unit->generation.store(generation, std::memory_order_release);
     return flags;
@@ -322,24 +354,23 @@ void RAS1_ExitValue(const RAS1_BLOCK* block, int line, long value) {
 }
 
 void RAS1_Printf(const RAS1_BLOCK* block, unsigned level, int line, const char* format, ...) {
-    const char letter = level == RAS1_ERROR ? 'E' : 'D';
     std::va_list arguments;
     va_start(arguments, format);
     if (std::strcmp(format, "%s") == 0) {
         const char* const given = va_arg(arguments, const char*);
         const char* const text = given != nullptr ? given : "(null)";
-        writeText(*block, letter, line, text, std::strlen(text));
+        passOn(*block, level, line, text, std::strlen(text));
     } else {
         char buffer[1024];
         std::va_list again;
         va_copy(again, arguments);
         const int length = std::vsnprintf(buffer, sizeof buffer, format, arguments);
         if (length >= 0 && static_cast<std::size_t>(length) < sizeof buffer) {
-            writeText(*block, letter, line, buffer, static_cast<std::size_t>(length));
+            passOn(*block, level, line, buffer, static_cast<std::size_t>(length));
         } else if (length >= 0) {
             std::string whole(static_cast<std::size_t>(length) + 1, '\0');
             std::vsnprintf(whole.data(), whole.size(), format, again);
-            writeText(*block, letter, line, whole.data(), static_cast<std::size_t>(length));
+            passOn(*block, level, line, whole.data(), static_cast<std::size_t>(length));
         }
         va_end(again);
     }
