@@ -1,32 +1,21 @@
 #include "ctl/command_line.h"
 
 #include <CLI/CLI.hpp>
-#include <deque>
-#include <map>
+#include <algorithm>
+#include <iomanip>
 #include <optional>
 #include <sstream>
 #include <utility>
 
-#include "ctl/client/failure.h"
 #include "ctl/verbs/global_arguments.h"
+#include "ctl/verbs/help_page.h"
+#include "ctl/verbs/usage_mistake.h"
 #include "ctl/verbs/verb_table.h"
 
 namespace ctl {
 namespace {
 
 using Words = std::vector<std::string>;
-using Verbs = std::vector<const Verb*>;
-
-constexpr const char* kExitStatuses =
-    "Exit status: 0 success, 1 the host reported a failure, 2 wrong usage,\n"
-    "3 no host reached, 4 no outcome within --timeout.";
-
-std::string joined(const Words& words) {
-    std::string text;
-    for (const std::string& word : words)
-        text += (text.empty() ? "" : " ") + word;
-    return text;
-}
 
 /// "config" and "get" of "config get"; nothing and "start" of "start".
 std::pair<std::string, std::string> splitName(const std::string& name) {
@@ -35,16 +24,40 @@ std::pair<std::string, std::string> splitName(const std::string& name) {
     return {name.substr(0, blank), name.substr(blank + 1)};
 }
 
+/// What a value must be: "--port: "0" is not a whole number from 1 to 65535".
+CLI::Validator kindOf(const Argument& argument) {
+    const bool isWhole = argument.type == Argument::Type::Number;
+    const bool isLimited = argument.least < argument.most;
+    std::ostringstream kind;
+    kind << (isWhole ? "a whole number" : "a number of seconds") << std::fixed
+         << std::setprecision(0);
+    if (isLimited) kind << " from " << argument.least << " to " << argument.most;
+    const auto fits = [=](const std::string& text) {
+        double value = 0;
+        unsigned whole = 0;
+        if (isWhole ? !CLI::detail::lexical_cast(text, whole)
+                    : !CLI::detail::lexical_cast(text, value)) {
+            return false;
+        }
+        if (isWhole) value = whole;
+        // What is "not a number" is neither below a limit nor above it.
+        return !isLimited || (value >= argument.least && value <= argument.most);
+    };
+    return CLI::Validator(
+        [fits, text = kind.str()](const std::string& value) {
+            return fits(value) ? std::string() : "\"" + value + "\" is not " + text;
+        },
+        "");
+}
+
 /// The arguments of one command, declared to CLI11, which stores the values where they belong.
+/// Whether they are complete and go together is for firstMistake().
 class DeclaredArguments {
 public:
     DeclaredArguments(CLI::App& app, const ArgumentList& arguments) {
-        for (const Argument& argument : arguments)
-            declareOne(app, argument);
         for (const Argument& argument : arguments) {
-            CLI::Option& option = *options_.at(argument.name).first;
-            if (argument.excludes != nullptr) option.excludes(options_.at(argument.excludes).first);
-            if (argument.needs != nullptr) option.needs(options_.at(argument.needs).first);
+            Value& value = values_.add(argument);
+            options_.emplace_back(addOption(app, argument, value), &value);
         }
     }
     DeclaredArguments(const DeclaredArguments&) = delete;
@@ -52,131 +65,75 @@ public:
 
     /// After the parse.
     const Values& values() {
-        for (auto& [name, declared] : options_)
-            declared.second->isGiven = declared.first->count() > 0;
+        for (auto& [option, value] : options_)
+            value->isGiven = option->count() > 0;
         return values_;
     }
 
 private:
-    static std::string helpOf(const Argument& argument) {
-        if (argument.fallback == nullptr) return argument.help;
-        return std::string(argument.help) + "; " + argument.fallback + " if not given";
-    }
-
     static CLI::Option* addOption(CLI::App& app, const Argument& argument, Value& value) {
-        const std::string help = helpOf(argument);
-        if (argument.kind == Argument::Kind::Flag) {
-            return app.add_flag(argument.name, value.flag, help);
-        }
+        if (argument.kind == Argument::Kind::Flag) return app.add_flag(argument.name, value.flag);
         switch (argument.type) {
             case Argument::Type::Texts:
-                return app.add_option(argument.name, value.texts, help);
+                return app.add_option(argument.name, value.texts);
             case Argument::Type::Number:
-                return app.add_option(argument.name, value.number, help);
+                return app.add_option(argument.name, value.number)->check(kindOf(argument));
             case Argument::Type::Seconds:
-                return app.add_option(argument.name, value.seconds, help);
+                return app.add_option(argument.name, value.seconds)->check(kindOf(argument));
             case Argument::Type::Text:
                 break;
         }
-        return app.add_option(argument.name, value.text, help);
-    }
-
-    static void limit(CLI::Option& option, const Argument& argument) {
-        if (argument.least >= argument.most) return;
-        if (argument.type == Argument::Type::Number) {
-            option.check(CLI::Range(static_cast<unsigned>(argument.least),
-                                    static_cast<unsigned>(argument.most)));
-        } else {
-            option.check(CLI::Range(argument.least, argument.most));
-        }
-    }
-
-    void declareOne(CLI::App& app, const Argument& argument) {
-        Value& value = values_.add(argument);
-        CLI::Option* const option = addOption(app, argument, value);
-        option->required(argument.isRequired);
-        if (argument.valueName != nullptr) option->type_name(argument.valueName);
-        if (argument.isHidden) option->group("");
-        limit(*option, argument);
-        options_[argument.name] = {option, &value};
+        return app.add_option(argument.name, value.text);
     }
 
     Values values_;
-    std::map<std::string, std::pair<CLI::Option*, Value*>> options_;
+    std::vector<std::pair<CLI::Option*, Value*>> options_;
 };
 
-/// A parser that knows some of the verbs, or all.
+/// Takes words apart, for one verb or for none.
 class Parser {
 public:
-    explicit Parser(const Verbs& verbs)
-        : app_("Manages the monitoring agents of one host.", "zavctl") {
-        app_.require_subcommand(1);
+    explicit Parser(const Verb* verb) : app_("", "zavctl"), globals_(app_, kGlobalArguments) {
         app_.fallthrough();  // global options may stand behind the verb
-        app_.footer(kExitStatuses);
-        globals_.emplace(app_, kGlobalArguments);
-        app_.set_version_flag("--version", "zavctl " ZAV_VERSION, "Print the version and exit");
-        for (const Verb* const verb : verbs)
-            addVerb(*verb);
+        app_.allow_extras();
+        app_.set_version_flag("--version", "zavctl " ZAV_VERSION);
+        if (verb != nullptr) addVerb(*verb);
     }
 
     /// Throws CLI::ParseError, also for help and the version.
-    CommandLine parse(const Words& words) {
+    Values parse(const Words& words) {
         Words reversed(words.rbegin(), words.rend());
         app_.parse(reversed);
-        CommandLine line;
-        for (Entry& entry : entries_) {
-            if (!entry.app->parsed()) continue;
-            line.verb = entry.verb;
-            line.given = entry.arguments.values();
-        }
-        line.given.append(globals_->values());
-        return line;
+        Values given;
+        if (arguments_) given = arguments_->values();
+        given.append(globals_.values());
+        return given;
     }
 
-    /// The text to print after parse() has thrown. An unknown word hides a missing required one, so
-    /// the unknown word is reported.
-    Page pageOf(const CLI::ParseError& error) const {
-        const Words unknown = app_.remaining(true);
-        const bool missing = dynamic_cast<const CLI::RequiredError*>(&error) != nullptr;
-        std::ostringstream out;
-        std::ostringstream err;
-        const int code = missing && !unknown.empty()
-                             ? app_.exit(CLI::ExtrasError(app_.get_name(), unknown), out, err)
-                             : app_.exit(error, out, err);
-        return {out.str(), err.str(), code == 0 ? kSuccess : kWrongUsage};
+    /// The words that nobody takes, in no order. After the parse.
+    Words unknown() const {
+        Words words = app_.remaining(true);
+        // What ends the options is listed among them.
+        words.erase(std::remove(words.begin(), words.end(), "--"), words.end());
+        return words;
     }
 
 private:
-    struct Entry {
-        Entry(const Verb& of, CLI::App& parser)
-            : verb(&of), app(&parser), arguments(parser, of.arguments) {}
-        const Verb* verb;
-        CLI::App* app;
-        DeclaredArguments arguments;
-    };
-
     void addVerb(const Verb& verb) {
         const auto [group, name] = splitName(verb.name);
-        CLI::App& parent = group.empty() ? app_ : groupOf(group);
-        CLI::App* const app = parent.add_subcommand(name, verb.help);
-        app->footer(std::string("Examples:\n  ") + verb.examples[0] + "\n  " + verb.examples[1] +
-                    "\n\n" + kExitStatuses);
-        entries_.emplace_back(verb, *app);
-    }
-
-    CLI::App& groupOf(const std::string& name) {
-        CLI::App*& group = groups_[name];
-        if (group == nullptr) {
-            group = app_.add_subcommand(name, findVerbGroup(name)->help);
-            group->require_subcommand(1);
+        CLI::App* parent = &app_;
+        if (!group.empty()) {
+            parent = app_.add_subcommand(group);
+            parent->allow_extras();
         }
-        return *group;
+        CLI::App* const app = parent->add_subcommand(name);
+        app->allow_extras();
+        arguments_.emplace(*app, verb.arguments);
     }
 
     CLI::App app_;
-    std::optional<DeclaredArguments> globals_;
-    std::map<std::string, CLI::App*> groups_;
-    std::deque<Entry> entries_;
+    DeclaredArguments globals_;
+    std::optional<DeclaredArguments> arguments_;
 };
 
 bool takesValue(const std::string& option) {
@@ -186,55 +143,70 @@ bool takesValue(const std::string& option) {
     return false;
 }
 
-Verbs allVerbs() {
-    return {std::begin(kVerbs), std::end(kVerbs)};
+/// How far the words name a command, seen without parsing them.
+NamedCommand nameIn(const Words& words) {
+    NamedCommand named;
+    for (std::size_t i = 0; i < words.size(); ++i) {
+        const bool isOption = words[i].rfind('-', 0) == 0;
+        if (takesValue(words[i])) ++i;
+        if (isOption) continue;
+        named.name += (named.name.empty() ? "" : " ") + words[i];
+        const VerbGroup* const group = findVerbGroup(named.name);
+        if (group == nullptr) break;
+        named.group = group;
+    }
+    named.verb = findVerb(named.name);
+    return named;
 }
 
-CommandLine parseWithAllVerbs(const Words& words) {
-    Parser parser(allVerbs());
-    try {
-        return parser.parse(words);
-    } catch (const CLI::ParseError& error) {
-        CommandLine line;
-        line.page = parser.pageOf(error);
-        return line;
+CommandLine helpFor(const NamedCommand& named) {
+    CommandLine line;
+    line.page.out = named.verb != nullptr    ? verbHelp(*named.verb)
+                    : named.group != nullptr ? groupHelp(*named.group)
+                                             : programHelp();
+    return line;
+}
+
+CommandLine wrongUsage(const std::string& mistake, const NamedCommand& named) {
+    std::string hint = "zavctl help";
+    if (named.verb != nullptr) {
+        hint += std::string(" ") + named.verb->name + " shows how it is used";
+    } else {
+        if (named.group != nullptr) hint += std::string(" ") + named.group->name;
+        hint += " lists the commands";
     }
+    CommandLine line;
+    line.page = {{}, complaint(mistake) + hint + "\n", kWrongUsage};
+    return line;
 }
 
 }  // namespace
 
 const Verb* namedVerb(const std::vector<std::string>& words) {
-    std::string name;
-    for (std::size_t i = 0; i < words.size(); ++i) {
-        const bool isOption = words[i].rfind('-', 0) == 0;
-        if (takesValue(words[i])) ++i;
-        if (isOption) continue;
-        name += (name.empty() ? "" : " ") + words[i];
-        if (findVerbGroup(name) == nullptr) break;
-    }
-    return findVerb(name);
+    return nameIn(words).verb;
 }
 
 CommandLine parseCommandLine(const std::vector<std::string>& words) {
-    // Declaring all verbs takes longer than most of them run. On an error the line is parsed again
-    // with all of them, for a complete message.
-    if (const Verb* const verb = namedVerb(words); verb != nullptr) {
-        try {
-            return Parser({verb}).parse(words);
-        } catch (const CLI::ParseError&) {
-        }
+    const NamedCommand named = nameIn(words);
+    Parser parser(named.verb);
+    CommandLine line;
+    try {
+        line.given = parser.parse(words);
+    } catch (const CLI::CallForHelp&) {
+        return helpFor(named);
+    } catch (const CLI::CallForVersion& version) {
+        line.page.out = std::string(version.what()) + "\n";
+        return line;
+    } catch (const CLI::ArgumentMismatch& mismatch) {
+        const std::string text = mismatch.what();
+        return wrongUsage(text.substr(0, text.find(':')) + " needs a value", named);
+    } catch (const CLI::ParseError& error) {
+        return wrongUsage(error.what(), named);
     }
-    return parseWithAllVerbs(words);
-}
-
-std::string helpText(const std::vector<std::string>& verb) {
-    const std::string name = joined(verb);
-    if (!name.empty() && findVerb(name) == nullptr && findVerbGroup(name) == nullptr) {
-        throw Failure(kWrongUsage, "there is no command \"" + name + "\"");
-    }
-    Words words = verb;
-    words.emplace_back("--help");
-    return parseWithAllVerbs(words).page.out;
+    const std::string mistake = firstMistake(named, {words, parser.unknown(), line.given});
+    if (!mistake.empty()) return wrongUsage(mistake, named);
+    line.verb = named.verb;
+    return line;
 }
 
 }  // namespace ctl

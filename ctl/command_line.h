@@ -23,8 +23,4 @@ const Verb* namedVerb(const std::vector<std::string>& words);
 /// Takes the words behind the program's name apart. Nothing is run.
 CommandLine parseCommandLine(const std::vector<std::string>& words);
 
-/// The help for a verb or a group, named by its words; for the program if there are none. Throws
-/// Failure(kWrongUsage) when there is no such verb.
-std::string helpText(const std::vector<std::string>& verb);
-
 }  // namespace ctl

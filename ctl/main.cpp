@@ -20,8 +20,7 @@ namespace {
 ctl::ExitStatus run(const std::vector<std::string>& words) {
     const ctl::CommandLine line = ctl::parseCommandLine(words);
     if (line.verb == nullptr) return ctl::print(line.page);
-    return line.verb->run(
-        {line.given, ctl::hostAddressOf(line.given), ctl::formatOf(line.given), ctl::helpText});
+    return line.verb->run({line.given, ctl::hostAddressOf(line.given), ctl::formatOf(line.given)});
 }
 
 /// False when standard output is a pipe that nobody reads any more.

@@ -112,8 +112,7 @@ constexpr Verb kInstallVerb = {
     "Install a product from the depot",
     kArguments,
     {"zavctl install ux 7.1 -- /bin/sh '|DEPLOYDIR|/install.sh' -h '|TOVRINHOME|'",
-     "zavctl install ux 7.1 --restart --complete -- /bin/sh '|DEPLOYDIR|/install.sh' -h "
-     "'|TOVRINHOME|'"},
+     "zavctl install ux 7.1 --restart --complete -- '|DEPLOYDIR|/setup.sh'"},
     run,
 };
 

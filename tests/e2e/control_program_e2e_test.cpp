@@ -137,7 +137,8 @@ TEST(ControlProgram, AnUnknownWordIsWrongUsageAndIsNamed) {
         const ProgramResult result = runProgram(line);
         EXPECT_EQ(result.status, 2);
         EXPECT_EQ(result.out, "");
-        EXPECT_THAT(result.err, ContainsRegex("not expected: (--)?frobnicate\n"));
+        EXPECT_THAT(result.err,
+                    ContainsRegex("(command|option|with) \"(config )?(--)?frobnicate\"\n"));
     }
 }
 
@@ -171,7 +172,7 @@ TEST(ControlProgram, EveryCommandHasHelpThatNeedsNoHost) {
         std::string usage = "Usage: zavctl ";
         for (const std::string& word : command)
             usage += word + " ";
-        EXPECT_THAT(result.out, HasSubstr(usage + "[OPTIONS]"));
+        EXPECT_THAT(result.out, HasSubstr(usage));
     }
 }
 
