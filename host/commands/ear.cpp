@@ -1,0 +1,92 @@
+#include "host/commands/ear.h"
+
+#include <cstddef>
+#include <iterator>
+#include <string_view>
+
+#include "host/commands/trace_texts.h"
+
+namespace host {
+namespace {
+
+using OwnRecorders = std::vector<std::shared_ptr<Recorder>>;
+
+/// The recorders of threads that have no ThreadEar. Never destroyed: such threads live as long as
+/// the process.
+class PluginThreads {
+public:
+    static PluginThreads& ofProcess() {
+        static PluginThreads& instance = *new PluginThreads;
+        return instance;
+    }
+    Recorder* add() {
+        const embedded::MutexLock lock(lock_);
+        return recorders_.emplace_back(std::make_shared<Recorder>()).get();
+    }
+    OwnRecorders all() const {
+        const embedded::MutexLock lock(lock_);
+        return recorders_;
+    }
+
+private:
+    mutable embedded::Mutex lock_;
+    OwnRecorders recorders_ ZAV_GUARDED_BY(lock_);
+};
+
+thread_local Recorder* current = nullptr;
+
+class Ear final : public ras1::Listener {
+public:
+    void hear(const ras1::HeardLine& line) noexcept override {
+        if (current == nullptr && !beginsCommand(line)) return;
+        try {
+            if (current == nullptr) current = PluginThreads::ofProcess().add();
+        } catch (...) {
+            return;  // no memory to remember anything in
+        }
+        current->hear(line);
+    }
+
+private:
+    static bool beginsCommand(const ras1::HeardLine& line) {
+        const std::string_view text(line.text, line.length);
+        return std::string_view(line.unit) == trace::kRunnerUnit &&
+               text.substr(0, trace::kCommand.size()) == trace::kCommand;
+    }
+};
+
+}  // namespace
+
+void hearCommands() {
+    static Ear& ear = *new Ear;
+    static const ras1::Listening& listening =
+        *new ras1::Listening(ear, {{trace::kRunnerUnit, RAS1_DETAIL | RAS1_ERROR},
+                                   {trace::kProcessUnit, RAS1_DETAIL | RAS1_ERROR},
+                                   {trace::kAnswerUnit, RAS1_DETAIL},
+                                   {trace::kInventoryUnit, RAS1_ERROR}});
+    (void)listening;
+}
+
+ThreadEar::ThreadEar(std::size_t outputBytes) : recorder_(outputBytes) {
+    current = &recorder_;
+}
+
+ThreadEar::~ThreadEar() {
+    current = nullptr;
+}
+
+Heard takeOfPluginThread() {
+    return current == nullptr ? Heard{} : current->take();
+}
+
+std::vector<Command> commandsOfPluginThreads() {
+    std::vector<Command> found;
+    for (const auto& recorder : PluginThreads::ofProcess().all()) {
+        std::vector<Command> commands = recorder->commands();
+        found.insert(found.end(), std::make_move_iterator(commands.begin()),
+                     std::make_move_iterator(commands.end()));
+    }
+    return found;
+}
+
+}  // namespace host

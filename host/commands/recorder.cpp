@@ -1,0 +1,221 @@
+#include "host/commands/recorder.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <charconv>
+#include <csignal>
+#include <ctime>
+#include <system_error>
+#include <utility>
+
+#include "host/commands/child_end.h"
+#include "host/commands/trace_texts.h"
+
+namespace host {
+namespace {
+
+constexpr std::size_t kMostCommands = 64;
+constexpr std::size_t kLongestLine = 16 * 1024;
+
+bool begins(std::string_view text, std::string_view with) {
+    return text.substr(0, with.size()) == with;
+}
+
+/// The rest of a text that begins so; nothing if it does not.
+std::optional<std::string_view> after(std::string_view text, std::string_view beginning) {
+    if (!begins(text, beginning)) return std::nullopt;
+    return text.substr(beginning.size());
+}
+
+int numberIn(std::string_view text) {
+    int number = 0;
+    std::from_chars(text.data(), text.data() + text.size(), number);
+    return number;
+}
+
+std::string reason(const char* what, int error) {
+    return std::string(what) + ": " + std::generic_category().message(error);
+}
+
+std::int64_t nanoseconds() {
+    timespec now{};
+    ::clock_gettime(CLOCK_REALTIME, &now);
+    return std::int64_t{now.tv_sec} * 1'000'000'000 + now.tv_nsec;
+}
+
+WallClock::time_point wallTime(std::int64_t sinceEpoch) {
+    return WallClock::time_point(
+        std::chrono::duration_cast<WallClock::duration>(std::chrono::nanoseconds(sinceEpoch)));
+}
+
+}  // namespace
+
+void Recorder::hear(const ras1::HeardLine& line) noexcept {
+    const std::string_view text(line.text, line.length);
+    if (hearInChild(line, text)) return;
+    try {
+        const std::string_view unit = line.unit;
+        if (unit == trace::kRunnerUnit) {
+            hearRunner(text);
+        } else if (unit == trace::kProcessUnit) {
+            hearProcess(line, text);
+        } else if (const auto answer = after(text, trace::kAnswer)) {
+            const embedded::MutexLock lock(lock_);
+            others_.answer = numberIn(*answer);
+        } else if (begins(text, trace::kNoInventory)) {
+            const embedded::MutexLock lock(lock_);
+            others_.noInventory = true;
+        }
+    } catch (...) {
+        // For want of memory something stays unknown. The command itself must not suffer.
+    }
+}
+
+bool Recorder::hearInChild(const ras1::HeardLine& line, std::string_view text) {
+    const int error = errno;
+    if (std::string_view(line.unit) != trace::kProcessUnit) return false;
+    if (const auto pid = after(text, trace::kInChild)) {
+        notes_.started.store(nanoseconds());
+        notes_.pid.store(numberIn(*pid));
+        return true;
+    }
+    if (begins(text, trace::kNotConnected)) {
+        notes_.notConnected.store(true);
+        return true;
+    }
+    if (begins(text, trace::kNotExecuted)) {
+        notes_.notExecuted.store(error);
+        return true;
+    }
+    return false;
+}
+
+void Recorder::hearRunner(std::string_view text) {
+    if (const auto command = after(text, trace::kCommand)) {
+        begin(command->substr(0, command->rfind(trace::kCommandEnd)));
+    } else if (const auto out = after(text, trace::kOutput)) {
+        keepOutput(*out);
+    } else if (const auto errors = after(text, trace::kErrors)) {
+        const embedded::MutexLock lock(lock_);
+        if (open_) commands_.back().err.append(*errors);
+    } else if (begins(text, trace::kNotStarted)) {
+        close({});
+    } else if (begins(text, trace::kTimedOut)) {
+        {
+            const embedded::MutexLock lock(lock_);
+            if (open_) commands_.back().timedOut = true;
+        }
+        close({});
+    } else if (const auto good = after(text, trace::kGoodEnd)) {
+        close(*good);
+    } else if (const auto bad = after(text, trace::kBadEnd)) {
+        close(*bad);
+    }
+}
+
+void Recorder::hearProcess(const ras1::HeardLine& line, std::string_view text) {
+    if (const auto seconds = after(text, trace::kTimeout)) {
+        timeout_ = std::chrono::seconds(std::max(0, numberIn(*seconds)));
+    } else if (const auto pid = after(text, trace::kWaiting)) {
+        waitForEnd(numberIn(*pid), line.function == trace::kGivesUp);
+    } else if (const auto program = after(text, trace::kNoProgram)) {
+        const std::string path(*program);
+        const int error = ::access(path.c_str(), X_OK) == 0 ? 0 : errno;
+        const embedded::MutexLock lock(lock_);
+        if (open_) commands_.back().error = reason(path.c_str(), error);
+    }
+}
+
+void Recorder::begin(std::string_view line) {
+    // Before the plug-in's own clock starts: the wait below must not outlast the plug-in's.
+    began_ = std::chrono::steady_clock::now();
+    notes_.pid.store(0);
+    notes_.started.store(0);
+    notes_.notExecuted.store(0);
+    notes_.notConnected.store(false);
+    const embedded::MutexLock lock(lock_);
+    if (commands_.size() == kMostCommands) commands_.pop_front();
+    Command& command = commands_.emplace_back();
+    open_ = true;
+    command.line = line.substr(0, kLongestLine);
+    command.started = WallClock::now();
+    others_.output.clear();
+    others_.outputComplete = true;
+}
+
+void Recorder::keepOutput(std::string_view piece) {
+    const embedded::MutexLock lock(lock_);
+    if (!open_) return;
+    commands_.back().out.append(piece);
+    if (outputBytes_ == 0) return;
+    const std::size_t room = outputBytes_ - others_.output.size();
+    others_.output.append(piece.substr(0, room));
+    if (piece.size() > room) others_.outputComplete = false;
+}
+
+void Recorder::waitForEnd(pid_t pid, bool onlyLook) {
+    {
+        const embedded::MutexLock lock(lock_);
+        if (!open_ || pid <= 0) return;
+    }
+    const auto until = onlyLook ? std::chrono::steady_clock::now() : began_ + timeout_;
+    const std::optional<ChildEnd> end = awaitChildEnd(pid, until);
+    const embedded::MutexLock lock(lock_);
+    Command& command = commands_.back();
+    command.pid = pid;
+    if (!end) return;
+    command.ended = WallClock::now();
+    (end->bySignal ? command.signal : command.exit) = end->number;
+}
+
+void Recorder::close(std::string_view status) {
+    const embedded::MutexLock lock(lock_);
+    if (!open_) return;
+    open_ = false;
+    Command& command = commands_.back();
+    command = withNotes(command);
+    if (!command.ended) command.ended = WallClock::now();
+    if (const int error = notes_.notExecuted.load()) {
+        command.error = reason("cannot be executed", error);
+        command.executedNothing = true;
+    } else if (notes_.notConnected.load()) {
+        command.error = "its standard streams could not be connected";
+    }
+    if (command.timedOut && !command.exit) command.signal = SIGKILL;
+    if (!command.error.empty()) {
+        command.exit.reset();
+        command.signal.reset();
+    } else if (!command.exit && !command.signal && !status.empty()) {
+        command.exit = numberIn(status);
+    } else if (!command.exit && !command.signal) {
+        command.error = "could not be started";
+    }
+}
+
+Command Recorder::withNotes(const Command& command) const {
+    Command whole = command;
+    if (const pid_t pid = notes_.pid.load()) whole.pid = pid;
+    if (const std::int64_t started = notes_.started.load()) whole.started = wallTime(started);
+    return whole;
+}
+
+Heard Recorder::take() {
+    const embedded::MutexLock lock(lock_);
+    Heard heard = std::exchange(others_, {});
+    heard.commands.assign(std::make_move_iterator(commands_.begin()),
+                          std::make_move_iterator(commands_.end()));
+    commands_.clear();
+    open_ = false;
+    return heard;
+}
+
+std::vector<Command> Recorder::commands() const {
+    const embedded::MutexLock lock(lock_);
+    std::vector<Command> found(commands_.begin(), commands_.end());
+    if (open_) found.back() = withNotes(found.back());
+    return found;
+}
+
+}  // namespace host
