@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
+#include <optional>
 #include <system_error>
 
 #include "embedded/ncs_host.h"
@@ -14,11 +15,13 @@
 #include "host/api/services.h"
 #include "host/http/server.h"
 #include "host/process/end_signals.h"
+#include "host/process/home_lock.h"
 #include "host/process/options.h"
 #include "host/process/plugin_loader.h"
 #include "host/process/setup.h"
 #include "host/process/socket_file.h"
 #include "host/process/start_error.h"
+#include "host/process/task_timeout.h"
 
 namespace host {
 namespace {
@@ -53,7 +56,15 @@ void serveTransfers(ncs::Server& transfers, SocketFile& socket, const HostOption
     }
 }
 
+const char* environmentVariable(const char* name) {
+    return std::getenv(name);
+}
+
 void run(const HostOptions& options) {
+    // Unguarded hosts may share a home, as processes that load the plug-in themselves may.
+    std::optional<HomeLock> homeLock;
+    if (options.guarded) homeLock.emplace(options.home);
+    chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
     SocketFile socket(options.socket);
     SocketFile transferSocket(options.rpcSocket);
@@ -78,8 +89,7 @@ void run(const HostOptions& options) {
 int start(int argc, char** argv) {
     setUpProcess();
     try {
-        const auto options =
-            readOptions(argc, argv, [](const char* name) { return std::getenv(name); });
+        const auto options = readOptions(argc, argv, environmentVariable);
         if (options) run(*options);
         return 0;
     } catch (const std::exception& error) {

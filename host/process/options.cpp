@@ -1,16 +1,110 @@
 #include "host/process/options.h"
 
 #include <CLI/CLI.hpp>
+#include <charconv>
 #include <filesystem>
 #include <system_error>
+#include <vector>
 
 #include "host/process/start_error.h"
+#include "host/process/task_timeout.h"
 #include "host/process/version.h"
+#include "host/text/nearest_name.h"
 
 namespace host {
 namespace {
 
 namespace fs = std::filesystem;
+
+constexpr int kHighestPort = 65535;
+
+/// The command line as it was typed; a missing option is an absent value.
+struct Typed {
+    std::string home;
+    std::optional<std::string> socket;
+    std::optional<std::string> rpcSocket;
+    std::optional<std::string> rpcPort;
+    std::optional<std::string> originNode;
+    std::optional<std::string> plugin;
+    std::optional<std::string> state;
+    std::optional<std::string> taskTimeout;
+    bool unguarded = false;
+    bool check = false;
+};
+
+void declare(CLI::App& app, Typed& typed) {
+    app.set_version_flag("--version", kVersion, "Print the version and end");
+    app.set_help_flag("-h,--help", "Print this help and end");
+    app.add_option("--home", typed.home, "The home directory; else TOVRINHOME names it")
+        ->type_name("DIR");
+    app.add_option("--socket", typed.socket,
+                   "The socket for HTTP; else ZAV_SOCKET, XDG_RUNTIME_DIR/zavhost.sock or "
+                   "/run/zavhost.sock")
+        ->type_name("PATH");
+    app.add_option("--rpc-socket", typed.rpcSocket,
+                   "The socket for file transfers; else the other's name with .rpc appended")
+        ->type_name("PATH");
+    app.add_option("--rpc-port", typed.rpcPort,
+                   "A TCP port, 1 to 65535, that takes file transfers from this machine as well")
+        ->type_name("N");
+    app.add_option("--origin-node", typed.originNode,
+                   "The name of the node that this host stands for; else the machine's")
+        ->type_name("NAME");
+    app.add_option("--plugin", typed.plugin,
+                   "The plug-in; else libzavmgmt.so in ../lib beside this program or where the "
+                   "loader looks")
+        ->type_name("FILE");
+    app.add_option("--state", typed.state,
+                   "The directory for what the host itself keeps; else STATE_DIRECTORY or "
+                   "HOME/zavhost")
+        ->type_name("DIR");
+    app.add_option("--task-timeout", typed.taskTimeout,
+                   "How long one command of a task may run; else TIMEOUT says so, else 300")
+        ->type_name("SECONDS");
+    app.add_flag("--check", typed.check,
+                 "Check the home and the machine, print what was found, and end; the status is 1 "
+                 "if the host would refuse to start");
+    app.add_flag("--unguarded", typed.unguarded,
+                 "Switch off every guard, so that the plug-in does exactly what it is told");
+}
+
+std::vector<std::string> namesOf(const CLI::App& app) {
+    std::vector<std::string> names;
+    for (const CLI::Option* const option : app.get_options()) {
+        for (const std::string& name : option->get_lnames())
+            names.push_back("--" + name);
+    }
+    return names;
+}
+
+[[noreturn]] void failOnStray(const CLI::App& app, const std::string& stray) {
+    const bool isOption = !stray.empty() && stray.front() == '-';
+    const std::string name = stray.substr(0, stray.find('='));
+    const std::string nearest = isOption ? nearestName(name, namesOf(app)) : "";
+    throw StartError(
+        (isOption ? "there is no option " + name : "the argument \"" + stray + "\" has no place") +
+        (nearest.empty() ? "" : "; did you mean " + nearest + "?") + " (--help shows the options)");
+}
+
+/// Null after printing what was asked for in place of a run.
+std::optional<Typed> parse(int argc, const char* const* argv) {
+    Typed typed;
+    CLI::App app("A small agent process: loads the management plug-in and serves local clients",
+                 "zavhost");
+    declare(app, typed);
+    app.allow_extras();
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::Success& wanted) {
+        app.exit(wanted);
+        return std::nullopt;
+    } catch (const CLI::ParseError& error) {
+        throw StartError(std::string(error.what()) + " (--help shows the options)");
+    }
+    const std::vector<std::string> strays = app.remaining();
+    if (!strays.empty()) failOnStray(app, strays.front());
+    return typed;
+}
 
 std::string valueOf(const Environment& environment, const char* name) {
     const char* value = environment(name);
@@ -25,6 +119,10 @@ std::string defaultSocket(const Environment& environment) {
 }
 
 /// Children change their working directory, where a relative path would name something else.
+std::string absolutePath(const std::string& path) {
+    return fs::path(path).is_absolute() ? path : fs::absolute(path).string();
+}
+
 std::string usableHome(const std::string& given, const Environment& environment) {
     const std::string home = given.empty() ? valueOf(environment, "TOVRINHOME") : given;
     if (home.empty()) throw StartError("no home: give --home DIR or set TOVRINHOME");
@@ -35,58 +133,59 @@ std::string usableHome(const std::string& given, const Environment& environment)
                          (error ? error.message() : "no such file or directory"));
     }
     if (!fs::is_directory(status)) throw StartError("home " + home + " is not a directory");
-    return fs::path(home).is_absolute() ? home : fs::absolute(home).string();
+    return absolutePath(home);
 }
 
-}  // namespace
-
-std::optional<HostOptions> readOptions(int argc, const char* const* argv,
-                                       const Environment& environment) {
-    HostOptions options;
-    bool unguarded = false;
-    CLI::App app("A small agent process: loads the management plug-in and serves local clients",
-                 "zavhost");
-    app.set_version_flag("--version", kVersion);
-    app.add_option("--home", options.home, "Home directory; else TOVRINHOME")->type_name("DIR");
-    CLI::Option* socket =
-        app.add_option("--socket", options.socket,
-                       "Socket for HTTP; else ZAV_SOCKET, XDG_RUNTIME_DIR/zavhost.sock or "
-                       "/run/zavhost.sock")
-            ->type_name("PATH");
-    CLI::Option* rpcSocket = app.add_option("--rpc-socket", options.rpcSocket,
-                                            "Socket for file transfers; else the other's name "
-                                            "with .rpc appended")
-                                 ->type_name("PATH");
-    app.add_option("--rpc-port", options.rpcPort, "Loopback TCP port for file transfers as well")
-        ->type_name("N")
-        ->check(CLI::Range(1, 65535));
-    app.add_option("--origin-node", options.originNode,
-                   "Name of the node that this host stands for")
-        ->type_name("NAME");
-    app.add_option("--plugin", options.plugin,
-                   "The plug-in; else libzavmgmt.so in ../lib beside this program or where the "
-                   "loader looks")
-        ->type_name("FILE");
-    app.add_flag("--unguarded", unguarded,
-                 "Switch off every guard, so that the plug-in does exactly what it is told");
-    try {
-        app.parse(argc, argv);
-    } catch (const CLI::Success& wanted) {
-        app.exit(wanted);
-        return std::nullopt;
-    } catch (const CLI::ParseError& error) {
-        throw StartError(std::string(error.what()) + " (--help shows the options)");
+std::string stateDirectory(const Typed& typed, const std::string& home,
+                           const Environment& environment) {
+    if (typed.state && typed.state->empty()) {
+        throw StartError("the name of the state directory is empty");
     }
-    options.guarded = !unguarded;
-    options.home = usableHome(options.home, environment);
-    if (socket->empty()) options.socket = defaultSocket(environment);
-    if (rpcSocket->empty()) options.rpcSocket = options.socket + ".rpc";
+    if (typed.state) return absolutePath(*typed.state);
+    // A service manager that provides several separates them by colons.
+    const std::string provided = valueOf(environment, "STATE_DIRECTORY");
+    return provided.empty() ? home + "/zavhost"
+                            : absolutePath(provided.substr(0, provided.find(':')));
+}
+
+std::uint16_t portOf(const std::string& text) {
+    int port = 0;
+    const char* const end = text.data() + text.size();
+    const auto [rest, error] = std::from_chars(text.data(), end, port);
+    if (error != std::errc() || rest != end || port < 1 || port > kHighestPort) {
+        throw StartError("--rpc-port takes a number from 1 to 65535, not \"" + text + "\"");
+    }
+    return static_cast<std::uint16_t>(port);
+}
+
+void chooseSockets(const Typed& typed, const Environment& environment, HostOptions& options) {
+    options.socket = typed.socket ? *typed.socket : defaultSocket(environment);
+    options.rpcSocket = typed.rpcSocket ? *typed.rpcSocket : options.socket + ".rpc";
     if (options.socket.empty() || options.rpcSocket.empty()) {
         throw StartError("the name of a socket is empty");
     }
     if (options.socket == options.rpcSocket) {
         throw StartError("--socket and --rpc-socket name the same file " + options.socket);
     }
+}
+
+}  // namespace
+
+std::optional<HostOptions> readOptions(int argc, const char* const* argv,
+                                       const Environment& environment) {
+    const std::optional<Typed> typed = parse(argc, argv);
+    if (!typed) return std::nullopt;
+    HostOptions options;
+    options.guarded = !typed->unguarded;
+    options.check = typed->check;
+    options.originNode = typed->originNode;
+    options.plugin = typed->plugin;
+    options.home = usableHome(typed->home, environment);
+    options.state = stateDirectory(*typed, options.home, environment);
+    if (typed->rpcPort) options.rpcPort = portOf(*typed->rpcPort);
+    if (typed->taskTimeout)
+        options.taskTimeout = taskTimeoutOf("--task-timeout", *typed->taskTimeout);
+    chooseSockets(*typed, environment, options);
     return options;
 }
 

@@ -39,7 +39,8 @@ protected:
 
 TEST_F(Options, AllAreTaken) {
     const auto options = read({"--home", home.c_str(), "--socket", "/s", "--rpc-socket", "/r",
-                               "--rpc-port", "135", "--origin-node", "n", "--plugin", "p.so"});
+                               "--rpc-port", "135", "--origin-node", "n", "--plugin", "p.so",
+                               "--state", "/d", "--task-timeout", "60", "--check", "--unguarded"});
     ASSERT_TRUE(options);
     EXPECT_EQ(options->home, home);
     EXPECT_EQ(options->socket, "/s");
@@ -47,6 +48,18 @@ TEST_F(Options, AllAreTaken) {
     EXPECT_EQ(options->rpcPort, 135);
     EXPECT_EQ(options->originNode, "n");
     EXPECT_EQ(options->plugin, "p.so");
+    EXPECT_EQ(options->state, "/d");
+    EXPECT_EQ(options->taskTimeout, 60);
+    EXPECT_TRUE(options->check);
+    EXPECT_FALSE(options->guarded);
+}
+
+TEST_F(Options, WithoutThemTheHostIsGuardedAndRuns) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_TRUE(read({})->guarded);
+    EXPECT_FALSE(read({})->check);
+    EXPECT_FALSE(read({})->taskTimeout);
+    EXPECT_FALSE(read({})->rpcPort);
 }
 
 TEST_F(Options, HomeComesFromTheEnvironmentWhenItIsNotGiven) {
@@ -87,6 +100,16 @@ TEST_F(Options, SocketsHaveDefaults) {
     EXPECT_EQ(read({"--socket", "/s"})->rpcSocket, "/s.rpc");
 }
 
+TEST_F(Options, TheStateDirectoryHasDefaults) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_EQ(read({})->state, home + "/zavhost");
+    environment["STATE_DIRECTORY"] = "/var/lib/one:/var/lib/two";
+    EXPECT_EQ(read({})->state, "/var/lib/one");
+    EXPECT_EQ(read({"--state", "/s"})->state, "/s");
+    EXPECT_EQ(read({"--state", "relative"})->state.at(0), '/');
+    EXPECT_EQ(errorOf({"--state", ""}), "the name of the state directory is empty");
+}
+
 TEST_F(Options, EmptyOrEqualSocketsAreRefused) {
     environment["TOVRINHOME"] = home;
     EXPECT_EQ(errorOf({"--socket", ""}), "the name of a socket is empty");
@@ -108,6 +131,26 @@ TEST_F(Options, MistakesAreOneLine) {
         EXPECT_NE(error, "") << arguments.front();
         EXPECT_EQ(error.find('\n'), std::string::npos) << error;
     }
+}
+
+TEST_F(Options, AnUnknownOneSuggestsTheNearest) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_EQ(
+        errorOf({"--unguraded"}),
+        "there is no option --unguraded; did you mean --unguarded? (--help shows the options)");
+    EXPECT_EQ(errorOf({"--task-timout=5"}),
+              "there is no option --task-timout; did you mean --task-timeout? (--help shows the "
+              "options)");
+    EXPECT_EQ(errorOf({"--nonsense"}), "there is no option --nonsense (--help shows the options)");
+    EXPECT_EQ(errorOf({"stray"}), "the argument \"stray\" has no place (--help shows the options)");
+}
+
+TEST_F(Options, NumbersAreExplainedInWords) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_EQ(errorOf({"--rpc-port", "70000"}),
+              "--rpc-port takes a number from 1 to 65535, not \"70000\"");
+    EXPECT_EQ(errorOf({"--task-timeout", "5m"}),
+              "--task-timeout takes a number of seconds from 1 to 2147483646, not \"5m\"");
 }
 
 TEST_F(Options, HelpAndVersionRunNothing) {

@@ -1,0 +1,37 @@
+/// The products of a home, as its own inventory program lists them.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "host/process/run_command.h"
+
+namespace host {
+
+struct InstalledProduct {
+    std::string code;
+    std::string platform;
+    std::string version;
+};
+
+struct Inventory {
+    CommandResult result;  ///< of the inventory program
+    /// In the program's order; one entry for each platform that a product is installed for. Empty
+    /// too when the program failed.
+    std::vector<InstalledProduct> products;
+
+    bool has(const std::string& code) const;
+};
+
+/// Runs `home`/bin/cinfo. Any thread; takes as long as that program, at most ten seconds.
+Inventory readInventory(const std::string& home);
+
+/// The products in the list that the inventory program prints. Lines that are no entry are ignored,
+/// as the plug-in does.
+std::vector<InstalledProduct> productsIn(const std::string& list);
+
+/// Where the plug-in looks for the two-way translator of this home, which belongs to the shared
+/// component "ax"; "" while that is not in the inventory.
+std::string translatorPath(const std::string& home, const Inventory& inventory);
+
+}  // namespace host

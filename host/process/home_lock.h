@@ -1,0 +1,23 @@
+/// Keeps a second host off a home.
+#pragma once
+
+#include <string>
+
+#include "host/process/file_descriptor.h"
+
+namespace host {
+
+/// Two hosts on one home would overwrite each other's files and run commands at the same time. The
+/// owner of a home holds a lock on the file .zavhost.lock in it, which contains its process id. The
+/// lock ends with the process, however that ends; the file stays. Children do not inherit it.
+class HomeLock {
+public:
+    /// Throws StartError when another process holds the lock, with that process's id, or when the
+    /// file cannot be made.
+    explicit HomeLock(const std::string& home);
+
+private:
+    FileDescriptor file_;
+};
+
+}  // namespace host

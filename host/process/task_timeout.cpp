@@ -1,0 +1,38 @@
+#include "host/process/task_timeout.h"
+
+#include <charconv>
+#include <climits>
+#include <cstdlib>
+#include <system_error>
+
+#include "host/process/start_error.h"
+
+namespace host {
+namespace {
+
+/// The plug-in takes the largest int for a number out of range.
+constexpr int kLongest = INT_MAX - 1;
+
+}  // namespace
+
+int taskTimeoutOf(const std::string& name, const std::string& text) {
+    int seconds = 0;
+    const char* const end = text.data() + text.size();
+    const auto [rest, error] = std::from_chars(text.data(), end, seconds);
+    if (error != std::errc() || rest != end || seconds < 1 || seconds > kLongest) {
+        throw StartError(name + " takes a number of seconds from 1 to " + std::to_string(kLongest) +
+                         ", not \"" + text + "\"");
+    }
+    return seconds;
+}
+
+void chooseTaskTimeout(std::optional<int> given, bool guarded, const Environment& environment) {
+    if (given) {
+        ::setenv(kTimeoutVariable, std::to_string(*given).c_str(), 1);
+        return;
+    }
+    const char* const set = environment(kTimeoutVariable);
+    if (set != nullptr && guarded) taskTimeoutOf(kTimeoutVariable, set);
+}
+
+}  // namespace host
