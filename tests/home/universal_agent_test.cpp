@@ -188,6 +188,23 @@ TEST_F(UniversalAgent, CollectsTheCompleteNewLinesOfFiles) {
     EXPECT_EQ(std::count(more.begin(), more.end(), '\n'), 6) << more;
 }
 
+TEST_F(UniversalAgent, NotesWhatItHasStoredBeforeItEnds) {
+    // The whole process group is told to end while rows are being stored.
+    scratch.makeDir("offsets");
+    const Outcome collected = run(
+        {"/usr/bin/setsid", "-w", "/bin/sh", "-c",
+         "set -u; . \"$1\"\n"
+         "end_agent() { echo ended; exit 0; }\n"
+         "config_value() { :; }\n"
+         "store_rows() { sed 's/^/stored /'; kill -TERM 0; }\n"
+         "work=$2 import=f application=F data_source=$2/watched rows=$2/rows\n"
+         "collect_file; echo went on",
+         "sh", ZAV_SOURCE_DIR "/home/bundles/um/files/bin/collect.sh",
+         std::filesystem::path(scratch.write("watched", "one\ntwo\nhal")).parent_path().string()});
+    EXPECT_EQ(collected.out, "stored one\nstored two\nended\n") << collected.err;
+    EXPECT_EQ(scratch.read("offsets/f"), "8\n");
+}
+
 TEST_F(UniversalAgent, TypeThatWasNotStartedIsNotCollected) {
     write("universal/scripts/disk.sh", "#!/bin/sh\necho x\n", 0755);
     ASSERT_EQ(confirmed("IMPORT " + metafile()).status, 0);

@@ -93,7 +93,24 @@ collect_file() {
     else
         taken=$(head -n "$complete" "$chunk" | wc -c)
     fi
-    head -c "$taken" "$chunk" | store_rows
-    echo "$((offset + taken))" >"$offset_file"
+    # Between the rows and the note that they are stored the agent would, once started again, store
+    # them a second time.
+    hold_end
+    (
+        trap '' TERM INT # those who stop the agent tell its whole process group
+        head -c "$taken" "$chunk" | store_rows
+    ) && echo "$((offset + taken))" >"$offset_file"
+    release_end
     rm -f -- "$chunk"
+}
+
+# From hold_end to release_end the agent does not end; it does so then if it was told to meanwhile.
+hold_end() {
+    end_is_due=''
+    trap 'end_is_due=1' TERM INT
+}
+
+release_end() {
+    trap end_agent TERM INT
+    [ -z "$end_is_due" ] || end_agent
 }
