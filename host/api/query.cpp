@@ -6,6 +6,7 @@
 
 #include "host/api/call.h"
 #include "host/api/services.h"
+#include "host/api/watched_query.h"
 #include "host/tables/conditions.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
@@ -24,13 +25,6 @@ std::vector<oxa::Predicate> conditionsOf(const nlohmann::json& body, const oxa::
     return conditions;
 }
 
-oxa::Rows runWatched(const Query& query, TaskWatch& watch) {
-    TaskWatch::Request running(watch, *query.table);
-    oxa::Rows rows = run(query);
-    running.answered(rows);
-    return rows;
-}
-
 }  // namespace
 
 Endpoint postQuery;
@@ -43,8 +37,8 @@ Answer postQuery(Services& services, const Call& call) {
         return errorReply(403, "you may only read from this host; a query on " + name + " acts");
     }
     const Query query{table, conditionsOf(call.body(), *table, services.codePage)};
-    const oxa::Rows rows = runWatched(query, services.watch);
-    return jsonReply(200, rowsDocument(*table, rows, services.codePage));
+    const WatchedAnswer answer = runWatched(services, query, call.peer());
+    return jsonReply(200, rowsDocument(*table, answer.rows, services.codePage));
 }
 
 }  // namespace host

@@ -6,8 +6,10 @@
 #include <utility>
 #include <vector>
 
+#include "host/commands/ear.h"
 #include "host/http/server_counts.h"
 #include "host/outcomes/outcome_feed.h"
+#include "host/outcomes/task_list.h"
 #include "host/outcomes/task_watch.h"
 #include "host/tables/code_page.h"
 #include "host/tables/row_queue.h"
@@ -23,7 +25,9 @@ struct Services {
           codePage(std::move(localCodePage)),
           home(std::move(homeDirectory)),
           eventLimits(limits),
-          guarded(isGuarded) {}
+          guarded(isGuarded) {
+        hearCommands();
+    }
 
     const TableSet tables;
     const CodePage codePage;  ///< the one that tables speak
@@ -33,6 +37,7 @@ struct Services {
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
     ServerCounts counts;
     OutcomeFeed outcomes{tables};
+    TaskList tasks{tables, outcomes, guarded};
     TaskWatch watch{tables, outcomes};
 };
 

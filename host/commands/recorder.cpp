@@ -11,6 +11,7 @@
 #include <utility>
 
 #include "host/commands/child_end.h"
+#include "host/commands/restart_output.h"
 #include "host/commands/trace_texts.h"
 
 namespace host {
@@ -176,6 +177,7 @@ void Recorder::close(std::string_view status) {
     open_ = false;
     Command& command = commands_.back();
     command = withNotes(command);
+    addRestartOutput(command);
     if (!command.ended) command.ended = WallClock::now();
     if (const int error = notes_.notExecuted.load()) {
         command.error = reason("cannot be executed", error);
@@ -212,9 +214,13 @@ Heard Recorder::take() {
 }
 
 std::vector<Command> Recorder::commands() const {
-    const embedded::MutexLock lock(lock_);
+    embedded::MutexLock lock(lock_);
     std::vector<Command> found(commands_.begin(), commands_.end());
-    if (open_) found.back() = withNotes(found.back());
+    const bool running = open_;
+    if (running) found.back() = withNotes(found.back());
+    lock.unlock();
+    if (running) addRestartOutput(found.back());
+    lock.lock();
     return found;
 }
 

@@ -59,4 +59,14 @@ inline constexpr std::string_view kAnswer = "Returning status return code [";
 /// What the inventory program printed is no inventory.
 inline constexpr std::string_view kNoInventory = "Inventory header string ";
 
+// ---- No trace lines, but parts of one: an install that may end the host
+// --------------------------
+
+/// Its command line: this, the depot with kRestartScript at its end, a blank and the command.
+inline constexpr std::string_view kRestartShell = "/bin/sh ";
+inline constexpr std::string_view kRestartScript = "/runcmd.sh ";
+/// Files of the depot that get its outputs.
+inline constexpr const char* kRestartOutput = "stdout.txt";
+inline constexpr const char* kRestartErrors = "stderr.txt";
+
 }  // namespace host::trace

@@ -22,8 +22,25 @@ inline constexpr std::string_view kCommandColumn = "COMMAND";
 inline constexpr std::string_view kRetvalColumn = "RETVAL";
 inline constexpr int kAccepted = 0;
 
+/// In the request table: parameters of the command. SETCONFIG's context and GETCONFIG's answer are
+/// an agent's configuration, passwords among it.
+inline constexpr std::string_view kProductColumn = "PRODUCT";
+inline constexpr std::string_view kContextColumn = "CONTEXT";
+inline constexpr std::string_view kOptionalColumn = "OPTIONAL";
+inline constexpr std::string_view kGetConfiguration = "GETCONFIG";
+inline constexpr std::string_view kSetConfiguration = "SETCONFIG";
+
+constexpr bool holdsConfiguration(std::string_view command) {
+    return command == kSetConfiguration || command == kGetConfiguration;
+}
+
+/// An INSTALL with this OPTIONAL has two outcomes: one with kAccepted when it begins, since it may
+/// end the process, and one at its end. One that cannot begin has only that outcome.
+inline constexpr std::string_view kInstall = "INSTALL";
+inline constexpr std::string_view kWithRestart = "REQUIRES_RESTART";
+
 /// These commands have been carried out when their request is answered. All others are queued.
-inline constexpr std::array<std::string_view, 2> kCommandsAtOnce = {"GETCONFIG",
+inline constexpr std::array<std::string_view, 2> kCommandsAtOnce = {kGetConfiguration,
                                                                     "COMPLETE_INSTALL"};
 
 constexpr bool runsAtOnce(std::string_view command) {

@@ -62,9 +62,10 @@ TEST_F(Page, DescribesEveryParameterAndEveryMember) {
 TEST_F(Page, HasACommandForEveryRoute) {
     for (const Route& route : host::routes()) {
         const std::vector<std::string> section = sectionOf(route);
+        const std::string path = route.path;
+        const std::string upToParameter = "localhost" + path.substr(0, path.find('{'));
         EXPECT_TRUE(std::any_of(section.begin(), section.end(), [&](const std::string& line) {
-            return line.rfind("curl ", 0) == 0 &&
-                   line.find(std::string("localhost") + route.path) != std::string::npos;
+            return line.rfind("curl ", 0) == 0 && line.find(upToParameter) != std::string::npos;
         })) << nameOf(route);
     }
 }

@@ -197,14 +197,16 @@ TEST_F(Ear, LogsWhatTheSelectionAsksFor) {
 
 TEST_F(Ear, EachThreadIsHeardByItself) {
     std::vector<Heard> heard(4);
+    std::vector<std::string> scripts;  // all there before any child could hold one open
+    for (std::size_t i = 0; i < heard.size(); ++i)
+        scripts.push_back(
+            scratch.script("script" + std::to_string(i), "echo " + std::to_string(i)));
     std::vector<std::thread> threads;
     for (std::size_t i = 0; i < heard.size(); ++i) {
-        const std::string script =
-            scratch.script("script" + std::to_string(i), "echo " + std::to_string(i));
-        threads.emplace_back([&heard, i, script] {
+        threads.emplace_back([&heard, &scripts, i] {
             ThreadEar ear;
             for (int repeat = 0; repeat < 5; ++repeat)
-                run(script);
+                run(scripts[i]);
             heard[i] = ear.take();
         });
     }

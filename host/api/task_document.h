@@ -1,0 +1,22 @@
+/// Tasks and commands as JSON.
+#pragma once
+
+#include <nlohmann/json_fwd.hpp>
+#include <string>
+
+#include "host/api/services.h"
+#include "host/outcomes/task.h"
+
+namespace host {
+
+/// {"command", "pid", "started", "ended", "exit" | "signal" | "error", "timed_out"?, "stdout",
+/// "stderr"}. Members that are not known are left out.
+nlohmann::ordered_json commandObject(const Command& command, const CodePage& codePage);
+
+/// Identifier, TRANSID, what was asked for, state, times and asker.
+nlohmann::ordered_json taskSummary(const Task& task, const CodePage& codePage);
+
+/// The summary with "reply", "events" and "details", as text.
+std::string taskDocument(const Task& task, const Services& services);
+
+}  // namespace host

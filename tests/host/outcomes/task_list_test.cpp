@@ -1,0 +1,365 @@
+// ctest-label: threaded
+#include "host/outcomes/task_list.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <optional>
+#include <thread>
+
+#include "host/commands/ear.h"
+#include "host/made_up_table.h"
+#include "support/scratch_dir.h"
+#include "util/zavutil.h"
+
+namespace {
+
+using host::Heard;
+using host::Task;
+using host::TaskList;
+using host::TaskState;
+using testing::ElementsAre;
+
+std::vector<ColumnInfo> taskColumns() {
+    return {{"transid", 0, 8, OXA_TYPE_CHARACTER},
+            {"command", 8, 16, OXA_TYPE_CHARACTER},
+            {"context", 24, 8, OXA_TYPE_CHARACTER},
+            {"retval", 32, 4, OXA_TYPE_INTEGER}};
+}
+
+std::string taskRow(const std::string& transid, const std::string& command, int retval,
+                    const std::string& context = "") {
+    return RowBuilder().text(transid, 8).text(command, 16).text(context, 8).integer(retval);
+}
+
+/// What the plug-in says of itself when it answers.
+Heard answering(int retval) {
+    Heard heard;
+    heard.answer = retval;
+    return heard;
+}
+
+class Tasks : public testing::Test {
+protected:
+    explicit Tasks(bool seesThrough = true) {
+        requests.RegisterWithManager();
+        outcomes.RegisterWithManager();
+        tables.emplace(oxa::tables());
+        feed.emplace(*tables);
+        list.emplace(*tables, *feed, seesThrough);
+        host::hearCommands();
+    }
+
+    host::Query query(const std::string& transid, const std::string& command,
+                      std::vector<oxa::Predicate> more = {}) const {
+        host::Query made{tables->find("KAGREQT"),
+                         {{"TRANSID", OPER_EQ, transid}, {"COMMAND", OPER_EQ, command}}};
+        made.where.insert(made.where.end(), more.begin(), more.end());
+        return made;
+    }
+    static oxa::Rows rows(const std::string& row) {
+        return {row, static_cast<unsigned>(row.size())};
+    }
+    /// A request that is answered with this RETVAL.
+    void ask(const std::string& transid, const std::string& command = "START", int retval = 0,
+             const std::vector<oxa::Predicate>& more = {}) {
+        TaskList::Request request(*list, query(transid, command, more), "somebody");
+        request.answered(rows(taskRow(transid, command, retval)), answering(retval));
+    }
+    void publish(const std::string& transid, int retval = 0) {
+        outcomes.publish(taskRow(transid, "START", retval));
+    }
+    TaskState stateOf(const std::string& transid) const {
+        const std::optional<Task> task = list->find(transid);
+        EXPECT_TRUE(task.has_value()) << transid;
+        return task ? task->state : TaskState::Queued;
+    }
+    std::vector<std::string> transids(const TaskList::Filter& filter = {}) const {
+        std::vector<std::string> found;
+        for (const Task& task : list->newest(filter))
+            found.emplace_back(task.value("TRANSID"));
+        return found;
+    }
+
+    MadeUpTable requests{"KAGREQT", taskColumns()};
+    MadeUpTable outcomes{"KAGDYST", taskColumns()};
+    std::optional<host::TableSet> tables;
+    std::optional<host::OutcomeFeed> feed;
+    std::optional<TaskList> list;
+};
+
+TEST_F(Tasks, TheOldestRunsAndTheOthersWait) {
+    ask("t1");
+    ask("t2");
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(stateOf("t2"), TaskState::Queued);
+    publish("t1");
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+    EXPECT_EQ(stateOf("t2"), TaskState::Running);
+    publish("t2", 1024);
+    EXPECT_EQ(stateOf("t2"), TaskState::Failed);
+}
+
+TEST_F(Tasks, KnowWhoAskedForWhatAndWhen) {
+    const auto before = host::WallClock::now();
+    ask("t1", "STOP", 0, {{"PRODUCT", OPER_EQ, "lz"}, {"PRODUCT", OPER_EQ, "ux"}});
+    publish("t1");
+    const std::optional<Task> task = list->find("t1");
+    ASSERT_TRUE(task.has_value());
+    EXPECT_EQ(task->asker, "somebody");
+    EXPECT_EQ(task->value("COMMAND"), "STOP");
+    EXPECT_EQ(task->value("PRODUCT"), "ux") << "the plug-in takes the last value";
+    EXPECT_EQ(task->value("VERSION"), "");
+    ASSERT_TRUE(task->started && task->ended);
+    EXPECT_LE(before, task->accepted);
+    EXPECT_LE(task->accepted, *task->started);
+    EXPECT_LE(*task->started, *task->ended);
+    EXPECT_LE(*task->ended, host::WallClock::now());
+    EXPECT_EQ(task->reply, taskRow("t1", "STOP", 0));
+    EXPECT_THAT(task->outcomes, ElementsAre(taskRow("t1", "START", 0)));
+}
+
+TEST_F(Tasks, AreFoundByIdentifierAndTheNewestByItsTransaction) {
+    ask("same");
+    const std::string first = list->find("same")->id;
+    ask("same");
+    const std::string second = list->find("same")->id;
+    EXPECT_NE(first, second);
+    EXPECT_EQ(list->find(first)->state, TaskState::Running);
+    EXPECT_EQ(list->find(second)->state, TaskState::Queued);
+    publish("same");
+    EXPECT_EQ(list->find(first)->state, TaskState::Done);
+    EXPECT_EQ(list->find(second)->state, TaskState::Running);
+    EXPECT_FALSE(list->find("other").has_value());
+}
+
+TEST_F(Tasks, ARefusedRequestIsOverAtOnceAndHoldsNobodyUp) {
+    ask("t1", "NOSUCH", 1003);
+    ask("t2");
+    EXPECT_EQ(stateOf("t1"), TaskState::Refused);
+    EXPECT_EQ(list->find("t1")->started, std::nullopt);
+    EXPECT_EQ(stateOf("t2"), TaskState::Running);
+}
+
+TEST_F(Tasks, OneThatRunsAtOnceIsOverWithItsAnswer) {
+    ask("t1");
+    ask("t2", "GETCONFIG");
+    ask("t3", "COMPLETE_INSTALL", 1010);
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(stateOf("t2"), TaskState::Done);
+    EXPECT_EQ(stateOf("t3"), TaskState::Failed);
+}
+
+TEST_F(Tasks, AnOutcomeThatComesBeforeTheReplyIsItsOwn) {
+    {
+        TaskList::Request request(*list, query("t1", "START"), "somebody");
+        publish("t1", 1024);
+        EXPECT_FALSE(list->find("t1").has_value()) << "nobody knows yet that it was accepted";
+        request.answered(rows(taskRow("t1", "START", 0)), answering(0));
+    }
+    EXPECT_EQ(stateOf("t1"), TaskState::Failed);
+    const std::optional<Task> task = list->find("t1");
+    EXPECT_LE(task->accepted, *task->ended);
+}
+
+TEST_F(Tasks, AnOutcomeIsNotThatOfARequestWhichRunsAtOnce) {
+    ask("t1");
+    TaskList::Request request(*list, query("t1", "GETCONFIG"), "somebody");
+    publish("t1");
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+    EXPECT_EQ(list->find("t1")->value("COMMAND"), "START");
+}
+
+TEST_F(Tasks, ARequestWhoseConditionsHideItsReplyIsATask) {
+    {
+        TaskList::Request request(*list, query("t1", "START"), "somebody");
+        request.answered({}, answering(0));
+    }
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(list->find("t1")->reply, "");
+    publish("t1");
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+}
+
+TEST_F(Tasks, ARequestWithoutAnswerIsNone) {
+    { const TaskList::Request request(*list, query("t1", "START"), "somebody"); }
+    {
+        TaskList::Request request(*list, query("t2", "START"), "somebody");
+        request.answered({}, {});
+    }
+    EXPECT_THAT(transids(), ElementsAre());
+    publish("t1");
+    EXPECT_FALSE(list->find("t1").has_value());
+}
+
+TEST_F(Tasks, QueriesOnOtherTablesAreNone) {
+    {
+        TaskList::Request request(*list, {tables->find("KAGDYST"), {}}, "somebody");
+        request.answered(rows(taskRow("t1", "START", 0)), {});
+    }
+    EXPECT_THAT(transids(), ElementsAre());
+}
+
+TEST_F(Tasks, AnInstallWithARestartIsOverWithItsSecondOutcome) {
+    ask("t1", "INSTALL", 0, {{"OPTIONAL", OPER_EQ, "REQUIRES_RESTART"}});
+    publish("t1");
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    publish("t1", 1010);
+    EXPECT_EQ(stateOf("t1"), TaskState::Failed);
+    EXPECT_EQ(list->find("t1")->outcomes.size(), 2U);
+    ask("t2", "INSTALL", 0, {{"OPTIONAL", OPER_EQ, "REQUIRES_RESTART"}});
+    publish("t2", 1010);
+    EXPECT_EQ(stateOf("t2"), TaskState::Failed) << "it did not begin";
+}
+
+TEST_F(Tasks, AConfigurationIsNotKept) {
+    for (const char* command : {"SETCONFIG", "GETCONFIG"}) {
+        TaskList::Request request(*list, query("t1", command, {{"CONTEXT", OPER_EQ, "secret"}}),
+                                  "somebody");
+        Heard heard = answering(0);
+        heard.commands.emplace_back().out.append("secret");
+        request.answered(rows(taskRow("t1", command, 0, "secret")), heard);
+        if (std::string(command) == "SETCONFIG") publish("t1");
+        const std::optional<Task> task = list->find("t1");
+        EXPECT_EQ(task->reply, taskRow("t1", command, 0)) << command;
+        for (const host::Command& ran : task->commands)
+            EXPECT_EQ(ran.out.text(), "") << command;
+    }
+    EXPECT_EQ(list->newest({{}, {}, "SETCONFIG"}).at(0).value("CONTEXT"), "");
+    ask("t2", "INSTALL", 0, {{"CONTEXT", OPER_EQ, "./install.sh"}});
+    EXPECT_EQ(list->find("t2")->value("CONTEXT"), "./install.sh");
+}
+
+TEST_F(Tasks, LongValuesAreCut) {
+    ask("t1", "INSTALL", 0, {{"CONTEXT", OPER_EQ, std::string(100000, 'x')}});
+    EXPECT_EQ(list->find("t1")->value("CONTEXT"), std::string(4096, 'x'));
+}
+
+TEST_F(Tasks, AreListedNewestFirstAsAskedFor) {
+    ask("t1", "START", 0, {{"PRODUCT", OPER_EQ, "ux"}});
+    ask("t2", "STOP", 0, {{"PRODUCT", OPER_EQ, "ux"}});
+    ask("t3", "START", 0, {{"PRODUCT", OPER_EQ, "um"}});
+    publish("t1");
+    EXPECT_THAT(transids(), ElementsAre("t3", "t2", "t1"));
+    EXPECT_THAT(transids({TaskState::Done}), ElementsAre("t1"));
+    EXPECT_THAT(transids({{}, "ux"}), ElementsAre("t2", "t1"));
+    EXPECT_THAT(transids({{}, {}, "START"}), ElementsAre("t3", "t1"));
+    EXPECT_THAT(transids({{}, {}, {}, 2}), ElementsAre("t3", "t2"));
+    EXPECT_THAT(transids({{}, {}, {}, 0}), ElementsAre());
+}
+
+TEST_F(Tasks, OfThoseThatAreOverTheLastAreKept) {
+    ask("waits");
+    for (std::size_t i = 0; i < TaskList::kKept + 5; ++i)
+        ask("r" + std::to_string(i), "NOSUCH", 1003);
+    const std::vector<std::string> kept = transids({{}, {}, {}, 10000});
+    EXPECT_EQ(kept.size(), TaskList::kKept + 1);
+    EXPECT_EQ(kept.back(), "waits");
+    EXPECT_FALSE(list->find("r4").has_value());
+    EXPECT_TRUE(list->find("r5").has_value());
+}
+
+TEST_F(Tasks, TheOldestLoseTheirCommandsWhenAllTakeTooMuch) {
+    Heard heard = answering(0);
+    for (int i = 0; i < 64; ++i) {
+        host::Command& command = heard.commands.emplace_back();
+        command.out.append(std::string(4096, 'o'));
+        command.err.append(std::string(4096, 'e'));
+    }
+    for (int i = 0; i < 40; ++i) {  // about half a MiB each
+        TaskList::Request request(*list, query("t" + std::to_string(i), "COMPLETE_INSTALL"), "");
+        request.answered({}, heard);
+    }
+    EXPECT_EQ(list->find("t39")->commands.size(), 64U);
+    EXPECT_EQ(list->find("t30")->commands.size(), 64U);
+    EXPECT_EQ(list->find("t20")->commands.size(), 0U);
+    EXPECT_EQ(list->find("t0")->commands.size(), 0U);
+    EXPECT_EQ(stateOf("t0"), TaskState::Done);
+}
+
+TEST_F(Tasks, WhoWaitsGetsTheTaskThatIsOver) {
+    std::vector<std::string> heard;
+    const auto note = [&heard](const Task& task) { heard.emplace_back(task.value("TRANSID")); };
+    ask("t1");
+    ask("t2");
+    EXPECT_NE(list->awaitEnd(list->find("t1")->id, note), 0U);
+    EXPECT_NE(list->awaitEnd(list->find("t2")->id, note), 0U);
+    const std::uint64_t cancelled = list->awaitEnd(list->find("t2")->id, note);
+    list->cancel(cancelled);
+    EXPECT_THAT(heard, ElementsAre());
+    publish("t1");
+    EXPECT_THAT(heard, ElementsAre("t1"));
+    EXPECT_EQ(list->awaitEnd(list->find("t1")->id, note), 0U);
+    EXPECT_THAT(heard, ElementsAre("t1", "t1"));
+    publish("t2");
+    EXPECT_THAT(heard, ElementsAre("t1", "t1", "t2"));
+}
+
+/// Runs a command as a thread of the plug-in does.
+void work(const std::string& command) {
+    int rc = 0;
+    ZAV::String out;
+    ZAV::String err;
+    ZAV::Util::runCommand(ZAV::String(command.c_str()), rc, out, err, ZAV::String(), false);
+}
+
+TEST_F(Tasks, GetTheCommandsThatTheExecutorRanForThem) {
+    const ScratchDir scratch;
+    const std::string first = scratch.script("first", "echo one");
+    const std::string second = scratch.script("second", "exit 3");
+    ask("t1");
+    ask("t2");
+    std::thread executor([&] {
+        work(first);
+        publish("t1");
+        work(second);
+        work(first);
+        publish("t2", 1024);
+    });
+    executor.join();
+    const std::vector<host::Command> ofFirst = list->find("t1")->commands;
+    ASSERT_EQ(ofFirst.size(), 1U);
+    EXPECT_EQ(ofFirst[0].line, first);
+    EXPECT_EQ(ofFirst[0].out.text(), "one\n");
+    const std::vector<host::Command> ofSecond = list->find("t2")->commands;
+    ASSERT_EQ(ofSecond.size(), 2U);
+    EXPECT_EQ(ofSecond[0].exit, 3);
+    EXPECT_EQ(ofSecond[1].exit, 0);
+}
+
+TEST_F(Tasks, ASuccessWhoseCommandDiedOfASignalIsAFailure) {
+    const ScratchDir scratch;
+    ask("t1");
+    std::thread([&] {
+        work(scratch.script("script", "kill -9 $$"));
+        publish("t1");
+    }).join();
+    EXPECT_EQ(stateOf("t1"), TaskState::Failed);
+    EXPECT_EQ(list->find("t1")->commands.at(0).signal, SIGKILL);
+}
+
+class TasksWithoutGuards : public Tasks {
+protected:
+    TasksWithoutGuards() : Tasks(false) {}
+};
+
+TEST_F(TasksWithoutGuards, AreJudgedByTheirResultAlone) {
+    const ScratchDir scratch;
+    ask("t1");
+    std::thread([&] {
+        work(scratch.script("script", "kill -9 $$"));
+        publish("t1");
+    }).join();
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+    EXPECT_EQ(list->find("t1")->commands.at(0).signal, SIGKILL);
+}
+
+TEST(TasksWithoutTables, ThereAreNone) {
+    const host::TableSet none({});
+    host::OutcomeFeed feed(none);
+    TaskList list(none, feed, true);
+    EXPECT_TRUE(list.newest({}).empty());
+    EXPECT_FALSE(list.find("t1").has_value());
+}
+
+}  // namespace
