@@ -7,10 +7,12 @@
 #include <boost/beast/http/read.hpp>
 #include <boost/beast/http/write.hpp>
 #include <exception>
+#include <optional>
 #include <utility>
 #include <variant>
 
 #include "host/http/event_stream.h"
+#include "host/http/head_check.h"
 
 namespace host {
 namespace {
@@ -86,14 +88,40 @@ void HttpSession::readRequest() {
     parser_->body_limit(core_.limits.bodyBytes);
     keepAlive_ = false;
     isHead_ = false;
+    head_.clear();
     stream_.expires_after(core_.limits.requestTime);
-    http::async_read_header(
-        stream_, buffer_, *parser_,
-        [self = shared_from_this()](Error error, std::size_t) { self->onHead(error); });
+    readHead();
+}
+
+/// Keeps the head's bytes, because the parser mends some of what is to be refused.
+void HttpSession::readHead() {
+    Error error;
+    while (buffer_.size() > 0 && !error && !parser_->is_header_done()) {
+        const std::size_t taken = parser_->put(buffer_.data(), error);
+        head_.append(static_cast<const char*>(buffer_.data().data()), taken);
+        buffer_.consume(taken);
+    }
+    if (parser_->is_header_done() || (error && error != http::error::need_more)) {
+        return onHead(error);
+    }
+    stream_.async_read_some(buffer_.prepare(kReadBytes),
+                            [self = shared_from_this()](Error failure, std::size_t bytes) {
+                                if (failure) return self->onEndInHead(failure);
+                                self->buffer_.commit(bytes);
+                                self->readHead();
+                            });
+}
+
+void HttpSession::onEndInHead(Error error) {
+    const bool begun = parser_->got_some() || buffer_.size() > 0;
+    onReadError(error == net::error::eof && begun ? http::error::partial_message : error);
 }
 
 void HttpSession::onHead(Error error) {
     if (error) return onReadError(error);
+    std::optional<Reply> refused = refusalOfHead(head_, parser_->get());
+    head_ = {};
+    if (refused) return respond(std::move(*refused));
     if (parser_->is_done() || buffer_.size() > 0 || !wantsContinue(parser_->get())) {
         return readBody();
     }

@@ -35,6 +35,8 @@ private:
 
     void awaitRequest();
     void readRequest();
+    void readHead();
+    void onEndInHead(Error error);
     void onHead(Error error);
     void readBody();
     void onRequest(Error error);
@@ -59,6 +61,7 @@ private:
     boost::beast::flat_buffer buffer_;
     std::optional<boost::beast::http::request_parser<boost::beast::http::string_body>> parser_;
     std::optional<boost::beast::http::response<boost::beast::http::string_body>> response_;
+    std::string head_;  ///< the bytes of the request's head so far
     State state_ = State::Idle;
     unsigned exchange_ = 0;           ///< counts requests; tells late answers from others
     std::optional<Timer> waitTimer_;  ///< made by the first answer that comes later
