@@ -257,6 +257,51 @@ TEST_F(AServer, AnswersOverTcpOnLoopbackAndNamesItsPort) {
     EXPECT_EQ(client.repeat("hello"), "hello");
 }
 
+/// What becomes of a connection to the port that another user's process makes.
+std::string fateOfForeignConnection(std::uint16_t port, bool leavesAtOnce) {
+    const std::string hello = bindPacket();
+    const pid_t child = ::fork();
+    if (child == 0) {
+        constexpr uid_t kNobody = 65534;
+        sockaddr_in address{};
+        address.sin_family = AF_INET;
+        address.sin_port = htons(port);
+        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        if (::setresgid(kNobody, kNobody, kNobody) != 0) ::_exit(1);
+        if (::setresuid(kNobody, kNobody, kNobody) != 0) ::_exit(1);
+        const int socket = ::socket(AF_INET, SOCK_STREAM, 0);
+        if (::connect(socket, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0) {
+            ::_exit(2);
+        }
+        (void)!::write(socket, hello.data(), hello.size());
+        if (leavesAtOnce) ::_exit(0);
+        char byte;
+        ::_exit(::read(socket, &byte, 1) > 0 ? 3 : 0);
+    }
+    int status = 0;
+    ::waitpid(child, &status, 0);
+    switch (WEXITSTATUS(status)) {
+        case 0:
+            return "closed";
+        case 3:
+            return "served";
+        default:
+            return "not tried";
+    }
+}
+
+TEST_F(AServer, ServesNoOtherUserOverTcp) {
+    if (::geteuid() != 0) GTEST_SKIP() << "only root can become another user";
+    start();
+    const std::uint16_t port = server->listenOnLoopback(0);
+    EXPECT_EQ(fateOfForeignConnection(port, false), "closed");
+    // Who has left already must not be taken for root, whom the kernel names in his place.
+    for (int i = 0; i < 20; ++i)
+        EXPECT_EQ(fateOfForeignConnection(port, true), "closed");
+    EXPECT_TRUE(eventually([this] { return server->counts().refused == 21; }));
+    EXPECT_EQ(server->counts().accepted, 0U);
+}
+
 TEST_F(AServer, ListensOnTcpOnLoopbackOnly) {
     start();
     const std::uint16_t port = server->listenOnLoopback(0);

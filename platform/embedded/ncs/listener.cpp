@@ -8,7 +8,10 @@
 #include <sys/types.h>
 
 #include <cerrno>
+#include <optional>
 #include <system_error>
+
+#include "ncs/loopback_peer.h"
 
 namespace ncs {
 namespace {
@@ -18,6 +21,13 @@ int domainOf(int socket) {
     socklen_t size = sizeof domain;
     checked(::getsockopt(socket, SOL_SOCKET, SO_DOMAIN, &domain, &size), "listening socket");
     return domain;
+}
+
+std::optional<uid_t> userOfUnixPeer(int accepted) {
+    ucred peer{};
+    socklen_t size = sizeof peer;
+    if (::getsockopt(accepted, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return std::nullopt;
+    return peer.uid;
 }
 
 }  // namespace
@@ -41,12 +51,10 @@ bool Listener::admits(int accepted) const {
         // Clients wait for answers, which are small.
         const int on = 1;
         ::setsockopt(accepted, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
-        return true;
     }
-    ucred peer{};
-    socklen_t size = sizeof peer;
-    if (::getsockopt(accepted, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return false;
-    return peer.uid == ::geteuid() || peer.uid == 0;
+    const std::optional<uid_t> user =
+        isUnix ? userOfUnixPeer(accepted) : ownerOfLoopbackPeer(accepted);
+    return user && (*user == ::geteuid() || *user == 0);
 }
 
 Descriptor loopbackSocket(std::uint16_t& port) {

@@ -19,8 +19,8 @@ struct Listener : Source {
     /// for a Unix socket. Throws std::system_error.
     Listener(int listeningSocket, std::string portText);
 
-    /// Sets up an accepted socket. Returns whether its peer may be served: on a Unix socket, only
-    /// the process's own user and root may.
+    /// Sets up an accepted socket. Returns whether its peer may be served: only the process's own
+    /// user and root may.
     bool admits(int accepted) const;
 
     const int socket;

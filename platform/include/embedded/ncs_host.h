@@ -1,8 +1,8 @@
 /// The RPC runtime as the host process sees it: where it listens and what limits it keeps.
 ///
-/// It speaks connection-oriented DCE/RPC 5.0 without authentication. A Unix socket serves peers
-/// that run as the process's own user or as root; TCP serves everybody who can connect, but listens
-/// on 127.0.0.1 only. A call whose parameters are larger than the limit (4 MiB) gets the fault
+/// It speaks connection-oriented DCE/RPC 5.0 without authentication. It serves peers that
+/// run as the process's own user or as root; TCP listens on 127.0.0.1 only, and the kernel says who
+/// owns the other end. A call whose parameters are larger than the limit (4 MiB) gets the fault
 /// nca_s_fault_remote_no_memory; other calls are not affected.
 #pragma once
 
