@@ -44,6 +44,19 @@ FileDescriptor newSocket(const std::string& path) {
     return made;
 }
 
+/// Where everybody may replace files, everybody could put a host of his own in the socket's place.
+/// The sticky bit keeps others from that.
+void checkFolder(const std::string& path) {
+    const std::size_t slash = path.rfind('/');
+    const std::string folder = slash == std::string::npos ? "." : path.substr(0, slash + 1);
+    struct stat found {};
+    if (::stat(folder.c_str(), &found) != 0) return;  // making the lock says why
+    if ((found.st_mode & S_IWOTH) != 0 && (found.st_mode & S_ISVTX) == 0) {
+        throw StartError("socket " + path + ": everybody may replace files in its directory; " +
+                         "put it elsewhere or remove that permission");
+    }
+}
+
 /// Whether the open file is still the one with this name. The last owner removes it, and a lock on
 /// a file that nobody else can find protects nothing.
 bool isStill(int descriptor, const std::string& name) {
@@ -71,6 +84,7 @@ FileDescriptor takeLock(const std::string& path) {
 }  // namespace
 
 SocketFile::SocketFile(const std::string& path) : path_(path) {
+    checkFolder(path_);
     addressOf(path_);  // throws before a lock file is made for an impossible name
     lock_ = takeLock(path_);
     try {

@@ -130,6 +130,20 @@ TEST_F(Socket, NameMayBeAsLongAsAnAddressHolds) {
     EXPECT_FALSE(scratch.exists(longest.substr(scratch.path().size() + 1) + "s.lock"));
 }
 
+TEST_F(Socket, WhereEverybodyMayReplaceItIsRefused) {
+    const std::string folder = scratch.makeDir("open");
+    const std::string inside = folder + "/host.sock";
+    ASSERT_EQ(::chmod(folder.c_str(), 0777), 0);
+    EXPECT_EQ(errorOf(inside),
+              "socket " + inside +
+                  ": everybody may replace files in its directory; put it elsewhere "
+                  "or remove that permission");
+    ASSERT_EQ(::chmod(folder.c_str(), 01777), 0);
+    EXPECT_EQ(errorOf(inside), "");
+    ASSERT_EQ(::chmod(folder.c_str(), 0775), 0);
+    EXPECT_EQ(errorOf(inside), "");
+}
+
 TEST_F(Socket, InADirectoryThatIsNotThereIsAnError) {
     const std::string lost = scratch.path("no/host.sock");
     EXPECT_EQ(errorOf(lost), "cannot make " + lost + ".lock: No such file or directory");
