@@ -6,13 +6,17 @@
 #include <cstdlib>
 #include <exception>
 #include <optional>
+#include <string>
 #include <system_error>
+#include <vector>
 
 #include "embedded/ncs_host.h"
 #include "embedded/oxa_host.h"
 #include "host/api/api.h"
 #include "host/api/routes.h"
 #include "host/api/services.h"
+#include "host/checks/check_list.h"
+#include "host/home/temporary_directory.h"
 #include "host/http/server.h"
 #include "host/process/end_signals.h"
 #include "host/process/home_lock.h"
@@ -60,17 +64,49 @@ const char* environmentVariable(const char* name) {
     return std::getenv(name);
 }
 
+/// Prints what the checks find. Returns the exit status.
+int check(const HostOptions& options) {
+    CheckSubject subject(options, environmentVariable);
+    const std::vector<CheckResult> results = runChecks(subject);
+    for (const CheckResult& result : results)
+        std::fputs(lineOf(result).c_str(), stdout);
+    return hasError(results) ? 1 : 0;
+}
+
+/// Says on standard error what the checks find wrong. Throws StartError if that is an error.
+void refuseUnfitHome(const HostOptions& options) {
+    CheckSubject subject(options, environmentVariable);
+    const std::vector<CheckResult> results = runChecks(subject);
+    for (const CheckResult& result : results) {
+        if (result.finding.verdict == Verdict::Ok) continue;
+        std::fprintf(stderr, "zavhost: %s: %s: %s\n", nameOf(result.finding.verdict),
+                     result.check.c_str(), wordsOf(result.finding).c_str());
+    }
+    if (hasError(results)) {
+        throw StartError("not started, because of the errors above (--check lists all checks)");
+    }
+}
+
+/// What a guarded host does before anything of the home is used. Returns the home's lock.
+HomeLock guardStart(const HostOptions& options) {
+    HomeLock lock(options.home);
+    refuseUnfitHome(options);
+    provideTemporaryDirectory(options.home);
+    return lock;
+}
+
 void run(const HostOptions& options) {
     // Unguarded hosts may share a home, as processes that load the plug-in themselves may.
     std::optional<HomeLock> homeLock;
-    if (options.guarded) homeLock.emplace(options.home);
     chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);
+    if (options.guarded) homeLock.emplace(guardStart(options));
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
     SocketFile socket(options.socket);
     SocketFile transferSocket(options.rpcSocket);
     const int endDescriptor = catchEndSignals();
     Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
                       options.guarded);
+    services.checkSubject = [options] { return CheckSubject(options, environmentVariable); };
     Api api(services, routes());
     ncs::Server transfers;
     serveTransfers(transfers, transferSocket, options);
@@ -90,6 +126,7 @@ int start(int argc, char** argv) {
     setUpProcess();
     try {
         const auto options = readOptions(argc, argv, environmentVariable);
+        if (options && options->check) return check(*options);
         if (options) run(*options);
         return 0;
     } catch (const std::exception& error) {

@@ -23,6 +23,7 @@ extern const Verb kQueryVerb;
 extern const Verb kAgentsVerb;
 extern const Verb kEventsVerb;
 extern const Verb kStatusVerb;
+extern const Verb kDoctorVerb;
 extern const Verb kHelpVerb;
 
 /// In the order of the help. Verbs of one group stand together.
@@ -43,6 +44,7 @@ constexpr const Verb* kVerbs[] = {
     &kAgentsVerb,           //
     &kEventsVerb,           //
     &kStatusVerb,           //
+    &kDoctorVerb,           //
     &kHelpVerb,
 };
 

@@ -3,7 +3,7 @@
 namespace host {
 
 /// The endpoints. Each has a file of its own in this folder and a row below.
-Endpoint getTables, postQuery, getEvents, getTasks, getTask, getHealth;
+Endpoint getTables, postQuery, getEvents, getTasks, getTask, getDoctor, getHealth;
 
 // clang-format off
 std::vector<Route> routes() {
@@ -31,6 +31,9 @@ std::vector<Route> routes() {
          Access::Read, Runs::OnWorker, getTask,
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
           {"wait", Type::Number, Need::Optional, "seconds to wait for the task's end"}}},
+
+        {"GET", "/v1/doctor", "Checks the home and the machine.",
+         Access::Read, Runs::OnWorker, getDoctor},
 
         {"GET", "/v1/health", "What the host says about itself.",
          Access::Read, Runs::AtOnce, getHealth},

@@ -2,10 +2,12 @@
 #pragma once
 
 #include <chrono>
+#include <functional>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "host/checks/check.h"
 #include "host/commands/ear.h"
 #include "host/http/server_counts.h"
 #include "host/outcomes/outcome_feed.h"
@@ -34,6 +36,8 @@ struct Services {
     const std::string home;   ///< in that code page
     const RowQueue::Limits eventLimits;
     const bool guarded;  ///< false: no guard looks at a request
+    /// What the checks of GET /v1/doctor look at; main() sets it before it serves.
+    std::function<CheckSubject()> checkSubject;
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
     ServerCounts counts;
     OutcomeFeed outcomes{tables};

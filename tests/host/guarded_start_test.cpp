@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <filesystem>
 #include <memory>
 #include <vector>
 
@@ -85,6 +86,94 @@ TEST_F(GuardedStart, OfManyAtOnceExactlyOneServesTheHome) {
                   std::string::npos)
             << program->err();
     }
+}
+
+TEST_F(GuardedStart, AMissingProgramIsRefusedWithTheRemedy) {
+    const std::string program = home.path("bin/uninstall.sh");
+    std::filesystem::remove(program);
+    const ProgramResult result = refused();
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "");
+    EXPECT_NE(result.err.find("zavhost: error: uninstaller: " + program + " is missing"),
+              std::string::npos)
+        << result.err;
+    EXPECT_NE(result.err.find("zavhost: not started, because of the errors above"),
+              std::string::npos)
+        << result.err;
+}
+
+TEST_F(GuardedStart, ADepotThatCannotBeUsedIsRefused) {
+    const std::string file = scratch.write("file", "");
+    const ProgramResult result = refused({}, {{"QVSDEPLOY_AGENTDEPOT", file}});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_NE(result.err.find("zavhost: error: depot: " + file + " cannot be used"),
+              std::string::npos)
+        << result.err;
+}
+
+TEST_F(GuardedStart, AnUnguardedHostStartsWithoutADepotAndItsPlugInRefusesEveryCommand) {
+    const std::string file = scratch.write("file", "");
+    const auto program = start("s", {"--unguarded"}, {{"QVSDEPLOY_AGENTDEPOT", file + "/depot"}});
+    ASSERT_TRUE(isReady(*program, "s")) << program->err();
+    RawClient client(scratch.path("s"));
+    const auto answer = client.post("/v1/query", R"({"table":"KAGREQT","where":[)"
+                                                 R"({"column":"COMMAND","op":"=","value":"START"},)"
+                                                 R"({"column":"PRODUCT","op":"=","value":"ux"}]})");
+    EXPECT_NE(answer.body.find("\"RETVAL\":1002"), std::string::npos) << answer.body;
+}
+
+TEST_F(GuardedStart, WarningsAreSaidAndDoNotMatter) {
+    const std::string copy = home.files().write("home/config/um.config.copy", "");
+    const auto program = start("s");
+    ASSERT_TRUE(isReady(*program, "s")) << program->err();
+    EXPECT_NE(program->err().find("zavhost: warning: leftovers: "), std::string::npos)
+        << program->err();
+    EXPECT_NE(program->err().find(copy), std::string::npos) << program->err();
+}
+
+TEST_F(GuardedStart, TheTemporaryDirectoryIsMade) {
+    std::filesystem::remove_all(home.path("tmp"));
+    const auto program = start("s");
+    ASSERT_TRUE(isReady(*program, "s")) << program->err();
+    EXPECT_TRUE(std::filesystem::is_directory(home.path("tmp")));
+}
+
+TEST_F(GuardedStart, AnUnguardedHostChecksNothing) {
+    std::filesystem::remove(home.path("bin/uninstall.sh"));
+    const auto program = start("s", {"--unguarded"});
+    ASSERT_TRUE(isReady(*program, "s")) << program->err();
+    EXPECT_EQ(program->err().find("uninstall"), std::string::npos) << program->err();
+}
+
+TEST_F(GuardedStart, CheckPrintsEveryCheckAndStartsNothing) {
+    const ProgramResult good = refused({"--check"});
+    EXPECT_EQ(good.status, 0) << good.out;
+    EXPECT_EQ(good.out.find("error"), std::string::npos) << good.out;
+    EXPECT_EQ(std::count(good.out.begin(), good.out.end(), '\n'), 22) << good.out;
+    EXPECT_NE(good.out.find("ok       agent-script  " + home.path("bin/TovrinAgent") + "\n"),
+              std::string::npos)
+        << good.out;
+    EXPECT_FALSE(scratch.exists("refused"));
+    EXPECT_FALSE(home.files().exists("home/.zavhost.lock"));
+    std::filesystem::remove(home.path("bin/TovrinAgent"));
+    const ProgramResult bad = refused({"--check"});
+    EXPECT_EQ(bad.status, 1);
+    EXPECT_NE(bad.out.find("error    agent-script  "), std::string::npos) << bad.out;
+}
+
+TEST_F(GuardedStart, TheDoctorSaysWhatCheckPrints) {
+    const auto program = start("s");
+    ASSERT_TRUE(isReady(*program, "s")) << program->err();
+    const ProgramResult doctor =
+        runProgram({ZAV_BUILD_DIR "/bin/zavctl", "--socket", scratch.path("s"), "doctor"});
+    EXPECT_EQ(doctor.status, 0) << doctor.out;
+    EXPECT_EQ(doctor.err, "");
+    const auto until = [](const std::string& text) { return text.substr(0, text.find("space")); };
+    EXPECT_EQ(until(doctor.out), until(runProgram(command("s", {"--check"})).out));
+    std::filesystem::remove(home.path("bin/TovrinAgent"));
+    EXPECT_EQ(
+        runProgram({ZAV_BUILD_DIR "/bin/zavctl", "--socket", scratch.path("s"), "doctor"}).status,
+        1);
 }
 
 TEST_F(GuardedStart, ATimeOutThatIsNoNumberIsRefused) {

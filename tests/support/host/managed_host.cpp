@@ -24,6 +24,16 @@ long statusFigure(pid_t pid, const std::string& name) {
     return -1;
 }
 
+void addMissingPrograms(const std::string& home) {
+    fs::create_directories(home + "/bin");
+    for (const char* const name : {"TovrinAgent", "cinfo", "uninstall.sh"}) {
+        const fs::path path = home + "/bin/" + name;
+        if (fs::exists(path)) continue;
+        std::ofstream(path) << "#!/bin/sh\nexit 1\n";
+        fs::permissions(path, fs::perms::owner_all);
+    }
+}
+
 }  // namespace
 
 std::string zavhostPath() {
@@ -40,7 +50,11 @@ ManagedHost::ManagedHost(const std::string& home, const Environment& environment
       environment_(environment),
       moreArguments_(moreArguments),
       socket_(scratch_.path("host.sock")) {
-    if (guards == Guards::Off) moreArguments_.emplace_back("--unguarded");
+    if (guards == Guards::Off) {
+        moreArguments_.emplace_back("--unguarded");
+    } else {
+        addMissingPrograms(home_);
+    }
     start();
 }
 
