@@ -3,10 +3,12 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <iomanip>
+#include <nlohmann/json.hpp>
 #include <optional>
 #include <sstream>
 #include <utility>
 
+#include "ctl/verbs/foreign_words.h"
 #include "ctl/verbs/global_arguments.h"
 #include "ctl/verbs/help_page.h"
 #include "ctl/verbs/usage_mistake.h"
@@ -167,7 +169,13 @@ CommandLine helpFor(const NamedCommand& named) {
     return line;
 }
 
-CommandLine wrongUsage(const std::string& mistake, const NamedCommand& named) {
+/// Whether a line that could not be taken apart asks for JSON.
+bool asksForJson(const Words& words) {
+    const auto end = std::find(words.begin(), words.end(), "--");
+    return std::find(words.begin(), end, kJson.name) != end;
+}
+
+CommandLine wrongUsage(const std::string& mistake, const NamedCommand& named, const Words& words) {
     std::string hint = "zavctl help";
     if (named.verb != nullptr) {
         hint += std::string(" ") + named.verb->name + " shows how it is used";
@@ -177,6 +185,26 @@ CommandLine wrongUsage(const std::string& mistake, const NamedCommand& named) {
     }
     CommandLine line;
     line.page = {{}, complaint(mistake) + hint + "\n", kWrongUsage};
+    if (asksForJson(words)) line.page.out = jsonText({{"error", mistake}});
+    return line;
+}
+
+/// "--version" is the verb "version", whatever else stands on the line.
+CommandLine versionLine(const Words& words) {
+    CommandLine line;
+    line.verb = &kVersionVerb;
+    Words options = {kVersionVerb.name};
+    std::copy_if(words.begin(), words.end(), std::back_inserter(options),
+                 [](const std::string& word) { return word != "--version"; });
+    line.given = Parser(&kVersionVerb).parse(options);
+    return line;
+}
+
+CommandLine dashesMissing(const Verb& verb, const std::string& corrected, const Words& words) {
+    const Failure failure(kWrongUsage, std::string("put the ") + verb.name + " command behind --",
+                          corrected);
+    CommandLine line;
+    line.page = failurePage(failure, asksForJson(words) ? Format::Json : Format::Text);
     return line;
 }
 
@@ -188,23 +216,26 @@ const Verb* namedVerb(const std::vector<std::string>& words) {
 
 CommandLine parseCommandLine(const std::vector<std::string>& words) {
     const NamedCommand named = nameIn(words);
+    if (named.verb != nullptr) {
+        const std::string corrected = lineWithDashes(*named.verb, words);
+        if (!corrected.empty()) return dashesMissing(*named.verb, corrected, words);
+    }
     Parser parser(named.verb);
     CommandLine line;
     try {
         line.given = parser.parse(words);
     } catch (const CLI::CallForHelp&) {
         return helpFor(named);
-    } catch (const CLI::CallForVersion& version) {
-        line.page.out = std::string(version.what()) + "\n";
-        return line;
+    } catch (const CLI::CallForVersion&) {
+        return versionLine(words);
     } catch (const CLI::ArgumentMismatch& mismatch) {
         const std::string text = mismatch.what();
-        return wrongUsage(text.substr(0, text.find(':')) + " needs a value", named);
+        return wrongUsage(text.substr(0, text.find(':')) + " needs a value", named, words);
     } catch (const CLI::ParseError& error) {
-        return wrongUsage(error.what(), named);
+        return wrongUsage(error.what(), named, words);
     }
     const std::string mistake = firstMistake(named, {words, parser.unknown(), line.given});
-    if (!mistake.empty()) return wrongUsage(mistake, named);
+    if (!mistake.empty()) return wrongUsage(mistake, named, words);
     line.verb = named.verb;
     return line;
 }

@@ -1,5 +1,6 @@
 // zavctl: sends a central server's requests to a managed host and shows how they ended.
 
+#include <fcntl.h>
 #include <poll.h>
 #include <unistd.h>
 
@@ -17,10 +18,28 @@
 
 namespace {
 
+/// A standard descriptor that the caller has closed would be given to the next socket, and the
+/// output would go to the host. In its place stands one on which reading or writing fails.
+void occupyStandardDescriptors() {
+    for (const int descriptor : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
+        if (::fcntl(descriptor, F_GETFD) != -1) continue;
+        // The lowest free number is this one.
+        (void)::open("/dev/null", descriptor == STDIN_FILENO ? O_WRONLY : O_RDONLY);
+    }
+}
+
+ctl::ExitStatus run(const ctl::CommandLine& line, ctl::Format format) {
+    if (line.verb == nullptr) return ctl::print(line.page);
+    try {
+        return line.verb->run({line.given, ctl::hostAddressOf(line.given), format});
+    } catch (const ctl::Failure& failure) {
+        return ctl::print(ctl::failurePage(failure, format));
+    }
+}
+
 ctl::ExitStatus run(const std::vector<std::string>& words) {
     const ctl::CommandLine line = ctl::parseCommandLine(words);
-    if (line.verb == nullptr) return ctl::print(line.page);
-    return line.verb->run({line.given, ctl::hostAddressOf(line.given), ctl::formatOf(line.given)});
+    return run(line, line.verb == nullptr ? ctl::Format::Text : ctl::formatOf(line.given));
 }
 
 /// False when standard output is a pipe that nobody reads any more.
@@ -40,11 +59,10 @@ ctl::ExitStatus withOutputWritten(ctl::ExitStatus status) {
 }  // namespace
 
 int main(int argc, char** argv) {
+    occupyStandardDescriptors();
     std::signal(SIGPIPE, SIG_IGN);  // a host that goes away is an error of the write
     try {
         return withOutputWritten(run({argv + 1, argv + argc}));
-    } catch (const ctl::Failure& failure) {
-        return ctl::print({{}, ctl::complaint(failure.what()), failure.status()});
     } catch (const std::exception& error) {
         return ctl::print({{}, ctl::complaint(error.what()), ctl::kNoHost});
     }

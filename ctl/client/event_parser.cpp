@@ -1,5 +1,8 @@
 #include "ctl/client/event_parser.h"
 
+#include "ctl/client/bounded_json.h"
+#include "ctl/client/failure.h"
+
 namespace ctl {
 namespace {
 
@@ -21,6 +24,9 @@ bool takeField(const std::string& line, const std::string& name, std::string& va
 
 std::vector<ServerEvent> EventParser::feed(const char* bytes, std::size_t length) {
     std::vector<ServerEvent> complete;
+    if (line_.size() + event_.data.size() + length > kMostBytes) {
+        throw Failure(kNoHost, "the host sent an event that is larger than 64 MiB");
+    }
     for (std::size_t i = 0; i < length; ++i) {
         if (bytes[i] == '\n') {
             endLine(complete);

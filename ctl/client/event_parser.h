@@ -14,7 +14,7 @@ struct ServerEvent {
 class EventParser {
 public:
     /// Takes the next bytes of the stream, as many or few as there are. Returns the events that are
-    /// complete with them.
+    /// complete with them. Throws Failure(kNoHost) when an event grows beyond kMostBytes.
     std::vector<ServerEvent> feed(const char* bytes, std::size_t length);
 
 private:

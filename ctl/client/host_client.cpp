@@ -2,8 +2,8 @@
 
 #include <boost/beast/core/flat_buffer.hpp>
 #include <boost/beast/http.hpp>
-#include <nlohmann/json.hpp>
 
+#include "ctl/client/bounded_json.h"
 #include "ctl/client/failure.h"
 #include "ctl/client/transport.h"
 
@@ -13,9 +13,8 @@ using nlohmann::json;
 namespace ctl {
 namespace {
 
-constexpr std::uint64_t kAnswerLimit = 256ULL * 1024 * 1024;  // a table of many rows
-
 using Request = http::request<http::string_body>;
+using Response = http::response<http::string_body>;
 
 Request makeRequest(http::verb method, const std::string& target) {
     Request request(method, target, 11);
@@ -25,8 +24,12 @@ Request makeRequest(http::verb method, const std::string& target) {
     return request;
 }
 
-json exchange(const std::string& path, const Request& request, Deadline deadline,
-              const Ticker& tick) {
+Failure senseless(const std::string& what) {
+    return {kNoHost, "the host's answer " + what};
+}
+
+Response exchange(const std::string& path, const Request& request, Deadline deadline,
+                  const Ticker& tick) {
     Transport transport(path);
     Transport::Error error;
     transport.runInTime(deadline, {}, error,
@@ -35,46 +38,64 @@ json exchange(const std::string& path, const Request& request, Deadline deadline
     // there may be an answer although the write failed.
     boost::beast::flat_buffer buffer;
     http::response_parser<http::string_body> parser;
-    parser.body_limit(kAnswerLimit);
+    parser.body_limit(kMostBytes);
     transport.runInTime(deadline, tick, error, [&](auto done) {
         http::async_read(transport.socket(), buffer, parser, done);
     });
+    if (error == http::error::body_limit) throw senseless("is larger than 64 MiB");
     if (error) throw transport.broken(error);
-    const auto& response = parser.get();
-    if (response.result_int() != 200) throw refusal(response.result_int(), response.body());
-    json answer = json::parse(response.body(), nullptr, false);
-    if (answer.is_discarded()) throw Failure(kNoHost, "the host's answer is no JSON");
-    return answer;
+    return parser.release();
 }
 
-json queryDocument(const std::string& table, const std::vector<Condition>& where) {
+/// The document in an answer that is no refusal.
+json documentOf(const Response& response) {
+    if (response.result_int() != 200) throw refusal(response.result_int(), response.body());
+    ParsedJson answer = parseBounded(response.body());
+    if (answer.fault != nullptr) throw senseless(answer.fault);
+    return std::move(answer.document);
+}
+
+json queryDocument(const TableQuery& query) {
     json conditions = json::array();
-    for (const Condition& condition : where) {
+    for (const Condition& condition : query.where) {
         conditions.push_back(
             {{"column", condition.column}, {"op", condition.op}, {"value", condition.value}});
     }
-    return {{"table", table}, {"where", conditions}};
+    json document = {{"table", query.table}, {"where", conditions}};
+    if (query.isForced) document["force"] = true;  // hosts without guards do not know the member
+    return document;
+}
+
+/// A member that is a list; an empty one if there is none.
+json listIn(json& answer, const char* name) {
+    const auto found = answer.find(name);
+    return found != answer.end() && found->is_array() ? std::move(*found) : json::array();
 }
 
 }  // namespace
 
 json HostClient::get(const std::string& target, Deadline deadline) const {
-    return exchange(socketPath_, makeRequest(http::verb::get, target), deadline, {});
+    return documentOf(exchange(socketPath_, makeRequest(http::verb::get, target), deadline, {}));
 }
 
-json HostClient::query(const std::string& table, const std::vector<Condition>& where,
-                       Deadline deadline, const Ticker& tick) const {
+json HostClient::getIfThere(const std::string& target, Deadline deadline) const {
+    const Response response =
+        exchange(socketPath_, makeRequest(http::verb::get, target), deadline, {});
+    return response.result() == http::status::not_found ? json() : documentOf(response);
+}
+
+QueryAnswer HostClient::query(const TableQuery& query, Deadline deadline,
+                              const Ticker& tick) const {
     Request request = makeRequest(http::verb::post, "/v1/query");
     request.set(http::field::content_type, "application/json");
     // Arguments come from a terminal or a file and may be in any encoding.
-    request.body() =
-        queryDocument(table, where).dump(-1, ' ', false, json::error_handler_t::replace);
+    request.body() = queryDocument(query).dump(-1, ' ', false, json::error_handler_t::replace);
     request.prepare_payload();
-    json answer = exchange(socketPath_, request, deadline, tick);
-    if (!answer.is_object() || !answer.contains("rows") || !answer["rows"].is_array()) {
-        throw Failure(kNoHost, "the host's answer has no rows");
-    }
-    return std::move(answer["rows"]);
+    json answer = documentOf(exchange(socketPath_, request, deadline, tick));
+    const auto rows = answer.find("rows");
+    if (rows == answer.end() || !rows->is_array()) throw senseless("has no rows");
+    if (rows->size() > kMostRows) throw senseless("has more than 1,000,000 rows");
+    return {std::move(*rows), listIn(answer, "warnings"), listIn(answer, "full")};
 }
 
 }  // namespace ctl

@@ -1,7 +1,7 @@
 /// Requests to the host's HTTP interface that have one answer.
 #pragma once
 
-#include <nlohmann/json_fwd.hpp>
+#include <nlohmann/json.hpp>
 #include <string>
 #include <utility>
 #include <vector>
@@ -10,6 +10,22 @@
 #include "ctl/client/deadline.h"
 
 namespace ctl {
+
+/// What a query asks for.
+struct TableQuery {
+    std::string table;
+    std::vector<Condition> where;  ///< all of which a row fulfils
+    bool isForced = false;         ///< pass the host's guard that knows the inventory
+};
+
+/// What the host answers. Members that it does not send are empty lists.
+struct QueryAnswer {
+    nlohmann::json rows = nlohmann::json::array();  ///< objects with a member per column
+    /// Commands that failed while the rows were made, as in a task's details.
+    nlohmann::json warnings = nlohmann::json::array();
+    /// Texts that the rows may hold cut: {"row", "column", "text", "complete"}.
+    nlohmann::json full = nlohmann::json::array();
+};
 
 /// Makes a connection of its own for each request. Every operation throws Failure: kNoHost when
 /// nobody listens, the connection breaks or the answer makes no sense; kWrongUsage or
@@ -22,9 +38,10 @@ public:
     /// The JSON document at a path such as "/v1/health".
     nlohmann::json get(const std::string& target, Deadline deadline) const;
 
-    /// The rows of a table that fulfil all conditions: an array of objects.
-    nlohmann::json query(const std::string& table, const std::vector<Condition>& where,
-                         Deadline deadline, const Ticker& tick = {}) const;
+    /// The same; null when the host has nothing there (404), as one that does not know the path.
+    nlohmann::json getIfThere(const std::string& target, Deadline deadline) const;
+
+    QueryAnswer query(const TableQuery& query, Deadline deadline, const Ticker& tick = {}) const;
 
 private:
     std::string socketPath_;

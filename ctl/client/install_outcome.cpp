@@ -21,8 +21,8 @@ bool mayPass(const Failure& failure) {
 /// One reply; nothing when the host is not there.
 std::optional<json> askOnce(const HostClient& client, Deadline deadline, const Ticker& tick) {
     try {
-        json rows = client.query("KAGREQT", completeInstallRequest(makeTransid()).conditions(),
-                                 deadline, tick);
+        json rows =
+            client.query(completeInstallRequest(makeTransid()).query(), deadline, tick).rows;
         if (!rows.empty()) return std::move(rows.front());
     } catch (const Failure& failure) {
         if (!mayPass(failure)) throw;

@@ -1,5 +1,7 @@
 #include "ctl/client/row.h"
 
+#include <cstdint>
+#include <limits>
 #include <nlohmann/json.hpp>
 
 using nlohmann::json;
@@ -19,7 +21,10 @@ std::string textOf(const json& row, const std::string& column) {
 
 int returnCodeOf(const json& row) {
     const auto found = row.find("RETVAL");
-    return found != row.end() && found->is_number_integer() ? found->get<int>() : 0;
+    if (found == row.end() || !found->is_number_integer()) return kNoReturnCode;
+    const auto value = found->get<std::int64_t>();
+    using Limits = std::numeric_limits<std::int32_t>;
+    return value < Limits::min() || value > Limits::max() ? kNoReturnCode : static_cast<int>(value);
 }
 
 }  // namespace ctl

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "ctl/client/bounded_json.h"
 #include "ctl/client/failure.h"
 #include "ctl/client/row.h"
 
@@ -33,7 +34,7 @@ Task::Task(const HostAddress& host, TaskRequest request, Ticker tick)
 }
 
 json Task::askNow() {
-    json rows = HostClient(socket_).query("KAGREQT", request_.conditions(), deadline_, tick_);
+    json rows = HostClient(socket_).query(request_.query(), deadline_, tick_).rows;
     if (rows.empty()) {
         // The reply repeats the request's values and is filtered by them like any row.
         throw Failure(kHostReportedFailure,
@@ -59,7 +60,7 @@ EventStream::Result Task::awaitOutcome() {
     for (;;) {
         const auto result = stream_->next(deadline_, event, tick_);
         if (result != EventStream::Result::Event) return result;
-        json row = json::parse(event.data, nullptr, false);
+        json row = objectIn(event.data);
         if (event.type != "message" || !row.is_object()) continue;
         events_.push_back(std::move(row));
         return result;

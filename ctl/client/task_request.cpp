@@ -21,6 +21,10 @@ std::vector<Condition> TaskRequest::conditions() const {
     return where;
 }
 
+TableQuery TaskRequest::query() const {
+    return {kRequestTable, conditions(), isForced};
+}
+
 std::string makeTransid() {
     std::random_device random;
     char text[80];

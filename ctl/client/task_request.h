@@ -1,12 +1,15 @@
-/// A command for the host: one request to the table KAGREQT.
+/// A command for the host: one request to the request table.
 #pragma once
 
 #include <string>
 #include <vector>
 
-#include "ctl/client/condition.h"
+#include "ctl/client/host_client.h"
 
 namespace ctl {
+
+/// A query on this table acts: it carries out a command, or has it queued.
+constexpr const char* kRequestTable = "KAGREQT";
 
 /// The columns of a request. Empty ones are not sent.
 struct TaskRequest {
@@ -19,8 +22,10 @@ struct TaskRequest {
     std::string uascript;
     std::string version;
     std::string targetmsn;
+    bool isForced = false;  ///< send it although the inventory does not list the product
 
     std::vector<Condition> conditions() const;
+    TableQuery query() const;
 };
 
 /// A transaction identifier that no other request has.

@@ -1,6 +1,6 @@
 #include "ctl/client/transport.h"
 
-#include <nlohmann/json.hpp>
+#include "ctl/client/bounded_json.h"
 
 using nlohmann::json;
 
@@ -10,6 +10,12 @@ namespace {
 ExitStatus statusOfRefusal(unsigned status) {
     const bool forNow = status == 403 || status == 409 || status == 429 || status >= 500;
     return forNow ? kHostReportedFailure : kWrongUsage;
+}
+
+/// A member that is text; empty if there is none.
+std::string memberText(const json& object, const char* name) {
+    const auto found = object.find(name);
+    return found != object.end() && found->is_string() ? found->get<std::string>() : std::string();
 }
 
 }  // namespace
@@ -38,12 +44,11 @@ Failure Transport::broken(const Error& error) const {
 }
 
 Failure refusal(unsigned status, const std::string& body) {
-    const json parsed = json::parse(body, nullptr, false);
-    std::string text = "status " + std::to_string(status);
-    if (parsed.is_object() && parsed.contains("error") && parsed["error"].is_string()) {
-        text = parsed["error"].get<std::string>();
-    }
-    return {statusOfRefusal(status), "the host refused the request: " + text};
+    const json answer = objectIn(body);
+    std::string text = memberText(answer, "error");
+    if (text.empty()) text = "status " + std::to_string(status);
+    return {statusOfRefusal(status), "the host refused the request: " + text,
+            memberText(answer, "hint"), memberText(answer, "guard")};
 }
 
 }  // namespace ctl

@@ -49,8 +49,8 @@ private:
 };
 
 /// What to throw when the host answered with an HTTP status other than 200. `body` may hold the
-/// reason as {"error": "..."}. A request that is wrong is the user's to mend (kWrongUsage); one
-/// that the host does not want now is a failure (kHostReportedFailure).
+/// reason as {"error": "...", "guard": "...", "hint": "..."}. A request that is wrong is the user's
+/// to mend (kWrongUsage); one that the host does not want now is a failure (kHostReportedFailure).
 Failure refusal(unsigned status, const std::string& body);
 
 // ---------------------------------------------------------------------------------------------

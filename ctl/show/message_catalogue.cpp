@@ -62,7 +62,8 @@ std::string messageText(const std::string& id) {
 }
 
 std::string describeResult(int returnCode, const std::string& id, const std::string& parameter) {
-    std::string out = id.empty() ? "return code " + std::to_string(returnCode) : id;
+    if (id.empty() && returnCode == kNoReturnCode) return "the host gave no return code";
+    std::string out = id.empty() ? "return code " + std::to_string(returnCode) : printable(id);
     if (const std::string text = messageText(id); !text.empty()) out += ": " + text;
     if (!parameter.empty()) out += " [" + printable(parameter) + "]";
     return out;

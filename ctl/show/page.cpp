@@ -3,6 +3,8 @@
 #include <cstdio>
 #include <nlohmann/json.hpp>
 
+#include "ctl/show/printable.h"
+
 using nlohmann::json;
 
 namespace ctl {
@@ -13,14 +15,34 @@ void write(const std::string& text, std::FILE* file) {
     std::fflush(file);
 }
 
+std::string dumped(const json& document, int indent) {
+    return withoutTerminalControls(
+        document.dump(indent, ' ', false, json::error_handler_t::replace));
+}
+
 }  // namespace
 
 std::string complaint(const std::string& text) {
-    return "zavctl: " + text + "\n";
+    return "zavctl: " + printable(text) + "\n";
+}
+
+Page failurePage(const Failure& failure, Format format) {
+    Page page{{}, complaint(failure.what()), failure.status()};
+    if (!failure.hint().empty()) page.err += "  " + printable(failure.hint()) + "\n";
+    if (format == Format::Text) return page;
+    json document = {{"error", failure.what()}};
+    if (!failure.guard().empty()) document["guard"] = failure.guard();
+    if (!failure.hint().empty()) document["hint"] = failure.hint();
+    page.out = jsonText(document);
+    return page;
 }
 
 std::string jsonText(const json& document) {
-    return document.dump(2, ' ', false, json::error_handler_t::replace) + "\n";
+    return dumped(document, 2) + "\n";
+}
+
+std::string jsonLine(const json& document) {
+    return dumped(document, -1);
 }
 
 Page jsonPage(const json& document, ExitStatus status) {

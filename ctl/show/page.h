@@ -17,11 +17,19 @@ struct Page {
     ExitStatus status = kSuccess;
 };
 
-/// A line for standard error: "zavctl: text".
+/// A line for standard error: "zavctl: text". Control characters are shown as \xNN.
 std::string complaint(const std::string& text);
 
-/// The document with a line end, indented. Text that is not valid UTF-8 is mended, never refused.
+/// Why a command could not go on: the reason and, on a line of its own, the way out. As JSON there
+/// is also a document {"error": "...", "guard": "...", "hint": "..."} without the empty members.
+Page failurePage(const Failure& failure, Format format);
+
+/// The document with a line end, indented. Text that is not valid UTF-8 is mended, never refused,
+/// and control characters are written as \uNNNN.
 std::string jsonText(const nlohmann::json& document);
+
+/// The same on one line without a line end.
+std::string jsonLine(const nlohmann::json& document);
 
 /// A page that is one JSON document.
 Page jsonPage(const nlohmann::json& document, ExitStatus status = kSuccess);

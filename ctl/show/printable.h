@@ -5,7 +5,14 @@
 
 namespace ctl {
 
-/// The text with its control characters shown as \xNN.
+/// The text with its control characters shown as \xNN, those of the upper half of Latin-1 too: a
+/// terminal may take them for the start of a command.
 std::string printable(const std::string& text);
+
+/// The same for a text of several lines: line ends and tabs stay.
+std::string printableLines(const std::string& text);
+
+/// JSON with the control characters that JSON itself allows, in its strings, as \u00NN.
+std::string withoutTerminalControls(const std::string& json);
 
 }  // namespace ctl

@@ -2,8 +2,8 @@
 
 #include <nlohmann/json.hpp>
 
-#include "ctl/client/host_client.h"
 #include "ctl/show/table.h"
+#include "ctl/show/warnings.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
 
@@ -17,6 +17,17 @@ constexpr Argument kOnlyProduct =
 constexpr Argument kPlatform = textOption("--platform", "Only this platform");
 constexpr Argument kArguments[] = {kOnlyProduct, kPlatform};
 
+std::string agentsText(const json& rows) {
+    if (rows.empty()) return "No products are listed.\n";
+    return tableText(rows, {{"PRODUCT", "PRODUCT"},
+                            {"VERSION", "VERSION"},
+                            {"RELEASE", "RELEASE"},
+                            {"PLATFORM", "PLATFORM"},
+                            {"HOSTTYPE", "SYSTEM"},
+                            {"HOSTPC", "ARCHITECTURE"},
+                            {"PRODDESC", "DESCRIPTION"}});
+}
+
 ExitStatus run(const Invocation& invocation) {
     return print(showAgents(askAgents(invocation), invocation.format));
 }
@@ -29,7 +40,7 @@ constexpr Verb kAgentsVerb = {
     run,
 };
 
-json askAgents(const Invocation& invocation) {
+QueryAnswer askAgents(const Invocation& invocation) {
     std::vector<Condition> where;
     if (const std::string& product = invocation.given.text(kOnlyProduct); !product.empty()) {
         where.push_back({"PRODUCT", "=", product});
@@ -37,20 +48,18 @@ json askAgents(const Invocation& invocation) {
     if (const std::string& platform = invocation.given.text(kPlatform); !platform.empty()) {
         where.push_back({"PLATFORM", "=", platform});
     }
-    return HostClient(invocation.host.socket).query("KINAGT", where, invocation.deadline());
+    return HostClient(invocation.host.socket).query({"KINAGT", where}, invocation.deadline());
 }
 
-Page showAgents(const json& rows, Format format) {
-    if (format == Format::Json) return jsonPage({{"rows", rows}});
-    if (rows.empty()) return {"No products are listed.\n", {}};
-    return {tableText(rows, {{"PRODUCT", "PRODUCT"},
-                             {"VERSION", "VERSION"},
-                             {"RELEASE", "RELEASE"},
-                             {"PLATFORM", "PLATFORM"},
-                             {"HOSTTYPE", "SYSTEM"},
-                             {"HOSTPC", "ARCHITECTURE"},
-                             {"PRODDESC", "DESCRIPTION"}}),
-            {}};
+Page showAgents(const QueryAnswer& answer, Format format) {
+    const bool isTaken = answer.warnings.empty();
+    const ExitStatus status = isTaken ? kSuccess : kHostReportedFailure;
+    if (format == Format::Json) return jsonPage(answerDocument(answer), status);
+    Page page{agentsText(answer.rows), warningsText(answer.warnings), status};
+    // Nothing listed means nothing installed only where the inventory was taken.
+    if (!isTaken && answer.rows.empty()) page.out.clear();
+    if (!isTaken) page.err += complaint("what is installed could not be found out in full");
+    return page;
 }
 
 }  // namespace ctl

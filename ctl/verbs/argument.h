@@ -49,6 +49,9 @@ struct Argument {
     Completion completion = Completion::Nothing;
     bool isRequired = false;
     bool isHidden = false;  ///< works, but is not shown
+    /// Words of another program's command line: "--" must stand before them if options are among
+    /// them, which would be taken for the verb's own.
+    bool isForeign = false;
 
     constexpr Argument required() const {
         Argument changed = *this;
@@ -58,6 +61,11 @@ struct Argument {
     constexpr Argument hidden() const {
         Argument changed = *this;
         changed.isHidden = true;
+        return changed;
+    }
+    constexpr Argument foreign() const {
+        Argument changed = *this;
+        changed.isForeign = true;
         return changed;
     }
     constexpr Argument called(const char* value) const {

@@ -6,9 +6,11 @@
 #include <cstdio>
 #include <nlohmann/json.hpp>
 
+#include "ctl/client/bounded_json.h"
 #include "ctl/client/event_stream.h"
 #include "ctl/client/row.h"
 #include "ctl/show/message_catalogue.h"
+#include "ctl/show/printable.h"
 #include "ctl/verbs/global_arguments.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
@@ -61,13 +63,21 @@ private:
     unsigned count_ = 0;
 };
 
+/// Somebody who names a number of events wants all of them; else a time-out is an end like any.
+ExitStatus atTimeOut(unsigned count, unsigned wanted) {
+    if (wanted == 0) return kSuccess;
+    return print({{},
+                  complaint("only " + std::to_string(count) + " of " + std::to_string(wanted) +
+                            " outcomes came within the time-out"),
+                  kNoOutcome});
+}
+
 /// Prints up to `wanted` events; without end if it is 0.
-ExitStatus streamEvents(EventStream& stream, unsigned wanted, Deadline end, Format format) {
-    EventPrinter printer(format);
+ExitStatus streamEvents(EventStream& stream, EventPrinter& printer, unsigned wanted, Deadline end) {
     while (wanted == 0 || printer.count() < wanted) {
         ServerEvent event;
         const auto result = stream.next(end, event);
-        if (result == EventStream::Result::TimedOut) return wanted == 0 ? kSuccess : kNoOutcome;
+        if (result == EventStream::Result::TimedOut) return atTimeOut(printer.count(), wanted);
         if (result == EventStream::Result::Ended) {
             return print({{}, complaint("the host closed the stream"), kNoHost});
         }
@@ -75,7 +85,7 @@ ExitStatus streamEvents(EventStream& stream, unsigned wanted, Deadline end, Form
             print({{}, complaint(event.type + ": " + event.data)});
             continue;
         }
-        const json row = json::parse(event.data, nullptr, false);
+        const json row = objectIn(event.data);
         if (row.is_object() && !printer.add(row)) break;
     }
     return kSuccess;
@@ -91,7 +101,13 @@ ExitStatus run(const Invocation& invocation) {
     std::signal(SIGTERM, isJson ? endDocument : endStream);
     // Only somebody who asks for an end gets one: the default time-out is that of a task.
     const Deadline end = given.has(kTimeout) ? invocation.deadline() : Deadline::max();
-    return streamEvents(stream, given.number(kCount), end, invocation.format);
+    EventPrinter printer(invocation.format);
+    try {
+        return streamEvents(stream, printer, given.number(kCount), end);
+    } catch (const Failure& failure) {
+        // As JSON the document has begun already, and there is only one.
+        return print(failurePage(failure, Format::Text));
+    }
 }
 
 }  // namespace
@@ -104,14 +120,13 @@ constexpr Verb kEventsVerb = {
 
 std::string showEvent(const json& row, bool isFirst, Format format) {
     if (format == Format::Json) {
-        return std::string(isFirst ? "" : ",") + "\n  " +
-               row.dump(-1, ' ', false, json::error_handler_t::replace);
+        return std::string(isFirst ? "" : ",") + "\n  " + jsonLine(row);
     }
     std::string line = textOf(row, "TRANSID") + "  " + textOf(row, "COMMAND") + "  ";
     line += returnCodeOf(row) == 0 ? "done" : "failed; " + describeRow(row);
     const std::string target = textOf(row, "TARGETMSN");
     if (!target.empty()) line += "  target " + target;
-    return line + "\n";
+    return printable(line) + "\n";
 }
 
 }  // namespace ctl

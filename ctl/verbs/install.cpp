@@ -21,7 +21,8 @@ constexpr Argument kCommand =
     positionals("COMMAND",
                 "The install command, after --; |DEPLOYDIR|, |DEPOTDIR| and |TOVRINHOME|\n"
                 "stand for the host's directories")
-        .required();
+        .required()
+        .foreign();
 constexpr Argument kOptional =
     textOption("--optional", "Qualifier; any text asks for the translator's -setCMS step")
         .without("--restart");

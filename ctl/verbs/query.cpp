@@ -1,9 +1,15 @@
 #include "ctl/verbs/query.h"
 
+#include <algorithm>
 #include <nlohmann/json.hpp>
 
-#include "ctl/client/host_client.h"
+#include "ctl/client/failure.h"
+#include "ctl/client/guarded.h"
+#include "ctl/client/row.h"
+#include "ctl/client/task_request.h"
+#include "ctl/show/message_catalogue.h"
 #include "ctl/show/table.h"
+#include "ctl/show/warnings.h"
 #include "ctl/verbs/condition_text.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
@@ -17,10 +23,61 @@ constexpr Argument kTable =
     positional("TABLE", "KAGREQT, KINAGT or KAGDYST").required().completedBy(Completion::Table);
 constexpr Argument kConditions =
     positionals("CONDITION", "COLUMN=VALUE; also !=, <, <=, > and >=, and ~ for a pattern with *");
-constexpr Argument kArguments[] = {kTable, kConditions};
+constexpr Argument kYes = flag("--yes", "Send a query of KAGREQT, which carries out a command");
+constexpr Argument kArguments[] = {kTable, kConditions, kYes};
+
+struct CommandVerb {
+    const char* command;
+    const char* verb;
+    const char* rest;  ///< of the arguments, behind the product
+};
+constexpr CommandVerb kCommandVerbs[] = {
+    {"START", "start PRODUCT", ""},
+    {"STOP", "stop PRODUCT", ""},
+    {"RESTART", "restart PRODUCT", ""},
+    {"INSTALL", "install PRODUCT", " VERSION -- COMMAND"},
+    {"COMPLETE_INSTALL", "complete-install", ""},
+    {"UNINSTALL", "uninstall PRODUCT", ""},
+    {"REMOVEINSTANCE", "remove-instance PRODUCT", " TARGET"},
+    {"GETCONFIG", "config get PRODUCT", ""},
+    {"SETCONFIG", "config set PRODUCT", ""},
+};
+
+std::string valueOf(const TableQuery& query, const char* column) {
+    for (const Condition& condition : query.where) {
+        if (condition.column == column) return condition.value;
+    }
+    return {};
+}
+
+TableQuery queryOf(const Values& given) {
+    TableQuery query;
+    query.table = given.text(kTable);
+    for (const std::string& text : given.texts(kConditions))
+        query.where.push_back(parseCondition(text));
+    return query;
+}
+
+/// A query looks harmless, so one that acts is sent only by somebody who knows.
+void refuseToAct(const TableQuery& query) {
+    const std::string verb = verbInPlaceOf(query);
+    throw Failure(kWrongUsage,
+                  "a query of KAGREQT carries out a command" +
+                      (verb.empty() ? std::string() : "; the verb for it is: " + verb),
+                  "Add --yes to send the query as it stands.");
+}
+
+/// The status of a reply, and of a table's rows kSuccess.
+ExitStatus statusOf(const TableQuery& query, const json& rows) {
+    if (query.table != kRequestTable) return kSuccess;
+    const bool isDone = !rows.empty() && std::all_of(rows.begin(), rows.end(), [](const json& row) {
+        return returnCodeOf(row) == 0;
+    });
+    return isDone ? kSuccess : kHostReportedFailure;
+}
 
 ExitStatus run(const Invocation& invocation) {
-    return print(showQuery(askQuery(invocation), invocation.format));
+    return print(showQuery(queryOf(invocation.given), askQuery(invocation), invocation.format));
 }
 
 }  // namespace
@@ -31,18 +88,44 @@ constexpr Verb kQueryVerb = {
     run,
 };
 
-json askQuery(const Invocation& invocation) {
-    std::vector<Condition> where;
-    for (const std::string& text : invocation.given.texts(kConditions))
-        where.push_back(parseCondition(text));
-    return HostClient(invocation.host.socket)
-        .query(invocation.given.text(kTable), where, invocation.deadline());
+QueryAnswer askQuery(const Invocation& invocation) {
+    const TableQuery query = queryOf(invocation.given);
+    const Deadline deadline = invocation.deadline();
+    const bool isAgreed = query.table != kRequestTable || invocation.given.flag(kYes);
+    if (!isAgreed && isGuarded(invocation.host, deadline)) refuseToAct(query);
+    return HostClient(invocation.host.socket).query(query, deadline);
 }
 
-Page showQuery(const json& rows, Format format) {
-    if (format == Format::Json) return jsonPage({{"rows", rows}});
+Page showQuery(const TableQuery& query, const QueryAnswer& answer, Format format) {
+    const json& rows = answer.rows;
+    Page page{{}, {}, statusOf(query, rows)};
+    if (format == Format::Json) {
+        page.out = jsonText(answerDocument(answer));
+        return page;
+    }
     const std::string count = std::to_string(rows.size()) + (rows.size() == 1 ? " row" : " rows");
-    return {recordsText(rows) + (rows.empty() ? "" : "\n") + count + "\n", {}};
+    page.out = recordsText(rows) + (rows.empty() ? "" : "\n") + count + "\n";
+    page.err = warningsText(answer.warnings);
+    if (page.status == kSuccess) return page;
+    page.err += complaint(rows.empty() ? "the host gave no reply, so it is not known what became "
+                                         "of the command"
+                                       : "the host refused: " + describeRow(rows.front()));
+    return page;
+}
+
+std::string verbInPlaceOf(const TableQuery& query) {
+    const std::string command = valueOf(query, "COMMAND");
+    const std::string product = valueOf(query, "PRODUCT");
+    const bool isUniversalAgent = product == "um" || product == "UM";
+    if (command == "SETCONFIG" && isUniversalAgent) return "zavctl ua-config --metafile FILE";
+    for (const CommandVerb& known : kCommandVerbs) {
+        if (command != known.command) continue;
+        std::string line = std::string("zavctl ") + known.verb;
+        const std::size_t place = line.find("PRODUCT");
+        if (place != std::string::npos && !product.empty()) line.replace(place, 7, product);
+        return line + known.rest;
+    }
+    return {};
 }
 
 }  // namespace ctl

@@ -1,15 +1,19 @@
 /// query: the rows of a table.
 #pragma once
 
-#include <nlohmann/json_fwd.hpp>
-
+#include "ctl/client/host_client.h"
 #include "ctl/show/page.h"
 
 namespace ctl {
 
 struct Invocation;
 
-nlohmann::json askQuery(const Invocation& invocation);
-Page showQuery(const nlohmann::json& rows, Format format);
+QueryAnswer askQuery(const Invocation& invocation);
+/// As for any command, the status of one that the request table carried out is that of its reply.
+Page showQuery(const TableQuery& query, const QueryAnswer& answer, Format format);
+
+/// The command line that does what such a query of the request table would do, such as "zavctl stop
+/// ux"; empty if there is none.
+std::string verbInPlaceOf(const TableQuery& query);
 
 }  // namespace ctl

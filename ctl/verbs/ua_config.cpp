@@ -1,5 +1,7 @@
 // ua-config: imports a metafile and its scripts from the depot into the universal agent.
 
+#include "ctl/client/failure.h"
+#include "ctl/client/guarded.h"
 #include "ctl/verbs/common_arguments.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/queued.h"
@@ -29,6 +31,11 @@ std::string contextOf(const Values& given) {
 
 ExitStatus run(const Invocation& invocation) {
     const Values& given = invocation.given;
+    // The host takes scripts alone for done, and copies none.
+    if (given.text(kMetafile).empty() && isGuarded(invocation.host, invocation.deadline())) {
+        throw Failure(kWrongUsage, "ua-config imports nothing without a metafile",
+                      "Name one of the depot with --metafile.");
+    }
     TaskRequest request;
     request.command = "SETCONFIG";
     request.product = "um";

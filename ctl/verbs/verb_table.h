@@ -24,6 +24,7 @@ extern const Verb kAgentsVerb;
 extern const Verb kEventsVerb;
 extern const Verb kStatusVerb;
 extern const Verb kDoctorVerb;
+extern const Verb kVersionVerb;
 extern const Verb kHelpVerb;
 
 /// In the order of the help. Verbs of one group stand together.
@@ -45,6 +46,7 @@ constexpr const Verb* kVerbs[] = {
     &kEventsVerb,           //
     &kStatusVerb,           //
     &kDoctorVerb,           //
+    &kVersionVerb,          //
     &kHelpVerb,
 };
 

@@ -106,7 +106,6 @@ TEST(CommandLine, SaysWhatIsWrong) {
     const char* const status = "zavctl help status shows how it is used";
     const Mistake mistakes[] = {
         {{}, "a command is missing", list},
-        {{"--json"}, "a command is missing", list},
         {{""}, "a command is missing", list},
         {{"--bogus"}, "there is no option \"--bogus\"", list},
         {{"--jsno"}, "there is no option \"--jsno\"; did you mean \"--json\"?", list},
@@ -167,11 +166,43 @@ TEST(CommandLine, TakesDashesBehindTheEndOfTheOptionsForWords) {
     EXPECT_FALSE(line.given.flag(ctl::kJson));
 }
 
+TEST(CommandLine, TakesTheVersionOptionForTheVerb) {
+    for (const Words& words : {Words{"--json", "--version", "--socket", "/a"},
+                               Words{"start", "ux", "--version", "--socket", "/a", "--json"}}) {
+        const CommandLine line = parseCommandLine(words);
+        ASSERT_EQ(line.verb, &ctl::kVersionVerb) << line.page.err;
+        EXPECT_EQ(line.given.text(ctl::kSocket), "/a");
+        EXPECT_TRUE(line.given.flag(ctl::kJson));
+    }
+}
+
+TEST(CommandLine, IsADocumentTooWhenItIsWrongAndAskedForJson) {
+    const CommandLine wrong = parseCommandLine({"--json", "start"});
+    EXPECT_EQ(wrong.page.out, "{\n  \"error\": \"PRODUCT is missing\"\n}\n");
+    EXPECT_EQ(wrong.page.status, ctl::kWrongUsage);
+    EXPECT_EQ(parseCommandLine({"start"}).page.out, "");
+    EXPECT_EQ(parseCommandLine({"install", "--", "--json"}).page.out, "");
+}
+
+TEST(CommandLine, OfAnInstallCommandWithOptionsNeedsTheDashes) {
+    const CommandLine line = parseCommandLine(
+        {"install", "ux", "--transid", "T 1", "6.3", "./install.sh", "-q", "it's"});
+    EXPECT_EQ(line.verb, nullptr);
+    EXPECT_EQ(line.page.status, ctl::kWrongUsage);
+    EXPECT_EQ(line.page.out, "");
+    EXPECT_EQ(line.page.err,
+              "zavctl: put the install command behind --\n"
+              "  zavctl install ux --transid 'T 1' 6.3 -- ./install.sh -q 'it'\\''s'\n");
+    for (const Words& right : {Words{"install", "ux", "6.3", "./install.sh", "q"},
+                               Words{"install", "ux", "6.3", "--restart", "./install.sh"},
+                               Words{"install", "ux", "6.3", "--", "./install.sh", "-q"}}) {
+        EXPECT_EQ(parseCommandLine(right).verb, &ctl::kInstallVerb);
+    }
+    EXPECT_EQ(parseCommandLine({"install", "ux", "6.3", "--help"}).page.out,
+              ctl::verbHelp(ctl::kInstallVerb));
+}
+
 TEST(CommandLine, AnswersWhatNeedsNoVerb) {
-    const CommandLine version = parseCommandLine({"--version"});
-    EXPECT_EQ(version.verb, nullptr);
-    EXPECT_THAT(version.page.out, testing::MatchesRegex("zavctl [0-9]+[.][0-9]+[.][0-9]+\n"));
-    EXPECT_EQ(version.page.status, ctl::kSuccess);
     const CommandLine help = parseCommandLine({"start", "ux", "--help"});
     EXPECT_EQ(help.verb, nullptr);
     EXPECT_EQ(help.page.out, ctl::verbHelp(ctl::kStartVerb));

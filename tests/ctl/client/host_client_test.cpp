@@ -23,7 +23,7 @@ ctl::Deadline soon() {
 std::pair<int, std::string> failureOfQuery(const std::function<void(const Peer&)>& part) {
     const CannedHost host([&part](const CannedHost& self) { part(self.accept()); });
     try {
-        HostClient(host.path()).query("KINAGT", {}, soon());
+        HostClient(host.path()).query({"KINAGT", {}}, soon());
     } catch (const ctl::Failure& failure) {
         return {failure.status(), failure.what()};
     }
@@ -44,13 +44,70 @@ TEST(HostClient, AsksForATableWithItsConditionsAndReturnsTheRows) {
         request = peer.request();
         peer.answer(200, R"({"table": "KINAGT", "rows": [{"PRODUCT": "ux"}]})");
     });
-    const json rows = HostClient(host.path()).query("KINAGT", {{"PRODUCT", "like", "u*"}}, soon());
+    const json rows =
+        HostClient(host.path()).query({"KINAGT", {{"PRODUCT", "like", "u*"}}}, soon()).rows;
     host.join();
     EXPECT_EQ(rows, (json{{{"PRODUCT", "ux"}}}));
     EXPECT_EQ(request.rfind("POST /v1/query HTTP/1.1\r\n", 0), 0U);
     EXPECT_EQ(json::parse(request.substr(request.find("\r\n\r\n"))),
               (json{{"table", "KINAGT"},
                     {"where", {{{"column", "PRODUCT"}, {"op", "like"}, {"value", "u*"}}}}}));
+}
+
+/// The body of the request that a query is.
+json bodyOf(const ctl::TableQuery& query) {
+    std::string request;
+    CannedHost host([&request](const CannedHost& self) {
+        const Peer peer = self.accept();
+        request = peer.request();
+        peer.answer(200, R"({"rows": []})");
+    });
+    HostClient(host.path()).query(query, soon());
+    host.join();
+    return json::parse(request.substr(request.find("\r\n\r\n")));
+}
+
+TEST(HostClient, ForcesOnlyWhatIsToBeForced) {
+    EXPECT_EQ(bodyOf({"KAGREQT", {}, true})["force"], true);
+    EXPECT_FALSE(bodyOf({"KAGREQT", {}, false}).contains("force"));
+}
+
+TEST(HostClient, GivesWhatStandsBesideTheRows) {
+    const CannedHost host([](const CannedHost& self) {
+        const Peer peer = self.accept();
+        peer.request();
+        peer.answer(200, R"({"rows": [], "warnings": [{"exit": 3}], "full": [{"row": 0}]})");
+    });
+    const ctl::QueryAnswer answer = HostClient(host.path()).query({"KINAGT", {}}, soon());
+    EXPECT_EQ(answer.warnings, (json{{{"exit", 3}}}));
+    EXPECT_EQ(answer.full, (json{{{"row", 0}}}));
+}
+
+TEST(HostClient, TakesNothingThereForNoDocumentAndARefusalForOne) {
+    const CannedHost none([](const CannedHost& self) {
+        const Peer peer = self.accept();
+        peer.request();
+        peer.answer(404, R"({"error": "no such task"})");
+    });
+    EXPECT_EQ(HostClient(none.path()).getIfThere("/v1/tasks/T", soon()), json());
+    const CannedHost busy([](const CannedHost& self) {
+        const Peer peer = self.accept();
+        peer.request();
+        peer.answer(503, "{}");
+    });
+    EXPECT_THROW(HostClient(busy.path()).getIfThere("/v1/tasks/T", soon()), ctl::Failure);
+}
+
+TEST(HostClient, DoesNotReadAnAnswerBeyondItsLimits) {
+    const std::string deep(200'000, '[');
+    EXPECT_EQ(failureOfQuery(answering(200, deep)).second,
+              "the host's answer is nested deeper than 100 levels");
+    const auto huge = failureOfQuery([](const Peer& peer) {
+        peer.request();
+        peer.send("HTTP/1.1 200 OK\r\nContent-Length: 67108865\r\n\r\n");
+    });
+    EXPECT_EQ(huge, std::make_pair(int{ctl::kNoHost},
+                                   std::string("the host's answer is larger than 64 MiB")));
 }
 
 TEST(HostClient, MendsAValueThatIsNoValidUtf8) {
@@ -60,7 +117,7 @@ TEST(HostClient, MendsAValueThatIsNoValidUtf8) {
         request = peer.request();
         peer.answer(200, R"({"rows": []})");
     });
-    HostClient(host.path()).query("KINAGT", {{"PRODUCT", "=", "\xff"}}, soon());
+    HostClient(host.path()).query({"KINAGT", {{"PRODUCT", "=", "\xff"}}}, soon());
     host.join();
     EXPECT_NE(request.find("\"\xef\xbf\xbd\""), std::string::npos);
 }

@@ -16,10 +16,19 @@ TEST(Row, GivesTextsAndTheReturnCode) {
     EXPECT_EQ(ctl::textOf(row, "NONE"), "");
 }
 
-TEST(Row, TakesAMissingColumnForEmptyAndAMissingReturnCodeForSuccess) {
+TEST(Row, TakesAMissingColumnForEmpty) {
     EXPECT_EQ(ctl::textOf(json::object(), "NOPE"), "");
-    EXPECT_EQ(ctl::returnCodeOf(json::object()), 0);
-    EXPECT_EQ(ctl::returnCodeOf(json{{"RETVAL", "x"}}), 0);
+    EXPECT_EQ(ctl::textOf(json(), "NOPE"), "");
+}
+
+TEST(Row, TakesAReturnCodeThatIsNoneForNoSuccess) {
+    EXPECT_EQ(ctl::returnCodeOf(json::object()), ctl::kNoReturnCode);
+    EXPECT_EQ(ctl::returnCodeOf(json::array({1})), ctl::kNoReturnCode);
+    for (const json& value : {json("x"), json(nullptr), json(0.0), json(true), json(4294967296),
+                              json(18446744073709551615ULL)}) {
+        EXPECT_EQ(ctl::returnCodeOf(json{{"RETVAL", value}}), ctl::kNoReturnCode) << value;
+    }
+    EXPECT_EQ(ctl::returnCodeOf(json{{"RETVAL", -2147483648LL}}), -2147483647 - 1);
 }
 
 TEST(Row, GivesAnObjectWithBytesThatAreNoTextAsMendedJson) {

@@ -25,6 +25,14 @@ TEST(Refusal, GivesTheHostsReasonElseItsStatus) {
     }
 }
 
+TEST(Refusal, OfAGuardHasItsNameAndTheWayOut) {
+    const ctl::Failure failure =
+        refusal(409, R"({"error": "no such product", "guard": "products", "hint": "Try lz."})");
+    EXPECT_EQ(failure.guard(), "products");
+    EXPECT_EQ(failure.hint(), "Try lz.");
+    EXPECT_EQ(refusal(409, R"({"error": "x", "hint": 7})").hint(), "");
+}
+
 /// Status and text of the failure to connect.
 std::pair<int, std::string> failureToConnect(const std::string& path) {
     try {

@@ -14,6 +14,29 @@ TEST(Page, GoesToBothOutputsAndGivesItsStatus) {
     EXPECT_EQ(testing::internal::GetCapturedStderr(), "zavctl: err\n");
 }
 
+TEST(Page, OfAFailureIsTheReasonAndTheWayOut) {
+    const ctl::Failure failure(ctl::kHostReportedFailure, "no \x1b[2J", "Try \x07.", "products");
+    const ctl::Page text = ctl::failurePage(failure, ctl::Format::Text);
+    EXPECT_EQ(text.out, "");
+    EXPECT_EQ(text.err, "zavctl: no \\x1B[2J\n  Try \\x07.\n");
+    EXPECT_EQ(text.status, ctl::kHostReportedFailure);
+    const ctl::Page asJson = ctl::failurePage(failure, ctl::Format::Json);
+    EXPECT_EQ(
+        nlohmann::json::parse(asJson.out),
+        (nlohmann::json{{"error", "no \x1b[2J"}, {"guard", "products"}, {"hint", "Try \x07."}}));
+    EXPECT_EQ(asJson.err, text.err);
+}
+
+TEST(Page, OfAFailureWithoutAWayOutIsOneLine) {
+    const ctl::Failure failure(ctl::kNoHost, "gone");
+    EXPECT_EQ(ctl::failurePage(failure, ctl::Format::Text).err, "zavctl: gone\n");
+    EXPECT_EQ(ctl::failurePage(failure, ctl::Format::Json).out, "{\n  \"error\": \"gone\"\n}\n");
+}
+
+TEST(Page, OfJsonHasNoControlCharactersForATerminal) {
+    EXPECT_EQ(ctl::jsonText({{"A", "\x7f\xc2\x9b"}}), "{\n  \"A\": \"\\u007F\\u009B\"\n}\n");
+}
+
 TEST(Page, OfJsonIsOneIndentedDocument) {
     const ctl::Page page = ctl::jsonPage({{"A", 1}}, ctl::kHostReportedFailure);
     EXPECT_EQ(page.out, "{\n  \"A\": 1\n}\n");

@@ -17,7 +17,7 @@ TEST(Agents, AreShownAsATable) {
                         {"HOSTTYPE", "LZ"},
                         {"HOSTPC", "lx8266"},
                         {"PRODDESC", "An agent"}}};
-    const ctl::Page page = ctl::showAgents(rows, Format::Text);
+    const ctl::Page page = ctl::showAgents({rows}, Format::Text);
     EXPECT_EQ(page.out,
               "PRODUCT  VERSION   RELEASE  PLATFORM  SYSTEM  ARCHITECTURE  DESCRIPTION\n"
               "ux       06230100  0        lx8266    LZ      lx8266        An agent\n");
@@ -25,14 +25,30 @@ TEST(Agents, AreShownAsATable) {
 }
 
 TEST(Agents, ThatAreNoneAreSaid) {
-    EXPECT_EQ(ctl::showAgents(json::array(), Format::Text).out, "No products are listed.\n");
+    EXPECT_EQ(ctl::showAgents({}, Format::Text).out, "No products are listed.\n");
+}
+
+TEST(Agents, ThatCouldNotBeFoundOutAreAFailureThatSaysWhy) {
+    const json warning = {{"command", "/h/bin/cinfo -d"}, {"exit", 3}, {"stderr", "no registry\n"}};
+    const ctl::Page page = ctl::showAgents({json::array(), json{warning}}, Format::Text);
+    EXPECT_EQ(page.out, "");
+    EXPECT_EQ(page.err,
+              "zavctl: warning: a program of the home failed\n"
+              "  command: /h/bin/cinfo -d\n"
+              "  end:     exit code 3\n"
+              "  standard error:\n"
+              "    no registry\n"
+              "zavctl: what is installed could not be found out in full\n");
+    EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+    const ctl::Page asJson = ctl::showAgents({json::array(), json{warning}}, Format::Json);
+    EXPECT_EQ(json::parse(asJson.out), (json{{"rows", json::array()}, {"warnings", {warning}}}));
+    EXPECT_EQ(asJson.status, ctl::kHostReportedFailure);
 }
 
 TEST(Agents, AreRowsAsJson) {
-    EXPECT_EQ(json::parse(ctl::showAgents({{{"PRODUCT", "ux"}}}, Format::Json).out),
+    EXPECT_EQ(json::parse(ctl::showAgents({json{{{"PRODUCT", "ux"}}}}, Format::Json).out),
               (json{{"rows", {{{"PRODUCT", "ux"}}}}}));
-    EXPECT_EQ(json::parse(ctl::showAgents(json::array(), Format::Json).out),
-              (json{{"rows", json::array()}}));
+    EXPECT_EQ(json::parse(ctl::showAgents({}, Format::Json).out), (json{{"rows", json::array()}}));
 }
 
 }  // namespace

@@ -12,9 +12,11 @@ using ctl::showConfiguration;
 using nlohmann::json;
 
 TEST(ConfigGet, PrintsTheTextWithALineEnd) {
-    EXPECT_EQ(showConfiguration("ux", {{"CONTEXT", "A=1"}}, Format::Text).out, "A=1\n");
-    EXPECT_EQ(showConfiguration("ux", {{"CONTEXT", "A=1\n"}}, Format::Text).out, "A=1\n");
-    EXPECT_EQ(showConfiguration("ux", {{"CONTEXT", ""}}, Format::Text).out, "");
+    EXPECT_EQ(showConfiguration("ux", {{"RETVAL", 0}, {"CONTEXT", "A=1"}}, Format::Text).out,
+              "A=1\n");
+    EXPECT_EQ(showConfiguration("ux", {{"RETVAL", 0}, {"CONTEXT", "A=1\n"}}, Format::Text).out,
+              "A=1\n");
+    EXPECT_EQ(showConfiguration("ux", {{"RETVAL", 0}, {"CONTEXT", ""}}, Format::Text).out, "");
 }
 
 TEST(ConfigGet, SaysWhyThereIsNoneOnStandardError) {

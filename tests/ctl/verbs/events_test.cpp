@@ -25,6 +25,13 @@ TEST(Events, AreLinesThatSayHowTasksEnded) {
               "target a:h:UX\n");
 }
 
+TEST(Events, ShowNoControlCharactersAndTakeAMissingReturnCodeForNoSuccess) {
+    const json row = {{"TRANSID", "T\x1b[2J"}, {"COMMAND", "START"}};
+    EXPECT_EQ(showEvent(row, true, Format::Text),
+              "T\\x1B[2J  START  failed; the host gave no return code\n");
+    EXPECT_EQ(showEvent({{"A", "\x7f"}}, true, Format::Json), "\n  {\"A\":\"\\u007F\"}");
+}
+
 TEST(Events, AreElementsOfOneListAsJson) {
     const std::string list = "[" + showEvent(kDone, true, Format::Json) +
                              showEvent(kFailed, false, Format::Json) + "\n]";

@@ -9,16 +9,51 @@ namespace {
 using ctl::Format;
 using nlohmann::json;
 
+const ctl::TableQuery kInventory = {"KINAGT", {}};
+
+ctl::TableQuery request(const std::vector<ctl::Condition>& where) {
+    return {"KAGREQT", where};
+}
+
 TEST(Query, ShowsRecordsAndCountsThem) {
-    EXPECT_EQ(ctl::showQuery(json::array(), Format::Text).out, "0 rows\n");
-    EXPECT_EQ(ctl::showQuery({{{"A", "1"}}}, Format::Text).out, "A  1\n\n1 row\n");
-    EXPECT_EQ(ctl::showQuery({{{"A", "1"}}, {{"A", "2"}}}, Format::Text).out,
-              "A  1\n\nA  2\n\n2 rows\n");
+    const auto shown = [](const json& rows) {
+        return ctl::showQuery(kInventory, {rows}, Format::Text).out;
+    };
+    EXPECT_EQ(shown(json::array()), "0 rows\n");
+    EXPECT_EQ(shown({{{"A", "1"}}}), "A  1\n\n1 row\n");
+    EXPECT_EQ(shown({{{"A", "1"}}, {{"A", "2"}}}), "A  1\n\nA  2\n\n2 rows\n");
+}
+
+TEST(Query, ThatActsEndsAsItsReplySays) {
+    const json done = {{{"RETVAL", 0}}};
+    EXPECT_EQ(ctl::showQuery(request({}), {done}, Format::Text).status, ctl::kSuccess);
+    const json refused = {{{"RETVAL", 1003}, {"RETMSGID", "ZAV1003E"}}};
+    const ctl::Page page = ctl::showQuery(request({}), {refused}, Format::Text);
+    EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+    EXPECT_EQ(page.err, "zavctl: the host refused: ZAV1003E: the request names no product\n");
+    EXPECT_EQ(ctl::showQuery(request({}), {refused}, Format::Json).status,
+              ctl::kHostReportedFailure);
+    EXPECT_EQ(ctl::showQuery(request({}), {}, Format::Text).status, ctl::kHostReportedFailure);
+}
+
+TEST(Query, ThatActsHasAVerbInItsPlace) {
+    const std::pair<std::vector<ctl::Condition>, const char*> cases[] = {
+        {{{"COMMAND", "=", "STOP"}, {"PRODUCT", "=", "ux"}}, "zavctl stop ux"},
+        {{{"COMMAND", "=", "INSTALL"}}, "zavctl install PRODUCT VERSION -- COMMAND"},
+        {{{"COMMAND", "=", "SETCONFIG"}, {"PRODUCT", "=", "um"}},
+         "zavctl ua-config --metafile FILE"},
+        {{{"COMMAND", "=", "COMPLETE_INSTALL"}}, "zavctl complete-install"},
+        {{{"COMMAND", "=", "NOPE"}}, ""},
+        {{}, ""},
+    };
+    for (const auto& [where, line] : cases)
+        EXPECT_EQ(ctl::verbInPlaceOf(request(where)), line);
 }
 
 TEST(Query, GivesRowsAsJson) {
     const json rows = {{{"A", "1"}}, {{"A", 2}}};
-    EXPECT_EQ(json::parse(ctl::showQuery(rows, Format::Json).out), (json{{"rows", rows}}));
+    EXPECT_EQ(json::parse(ctl::showQuery(kInventory, {rows}, Format::Json).out),
+              (json{{"rows", rows}}));
 }
 
 }  // namespace
