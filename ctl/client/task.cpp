@@ -4,6 +4,7 @@
 
 #include "ctl/client/bounded_json.h"
 #include "ctl/client/failure.h"
+#include "ctl/client/percent_encoding.h"
 #include "ctl/client/row.h"
 
 using nlohmann::json;
@@ -33,15 +34,15 @@ Task::Task(const HostAddress& host, TaskRequest request, Ticker tick)
     if (request_.transid.empty()) request_.transid = makeTransid();
 }
 
-json Task::askNow() {
-    json rows = HostClient(socket_).query(request_.query(), deadline_, tick_).rows;
-    if (rows.empty()) {
+QueryAnswer Task::askNow() {
+    QueryAnswer answer = HostClient(socket_).query(request_.query(), deadline_, tick_);
+    if (answer.rows.empty()) {
         // The reply repeats the request's values and is filtered by them like any row.
         throw Failure(kHostReportedFailure,
                       "the host's reply holds another value than the request, so it is not known "
                       "what became of it: the host cuts text with many characters beyond ASCII");
     }
-    return std::move(rows.front());
+    return answer;
 }
 
 bool Task::submit(bool subscribe) {
@@ -51,7 +52,7 @@ bool Task::submit(bool subscribe) {
             std::vector<std::pair<std::string, std::string>>{{"TRANSID", request_.transid}},
             deadline_);
     }
-    reply_ = askNow();
+    reply_ = std::move(askNow().rows.front());
     return returnCodeOf(reply_) == 0;
 }
 
@@ -64,6 +65,20 @@ EventStream::Result Task::awaitOutcome() {
         if (event.type != "message" || !row.is_object()) continue;
         events_.push_back(std::move(row));
         return result;
+    }
+}
+
+json Task::record() const {
+    // The outcome may be seen here before the host has closed its record. An install that restarts
+    // the host stays open after its first outcome, so it is not waited for.
+    const bool staysOpen = request_.optional == "REQUIRES_RESTART";
+    const std::string path =
+        "/v1/tasks/" + percentEncoded(request_.transid) + (staysOpen ? "" : "?wait=5");
+    try {
+        json record = HostClient(socket_).getIfThere(path, deadline_);
+        return record.is_object() ? record : json();
+    } catch (const Failure&) {
+        return nullptr;  // how the task ended is known without it
     }
 }
 
@@ -83,6 +98,7 @@ TaskResult runTask(const HostAddress& host, const TaskRequest& request, bool wai
     result.reply = task.reply();
     result.events = task.events();
     result.elapsed = task.elapsed();
+    if (result.end == TaskResult::End::Outcome) result.record = task.record();
     return result;
 }
 

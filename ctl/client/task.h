@@ -5,6 +5,7 @@
 #include <functional>
 #include <memory>
 #include <nlohmann/json.hpp>
+#include <string>
 
 #include "ctl/client/deadline.h"
 #include "ctl/client/event_stream.h"
@@ -21,8 +22,8 @@ public:
     /// Makes a transaction identifier when the request has none.
     Task(const HostAddress& host, TaskRequest request, Ticker tick = {});
 
-    /// Sends a request that is answered at once; returns its reply row.
-    nlohmann::json askNow();
+    /// Sends a request that is answered at once; the reply is the answer's only row.
+    QueryAnswer askNow();
 
     /// Subscribes to the request's outcomes when asked to, sends it and keeps the reply. Returns
     /// false when the host refused the request.
@@ -31,6 +32,9 @@ public:
     /// Waits for the next outcome row and adds it to events(). Ended means that the host went away.
     /// Only after submit(true).
     EventStream::Result awaitOutcome();
+
+    /// What the host knows of the task beyond its rows; null when it knows nothing, or cannot say.
+    nlohmann::json record() const;
 
     const nlohmann::json& reply() const { return reply_; }
     const nlohmann::json& events() const { return events_; }
@@ -62,6 +66,12 @@ struct TaskResult {
     nlohmann::json reply;
     nlohmann::json events = nlohmann::json::array();
     std::chrono::milliseconds elapsed{0};
+    /// Task::record(), with the commands that ran, after an outcome; null if there is none.
+    nlohmann::json record = nullptr;
+    /// What a look afterwards found that belies a success; empty if nothing.
+    std::string doubt = {};
+    /// Why there was no such look although one was wanted; empty if there was.
+    std::string note = {};
 };
 
 /// Who wants to know how a command proceeds. Both functions may be empty.

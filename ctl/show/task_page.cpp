@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/row.h"
+#include "ctl/show/command_report.h"
 #include "ctl/show/message_catalogue.h"
 #include "ctl/show/running_clock.h"
 
@@ -10,6 +11,27 @@ using nlohmann::json;
 
 namespace ctl {
 namespace {
+
+/// The commands of a record; an empty list if there are none.
+json commandsOf(const json& record) {
+    const auto details = record.find("details");
+    if (details == record.end()) return json::array();
+    const auto commands = details->find("commands");
+    return commands != details->end() && commands->is_array() ? *commands : json::array();
+}
+
+Page outcomePage(const std::string& title, const TaskResult& result) {
+    const json& row = result.events.back();
+    const std::string fault = returnCodeOf(row) == 0 ? faultOf(result.record) : std::string();
+    Page page = showOutcome(title, row, result.elapsed, Format::Text);
+    if (!fault.empty()) {
+        page.out = title + ": reported as done, but " + fault + "\n";
+        page.status = kHostReportedFailure;
+    }
+    if (page.status != kSuccess) page.out += failureReport(commandsOf(result.record));
+    addDoubts(page, title, result);
+    return page;
+}
 
 /// What follows the reply line.
 Page textPage(const std::string& title, const TaskResult& result) {
@@ -19,7 +41,7 @@ Page textPage(const std::string& title, const TaskResult& result) {
         case TaskResult::End::Accepted:
             return {};
         case TaskResult::End::Outcome:
-            return showOutcome(title, result.events.back(), result.elapsed, Format::Text);
+            return outcomePage(title, result);
         case TaskResult::End::HostGone:
             return {{}, complaint("the host went away before the outcome came"), kNoHost};
         case TaskResult::End::TimedOut:
@@ -55,7 +77,35 @@ Page showOutcome(const std::string& title, const json& row, std::chrono::millise
 }
 
 json taskDocument(const TaskResult& result) {
-    return {{"reply", result.reply}, {"events", result.events}};
+    json document = {{"reply", result.reply}, {"events", result.events}};
+    if (result.record.is_object()) {
+        json task = result.record;
+        const auto details = task.find("details");
+        if (details != task.end()) document["details"] = *details;
+        for (const char* const elsewhere : {"reply", "events", "details"})
+            task.erase(elsewhere);
+        document["task"] = std::move(task);
+    }
+    if (!result.doubt.empty()) document["doubt"] = result.doubt;
+    return document;
+}
+
+std::string faultOf(const json& record) {
+    if (textOf(record, "state") != "failed") return {};
+    for (const json& command : commandsOf(record)) {
+        if (!diedUnnoticed(command)) continue;
+        const bool hasRun = textOf(command, "error").empty();
+        return (hasRun ? "the command was " : "the command ") + endText(command);
+    }
+    return "the host counts it as failed";
+}
+
+void addDoubts(Page& page, const std::string& title, const TaskResult& result) {
+    if (!result.doubt.empty()) {
+        page.err += complaint(title + ": " + result.doubt);
+        if (page.status == kSuccess) page.status = kHostReportedFailure;
+    }
+    if (!result.note.empty()) page.err += complaint("note: " + result.note);
 }
 
 Page showTask(const std::string& title, const TaskResult& result, Format format) {

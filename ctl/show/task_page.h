@@ -24,8 +24,17 @@ ExitStatus statusOf(const nlohmann::json& row);
 Page showOutcome(const std::string& title, const nlohmann::json& row,
                  std::chrono::milliseconds elapsed, Format format);
 
-/// {"reply": {...}, "events": [...]}
+/// {"reply": {...}, "events": [...]}, with "task" and "details" when the host keeps a record, and
+/// with "doubt" when a look afterwards belies the success.
 nlohmann::json taskDocument(const TaskResult& result);
+
+/// What the host's record of a task says against its success, such as "the command was killed by
+/// signal 9"; empty if nothing. Without a record, or when the host takes the task for done, nothing
+/// does.
+std::string faultOf(const nlohmann::json& record);
+
+/// Adds what a look afterwards found to a page that says how the task ended.
+void addDoubts(Page& page, const std::string& title, const TaskResult& result);
 
 /// How a queued command ended. As text it is what follows the reply line, which is printed as soon
 /// as the reply is there.

@@ -14,5 +14,9 @@ constexpr Argument kTarget =
 constexpr Argument kNoWait = flag("--no-wait", "Do not wait for the outcome");
 constexpr Argument kTransid = textOption("--transid", "The transaction identifier to use")
                                   .completedBy(Completion::Transaction);
+constexpr Argument kForce =
+    flag("--force", "Send it although the inventory does not list the product");
+constexpr Argument kNoVerify =
+    flag("--no-verify", "Do not look afterwards whether a success is one");
 
 }  // namespace ctl

@@ -18,7 +18,7 @@ ExitStatus run(const Invocation& invocation) {
     RunningClock clock(kTitle, invocation.format == Format::Text);
     Task task(invocation.host, completeInstallRequest(invocation.given.text(kTransid)),
               [&clock] { clock.tick(); });
-    const nlohmann::json row = task.askNow();
+    const nlohmann::json row = task.askNow().rows.front();
     clock.erase();
     return print(showOutcome(kTitle, row, task.elapsed(), invocation.format));
 }

@@ -15,7 +15,7 @@ namespace {
 constexpr Argument kFile =
     textOption("--file", "File with the configuration").completedBy(Completion::LocalFile);
 constexpr Argument kText = positional("TEXT", "The configuration itself, or - for standard input");
-constexpr Argument kArguments[] = {kProduct, kText, kTarget, kFile, kNoWait, kTransid};
+constexpr Argument kArguments[] = {kProduct, kText, kTarget, kFile, kForce, kNoWait, kTransid};
 
 /// The host takes SETCONFIG for the universal agent as the import of a metafile, whatever the
 /// context says. Without a metafile it changes nothing and reports success.
@@ -38,9 +38,11 @@ std::string textToSet(const Values& given) {
 
 ExitStatus run(const Invocation& invocation) {
     const Values& given = invocation.given;
-    const TaskRequest request =
+    TaskRequest request =
         configurationRequest(given.text(kProduct), given.text(kTarget), textToSet(given));
-    return runQueued(invocation, request, "config set " + request.product);
+    request.isForced = given.flag(kForce);
+    return runQueued(invocation,
+                     queuedCommand(invocation, request, "config set " + request.product));
 }
 
 }  // namespace

@@ -9,6 +9,7 @@
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/queued.h"
 #include "ctl/verbs/verb_table.h"
+#include "ctl/verbs/verification.h"
 
 using nlohmann::json;
 
@@ -31,13 +32,12 @@ constexpr Argument kRestart =
 constexpr Argument kComplete =
     flag("--complete", "With --restart: wait for the host to come back and fetch the final outcome")
         .with("--restart");
-constexpr Argument kArguments[] = {kProduct, kVersion,  kCommand, kOptional,
-                                   kRestart, kComplete, kNoWait,  kTransid};
+constexpr Argument kArguments[] = {kProduct,  kVersion,  kCommand, kOptional, kRestart,
+                                   kComplete, kNoVerify, kNoWait,  kTransid};
 
 TaskRequest requestOf(const Values& given) {
     TaskRequest request;
     request.command = "INSTALL";
-    request.transid = given.text(kTransid);
     request.product = given.text(kProduct);
     request.version = given.text(kVersion);
     request.context = joinedCommand(given.texts(kCommand));
@@ -46,7 +46,9 @@ TaskRequest requestOf(const Values& given) {
 }
 
 TaskResult resultOf(const Task& task, TaskResult::End end) {
-    return {end, task.reply(), task.events(), task.elapsed()};
+    TaskResult result{end, task.reply(), task.events(), task.elapsed()};
+    if (end == TaskResult::End::Outcome) result.record = task.record();
+    return result;
 }
 
 /// Waits for the first outcome. It must come: without it nothing is known of the install.
@@ -69,10 +71,12 @@ void awaitRestart(Task& task) {
     }
 }
 
-CompletedInstall askCompleted(const Invocation& invocation, const std::string& title) {
+CompletedInstall askCompleted(const Invocation& invocation, const QueuedCommand& command) {
+    const std::string& title = command.title;
+    const Verification verification(invocation.host, command.request, command.isVerified);
     RunningClock clock(title, invocation.format == Format::Text);
     const Ticker tick = [&clock] { clock.tick(); };
-    Task task(invocation.host, requestOf(invocation.given), tick);
+    Task task(invocation.host, command.request, tick);
     if (!task.submit(true)) return {resultOf(task, TaskResult::End::Refused), {}};
     awaitBegin(task);
     if (returnCodeOf(task.events().back()) != 0) {
@@ -84,12 +88,15 @@ CompletedInstall askCompleted(const Invocation& invocation, const std::string& t
     }
     awaitRestart(task);
     json completion = fetchInstallOutcome(invocation.host.socket, task.deadline(), tick);
-    return {resultOf(task, TaskResult::End::Outcome), std::move(completion)};
+    CompletedInstall install{resultOf(task, TaskResult::End::Outcome), std::move(completion)};
+    if (returnCodeOf(install.completion) == 0) verification.check(install.task);
+    return install;
 }
 
-ExitStatus runWithRestart(const Invocation& invocation, const std::string& title) {
-    const TaskResult result = askQueued(invocation, requestOf(invocation.given), title);
-    Page page = showTask(title, result, invocation.format);
+ExitStatus runWithRestart(const Invocation& invocation, const QueuedCommand& command) {
+    const TaskResult result =
+        askQueued(invocation, command, replyShown(command.title, invocation.format));
+    Page page = showTask(command.title, result, invocation.format);
     const bool hasBegun =
         result.end == TaskResult::End::Outcome && returnCodeOf(result.events.back()) == 0;
     if (hasBegun && invocation.format == Format::Text) {
@@ -100,10 +107,15 @@ ExitStatus runWithRestart(const Invocation& invocation, const std::string& title
 
 ExitStatus run(const Invocation& invocation) {
     const Values& given = invocation.given;
-    const std::string title = "install " + given.text(kProduct);
-    if (!given.flag(kRestart)) return runQueued(invocation, requestOf(given), title);
-    if (!given.flag(kComplete) || given.flag(kNoWait)) return runWithRestart(invocation, title);
-    return print(showCompletedInstall(title, askCompleted(invocation, title), invocation.format));
+    QueuedCommand command =
+        queuedCommand(invocation, requestOf(given), "install " + given.text(kProduct));
+    // The first outcome of an install that restarts the host says only that it has begun.
+    const bool isSeenToItsEnd = !given.flag(kRestart) || given.flag(kComplete);
+    command.isVerified = isSeenToItsEnd && !given.flag(kNoVerify);
+    if (!given.flag(kRestart)) return runQueued(invocation, command);
+    if (!given.flag(kComplete) || given.flag(kNoWait)) return runWithRestart(invocation, command);
+    return print(
+        showCompletedInstall(command.title, askCompleted(invocation, command), invocation.format));
 }
 
 }  // namespace
@@ -138,10 +150,13 @@ Page showCompletedInstall(const std::string& title, const CompletedInstall& inst
         }
         return page;
     }
-    if (format == Format::Text) return showOutcome(title, install.completion, task.elapsed, format);
+    Page page = showOutcome(title, install.completion, task.elapsed, Format::Text);
+    addDoubts(page, title, task);
+    if (format == Format::Text) return page;
     json document = taskDocument(task);
     document["completion"] = install.completion;
-    return jsonPage(document, statusOf(install.completion));
+    page.out = jsonText(document);
+    return page;
 }
 
 }  // namespace ctl

@@ -5,34 +5,43 @@
 #include "ctl/show/running_clock.h"
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/common_arguments.h"
+#include "ctl/verbs/verification.h"
 
 using nlohmann::json;
 
 namespace ctl {
 
-TaskResult askQueued(const HostAddress& host, Format format, const TaskRequest& request,
-                     const std::string& title, bool wait) {
-    RunningClock clock(title, format == Format::Text);
+QueuedCommand queuedCommand(const Invocation& invocation, TaskRequest request, std::string title) {
+    request.transid = invocation.given.text(kTransid);
+    if (!request.transid.empty()) title += " (" + request.transid + ")";
+    return {std::move(request), std::move(title), !invocation.given.flag(kNoWait)};
+}
+
+OnReply replyShown(const std::string& title, Format format) {
+    if (format == Format::Json) return {};
+    return [title](const json& reply) { print({replyLine(title, reply), {}}); };
+}
+
+TaskResult askQueued(const Invocation& invocation, const QueuedCommand& command,
+                     const OnReply& onReply) {
+    const Verification verification(invocation.host, command.request,
+                                    command.isVerified && command.isAwaited);
+    RunningClock clock(command.title, invocation.format == Format::Text);
     TaskWatch watch;
     watch.tick = [&clock] { clock.tick(); };
-    if (format == Format::Text) {
-        watch.onReply = [&](const json& reply) {
-            clock.erase();
-            print({replyLine(title, reply), {}});
-        };
-    }
-    return runTask(host, request, wait, watch);
+    watch.onReply = [&](const json& reply) {
+        clock.erase();
+        if (onReply) onReply(reply);
+    };
+    TaskResult result = runTask(invocation.host, command.request, command.isAwaited, watch);
+    verification.check(result);
+    return result;
 }
 
-TaskResult askQueued(const Invocation& invocation, TaskRequest request, const std::string& title) {
-    request.transid = invocation.given.text(kTransid);
-    return askQueued(invocation.host, invocation.format, request, title,
-                     !invocation.given.flag(kNoWait));
-}
-
-ExitStatus runQueued(const Invocation& invocation, const TaskRequest& request,
-                     const std::string& title) {
-    return print(showTask(title, askQueued(invocation, request, title), invocation.format));
+ExitStatus runQueued(const Invocation& invocation, const QueuedCommand& command) {
+    const TaskResult result =
+        askQueued(invocation, command, replyShown(command.title, invocation.format));
+    return print(showTask(command.title, result, invocation.format));
 }
 
 }  // namespace ctl

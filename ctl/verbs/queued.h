@@ -2,6 +2,7 @@
 /// both.
 #pragma once
 
+#include <nlohmann/json_fwd.hpp>
 #include <string>
 
 #include "ctl/client/task.h"
@@ -10,16 +11,29 @@
 
 namespace ctl {
 
-/// Sends a request and, unless --no-wait is given, waits for its outcome. As text, the reply is
-/// shown as soon as it is there. The verb must declare kNoWait and kTransid.
-TaskResult askQueued(const Invocation& invocation, TaskRequest request, const std::string& title);
+/// A command as a verb asks for it.
+struct QueuedCommand {
+    TaskRequest request;
+    std::string title;  ///< such as "start ux"
+    bool isAwaited = true;
+    bool isVerified = false;  ///< look afterwards whether a success is one
+};
 
-/// The same, without reading the verb's arguments.
-TaskResult askQueued(const HostAddress& host, Format format, const TaskRequest& request,
-                     const std::string& title, bool wait);
+/// The command with what the user said about it. The verb must declare kNoWait and kTransid. A
+/// transaction identifier that the user has chosen becomes part of the title.
+QueuedCommand queuedCommand(const Invocation& invocation, TaskRequest request, std::string title);
 
-/// askQueued(), then shows how it ended.
-ExitStatus runQueued(const Invocation& invocation, const TaskRequest& request,
-                     const std::string& title);
+/// Called when the reply is there, which may be long before the outcome.
+using OnReply = std::function<void(const nlohmann::json& reply)>;
+
+/// Shows the line that the reply is, for people only.
+OnReply replyShown(const std::string& title, Format format);
+
+/// Sends a command and waits for its outcome if it is to be awaited, with a clock on a terminal.
+TaskResult askQueued(const Invocation& invocation, const QueuedCommand& command,
+                     const OnReply& onReply);
+
+/// askQueued(), and shows the reply as soon as it is there and how the command ended.
+ExitStatus runQueued(const Invocation& invocation, const QueuedCommand& command);
 
 }  // namespace ctl

@@ -19,8 +19,8 @@ ExitStatus run(const Invocation& invocation) {
     request.product = invocation.given.text(kProduct);
     request.targetmsn = invocation.given.text(kTargetName);
     request.context = invocation.given.text(kContext);
-    return runQueued(invocation, request,
-                     "remove-instance " + request.product + " " + request.targetmsn);
+    const std::string title = "remove-instance " + request.product + " " + request.targetmsn;
+    return runQueued(invocation, queuedCommand(invocation, request, title));
 }
 
 }  // namespace

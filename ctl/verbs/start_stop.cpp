@@ -12,17 +12,25 @@ namespace {
 constexpr Argument kInstance = textOption("--instance", "Name of the instance itself")
                                    .without("--target")
                                    .completedBy(Completion::Instance);
-constexpr Argument kStartArguments[] = {kProduct, kTarget.without("--instance"), kInstance, kNoWait,
-                                        kTransid};
+constexpr Argument kStartArguments[] = {
+    kProduct, kTarget.without("--instance"), kInstance, kForce, kNoVerify, kNoWait, kTransid};
 /// --instance is known only to say that --target takes its place.
-constexpr Argument kArguments[] = {kProduct, kTarget, kInstance.hidden(), kNoWait, kTransid};
+constexpr Argument kArguments[] = {kProduct, kTarget, kInstance.hidden(), kForce, kNoVerify,
+                                   kNoWait,  kTransid};
 
 TaskRequest requestOf(const Values& given, const std::string& command) {
     TaskRequest request;
     request.command = command;
     request.product = given.text(kProduct);
     request.targetmsn = given.text(kTarget);
+    request.isForced = given.flag(kForce);
     return request;
+}
+
+ExitStatus send(const Invocation& invocation, const TaskRequest& request, const std::string& name) {
+    QueuedCommand command = queuedCommand(invocation, request, name + " " + request.product);
+    command.isVerified = !invocation.given.flag(kNoVerify);
+    return runQueued(invocation, command);
 }
 
 ExitStatus start(const Invocation& invocation) {
@@ -31,7 +39,7 @@ ExitStatus start(const Invocation& invocation) {
         request.optional = "INSTANCE";
         request.targetmsn = instance;
     }
-    return runQueued(invocation, request, "start " + request.product);
+    return send(invocation, request, "start");
 }
 
 /// Only START has a way to name an instance outright. The others resolve a managed system name.
@@ -40,8 +48,7 @@ ExitStatus runOnTarget(const Invocation& invocation, const std::string& command,
     if (!invocation.given.text(kInstance).empty()) {
         throw Failure(kWrongUsage, name + " takes --target, not --instance");
     }
-    const TaskRequest request = requestOf(invocation.given, command);
-    return runQueued(invocation, request, name + " " + request.product);
+    return send(invocation, requestOf(invocation.given, command), name);
 }
 
 ExitStatus stop(const Invocation& invocation) {

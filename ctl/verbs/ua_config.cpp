@@ -43,7 +43,7 @@ ExitStatus run(const Invocation& invocation) {
     request.uaconfig = given.text(kMetafile);
     request.uascript = given.text(kScripts);
     request.targetmsn = given.text(kTarget);
-    return runQueued(invocation, request, "ua-config");
+    return runQueued(invocation, queuedCommand(invocation, request, "ua-config"));
 }
 
 }  // namespace

@@ -8,13 +8,16 @@
 namespace ctl {
 namespace {
 
-constexpr Argument kArguments[] = {kProduct, kNoWait, kTransid};
+constexpr Argument kArguments[] = {kProduct, kForce, kNoVerify, kNoWait, kTransid};
 
 ExitStatus run(const Invocation& invocation) {
     TaskRequest request;
     request.command = "UNINSTALL";
     request.product = invocation.given.text(kProduct);
-    return runQueued(invocation, request, "uninstall " + request.product);
+    request.isForced = invocation.given.flag(kForce);
+    QueuedCommand command = queuedCommand(invocation, request, "uninstall " + request.product);
+    command.isVerified = !invocation.given.flag(kNoVerify);
+    return runQueued(invocation, command);
 }
 
 }  // namespace

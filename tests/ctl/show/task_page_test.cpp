@@ -18,7 +18,12 @@ const json kFailed = {{"RETVAL", 1024}, {"RETMSGID", "ZAV1024E"}, {"RETMSGPARM",
 const json kRefused = {{"RETVAL", 1003}, {"RETMSGID", "ZAV1003E"}};
 
 TaskResult outcome(const json& row) {
-    return {TaskResult::End::Outcome, kAccepted, json::array({row}), seconds(3)};
+    TaskResult result;
+    result.end = TaskResult::End::Outcome;
+    result.reply = kAccepted;
+    result.events = json::array({row});
+    result.elapsed = seconds(3);
+    return result;
 }
 
 TEST(TaskPage, SaysWhetherTheCommandWasAccepted) {
@@ -36,6 +41,82 @@ TEST(TaskPage, SaysHowAndAfterWhatTimeTheTaskEnded) {
               "start ux: failed after 3 s; ZAV1024E: the start or stop command ended with a bad "
               "return code [cmd]\n");
     EXPECT_EQ(failed.status, ctl::kHostReportedFailure);
+}
+
+/// A record of a task in that state that ran one command.
+json record(const char* state, const json& command) {
+    return {{"id", "1"},
+            {"state", state},
+            {"reply", nullptr},
+            {"events", json::array()},
+            {"details", {{"commands", {command}}}}};
+}
+
+TaskResult withRecord(const json& row, const json& kept) {
+    TaskResult result = outcome(row);
+    result.record = kept;
+    return result;
+}
+
+const json kKilled = {{"command", "run"}, {"signal", 9}, {"stdout", "half"}};
+
+TEST(TaskPage, OfAFailureHasTheCommandItsEndAndItsLastLines) {
+    const json command = {{"command", "run"}, {"exit", 3}, {"stderr", "no space\n"}};
+    const Page page =
+        ctl::showTask("start ux", withRecord(kFailed, record("failed", command)), Format::Text);
+    EXPECT_EQ(page.out,
+              "start ux: failed after 3 s; ZAV1024E: the start or stop command ended with a bad "
+              "return code [cmd]\n"
+              "  command: run\n  end:     exit code 3\n  standard error:\n    no space\n");
+    EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+}
+
+TEST(TaskPage, ShowsASuccessThatIsNone) {
+    const Page page =
+        ctl::showTask("start ux", withRecord(kDone, record("failed", kKilled)), Format::Text);
+    EXPECT_EQ(page.out,
+              "start ux: reported as done, but the command was killed by signal 9\n"
+              "  command: run\n  end:     killed by signal 9\n  standard output:\n    half\n");
+    EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+}
+
+TEST(TaskPage, TakesTheHostsWordForWhatIsAFailure) {
+    // Without guards the host counts a killed command as the plug-in does.
+    EXPECT_EQ(ctl::faultOf(record("done", kKilled)), "");
+    EXPECT_EQ(ctl::faultOf(record("failed", {{"error", "No such file"}})),
+              "the command could not be run: No such file");
+    EXPECT_EQ(ctl::faultOf(record("failed", {{"exit", 0}})), "the host counts it as failed");
+    EXPECT_EQ(ctl::faultOf(json{{"state", "failed"}}), "the host counts it as failed");
+    EXPECT_EQ(ctl::faultOf(json()), "");
+    const Page page =
+        ctl::showTask("start ux", withRecord(kDone, record("done", kKilled)), Format::Text);
+    EXPECT_EQ(page.out, "start ux: done after 3 s\n");
+}
+
+TEST(TaskPage, HasTheRecordAsTaskAndDetailsInItsDocument) {
+    const json kept = record("failed", kKilled);
+    const Page page = ctl::showTask("start ux", withRecord(kDone, kept), Format::Json);
+    EXPECT_EQ(json::parse(page.out), (json{{"reply", kAccepted},
+                                           {"events", {kDone}},
+                                           {"task", {{"id", "1"}, {"state", "failed"}}},
+                                           {"details", {{"commands", {kKilled}}}}}));
+    EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+}
+
+TEST(TaskPage, SaysWhatALookAfterwardsFound) {
+    TaskResult result = outcome(kDone);
+    result.doubt = "ux is still there";
+    const Page doubted = ctl::showTask("uninstall ux", result, Format::Text);
+    EXPECT_EQ(doubted.out, "uninstall ux: done after 3 s\n");
+    EXPECT_EQ(doubted.err, "zavctl: uninstall ux: ux is still there\n");
+    EXPECT_EQ(doubted.status, ctl::kHostReportedFailure);
+    EXPECT_EQ(json::parse(ctl::showTask("uninstall ux", result, Format::Json).out)["doubt"],
+              "ux is still there");
+    result.doubt.clear();
+    result.note = "not verified";
+    const Page noted = ctl::showTask("uninstall ux", result, Format::Text);
+    EXPECT_EQ(noted.err, "zavctl: note: not verified\n");
+    EXPECT_EQ(noted.status, ctl::kSuccess);
 }
 
 TEST(TaskPage, ShowsTheMessageOfASuccess) {
