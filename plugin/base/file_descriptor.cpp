@@ -1,6 +1,6 @@
 #include "base/file_descriptor.h"
 
-#include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -11,6 +11,15 @@ namespace {
 
 constexpr int kFirstOwnDescriptor = 3;
 constexpr mode_t kStreamMode = 0666;
+
+/// Whether a descriptor is of a kind that never makes its reader or writer wait. Sets errno if not.
+bool isFileOrDirectory(const FileDescriptor& opened) {
+    struct stat found {};
+    if (::fstat(opened.get(), &found) != 0) return false;
+    if (S_ISREG(found.st_mode) || S_ISDIR(found.st_mode)) return true;
+    errno = ESPIPE;
+    return false;
+}
 
 }  // namespace
 
@@ -40,14 +49,24 @@ int FileDescriptor::close() {
     return errno;
 }
 
-FileDescriptor openFile(const char* path, int flags, mode_t mode) {
-    int fd;
-    do {
-        fd = ::open(path, flags | O_CLOEXEC, mode);
-    } while (fd < 0 && errno == EINTR);
+FileDescriptor takeDescriptor(int fd) {
     FileDescriptor opened(fd);
     if (fd < 0 || fd >= kFirstOwnDescriptor) return opened;
     return FileDescriptor(::fcntl(fd, F_DUPFD_CLOEXEC, kFirstOwnDescriptor));
+}
+
+FileDescriptor takeOpened(int fd) {
+    FileDescriptor opened = takeDescriptor(fd);
+    if (opened.isOpen() && !isFileOrDirectory(opened)) return FileDescriptor();
+    return opened;
+}
+
+FileDescriptor openFile(const char* path, int flags, mode_t mode) {
+    int fd;
+    do {
+        fd = ::open(path, flags | kOpenFlags, mode);
+    } while (fd < 0 && errno == EINTR);
+    return takeOpened(fd);
 }
 
 std::FILE* openStream(const char* path, const char* mode) {

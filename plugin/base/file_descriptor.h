@@ -1,6 +1,7 @@
 /// File descriptors that close themselves, and reading from and writing to them.
 #pragma once
 
+#include <fcntl.h>
 #include <sys/types.h>
 
 #include <cstddef>
@@ -33,7 +34,21 @@ private:
 /// Opens a file like open does, close-on-exec. On failure the result is not open and errno says
 /// why. The descriptor is above 2 even when lower ones are free, so that the host's output never
 /// ends up in a file of this library.
+///
+/// Never waits for the other end of a pipe or for a device: what is neither a regular file nor a
+/// directory cannot be opened (ESPIPE; ENXIO for a socket, and for a pipe without a reader that is
+/// opened for writing).
 FileDescriptor openFile(const char* path, int flags, mode_t mode = 0);
+
+/// What every open of this library adds to its flags.
+constexpr int kOpenFlags = O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
+
+/// Takes over what an open with kOpenFlags returned. The result is above 2. It is not open, with
+/// errno set, when `fd` is -1 (errno stays what it is) or is neither a file nor a directory.
+FileDescriptor takeOpened(int fd);
+
+/// The same for descriptors of O_PATH, which may name anything.
+FileDescriptor takeDescriptor(int fd);
 
 /// Opens a stream on such a descriptor, for reading ("rb") or for writing from the start ("wb").
 /// Returns null with errno set on failure. The caller closes the stream.

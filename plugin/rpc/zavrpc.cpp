@@ -8,11 +8,14 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <string>
 #include <vector>
 
 #include "base/file_descriptor.h"
 #include "base/zavstr.h"
 #include "base/zavtrace.h"
+#include "rpc/depot_tree.h"
+#include "rpc/dos2unix.h"
 #include "rpc/transfer_path.h"
 #include "util/zavutil.h"
 
@@ -30,11 +33,15 @@ constexpr mode_t kFileMode = 0770;
 /// longer fits rather than when the file is closed.
 class DestinationFile {
 public:
-    DestinationFile(const char* path, bool anew)
-        : file_(openFile(path, O_CREAT | (anew ? O_WRONLY | O_TRUNC : O_RDWR | O_APPEND),
-                         kCreationMode)) {}
+    /// When it cannot be opened, errno says why.
+    DestinationFile(DepotTree& depot, const char* path, bool anew)
+        : file_(depot.open(path, O_CREAT | (anew ? O_WRONLY | O_TRUNC : O_RDWR | O_APPEND),
+                           kCreationMode)) {}
 
     bool isOpen() const { return file_.isOpen(); }
+
+    /// Sets the mode like chmod.
+    bool setMode(mode_t mode) const { return ::fchmod(file_.get(), mode) == 0; }
 
     /// Writes the pieces, none of them empty, in order; false when one cannot be written. On return
     /// `done` is the number of pieces written in full, and the pieces after them describe the rest.
@@ -73,12 +80,12 @@ bool directoryOf(const String& path, String& directory) {
 }
 
 /// Creates the destination's directory. Returns false, with a trace line, on failure.
-bool ensureDirectory(const Trace& trace, const String& destination) {
+bool ensureDirectory(const Trace& trace, DepotTree& depot, const String& destination) {
     String directory;
-    if (!directoryOf(destination, directory) || Util::pathExists(directory)) return true;
+    if (!directoryOf(destination, directory) || pathExists(depot, directory)) return true;
     // Files for one directory may arrive on several threads; one of them creates it first.
     const CharStar narrow = directory.c_str();
-    if (Util::createDir(narrow) == 0 || Util::pathExists(directory)) return true;
+    if (createDir(depot, narrow) == 0 || pathExists(depot, directory)) return true;
     trace().error("Could not create destination directory %s", directory);
     return false;
 }
@@ -120,41 +127,53 @@ bool writeChunks(const Trace& trace, const DestinationFile& file, const DataChun
     return false;
 }
 
-/// Opens the file, writes the batch and closes the file.
-TransferStatus writeBatch(const Trace& trace, const String& destination, const char* path,
-                          bool anew, const DataChunk* chunks, std::int32_t lastIndex) {
+/// What leads out of the depot has no directory in it.
+TransferStatus refuseDirectory(const Trace& trace, const String& destination) {
+    String directory = destination;
+    directoryOf(destination, directory);
+    trace().error("Could not create destination directory %s", directory);
+    return kTransferCannotCreateDirectory;
+}
+
+TransferStatus cannotOpen(const Trace& trace, const String& destination, const char* mode) {
+    if (errno == EXDEV) return refuseDirectory(trace, destination);
+    trace().error("Failed to open file %s using mode \"%s\", check permissions", destination, mode);
+    return kTransferCannotOpen;
+}
+
+/// Opens the file, writes the batch, sets the mode and closes the file.
+TransferStatus writeBatch(const Trace& trace, DepotTree& depot, const String& destination,
+                          const char* path, bool anew, const DataChunk* chunks,
+                          std::int32_t lastIndex) {
     const char* const mode = anew ? "wb" : "a+b";
-    if (anew && ::unlink(path) != 0) {
+    if (anew && depot.remove(path) != 0) {
         trace().detail(
             "Failed to unlink file [%s]. File must not exist or we dont have perms to unlink it",
             destination);
     }
-    const DestinationFile file(path, anew);
-    if (!file.isOpen()) {
-        trace().error("Failed to open file %s using mode \"%s\", check permissions", destination,
-                      mode);
-        return kTransferCannotOpen;
-    }
+    const DestinationFile file(depot, path, anew);
+    if (!file.isOpen()) return cannotOpen(trace, destination, mode);
     trace().detail("Opened file %s for appending using mode %s", destination, mode);
-    return writeChunks(trace, file, chunks, lastIndex) ? kTransferDone : kTransferCannotWrite;
+    if (!writeChunks(trace, file, chunks, lastIndex)) return kTransferCannotWrite;
+    if (!file.setMode(kFileMode)) {
+        trace().error("Failed to set permissions on file [%s] to [%d]", destination, kFileMode);
+    }
+    return kTransferDone;
 }
 
-void convertIfInteresting(const Trace& trace, const String& destination, const char* path) {
+void convertIfInteresting(const Trace& trace, DepotTree& depot, const String& destination,
+                          const char* path) {
     for (const char* name : {"install.sh", "DeployLnk.sh", ".mdl"}) {
         if (destination.find(String(name), 0) == String::NPOS) continue;
         trace().detail("Its a file we're interested in: %s", destination);
-        convertDOS2Unix(path);
+        convertDOS2Unix(depot, path);
         return;
     }
 }
 
-bool refuseToLeaveDepot(const Trace& trace, const String& depot, const String& name,
-                        const String& destination) {
-    if (!leadsOutOfDepot(depot, name)) return false;
-    String directory = destination;
-    directoryOf(destination, directory);
-    trace().error("Could not create destination directory %s", directory);
-    return true;
+std::string narrowText(const String& text) {
+    const CharStar bytes = text.c_str();
+    return static_cast<const char*>(bytes);
 }
 
 TransferStatus transfer(const Trace& trace, const char* fileName, bool anew,
@@ -167,21 +186,19 @@ TransferStatus transfer(const Trace& trace, const char* fileName, bool anew,
     const String name = transferName(fileName);
     const String destination = depot + name;
     trace().detail("Destination path name is: %s", destination);
-    if (refuseToLeaveDepot(trace, depot, name, destination)) return kTransferCannotCreateDirectory;
-    if (!ensureDirectory(trace, destination)) return kTransferCannotCreateDirectory;
+    if (leadsOutOfDepot(depot, name)) return refuseDirectory(trace, destination);
+    DepotTree tree(narrowText(depot));
+    if (!ensureDirectory(trace, tree, destination)) return kTransferCannotCreateDirectory;
     if (destination.length() > kLongestPath) {
         trace().error("Destination path name too long, max is %d characters", kLongestPath - 1);
         return kTransferNameTooLong;
     }
     const CharStar narrow = destination.c_str();
     const char* const path = narrow;
-    const TransferStatus written = writeBatch(trace, destination, path, anew, chunks, lastIndex);
-    if (written != kTransferDone) return written;
-    if (::chmod(path, kFileMode) != 0) {
-        trace().error("Failed to set permissions on file [%s] to [%d]", destination, kFileMode);
-    }
-    convertIfInteresting(trace, destination, path);
-    return kTransferDone;
+    const TransferStatus written =
+        writeBatch(trace, tree, destination, path, anew, chunks, lastIndex);
+    if (written == kTransferDone) convertIfInteresting(trace, tree, destination, path);
+    return written;
 }
 
 }  // namespace

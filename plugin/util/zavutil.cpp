@@ -10,6 +10,7 @@
 
 #include "base/zavtrace.h"
 #include "platform/bss1.h"
+#include "util/directory_tree.h"
 
 namespace ZAV {
 
@@ -45,6 +46,11 @@ bool getKept(std::mutex& lock, String& kept, bool (*init)(String&), String& dir)
 const char* homeVariable() {
     const char* const value = BSS1_GetEnv(kHomeVariable, nullptr);
     return value != nullptr ? value : std::getenv(kHomeVariable);
+}
+
+bool existsTraced(const Trace& trace, bool exists, const String& path) {
+    trace().detail(exists ? "Path [%s] exists" : "Path [%s] does not exist", path);
+    return exists;
 }
 
 void endWithSlash(String& dir) {
@@ -109,11 +115,14 @@ bool provideDepot(Trace& trace, String& dir) {
 
 }  // namespace
 
+bool pathExists(DirectoryTree& tree, const String& path) {
+    Trace trace(traceUnit);
+    return trace.exit(existsTraced(trace, tree.exists(path.c_str()), path));
+}
+
 bool Util::pathExists(const String& path) {
     Trace trace(traceUnit);
-    const bool exists = ::access(path.c_str(), F_OK) == 0;
-    trace().detail(exists ? "Path [%s] exists" : "Path [%s] does not exist", path);
-    return trace.exit(exists);
+    return trace.exit(existsTraced(trace, ::access(path.c_str(), F_OK) == 0, path));
 }
 
 String Util::getHostName() {

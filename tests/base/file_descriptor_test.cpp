@@ -93,6 +93,22 @@ TEST(OpenFile, CreatesWithTheModeGiven) {
     EXPECT_EQ(info.st_mode & 07777u, 0640u);
 }
 
+TEST(OpenFile, NeverWaitsForAPipeAndOpensNoDevice) {
+    const ScratchDir scratch;
+    const std::string pipe = scratch.path("pipe");
+    ASSERT_EQ(::mkfifo(pipe.c_str(), 0600), 0);
+    EXPECT_FALSE(openFile(pipe.c_str(), O_RDONLY).isOpen());
+    EXPECT_EQ(errno, ESPIPE);
+    EXPECT_FALSE(openFile(pipe.c_str(), O_RDWR | O_APPEND).isOpen());
+    EXPECT_EQ(errno, ESPIPE);
+    EXPECT_FALSE(openFile(pipe.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600).isOpen());
+    EXPECT_EQ(errno, ENXIO);
+    for (const char* device : {"/dev/zero", "/dev/null", "/dev/full"}) {
+        EXPECT_FALSE(openFile(device, O_RDWR).isOpen()) << device;
+        EXPECT_EQ(errno, ESPIPE) << device;
+    }
+}
+
 TEST(OpenFile, LeavesTheStandardDescriptorsAlone) {
     const ScratchDir scratch;
     const std::string path = scratch.write("f", "x");

@@ -2,6 +2,7 @@
 #include "base/zavrbndl.h"
 
 #include <gmock/gmock.h>
+#include <sys/stat.h>
 
 #include <algorithm>
 #include <memory>
@@ -129,6 +130,12 @@ TEST_F(Bundle, UnreadableFileThrows) {
         EXPECT_STREQ(copy.getErrorMessage().c_str(), ("Unable to read file: " + path).c_str());
     }
     EXPECT_THROW(ResourceBundle(scratch.path().c_str(), '*'), ResourceBundleException);
+}
+
+TEST_F(Bundle, PipeThrowsAtOnce) {
+    const std::string pipe = scratch.path("pipe");
+    ASSERT_EQ(::mkfifo(pipe.c_str(), 0600), 0);
+    EXPECT_THROW(ResourceBundle(pipe.c_str(), '*'), ResourceBundleException);
 }
 
 TEST_F(Bundle, CopySharesTheValuesAndOutlivesItsSource) {

@@ -2,6 +2,7 @@
 #include "base/zavrunas.h"
 
 #include <gmock/gmock.h>
+#include <sys/stat.h>
 
 #include <memory>
 #include <string>
@@ -145,6 +146,17 @@ TEST_F(RunAs, MissingFileIsAnEmptyDatabase) {
     EXPECT_THAT(traces.errors("zavrunas"),
                 ElementsAre("Error reading file (defaults will be used): " + narrow(path()) +
                             ". Error: No such file or directory"));
+}
+
+TEST_F(RunAs, PipeInPlaceOfTheFileIsNotWaitedFor) {
+    ASSERT_EQ(::mkfifo(narrow(path()).c_str(), 0600), 0);
+    StartupDB db(path());
+    EXPECT_EQ(db.getNumAgents(), 0u);
+    EXPECT_EQ(db.save(), 0);
+    EXPECT_THAT(traces.errors("zavrunas"),
+                ElementsAre("Error reading file (defaults will be used): " + narrow(path()) +
+                                ". Error: Illegal seek",
+                            "Error opening file, " + narrow(path()) + ", in write mode: %"));
 }
 
 TEST_F(RunAs, EmptyFileIsAnEmptyDatabase) {

@@ -2,6 +2,7 @@
 // ctest-label: threaded
 
 #include <gmock/gmock.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -163,9 +164,15 @@ TEST_F(Push, AFileThatCannotBeOpenedIsStatusFour) {
 }
 
 TEST_F(Push, AFileThatCannotBeWrittenIsStatusFive) {
-    // A kernel's file that takes numbers only, and that nobody can remove.
-    ASSERT_EQ(::symlink("/proc/self", files_.path("depot/self").c_str()), 0);
-    expectRefused("self/oom_score_adj", 5, "the host could not write the file");
+    // Files of this host must not grow, which is told by an error instead of a signal: who starts
+    // ignoring the signal goes on ignoring it.
+    auto* const before = std::signal(SIGXFSZ, SIG_IGN);
+    host_.reset();
+    start();
+    std::signal(SIGXFSZ, before);
+    const rlimit none{0, 0};
+    ASSERT_EQ(::prlimit(host_->pid(), RLIMIT_FSIZE, &none, nullptr), 0);
+    expectRefused("file", 5, "the host could not write the file");
 }
 
 TEST_F(Push, ADirectoryThatCannotBeMadeIsStatusSix) {
@@ -177,6 +184,15 @@ TEST_F(Push, NothingLeavesTheDepot) {
     for (const char* name : {"../outside", "a/../../outside", "..\\outside"}) {
         expectRefused(name, 6, "the host could not make the file's directory");
     }
+    files_.makeDir("elsewhere");
+    ASSERT_EQ(::symlink("../elsewhere", files_.path("depot/relative").c_str()), 0);
+    ASSERT_EQ(::symlink(files_.path("elsewhere").c_str(), files_.path("depot/absolute").c_str()),
+              0);
+    for (const char* name : {"relative/outside", "absolute/outside", "absolute/made/outside"}) {
+        expectRefused(name, 6, "the host could not make the file's directory");
+    }
+    EXPECT_FALSE(files_.exists("elsewhere/outside"));
+    EXPECT_FALSE(files_.exists("elsewhere/made"));
     EXPECT_FALSE(files_.exists("outside"));
     EXPECT_FALSE(inDepot("a"));
     EXPECT_THAT(host_->trace(), HasSubstr("Could not create destination directory "));

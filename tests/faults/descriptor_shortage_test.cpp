@@ -91,7 +91,7 @@ TEST_F(DescriptorShortage, ACommandNeedsSixAndSaysWhichPipeItMisses) {
         EXPECT_EQ(with(left, run), (End{"true x\n", {}})) << left;
 }
 
-TEST_F(DescriptorShortage, ATransferNeedsOneAndItsConversionTwo) {
+TEST_F(DescriptorShortage, ATransferNeedsTwoAndItsConversionFour) {
     scratch_.makeDir("home/tmp");
     const std::string file = scratch_.path("depot/install.sh");
     const auto run = [&] {
@@ -103,14 +103,16 @@ TEST_F(DescriptorShortage, ATransferNeedsOneAndItsConversionTwo) {
         return std::to_string(status);
     };
     EXPECT_EQ(run(), "0");
-    EXPECT_EQ(
-        with(0, run),
-        (End{"4", {"Failed to open file " + file + " using mode \"wb\", check permissions"}}));
-    EXPECT_EQ(
-        with(1, run),
-        (End{"0", {"Could not open [" + scratch_.path("home") + "//tmp/.zavtemp] for writing."}}));
+    const End unopened{"4",
+                       {"Failed to open file " + file + " using mode \"wb\", check permissions"}};
+    const End unconverted{
+        "0", {"Could not open [" + scratch_.path("home") + "//tmp/.zavtemp] for writing."}};
+    for (const unsigned left : {0U, 1U})
+        EXPECT_EQ(with(left, run), unopened) << left;
+    for (const unsigned left : {2U, 3U})
+        EXPECT_EQ(with(left, run), unconverted) << left;
     EXPECT_EQ(scratch_.read("depot/install.sh"), "a\r\n");
-    for (unsigned left = 2; left < kEnough; ++left)
+    for (unsigned left = 4; left < kEnough; ++left)
         EXPECT_EQ(with(left, run), (End{"0", {}})) << left;
     EXPECT_EQ(scratch_.read("depot/install.sh"), "a\n");
 }

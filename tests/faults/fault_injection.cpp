@@ -36,10 +36,11 @@ extern "C" const char etext;
 namespace {
 
 constexpr const char* kNames[] = {
-    "access", "calloc", "chmod", "close",   "dup2",       "execve", "fclose", "fcntl",
-    "fdopen", "fread",  "fstat", "fwrite",  "kill",       "link",   "lseek",  "lstat",
-    "malloc", "mkdir",  "new",   "open",    "pidfd_open", "pipe2",  "poll",   "read",
-    "uname",  "unlink", "vfork", "waitpid", "write",      "writev",
+    "access",  "calloc",     "chmod",  "close",  "dup2",    "execve", "fclose", "fchmod",
+    "fcntl",   "fdopen",     "fread",  "fstat",  "fwrite",  "kill",   "link",   "linkat",
+    "lseek",   "lstat",      "malloc", "mkdir",  "mkdirat", "new",    "open",   "openat",
+    "openat2", "pidfd_open", "pipe2",  "poll",   "read",    "uname",  "unlink", "unlinkat",
+    "vfork",   "waitpid",    "write",  "writev",
 };
 static_assert(sizeof kNames / sizeof *kNames == static_cast<std::size_t>(Call::kCount));
 
@@ -215,6 +216,11 @@ int fclose(std::FILE* stream) {
     return EOF;
 }
 
+int fchmod(int fd, mode_t mode) noexcept {
+    if (fails(Call::kFchmod, CALLER)) return -1;
+    return static_cast<int>(::syscall(SYS_fchmod, fd, mode));
+}
+
 int fcntl(int fd, int command, ...) {
     std::va_list list;
     va_start(list, command);
@@ -262,6 +268,11 @@ int link(const char* from, const char* to) noexcept {
     return real(from, to);
 }
 
+int linkat(int above, const char* from, int directory, const char* to, int flags) noexcept {
+    if (fails(Call::kLinkat, CALLER)) return -1;
+    return static_cast<int>(::syscall(SYS_linkat, above, from, directory, to, flags));
+}
+
 off_t lseek(int fd, off_t offset, int whence) noexcept {
     if (fails(Call::kLseek, CALLER)) return -1;
     static auto* const real = nextOf<off_t(int, off_t, int)>("lseek", "lseek64");
@@ -280,6 +291,11 @@ int mkdir(const char* path, mode_t mode) noexcept {
     return real(path, mode);
 }
 
+int mkdirat(int directory, const char* name, mode_t mode) noexcept {
+    if (fails(Call::kMkdirat, CALLER)) return -1;
+    return static_cast<int>(::syscall(SYS_mkdirat, directory, name, mode));
+}
+
 int open(const char* path, int flags, ...) {
     std::va_list list;
     va_start(list, flags);
@@ -288,6 +304,16 @@ int open(const char* path, int flags, ...) {
     if (failsOrInterrupted(Call::kOpen, CALLER)) return -1;
     static auto* const real = nextOf<int(const char*, int, ...)>("open", "open64");
     return real(path, flags, mode);
+}
+
+int openat(int directory, const char* name, int flags, ...) {
+    std::va_list list;
+    va_start(list, flags);
+    const mode_t mode = va_arg(list, mode_t);
+    va_end(list);
+    if (failsOrInterrupted(Call::kOpenat, CALLER)) return -1;
+    static auto* const real = nextOf<int(int, const char*, int, ...)>("openat", "openat64");
+    return real(directory, name, flags, mode);
 }
 
 int pipe2(int* ends, int flags) noexcept {
@@ -308,6 +334,7 @@ ssize_t read(int fd, void* buffer, std::size_t size) {
 
 long syscall(long number, ...) noexcept {
     if (number == SYS_pidfd_open && fails(Call::kPidfdOpen, CALLER)) return -1;
+    if (number == SYS_openat2 && failsOrInterrupted(Call::kOpenat2, CALLER)) return -1;
     std::va_list list;
     va_start(list, number);
     long arguments[6];
@@ -329,6 +356,11 @@ int unlink(const char* path) noexcept {
     if (fails(Call::kUnlink, CALLER)) return -1;
     static auto* const real = next<int(const char*)>("unlink");
     return real(path);
+}
+
+int unlinkat(int directory, const char* name, int flags) noexcept {
+    if (fails(Call::kUnlinkat, CALLER)) return -1;
+    return static_cast<int>(::syscall(SYS_unlinkat, directory, name, flags));
 }
 
 pid_t waitpid(pid_t pid, int* status, int options) {

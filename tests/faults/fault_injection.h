@@ -18,6 +18,7 @@ enum class Call {
     kDup2,
     kExecve,
     kFclose,
+    kFchmod,
     kFcntl,
     kFdopen,
     kFread,
@@ -25,18 +26,23 @@ enum class Call {
     kFwrite,
     kKill,
     kLink,
+    kLinkat,
     kLseek,
     kLstat,
     kMalloc,
     kMkdir,
+    kMkdirat,
     kNew,
     kOpen,
+    kOpenat,
+    kOpenat2,
     kPidfdOpen,
     kPipe2,
     kPoll,
     kRead,
     kUname,
     kUnlink,
+    kUnlinkat,
     kVfork,
     kWaitpid,
     kWrite,
@@ -70,7 +76,7 @@ public:
 };
 
 /// While it exists, every other call that a signal handler may interrupt fails with EINTR: open,
-/// read, write, writev, poll and waitpid.
+/// openat, openat2, read, write, writev, poll and waitpid.
 class Interruptions {
 public:
     Interruptions();

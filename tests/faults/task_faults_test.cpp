@@ -162,7 +162,7 @@ TEST_F(TaskFaults, ACompletedInstallWhoseResultCannotBeReadIs1031) {
     const End failed{"1031 ZAV1031E " + files_.depot() + "rc.txt,NOTFOUND",
                      {"Unable to read rc.txt for install's return code"}};
     scenario.expectEach(Call::kOpen, EMFILE, {failed});
-    scenario.expectEach(Call::kFstat, EIO, {failed});
+    scenario.expectEach(Call::kFstat, EIO, {failed, failed});
     scenario.expectEach(Call::kLseek, EIO, {failed, failed});
     scenario.expectEach(Call::kRead, EIO, {failed});
     EXPECT_FALSE(fake_sleep::slept().empty());

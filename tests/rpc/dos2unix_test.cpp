@@ -36,6 +36,13 @@ Function next(const char* name) {
     return reinterpret_cast<Function>(::dlsym(RTLD_NEXT, name));
 }
 
+std::string pathOf(int fd) {
+    char path[4096] = "";
+    const std::string descriptor = "/proc/self/fd/" + std::to_string(fd);
+    const ssize_t length = ::readlink(descriptor.c_str(), path, sizeof path - 1);
+    return std::string(path, length > 0 ? static_cast<std::size_t>(length) : 0);
+}
+
 int failWith(int error) {
     errno = error;
     return -1;
@@ -45,9 +52,9 @@ int failWith(int error) {
 
 extern "C" {
 
-int chmod(const char* path, mode_t mode) noexcept {
-    if (fails("chmod", path)) return failWith(EPERM);
-    return next<int (*)(const char*, mode_t)>("chmod")(path, mode);
+int fchmod(int fd, mode_t mode) noexcept {
+    if (fails("fchmod", pathOf(fd))) return failWith(EPERM);
+    return next<int (*)(int, mode_t)>("fchmod")(fd, mode);
 }
 
 int unlink(const char* path) noexcept {
@@ -61,11 +68,7 @@ int link(const char* from, const char* to) noexcept {
 }
 
 int close(int fd) {
-    char path[4096] = "";
-    const std::string descriptor = "/proc/self/fd/" + std::to_string(fd);
-    const ssize_t length = ::readlink(descriptor.c_str(), path, sizeof path - 1);
-    const bool toFail =
-        length > 0 && fails("close", std::string(path, static_cast<std::size_t>(length)));
+    const bool toFail = fails("close", pathOf(fd));
     const int closed = next<int (*)(int)>("close")(fd);
     return toFail ? failWith(EIO) : closed;
 }
@@ -141,7 +144,7 @@ TEST_F(Dos2Unix, AnInputMayFailToCloseWhenThereIsNoTemporaryFile) {
 }
 
 TEST_F(Dos2Unix, PermissionsThatCannotBeSetLeaveTheOriginal) {
-    EXPECT_EQ(errorsOf({"chmod", "/.zavtemp"}),
+    EXPECT_EQ(errorsOf({"fchmod", "/.zavtemp"}),
               (Texts{"Failed to set permissions on file [" + temporary() + "] to [504]"}));
     EXPECT_EQ(original(), "a\r\nb\x1a");
 }
@@ -176,7 +179,7 @@ TEST_F(Dos2Unix, WithoutAHomeTheTemporaryFileIsInTheWorkingDirectory) {
 }
 
 TEST_F(Dos2Unix, ATransferWhosePermissionsCannotBeSetCarriesOn) {
-    failing = {"chmod", "/depot/install.sh"};
+    failing = {"fchmod", "/depot/install.sh"};
     const ZAV::DataChunk chunk{3, {'x', '\r', '\n'}};
     std::int32_t status = -1;
     TraceCapture trace;
@@ -186,6 +189,29 @@ TEST_F(Dos2Unix, ATransferWhosePermissionsCannotBeSetCarriesOn) {
               (Texts{"Failed to set permissions on file [" + file_ + "] to [504]"}));
     EXPECT_EQ(trace.count('D', "Its a file we're interested in: " + file_), 1);
     EXPECT_EQ(original(), "x\n");
+}
+
+TEST_F(Dos2Unix, ALinkInTheTemporaryFilesPlaceIsNotFollowed) {
+    const std::string outside = scratch_.write("outside", "untouched");
+    ASSERT_EQ(::symlink(outside.c_str(), scratch_.path("home/tmp/.zavtemp").c_str()), 0);
+    TraceCapture trace;
+    EXPECT_EQ(convertDOS2Unix(file_.c_str()), -1);
+    EXPECT_EQ(trace.errors("zavrpc"), (Texts{"Could not open [" + temporary() + "] for writing."}));
+    EXPECT_EQ(scratch_.read("outside"), "untouched");
+    EXPECT_EQ(original(), "a\r\nb\x1a");
+}
+
+TEST_F(Dos2Unix, PipesInPlaceOfEitherFileAreNotWaitedFor) {
+    const std::string pipe = scratch_.path("depot/pipe");
+    ASSERT_EQ(::mkfifo(pipe.c_str(), 0600), 0);
+    TraceCapture trace;
+    EXPECT_EQ(convertDOS2Unix(pipe.c_str()), -1);
+    EXPECT_EQ(trace.errors("zavrpc"), (Texts{"Could not open [" + pipe + "] for reading."}));
+    trace.clear();
+    ASSERT_EQ(::mkfifo(scratch_.path("home/tmp/.zavtemp").c_str(), 0600), 0);
+    EXPECT_EQ(convertDOS2Unix(file_.c_str()), -1);
+    EXPECT_EQ(trace.errors("zavrpc"), (Texts{"Could not open [" + temporary() + "] for writing."}));
+    EXPECT_EQ(original(), "a\r\nb\x1a");
 }
 
 }  // namespace

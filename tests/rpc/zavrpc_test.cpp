@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <cstring>
+#include <filesystem>
 #include <thread>
 
 #include "support/scratch_dir.h"
@@ -53,6 +54,15 @@ protected:
     }
     std::string depot(const std::string& relative) const {
         return scratch_.read("depot/" + relative);
+    }
+    void link(const std::string& target, const std::string& at) const {
+        ASSERT_EQ(::symlink(target.c_str(), scratch_.path(at).c_str()), 0) << at;
+    }
+    std::vector<std::string> filesIn(const std::string& directory) const {
+        std::vector<std::string> names;
+        for (const auto& entry : std::filesystem::directory_iterator(scratch_.path(directory)))
+            names.push_back(entry.path().filename());
+        return names;
     }
     std::string depotPath() const { return scratch_.path("depot") + "/"; }
     unsigned modeOf(const std::string& relative) const {
@@ -162,12 +172,15 @@ TEST_F(BinaryDataTransferTest, AFileThatCannotBeOpenedIsStatusFour) {
               1);
 }
 
-TEST_F(BinaryDataTransferTest, AFullDeviceIsStatusFiveAndNamesTheChunk) {
-    ASSERT_EQ(::symlink("/dev/full", scratch_.path("depot/full").c_str()), 0);
+TEST_F(BinaryDataTransferTest, APipeInTheDepotIsStatusFourOrReplaced) {
+    ASSERT_EQ(::mkfifo(scratch_.path("depot/pipe").c_str(), 0600), 0);
     TraceCapture trace;
-    EXPECT_EQ(send("full", {"", "x"}, false), 5);
+    EXPECT_EQ(send("pipe", {"x"}, false), 4);
     EXPECT_EQ(trace.errors("zavrpc"),
-              std::vector<std::string>{"Error writing chunk 1, error number was 1"});
+              std::vector<std::string>{"Failed to open file " + depotPath() +
+                                       "pipe using mode \"a+b\", check permissions"});
+    EXPECT_EQ(send("pipe", {"x"}), 0);
+    EXPECT_EQ(depot("pipe"), "x");
 }
 
 TEST_F(BinaryDataTransferTest, AChunkThatClaimsTooMuchIsStatusFive) {
@@ -180,17 +193,6 @@ TEST_F(BinaryDataTransferTest, AChunkThatClaimsTooMuchIsStatusFive) {
     EXPECT_EQ(trace.errors("zavrpc"),
               std::vector<std::string>{"Error writing chunk 1, error number was 1"});
     EXPECT_EQ(depot("file"), "good");
-}
-
-TEST_F(BinaryDataTransferTest, AModeThatCannotBeSetIsTracedAndNoMore) {
-    // A file of the kernel that can be written, but not removed and not given another mode.
-    ASSERT_EQ(::symlink("/proc/self", scratch_.path("depot/self").c_str()), 0);
-    TraceCapture trace;
-    EXPECT_EQ(send("self/comm", {"renamed"}), 0);
-    EXPECT_EQ(depot("self/comm"), "renamed\n");
-    EXPECT_EQ(trace.errors("zavrpc"),
-              std::vector<std::string>{"Failed to set permissions on file [" + depotPath() +
-                                       "self/comm] to [504]"});
 }
 
 TEST_F(BinaryDataTransferTest, ADirectoryThatCannotBeMadeIsStatusSix) {
@@ -218,16 +220,93 @@ TEST_F(BinaryDataTransferTest, ANameNeverLeadsOutOfTheDepot) {
     EXPECT_FALSE(scratch_.exists("depot/a")) << "refused before any directory is made";
 }
 
-TEST_F(BinaryDataTransferTest, LinksInTheDepotAreFollowedAndDotsThatStayInsideAreHarmless) {
-    scratch_.makeDir("outside");
-    scratch_.makeDir("depot/a");
-    ASSERT_EQ(::symlink(scratch_.path("outside").c_str(), scratch_.path("depot/link").c_str()), 0);
+TEST_F(BinaryDataTransferTest, LinksThatStayInTheDepotAreFollowedAndDotsInsideAreHarmless) {
+    scratch_.makeDir("depot/a/deep");
+    scratch_.write("depot/b/old", "old", 0600);
+    link("a/deep", "depot/link");
+    link("../../b", "depot/a/deep/aside");
+    link("../b/old", "depot/a/file");
     EXPECT_EQ(send("link/x", {"linked"}), 0);
-    EXPECT_EQ(scratch_.read("outside/x"), "linked");
-    EXPECT_EQ(send("a/../b", {"inside"}), 0);
-    EXPECT_EQ(depot("b"), "inside");
+    EXPECT_EQ(depot("a/deep/x"), "linked");
+    EXPECT_EQ(send("link/aside/made/y", {"twice"}), 0);
+    EXPECT_EQ(depot("b/made/y"), "twice");
+    EXPECT_EQ(send("a/file", {" and new"}, false), 0);
+    EXPECT_EQ(depot("b/old"), "old and new");
+    EXPECT_EQ(modeOf("b/old"), 0770U);
+    EXPECT_EQ(send("a/../c", {"inside"}), 0);
+    EXPECT_EQ(depot("c"), "inside");
     EXPECT_EQ(send("..c/...d", {"dots"}), 0);
     EXPECT_EQ(depot("..c/...d"), "dots");
+    EXPECT_EQ(send("a//deep/./z", {"slashes"}), 0);
+    EXPECT_EQ(depot("a/deep/z"), "slashes");
+    EXPECT_EQ(send("new//deeper/./z", {"made"}), 0);
+    EXPECT_EQ(depot("new/deeper/z"), "made");
+}
+
+TEST_F(BinaryDataTransferTest, LinksThatLeadOutOfTheDepotAreStatusSix) {
+    scratch_.write("outside/file", "untouched", 0600);
+    link(scratch_.path("outside"), "depot/absolute");
+    link("../outside", "depot/relative");
+    link(scratch_.path("depot"), "depot/home");  // absolute, even though it stays inside
+    link("absolute", "depot/indirect");
+    for (const char* directory : {"absolute", "relative", "home", "indirect"}) {
+        for (const char* name : {"/file", "/new", "/sub/new", "/install.sh"}) {
+            for (const bool first : {true, false}) {
+                TraceCapture trace;
+                EXPECT_EQ(send(std::string(directory) + name, {"x"}, first), 6)
+                    << directory << name;
+                EXPECT_EQ(trace.errors("zavrpc").size(), 1U);
+                EXPECT_EQ(
+                    trace.errors("zavrpc")[0].rfind(
+                        "Could not create destination directory " + depotPath() + directory, 0),
+                    0U);
+            }
+        }
+    }
+    EXPECT_EQ(filesIn("outside"), std::vector<std::string>{"file"});
+    EXPECT_EQ(scratch_.read("outside/file"), "untouched");
+    EXPECT_FALSE(scratch_.exists("depot/new"));
+}
+
+TEST_F(BinaryDataTransferTest, AFileThatIsALinkOutOfTheDepotIsReplacedButNeverAppendedTo) {
+    const std::string outside = scratch_.write("outside/x.mdl", "a\r\n", 0600);
+    for (const std::string& target : {outside, std::string("../outside/x.mdl")}) {
+        link(target, "depot/x.mdl");
+        TraceCapture trace;
+        EXPECT_EQ(send("x.mdl", {"more"}, false), 6);
+        EXPECT_EQ(trace.errors("zavrpc"),
+                  std::vector<std::string>{"Could not create destination directory " +
+                                           scratch_.path("depot")});
+        EXPECT_EQ(send("x.mdl", {"new\r\n"}), 0);
+        EXPECT_EQ(depot("x.mdl"), "new\n");
+        EXPECT_EQ(scratch_.read("outside/x.mdl"), "a\r\n");
+        ASSERT_EQ(::unlink(scratch_.path("depot/x.mdl").c_str()), 0);
+    }
+}
+
+TEST_F(BinaryDataTransferTest, ALinkToNowhereInsideMakesItsTarget) {
+    link("real", "depot/link");
+    EXPECT_EQ(send("link", {"x"}, false), 0);
+    EXPECT_EQ(depot("real"), "x");
+}
+
+TEST_F(BinaryDataTransferTest, ADepotThatIsGoneIsMadeAgain) {
+    EXPECT_EQ(send("file", {"x"}), 0);
+    std::filesystem::remove_all(scratch_.path("depot"));
+    EXPECT_EQ(send("a/b/file", {"y"}), 0);
+    EXPECT_EQ(depot("a/b/file"), "y");
+    std::filesystem::remove_all(scratch_.path("depot"));
+    EXPECT_EQ(send("file", {"z"}), 0);
+    EXPECT_EQ(depot("file"), "z");
+}
+
+TEST_F(BinaryDataTransferTest, ADepotBehindALinkOfTheAdministratorsIsFine) {
+    scratch_.makeDir("elsewhere");
+    link(scratch_.path("elsewhere"), "place");
+    ::setenv("QVSDEPLOY_AGENTDEPOT", scratch_.path("place").c_str(), 1);
+    Util::_agentDepotDir.clear();
+    EXPECT_EQ(send("a/file", {"x"}), 0);
+    EXPECT_EQ(scratch_.read("elsewhere/a/file"), "x");
 }
 
 TEST_F(BinaryDataTransferTest, AModelFileLosesEveryCarriageReturnBatchAfterBatch) {

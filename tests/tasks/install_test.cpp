@@ -1,6 +1,7 @@
 #include "tasks/install.h"
 
 #include <gmock/gmock.h>
+#include <sys/stat.h>
 
 #include "support/clock.h"
 #include "support/fake_sleep.h"
@@ -474,6 +475,11 @@ TEST_F(CompleteInstall, TakesWhatIsNoNumberForSuccess) {
 TEST_F(CompleteInstall, NeedsTheScriptsResult) {
     EXPECT_EQ(complete(), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,NOTFOUND"}));
     EXPECT_EQ(trace_.count('E', "Unable to read rc.txt for install's return code"), 1);
+}
+
+TEST_F(CompleteInstall, APipeInPlaceOfTheReturnCodeIsNone) {
+    ASSERT_EQ(::mkfifo(home_.dir().path("depot/rc.txt").c_str(), 0600), 0);
+    EXPECT_EQ(complete(), (Outcome{1031, "ZAV1031E", home_.depot() + "rc.txt,NOTFOUND"}));
 }
 
 TEST_F(CompleteInstall, LooksForTheResultOnlyAfterItsSleep) {

@@ -478,6 +478,19 @@ TEST_F(UaConfig, AMetafileThatIsNotInTheDepotIsAFailure) {
     EXPECT_THAT(home_.calls(kConsole), IsEmpty());
 }
 
+TEST_F(UaConfig, APipeInPlaceOfAMetafileOrAScriptIsAFailureAtOnce) {
+    ASSERT_EQ(::mkfifo(home_.dir().path("depot/pipe").c_str(), 0600), 0);
+    Request request;
+    request.metafile = "pipe";
+    EXPECT_EQ(run(request),
+              (Outcome{1014, "ZAV1014E", home_.depot() + "pipe," + home_.home() + "/metafiles"}));
+    request.metafile = "app.mdl";
+    request.scripts = "pipe";
+    EXPECT_EQ(run(request), (Outcome{1015, "ZAV1015E",
+                                     home_.depot() + "pipe," + home_.home() + "/work/scripts"}));
+    EXPECT_THAT(home_.calls(kConsole), IsEmpty());
+}
+
 TEST_F(UaConfig, AMetafileDirectoryThatIsMissingIsAFailure) {
     configure({{"KUMP_META_PATH", home_.home() + "/none"}});
     EXPECT_EQ(run({}),

@@ -241,10 +241,16 @@ TEST_F(WholeFile, AWriteErrorIsReported) {
                             ", error code: Input/output error"));
 }
 
-TEST_F(WholeFile, AFailedCloseIsAFailureOfTheWriter) {
-    EXPECT_EQ(writeFile("/dev/full", "text"), 0);
-    EXPECT_THAT(trace_.errors("zavtasks"),
-                ElementsAre("Failed to close stream for file /dev/full"));
+TEST_F(WholeFile, APipeOrADeviceIsAFileThatCannotBeOpened) {
+    ASSERT_EQ(::mkfifo(scratch_.path("fifo").c_str(), 0600), 0);
+    for (const std::string& special : {scratch_.path("fifo"), std::string("/dev/zero")}) {
+        trace_.clear();
+        EXPECT_EQ(writeFile(special.c_str(), "text"), 0) << special;
+        EXPECT_EQ(narrow(readFile(special.c_str())), "") << special;
+        const std::string why =
+            "Failed to open file " + special + " using mode \"rb\", check permissions";
+        EXPECT_THAT(trace_.errors("zavtasks"), ElementsAre(why, why));
+    }
 }
 
 TEST_F(WholeFile, AFileThatMayNotGrowIsReported) {
