@@ -15,7 +15,7 @@
 #include "base/zavstr.h"
 #include "base/zavtrace.h"
 #include "rpc/depot_tree.h"
-#include "rpc/dos2unix.h"
+#include "rpc/line_ends.h"
 #include "rpc/transfer_path.h"
 #include "util/zavutil.h"
 
