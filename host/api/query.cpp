@@ -5,11 +5,11 @@
 #include <nlohmann/json.hpp>
 
 #include "host/api/call.h"
+#include "host/api/query_document.h"
 #include "host/api/services.h"
 #include "host/api/watched_query.h"
 #include "host/tables/conditions.h"
 #include "host/tables/plugin_facts.h"
-#include "host/tables/table_documents.h"
 
 namespace host {
 namespace {
@@ -38,7 +38,7 @@ Answer postQuery(Services& services, const Call& call) {
     }
     const Query query{table, conditionsOf(call.body(), *table, services.codePage)};
     const WatchedAnswer answer = runWatched(services, query, call.peer());
-    return jsonReply(200, rowsDocument(*table, answer.rows, services.codePage));
+    return jsonReply(200, queryDocument(services, query, answer));
 }
 
 }  // namespace host

@@ -14,6 +14,10 @@ inline constexpr std::string_view kRequestTable = "KAGREQT";
 /// Each queued command that ends, however it ends, publishes one row of this table.
 inline constexpr std::string_view kOutcomeTable = "KAGDYST";
 
+/// What is installed, as the last command of the query, the inventory program, tells it. No rows if
+/// that fails.
+inline constexpr std::string_view kInventoryTable = "KINAGT";
+
 /// In both tables: what the requester calls the command. An outcome carries the one of its request.
 inline constexpr std::string_view kTransidColumn = "TRANSID";
 /// In the request table: the command.
@@ -28,6 +32,8 @@ inline constexpr std::string_view kProductColumn = "PRODUCT";
 inline constexpr std::string_view kContextColumn = "CONTEXT";
 inline constexpr std::string_view kOptionalColumn = "OPTIONAL";
 inline constexpr std::string_view kGetConfiguration = "GETCONFIG";
+/// What the last command of a GETCONFIG writes before this is no part of the configuration.
+inline constexpr std::string_view kConfigurationBegin = "INSTANCE=";
 inline constexpr std::string_view kSetConfiguration = "SETCONFIG";
 
 constexpr bool holdsConfiguration(std::string_view command) {

@@ -21,6 +21,8 @@ using Guards = ManagedHost::Guards;
 
 class TaskDetails : public testing::Test {
 protected:
+    TaskDetails() { home.products({"ux"}, "exit 0"); }
+
     void start(Guards guards) {
         host.emplace(home.path(), Environment{{"QVSDEPLOY_AGENTDEPOT", home.depot()}},
                      std::vector<std::string>{}, guards);
@@ -148,7 +150,6 @@ TEST_F(TaskDetails, ShowTheProcessesOfTheTaskAtWork) {
 }
 
 TEST_F(TaskDetails, TheOutputOfAnInstallThatMayRestartTheHostIsTakenFromTheDepot) {
-    home.products({"ux"}, "exit 0");
     const std::string go = home.files().path("go");
     const std::string install =
         home.files().script("depot/install.sh", "echo installing; echo careful >&2\n" +
