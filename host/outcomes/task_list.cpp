@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "host/commands/ear.h"
+#include "host/outcomes/packed_row.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/row_fields.h"
 
@@ -91,6 +92,26 @@ bool TaskList::Columns::complete() const {
            outcomeRetval != nullptr;
 }
 
+Task TaskList::Entry::whole() const {
+    Task copy = task;
+    copy.reply = unpackRow(reply);
+    for (const std::string& row : outcomes)
+        copy.outcomes.push_back(unpackRow(row));
+    return copy;
+}
+
+Task TaskList::Entry::summary() const {
+    Task copy;
+    copy.id = task.id;
+    copy.asker = task.asker;
+    copy.request = task.request;
+    copy.state = task.state;
+    copy.accepted = task.accepted;
+    copy.started = task.started;
+    copy.ended = task.ended;
+    return copy;
+}
+
 TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, bool seesThrough)
     : seesThrough_(seesThrough), run_(randomName() + '-') {
     const oxa::Table* const requests = tables.find(plugin::kRequestTable);
@@ -158,16 +179,17 @@ TaskList::Calls TaskList::answer(std::uint64_t number, const oxa::Rows& rows, co
     Entry& entry = entries_.at(number);
     Task& task = entry.task;
     std::optional<int> retval = heard.answer;
+    const std::string_view command = task.value(plugin::kCommandColumn);
     if (rows.count() > 0) {
-        task.reply = rowOf(rows, 0);
-        retval = integerField(*columns_.retval, task.reply);
-        entry.transid = textField(*columns_.transid, task.reply);
+        std::string reply(rowOf(rows, 0));
+        retval = integerField(*columns_.retval, reply);
+        entry.transid = textField(*columns_.transid, reply);
+        if (plugin::holdsConfiguration(command) && columns_.context != nullptr) {
+            blank(reply, *columns_.context);
+        }
+        entry.reply = packRow(reply);
     }
     if (!retval && !entry.ended) return {};
-    const std::string_view command = task.value(plugin::kCommandColumn);
-    if (plugin::holdsConfiguration(command) && columns_.context != nullptr) {
-        blank(task.reply, *columns_.context);
-    }
     entry.answered = true;
     if (plugin::runsAtOnce(command)) {
         task.started = task.accepted;
@@ -194,11 +216,11 @@ void TaskList::take(const std::string& row, std::vector<Command> commands) {
         const auto found = awaiting(textField(*columns_.outcomeTransid, row));
         if (found == entries_.end()) return;
         Entry& entry = found->second;
-        entry.task.outcomes.push_back(row);
+        entry.outcomes.push_back(packRow(row));
         append(entry.task.commands, std::move(commands));
         entry.retval = integerField(*columns_.outcomeRetval, row);
-        entry.ended = entry.overAtFirst || entry.retval != plugin::kAccepted ||
-                      entry.task.outcomes.size() > 1;
+        entry.ended =
+            entry.overAtFirst || entry.retval != plugin::kAccepted || entry.outcomes.size() > 1;
         if (!entry.ended) return;
         entry.task.ended = WallClock::now();
         if (!entry.answered) return;  // its thread has yet to come
@@ -259,7 +281,7 @@ TaskList::Calls TaskList::finish(std::uint64_t number, TaskState state) {
         calls.waiters.push_back(std::move(at->second.whenOver));
         at = waiters_.erase(at);
     }
-    if (!calls.waiters.empty()) calls.task = task;
+    if (!calls.waiters.empty()) calls.task = entry.whole();
     entry.weight = weightOf(task.commands);
     weight_ += entry.weight;
     over_.push_back(number);
@@ -291,9 +313,7 @@ std::vector<Task> TaskList::newest(const Filter& filter) const {
         if (filter.state && task.state != *filter.state) continue;
         if (filter.product && task.value(plugin::kProductColumn) != *filter.product) continue;
         if (filter.command && task.value(plugin::kCommandColumn) != *filter.command) continue;
-        Task copy = task;
-        copy.commands.clear();
-        found.push_back(std::move(copy));
+        found.push_back(at->second.summary());
     }
     return found;
 }
@@ -315,7 +335,7 @@ std::optional<Task> TaskList::find(std::string_view name) const {
         const embedded::MutexLock lock(lock_);
         const auto entry = entryOf(name);
         if (entry == entries_.end()) return std::nullopt;
-        found = entry->second.task;
+        found = entry->second.whole();
         atWork = found->state == TaskState::Running;
     }
     if (atWork) append(found->commands, commandsOfPluginThreads());
@@ -328,7 +348,7 @@ std::uint64_t TaskList::awaitEnd(const std::string& id, WhenOver whenOver) {
         const embedded::MutexLock lock(lock_);
         const auto entry = entryOf(id);
         if (entry != entries_.end() && isOver(entry->second.task.state)) {
-            over = entry->second.task;
+            over = entry->second.whole();
         } else {
             waiters_.emplace(++lastWaiter_, Waiter{id, std::move(whenOver)});
             return lastWaiter_;

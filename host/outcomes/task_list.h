@@ -61,7 +61,8 @@ public:
         std::optional<std::string> command{};
         std::size_t limit = kKept;
     };
-    /// The tasks that satisfy all conditions, newest first, without their commands.
+    /// The tasks that satisfy all conditions, newest first, without their rows and
+    /// commands.
     std::vector<Task> newest(const Filter& filter) const;
 
     /// The task with this identifier, or else the newest one with this TRANSID. The commands of a
@@ -86,14 +87,19 @@ private:
         bool complete() const;
     };
     struct Entry {
-        Task task;
-        std::string transid;     ///< as the outcome will have it
+        Task task;                          ///< without its rows
+        std::string reply;                  ///< packed
+        std::vector<std::string> outcomes;  ///< packed
+        std::string transid;                ///< as the outcome will have it
         std::uint64_t turn = 0;  ///< place in the executor's queue; 0: not accepted, or ran at once
         bool answered = false;
         bool overAtFirst = true;  ///< its first outcome with RETVAL 0 is its last
         int retval = 0;           ///< of its last outcome
         bool ended = false;       ///< its last outcome has come
         std::size_t weight = 0;   ///< bytes of its commands, once it is over
+
+        Task whole() const;
+        Task summary() const;  ///< without rows and commands
     };
     struct Waiter {
         std::string id;

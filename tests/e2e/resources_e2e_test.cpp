@@ -79,8 +79,9 @@ TEST(Resources, ManyRequestsSubscriptionsAndTasksLeaveNothingBehind) {
     ScriptHome home;
     home.agentScript("test $product = ux");
     ManagedHost host(home.path());
-    // What is made once and kept: threads of the pool, buffers, the string library's locale.
-    refuseRequests(host, 200 / kShare);
+    // What is made once and kept: threads of the pool, buffers, the string library's locale, and as
+    // many tasks as the host remembers.
+    refuseRequests(host, 1200 / kShare);
     openAndDropSubscriptions(host, 100 / kShare);
     startAgents(host, 2);
     ASSERT_TRUE(eventually([&] {
