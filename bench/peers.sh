@@ -58,10 +58,11 @@ answers() { (exec 3<>"/dev/tcp/127.0.0.1/$1"); }
 # process and `host_socket`.
 start_host() {
     mkdir -p "$scratch"/{depot,home/{bin,config,logs,tmp}}
-    if [ ! -e "$scratch/home/bin/TovrinAgent" ]; then
-        printf '#!/bin/sh\nexit 0\n' >"$scratch/home/bin/TovrinAgent"
-        chmod +x "$scratch/home/bin/TovrinAgent"
-    fi
+    for program in TovrinAgent cinfo uninstall.sh; do
+        [ ! -e "$scratch/home/bin/$program" ] || continue
+        printf '#!/bin/sh\nexit 0\n' >"$scratch/home/bin/$program"
+        chmod +x "$scratch/home/bin/$program"
+    done
     host_socket=$scratch/host.sock
     QVSDEPLOY_AGENTDEPOT=$scratch/depot start "$1/bin/zavhost" --home "$scratch/home" \
         --socket "$host_socket"

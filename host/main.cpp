@@ -73,18 +73,21 @@ int check(const HostOptions& options) {
     return hasError(results) ? 1 : 0;
 }
 
-/// Says on standard error what the checks find wrong. Throws StartError if that is an error.
+/// Throws StartError, which names them all in one line, if the checks find errors. Otherwise says
+/// on standard error what they warn of.
 void refuseUnfitHome(const HostOptions& options) {
     CheckSubject subject(options, environmentVariable);
-    const std::vector<CheckResult> results = runChecks(subject);
-    for (const CheckResult& result : results) {
-        if (result.finding.verdict == Verdict::Ok) continue;
-        std::fprintf(stderr, "zavhost: %s: %s: %s\n", nameOf(result.finding.verdict),
-                     result.check.c_str(), wordsOf(result.finding).c_str());
+    std::string errors;
+    std::string warnings;
+    for (const CheckResult& result : runChecks(subject)) {
+        const std::string words = result.check + ": " + wordsOf(result.finding);
+        if (result.finding.verdict == Verdict::Error) errors += "; " + words;
+        if (result.finding.verdict == Verdict::Warning) {
+            warnings += "zavhost: warning: " + words + "\n";
+        }
     }
-    if (hasError(results)) {
-        throw StartError("not started, because of the errors above (--check lists all checks)");
-    }
+    if (!errors.empty()) throw StartError("not started (see --check)" + errors);
+    std::fputs(warnings.c_str(), stderr);
 }
 
 /// What a guarded host does before anything of the home is used. Returns the home's lock.

@@ -50,11 +50,15 @@ TEST(BadInput, AHostThatCannotStartSaysWhyInOneLineAndEndsWithOne) {
         {"a home that is a file", {"--home", noLibrary, "--socket", socket}},
         {"a plug-in that is none",
          {"--home", home.path(), "--socket", socket, "--plugin", noLibrary}},
+        {"a plug-in that is none, unguarded",
+         {"--unguarded", "--home", home.path(), "--socket", socket, "--plugin", noLibrary}},
         {"a plug-in that does not exist",
          {"--home", home.path(), "--socket", socket, "--plugin", "/nonexistent.so"}},
         {"a library that is no plug-in",
          {"--home", home.path(), "--socket", socket, "--plugin",
           ZAV_BUILD_DIR "/lib/libzavplatform.so"}},
+        {"a socket that cannot be made, unguarded",
+         {"--unguarded", "--home", home.path(), "--socket", "/nonexistent/dir/socket"}},
         {"a socket that cannot be made",
          {"--home", home.path(), "--socket", "/nonexistent/dir/socket"}},
         {"a socket path that is too long",
@@ -75,8 +79,8 @@ TEST(BadInput, AHostThatCannotStartSaysWhyInOneLineAndEndsWithOne) {
 TEST(BadInput, ALiveSocketIsLeftAloneAndAStaleOneReplaced) {
     ScriptHome home;
     ManagedHost host(home.path());
-    const ProgramResult second =
-        runProgram({zavhostPath(), "--home", home.path(), "--socket", host.socket()});
+    const ProgramResult second = runProgram(
+        {zavhostPath(), "--unguarded", "--home", home.path(), "--socket", host.socket()});
     EXPECT_EQ(second.status, 1);
     EXPECT_EQ(host.zavctl({"status"}).status, 0) << "the first host still serves";
 

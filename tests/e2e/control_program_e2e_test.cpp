@@ -211,7 +211,7 @@ TEST(ControlProgram, FindsTheHostByTheEnvironmentAsTheHostDoes) {
         {byRuntime, home.files().path("runtime/zavhost.sock")},
         {byName, home.files().path("named")}};
     for (const auto& [environment, socket] : cases) {
-        Program host({zavhostPath(), "--home", home.path()}, "", environment);
+        Program host({zavhostPath(), "--unguarded", "--home", home.path()}, "", environment);
         ASSERT_TRUE(host.awaitOutput("ready: " + socket + "\n", std::chrono::seconds(20)))
             << host.err();
         EXPECT_EQ(runProgram({zavctlPath(), "status"}, "", environment).status, 0);

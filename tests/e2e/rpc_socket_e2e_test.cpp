@@ -178,8 +178,9 @@ TEST_F(RpcSocket, BelongsToItsOwnerAlone) {
 TEST_F(RpcSocket, ThatIsServedIsLeftAloneAndIsGoneWithItsHost) {
     start();
     const std::string path = rpcPath();
-    const ProgramResult second = runProgram({zavhostPath(), "--home", home_.path(), "--socket",
-                                             files_.path("other.sock"), "--rpc-socket", path});
+    const ProgramResult second =
+        runProgram({zavhostPath(), "--unguarded", "--home", home_.path(), "--socket",
+                    files_.path("other.sock"), "--rpc-socket", path});
     EXPECT_EQ(second.status, 1);
     EXPECT_THAT(second.err, testing::HasSubstr(path));
     EXPECT_EQ(push(files_.write("file", "x")).status, 0) << "the first host still serves";
@@ -260,8 +261,8 @@ TEST_F(RpcSocket, APortThatIsTakenIsSaid) {
     const std::uint16_t port = freePort();
     start({"--rpc-port", std::to_string(port)});
     const ProgramResult second =
-        runProgram({zavhostPath(), "--home", home_.path(), "--socket", files_.path("other.sock"),
-                    "--rpc-port", std::to_string(port)});
+        runProgram({zavhostPath(), "--unguarded", "--home", home_.path(), "--socket",
+                    files_.path("other.sock"), "--rpc-port", std::to_string(port)});
     EXPECT_EQ(second.status, 1);
     EXPECT_THAT(second.err,
                 testing::HasSubstr("zavhost: cannot listen on the loopback port " +

@@ -32,8 +32,10 @@ fail() {
 
 # --- a host -------------------------------------------------------------------------------------
 mkdir -p "$scratch/depot" "$scratch/home/bin" "$scratch/home/config" "$scratch/home/logs"
-printf '#!/bin/sh\nexit 0\n' >"$scratch/home/bin/TovrinAgent"
-chmod +x "$scratch/home/bin/TovrinAgent"
+for program in TovrinAgent cinfo uninstall.sh; do
+    printf '#!/bin/sh\nexit 0\n' >"$scratch/home/bin/$program"
+    chmod +x "$scratch/home/bin/$program"
+done
 touch "$scratch/host.log"
 port=$("$python" -c 'import socket; print(socket.create_server(("127.0.0.1", 0)).getsockname()[1])')
 QVSDEPLOY_AGENTDEPOT="$scratch/depot" "$build/bin/zavhost" --home "$scratch/home" \
