@@ -54,6 +54,15 @@ await() {
 
 answers() { (exec 3<>"/dev/tcp/127.0.0.1/$1"); }
 
+# start_unguarded_host BUILD: starts a second host without guards beside that of start_host, on the same
+# home; sets `unguarded_socket`.
+start_unguarded_host() {
+    unguarded_socket=$scratch/unguarded.sock
+    QVSDEPLOY_AGENTDEPOT=$scratch/depot start "$1/bin/zavhost" --home "$scratch/home" \
+        --socket "$unguarded_socket" --unguarded
+    await grep -q "ready: $unguarded_socket" "$scratch/log"
+}
+
 # start_host BUILD: starts a host with the home and depot in the scratch folder; sets `host` to its
 # process and `host_socket`.
 start_host() {

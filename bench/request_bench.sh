@@ -43,6 +43,7 @@ printf 'os=Linux cArch=lx8266\n' >"$home/bin/dynarch.shl"
 
 # --- the servers --------------------------------------------------------------------------------
 start_host "$build"
+start_unguarded_host "$build"
 
 count_children() { # prints how many a GETCONFIG runs
     local child
@@ -84,6 +85,7 @@ if start_sshd; then
 fi
 
 await_quiet
-"$build/bin/request_bench" --host "$host_socket" --script "$script" --expect INSTANCE=bench \
+"$build/bin/request_bench" --host "$host_socket" --unguarded "$unguarded_socket" \
+    --script "$script" --expect INSTANCE=bench \
     --rounds "$rounds" ${out:+--out "$out"} "${ways[@]}"
 write_quiet request_bench

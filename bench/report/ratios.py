@@ -96,6 +96,12 @@ class Table:
                           [self._ratio(f"request/host/{query}/{way}", f"request/{peer}")
                            for way in ("anew", "kept")])
 
+        for query, title in (("getconfig", "GETCONFIG"), ("inventory", "query of KINAGT"),
+                             ("refused", "request that the plug-in refuses")):
+            yield Row(f"{title}, connection new / kept", "the same without guards",
+                      [self._ratio(f"request/host/{query}/{way}", f"request/unguarded/{query}/{way}")
+                       for way in ("anew", "kept")], 1.05)
+
     def _conversions(self):
         kinds = [("utf8_ascii", "ASCII", "UTF-8"), ("utf8_mixed", "mixed text", "UTF-8"),
                  ("utf8_scripts", "text of many scripts", "UTF-8"),

@@ -2,12 +2,13 @@
 // which run the same script. They take turns, so that whatever else the machine does meets all of
 // them alike. See request_bench.sh, which starts the servers.
 //
-//   request_bench --host SOCKET [--nrpe PORT] [--zabbix PORT] [--program NAME=COMMAND-LINE]...
+//   request_bench --host SOCKET [--unguarded SOCKET] [--nrpe PORT] [--zabbix PORT] [--program
+//   NAME=COMMAND-LINE]...
 //                 --script PATH --expect TEXT [--rounds N] [--out FILE]
 //
-// TEXT is what the script prints, or a part of it; every answer of a command must hold it. A
-// command line is split at blanks. The medians are printed in microseconds; FILE takes them in
-// seconds.
+// The second host has its guards switched off. TEXT is what the script prints, or a part of it;
+// every answer of a command must hold it. A command line is split at blanks. The medians are
+// printed in microseconds; FILE takes them in seconds.
 
 #include <CLI/CLI.hpp>
 #include <cstdint>
@@ -25,6 +26,7 @@ using request::Way;
 
 struct Options {
     std::string host;
+    std::string unguarded;
     std::uint16_t nrpe = 0;
     std::uint16_t zabbix = 0;
     std::vector<std::string> programs;
@@ -41,19 +43,24 @@ std::string requestQuery(const std::string& command) {
            R"( {"column": "TRANSID", "op": "=", "value": "bench"}]})";
 }
 
-std::vector<Way> waysOf(const Options& options) {
-    std::vector<Way> ways;
+void addHost(std::vector<Way>& ways, const std::string& name, const std::string& socket,
+             const std::string& expected) {
     for (const bool keep : {true, false}) {
         const std::string suffix = keep ? "/kept" : "/anew";
-        ways.push_back({"host/getconfig" + suffix,
-                        request::hostQuery(options.host, requestQuery("GETCONFIG"), keep),
-                        options.expected});
-        ways.push_back({"host/inventory" + suffix,
-                        request::hostQuery(options.host, R"({"table": "KINAGT"})", keep),
-                        options.expected});
-        ways.push_back({"host/refused" + suffix,
-                        request::hostQuery(options.host, requestQuery("NOSUCH"), keep),
-                        "ZAV1006E"});
+        ways.push_back({name + "/getconfig" + suffix,
+                        request::hostQuery(socket, requestQuery("GETCONFIG"), keep), expected});
+        ways.push_back({name + "/inventory" + suffix,
+                        request::hostQuery(socket, R"({"table": "KINAGT"})", keep), expected});
+        ways.push_back({name + "/refused" + suffix,
+                        request::hostQuery(socket, requestQuery("NOSUCH"), keep), "ZAV1006E"});
+    }
+}
+
+std::vector<Way> waysOf(const Options& options) {
+    std::vector<Way> ways;
+    addHost(ways, "host", options.host, options.expected);
+    if (!options.unguarded.empty()) {
+        addHost(ways, "unguarded", options.unguarded, options.expected);
     }
     if (options.nrpe != 0)
         ways.push_back({"nrpe", request::nrpe(options.nrpe, "script"), options.expected});
@@ -72,6 +79,7 @@ int main(int argc, char** argv) {
     Options options;
     CLI::App app;
     app.add_option("--host", options.host)->required();
+    app.add_option("--unguarded", options.unguarded);
     app.add_option("--nrpe", options.nrpe);
     app.add_option("--zabbix", options.zabbix);
     app.add_option("--program", options.programs);
