@@ -81,6 +81,7 @@ measure_output() {
 step rest
 bench/rest_bench.sh --build "$build" --out "$out"
 measure command --benchmark_repetitions=5
+measure heard_command --benchmark_repetitions=5
 measure_output
 for name in conversions strings runas; do measure_ratios "$name"; done
 for name in property inventory map queue subscription text_growth; do measure_growth "$name"; done

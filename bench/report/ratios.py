@@ -79,6 +79,12 @@ class Table:
         yield Row("running it with 1 GiB of touched heap, median", "running it with a small heap",
                   [self._ratio("spawn/1GiB:run", "spawn/small:run")], 1.2)
 
+        for output, title, limit in (("line", "a one-line script", 1.02),
+                                     ("64KiB", "a script that prints 64 KiB", None),
+                                     ("4MiB", "a script that prints 4 MiB", None)):
+            yield Row(f"{title} that the host hears, median", "the same unheard",
+                      [self._figures.get(f"heard/{output}:ratio")], limit)
+
     def _requests(self):
         children = self._figures.get("request/children", 0)
         share = 1 / children if children else 1

@@ -57,13 +57,16 @@ private:
 
 }  // namespace
 
+std::vector<ras1::HeardUnit> heardUnits() {
+    return {{trace::kRunnerUnit, RAS1_DETAIL | RAS1_ERROR},
+            {trace::kProcessUnit, RAS1_DETAIL | RAS1_ERROR},
+            {trace::kAnswerUnit, RAS1_DETAIL},
+            {trace::kInventoryUnit, RAS1_ERROR}};
+}
+
 void hearCommands() {
     static Ear& ear = *new Ear;
-    static const ras1::Listening& listening =
-        *new ras1::Listening(ear, {{trace::kRunnerUnit, RAS1_DETAIL | RAS1_ERROR},
-                                   {trace::kProcessUnit, RAS1_DETAIL | RAS1_ERROR},
-                                   {trace::kAnswerUnit, RAS1_DETAIL},
-                                   {trace::kInventoryUnit, RAS1_ERROR}});
+    static const ras1::Listening& listening = *new ras1::Listening(ear, heardUnits());
     (void)listening;
 }
 

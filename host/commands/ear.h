@@ -8,6 +8,9 @@
 
 namespace host {
 
+/// The units whose lines a Recorder wants.
+std::vector<ras1::HeardUnit> heardUnits();
+
 /// Begins to hear the commands of this process, and never ends. May be called again. Throws
 /// std::logic_error when somebody else listens to the trace.
 void hearCommands();

@@ -12,6 +12,7 @@
 
 #include "embedded/oxa_host.h"
 #include "embedded/ras1_listener.h"
+#include "host/commands/ear.h"
 #include "host/process/plugin_loader.h"
 #include "support/fake_sleep.h"
 #include "support/host/script_home.h"
@@ -80,10 +81,7 @@ TEST(TraceTexts, AreThoseOfThePlugin) {
     const host::Plugin plugin{std::string(ZAV_BUILD_DIR "/lib/libzavmgmt.so")};
     plugin.initialize();
     Lines lines;
-    const ras1::Listening listening(lines, {{trace::kRunnerUnit, RAS1_DETAIL | RAS1_ERROR},
-                                            {trace::kProcessUnit, RAS1_DETAIL | RAS1_ERROR},
-                                            {trace::kAnswerUnit, RAS1_DETAIL},
-                                            {trace::kInventoryUnit, RAS1_ERROR}});
+    const ras1::Listening listening(lines, host::heardUnits());
     getConfiguration();  // there is no inventory program
     const std::string translator = home.products({"ux"}, "echo out; echo err >&2");
     getConfiguration();
