@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -240,15 +241,27 @@ TEST(Log, IsNotInheritedByPrograms) {
     EXPECT_EQ(scratch.read("out").find(scratch.path("log")), std::string::npos);
 }
 
+/// Puts `descriptor` in the place of standard error and of every duplicate of it.
+void becomeStandardError(int descriptor) {
+    const auto target = [](int fd) {
+        char name[PATH_MAX] = "";
+        const std::string link = "/proc/self/fd/" + std::to_string(fd);
+        return ::readlink(link.c_str(), name, sizeof name - 1) > 0 ? std::string(name) : "";
+    };
+    const std::string before = target(STDERR_FILENO);
+    for (int fd = STDERR_FILENO; fd < 256; ++fd) {
+        if (fd != descriptor && target(fd) == before) ::dup3(descriptor, fd, O_CLOEXEC);
+    }
+}
+
 TEST(Log, APipeWithoutAReaderCostsTheProcessNothing) {
-    const ScratchDir scratch;
-    const std::string fifo = scratch.path("fifo");
-    ASSERT_EQ(::mkfifo(fifo.c_str(), 0600), 0);
     const int status = inChild([&] {
         ::signal(SIGPIPE, SIG_DFL);
-        const int reader = ::open(fifo.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-        ras1::configure("ALL", fifo);
-        ::close(reader);
+        int ends[2];
+        if (::pipe2(ends, O_CLOEXEC) != 0) ::_exit(2);
+        ::close(ends[0]);
+        becomeStandardError(ends[1]);
+        ras1::configure("ALL", "");
         RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "nobody reads this");
         sigset_t left;
         ::sigpending(&left);
@@ -256,6 +269,46 @@ TEST(Log, APipeWithoutAReaderCostsTheProcessNothing) {
     });
     EXPECT_TRUE(WIFEXITED(status));
     EXPECT_EQ(WEXITSTATUS(status), 0);
+}
+
+/// What reaches standard error when the log is to be `path`.
+std::string standardErrorWithLog(const ScratchDir& scratch, const std::string& path) {
+    const std::string errors = scratch.write("errors", "");
+    EXPECT_EQ(inChild([&] {
+                  becomeStandardError(::open(errors.c_str(), O_WRONLY | O_APPEND | O_CLOEXEC));
+                  ras1::configure("ALL", path);
+                  RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "written");
+                  ::_exit(0);
+              }),
+              0);
+    return scratch.read("errors");
+}
+
+TEST(Log, ALinkIsNotFollowed) {
+    const ScratchDir scratch;
+    const std::string target = scratch.write("target", "untouched");
+    ASSERT_EQ(::symlink(target.c_str(), scratch.path("log").c_str()), 0);
+    EXPECT_THAT(standardErrorWithLog(scratch, scratch.path("log")),
+                MatchesRegex(".* doWork: written\n"));
+    EXPECT_EQ(scratch.read("target"), "untouched");
+}
+
+TEST(Log, APipeOrADeviceIsNoLogAndIsNotWaitedFor) {
+    const ScratchDir scratch;
+    ASSERT_EQ(::mkfifo(scratch.path("pipe").c_str(), 0600), 0);
+    for (const std::string& path : {scratch.path("pipe"), std::string("/dev/zero")}) {
+        EXPECT_THAT(standardErrorWithLog(scratch, path), MatchesRegex(".* doWork: written\n"))
+            << path;
+    }
+    const int reader = ::open(scratch.path("pipe").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    EXPECT_THAT(standardErrorWithLog(scratch, scratch.path("pipe")),
+                MatchesRegex(".* doWork: written\n"));
+    ::close(reader);
+}
+
+TEST(Log, TheNullDeviceMeansNoLog) {
+    const ScratchDir scratch;
+    EXPECT_EQ(standardErrorWithLog(scratch, "/dev/null"), "");
 }
 
 }  // namespace

@@ -40,9 +40,11 @@ TraceLine parseLine(const std::string& line) {
 
 TraceCapture::TraceCapture(const std::string& selection) {
     ras1::configure(selection, scratch_.path("trace.log"));
+    ras1::showSecrets(true);  // texts are compared as they were traced
 }
 
 TraceCapture::~TraceCapture() {
+    ras1::showSecrets(false);
     ras1::configureFromEnvironment();
 }
 

@@ -11,6 +11,7 @@
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
+#include <sys/sysmacros.h>
 #include <sys/uio.h>
 #include <unistd.h>
 
@@ -27,11 +28,16 @@
 
 #include "embedded/ras1_control.h"
 #include "ras1/ears.h"
+#include "ras1/secrets.h"
 #include "ras1/selection.h"
 
 std::atomic<unsigned> RAS1_Generation{1};
 
 namespace {
+
+// The null device's numbers, which are the same on every Linux.
+constexpr unsigned kMemoryMajor = 1;
+constexpr unsigned kNullMinor = 3;
 
 /// Duplicates a descriptor to a number above those of the standard streams; -1 on failure. If the
 /// process closes descriptor 2 and a file or pipe gets that number, traces must not end up there.
@@ -40,9 +46,25 @@ int ownDescriptor(int descriptor) {
     return ::fcntl(descriptor, F_DUPFD_CLOEXEC, 3);
 }
 
+/// A regular file, or the null device, which many choose for no log at all.
+bool canBeLog(int descriptor) {
+    struct stat found {};
+    if (::fstat(descriptor, &found) != 0) return false;
+    return S_ISREG(found.st_mode) ||
+           (S_ISCHR(found.st_mode) && found.st_rdev == ::makedev(kMemoryMajor, kNullMinor));
+}
+
+/// Follows no link in the log's place and waits for no pipe: who may write to the directory must
+/// not choose what is appended to.
 int openLog(const std::string& path) {
     if (path.empty()) return -1;
-    const int opened = ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0640);
+    constexpr int kFlags =
+        O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY;
+    const int opened = ::open(path.c_str(), kFlags, 0640);
+    if (opened != -1 && !canBeLog(opened)) {
+        ::close(opened);
+        return -1;
+    }
     if (opened == -1 || opened > STDERR_FILENO) return opened;
     const int moved = ownDescriptor(opened);
     ::close(opened);
@@ -77,6 +99,8 @@ public:
 
     const ras1::Selection& selection() const { return *selection_.load(std::memory_order_acquire); }
     int descriptor() const { return lines_.load(std::memory_order_relaxed); }
+    void showSecrets(bool shown) { secretsShown_.store(shown, std::memory_order_relaxed); }
+    bool showsSecrets() const { return secretsShown_.load(std::memory_order_relaxed); }
     bool readerMayGo() const { return readerMayGo_.load(std::memory_order_relaxed); }
 
 private:
@@ -102,7 +126,8 @@ private:
     std::vector<std::unique_ptr<const ras1::Selection>> selections_;
     std::atomic<const ras1::Selection*> selection_{nullptr};
     const int standardError_ = ownDescriptor(STDERR_FILENO);
-    std::atomic<int> lines_{-1};            ///< where lines go
+    std::atomic<int> lines_{-1};  ///< where lines go
+    std::atomic<bool> secretsShown_{false};
     std::atomic<bool> readerMayGo_{false};  ///< lines go to a pipe or a socket
 };
 
@@ -300,8 +325,8 @@ void writeLine(const RAS1_BLOCK& block, char letter, int line, const char* text,
     errno = savedErrno;
 }
 
-void writeText(const RAS1_BLOCK& block, char letter, int line, const char* text,
-               std::size_t length) {
+void writeEscaped(const RAS1_BLOCK& block, char letter, int line, const char* text,
+                  std::size_t length) {
     while (length > 0 && text[length - 1] == '\n')
         --length;
     if (!needsEscapes(text, length)) {
@@ -311,6 +336,23 @@ void writeText(const RAS1_BLOCK& block, char letter, int line, const char* text,
     Scratch safe(length * 2);
     if (safe.get() == nullptr) return;
     writeLine(block, letter, line, safe.get(), putEscaped(safe.get(), text, length));
+}
+
+void writeText(const RAS1_BLOCK& block, char letter, int line, const char* text,
+               std::size_t length) {
+    if (facility().showsSecrets()) {
+        writeEscaped(block, letter, line, text, length);
+        return;
+    }
+    const ras1::Masking masking(block.unit->name, text, length);
+    if (!masking.changes()) {
+        writeEscaped(block, letter, line, text, length);
+        return;
+    }
+    Scratch masked(masking.length());
+    if (masked.get() == nullptr) return;
+    masking.put(masked.get());
+    writeEscaped(block, letter, line, masked.get(), masking.length());
 }
 
 void tell(const RAS1_BLOCK& block, unsigned level, const char* text, std::size_t length) {
@@ -387,6 +429,10 @@ void configure(const std::string& selection, const std::string& logPath) {
 void configureFromEnvironment() {
     facility().configureFromEnvironment();
     ++RAS1_Generation;
+}
+
+void showSecrets(bool shown) {
+    facility().showSecrets(shown);
 }
 
 }  // namespace ras1

@@ -8,12 +8,18 @@ namespace ras1 {
 /// Replaces the settings that KBB_RAS1 and KBB_RAS1_LOG gave at the start. `selection` has the form
 /// of KBB_RAS1: "ALL", "ERROR", or a level followed by groups such as "ERROR (UNIT:zavtasks ALL)".
 /// A group selects units by the beginning of their names. Lines are appended to the file `logPath`;
-/// they go to standard error if it is empty or the file cannot be opened. Does not change the
-/// environment. To be called by one thread at a time; lines that other threads write meanwhile go
-/// to the old or the new place.
+/// they go to standard error if it is empty or the file cannot be opened. What is no regular file
+/// and not the null device, or a symbolic link, is not opened. Does not change the environment. To
+/// be called by one thread at a time; lines that other threads write meanwhile go to the old or the
+/// new place.
 void configure(const std::string& selection, const std::string& logPath);
 
 /// Returns to the settings of the environment as it is now.
 void configureFromEnvironment();
+
+/// Whether the log shows secrets as they are; off at the start. Off, it has "***" in the place of
+/// configurations that are set or read, and of what follows "password", "passwd", "pwd", "secret",
+/// "token", "apikey" or "key" and "=" or ":". Listeners always hear the true text. Any thread.
+void showSecrets(bool shown);
 
 }  // namespace ras1
