@@ -12,6 +12,7 @@
 
 #include "embedded/ncs_host.h"
 #include "embedded/oxa_host.h"
+#include "embedded/ras1_control.h"
 #include "host/api/api.h"
 #include "host/api/routes.h"
 #include "host/api/services.h"
@@ -99,6 +100,7 @@ HomeLock guardStart(const HostOptions& options) {
 }
 
 void run(const HostOptions& options) {
+    ras1::showSecrets(options.traceSecrets || !options.guarded);
     // Unguarded hosts may share a home, as processes that load the plug-in themselves may.
     std::optional<HomeLock> homeLock;
     chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);

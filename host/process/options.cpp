@@ -29,6 +29,7 @@ struct Typed {
     std::optional<std::string> state;
     std::optional<std::string> taskTimeout;
     bool unguarded = false;
+    bool traceSecrets = false;
     bool check = false;
 };
 
@@ -61,6 +62,8 @@ void declare(CLI::App& app, Typed& typed) {
     app.add_option("--task-timeout", typed.taskTimeout,
                    "How long one command of a task may run; else TIMEOUT says so, else 300")
         ->type_name("SECONDS");
+    app.add_flag("--trace-secrets", typed.traceSecrets,
+                 "Show passwords and configurations in the trace log as they are");
     app.add_flag("--check", typed.check,
                  "Check the home and the machine, print what was found, and end; the status is 1 "
                  "if the host would refuse to start");
@@ -177,6 +180,7 @@ std::optional<HostOptions> readOptions(int argc, const char* const* argv,
     if (!typed) return std::nullopt;
     HostOptions options;
     options.guarded = !typed->unguarded;
+    options.traceSecrets = typed->traceSecrets;
     options.check = typed->check;
     options.originNode = typed->originNode;
     options.plugin = typed->plugin;

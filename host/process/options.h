@@ -19,6 +19,7 @@ struct HostOptions {
     std::optional<std::string> plugin;      ///< absent: searched for
     std::optional<int> taskTimeout;         ///< in seconds; absent: the variable TIMEOUT decides
     bool guarded = true;                    ///< false: the plug-in's own behaviour is seen in full
+    bool traceSecrets = false;              ///< the trace log shows secrets as they are
     bool check = false;                     ///< look whether the host could start, and end
 };
 

@@ -38,9 +38,10 @@ protected:
 };
 
 TEST_F(Options, AllAreTaken) {
-    const auto options = read({"--home", home.c_str(), "--socket", "/s", "--rpc-socket", "/r",
-                               "--rpc-port", "135", "--origin-node", "n", "--plugin", "p.so",
-                               "--state", "/d", "--task-timeout", "60", "--check", "--unguarded"});
+    const auto options =
+        read({"--home", home.c_str(), "--socket", "/s", "--rpc-socket", "/r", "--rpc-port", "135",
+              "--origin-node", "n", "--plugin", "p.so", "--state", "/d", "--task-timeout", "60",
+              "--check", "--unguarded", "--trace-secrets"});
     ASSERT_TRUE(options);
     EXPECT_EQ(options->home, home);
     EXPECT_EQ(options->socket, "/s");
@@ -51,6 +52,7 @@ TEST_F(Options, AllAreTaken) {
     EXPECT_EQ(options->state, "/d");
     EXPECT_EQ(options->taskTimeout, 60);
     EXPECT_TRUE(options->check);
+    EXPECT_TRUE(options->traceSecrets);
     EXPECT_FALSE(options->guarded);
 }
 
@@ -58,6 +60,7 @@ TEST_F(Options, WithoutThemTheHostIsGuardedAndRuns) {
     environment["TOVRINHOME"] = home;
     EXPECT_TRUE(read({})->guarded);
     EXPECT_FALSE(read({})->check);
+    EXPECT_FALSE(read({})->traceSecrets);
     EXPECT_FALSE(read({})->taskTimeout);
     EXPECT_FALSE(read({})->rpcPort);
 }
