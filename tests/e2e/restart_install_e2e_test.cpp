@@ -35,12 +35,17 @@ protected:
             home_.path(), Environment{{"QVSDEPLOY_AGENTDEPOT", home_.path() + "/depot"}});
     }
 
-    /// An installer that kills the host first and then ends with `code`.
+    /// An installer that waits for letItRun(), kills the host then and ends with `code`.
     std::string installer(const std::string& name, const ManagedHost& host, int code) const {
-        return files().script(name, "kill -9 " + std::to_string(host.pid()) +
+        return files().script(name, "until [ -e '" + files().path("go") +
+                                        "' ]; do sleep 0.05; done\nkill -9 " +
+                                        std::to_string(host.pid()) +
                                         "\nsleep 1\necho installed\necho trouble >&2\nexit " +
                                         std::to_string(code) + "\n");
     }
+
+    /// The host is to be killed when it has told of the first outcome, not before.
+    void letItRun() const { files().write("go", ""); }
 
     /// Sends the install, waits for its first outcome and for the host to be killed by it.
     void installAndAwaitDeath(ManagedHost& host, const std::string& command) const {
@@ -51,6 +56,7 @@ protected:
         EXPECT_EQ(document["reply"]["RETVAL"], 0);
         ASSERT_EQ(document["events"].size(), 1U);
         EXPECT_EQ(document["events"][0]["RETVAL"], 0) << "success is reported before it has run";
+        letItRun();
         EXPECT_EQ(host.program().wait(std::chrono::seconds(30)).status, 128 + SIGKILL);
     }
 
@@ -77,8 +83,14 @@ TEST_F(RestartInstallTest, TheRealOutcomeIsFetchedFromTheHostThatCameBack) {
 TEST_F(RestartInstallTest, CompleteFollowsAFailingInstallToItsEndByItself) {
     const auto host = startHost();
     const std::string command = installer("installer", *host, 65);
-    const auto waiting = host->startZavctl(
-        {"install", "ux", "010000000", "--restart", "--complete", "--", "/bin/sh", command});
+    const auto watching = host->startZavctl({"events", "--transid", "it", "--count", "1"});
+    ASSERT_TRUE(eventually([&host] {
+        return json::parse(host->zavctl({"--json", "status"}).out)["subscriptions"] == 1;
+    }));
+    const auto waiting = host->startZavctl({"install", "ux", "010000000", "--restart", "--complete",
+                                            "--transid", "it", "--", "/bin/sh", command});
+    EXPECT_EQ(watching->wait(std::chrono::seconds(40)).status, 0);
+    letItRun();  // both have been told of the outcome by the same turn of the host's loop
     EXPECT_EQ(host->program().wait(std::chrono::seconds(40)).status, 128 + SIGKILL);
     host->start();
     const ProgramResult result = waiting->wait(std::chrono::seconds(60));
