@@ -49,9 +49,11 @@ std::optional<Json> inventoryWarning(const Heard& heard, const CodePage& codePag
     if (!program.failed() && !heard.noInventory) return std::nullopt;
     const std::string reason =
         program.failed() ? failureOf(program, codePage) : "it did not print an inventory";
-    return Json{
-        {"text", "what is installed is not known, because the inventory program failed: " + reason},
-        {"details", {{"commands", Json::array({commandObject(program, codePage)})}}}};
+    Json warning = {
+        {"text",
+         "what is installed is not known, because the inventory program failed: " + reason}};
+    warning.update(commandObject(program, codePage));
+    return warning;
 }
 
 void add(std::string& document, const char* member, const Json& value) {

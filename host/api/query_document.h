@@ -15,7 +15,8 @@ namespace host {
 ///   "full": [{"row", "column", "text", "complete"}]   what does not fit into a column; not
 ///   complete
 ///                                                     if even this is only a part of it
-///   "warnings": [{"text", "details": {"commands"}}]   why there may be less than there should be
+///   "warnings": [{"text", ...}]                       why there may be less than there should be;
+///                                                     after the text the members of the command
 std::string queryDocument(const Services& services, const Query& query,
                           const WatchedAnswer& answer);
 

@@ -93,6 +93,10 @@ TEST(PluginFacts, NameTablesAndColumnsThatThereAre) {
     expectColumn(plugin::kRequestTable, plugin::kTransidColumn, OXA_TYPE_CHARACTER);
     expectColumn(plugin::kRequestTable, plugin::kCommandColumn, OXA_TYPE_CHARACTER);
     expectColumn(plugin::kRequestTable, plugin::kRetvalColumn, OXA_TYPE_INTEGER);
+    expectColumn(plugin::kRequestTable, plugin::kProductColumn, OXA_TYPE_CHARACTER);
+    expectColumn(plugin::kRequestTable, plugin::kContextColumn, OXA_TYPE_CHARACTER);
+    expectColumn(plugin::kRequestTable, plugin::kOptionalColumn, OXA_TYPE_CHARACTER);
+    EXPECT_NE(Started::once().find(plugin::kInventoryTable), nullptr);
     expectColumn(plugin::kOutcomeTable, plugin::kTransidColumn, OXA_TYPE_CHARACTER);
 }
 
