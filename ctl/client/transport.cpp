@@ -1,6 +1,7 @@
 #include "ctl/client/transport.h"
 
 #include "ctl/client/bounded_json.h"
+#include "ctl/client/no_host.h"
 
 using nlohmann::json;
 
@@ -27,7 +28,7 @@ Transport::Transport(const std::string& path) : path_(path), socket_(context_) {
     } catch (const boost::system::system_error& tooLong) {
         error = tooLong.code();
     }
-    if (error) throw Failure(kNoHost, "no host reached at " + path + ": " + error.message());
+    if (error) throw noHost(path, error.value());
 }
 
 /// The operation's handler refers to its caller's variables, so it is run before the caller

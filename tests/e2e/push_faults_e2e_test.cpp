@@ -65,7 +65,9 @@ TEST_F(PushFaults, NobodyListensIsStatusThree) {
         runProgram({zavctlPath(), "--rpc-socket", files_.path("nobody.rpc"), "push", file});
     EXPECT_EQ(result.status, 3);
     EXPECT_EQ(result.err, "zavctl: no host reached at " + files_.path("nobody.rpc") +
-                              ": No such file or directory\n");
+                              ": No such file or directory\n  start one with: zavhost --home DIR "
+                              "--socket " +
+                              files_.path("nobody") + "\n");
 }
 
 TEST_F(PushFaults, AHostThatDoesNotAnswerIsStatusFour) {

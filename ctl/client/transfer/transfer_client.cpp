@@ -1,4 +1,5 @@
 #include "ctl/client/transfer/transfer_client.h"
+#include "ctl/client/no_host.h"
 
 #include <sys/socket.h>
 #include <sys/time.h>
@@ -116,7 +117,7 @@ void TransferClient::connect(const std::string& path) {
     }
     std::memcpy(address.sun_path, path.c_str(), path.size());
     if (::connect(descriptor_, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
-        throw Failure(kNoHost, "no host reached at " + path + ": " + std::strerror(errno));
+        throw noHost(path, errno);
     }
 }
 
