@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
@@ -17,13 +18,15 @@
 #include "host/api/routes.h"
 #include "host/api/services.h"
 #include "host/checks/check_list.h"
+#include "host/commands/recorder.h"
 #include "host/home/temporary_directory.h"
 #include "host/http/server.h"
-#include "host/process/end_signals.h"
 #include "host/process/home_lock.h"
 #include "host/process/options.h"
+#include "host/process/orphans.h"
 #include "host/process/plugin_loader.h"
 #include "host/process/setup.h"
+#include "host/process/signal_descriptor.h"
 #include "host/process/socket_file.h"
 #include "host/process/start_error.h"
 #include "host/process/task_timeout.h"
@@ -99,6 +102,25 @@ HomeLock guardStart(const HostOptions& options) {
     return lock;
 }
 
+/// The trace is the host's only log; what it prints itself goes to its standard outputs.
+void reopenLogs(int signals) {
+    forgetSignals(signals);
+    if (ras1::reopenLog()) return;
+    std::fprintf(stderr,
+                 "zavhost: the trace log cannot be opened anew; the old one is still used\n");
+}
+
+/// Ends what a command leaves behind when its time is over, and reaps it. run() is called on the
+/// main thread, which has no other children.
+void attendToOrphans(HttpServer& server, int childSignals) {
+    adoptOrphans();
+    endWhatGivenUpCommandsStarted();
+    server.whenReadable(childSignals, [childSignals] {
+        forgetSignals(childSignals);
+        reapOrphans();
+    });
+}
+
 void run(const HostOptions& options) {
     ras1::showSecrets(options.traceSecrets || !options.guarded);
     // Unguarded hosts may share a home, as processes that load the plug-in themselves may.
@@ -108,7 +130,9 @@ void run(const HostOptions& options) {
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
     SocketFile socket(options.socket);
     SocketFile transferSocket(options.rpcSocket);
-    const int endDescriptor = catchEndSignals();
+    const int endDescriptor = catchSignals({SIGTERM, SIGINT});
+    const int reopenDescriptor = catchSignals({SIGHUP});
+    const int childDescriptor = options.guarded ? catchSignals({SIGCHLD}) : -1;
     Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
                       options.guarded);
     services.checkSubject = [options] { return CheckSubject(options, environmentVariable); };
@@ -117,6 +141,8 @@ void run(const HostOptions& options) {
     serveTransfers(transfers, transferSocket, options);
     HttpServer server(socket.listen(), api, services.counts);
     server.endWhenReadable(endDescriptor, kEndGrace);
+    server.whenReadable(reopenDescriptor, [=] { reopenLogs(reopenDescriptor); });
+    if (options.guarded) attendToOrphans(server, childDescriptor);
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     server.run();

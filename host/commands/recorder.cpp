@@ -13,12 +13,15 @@
 #include "host/commands/child_end.h"
 #include "host/commands/restart_output.h"
 #include "host/commands/trace_texts.h"
+#include "host/process/orphans.h"
 
 namespace host {
 namespace {
 
 constexpr std::size_t kMostCommands = 64;
 constexpr std::size_t kLongestLine = 16 * 1024;
+
+std::atomic<bool> endsDescendants{false};
 
 bool begins(std::string_view text, std::string_view with) {
     return text.substr(0, with.size()) == with;
@@ -52,6 +55,10 @@ WallClock::time_point wallTime(std::int64_t sinceEpoch) {
 }
 
 }  // namespace
+
+void endWhatGivenUpCommandsStarted() {
+    endsDescendants.store(true);
+}
 
 void Recorder::hear(const ras1::HeardLine& line) noexcept {
     const std::string_view text(line.text, line.length);
@@ -121,6 +128,8 @@ void Recorder::hearProcess(const ras1::HeardLine& line, std::string_view text) {
         timeout_ = std::chrono::seconds(std::max(0, numberIn(*seconds)));
     } else if (const auto pid = after(text, trace::kWaiting)) {
         waitForEnd(numberIn(*pid), line.function == trace::kGivesUp);
+    } else if (const auto givenUp = after(text, trace::kGivenUp)) {
+        if (endsDescendants.load()) killDescendants(numberIn(*givenUp), orphansBefore_);
     } else if (const auto program = after(text, trace::kNoProgram)) {
         const std::string path(*program);
         const int error = ::access(path.c_str(), X_OK) == 0 ? 0 : errno;
@@ -130,6 +139,7 @@ void Recorder::hearProcess(const ras1::HeardLine& line, std::string_view text) {
 }
 
 void Recorder::begin(std::string_view line) {
+    if (endsDescendants.load()) orphansBefore_ = orphans();
     // Before the plug-in's own clock starts: the wait below must not outlast the plug-in's.
     began_ = std::chrono::steady_clock::now();
     notes_.pid.store(0);

@@ -28,6 +28,11 @@ struct Heard {
     bool outputComplete = true;  ///< false: the output was longer than it is kept
 };
 
+/// From now on, when the plug-in gives up a command because its time is over, what that command has
+/// started is killed too: the plug-in kills its own child only. The process must have adopted its
+/// orphans. Any thread.
+void endWhatGivenUpCommandsStarted();
+
 class Recorder {
 public:
     /// Keeps up to `outputBytes` of the last command's standard output.
@@ -69,6 +74,7 @@ private:
     // Of the thread alone.
     std::chrono::steady_clock::time_point began_{};
     std::chrono::seconds timeout_{0};
+    std::vector<pid_t> orphansBefore_;  ///< that were there when the command began
 
     ChildNotes notes_;
     mutable embedded::Mutex lock_;  // never held in a child, nor while waiting

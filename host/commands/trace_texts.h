@@ -43,6 +43,9 @@ inline constexpr std::string_view kWaiting = "Waiting for process id: ";
 /// The function that traces kWaiting and kills the process without a further look.
 inline constexpr std::string_view kGivesUp = "giveUp";
 
+/// Followed by the process id. The time is over; the plug-in is about to kill the process.
+inline constexpr std::string_view kGivenUp = "Terminating process group -";
+
 // ---- The child, between fork and exec -----------------------------------------------------------
 
 /// Followed by the process id.

@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <exception>
 #include <utility>
+#include <vector>
 
 #include "host/http/server_core.h"
 #include "host/http/session.h"
@@ -37,6 +38,25 @@ int duplicate(int descriptor) {
 
 }  // namespace
 
+using Descriptor = net::posix::basic_stream_descriptor<net::io_context::executor_type>;
+
+/// Something beside clients that the I/O thread attends to.
+struct Watched {
+    Watched(net::io_context& io, int descriptor, std::function<void()> action)
+        : readable(io, descriptor), act(std::move(action)) {}
+
+    void await() {
+        readable.async_wait(net::posix::descriptor_base::wait_read, [this](Error error) {
+            if (error) return;
+            act();
+            await();
+        });
+    }
+
+    Descriptor readable;
+    const std::function<void()> act;
+};
+
 struct HttpServer::Implementation {
     Implementation(int listenerDescriptor, Handler& handler, ServerCounts& counts,
                    const ServerLimits& limits)
@@ -55,8 +75,9 @@ struct HttpServer::Implementation {
     void after(std::chrono::milliseconds time, Next next);
 
     ServerCore core;
-    net::posix::basic_stream_descriptor<net::io_context::executor_type> listener;
-    net::posix::basic_stream_descriptor<net::io_context::executor_type> signal;
+    Descriptor listener;
+    Descriptor signal;
+    std::vector<std::unique_ptr<Watched>> watched;
     Timer timer;
     Clock::time_point deadline;
 };
@@ -177,6 +198,13 @@ void HttpServer::endWhenReadable(int descriptor, std::chrono::milliseconds grace
                                      [&implementation, grace](Error error) {
                                          if (!error) implementation.beginEnd(grace);
                                      });
+}
+
+void HttpServer::whenReadable(int descriptor, std::function<void()> act) {
+    auto& watched = implementation_->watched;
+    watched.push_back(
+        std::make_unique<Watched>(implementation_->core.io, duplicate(descriptor), std::move(act)));
+    watched.back()->await();
 }
 
 }  // namespace host

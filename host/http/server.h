@@ -2,6 +2,7 @@
 #pragma once
 
 #include <chrono>
+#include <functional>
 #include <memory>
 
 #include "host/http/handler.h"
@@ -32,6 +33,9 @@ public:
     void end(std::chrono::milliseconds grace);
     /// Calls end() when `descriptor`, which stays the caller's, becomes readable. Before run().
     void endWhenReadable(int descriptor, std::chrono::milliseconds grace);
+    /// Calls `act` on the thread of run() whenever `descriptor`, which stays the caller's, is
+    /// readable. `act` makes it unreadable, must not block and must not throw. Before run().
+    void whenReadable(int descriptor, std::function<void()> act);
 
 private:
     struct Implementation;

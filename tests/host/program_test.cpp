@@ -98,6 +98,21 @@ TEST_F(HostProgram, EndsWithStatus0OnBothSignals) {
     }
 }
 
+TEST_F(HostProgram, OpensItsTraceLogAnewOnHangUpAndGoesOn) {
+    const std::string log = scratch.path("trace.log");
+    Program program(command(), "", {{"KBB_RAS1_LOG", log}});
+    ASSERT_TRUE(program.awaitOutput("ready: ", seconds(30))) << program.err();
+    for (int round = 0; round < 3; ++round) {
+        ASSERT_TRUE(scratch.exists("trace.log"));
+        std::filesystem::rename(log, scratch.path("trace.old"));
+        program.signal(SIGHUP);
+        EXPECT_TRUE(eventually([&] { return scratch.exists("trace.log"); })) << "round " << round;
+    }
+    EXPECT_EQ(RawClient(socket).get("/v1/health").status, 200);
+    program.signal(SIGTERM);
+    EXPECT_EQ(program.wait().status, 0);
+}
+
 TEST_F(HostProgram, TellsWhyItDoesNotStart) {
     const std::string program = command()[0];
     const auto withPlugin = [&](const std::string& plugin) {

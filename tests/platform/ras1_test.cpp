@@ -10,6 +10,7 @@
 
 #include <cerrno>
 #include <climits>
+#include <cstdio>
 #include <cstdlib>
 #include <string>
 #include <vector>
@@ -209,6 +210,30 @@ int inChild(Body body) {
     int status = 0;
     EXPECT_EQ(::waitpid(child, &status, 0), child);
     return status;
+}
+
+TEST(Log, IsOpenedAnewUnderItsNameAfterItWasRenamed) {
+    ScratchDir scratch;
+    const std::string log = scratch.path("log");
+    ras1::configure("ERROR", log);
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "first");
+    ASSERT_EQ(std::rename(log.c_str(), scratch.path("old").c_str()), 0);
+    EXPECT_TRUE(ras1::reopenLog());
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "second");
+    EXPECT_THAT(scratch.read("old"), MatchesRegex("[^\n]*first\n"));
+    EXPECT_THAT(scratch.read("log"), MatchesRegex("[^\n]*second\n"));
+    ras1::configureFromEnvironment();
+}
+
+TEST(Log, GoesOnInTheOldFileWhenItCannotBeOpenedAnew) {
+    ScratchDir scratch;
+    const std::string log = scratch.write("dir/log", "");
+    ras1::configure("ERROR", log);
+    ASSERT_EQ(std::rename(scratch.path("dir").c_str(), scratch.path("moved").c_str()), 0);
+    EXPECT_FALSE(ras1::reopenLog());
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "still");
+    EXPECT_THAT(scratch.read("moved/log"), MatchesRegex("[^\n]*still\n"));
+    ras1::configureFromEnvironment();
 }
 
 TEST(Log, NeverTakesTheNumberOfAStandardStream) {

@@ -87,8 +87,18 @@ public:
         selections_.push_back(
             std::make_unique<const ras1::Selection>(ras1::parseSelection(selectionText)));
         selection_.store(selections_.back().get(), std::memory_order_release);
+        logPath_ = logPath;
         redirect(openLog(logPath));
         readerMayGo_.store(hasReader(descriptor()), std::memory_order_relaxed);
+    }
+
+    bool reopenLog() {
+        if (logPath_.empty()) return true;
+        const int log = openLog(logPath_);
+        if (log == -1) return false;
+        redirect(log);
+        readerMayGo_.store(hasReader(descriptor()), std::memory_order_relaxed);
+        return true;
     }
 
     void configureFromEnvironment() {
@@ -125,6 +135,7 @@ private:
     /// The last one is in force; threads may still be reading earlier ones.
     std::vector<std::unique_ptr<const ras1::Selection>> selections_;
     std::atomic<const ras1::Selection*> selection_{nullptr};
+    std::string logPath_;  ///< of the thread that configures
     const int standardError_ = ownDescriptor(STDERR_FILENO);
     std::atomic<int> lines_{-1};  ///< where lines go
     std::atomic<bool> secretsShown_{false};
@@ -424,6 +435,10 @@ namespace ras1 {
 void configure(const std::string& selection, const std::string& logPath) {
     facility().configure(selection, logPath);
     ++RAS1_Generation;
+}
+
+bool reopenLog() {
+    return facility().reopenLog();
 }
 
 void configureFromEnvironment() {

@@ -14,6 +14,11 @@ namespace ras1 {
 /// new place.
 void configure(const std::string& selection, const std::string& logPath);
 
+/// Opens the file that lines go to anew under its name, for instance after it was renamed. Returns
+/// false, and lines go where they went, when it cannot be opened. Does nothing for standard error.
+/// To be called as configure() is.
+bool reopenLog();
+
 /// Returns to the settings of the environment as it is now.
 void configureFromEnvironment();
 

@@ -109,6 +109,7 @@ TEST(TraceTexts, AreThoseOfThePlugin) {
         lines.heard(trace::kProcessUnit, std::string(trace::kNoProgram) + home.path() + "/bin/"));
     EXPECT_TRUE(lines.heard(trace::kProcessUnit, trace::kWaiting, "waitUntil"));
     EXPECT_TRUE(lines.heard(trace::kProcessUnit, trace::kWaiting, trace::kGivesUp));
+    EXPECT_TRUE(lines.heard(trace::kProcessUnit, trace::kGivenUp));
     EXPECT_TRUE(lines.heard(trace::kAnswerUnit, std::string(trace::kAnswer) + "0]"));
     EXPECT_TRUE(lines.heard(trace::kInventoryUnit, trace::kNoInventory));
     EXPECT_TRUE(lines.entered);
