@@ -15,14 +15,24 @@ namespace host {
 namespace {
 
 std::vector<oxa::Predicate> conditionsOf(const nlohmann::json& body, const oxa::Table& table,
-                                         const CodePage& codePage) {
+                                         const Services& services) {
     std::vector<oxa::Predicate> conditions;
     const auto where = body.find("where");
     if (where == body.end()) return conditions;
-    const ConditionReader reader(table, codePage);
-    for (const nlohmann::json& condition : *where)
-        conditions.push_back(reader.fromJson(condition));
+    const ConditionReader reader(table, services.codePage);
+    try {
+        for (const nlohmann::json& condition : *where)
+            conditions.push_back(reader.fromJson(condition));
+    } catch (const UnknownColumn& unknown) {
+        if (!services.guarded || table.name != plugin::kRequestTable) throw;
+        Guards::refuseUnknownColumn(table, unknown.name());
+    }
     return conditions;
+}
+
+bool isForced(const nlohmann::json& body) {
+    const auto force = body.find("force");
+    return force != body.end() && force->get<bool>();
 }
 
 }  // namespace
@@ -36,8 +46,8 @@ Answer postQuery(Services& services, const Call& call) {
     if (table->name == plugin::kRequestTable && call.peer().access < Access::Act) {
         return errorReply(403, "you may only read from this host; a query on " + name + " acts");
     }
-    const Query query{table, conditionsOf(call.body(), *table, services.codePage)};
-    const WatchedAnswer answer = runWatched(services, query, call.peer());
+    const Query query{table, conditionsOf(call.body(), *table, services)};
+    const WatchedAnswer answer = runWatched(services, query, isForced(call.body()), call.peer());
     return jsonReply(200, queryDocument(services, query, answer));
 }
 

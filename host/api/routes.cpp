@@ -14,7 +14,9 @@ std::vector<Route> routes() {
         {"POST", "/v1/query", "Queries a table; on the request table, asks for a command.",
          Access::Read, Runs::OnWorker, postQuery, {}, Others::None,
          {{"table", Json::String, Need::Required, "the name of the table"},
-          {"where", Json::Array, Need::Optional, "conditions, all of which a row satisfies"}}},
+          {"where", Json::Array, Need::Optional, "conditions, all of which a row satisfies"},
+          {"force", Json::Boolean, Need::Optional,
+           "on the request table: true sends a command for a product that is not there"}}},
 
         {"GET", "/v1/events", "Streams the rows of a table as they come.",
          Access::Read, Runs::OnWorker, getEvents,

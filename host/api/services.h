@@ -2,6 +2,7 @@
 #pragma once
 
 #include <chrono>
+#include <cstdlib>
 #include <functional>
 #include <string>
 #include <utility>
@@ -9,6 +10,8 @@
 
 #include "host/checks/check.h"
 #include "host/commands/ear.h"
+#include "host/depot/depot_directory.h"
+#include "host/guard/guards.h"
 #include "host/http/server_counts.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task_list.h"
@@ -39,10 +42,13 @@ struct Services {
     /// What the checks of GET /v1/doctor look at; main() sets it before it serves.
     std::function<CheckSubject()> checkSubject;
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
+    const std::string depot =  ///< its directory, in that code page, too
+        depotDirectoryOf(home, std::getenv(kDepotVariable), guarded).path;
     ServerCounts counts;
     OutcomeFeed outcomes{tables};
     TaskList tasks{tables, outcomes, guarded};
     TaskWatch watch{tables, outcomes};
+    const Guards guards{{codePage, home, depot}, tasks};  ///< asked if `guarded`
 };
 
 }  // namespace host

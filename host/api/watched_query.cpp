@@ -37,14 +37,24 @@ std::string askerOf(const Query& query, const Peer& peer) {
     return query.table->name == plugin::kRequestTable ? userName(peer.user) : std::string();
 }
 
+/// What the table gets: a request as the guards leave it, other queries as they are.
+Query admitted(const Services& services, const Query& query, bool force) {
+    if (!services.guarded || query.table->name != plugin::kRequestTable) return query;
+    CommandRequest request(query.where, force);
+    services.guards.admit(request);
+    return {query.table, request.conditions()};
+}
+
 }  // namespace
 
-WatchedAnswer runWatched(Services& services, const Query& query, const Peer& peer) {
+WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer) {
     const bool wantsOutput = services.guarded && readsConfiguration(query);
     TaskWatch::Request watched(services.watch, *query.table);
+    const Query handedOn = admitted(services, query, force);
+    // The task is what was asked for, not what the guards made of it.
     TaskList::Request task(services.tasks, query, askerOf(query, peer));
     ThreadEar ear(wantsOutput ? kMostOutput : 0);
-    WatchedAnswer answer{run(query), {}};
+    WatchedAnswer answer{run(handedOn), {}};
     answer.heard = ear.take();
     task.answered(answer.rows, answer.heard);
     watched.answered(answer.rows);

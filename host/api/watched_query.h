@@ -13,7 +13,8 @@ struct WatchedAnswer {
     Heard heard;  ///< on the query's thread
 };
 
-/// Runs the query on the calling thread; a request becomes a task of this peer. Throws QueryFailed.
-WatchedAnswer runWatched(Services& services, const Query& query, const Peer& peer);
+/// Runs the query on the calling thread; a request becomes a task of this peer once the guards have
+/// admitted it. `force` passes the guard of products. Throws Refusal and QueryFailed.
+WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer);
 
 }  // namespace host

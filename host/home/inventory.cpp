@@ -50,7 +50,7 @@ std::string platformOf(const Inventory& inventory, const std::string& code,
                        const std::string& preferred) {
     std::string platform;
     for (const InstalledProduct& product : inventory.products) {
-        if (product.code != code || isUnusable(product)) continue;
+        if (product.code != code || product.platform.empty() || isUnusable(product)) continue;
         platform = product.platform;
         if (preferred.empty() || endAlike(platform, preferred)) break;
     }
@@ -79,6 +79,7 @@ std::vector<InstalledProduct> productsIn(const std::string& list) {
     for (std::string line; std::getline(lines, line);) {
         const std::vector<std::string> fields = fieldsOf(line);
         if (fields.size() == kFields) products.push_back({fields[0], fields[2], fields[3]});
+        if (fields.size() > kFields) products.push_back({fields[0], "", ""});
     }
     return products;
 }

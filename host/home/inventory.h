@@ -8,6 +8,7 @@
 
 namespace host {
 
+/// The last two are empty where a comma in the product's description hides them from the plug-in.
 struct InstalledProduct {
     std::string code;
     std::string platform;

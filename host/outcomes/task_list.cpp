@@ -1,5 +1,7 @@
 #include "host/outcomes/task_list.h"
 
+#include <strings.h>
+
 #include <algorithm>
 #include <cstdio>
 #include <iterator>
@@ -326,6 +328,17 @@ TaskList::Entries::const_iterator TaskList::entryOf(std::string_view name) const
         if (at->second.transid == name) newest = at;
     }
     return newest;
+}
+
+bool TaskList::unfinished(const std::string& product) const {
+    if (product.empty()) return false;
+    const embedded::MutexLock lock(lock_);
+    return std::any_of(entries_.begin(), entries_.end(), [&product](const auto& each) {
+        const Entry& entry = each.second;
+        const std::string other(entry.task.value(plugin::kProductColumn));
+        return entry.turn != 0 && !isOver(entry.task.state) &&
+               ::strcasecmp(other.c_str(), product.c_str()) == 0;
+    });
 }
 
 std::optional<Task> TaskList::find(std::string_view name) const {

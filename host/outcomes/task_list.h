@@ -65,6 +65,10 @@ public:
     /// commands.
     std::vector<Task> newest(const Filter& filter) const;
 
+    /// Whether an accepted task for the product, in upper or lower case, is not over. False for no
+    /// product.
+    bool unfinished(const std::string& product) const;
+
     /// The task with this identifier, or else the newest one with this TRANSID. The commands of a
     /// running one are those so far.
     std::optional<Task> find(std::string_view name) const;

@@ -95,9 +95,7 @@ oxa::Predicate ConditionReader::equality(const std::string& column, const std::s
 
 const oxa::Column& ConditionReader::columnOf(const std::string& name) const {
     const oxa::Column* column = table_.find(name);
-    if (column == nullptr) {
-        throw BadRequest("table " + table_.name + " has no column \"" + name + "\"");
-    }
+    if (column == nullptr) throw UnknownColumn(table_, name);
     return *column;
 }
 

@@ -3,6 +3,7 @@
 
 #include <nlohmann/json_fwd.hpp>
 #include <string>
+#include <utility>
 
 #include "embedded/oxa_host.h"
 #include "host/tables/bad_request.h"
@@ -10,8 +11,22 @@
 
 namespace host {
 
-/// Makes conditions on one table. Every member throws BadRequest when the column is unknown (names
-/// are compared exactly), or when its type does not go with the operator or the value.
+/// There is no such column.
+class UnknownColumn : public BadRequest {
+public:
+    UnknownColumn(const oxa::Table& table, std::string name)
+        : BadRequest("table " + table.name + " has no column \"" + name + "\""),
+          name_(std::move(name)) {}
+    /// The name that was given.
+    const std::string& name() const { return name_; }
+
+private:
+    std::string name_;
+};
+
+/// Makes conditions on one table. Every member throws UnknownColumn when there is no such column
+/// (names are compared exactly), and BadRequest when its type does not go with the operator or the
+/// value.
 class ConditionReader {
 public:
     /// Both outlive the reader.

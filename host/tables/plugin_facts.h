@@ -26,24 +26,65 @@ inline constexpr std::string_view kCommandColumn = "COMMAND";
 inline constexpr std::string_view kRetvalColumn = "RETVAL";
 inline constexpr int kAccepted = 0;
 
-/// In the request table: parameters of the command. SETCONFIG's context and GETCONFIG's answer are
-/// an agent's configuration, passwords among it.
+/// In the request table: the parameters of the commands. The plug-in takes their values whatever
+/// the operators of the conditions are.
 inline constexpr std::string_view kProductColumn = "PRODUCT";
-inline constexpr std::string_view kContextColumn = "CONTEXT";
+inline constexpr std::string_view kVersionColumn = "VERSION";
+inline constexpr std::string_view kTargetColumn = "TARGETMSN";
 inline constexpr std::string_view kOptionalColumn = "OPTIONAL";
+inline constexpr std::string_view kContextColumn = "CONTEXT";
+inline constexpr std::string_view kMetafileColumn = "UACONFIG";
+inline constexpr std::string_view kScriptsColumn = "UASCRIPT";
+/// These hold text or names of files; all others hold names in ASCII.
+inline constexpr std::array<std::string_view, 3> kTextColumns = {kContextColumn, kMetafileColumn,
+                                                                 kScriptsColumn};
+/// In the request table: the node that answers. No parameter.
+inline constexpr std::string_view kOriginNodeColumn = "ORIGINNODE";
+/// In the request table: what only the answer has.
+inline constexpr std::array<std::string_view, 3> kResultColumns = {kRetvalColumn, "RETMSGID",
+                                                                   "RETMSGPARM"};
+/// The commands that guards tell apart.
+inline constexpr std::string_view kStart = "START";
+inline constexpr std::string_view kStop = "STOP";
+inline constexpr std::string_view kRestart = "RESTART";
+inline constexpr std::string_view kInstall = "INSTALL";
+inline constexpr std::string_view kUninstall = "UNINSTALL";
+inline constexpr std::string_view kSetConfiguration = "SETCONFIG";
+inline constexpr std::string_view kRemoveInstance = "REMOVEINSTANCE";
 inline constexpr std::string_view kGetConfiguration = "GETCONFIG";
 /// What the last command of a GETCONFIG writes before this is no part of the configuration.
 inline constexpr std::string_view kConfigurationBegin = "INSTANCE=";
-inline constexpr std::string_view kSetConfiguration = "SETCONFIG";
 
+/// SETCONFIG's context and GETCONFIG's answer are an agent's configuration, passwords among it.
 constexpr bool holdsConfiguration(std::string_view command) {
     return command == kSetConfiguration || command == kGetConfiguration;
 }
 
+/// With this in OPTIONAL, the target of a START is the name of an instance.
+inline constexpr std::string_view kTargetIsInstance = "INSTANCE";
 /// An INSTALL with this OPTIONAL has two outcomes: one with kAccepted when it begins, since it may
 /// end the process, and one at its end. One that cannot begin has only that outcome.
-inline constexpr std::string_view kInstall = "INSTALL";
 inline constexpr std::string_view kWithRestart = "REQUIRES_RESTART";
+/// Stands for the product's folder of the depot in the command of an INSTALL.
+inline constexpr std::string_view kDeployFolderToken = "|DEPLOYDIR|";
+
+/// The product code of the universal agent, in whatever case when it is configured.
+inline constexpr std::string_view kUniversalAgent = "um";
+/// The component whose programs all products share, among them the translator.
+inline constexpr std::string_view kSharedComponent = "ax";
+/// Its folder of the depot is the same for all versions.
+inline constexpr std::string_view kCommonInstaller = "ci";
+
+/// These commands fail for a product that is not installed.
+inline constexpr std::array<std::string_view, 5> kCommandsOnProducts = {
+    kStart, kStop, kRestart, kUninstall, kSetConfiguration};
+
+constexpr bool needsProduct(std::string_view command) {
+    for (const std::string_view needing : kCommandsOnProducts) {
+        if (command == needing) return true;
+    }
+    return false;
+}
 
 /// These commands have been carried out when their request is answered. All others are queued.
 inline constexpr std::array<std::string_view, 2> kCommandsAtOnce = {kGetConfiguration,

@@ -51,6 +51,7 @@ protected:
 };
 
 TEST_F(TaskDetails, TellWhyATaskFailed) {
+    home.products({"ux"}, "exit 0");
     home.agentScript("echo I will; echo I cannot >&2; exit 3");
     start(Guards::On);
     queue({"start", "ux"}, "T-1");
@@ -80,6 +81,7 @@ TEST_F(TaskDetails, TellWhyATaskFailed) {
 }
 
 TEST_F(TaskDetails, ASuccessWhoseCommandWasKilledIsAFailure) {
+    home.products({"ux"}, "exit 0");
     home.agentScript("kill -9 $$");
     start(Guards::On);
     queue({"start", "ux"}, "T-1");
@@ -176,6 +178,7 @@ TEST_F(TaskDetails, TheOutputOfAnInstallThatMayRestartTheHostIsTakenFromTheDepot
 }
 
 TEST_F(TaskDetails, TheEndOfALongOutputIsKept) {
+    home.products({"ux"}, "exit 0");
     home.agentScript("i=0; while [ $i -lt 2000 ]; do echo line $i; i=$((i+1)); done; exit 1");
     start(Guards::On);
     queue({"start", "ux"}, "T-1");

@@ -113,4 +113,88 @@ TEST_F(QueryEndpoint, LetsReadersQueryAllTablesButTheOneThatActs) {
     EXPECT_EQ(samples, 1);
 }
 
+/// A request table whose requests are counted.
+class GuardedQuery : public QueryEndpoint {
+protected:
+    GuardedQuery() {
+        requests.sampler = [this](rtoxa& request) {
+            ++samples;
+            FLT1_FILTERINFO entry{};
+            while (request.GetFilterInfo(&entry) == OXA_OK)
+                seen += std::string(entry.columnName) + "=" + entry.value + ";";
+            return static_cast<int>(OXA_OK);
+        };
+        requests.RegisterWithManager();
+    }
+    void serve(bool guarded) {
+        api.reset();
+        services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it",
+                         host::RowQueue::Limits{}, guarded);
+        api.emplace(*services, host::routes());
+    }
+
+    MadeUpTable requests{"KAGREQT",
+                         {{"command", 0, 16, OXA_TYPE_CHARACTER},
+                          {"product", 16, 8, OXA_TYPE_CHARACTER},
+                          {"context", 24, 64, OXA_TYPE_CHARACTER}}};
+    int samples = 0;
+    std::string seen;
+};
+
+TEST_F(GuardedQuery, ARefusedRequestIsNotHandedOn) {
+    const std::string body =
+        R"({"table":"KAGREQT","where":[{"column":"PRODUCT","op":"like","value":"u*"}]})";
+    serve(true);
+    const host::Reply reply = post(body);
+    EXPECT_EQ(reply.status, 400U);
+    EXPECT_EQ(reply.body,
+              "{\"error\":\"a request gives values; PRODUCT has an operator other than \\\"=\\\", "
+              "which would be taken for \\\"=\\\"\",\"guard\":\"conditions\",\"hint\":\"give every "
+              "column with \\\"=\\\"\"}\n");
+    EXPECT_EQ(samples, 0);
+    serve(false);
+    EXPECT_EQ(post(body).status, 200U);
+    EXPECT_EQ(samples, 1);
+}
+
+TEST_F(GuardedQuery, TheTableGetsWhatTheGuardsMadeOfTheRequest) {
+    const std::string body =
+        "{\"table\":\"KAGREQT\",\"where\":[{\"column\":\"CONTEXT\",\"op\":\"=\",\"value\":"
+        "\"äöü\"}]}";
+    serve(true);
+    EXPECT_EQ(post(body).status, 200U);
+    EXPECT_EQ(seen, "CONTEXT=äöü  ;");
+    seen.clear();
+    serve(false);
+    EXPECT_EQ(post(body).status, 200U);
+    EXPECT_EQ(seen, "CONTEXT=äöü;");
+}
+
+TEST_F(GuardedQuery, ForceIsForTheGuardOfProducts) {
+    const auto start = [](const char* force) {
+        return std::string(R"({"table":"KAGREQT")") + force +
+               R"(,"where":[{"column":"COMMAND","op":"=","value":"START"},)"
+               R"({"column":"PRODUCT","op":"=","value":"ux"}]})";
+    };
+    serve(true);
+    EXPECT_EQ(post(start("")).status, 409U);
+    EXPECT_EQ(post(start(",\"force\":false")).status, 409U);
+    EXPECT_EQ(samples, 0);
+    EXPECT_EQ(post(start(",\"force\":true")).status, 200U);
+    EXPECT_EQ(samples, 1);
+    expectError(400, "\"force\" is not true or false", post(start(",\"force\":1")));
+    EXPECT_EQ(post(R"({"table":"PLAIN","force":true})").status, 200U);
+}
+
+TEST_F(GuardedQuery, AnUnknownColumnOfTheRequestTableGetsTheNearestName) {
+    const std::string body =
+        R"({"table":"KAGREQT","where":[{"column":"PRODCUT","op":"=","value":"ux"}]})";
+    serve(true);
+    EXPECT_EQ(post(body).body,
+              "{\"error\":\"table KAGREQT has no column \\\"PRODCUT\\\"\",\"guard\":\"columns\","
+              "\"hint\":\"did you mean PRODUCT?\"}\n");
+    serve(false);
+    expectError(400, "table KAGREQT has no column \"PRODCUT\"", post(body));
+}
+
 }  // namespace

@@ -100,6 +100,32 @@ TEST_F(Tasks, TheOldestRunsAndTheOthersWait) {
     EXPECT_EQ(stateOf("t2"), TaskState::Failed);
 }
 
+TEST_F(Tasks, AProductIsUnfinishedFromTheReplyToTheOutcome) {
+    EXPECT_FALSE(list->unfinished("ux"));
+    {
+        const TaskList::Request asked(*list, query("t0", "START", {{"PRODUCT", OPER_EQ, "ux"}}),
+                                      "somebody");
+        EXPECT_FALSE(list->unfinished("ux")) << "nobody has accepted it";
+    }
+    ask("t1", "START", 0, {{"PRODUCT", OPER_EQ, "ux"}});
+    ask("t2", "START", 1003, {{"PRODUCT", OPER_EQ, "um"}});
+    EXPECT_TRUE(list->unfinished("ux"));
+    EXPECT_TRUE(list->unfinished("UX"));
+    EXPECT_FALSE(list->unfinished("um")) << "refused";
+    EXPECT_FALSE(list->unfinished(""));
+    publish("t1", 1024);
+    EXPECT_FALSE(list->unfinished("ux"));
+}
+
+TEST_F(Tasks, AnInstallThatRestartsLeavesItsProductUnfinishedUntilItsSecondOutcome) {
+    ask("t1", "INSTALL", 0,
+        {{"PRODUCT", OPER_EQ, "ux"}, {"OPTIONAL", OPER_EQ, "REQUIRES_RESTART"}});
+    publish("t1");
+    EXPECT_TRUE(list->unfinished("ux"));
+    publish("t1");
+    EXPECT_FALSE(list->unfinished("ux"));
+}
+
 TEST_F(Tasks, KnowWhoAskedForWhatAndWhen) {
     const auto before = host::WallClock::now();
     ask("t1", "STOP", 0, {{"PRODUCT", OPER_EQ, "lz"}, {"PRODUCT", OPER_EQ, "ux"}});

@@ -7,6 +7,7 @@
 #include <cstdlib>
 #include <map>
 #include <mutex>
+#include <set>
 
 #include "embedded/oxa_host.h"
 #include "host/process/plugin_loader.h"
@@ -98,6 +99,22 @@ TEST(PluginFacts, NameTablesAndColumnsThatThereAre) {
     expectColumn(plugin::kRequestTable, plugin::kOptionalColumn, OXA_TYPE_CHARACTER);
     EXPECT_NE(Started::once().find(plugin::kInventoryTable), nullptr);
     expectColumn(plugin::kOutcomeTable, plugin::kTransidColumn, OXA_TYPE_CHARACTER);
+    expectColumn(plugin::kOutcomeTable, plugin::kRetvalColumn, OXA_TYPE_INTEGER);
+}
+
+TEST(PluginFacts, NameEveryColumnOfTheRequestTableOnce) {
+    const std::set<std::string_view> known = {plugin::kTransidColumn, plugin::kCommandColumn,
+                                              plugin::kProductColumn, plugin::kVersionColumn,
+                                              plugin::kTargetColumn,  plugin::kOptionalColumn,
+                                              plugin::kContextColumn, plugin::kMetafileColumn,
+                                              plugin::kScriptsColumn, plugin::kOriginNodeColumn};
+    std::set<std::string_view> all(plugin::kResultColumns.begin(), plugin::kResultColumns.end());
+    EXPECT_EQ(all.size(), plugin::kResultColumns.size());
+    for (const std::string_view column : known)
+        EXPECT_TRUE(all.insert(column).second) << column << " is no result";
+    for (const oxa::Column& column : Started::once().find(plugin::kRequestTable)->columns)
+        EXPECT_EQ(all.erase(column.name), 1U) << column.name;
+    EXPECT_TRUE(all.empty()) << *all.begin();
 }
 
 /// What the answer to a request says about its acceptance.
@@ -134,6 +151,18 @@ TEST(PluginFacts, TellAcceptedRequestsFromRefusedOnes) {
     EXPECT_EQ(retvalOf(started.request("STOP", "accepted")), plugin::kAccepted);
     EXPECT_TRUE(eventually([&] { return started.outcomes("accepted") == 1; }));
     EXPECT_EQ(started.outcomes("refused"), 0);
+}
+
+TEST(PluginFacts, ValuesAreTakenWhateverTheOperator) {
+    Started& started = Started::once();
+    oxa::Rows rows;
+    const std::vector<oxa::Predicate> where = {{"COMMAND", OPER_GE, "STOP"},
+                                               {"PRODUCT", OPER_LE, "ux"},
+                                               {"TRANSID", OPER_EQ, "compared"},
+                                               {"UASCRIPT", OPER_NE, "more than the row holds"}};
+    EXPECT_EQ(oxa::query(std::string(plugin::kRequestTable), where, rows), OXA_OK);
+    EXPECT_EQ(rows.count(), 0U) << "the row holds the value, so it is not the one that is wanted";
+    EXPECT_TRUE(eventually([&] { return started.outcomes("compared") == 1; }));
 }
 
 }  // namespace

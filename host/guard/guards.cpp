@@ -1,0 +1,52 @@
+#include "host/guard/guards.h"
+
+#include "host/guard/refusal.h"
+#include "host/text/nearest_name.h"
+
+namespace host {
+
+/// Each family has a file of its own in this folder and its rows below.
+using Check = void(CommandRequest& request, Machine& machine);
+Check checkConditions, checkAscii, checkValues, checkImportNames;
+Check checkProduct, checkDeployFolder, checkTarget, checkImport;
+Check mendText;
+
+const std::vector<Guard>& guards() {
+    // clang-format off
+    static const std::vector<Guard> table = {
+        {"conditions",    Asks::Request, checkConditions},
+        {"text",          Asks::Request, checkAscii},
+        {"values",        Asks::Request, checkValues},
+        {"import-names",  Asks::Request, checkImportNames},
+        {"product",       Asks::Machine, checkProduct},
+        {"deploy-folder", Asks::Machine, checkDeployFolder},
+        {"target",        Asks::Machine, checkTarget},
+        {"import",        Asks::Machine, checkImport},
+        // Last, so that all others see what the client sent.
+        {"text",          Asks::Request, mendText},
+    };
+    // clang-format on
+    return table;
+}
+
+void Guards::admit(CommandRequest& request) const {
+    Machine machine(site_);
+    const bool mayChange = tasks_.unfinished(request.product());
+    for (const Guard& guard : guards()) {
+        if (guard.asks == Asks::Machine && mayChange) continue;
+        guard.check(request, machine);
+    }
+}
+
+void Guards::refuseUnknownColumn(const oxa::Table& table, const std::string& name) {
+    std::vector<std::string> known;
+    for (const oxa::Column& column : table.columns)
+        known.push_back(column.name);
+    const std::string nearest = nearestName(name, known);
+    throw Refusal(
+        "columns", "table " + table.name + " has no column \"" + name + "\"",
+        nearest.empty() ? "GET /v1/tables lists the columns" : "did you mean " + nearest + "?",
+        Refusal::Kind::Malformed);
+}
+
+}  // namespace host

@@ -1,0 +1,92 @@
+// The guard of targets that nobody knows. The plug-in takes a managed system name that it cannot
+// resolve for the default instance, so that a typing slip would stop the wrong agent.
+
+#include <strings.h>
+
+#include <algorithm>
+#include <cctype>
+
+#include "host/guard/guard.h"
+#include "host/guard/listing.h"
+#include "host/guard/refusal.h"
+#include "host/guard/wording.h"
+#include "host/tables/plugin_facts.h"
+
+namespace host {
+
+void checkTarget(CommandRequest& request, Machine& machine);
+
+namespace {
+
+bool isResolved(const CommandRequest& request) {
+    const std::string& command = request.command();
+    if (request.targetIsInstance() || request.product().empty()) return false;
+    // The plug-in itself refuses to remove an instance of the universal agent.
+    if (command == plugin::kRemoveInstance) return request.product() != plugin::kUniversalAgent;
+    return command == plugin::kStart || command == plugin::kStop || command == plugin::kRestart;
+}
+
+/// The host in "INSTANCE:HOST:CODE" or "HOST:CODE"; a name without a colon is one itself.
+std::string hostIn(const std::string& name) {
+    const std::size_t last = name.rfind(':');
+    if (last == std::string::npos) return name;
+    const std::size_t before = last == 0 ? std::string::npos : name.rfind(':', last - 1);
+    const std::size_t begin = before == std::string::npos ? 0 : before + 1;
+    return name.substr(begin, last - begin);
+}
+
+bool sameHost(const std::string& a, const std::string& b) {
+    return !a.empty() && ::strcasecmp(a.c_str(), b.c_str()) == 0;
+}
+
+bool namesThisMachine(const std::string& target) {
+    const std::string host = hostIn(target);
+    return target.find(':') != std::string::npos &&
+           (sameHost(host, Machine::shortName()) || sameHost(host, hostIn(oxa::originNode())));
+}
+
+/// What stands at the end of a product's managed system names.
+std::string codeOf(std::string product) {
+    if (product == plugin::kUniversalAgent) return "UA";
+    std::transform(product.begin(), product.end(), product.begin(),
+                   [](unsigned char c) { return static_cast<char>(std::toupper(c)); });
+    return product;
+}
+
+/// The default instance and those that have a configuration file.
+std::vector<std::string> knownNames(const Site& site, const std::string& product) {
+    const std::string suffix = ":" + codeOf(product);
+    std::vector<std::string> names = {Machine::shortName() + suffix};
+    const std::string prefix = product + "_";
+    for (const std::string& file : filesIn(site.home + "/config")) {
+        const std::size_t dot = file.rfind('.');
+        if (file.compare(0, prefix.size(), prefix) != 0 || dot == std::string::npos) continue;
+        const std::string extension = file.substr(dot);
+        if (extension != ".cfg" && extension != ".config") continue;
+        if (dot <= prefix.size()) continue;
+        const std::string instance = file.substr(prefix.size(), dot - prefix.size());
+        names.push_back(instance + ":" + Machine::shortName() + suffix);
+    }
+    return names;
+}
+
+}  // namespace
+
+void checkTarget(CommandRequest& request, Machine& machine) {
+    const std::string& target = request.target();
+    if (target.empty() || !isResolved(request)) return;
+    const Resolution resolved = machine.resolve(request.product(), target);
+    if (!resolved.instance.empty() || namesThisMachine(target)) return;
+    const std::vector<std::string> known = knownNames(machine.site(), request.product());
+    throw Refusal("target",
+                  quoted(target, machine.site().codePage) + " names no instance of " +
+                      request.product() +
+                      " here; the default instance would be taken in its place" +
+                      (resolved.complaint.empty()
+                           ? ""
+                           : " (" + machine.site().codePage.toUtf8(resolved.complaint) + ")"),
+                  "known " + std::string(known.size() == 1 ? "is " : "are ") +
+                      enumerated(known, machine.site().codePage));
+}
+
+}  // namespace host

@@ -1,0 +1,28 @@
+#include "host/guard/wording.h"
+
+#include <algorithm>
+
+namespace host {
+namespace {
+
+constexpr std::size_t kLongestValue = 120;  // bytes
+constexpr std::size_t kShownNames = 20;
+
+}  // namespace
+
+std::string quoted(const std::string& value, const CodePage& codePage) {
+    const bool isLong = value.size() > kLongestValue;
+    return '"' + codePage.toUtf8(isLong ? value.substr(0, kLongestValue) + "..." : value) + '"';
+}
+
+std::string enumerated(const std::vector<std::string>& names, const CodePage& codePage) {
+    std::string text;
+    for (std::size_t i = 0; i < std::min(names.size(), kShownNames); ++i)
+        text += (i > 0 ? ", " : "") + codePage.toUtf8(names[i]);
+    if (names.size() > kShownNames) {
+        text += " and " + std::to_string(names.size() - kShownNames) + " more";
+    }
+    return text;
+}
+
+}  // namespace host
