@@ -59,7 +59,7 @@ Finding usable(const std::string& path, const std::string& purpose) {
                     fault + "; " + purpose,
                 "make it a directory that the host's user may write to"};
     }
-    return {Verdict::Ok, path + (isThere ? "" : " will be made"), ""};
+    return {Verdict::Ok, path + (isThere ? "" : " can be made"), ""};
 }
 
 std::optional<dev_t> deviceOf(const std::string& path) {

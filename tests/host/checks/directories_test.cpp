@@ -14,7 +14,7 @@ TEST_F(DirectoryChecks, MissingDirectoriesThatCanBeMadeAreFine) {
     environment["QVSDEPLOY_AGENTDEPOT"] = scratch.path("new/depot");
     options.state = scratch.path("new/state");
     for (const char* const check : {"tmp", "depot", "state"}) {
-        expectFinding(check, Verdict::Ok, "will be made");
+        expectFinding(check, Verdict::Ok, "can be made");
     }
     EXPECT_FALSE(scratch.exists("new")) << "checks change nothing";
 }
@@ -31,7 +31,7 @@ TEST_F(DirectoryChecks, FilesInTheirPlaceAreErrors) {
 
 TEST_F(DirectoryChecks, TheDepotIsTheHomesOwnUnlessOneIsNamed) {
     environment.erase("QVSDEPLOY_AGENTDEPOT");
-    expectFinding("depot", Verdict::Ok, home + "/depot will be made");
+    expectFinding("depot", Verdict::Ok, home + "/depot can be made");
     options.guarded = false;
     EXPECT_EQ(find("depot").text, home);
 }
