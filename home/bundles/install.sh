@@ -37,15 +37,26 @@ done
 }
 # shellcheck source=home/lib/common.sh
 . "$chosen_home/lib/common.sh"
+# A home older than this bundle has no such file and needs none.
+# shellcheck source=home/lib/users.sh
+[ ! -r "$chosen_home/lib/users.sh" ] || . "$chosen_home/lib/users.sh"
 # shellcheck source=home/lib/process.sh
 . "$chosen_home/lib/process.sh"
 # shellcheck source=home/lib/install.sh
 . "$chosen_home/lib/install.sh"
 use_home "$chosen_home"
+has() { command -v "$1" >/dev/null; }
+! has use_state || use_state
 
+# Whatever is no file or folder, a FIFO say, could not be read.
+odd=$(find "$bundle" ! -type f ! -type d -print -quit)
+[ -z "$odd" ] || fail "$EXIT_DAMAGED" "$odd is no file"
 read_description "$bundle/product.dsc" ||
     fail "$EXIT_DAMAGED" "$bundle/product.dsc is missing or not complete"
-# A missing or incomplete file must be noticed here, not by the running agent.
+# A missing or incomplete file must be noticed here, not by the running agent. A manifest that was cut
+# lacks its last line.
+! has sealed || sealed "$bundle/manifest" ||
+    fail "$EXIT_DAMAGED" "$bundle/manifest is missing or damaged"
 (cd -- "$bundle" && sha256sum --quiet --strict -c manifest) >&2 ||
     fail "$EXIT_DAMAGED" "the files in $bundle are not those of its manifest"
 

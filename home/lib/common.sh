@@ -5,6 +5,10 @@
 
 # shellcheck disable=SC2154
 
+# Nothing that a program of a home makes may be written by others, whatever umask it was started with.
+# It must not be stricter for everything: a user who runs agents has to read the programs.
+umask go-w
+
 # Exit codes, the same in every program of a home.
 # shellcheck disable=SC2034
 {
@@ -24,7 +28,7 @@
     EXIT_NO_FILE=25     # there is no such file
     EXIT_NOT_IMPORTED=26 # the metafile is not imported
     EXIT_NOT_CONFIRMED=27 # the question was not answered with yes
-    EXIT_DAMAGED=28     # the bundle is not complete
+    EXIT_DAMAGED=28     # the bundle or a product's manifest is damaged
     EXIT_PLATFORM=29    # the bundle is for another platform
     EXIT_UNREACHABLE=30 # the distribution could not be reached
 }
@@ -75,6 +79,7 @@ instance_key() {
 
 # config_file PRODUCT INSTANCE: sets config to the instance's configuration file. The universal agent's
 # files are named differently because the management library reads them too.
+# shellcheck disable=SC2034
 config_file() {
     instance_key "$1" "$2"
     case $1 in
@@ -148,16 +153,57 @@ find_product() {
     return 1
 }
 
-# replace_file FILE: writes standard input to FILE in one step: a reader sees the old file or the
-# new one. The new file keeps the old one's mode.
-replace_file() {
-    replacement=$(dirname -- "$1")/.${1##*/}.$$
-    if { cat >"$replacement"; } 2>/dev/null; then
-        if [ -e "$1" ]; then chmod --reference="$1" "$replacement" 2>/dev/null; fi
-        mv -f -- "$replacement" "$1" 2>/dev/null && return 0
+# plain FILE: succeeds when FILE is a file, or when there is nothing of that name. What is written to
+# is never a link, a FIFO or a device.
+plain() {
+    [ ! -L "$1" ] && { [ -f "$1" ] || [ ! -e "$1" ]; }
+}
+
+# mode_for FILE: prints the mode of a new file there: who may enter the folder may read the file.
+mode_for() {
+    folder_mode=$(stat -L -c %a -- "$(dirname -- "$1")") && printf '%o\n' $((0$folder_mode & 0644))
+}
+
+# rewrite_file FILE COMMAND...: FILE becomes what the command prints. After a crash at any moment it is
+# the old file or the new one, and it is the old one when the command fails. It keeps its mode and,
+# where the caller may give files away, its owner.
+rewrite_file() {
+    rewritten=$1
+    shift
+    [ ! -e "$rewritten" ] || [ -f "$rewritten" ] || return 1
+    remove_abandoned "$rewritten"
+    replacement=$(mktemp -- "$(dirname -- "$rewritten")/.${rewritten##*/}.$$.XXXXXX" 2>/dev/null) ||
+        return 1
+    if { "$@" >"$replacement"; } 2>/dev/null && like_the_old_one && sync -- "$replacement" &&
+        mv -fT -- "$replacement" "$rewritten" 2>/dev/null; then
+        # Some filesystems cannot sync a folder. The file is whole in any case.
+        sync -- "$(dirname -- "$rewritten")" 2>/dev/null
+        return 0
     fi
     rm -f -- "$replacement"
     return 1
+}
+
+like_the_old_one() {
+    if [ -e "$rewritten" ]; then
+        chown --reference="$rewritten" -- "$replacement" 2>/dev/null
+        chmod --reference="$rewritten" -- "$replacement" 2>/dev/null
+    else
+        chmod "$(mode_for "$rewritten")" -- "$replacement" 2>/dev/null
+    fi
+}
+
+# remove_abandoned FILE: removes the unfinished replacements of programs that were killed.
+remove_abandoned() {
+    for abandoned in "$(dirname -- "$1")/.${1##*/}".[0-9]*.??????; do
+        abandoned_by=${abandoned%.*}
+        [ ! -f "$abandoned" ] || [ -d "/proc/${abandoned_by##*.}" ] || rm -f -- "$abandoned"
+    done
+}
+
+# replace_file FILE: writes standard input to FILE like rewrite_file, for input that cannot be cut.
+replace_file() {
+    rewrite_file "$1" cat
 }
 
 # keep_below FILE KILOBYTES: rotates a file larger than that to FILE.1.

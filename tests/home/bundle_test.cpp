@@ -163,9 +163,8 @@ TEST_F(Bundle, BundleForAnotherPlatformIsRefused) {
     const auto at = text.find("Platform=any");
     scratch.write("bundle/product.dsc", std::string(text).replace(at, 12, "Platform=zz9999"));
     run({"/bin/sh", "-c",
-         "cd " + inBundle() +
-             " && find files product.dsc -type f "
-             "-exec sha256sum {} + >manifest"});
+         "cd " + inBundle() + " && . " + inHome("lib/install.sh") +
+             " && find files product.dsc -type f -exec sha256sum {} + | seal >manifest"});
     const Outcome refused = install();
     EXPECT_EQ(refused.status, 29);
     EXPECT_THAT(refused.err, HasSubstr("zz9999"));

@@ -42,9 +42,11 @@ class HomeTest : public ::testing::Test {
 protected:
     void TearDown() override {
         // Nothing that a failed test started may outlive it.
-        if (!std::filesystem::exists(home() + "/run")) return;
-        for (const auto& file : std::filesystem::directory_iterator(home() + "/run")) {
-            if (file.path().extension() != ".pid") continue;
+        std::error_code unreadable;
+        for (const auto& file : std::filesystem::recursive_directory_iterator(home(), unreadable)) {
+            if (file.path().extension() != ".pid" || file.is_symlink() || !file.is_regular_file()) {
+                continue;
+            }
             const pid_t pid = pidIn(file.path());
             std::ifstream environment("/proc/" + std::to_string(pid) + "/environ");
             std::stringstream text;

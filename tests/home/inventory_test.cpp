@@ -220,14 +220,18 @@ TEST_F(PrepareHome, HomeThatCannotBeCompletedIsTakenBack) {
     EXPECT_FALSE(exists("bin"));
 }
 
-TEST_F(PrepareHome, GroupMayWriteWhatAgentsWrite) {
+TEST_F(PrepareHome, GroupMayReadTheConfigurationAndMakeFoldersOfItsOwn) {
     const std::string group = std::to_string(::getgid());
     ASSERT_EQ(prepare({"--arch", "lx8266", "--run-as-group", group}).status, 0);
     struct stat info {};
-    for (const char* shared : {"run", "logs", "data", "config", "universal/work"}) {
+    for (const char* shared : {"run", "config", "config/.ConfigData", "universal/work"}) {
         ASSERT_EQ(::stat(inHome(shared).c_str(), &info), 0);
-        EXPECT_EQ(info.st_mode & 02070U, 02070U) << shared;
+        EXPECT_EQ(info.st_mode & 07777U, 02750U) << shared;
     }
+    ASSERT_EQ(::stat(inHome("users").c_str(), &info), 0);
+    EXPECT_EQ(info.st_mode & 07777U, 03770U);
+    ASSERT_EQ(::stat(inHome("config/um.config").c_str(), &info), 0);
+    EXPECT_EQ(info.st_mode & 07777U, 0640U);
 }
 
 class PathOfHome : public PrepareHome {

@@ -195,9 +195,9 @@ TEST_F(UniversalAgent, NotesWhatItHasStoredBeforeItEnds) {
         {"/usr/bin/setsid", "-w", "/bin/sh", "-c",
          "set -u; . \"$1\"\n"
          "end_agent() { echo ended; exit 0; }\n"
-         "config_value() { :; }\n"
+         "config_value() { :; }; replace_file() { cat >\"$1\"; }\n"
          "store_rows() { sed 's/^/stored /'; kill -TERM 0; }\n"
-         "work=$2 import=f application=F data_source=$2/watched rows=$2/rows\n"
+         "work=$2 notes=$2 import=f application=F data_source=$2/watched rows=$2/rows\n"
          "collect_file; echo went on",
          "sh", ZAV_SOURCE_DIR "/home/bundles/um/files/bin/collect.sh",
          std::filesystem::path(scratch.write("watched", "one\ntwo\nhal")).parent_path().string()});

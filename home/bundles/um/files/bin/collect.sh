@@ -1,5 +1,5 @@
 # shellcheck shell=sh
-# The universal agent's collectors. The agent sets work, scripts, providers, max_kb and
+# The universal agent's collectors. The agent sets work, notes, scripts, providers, max_kb and
 # script_seconds. child is the process to stop together with the agent.
 # shellcheck disable=SC2154
 
@@ -58,7 +58,7 @@ collect_script() {
         say_once "$application: no script $script"
         return
     }
-    output=$work/.output
+    output=$notes/.output
     timeout --foreground -k 5 "$script_seconds" "$script" >"$output" </dev/null &
     child=$!
     wait "$child"
@@ -77,14 +77,18 @@ collect_file() {
         say_once "$application: no file $data_source"
         return
     }
-    offset_file=$work/offsets/${import##*/}
+    offset_file=$notes/offsets/${import##*/}
     offset=0
     [ ! -f "$offset_file" ] || read -r offset <"$offset_file"
-    size=$(wc -c <"$data_source")
+    case $offset in
+    '' | *[!0-9]*) offset=0 ;;
+    esac
+    size=$(stat -L -c %s -- "$data_source") || return 0
     [ "$offset" -le "$size" ] || offset=0
     [ "$offset" -lt "$size" ] || return 0
-    chunk=$work/.chunk
-    tail -c "+$((offset + 1))" -- "$data_source" | head -c 65536 >"$chunk"
+    chunk=$notes/.chunk
+    # The file is somebody else's, who could put a FIFO or a device in its place.
+    dd if="$data_source" bs=65536 iflag=nonblock,skip_bytes skip="$offset" count=1 status=none >"$chunk"
     complete=$(wc -l <"$chunk")
     if [ "$complete" -eq 0 ]; then
         # A line longer than the chunk would block everything after it.
@@ -99,7 +103,7 @@ collect_file() {
     (
         trap '' TERM INT # those who stop the agent tell its whole process group
         head -c "$taken" "$chunk" | store_rows
-    ) && echo "$((offset + taken))" >"$offset_file"
+    ) && echo "$((offset + taken))" | replace_file "$offset_file"
     release_end
     rm -f -- "$chunk"
 }

@@ -1,0 +1,106 @@
+# shellcheck shell=sh
+# Whose files are whose. Read after common.sh; use_state comes after use_home.
+#
+# What the home's owner starts has its pid files, logs and data in run/, logs/ and data/, which only the
+# owner may write. Any other user who runs agents has folders of the same names in users/<user id>/,
+# which is that user's alone. So nobody believes or writes to what another user could have put there.
+# Root looks after another user's instances with that user's rights (lib/own-instances).
+# shellcheck disable=SC2034,SC2154
+
+# use_state: sets user_id, is_owner and state, the folder of the caller's run/, logs/ and data/; exits
+# when others may write where the owner's programs do.
+use_state() {
+    user_id=$(id -u)
+    owner_id=$(stat -L -c %u -- "$home") || fail "$EXIT_HOME" "cannot look at $home"
+    # Root runs the programs of the home's owner, so the two trust each other.
+    if [ "$user_id" -eq 0 ] || [ "$user_id" = "$owner_id" ]; then
+        is_owner=yes state=$home
+        refuse_shared_folders
+    else
+        is_owner=no state=$home/users/$user_id
+    fi
+}
+
+refuse_shared_folders() {
+    shared=$(
+        cd -- "$home" && find -H . bin lib registry agtqvs6 run logs data config universal -maxdepth 0 \
+            \( -perm /022 -o ! -uid 0 ! -uid "$owner_id" \) -print -quit 2>/dev/null
+    )
+    [ -z "$shared" ] || fail "$EXIT_HOME" "other users may write to $home/$shared;" \
+        "give it to the home's owner and run: chmod go-w $home/$shared"
+}
+
+# make_state: makes the caller's folders.
+make_state() {
+    if [ "$is_owner" = no ]; then
+        [ -d "$home/users" ] || {
+            say "only its owner may run agents in $home: it was made without --run-as-group"
+            return "$EXIT_WRITE"
+        }
+        mkdir -m 700 -- "$state" 2>/dev/null
+        # Somebody else may have been there first.
+        [ -n "$(find "$state" -maxdepth 0 -type d -uid "$user_id" ! -perm /077 2>/dev/null)" ] || {
+            say "$state is not a folder that belongs to user $user_id alone"
+            return "$EXIT_WRITE"
+        }
+    fi
+    (umask 077 && mkdir -p -- "$state/run" "$state/logs" "$state/data") 2>/dev/null || {
+        say "cannot write to $state"
+        return "$EXIT_WRITE"
+    }
+}
+
+# other_users: prints the ids of the users who have folders of their own in the home.
+other_users() {
+    for own_folder in "$home/users"/*; do
+        [ -d "$own_folder" ] && [ ! -L "$own_folder" ] || continue
+        case ${own_folder##*/} in
+        0 | *[!0-9]*) ;;
+        *) printf '%s\n' "${own_folder##*/}" ;;
+        esac
+    done
+}
+
+# may_run PRODUCT INSTANCE: sets key; fails when nobody has a pid file for the instance.
+may_run() {
+    instance_key "$1" "$2"
+    for may_run_file in "$state/run/$key.pid" "$home/run/$key.pid" "$home/users"/*/run/"$key.pid"; do
+        [ ! -e "$may_run_file" ] && [ ! -L "$may_run_file" ] || return 0
+    done
+    return 1
+}
+
+# as_user ID VERB PRODUCT ARGUMENT: has lib/own-instances do this with that user's rights, in a session
+# of its own. That user could stop it or keep its descriptors, so it has a time limit and none of the
+# caller's descriptors.
+as_user() {
+    as_user_id=$1
+    shift
+    # shellcheck disable=SC2086
+    timeout --foreground -k 5 280 setsid -w setpriv --reuid="$as_user_id" \
+        --regid="$(stat -c %g -- "$home/users")" --clear-groups --inh-caps=-all --no-new-privs \
+        env -i PATH=/usr/sbin:/usr/bin:/sbin:/bin sh "$home/lib/own-instances" "$home" "$@" \
+        </dev/null >/dev/null 2>&1 3>&- 4>&- 5>&- 6>&- 7>&- 8>&- 9>&-
+}
+
+# for_other_users VERB PRODUCT ARGUMENT: does this for each of the other users. Succeeds when all did
+# it or had nothing to do; done_by then names those who did it.
+for_other_users() {
+    done_by=''
+    [ "$is_owner" = yes ] || return 0
+    for other_user in $(other_users); do
+        if [ "$user_id" -ne 0 ]; then
+            say "note: only root can look at the instances of user $other_user"
+            continue
+        fi
+        as_user "$other_user" "$@"
+        case $? in
+        0) done_by=$done_by${done_by:+, }$other_user ;;
+        "$EXIT_NOT_RUNNING" | "$EXIT_NO_INSTANCE") ;;
+        *)
+            say "could not $1 what user $other_user has of $2"
+            return 1
+            ;;
+        esac
+    done
+}
