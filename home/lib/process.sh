@@ -180,7 +180,7 @@ refuse_running() {
         say "$key runs already, process $agent_pid of the home's owner"
         return "$EXIT_RUNNING"
     fi
-    for_other_users find "$1" "$2" || return "$EXIT_WRITE"
+    for_other_users find "$1" "$2"
     if [ -n "$done_by" ]; then
         say "$key runs already, started by user $done_by"
         return "$EXIT_RUNNING"

@@ -52,13 +52,8 @@ make_state() {
 
 # other_users: prints the ids of the users who have folders of their own in the home.
 other_users() {
-    for own_folder in "$home/users"/*; do
-        [ -d "$own_folder" ] && [ ! -L "$own_folder" ] || continue
-        case ${own_folder##*/} in
-        0 | *[!0-9]*) ;;
-        *) printf '%s\n' "${own_folder##*/}" ;;
-        esac
-    done
+    [ ! -d "$home/users" ] || find "$home/users" -mindepth 1 -maxdepth 1 -type d -printf '%f %U\n' |
+        awk '$1 ~ /^[1-9][0-9]*$/ && $1 == $2 && NF == 2 { print $1 }'
 }
 
 # may_run PRODUCT INSTANCE: sets key; fails when nobody has a pid file for the instance.
@@ -74,17 +69,18 @@ may_run() {
 # of its own. That user could stop it or keep its descriptors, so it has a time limit and none of the
 # caller's descriptors.
 as_user() {
-    as_user_id=$1
+    as_user_id=$1 as_user_limit=280
     shift
-    # shellcheck disable=SC2086
-    timeout --foreground -k 5 280 setsid -w setpriv --reuid="$as_user_id" \
+    [ "$1" != find ] || as_user_limit=10
+    timeout --foreground -k 5 "$as_user_limit" setsid -w setpriv --reuid="$as_user_id" \
         --regid="$(stat -c %g -- "$home/users")" --clear-groups --inh-caps=-all --no-new-privs \
         env -i PATH=/usr/sbin:/usr/bin:/sbin:/bin sh "$home/lib/own-instances" "$home" "$@" \
         </dev/null >/dev/null 2>&1 3>&- 4>&- 5>&- 6>&- 7>&- 8>&- 9>&-
 }
 
 # for_other_users VERB PRODUCT ARGUMENT: does this for each of the other users. Succeeds when all did
-# it or had nothing to do; done_by then names those who did it.
+# it or had nothing to do; done_by then names those who did it. Where nothing is found because that
+# user does not let it be found, there is nothing.
 for_other_users() {
     done_by=''
     [ "$is_owner" = yes ] || return 0
@@ -98,6 +94,7 @@ for_other_users() {
         0) done_by=$done_by${done_by:+, }$other_user ;;
         "$EXIT_NOT_RUNNING" | "$EXIT_NO_INSTANCE") ;;
         *)
+            [ "$1" != find ] || continue
             say "could not $1 what user $other_user has of $2"
             return 1
             ;;
