@@ -4,8 +4,11 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <optional>
 #include <random>
+#include <stdexcept>
 #include <string>
+#include <vector>
 
 #include "ncs/memory.h"
 #include "platform/ncs_packets.h"
@@ -20,8 +23,10 @@ constexpr std::size_t kLimit = 100'000;
 /// Feeds an association by way of its windows and collects what it says.
 class Wire {
 public:
-    explicit Wire(std::size_t limit = kLimit, std::size_t budget = 10 * kLimit)
-        : shared(limit, budget), association(std::make_unique<ncs::Association>(shared, "")) {}
+    explicit Wire(std::size_t limit = kLimit, std::size_t budget = 10 * kLimit,
+                  ncs::CallWatch* watch = nullptr)
+        : shared(limit, budget, watch),
+          association(std::make_unique<ncs::Association>(shared, "")) {}
 
     /// Portions of at most `size` bytes; stops when the association ends.
     void feed(const std::string& bytes, std::size_t size = static_cast<std::size_t>(-1)) {
@@ -570,6 +575,80 @@ TEST_F(AnAssociation, SurvivesDamagedConversations) {
         fresh.association.reset();
         ASSERT_TRUE(fresh.shared.memory.take(2000)) << round;
     }
+}
+
+/// Writes down what it sees.
+class Watch final : public ncs::CallWatch {
+public:
+    std::optional<std::string> before(const ncs::Call& call) override {
+        seen += std::string("before ") + call.interface + " " + std::to_string(call.operation) +
+                (call.littleEndian ? " little " : " big ") +
+                std::string(reinterpret_cast<const char*>(call.data), call.length) + "\n";
+        associations.push_back(call.association);
+        if (throws) throw std::runtime_error("watch");
+        return answer;
+    }
+    void after(const ncs::Call& call, const std::string& reply) noexcept override {
+        seen += "after " + std::to_string(call.operation) + " [" + reply + "]\n";
+    }
+    void ended(std::uint64_t association) noexcept override {
+        seen += "ended\n";
+        associations.push_back(association);
+    }
+
+    std::string seen;
+    std::vector<std::uint64_t> associations;
+    std::optional<std::string> answer;
+    bool throws = false;
+};
+
+class AWatchedAssociation : public AnAssociation {
+protected:
+    AWatchedAssociation() : watched(kLimit, 10 * kLimit, &watch) { watched.ask(bindPacket()); }
+
+    Watch watch;
+    Wire watched;
+};
+
+TEST_F(AWatchedAssociation, ShowsEachCallBeforeAndAfterItsStub) {
+    EXPECT_EQ(stubOf(watched.ask(requestPackets(kRepeat, "text", 3))), "text");
+    EXPECT_EQ(watch.seen, "before echo 0 little text\nafter 0 [text]\n");
+    watched.ask(requestPackets(kRepeat, "text", 100, 2, false));
+    EXPECT_THAT(watch.seen, testing::HasSubstr("before echo 0 big text\n"));
+}
+
+TEST_F(AWatchedAssociation, LetsTheWatchAnswerInTheStubsPlace) {
+    watch.answer = "from the watch";
+    EXPECT_EQ(stubOf(watched.ask(requestPackets(kRepeat, "text"))), "from the watch");
+    EXPECT_EQ(callsOfRepeat(), 0);
+    EXPECT_EQ(watched.shared.calls, 0U);
+    EXPECT_EQ(watch.seen, "before echo 0 little text\n");
+}
+
+TEST_F(AWatchedAssociation, AnswersWithAFaultWhenTheWatchThrows) {
+    watch.throws = true;
+    const std::vector<Reply> answers = watched.ask(requestPackets(kRepeat, "text"));
+    ASSERT_EQ(answers.size(), 1U);
+    EXPECT_EQ(answers[0].type, kFault);
+    EXPECT_EQ(callsOfRepeat(), 0);
+}
+
+TEST_F(AWatchedAssociation, ShowsACallThatEndsWithAFaultAsOneWithoutAReply) {
+    watched.ask(requestPackets(kRefuse, ""));
+    EXPECT_EQ(watch.seen, "before echo 2 little \nafter 2 []\n");
+}
+
+TEST_F(AWatchedAssociation, TellsItsEndUnderTheNumberOfItsCalls) {
+    watched.ask(requestPackets(kRepeat, "a"));
+    watched.ask(requestPackets(kRepeat, "b", 100, 2));
+    watched.association.reset();
+    EXPECT_EQ(watch.associations, (std::vector<std::uint64_t>{1, 1, 1}));
+    EXPECT_THAT(watch.seen, testing::EndsWith("ended\n"));
+}
+
+TEST_F(AWatchedAssociation, SaysNothingOfItsEndWithoutACall) {
+    watched.association.reset();
+    EXPECT_EQ(watch.seen, "");
 }
 
 }  // namespace

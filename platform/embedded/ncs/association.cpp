@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <optional>
 #include <utility>
 
 #include "platform/ras1.h"
@@ -41,20 +42,14 @@ std::uint16_t commonMaximum(std::uint16_t clients) {
     return std::clamp(clients, kSmallestMaximum, kLargestFragment);
 }
 
-/// Calls a stub. If it throws, against its contract, that becomes a fault.
-std::uint32_t callStub(rpc__server_stub stub, const rpc__request& request, const void* manager,
-                       rpc__reply& reply) {
-    try {
-        return stub(&request, manager, &reply);
-    } catch (...) {
-        return rpc__s_fault_unspec;
-    }
-}
-
 }  // namespace
 
 Association::Association(SharedState& shared, std::string port)
     : shared_(shared), port_(std::move(port)), stub_(shared.memory) {}
+
+Association::~Association() {
+    if (watchedAs_ != 0) shared_.watch->ended(watchedAs_);
+}
 
 int Association::windows(iovec (&ranges)[2]) {
     if (directLeft_ == 0) {
@@ -208,20 +203,54 @@ void Association::finishCall() {
 
 /// Calls the stub and appends its reply to the output. Returns 0 or the fault to answer with.
 std::uint32_t Association::execute() {
-    ++shared_.calls;
     unsigned char replyBytes[kReplyCapacity];
     rpc__binding binding;
     const rpc__request request{&binding, stub_.data(), stub_.size(), call_.littleEndian};
     rpc__reply reply{replyBytes, sizeof replyBytes, 0};
-    const RegisteredInterface& interface = call_.interface;
     const std::uint32_t fault =
-        callStub(interface.stubs->stubs[call_.operation], request, interface.manager, reply);
+        shared_.watch != nullptr ? watchedCall(request, reply) : callStub(request, reply);
     if (fault != 0) return fault;
-    if (reply.length > sizeof replyBytes) return rpc__s_fault_unspec;
     if (call_.answered) {
         encodeResponse(call_.id, call_.contextId, replyBytes, reply.length, largestSent_, output_);
     }
     return 0;
+}
+
+/// Asks the watch first; it may have the answer.
+std::uint32_t Association::watchedCall(const rpc__request& request, rpc__reply& reply) {
+    if (watchedAs_ == 0) watchedAs_ = ++shared_.associations;
+    const ncs::Call call{watchedAs_,      call_.interface.interface->name,
+                         call_.operation, request.data,
+                         request.length,  request.littleEndian};
+    std::optional<std::string> answer;
+    try {
+        answer = shared_.watch->before(call);
+    } catch (...) {
+        return rpc__s_fault_unspec;
+    }
+    if (answer) {
+        reply.length = std::min(answer->size(), reply.capacity);
+        std::memcpy(reply.data, answer->data(), reply.length);
+        return rpc__s_ok;
+    }
+    const std::uint32_t fault = callStub(request, reply);
+    const std::size_t length = fault == rpc__s_ok ? reply.length : 0;
+    shared_.watch->after(call, std::string(reinterpret_cast<const char*>(reply.data), length));
+    return fault;
+}
+
+/// Calls the stub. If it throws, or claims more than the reply holds, against its contract, that
+/// becomes a fault.
+std::uint32_t Association::callStub(const rpc__request& request, rpc__reply& reply) {
+    ++shared_.calls;
+    const RegisteredInterface& interface = call_.interface;
+    try {
+        const std::uint32_t fault =
+            interface.stubs->stubs[call_.operation](&request, interface.manager, &reply);
+        return fault == rpc__s_ok && reply.length > reply.capacity ? rpc__s_fault_unspec : fault;
+    } catch (...) {
+        return rpc__s_fault_unspec;
+    }
 }
 
 void Association::endCall() {

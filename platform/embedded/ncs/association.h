@@ -10,6 +10,7 @@
 #include <map>
 #include <string>
 
+#include "embedded/ncs_host.h"
 #include "ncs/pdu.h"
 #include "ncs/registry.h"
 #include "ncs/stub_buffer.h"
@@ -22,10 +23,12 @@ namespace ncs {
 
 /// Shared by all associations of a server.
 struct SharedState {
-    SharedState(std::size_t stubLimit, std::size_t totalLimit)
-        : largestStub(stubLimit), memory(totalLimit) {}
+    SharedState(std::size_t stubLimit, std::size_t totalLimit, CallWatch* callWatch = nullptr)
+        : largestStub(stubLimit), watch(callWatch), memory(totalLimit) {}
 
-    const std::size_t largestStub;  ///< bytes of one call's parameters
+    const std::size_t largestStub;               ///< bytes of one call's parameters
+    CallWatch* const watch;                      ///< null when nobody watches
+    std::atomic<std::uint64_t> associations{0};  ///< that made calls while somebody watched
     MemoryBudget memory;
     std::atomic<std::uint64_t> calls{0};   ///< that reached a stub
     std::atomic<std::uint64_t> faults{0};  ///< that were answered
@@ -36,6 +39,8 @@ class Association {
 public:
     /// `port` is the TCP port that the client connected to, in decimal; empty for a Unix socket.
     Association(SharedState& shared, std::string port);
+    /// Tells the watch.
+    ~Association();
     Association(const Association&) = delete;
     Association& operator=(const Association&) = delete;
 
@@ -86,6 +91,8 @@ private:
     void finishCall();
     std::uint32_t resolve();
     std::uint32_t execute();
+    std::uint32_t watchedCall(const rpc__request& request, rpc__reply& reply);
+    std::uint32_t callStub(const rpc__request& request, rpc__reply& reply);
     void endCall();
 
     void bind(PduType answerType, const unsigned char* pdu, const PduHeader& header);
@@ -101,6 +108,7 @@ private:
     std::uint16_t largestSent_ = kSmallestMaximum;
     std::map<std::uint16_t, Context> contexts_;
     std::uint64_t requestsDone_ = 0;
+    std::uint64_t watchedAs_ = 0;  ///< the number that the watch knows; 0 before the first call
     std::string output_;
 
     Call call_;

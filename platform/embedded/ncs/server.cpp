@@ -54,7 +54,7 @@ private:
 
 class Server::Implementation {
 public:
-    explicit Implementation(const Limits& limits);
+    Implementation(const Limits& limits, CallWatch* callWatch);
     ~Implementation() { stop(); }
     Implementation(const Implementation&) = delete;
     Implementation& operator=(const Implementation&) = delete;
@@ -93,9 +93,9 @@ private:
     Counts counts_ ZAV_GUARDED_BY(lock_);
 };
 
-Server::Implementation::Implementation(const Limits& limits)
+Server::Implementation::Implementation(const Limits& limits, CallWatch* callWatch)
     : limits_(limits),
-      shared_(limits.stubBytes, limits.totalStubBytes),
+      shared_(limits.stubBytes, limits.totalStubBytes, callWatch),
       poll_(checked(::epoll_create1(EPOLL_CLOEXEC), "epoll_create1")),
       timer_(
           checked(::timerfd_create(CLOCK_MONOTONIC, TFD_CLOEXEC | TFD_NONBLOCK), "timerfd_create")),
@@ -228,10 +228,19 @@ void Server::Implementation::serve(Connection& connection) {
     rearm(connection.socket(), connection, event);
 }
 
+/// Destroys the connection without the lock, because the watch hears of its end.
 void Server::Implementation::close(Connection& connection) {
-    const embedded::MutexLock lock(lock_);
-    connections_.erase(&connection);
-    if (connections_.empty()) releaseKeptBlocks();
+    std::unique_ptr<Connection> ended;
+    bool isLast = false;
+    {
+        const embedded::MutexLock lock(lock_);
+        const auto found = connections_.find(&connection);
+        ended = std::move(found->second);
+        connections_.erase(found);
+        isLast = connections_.empty();
+    }
+    ended.reset();
+    if (isLast) releaseKeptBlocks();
 }
 
 void Server::Implementation::wakeBy(Milliseconds deadline) {
@@ -288,13 +297,17 @@ void Server::Implementation::stop() {
     [[maybe_unused]] const ssize_t put = ::write(stopEvent_.get(), &one, sizeof one);
     for (std::thread& thread : threads)
         thread.join();
-    const embedded::MutexLock lock(lock_);
-    for (const auto& listener : listeners_) {
-        ::epoll_ctl(poll_.get(), EPOLL_CTL_DEL, listener->socket, nullptr);
+    std::unordered_map<Connection*, std::unique_ptr<Connection>> ended;
+    {
+        const embedded::MutexLock lock(lock_);
+        for (const auto& listener : listeners_) {
+            ::epoll_ctl(poll_.get(), EPOLL_CTL_DEL, listener->socket, nullptr);
+        }
+        listeners_.clear();
+        ownSockets_.clear();
+        ended.swap(connections_);
     }
-    listeners_.clear();
-    ownSockets_.clear();
-    connections_.clear();
+    ended.clear();
     releaseKeptBlocks();
 }
 
@@ -307,7 +320,8 @@ Counts Server::Implementation::counts() const {
     return counts;
 }
 
-Server::Server(const Limits& limits) : implementation_(std::make_unique<Implementation>(limits)) {}
+Server::Server(const Limits& limits, CallWatch* watch)
+    : implementation_(std::make_unique<Implementation>(limits, watch)) {}
 
 Server::~Server() = default;
 

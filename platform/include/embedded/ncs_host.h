@@ -10,8 +10,37 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
+#include <string>
 
 namespace ncs {
+
+/// One complete call, as it came. Valid as long as the callback that gets it.
+struct Call {
+    std::uint64_t association = 0;        ///< of the client; a number is never used twice
+    const char* interface = "";           ///< the name that it was registered with
+    unsigned operation = 0;               ///< counted from 0
+    const unsigned char* data = nullptr;  ///< the marshalled parameters; nothing is checked yet
+    std::size_t length = 0;
+    bool littleEndian = true;  ///< the caller's byte order
+};
+
+/// Sees every call before its stub does, and may answer in its place. Called on the server's
+/// threads, several at a time, without a lock held; the calls of one association come one after the
+/// other.
+class CallWatch {
+public:
+    virtual ~CallWatch() = default;
+    /// Comes before the stub. A text that it returns is the reply's marshalled data, of at most
+    /// 4096 bytes: the stub is not called then. What it throws becomes a fault.
+    virtual std::optional<std::string> before(const Call& call) = 0;
+    /// Comes after a stub that was called. `reply` is its reply's data, empty when the call ended
+    /// with a fault.
+    virtual void after(const Call& call, const std::string& reply) noexcept = 0;
+    /// An association that had made calls is over; none of its calls is running. Comes before its
+    /// client sees the end of the connection.
+    virtual void ended(std::uint64_t association) noexcept = 0;
+};
 
 struct Limits {
     unsigned workers = 8;                          ///< threads, and so calls that run at a time
@@ -37,8 +66,9 @@ struct Counts {
 /// block all signals. All operations are thread-safe. Without connections no thread wakes up.
 class Server {
 public:
-    /// Starts the threads. Throws std::system_error.
-    explicit Server(const Limits& limits = {});
+    /// Starts the threads. `watch` outlives the server; null stands for none. Throws
+    /// std::system_error.
+    explicit Server(const Limits& limits = {}, CallWatch* watch = nullptr);
     /// Calls stop().
     ~Server();
     Server(const Server&) = delete;
