@@ -8,7 +8,7 @@ set -eu
 cd "$(dirname "$0")/.."
 
 packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev libexpat1-dev
-libboost-dev nlohmann-json3-dev libcli11-dev mksh curl pkgconf procps shellcheck clang
+libssl-dev libboost-dev nlohmann-json3-dev libcli11-dev mksh curl pkgconf procps shellcheck clang
 libclang-rt-dev'
 # Programs that only judge the product from outside; their tests are skipped without them.
 judges='python3-impacket tshark'
@@ -67,19 +67,26 @@ fi
 [ -z "$missing_judges" ] || install $missing_judges ||
     echo "bootstrap: could not install" $missing_judges "- their tests will be skipped" >&2
 
-# The 32-bit expat cannot be installed beside the 64-bit one: it is unpacked below build/ instead.
+# The 32-bit libraries cannot be installed beside the 64-bit ones: they are unpacked below build/
+# instead. `package` holds the static library `file`.
 i386_root=build/third_party/i386
-if [ ! -f "$i386_root/usr/lib/i386-linux-gnu/libexpat.a" ]; then
-    echo "bootstrap: unpacking the 32-bit expat into $i386_root"
+unpack_i386() {
+    package=$1 file=$2
+    [ ! -f "$i386_root/usr/lib/i386-linux-gnu/$file" ] || return 0
+    echo "bootstrap: unpacking the 32-bit $package into $i386_root"
     if ! dpkg --print-foreign-architectures | grep -qx i386; then
         as_root dpkg --add-architecture i386
         refresh_lists
-    elif ! apt-cache show libexpat1-dev:i386 >/dev/null 2>&1; then
+    elif ! apt-cache show "$package:i386" >/dev/null 2>&1; then
         refresh_lists
     fi
     mkdir -p "$i386_root"
     scratch=$(mktemp -d)
     trap 'rm -rf "$scratch"' EXIT
-    (cd "$scratch" && apt-get -qq -o APT::Sandbox::User=root download libexpat1-dev:i386)
-    dpkg -x "$scratch"/libexpat1-dev_*_i386.deb "$i386_root"
-fi
+    (cd "$scratch" && apt-get -qq -o APT::Sandbox::User=root download "$package:i386")
+    dpkg -x "$scratch/$package"_*_i386.deb "$i386_root"
+    rm -rf "$scratch"
+    trap - EXIT
+}
+unpack_i386 libexpat1-dev libexpat.a
+unpack_i386 libssl-dev libcrypto.a
