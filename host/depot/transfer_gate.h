@@ -1,0 +1,48 @@
+/// Stands between the clients that send files and the plug-in that takes them.
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <optional>
+#include <string>
+
+#include "embedded/mutex.h"
+#include "embedded/ncs_host.h"
+#include "host/depot/transfer_rules.h"
+
+namespace host {
+
+/// Refuses transfers with status 6 before the plug-in sees them: those that the rules forbid and,
+/// when guarded, those of a file that another client is just sending. The protocol does not say
+/// where a transfer ends. Here it ends with a batch whose last chunk is not full, with a batch that
+/// fails, with the first batch of the client's next file, or with its association. Any thread.
+class TransferGate final : public ncs::CallWatch {
+public:
+    /// The rules outlive this object.
+    explicit TransferGate(const TransferRules& rules) : rules_(rules) {}
+
+    std::optional<std::string> before(const ncs::Call& call) override;
+    void after(const ncs::Call& call, const std::string& reply) noexcept override;
+    void ended(std::uint64_t association) noexcept override;
+
+    /// What stands against a push of that name now.
+    std::optional<Objection> objectionTo(const std::string& name) const;
+    /// Whether some client is just sending this file, or one below it if it is a directory.
+    bool isReceiving(const std::string& name) const;
+
+private:
+    struct Transfer {
+        std::string destination;
+        bool endsFile = false;
+    };
+    std::optional<Objection> begin(std::uint64_t association, Transfer transfer);
+    bool isSentByOther(std::uint64_t association, const std::string& destination) const
+        ZAV_REQUIRES(lock_);
+
+    const TransferRules& rules_;
+    mutable embedded::Mutex lock_;
+    /// What each association is sending.
+    std::map<std::uint64_t, Transfer> underWay_ ZAV_GUARDED_BY(lock_);
+};
+
+}  // namespace host

@@ -1,0 +1,167 @@
+#include "host/depot/transfer_rules.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <initializer_list>
+#include <utility>
+
+#include "host/depot/beneath.h"
+#include "host/depot/conversion_probe.h"
+#include "host/depot/real_path.h"
+
+namespace host {
+namespace {
+
+bool isLink(const std::string& path) {
+    struct stat found {};
+    return ::lstat(path.c_str(), &found) == 0 && S_ISLNK(found.st_mode);
+}
+
+/// The directory part with its slash, and the rest.
+std::pair<std::string, std::string> split(const std::string& path) {
+    const std::size_t slash = path.rfind('/');
+    const std::size_t end = slash == std::string::npos ? 0 : slash + 1;
+    return {path.substr(0, end), path.substr(end)};
+}
+
+/// Whether a ".." climbs above the depot, or follows a link, after which it could lead anywhere.
+bool climbsOut(const std::string& depot, const std::string& path) {
+    std::string prefix = depot;
+    int depth = 0;
+    for (std::size_t at = 0; at < path.size();) {
+        const std::size_t end = std::min(path.find('/', at), path.size());
+        const std::string component = path.substr(at, end - at);
+        if (component == ".." && (--depth < 0 || isLink(prefix))) return true;
+        if (component != ".." && component != "." && !component.empty()) ++depth;
+        if (!component.empty()) prefix += "/" + component;
+        at = end + 1;
+    }
+    return false;
+}
+
+/// Whether a link among the directories that exist leads out.
+bool linksOut(const std::string& depot, const std::string& path) {
+    const FileDescriptor root(::open(depot.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    if (!root) return false;
+    for (std::string directory = split(path).first; !directory.empty();) {
+        if (openBeneath(root.get(), directory, O_PATH)) return false;
+        if (errno != ENOENT) return errno == EXDEV;
+        directory.resize(directory.find_last_not_of('/') + 1);
+        directory = split(directory).first;
+    }
+    return false;
+}
+
+/// The file system of a path, or of what exists above it; 0 when that cannot be told.
+dev_t deviceOf(std::string path) {
+    struct stat found {};
+    while (!path.empty()) {
+        if (::stat(path.c_str(), &found) == 0) return found.st_dev;
+        path = split(path).first;
+        while (!path.empty() && path.back() == '/')
+            path.pop_back();
+    }
+    return 0;
+}
+
+std::vector<std::string> realPaths(const std::vector<std::string>& paths) {
+    std::vector<std::string> real;
+    for (const std::string& path : paths)
+        real.push_back(realPath(path));
+    return real;
+}
+
+const char* const kConversionHint =
+    "Use a depot on the file system of the home's tmp directory, or another name: without "
+    "install.sh, DeployLnk.sh and .mdl in it nothing is converted.";
+
+}  // namespace
+
+TransferRules::TransferRules(const Depot& depot, const std::string& home, CodePage codePage,
+                             bool guarded)
+    : depot_(depot),
+      kept_(realPaths(depot.keptOut())),
+      temporaries_(home + "/tmp"),
+      codePage_(std::move(codePage)),
+      guarded_(guarded),
+      conversionProblem_(guarded ? host::conversionProblem(temporaries_, depot.directory()) : "") {}
+
+std::optional<std::string> TransferRules::arrivalName(const std::string& name) const {
+    // Backslashes are replaced as characters: in some code pages a letter's second byte looks like
+    // one.
+    std::string text = codePage_.toUtf8(name);
+    if (codePage_.fromUtf8(text) != name) return std::nullopt;
+    std::replace(text.begin(), text.end(), '\\', '/');
+    if (!text.empty() && text.front() == '/') text.erase(0, 1);
+    return codePage_.fromUtf8(text);
+}
+
+std::string TransferRules::pathOf(const std::string& name) const {
+    // A name that is no text gets other letters in its place, which lead nowhere else.
+    return depot_.directory() + "/" + arrivalName(name).value_or(name);
+}
+
+std::string TransferRules::destination(const std::string& name) const {
+    const auto [directory, base] = split(pathOf(name));
+    return realPath(directory) + "/" + base;
+}
+
+bool TransferRules::isConverted(const std::string& name) const {
+    // The plug-in looks at the whole path.
+    const std::string path = pathOf(name);
+    const auto marks = {"install.sh", "DeployLnk.sh", ".mdl"};
+    return std::any_of(marks.begin(), marks.end(),
+                       [&path](const char* mark) { return path.find(mark) != std::string::npos; });
+}
+
+bool TransferRules::leadsOut(const std::string& name) const {
+    const std::string path = arrivalName(name).value_or(name);
+    return climbsOut(depot_.directory(), path) || linksOut(depot_.directory(), path);
+}
+
+/// A batch that is appended follows a link in the place of the file.
+bool TransferRules::isKept(const std::string& name, const std::string& destination,
+                           bool startsFile) const {
+    const std::string behind = startsFile ? destination : realPath(pathOf(name));
+    return std::any_of(kept_.begin(), kept_.end(), [&](const std::string& directory) {
+        return isWithin(destination, directory) || isWithin(behind, directory);
+    });
+}
+
+bool TransferRules::canConvertAt(const std::string& name) const {
+    return deviceOf(pathOf(name)) == deviceOf(temporaries_);
+}
+
+std::optional<Objection> TransferRules::objectionTo(const std::string& name,
+                                                    const std::string& destination,
+                                                    bool startsFile) const {
+    if (isKept(name, destination, startsFile))
+        return Objection{"", "the name lies in the host's own files", ""};
+    if (!guarded_) return std::nullopt;
+    if (!arrivalName(name)) {
+        return Objection{"depot-names",
+                         "the name is no text in the host's code page, " + codePage_.name() +
+                             ", and would arrive as another one",
+                         "Rename the file."};
+    }
+    if (!isConverted(name)) return std::nullopt;
+    if (!conversionProblem_.empty()) {
+        return Objection{"depot-conversion",
+                         "line ends of this file would be converted, and it would be lost: " +
+                             conversionProblem_,
+                         kConversionHint};
+    }
+    if (!canConvertAt(name)) {
+        return Objection{"depot-conversion",
+                         "line ends of this file would be converted, and it would be lost: its "
+                         "directory is on another file system than " +
+                             temporaries_,
+                         kConversionHint};
+    }
+    return std::nullopt;
+}
+
+}  // namespace host
