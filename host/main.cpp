@@ -19,6 +19,7 @@
 #include "host/api/services.h"
 #include "host/checks/check_list.h"
 #include "host/commands/recorder.h"
+#include "host/depot/depot_directory.h"
 #include "host/home/temporary_directory.h"
 #include "host/http/server.h"
 #include "host/process/home_lock.h"
@@ -133,11 +134,14 @@ void run(const HostOptions& options) {
     const int endDescriptor = catchSignals({SIGTERM, SIGINT});
     const int reopenDescriptor = catchSignals({SIGHUP});
     const int childDescriptor = options.guarded ? catchSignals({SIGCHLD}) : -1;
+    const DepotDirectory depot =
+        depotDirectoryOf(options.home, std::getenv(kDepotVariable), options.guarded);
+    provideDepotDirectory(depot);
     Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
-                      options.guarded);
+                      options.guarded, {depot.path, options.state});
     services.checkSubject = [options] { return CheckSubject(options, environmentVariable); };
     Api api(services, routes());
-    ncs::Server transfers;
+    ncs::Server transfers({}, &services.transfers);
     serveTransfers(transfers, transferSocket, options);
     HttpServer server(socket.listen(), api, services.counts);
     server.endWhenReadable(endDescriptor, kEndGrace);

@@ -5,12 +5,28 @@
 
 #include "host/api/call.h"
 #include "host/api/services.h"
+#include "host/depot/depot_error.h"
 #include "host/guard/refusal.h"
 #include "host/tables/bad_request.h"
 #include "host/tables/query.h"
 
 namespace host {
 namespace {
+
+unsigned statusOf(DepotError::Kind kind) {
+    switch (kind) {
+        case DepotError::Kind::LeadsOut:
+        case DepotError::Kind::WrongKind:
+            return 400;
+        case DepotError::Kind::Forbidden:
+            return 403;
+        case DepotError::Kind::NotThere:
+            return 404;
+        case DepotError::Kind::Failed:
+            break;
+    }
+    return 500;
+}
 
 Answer answerTo(Services& services, Call& call) {
     try {
@@ -20,6 +36,8 @@ Answer answerTo(Services& services, Call& call) {
         return errorReply(400, bad.what());
     } catch (const Refusal& refused) {
         return guardReply(refused.httpStatus(), refused.what(), refused.guard(), refused.hint());
+    } catch (const DepotError& error) {
+        return errorReply(statusOf(error.kind()), error.what());
     } catch (const QueryFailed& failed) {
         return errorReply(failed.gone() ? 404 : 500, failed.what());
     }

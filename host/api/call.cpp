@@ -100,6 +100,14 @@ const std::string* Call::text(const char* name) const {
     return nullptr;
 }
 
+std::vector<std::string> Call::texts(const char* name) const {
+    std::vector<std::string> values;
+    for (const auto& [known, value] : match_.parameters) {
+        if (known == name) values.push_back(value);
+    }
+    return values;
+}
+
 long long Call::number(const char* name, long long otherwise) const {
     const std::string* const value = text(name);
     return value == nullptr ? otherwise : std::atoll(value->c_str());

@@ -24,6 +24,8 @@ public:
 
     /// The value of a parameter of the path or of the query; null when it was not given.
     const std::string* text(const char* name) const;
+    /// The values of a parameter of type Texts, in their order.
+    std::vector<std::string> texts(const char* name) const;
     /// The value of a required parameter.
     const std::string& required(const char* name) const { return *text(name); }
     /// The value of a parameter of type Number; `otherwise` when it was not given.

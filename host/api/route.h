@@ -13,7 +13,8 @@ class Call;
 struct Services;
 
 /// Answers one request that fits its route. What it throws as BadRequest is answered with 400, as
-/// Refusal with 409 or 400, as QueryFailed with 404 or 500.
+/// Refusal with 409 or 400, as DepotError with 400, 403, 404 or 500, as QueryFailed with 404 or
+/// 500.
 using Endpoint = Answer(Services& services, const Call& call);
 
 /// Where an endpoint runs.
@@ -27,6 +28,7 @@ enum class Need { Optional, Required };
 /// The type of a parameter of the path or of the query.
 enum class Type {
     Text,
+    Texts,   ///< text, and the parameter may be given several times
     Number,  ///< a whole number from 0 up, at most 18 digits
     Flag,    ///< 0 or 1
 };

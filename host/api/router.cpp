@@ -30,6 +30,7 @@ const Parameter* parameterOf(const Route& route, std::string_view name) {
 bool hasType(const std::string& value, Type type) {
     switch (type) {
         case Type::Text:
+        case Type::Texts:
             return true;
         case Type::Number:
             return !value.empty() && value.size() <= kMaxDigits &&
@@ -43,6 +44,7 @@ bool hasType(const std::string& value, Type type) {
 const char* nameOf(Type type) {
     switch (type) {
         case Type::Text:
+        case Type::Texts:
             return "text";
         case Type::Number:
             return "a whole number";
@@ -105,7 +107,8 @@ Reply wrongMethod(const std::string& path, const std::vector<const Route*>& rout
 void takeParameter(Match& match, const Parameter& parameter, const std::string& value) {
     const std::string name = parameter.name;
     for (const auto& taken : match.parameters) {
-        if (taken.first == name) throw BadRequest("the parameter \"" + name + "\" is given twice");
+        if (taken.first == name && parameter.type != Type::Texts)
+            throw BadRequest("the parameter \"" + name + "\" is given twice");
     }
     if (!hasType(value, parameter.type)) {
         throw BadRequest("the parameter \"" + name + "\" is not " + nameOf(parameter.type));

@@ -4,6 +4,7 @@ namespace host {
 
 /// The endpoints. Each has a file of its own in this folder and a row below.
 Endpoint getTables, postQuery, getEvents, getTasks, getTask, getDoctor, getHealth;
+Endpoint getDepot, deleteDepot, getDepotSum, getDepotCheck;
 
 // clang-format off
 std::vector<Route> routes() {
@@ -39,6 +40,24 @@ std::vector<Route> routes() {
 
         {"GET", "/v1/health", "What the host says about itself.",
          Access::Read, Runs::AtOnce, getHealth},
+
+        {"GET", "/v1/depot", "What the depot holds.",
+         Access::Read, Runs::OnWorker, getDepot,
+         {{"path", Type::Text, Need::Optional, "a directory or file; the depot if not given"}}},
+
+        {"DELETE", "/v1/depot", "Removes a file or a directory of the depot.",
+         Access::Act, Runs::OnWorker, deleteDepot,
+         {{"path", Type::Text, Need::Required, "what is to be removed"},
+          {"recursive", Type::Flag, Need::Optional, "1: a directory with everything in it"}}},
+
+        {"GET", "/v1/depot/sum", "The SHA-256 of files of the depot.",
+         Access::Read, Runs::OnWorker, getDepotSum,
+         {{"path", Type::Texts, Need::Required, "a file; may be given several times"}}},
+
+        {"GET", "/v1/depot/check", "Whether the host would take files.",
+         Access::Read, Runs::OnWorker, getDepotCheck,
+         {{"path", Type::Texts, Need::Required, "the name to be; may be given several times"},
+          {"bytes", Type::Number, Need::Optional, "the size of all of them together"}}},
     };
 }
 // clang-format on

@@ -10,7 +10,10 @@
 
 #include "host/checks/check.h"
 #include "host/commands/ear.h"
+#include "host/depot/depot.h"
 #include "host/depot/depot_directory.h"
+#include "host/depot/transfer_gate.h"
+#include "host/depot/transfer_rules.h"
 #include "host/guard/guards.h"
 #include "host/http/server_counts.h"
 #include "host/outcomes/outcome_feed.h"
@@ -22,15 +25,23 @@
 
 namespace host {
 
+/// Directories that need not be where the home would have them.
+struct Places {
+    std::string depot{};  ///< empty: the home itself
+    std::string state{};  ///< empty: HOME/zavhost
+};
+
 /// Made once, after the plug-in has started, and shared by all requests. Any thread.
 struct Services {
     Services(std::vector<oxa::Table> offered, CodePage localCodePage, std::string homeDirectory,
-             RowQueue::Limits limits = {}, bool isGuarded = true)
+             RowQueue::Limits limits = {}, bool isGuarded = true, Places places = {})
         : tables(std::move(offered)),
           codePage(std::move(localCodePage)),
           home(std::move(homeDirectory)),
           eventLimits(limits),
-          guarded(isGuarded) {
+          guarded(isGuarded),
+          depotFiles(places.depot.empty() ? home : std::move(places.depot),
+                     {places.state.empty() ? home + "/zavhost" : std::move(places.state)}) {
         hearCommands();
     }
 
@@ -41,6 +52,9 @@ struct Services {
     const bool guarded;  ///< false: no guard looks at a request
     /// What the checks of GET /v1/doctor look at; main() sets it before it serves.
     std::function<CheckSubject()> checkSubject;
+    const Depot depotFiles;
+    const TransferRules transferRules{depotFiles, home, codePage, guarded};
+    TransferGate transfers{transferRules};
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
     const std::string depot =  ///< its directory, in that code page, too
         depotDirectoryOf(home, std::getenv(kDepotVariable), guarded).path;

@@ -39,9 +39,9 @@ protected:
                                {"meaning", words}};
         EXPECT_EQ(document["files"], json::array({expected}));
     }
-    /// The host's socket for transfers and its ends of connections, accepted or not.
-    std::size_t transferSockets() const {
-        const std::string path = host_->socket() + ".rpc";
+    /// The host's socket for requests and its ends of connections, accepted or not.
+    std::size_t requestSockets() const {
+        const std::string path = host_->socket();
         std::ifstream table("/proc/net/unix");
         const std::istream_iterator<std::string> words(table);
         return static_cast<std::size_t>(std::count(words, {}, path));
@@ -182,14 +182,14 @@ TEST_F(Push, ADirectoryThatCannotBeMadeIsStatusSix) {
 
 TEST_F(Push, NothingLeavesTheDepot) {
     for (const char* name : {"../outside", "a/../../outside", "..\\outside"}) {
-        expectRefused(name, 6, "the host could not make the file's directory");
+        expectRefused(name, 6, "the name leads out of the depot");
     }
     files_.makeDir("elsewhere");
     ASSERT_EQ(::symlink("../elsewhere", files_.path("depot/relative").c_str()), 0);
     ASSERT_EQ(::symlink(files_.path("elsewhere").c_str(), files_.path("depot/absolute").c_str()),
               0);
     for (const char* name : {"relative/outside", "absolute/outside", "absolute/made/outside"}) {
-        expectRefused(name, 6, "the host could not make the file's directory");
+        expectRefused(name, 6, "the name leads out of the depot");
     }
     EXPECT_FALSE(files_.exists("elsewhere/outside"));
     EXPECT_FALSE(files_.exists("elsewhere/made"));
@@ -220,10 +220,10 @@ TEST_F(Push, WhatIsNoFileIsWrongUsage) {
 TEST_F(Push, ATerminalSeesABarWithBytesRateAndTimeLeft) {
     const std::string file = files_.write("file", randomBytes(3 * kBatch));
     const std::string command = zavctlPath() + " --socket " + host_->socket() + " push " + file;
-    const std::size_t before = transferSockets();
+    const std::size_t before = requestSockets();
     ::kill(host_->pid(), SIGSTOP);
     Program terminal({"/usr/bin/script", "-qec", command, "/dev/null"});
-    EXPECT_TRUE(eventually([&] { return transferSockets() > before; })) << "the push has begun";
+    EXPECT_TRUE(eventually([&] { return requestSockets() > before; })) << "the push has begun";
     // Nothing is drawn in the first tenth of a second. Only time brings that to an end.
     ::usleep(150'000);
     ::kill(host_->pid(), SIGCONT);
