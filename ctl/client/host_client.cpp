@@ -84,6 +84,11 @@ json HostClient::getIfThere(const std::string& target, Deadline deadline) const 
     return response.result() == http::status::not_found ? json() : documentOf(response);
 }
 
+json HostClient::remove(const std::string& target, Deadline deadline) const {
+    return documentOf(
+        exchange(socketPath_, makeRequest(http::verb::delete_, target), deadline, {}));
+}
+
 QueryAnswer HostClient::query(const TableQuery& query, Deadline deadline,
                               const Ticker& tick) const {
     Request request = makeRequest(http::verb::post, "/v1/query");

@@ -41,6 +41,9 @@ public:
     /// The same; null when the host has nothing there (404), as one that does not know the path.
     nlohmann::json getIfThere(const std::string& target, Deadline deadline) const;
 
+    /// Removes what is at a path; the host's answer.
+    nlohmann::json remove(const std::string& target, Deadline deadline) const;
+
     QueryAnswer query(const TableQuery& query, Deadline deadline, const Ticker& tick = {}) const;
 
 private:

@@ -1,18 +1,15 @@
 #include "ctl/verbs/push.h"
 
-#include <algorithm>
 #include <chrono>
-#include <cstdio>
-#include <nlohmann/json.hpp>
 #include <numeric>
 
+#include "ctl/client/transfer/arrival.h"
+#include "ctl/client/transfer/interruption.h"
+#include "ctl/client/transfer/push_check.h"
 #include "ctl/client/transfer/pusher.h"
 #include "ctl/show/transfer_progress.h"
-#include "ctl/show/transfer_status.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
-
-using nlohmann::json;
 
 namespace ctl {
 namespace {
@@ -23,56 +20,80 @@ constexpr Argument kDestination =
     positional("DEST",
                "Name in the depot; the file's own if not given, and below it if it ends in /")
         .completedBy(Completion::DepotFile);
-constexpr Argument kArguments[] = {kFile, kDestination};
-
-std::uintmax_t sum(const std::vector<PushedFile>& files, std::uintmax_t PushedFile::*bytes) {
-    return std::accumulate(
-        files.begin(), files.end(), std::uintmax_t{0},
-        [bytes](std::uintmax_t total, const PushedFile& file) { return total + file.*bytes; });
-}
-
-json reportDocument(const PushReport& report) {
-    json files = json::array();
-    for (const PushedFile& file : report.files) {
-        files.push_back({{"name", file.name},
-                         {"bytes", file.sent},
-                         {"status", file.worst.status},
-                         {"fault", file.worst.fault},
-                         {"meaning", statusText(file.worst)}});
-    }
-    return {{"files", files},
-            {"bytes", sum(report.files, &PushedFile::sent)},
-            {"seconds", report.seconds}};
-}
-
-std::string successText(const std::string& what, double bytes, double seconds) {
-    seconds = std::max(seconds, 1e-6);
-    char time[32];
-    std::snprintf(time, sizeof time, "%.2f s", seconds);
-    return "push " + what + ": done; " + bytesText(bytes) + " in " + time + ", " +
-           bytesText(bytes / seconds) + "/s\n";
-}
-
-std::string reportText(const PushReport& report) {
-    const std::size_t count = report.files.size();
-    const std::string what =
-        count == 1 ? report.files.front().name : std::to_string(count) + " files";
-    std::string text;
-    std::size_t failed = 0;
-    for (const PushedFile& file : report.files) {
-        if (file.wasTaken()) continue;
-        ++failed;
-        text += file.name + ": " + statusText(file.worst) + "\n";
-    }
-    if (failed == 0) {
-        return successText(what, double(sum(report.files, &PushedFile::sent)), report.seconds);
-    }
-    return text + "push " + what + ": failed; " + std::to_string(failed) + " of " +
-           std::to_string(count) + " not taken\n";
-}
+constexpr Argument kChecksum = flag("--checksum", "Print the SHA-256 of what arrives");
+constexpr Argument kNoVerify =
+    flag("--no-verify", "Do not compare the files in the depot with what was sent");
+constexpr Argument kArguments[] = {kFile, kDestination, kChecksum, kNoVerify};
 
 ExitStatus run(const Invocation& invocation) {
     return print(showPush(askPush(invocation), invocation.format));
+}
+
+std::uintmax_t sizeOf(const std::vector<PushedFile>& files) {
+    return std::accumulate(
+        files.begin(), files.end(), std::uintmax_t{0},
+        [](std::uintmax_t total, const PushedFile& file) { return total + file.size; });
+}
+
+void append(std::vector<std::string>& all, const std::vector<std::string>& more) {
+    all.insert(all.end(), more.begin(), more.end());
+}
+
+/// What a guarded host cannot keep is removed again.
+std::vector<std::string> cleanUp(const HostAddress& host, const PushCheck& check,
+                                 const std::vector<PushedFile>& files) {
+    return check.guarded ? removePartialFiles(host, files) : namePartialFiles(files);
+}
+
+/// The failure with what became of the files that had arrived in part.
+Failure withRemains(const Failure& failure, const std::vector<std::string>& remains) {
+    const int signal = Interruption::signal();
+    // Shells know a program that was ended by a signal by this status.
+    const auto status = signal != 0 ? static_cast<ExitStatus>(128 + signal) : failure.status();
+    std::string text = signal != 0 ? "interrupted" : failure.what();
+    for (const std::string& sentence : remains)
+        text += "; " + sentence;
+    return {status, text};
+}
+
+void sendAll(Pusher& pusher, std::vector<PushedFile>& files) {
+    for (PushedFile& file : files)
+        pusher.push(file);
+    pusher.finish();
+    if (Interruption::signal() != 0) throw Failure(kNoHost, "interrupted");
+}
+
+/// Sends the files. A push that breaks off does not leave parts of files behind if that can be
+/// helped.
+void send(const Invocation& invocation, const PushCheck& check, Pusher::Sums sums,
+          Progress& progress, PushReport& report) {
+    const Interruption interruption;
+    const auto begin = std::chrono::steady_clock::now();
+    try {
+        Pusher pusher(
+            invocation.host, [&](std::uintmax_t bytes) { progress.add(bytes); }, sums);
+        try {
+            sendAll(pusher, report.files);
+        } catch (const Failure&) {
+            pusher.abandon();
+            throw;
+        }
+    } catch (const Failure& failure) {
+        throw withRemains(failure, cleanUp(invocation.host, check, report.files));
+    }
+    const std::chrono::duration<double> elapsed = std::chrono::steady_clock::now() - begin;
+    report.seconds = elapsed.count();
+}
+
+void verify(const HostAddress& host, const PushCheck& check, PushReport& report) {
+    if (!check.known) {
+        report.verification = Verification::Unknown;
+        report.whyUnknown = check.whyUnknown;
+        return;
+    }
+    if (!check.guarded) return;
+    report.whyUnknown = verifyArrival(host, report.files);
+    report.verification = report.whyUnknown.empty() ? Verification::Done : Verification::Unknown;
 }
 
 }  // namespace
@@ -84,25 +105,27 @@ constexpr Verb kPushVerb = {
 };
 
 PushReport askPush(const Invocation& invocation) {
+    PushPlan plan = filesToPush(invocation.given.text(kFile), invocation.given.text(kDestination));
     PushReport report;
-    report.files = filesToPush(invocation.given.text(kFile), invocation.given.text(kDestination));
-    Progress progress(sum(report.files, &PushedFile::size), invocation.format == Format::Text);
-    const auto begin = std::chrono::steady_clock::now();
-    Pusher pusher(invocation.host, [&progress](std::uintmax_t bytes) { progress.add(bytes); });
-    for (PushedFile& file : report.files)
-        pusher.push(file);
-    pusher.finish();
-    const std::chrono::duration<double> elapsed = std::chrono::steady_clock::now() - begin;
-    report.seconds = elapsed.count();
-    return report;
-}
+    report.files = std::move(plan.files);
+    report.notes = std::move(plan.skipped);
+    Progress progress(sizeOf(report.files), invocation.format == Format::Text);
+    const PushCheck check = checkPush(invocation.host, report.files);
+    append(report.notes, check.notes);
+    report.refused = !check.taken;
+    if (report.refused) return report;
 
-Page showPush(const PushReport& report, Format format) {
-    const bool allTaken = std::all_of(report.files.begin(), report.files.end(),
-                                      [](const PushedFile& file) { return file.wasTaken(); });
-    const ExitStatus status = allTaken ? kSuccess : kHostReportedFailure;
-    if (format == Format::Json) return jsonPage(reportDocument(report), status);
-    return {reportText(report), {}, status};
+    const bool verifies = !invocation.given.flag(kNoVerify);
+    report.showsSums = invocation.given.flag(kChecksum);
+    const bool needsSums = report.showsSums || (verifies && check.guarded);
+    const auto sums = needsSums ? Pusher::Sums::Yes : Pusher::Sums::No;
+    send(invocation, check, sums, progress, report);
+    if (check.guarded) {
+        append(report.notes, removePartialFiles(invocation.host, report.files));
+    }
+    explainRefusals(invocation.host, report.files);
+    if (verifies) verify(invocation.host, check, report);
+    return report;
 }
 
 }  // namespace ctl

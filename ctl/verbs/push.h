@@ -1,21 +1,15 @@
 /// push: files into the host's depot.
 #pragma once
 
-#include <vector>
-
-#include "ctl/client/transfer/pushed_file.h"
-#include "ctl/show/page.h"
+#include "ctl/verbs/push_page.h"
 
 namespace ctl {
 
 struct Invocation;
 
-struct PushReport {
-    std::vector<PushedFile> files;  ///< at least one
-    double seconds = 0;             ///< from the first byte to the last answer
-};
-
+/// Asks the host whether it takes the files, sends them and has their arrival verified. Throws
+/// Failure when the sending breaks off; what had arrived in part is removed then, or named in the
+/// failure's text.
 PushReport askPush(const Invocation& invocation);
-Page showPush(const PushReport& report, Format format);
 
 }  // namespace ctl

@@ -19,6 +19,9 @@ extern const Verb kConfigSetVerb;
 extern const Verb kConfigEditVerb;
 extern const Verb kUaConfigVerb;
 extern const Verb kPushVerb;
+extern const Verb kDepotLsVerb;
+extern const Verb kDepotSumVerb;
+extern const Verb kDepotRmVerb;
 extern const Verb kQueryVerb;
 extern const Verb kAgentsVerb;
 extern const Verb kEventsVerb;
@@ -41,6 +44,9 @@ constexpr const Verb* kVerbs[] = {
     &kConfigEditVerb,       //
     &kUaConfigVerb,         //
     &kPushVerb,             //
+    &kDepotLsVerb,          //
+    &kDepotSumVerb,         //
+    &kDepotRmVerb,          //
     &kQueryVerb,            //
     &kAgentsVerb,           //
     &kEventsVerb,           //
@@ -52,6 +58,7 @@ constexpr const Verb* kVerbs[] = {
 
 constexpr VerbGroup kVerbGroups[] = {
     {"config", "Read and change an agent's configuration"},
+    {"depot", "Look into the depot and remove files from it"},
 };
 
 /// The verb of a full name such as "config get"; null if there is none.

@@ -119,9 +119,8 @@ FileDescriptor Depot::root() const {
     FileDescriptor opened(
         ::open(directory_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NONBLOCK));
     if (opened) return opened;
-    const int reason = errno;
-    throw DepotError(reason == ENOENT ? Kind::NotThere : Kind::Failed,
-                     "the depot " + directory_ + " cannot be opened: " + std::strerror(reason));
+    throw DepotError(Kind::Failed,
+                     "the depot " + directory_ + " cannot be opened: " + std::strerror(errno));
 }
 
 FileDescriptor Depot::open(const FileDescriptor& root, const std::string& path, int flags) const {
@@ -204,7 +203,7 @@ void Depot::remove(const std::string& given, bool recursive) const {
 std::uint64_t Depot::freeBytes() const {
     struct statvfs found {};
     if (::statvfs(directory_.c_str(), &found) != 0) {
-        throw DepotError(kindOf(errno),
+        throw DepotError(Kind::Failed,
                          "the depot " + directory_ + " cannot be used: " + std::strerror(errno));
     }
     return std::uint64_t{found.f_bavail} * found.f_frsize;

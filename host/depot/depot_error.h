@@ -11,10 +11,10 @@ class DepotError : public std::runtime_error {
 public:
     enum class Kind {
         LeadsOut,   ///< the path leads out of the depot
-        NotThere,   ///< there is nothing of that name, or no depot
+        NotThere,   ///< there is nothing of that name
         Forbidden,  ///< the host keeps it to itself, or may not touch it
         WrongKind,  ///< a directory where a file is needed, and the like
-        Failed,     ///< the file system does not work
+        Failed,     ///< there is no depot, or the file system does not work
     };
 
     DepotError(Kind kind, const std::string& text) : std::runtime_error(text), kind_(kind) {}

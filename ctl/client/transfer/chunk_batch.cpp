@@ -49,6 +49,7 @@ std::size_t ChunkBatch::readSome(int descriptor, std::size_t from, std::size_t t
 }
 
 void ChunkBatch::putLengths(std::size_t total) {
+    total_ = total;
     const std::size_t chunks = std::max<std::size_t>(1, (total + kChunkData - 1) / kChunkData);
     count_ = static_cast<std::uint16_t>(chunks);
     for (std::size_t i = 0; i < count_; ++i) {

@@ -1,6 +1,7 @@
 /// A part of a file as it stands in a transfer request.
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -29,6 +30,13 @@ public:
 
     /// The number of chunks.
     std::uint16_t count() const { return count_; }
+    /// Calls `look(const unsigned char* data, std::size_t length)` for the file's bytes, in order.
+    template <typename Look>
+    void eachPiece(Look look) const {
+        for (std::size_t at = 0; at < total_; at += kChunkData)
+            look(&bytes_[at / kChunkData * kChunkSize + 4], std::min(kChunkData, total_ - at));
+    }
+
     /// The chunks as they are sent.
     const unsigned char* data() const { return bytes_.data(); }
     std::size_t size() const { return count_ * kChunkSize; }
@@ -40,6 +48,7 @@ private:
 
     std::vector<unsigned char> bytes_;
     std::uint16_t count_ = 0;
+    std::size_t total_ = 0;  ///< bytes of the file
 };
 
 }  // namespace ctl

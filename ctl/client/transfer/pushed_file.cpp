@@ -28,24 +28,48 @@ std::string nameInDepot(const std::string& base, const std::string& destination)
     return destination.back() == '/' ? destination + base : destination;
 }
 
-std::vector<PushedFile> filesOfFolder(const std::string& folder, const std::string& destination) {
+/// What is said of an entry that is no file; nothing for a folder that holds something.
+std::string whySkipped(const fs::directory_entry& entry) {
+    if (entry.is_symlink()) {
+        return entry.exists() ? "a link to a folder is not followed" : "the link leads nowhere";
+    }
+    switch (entry.status().type()) {
+        case fs::file_type::directory:
+            return fs::is_empty(entry.path()) ? "the folder is empty" : "";
+        case fs::file_type::fifo:
+            return "it is a FIFO";
+        case fs::file_type::socket:
+            return "it is a socket";
+        default:
+            return "it is no regular file";
+    }
+}
+
+PushPlan filesOfFolder(const std::string& folder, const std::string& destination) {
     // What the folder's path stands before; taken off as text, which is a tenth of the work of
     // comparing paths.
     const std::size_t prefix = folder == "/" ? 1 : folder.size() + 1;
-    std::vector<PushedFile> files;
+    PushPlan plan;
+    std::vector<PushedFile>& files = plan.files;
     for (const auto& entry : fs::recursive_directory_iterator(folder)) {
-        if (!entry.is_regular_file()) continue;
         const std::string& source = entry.path().native();
         const std::string relative = source.substr(prefix);
+        std::error_code unreadable;
+        if (!entry.is_regular_file(unreadable)) {
+            const std::string why = whySkipped(entry);
+            if (!why.empty()) plan.skipped.push_back(relative + " is not pushed: " + why);
+            continue;
+        }
         refuseBackslash(relative);
         files.push_back({source, destination + "/" + relative, entry.file_size(), 0, {}});
     }
     std::sort(files.begin(), files.end(),
               [](const PushedFile& a, const PushedFile& b) { return a.name < b.name; });
-    return files;
+    std::sort(plan.skipped.begin(), plan.skipped.end());
+    return plan;
 }
 
-std::vector<PushedFile> filesOf(const std::string& source, const std::string& destination) {
+PushPlan filesOf(const std::string& source, const std::string& destination) {
     const fs::path path = withoutTrailingSlashes(source);
     std::error_code error;
     const fs::file_status found = fs::status(path, error);
@@ -55,16 +79,34 @@ std::vector<PushedFile> filesOf(const std::string& source, const std::string& de
     if (fs::is_directory(found)) return filesOfFolder(path.native(), withoutTrailingSlashes(name));
     if (!fs::is_regular_file(found)) throw Failure(kWrongUsage, source + " is no regular file");
     refuseBackslash(base);
-    return {{path.native(), name, fs::file_size(path), 0, {}}};
+    return {{{path.native(), name, fs::file_size(path), 0, {}}}, {}};
 }
 
 }  // namespace
 
-std::vector<PushedFile> filesToPush(const std::string& source, const std::string& destination) {
+std::string pathInDepot(const std::string& name) {
+    std::string path = name;
+    std::replace(path.begin(), path.end(), '\\', '/');
+    return path.substr(std::min(path.find_first_not_of('/'), path.size()));
+}
+
+bool leadsOutOfDepot(const std::string& name) {
+    int depth = 0;
+    for (const fs::path& part : fs::path(pathInDepot(name))) {
+        if (part == "..")
+            --depth;
+        else if (!part.empty() && part != ".")
+            ++depth;
+        if (depth < 0) return true;
+    }
+    return false;
+}
+
+PushPlan filesToPush(const std::string& source, const std::string& destination) {
     try {
-        std::vector<PushedFile> files = filesOf(source, destination);
-        if (files.empty()) throw Failure(kWrongUsage, source + " holds no files");
-        return files;
+        PushPlan plan = filesOf(source, destination);
+        if (plan.files.empty()) throw Failure(kWrongUsage, source + " holds no files");
+        return plan;
     } catch (const fs::filesystem_error& error) {
         throw Failure(kWrongUsage,
                       "cannot read " + error.path1().string() + ": " + error.code().message());

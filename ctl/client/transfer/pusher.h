@@ -20,14 +20,20 @@ public:
     /// Called with the number of bytes of each batch that the host has answered.
     using OnAnswer = std::function<void(std::uintmax_t bytes)>;
 
-    /// Connects to the host.
-    explicit Pusher(const HostAddress& host, OnAnswer onAnswer = {});
+    enum class Sums { No, Yes };
+
+    /// Connects to the host. With sums, each file's checksum is computed while it is read.
+    explicit Pusher(const HostAddress& host, OnAnswer onAnswer = {}, Sums sums = Sums::No);
 
     /// Sends a file. It must live until finish(): its result is filled in as answers come. A file
     /// that cannot be read does not keep those before it from arriving.
     void push(PushedFile& file);
     /// Waits for the answers that are still to come.
     void finish();
+    /// Sends nothing more, and takes the answers to what the host has got already, for two seconds
+    /// at most. To be called after a failure, so that each file's state is as well known as can be;
+    /// nothing else may follow. Does not throw.
+    void abandon() noexcept;
 
 private:
     // Small enough that the answers to all of them fit into the socket's buffer.
@@ -45,12 +51,14 @@ private:
     };
 
     void sendBatches(PushedFile& file);
+    void sendBatch(Lane& lane, PushedFile& file, bool first, std::size_t length);
     Lane& laneFor(const PushedFile& file);
     void openSecondLane();
     void awaitAnswers(Lane& lane, std::size_t remaining);
 
     HostAddress host_;
     OnAnswer onAnswer_;
+    Sums sums_;
     ChunkBatch batch_;
     std::deque<Lane> lanes_;
     std::size_t turn_ = 0;

@@ -12,6 +12,7 @@
 #include <cstring>
 
 #include "ctl/client/failure.h"
+#include "ctl/client/transfer/interruption.h"
 
 namespace ctl {
 namespace {
@@ -98,15 +99,27 @@ TransferClient::TransferClient(const std::string& socketPath, std::chrono::milli
         setTimeout(descriptor_, timeout);
         setSendBuffer(descriptor_);
         connect(socketPath);
+        Interruption::watch(descriptor_);
         bind();
     } catch (...) {
-        ::close(descriptor_);
+        close();
         throw;
     }
 }
 
 TransferClient::~TransferClient() {
+    close();
+}
+
+void TransferClient::close() {
+    Interruption::forget(descriptor_);
     ::close(descriptor_);
+}
+
+void TransferClient::stopSending(std::chrono::milliseconds timeout) {
+    heldBack_.clear();
+    setTimeout(descriptor_, timeout);
+    ::shutdown(descriptor_, SHUT_WR);
 }
 
 void TransferClient::connect(const std::string& path) {

@@ -37,6 +37,9 @@ public:
     void send(const std::string& name, bool firstBatch, const ChunkBatch& batch);
     /// Waits for the answer to the oldest request that has none yet.
     TransferAnswer receive();
+    /// Tells the host that no more requests come. From now on receive() waits that long at most and
+    /// fails when the host has answered what it had got.
+    void stopSending(std::chrono::milliseconds timeout);
 
 private:
     struct Packet {
@@ -45,6 +48,7 @@ private:
     };
     void connect(const std::string& path);
     void bind();
+    void close();
     void sendFragments(const std::vector<unsigned char>& head, const ChunkBatch& batch);
     void sendHeldBack();
     Packet readPacket();

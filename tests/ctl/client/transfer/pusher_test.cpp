@@ -138,6 +138,40 @@ TEST_F(APusher, ReportsWhatTheHostSaysOfEachFile) {
     EXPECT_EQ(depot_.files()["3"].size(), ChunkBatch::kMostData) << "nothing is appended";
 }
 
+TEST_F(APusher, SumsWhatTheDepotShallHoldWhenAskedTo) {
+    std::vector<PushedFile> files = filesWith({"abc",
+                                               "a\r\nb\x1a"
+                                               "c",
+                                               ""});
+    files[1].converted = true;
+    MadeUpHost host([&](HostConnection& connection) { depot_.serve(connection); }, 2);
+    {
+        Pusher pusher({"", host.path(), std::chrono::seconds(20)}, {}, Pusher::Sums::Yes);
+        for (PushedFile& file : files)
+            pusher.push(file);
+        pusher.finish();
+    }
+    host.join();
+    EXPECT_EQ(files[0].sha256, "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad");
+    EXPECT_EQ(files[1].sha256, "b4c620724d95022be9765d6f660a36f90835acab2437b5e8cd71812940b29346");
+    EXPECT_EQ(files[1].kept, 4U);
+    EXPECT_EQ(files[2].sha256, "e3b0c44298fc1c149afbf4c8996fb92427ae41e4649b934ca495991b7852b855");
+    for (const PushedFile& file : files)
+        EXPECT_TRUE(file.isComplete());
+}
+
+TEST_F(APusher, TakesTheAnswersToWhatWasSentBeforeItWasAbandoned) {
+    std::vector<PushedFile> files = filesWith({pattern(3 * ChunkBatch::kMostData), "held back"});
+    MadeUpHost host([&](HostConnection& connection) { depot_.serve(connection); }, 1);
+    Pusher pusher({"", host.path(), std::chrono::seconds(20)});
+    pusher.push(files[0]);
+    EXPECT_FALSE(files[0].isComplete()) << "only the first batch is waited for";
+    pusher.push(files[1]);
+    pusher.abandon();
+    EXPECT_TRUE(files[0].isComplete());
+    EXPECT_EQ(files[1].taken, 0U) << "a small file is held back until more come";
+}
+
 TEST_F(APusher, AFileThatCannotBeReadKeepsNoneBeforeItFromArriving) {
     std::vector<PushedFile> files = filesWith({"a", "b"});
     files.push_back({scratch_.path("none"), "none", 1, 0, {}});

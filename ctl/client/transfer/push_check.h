@@ -1,0 +1,30 @@
+/// Whether the files of a push may be sent: what the host says, and what they hold.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "ctl/client/host_address.h"
+#include "ctl/client/transfer/pushed_file.h"
+
+namespace ctl {
+
+struct PushCheck {
+    /// False when the host could not be asked: it is older, or nobody answers its HTTP requests.
+    bool known = false;
+    std::string whyUnknown;
+    bool guarded = false;
+    bool taken = true;               ///< false: nothing should be sent
+    std::vector<std::string> notes;  ///< sentences about files that change on their way
+};
+
+/// Asks the host, and stores what it says of each file there: whether it is converted, and the
+/// problem that it sees. For a guarded host, looks into the files whose line ends will be
+/// converted: one that is no text would be damaged. Throws Failure when there is too little room,
+/// and when a file cannot be read.
+PushCheck checkPush(const HostAddress& host, std::vector<PushedFile>& files);
+
+/// Asks again about the files that were not taken although nothing stood against them before.
+void explainRefusals(const HostAddress& host, std::vector<PushedFile>& files);
+
+}  // namespace ctl

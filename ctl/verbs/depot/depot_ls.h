@@ -1,0 +1,14 @@
+/// depot ls: what the depot holds.
+#pragma once
+
+#include <nlohmann/json_fwd.hpp>
+#include <string>
+
+#include "ctl/show/page.h"
+
+namespace ctl {
+
+/// Shows the document of GET /v1/depot: the names, or with `isLong` their types, sizes and times.
+Page showDepot(const nlohmann::json& listing, bool isLong, Format format);
+
+}  // namespace ctl
