@@ -17,5 +17,3 @@ else()
   find_package(OpenSSL 3.0 REQUIRED COMPONENTS Crypto)
   target_link_libraries(zav_crypto INTERFACE OpenSSL::Crypto)
 endif()
-# The digest's own functions: no tables of algorithms, no providers, no memory.
-target_compile_definitions(zav_crypto INTERFACE OPENSSL_API_COMPAT=10101)

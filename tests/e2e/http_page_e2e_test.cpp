@@ -90,6 +90,7 @@ protected:
 
 TEST_F(HttpPage, EveryCommandAnswersAsThePageSays) {
     home.products({"ux"}, "exit 0");
+    home.files().write("depot/ux/7.1/notes", "abc");
     std::vector<std::pair<Example, std::unique_ptr<Program>>> streams;
     const std::vector<Example> examples = examplesOf(ZAV_SOURCE_DIR "/docs/http.md");
     EXPECT_GE(examples.size(), 7U);

@@ -85,7 +85,8 @@ TEST_F(Push, AFolderArrivesFileByFileWithItsRelativePaths) {
     files_.makeDir("tree/nothing");
     const ProgramResult result = push(files_.path("tree"));
     EXPECT_EQ(result.status, 0) << result.err;
-    EXPECT_THAT(result.out, testing::StartsWith("push 3 files: done; 5.0 kB in "));
+    EXPECT_THAT(result.out, testing::StartsWith("note: nothing is not pushed: the folder is empty\n"
+                                                "push 3 files: done; 5.0 kB in "));
     EXPECT_THAT(depotFiles(), UnorderedElementsAre("tree/a", "tree/empty", "tree/deep/er/b"));
     EXPECT_EQ(depot("tree/deep/er/b"), std::string(5000, 'b'));
 }

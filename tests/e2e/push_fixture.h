@@ -37,9 +37,11 @@ protected:
 
     /// Starts the host with the depot "depot", or with another one.
     void start(const std::vector<std::string>& moreArguments = {},
-               const std::string& depot = "depot") {
+               const std::string& depot = "depot",
+               ManagedHost::Guards guards = ManagedHost::Guards::Off) {
         host_ = std::make_unique<ManagedHost>(
-            home_.path(), Environment{{"QVSDEPLOY_AGENTDEPOT", files_.path(depot)}}, moreArguments);
+            home_.path(), Environment{{"QVSDEPLOY_AGENTDEPOT", files_.path(depot)}}, moreArguments,
+            guards);
     }
 
     static std::vector<std::string> pushArguments(const std::string& source,
