@@ -34,12 +34,13 @@ agent_lives() {
 }
 
 # is_agent PRODUCT INSTANCE: whether the living process agent_pid is what launch_agent starts for this
-# instance. A process may keep its environment to itself; then only root, who could signal anything,
-# needs to know.
+# instance. A process may keep its environment to itself; then it is enough for an ordinary user that the
+# process is his.
 is_agent() {
     [ "$session" = "$agent_pid" ] || return 1
     agent_environment=$({ tr '\n\0' ' \n' <"/proc/$agent_pid/environ"; } 2>/dev/null) || {
-        [ "$user_id" -ne 0 ]
+        [ "$user_id" -ne 0 ] &&
+            awk -v id="$user_id" '$1 == "Uid:" { exit $2 != id }' "/proc/$agent_pid/status" 2>/dev/null
         return
     }
     printf '%s\n' "$agent_environment" | grep -qxF "AGENT_PRODUCT=$1" &&
