@@ -25,3 +25,22 @@ if(CMAKE_CXX_FLAGS MATCHES "-fsanitize" AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU"
   # Instrumented code trips the flow analysis behind this warning.
   target_compile_options(zav_options INTERFACE -Wno-maybe-uninitialized)
 endif()
+
+# For what is loaded into an agent. Sanitizers look for the same faults themselves, and counting of
+# lines wants code as it is written.
+add_library(zav_hardening INTERFACE)
+set(ZAV_HARDENED ON)
+if(CMAKE_CXX_FLAGS MATCHES "-fsanitize" OR ZAV_COVERAGE)
+  set(ZAV_HARDENED OFF)
+endif()
+if(ZAV_HARDENED)
+  include(CheckCXXCompilerFlag)
+  check_cxx_compiler_flag(-fcf-protection ZAV_HAS_CF_PROTECTION)  # x86 only
+  target_compile_options(zav_hardening INTERFACE -fstack-protector-strong
+    $<$<BOOL:${ZAV_HAS_CF_PROTECTION}>:-fcf-protection>
+    # Some distributions' compilers define it by themselves. It needs an optimised build.
+    $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-U_FORTIFY_SOURCE>
+    $<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-D_FORTIFY_SOURCE=3>)
+  target_compile_definitions(zav_hardening INTERFACE _GLIBCXX_ASSERTIONS)
+  target_link_options(zav_hardening INTERFACE LINKER:-z,relro LINKER:-z,now)
+endif()

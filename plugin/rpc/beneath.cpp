@@ -97,7 +97,7 @@ private:
         if (end == std::string::npos) return std::exchange(rest_, {});
         const std::string step = rest_.substr(0, end);
         rest_.erase(0, end + 1);
-        if (rest_.empty()) rest_ = ".";
+        if (rest_.empty()) rest_.assign(1, '.');
         return step;
     }
 
@@ -118,7 +118,10 @@ private:
             errno = tooMany ? ELOOP : EXDEV;
             return Step::kFailed;
         }
-        rest_ = rest_.empty() ? target : target + "/" + rest_;
+        std::string name = target;
+        if (!rest_.empty()) name += '/';
+        name += rest_;
+        rest_ = std::move(name);
         return Step::kTaken;
     }
 
