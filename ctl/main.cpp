@@ -13,6 +13,7 @@
 #include "ctl/client/failure.h"
 #include "ctl/command_line.h"
 #include "ctl/show/page.h"
+#include "ctl/show/terminal.h"
 #include "ctl/verbs/global_arguments.h"
 #include "ctl/verbs/invocation.h"
 
@@ -39,7 +40,10 @@ ctl::ExitStatus run(const ctl::CommandLine& line, ctl::Format format) {
 
 ctl::ExitStatus run(const std::vector<std::string>& words) {
     const ctl::CommandLine line = ctl::parseCommandLine(words);
-    return run(line, line.verb == nullptr ? ctl::Format::Text : ctl::formatOf(line.given));
+    const ctl::Format format = line.verb == nullptr ? ctl::Format::Text : ctl::formatOf(line.given);
+    // What stands on a page that needs no verb fits already.
+    ctl::lookAtTerminals(line.verb != nullptr && format == ctl::Format::Text);
+    return run(line, format);
 }
 
 /// False when standard output is a pipe that nobody reads any more.

@@ -3,7 +3,9 @@
 #include <cstdio>
 #include <nlohmann/json.hpp>
 
+#include "ctl/show/fold.h"
 #include "ctl/show/printable.h"
+#include "ctl/show/terminal.h"
 
 using nlohmann::json;
 
@@ -15,6 +17,10 @@ void write(const std::string& text, std::FILE* file) {
     std::fflush(file);
 }
 
+std::string fitted(const std::string& text, const Output& output) {
+    return output.columns > 0 ? foldedText(text, output.columns) : text;
+}
+
 std::string dumped(const json& document, int indent) {
     return withoutTerminalControls(
         document.dump(indent, ' ', false, json::error_handler_t::replace));
@@ -23,7 +29,9 @@ std::string dumped(const json& document, int indent) {
 }  // namespace
 
 std::string complaint(const std::string& text) {
-    return "zavctl: " + printable(text) + "\n";
+    const bool isMild = text.rfind("note: ", 0) == 0 || text.rfind("warning: ", 0) == 0;
+    return toned("zavctl:", isMild ? Tone::Attention : Tone::Bad, standardError()) + " " +
+           printable(text) + "\n";
 }
 
 Page failurePage(const Failure& failure, Format format) {
@@ -50,8 +58,8 @@ Page jsonPage(const json& document, ExitStatus status) {
 }
 
 ExitStatus print(const Page& page) {
-    write(page.out, stdout);
-    write(page.err, stderr);
+    write(page.isVerbatim ? page.out : fitted(page.out, standardOutput()), stdout);
+    write(fitted(page.err, standardError()), stderr);
     return page.status;
 }
 

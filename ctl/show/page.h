@@ -12,9 +12,11 @@ namespace ctl {
 enum class Format { Text, Json };
 
 struct Page {
-    std::string out;  ///< for standard output
-    std::string err;  ///< for standard error
+    std::string out = {};  ///< for standard output
+    std::string err = {};  ///< for standard error
     ExitStatus status = kSuccess;
+    /// `out` is a text of somebody else's, whose lines stay as they are.
+    bool isVerbatim = false;
 };
 
 /// A line for standard error: "zavctl: text". Control characters are shown as \xNN.
@@ -34,7 +36,8 @@ std::string jsonLine(const nlohmann::json& document);
 /// A page that is one JSON document.
 Page jsonPage(const nlohmann::json& document, ExitStatus status = kSuccess);
 
-/// Writes and flushes both outputs and returns the page's status. Standard output keeps the error
+/// Writes and flushes both outputs and returns the page's status. On a terminal, long lines are
+/// broken between words. Standard output keeps the error
 /// if it cannot be written.
 ExitStatus print(const Page& page);
 

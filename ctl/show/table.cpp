@@ -4,6 +4,7 @@
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/row.h"
+#include "ctl/show/fold.h"
 #include "ctl/show/printable.h"
 
 using nlohmann::json;
@@ -13,12 +14,7 @@ namespace {
 
 using Line = std::vector<std::string>;
 
-/// Places that a text takes on a terminal: characters, not bytes.
-std::size_t widthOf(const std::string& text) {
-    return static_cast<std::size_t>(std::count_if(text.begin(), text.end(), [](char c) {
-        return (static_cast<unsigned char>(c) & 0xC0U) != 0x80U;
-    }));
-}
+constexpr std::size_t kLeastRoom = 20;  // for a record's values
 
 std::string padded(const std::string& text, std::size_t width) {
     return text + std::string(width - widthOf(text), ' ');
@@ -32,23 +28,62 @@ std::string joined(const Line& cells, const std::vector<std::size_t>& widths) {
     return text + "\n";
 }
 
+/// A line whose cells may take several lines, each in its own column.
+std::string joinedCells(const Line& cells, const std::vector<std::size_t>& widths) {
+    std::vector<Line> pieces;
+    std::size_t height = 1;
+    for (std::size_t i = 0; i < cells.size(); ++i) {
+        pieces.push_back(folded(cells[i], std::max<std::size_t>(widths[i], 1)));
+        height = std::max(height, pieces.back().size());
+    }
+    std::string text;
+    for (std::size_t line = 0; line < height; ++line) {
+        Line part;
+        for (const Line& piece : pieces)
+            part.push_back(line < piece.size() ? piece[line] : std::string());
+        text += joined(part, widths);
+    }
+    return text;
+}
+
+/// Takes from the widest columns until all fit beside each other.
+void fit(std::vector<std::size_t>& widths) {
+    constexpr std::size_t kLeast = 8;
+    std::size_t total = 2 * (widths.size() - 1);
+    for (const std::size_t width : widths)
+        total += width;
+    while (total > kColumns) {
+        // Of equals the last, which is the one with the text to read.
+        const auto widest = std::max_element(widths.rbegin(), widths.rend());
+        if (*widest <= kLeast) return;
+        --*widest;
+        --total;
+    }
+}
+
 std::vector<std::size_t> widthsOf(const std::vector<Line>& lines) {
     std::vector<std::size_t> widths(lines.front().size(), 0);
     for (const Line& line : lines) {
         for (std::size_t i = 0; i < line.size(); ++i)
             widths[i] = std::max(widths[i], widthOf(line[i]));
     }
+    fit(widths);
     return widths;
 }
 
 std::string recordText(const json& row) {
     std::size_t widest = 0;
     for (const auto& item : row.items())
-        widest = std::max(widest, widthOf(item.key()));
+        widest = std::max(widest, widthOf(printable(item.key())));
+    const std::size_t room =
+        widest + 2 + kLeastRoom < kColumns ? kColumns - widest - 2 : kLeastRoom;
     std::string text;
     for (const auto& item : row.items()) {
-        const std::string value = valueText(item.value());
-        if (!value.empty()) text += padded(item.key(), widest) + "  " + printable(value) + "\n";
+        const std::string value = printable(valueText(item.value()));
+        if (value.empty()) continue;
+        const Line pieces = folded(value, room);
+        for (std::size_t i = 0; i < pieces.size(); ++i)
+            text += padded(i == 0 ? printable(item.key()) : "", widest) + "  " + pieces[i] + "\n";
     }
     return text;
 }
@@ -68,7 +103,7 @@ std::string tableText(const json& rows, const std::vector<TableColumn>& columns)
     const std::vector<std::size_t> widths = widthsOf(lines);
     std::string text;
     for (const Line& line : lines)
-        text += joined(line, widths);
+        text += joinedCells(line, widths);
     return text;
 }
 

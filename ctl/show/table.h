@@ -1,4 +1,4 @@
-/// Rows as text.
+/// Rows as text, in 80 columns. What is longer goes on below.
 #pragma once
 
 #include <nlohmann/json_fwd.hpp>

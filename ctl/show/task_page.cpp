@@ -5,27 +5,23 @@
 #include "ctl/client/row.h"
 #include "ctl/show/command_report.h"
 #include "ctl/show/message_catalogue.h"
+#include "ctl/show/printable.h"
 #include "ctl/show/running_clock.h"
+#include "ctl/show/shell_quoted.h"
+#include "ctl/show/terminal.h"
 
 using nlohmann::json;
 
 namespace ctl {
 namespace {
 
-/// The commands of a record; an empty list if there are none.
-json commandsOf(const json& record) {
-    const auto details = record.find("details");
-    if (details == record.end()) return json::array();
-    const auto commands = details->find("commands");
-    return commands != details->end() && commands->is_array() ? *commands : json::array();
-}
-
 Page outcomePage(const std::string& title, const TaskResult& result) {
     const json& row = result.events.back();
     const std::string fault = returnCodeOf(row) == 0 ? faultOf(result.record) : std::string();
     Page page = showOutcome(title, row, result.elapsed, Format::Text);
     if (!fault.empty()) {
-        page.out = title + ": reported as done, but " + fault + "\n";
+        page.out = printable(title) + ": " +
+                   toned("reported as done, but " + fault, Tone::Bad, standardOutput()) + "\n";
         page.status = kHostReportedFailure;
     }
     if (page.status != kSuccess) page.out += failureReport(commandsOf(result.record));
@@ -47,20 +43,32 @@ Page textPage(const std::string& title, const TaskResult& result) {
         case TaskResult::End::TimedOut:
             break;
     }
-    return {{}, complaint("no outcome within the time-out"), kNoOutcome};
+    const Failure late(kNoOutcome, "no outcome within the time-out",
+                       laterText(textOf(result.reply, "TRANSID")));
+    return failurePage(late, Format::Text);
 }
 
 }  // namespace
 
+json commandsOf(const json& record) {
+    const auto details = record.find("details");
+    if (details == record.end()) return json::array();
+    const auto commands = details->find("commands");
+    return commands != details->end() && commands->is_array() ? *commands : json::array();
+}
+
 std::string replyLine(const std::string& title, const json& reply) {
-    if (returnCodeOf(reply) == 0) return title + ": accepted\n";
-    return title + ": refused; " + describeRow(reply) + "\n";
+    if (returnCodeOf(reply) == 0) return printable(title) + ": accepted\n";
+    return printable(title) + ": " + toned("refused", Tone::Bad, standardOutput()) + "; " +
+           describeRow(reply) + "\n";
 }
 
 std::string outcomeLine(const std::string& title, const json& row,
                         std::chrono::milliseconds elapsed) {
     const bool ok = returnCodeOf(row) == 0;
-    std::string line = title + (ok ? ": done after " : ": failed after ") + elapsedText(elapsed);
+    const std::string end =
+        toned(ok ? "done" : "failed", ok ? Tone::Good : Tone::Bad, standardOutput());
+    std::string line = printable(title) + ": " + end + " after " + elapsedText(elapsed);
     // A restart whose stop failed and whose start succeeded is a success with a message.
     if (!ok || !textOf(row, "RETMSGID").empty()) line += "; " + describeRow(row);
     return line + "\n";
@@ -88,6 +96,10 @@ json taskDocument(const TaskResult& result) {
     }
     if (!result.doubt.empty()) document["doubt"] = result.doubt;
     return document;
+}
+
+std::string laterText(const std::string& transid) {
+    return "zavctl task show " + shellQuoted(transid) + " tells how it ended";
 }
 
 std::string faultOf(const json& record) {

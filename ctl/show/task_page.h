@@ -28,6 +28,12 @@ Page showOutcome(const std::string& title, const nlohmann::json& row,
 /// with "doubt" when a look afterwards belies the success.
 nlohmann::json taskDocument(const TaskResult& result);
 
+/// The commands of a task's record; an empty list if there are none.
+nlohmann::json commandsOf(const nlohmann::json& record);
+
+/// How to look at a task later: "zavctl task show T tells how it ended".
+std::string laterText(const std::string& transid);
+
 /// What the host's record of a task says against its success, such as "the command was killed by
 /// signal 9"; empty if nothing. Without a record, or when the host takes the task for done, nothing
 /// does.

@@ -4,8 +4,10 @@
 
 #include <cstdlib>
 #include <nlohmann/json.hpp>
+#include <optional>
 
 #include "ctl/client/failure.h"
+#include "ctl/client/interruption.h"
 #include "ctl/client/row.h"
 #include "ctl/client/whole_file.h"
 #include "ctl/show/task_page.h"
@@ -33,7 +35,10 @@ public:
         if (descriptor == -1) throw Failure(kWrongUsage, "cannot make a file for the editor");
         const bool written = writeDescriptor(descriptor, content);
         ::close(descriptor);
-        if (written) return;
+        if (written) {
+            note_.emplace(complaint(keptText()));
+            return;
+        }
         ::unlink(path_.c_str());
         throw Failure(kWrongUsage, "cannot write " + path_);
     }
@@ -46,7 +51,7 @@ public:
     /// Leaves the file where it is, and says so.
     std::string keep() {
         isKept_ = true;
-        return "Your text is kept in " + path_;
+        return keptText();
     }
 
     /// The text as the editor leaves it. After an editor that fails, a changed text is kept.
@@ -64,8 +69,11 @@ public:
     }
 
 private:
+    std::string keptText() const { return "your text is kept in " + path_; }
+
     std::string path_;
     std::string original_;
+    std::optional<InterruptNote> note_;
     bool isKept_ = false;
 };
 

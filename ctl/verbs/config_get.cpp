@@ -91,6 +91,7 @@ Page showConfiguration(const std::string& product, const Configuration& configur
         return page;
     }
     if (!isThere) return showNoConfiguration("config get " + product, row);
+    page.isVerbatim = true;
     page.out = configuration.text;
     if (!page.out.empty() && page.out.back() != '\n') page.out += '\n';
     return page;

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "ctl/show/shell_quoted.h"
 #include "ctl/verbs/global_arguments.h"
 
 namespace ctl {
@@ -47,17 +48,6 @@ Words::const_iterator foreignBegin(const Verb& verb, const Words& words, int pla
     return words.end();
 }
 
-/// A word as a shell takes it for one.
-std::string quoted(const std::string& word) {
-    const char* const kPlain =
-        "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789%+,-./:=@_";
-    if (!word.empty() && word.find_first_not_of(kPlain) == std::string::npos) return word;
-    std::string text = "'";
-    for (const char c : word)
-        text += c == '\'' ? std::string("'\\''") : std::string(1, c);
-    return text + "'";
-}
-
 }  // namespace
 
 std::string lineWithDashes(const Verb& verb, const Words& words) {
@@ -67,7 +57,7 @@ std::string lineWithDashes(const Verb& verb, const Words& words) {
     if (std::none_of(begin, words.end(), isOption)) return {};
     std::string line = "zavctl";
     for (auto word = words.begin(); word != words.end(); ++word)
-        line += (word == begin ? " -- " : " ") + quoted(*word);
+        line += (word == begin ? " -- " : " ") + shellQuoted(*word);
     return line;
 }
 

@@ -74,9 +74,12 @@ void awaitRestart(Task& task) {
 CompletedInstall askCompleted(const Invocation& invocation, const QueuedCommand& command) {
     const std::string& title = command.title;
     const Verification verification(invocation.host, command.request, command.isVerified);
+    TaskRequest request = command.request;
+    if (request.transid.empty()) request.transid = makeTransid();
+    const InterruptNote note = interruptNote(request.transid, invocation.format);
     RunningClock clock(title, invocation.format == Format::Text);
     const Ticker tick = [&clock] { clock.tick(); };
-    Task task(invocation.host, command.request, tick);
+    Task task(invocation.host, request, tick);
     if (!task.submit(true)) return {resultOf(task, TaskResult::End::Refused), {}};
     awaitBegin(task);
     if (returnCodeOf(task.events().back()) != 0) {

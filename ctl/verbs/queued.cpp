@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "ctl/client/failure.h"
 #include "ctl/show/running_clock.h"
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/common_arguments.h"
@@ -17,6 +18,13 @@ QueuedCommand queuedCommand(const Invocation& invocation, TaskRequest request, s
     return {std::move(request), std::move(title), !invocation.given.flag(kNoWait)};
 }
 
+InterruptNote interruptNote(const std::string& transid, Format format) {
+    const Failure interrupted(kInterrupted, "interrupted; the host goes on with task " + transid,
+                              laterText(transid));
+    const Page page = failurePage(interrupted, format);
+    return InterruptNote(page.err, page.out);
+}
+
 OnReply replyShown(const std::string& title, Format format) {
     if (format == Format::Json) return {};
     return [title](const json& reply) { print({replyLine(title, reply), {}}); };
@@ -26,6 +34,9 @@ TaskResult askQueued(const Invocation& invocation, const QueuedCommand& command,
                      const OnReply& onReply) {
     const Verification verification(invocation.host, command.request,
                                     command.isVerified && command.isAwaited);
+    TaskRequest request = command.request;
+    if (request.transid.empty()) request.transid = makeTransid();
+    const InterruptNote note = interruptNote(request.transid, invocation.format);
     RunningClock clock(command.title, invocation.format == Format::Text);
     TaskWatch watch;
     watch.tick = [&clock] { clock.tick(); };
@@ -33,7 +44,7 @@ TaskResult askQueued(const Invocation& invocation, const QueuedCommand& command,
         clock.erase();
         if (onReply) onReply(reply);
     };
-    TaskResult result = runTask(invocation.host, command.request, command.isAwaited, watch);
+    TaskResult result = runTask(invocation.host, request, command.isAwaited, watch);
     verification.check(result);
     return result;
 }

@@ -5,6 +5,7 @@
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
+#include "ctl/client/interruption.h"
 #include "ctl/client/task.h"
 #include "ctl/show/page.h"
 #include "ctl/verbs/invocation.h"
@@ -22,6 +23,9 @@ struct QueuedCommand {
 /// The command with what the user said about it. The verb must declare kNoWait and kTransid. A
 /// transaction identifier that the user has chosen becomes part of the title.
 QueuedCommand queuedCommand(const Invocation& invocation, TaskRequest request, std::string title);
+
+/// As long as the object exists, Ctrl-C names the task and says how to find its outcome.
+InterruptNote interruptNote(const std::string& transid, Format format);
 
 /// Called when the reply is there, which may be long before the outcome.
 using OnReply = std::function<void(const nlohmann::json& reply)>;

@@ -27,6 +27,8 @@ extern const Verb kAgentsVerb;
 extern const Verb kEventsVerb;
 extern const Verb kStatusVerb;
 extern const Verb kDoctorVerb;
+extern const Verb kPsVerb;
+extern const Verb kTaskShowVerb;
 extern const Verb kVersionVerb;
 extern const Verb kHelpVerb;
 
@@ -52,6 +54,8 @@ constexpr const Verb* kVerbs[] = {
     &kEventsVerb,           //
     &kStatusVerb,           //
     &kDoctorVerb,           //
+    &kPsVerb,               //
+    &kTaskShowVerb,         //
     &kVersionVerb,          //
     &kHelpVerb,
 };
@@ -59,6 +63,7 @@ constexpr const Verb* kVerbs[] = {
 constexpr VerbGroup kVerbGroups[] = {
     {"config", "Read and change an agent's configuration"},
     {"depot", "Look into the depot and remove files from it"},
+    {"task", "Look at what the host was asked for"},
 };
 
 /// The verb of a full name such as "config get"; null if there is none.

@@ -22,6 +22,22 @@ TEST(Table, HasNoBlanksAtTheEndsOfLinesAndNoControlCharacters) {
     EXPECT_EQ(ctl::tableText(rows, {{"A", "A"}, {"B", "B"}}), "A      B\nx\\x1B\ny      z\n");
 }
 
+TEST(Table, FitsEightyColumnsAndLosesNothing) {
+    const json rows = {
+        {{"A", "ux"}, {"B", std::string(30, 'b')}, {"C", std::string(30, 'c') + " end of a text"}}};
+    EXPECT_EQ(ctl::tableText(rows, {{"A", "A"}, {"B", "B"}, {"C", "C"}}),
+              "A   B                               C\n"
+              "ux  " +
+                  std::string(30, 'b') + "  " + std::string(30, 'c') + " end of a\n" +
+                  std::string(36, ' ') + "text\n");
+}
+
+TEST(Records, FitEightyColumnsAndLoseNothing) {
+    const json rows = {{{"NAME", std::string(100, 'x')}}};
+    EXPECT_EQ(ctl::recordsText(rows),
+              "NAME  " + std::string(74, 'x') + "\n      " + std::string(26, 'x') + "\n");
+}
+
 TEST(Table, OfNoRowsIsItsTitles) {
     EXPECT_EQ(ctl::tableText(json::array(), {{"A", "FIRST"}, {"B", "SECOND"}}), "FIRST  SECOND\n");
 }

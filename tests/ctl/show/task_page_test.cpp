@@ -145,7 +145,9 @@ TEST(TaskPage, SaysWhyThereIsNoOutcome) {
     EXPECT_EQ(gone.status, ctl::kNoHost);
     const Page late = ctl::showTask(
         "start ux", {TaskResult::End::TimedOut, kAccepted, json::array(), {}}, Format::Text);
-    EXPECT_EQ(late.err, "zavctl: no outcome within the time-out\n");
+    EXPECT_EQ(late.err,
+              "zavctl: no outcome within the time-out\n"
+              "  zavctl task show T tells how it ended\n");
     EXPECT_EQ(late.status, ctl::kNoOutcome);
 }
 

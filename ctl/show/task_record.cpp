@@ -1,0 +1,75 @@
+#include "ctl/show/task_record.h"
+
+#include <nlohmann/json.hpp>
+
+#include "ctl/client/row.h"
+#include "ctl/show/command_report.h"
+#include "ctl/show/message_catalogue.h"
+#include "ctl/show/printable.h"
+#include "ctl/show/task_page.h"
+
+using nlohmann::json;
+
+namespace ctl {
+namespace {
+
+/// "deploy-7: INSTALL ux 6.3": the transaction identifier, or that of the host without one.
+std::string headOf(const json& record) {
+    std::string name = textOf(record, "transid");
+    if (name.empty()) name = textOf(record, "id");
+    std::string text = name + ": " + textOf(record, "command");
+    for (const char* const part : {"product", "version", "targetmsn"}) {
+        const std::string value = textOf(record, part);
+        if (!value.empty()) text += " " + value;
+    }
+    return printable(text);
+}
+
+std::string timeLine(const char* name, const std::string& time, WallTime now) {
+    return time.empty() ? std::string() : std::string("  ") + name + timeText(time, now) + "\n";
+}
+
+/// The row with the task's result: its last outcome, else the reply.
+json resultOf(const json& record) {
+    const auto events = record.find("events");
+    if (events != record.end() && events->is_array() && !events->empty()) return events->back();
+    const auto reply = record.find("reply");
+    return reply != record.end() ? *reply : json();
+}
+
+std::string processLine(const json& command, WallTime now) {
+    const std::string pid = textOf(command, "pid");
+    return "  " + (pid.empty() ? "-" : printable(pid)) + "  " +
+           printable(textOf(command, "command")) + " (" +
+           timeText(textOf(command, "started"), now) + ")\n";
+}
+
+}  // namespace
+
+std::string workText(const json& record, WallTime now) {
+    const std::string started = textOf(record, "started");
+    std::string text = headOf(record) + ", " + printable(textOf(record, "state"));
+    if (!started.empty()) text += " since " + timeText(started, now);
+    text += "\n";
+    for (const json& command : commandsOf(record)) {
+        if (textOf(command, "ended").empty()) text += processLine(command, now);
+    }
+    return text;
+}
+
+std::string recordText(const json& record, WallTime now) {
+    std::string text = headOf(record) + ", " + printable(textOf(record, "state")) + "\n";
+    if (const std::string asker = textOf(record, "asker"); !asker.empty()) {
+        text += "  asked by " + printable(asker) + "\n";
+    }
+    text += timeLine("accepted ", textOf(record, "accepted"), now) +
+            timeLine("started  ", textOf(record, "started"), now) +
+            timeLine("ended    ", textOf(record, "ended"), now);
+    const json result = resultOf(record);
+    if (result.is_object() && returnCodeOf(result) != 0) text += "  " + describeRow(result) + "\n";
+    for (const json& command : commandsOf(record))
+        text += commandReport(command);
+    return text;
+}
+
+}  // namespace ctl
