@@ -21,7 +21,8 @@ struct TableQuery {
 /// What the host answers. Members that it does not send are empty lists.
 struct QueryAnswer {
     nlohmann::json rows = nlohmann::json::array();  ///< objects with a member per column
-    /// Commands that failed while the rows were made, as in a task's details.
+    /// What went wrong while the rows were made: {"text", "command", ...}, a command with the
+    /// members that one has in a task's details.
     nlohmann::json warnings = nlohmann::json::array();
     /// Texts that the rows may hold cut: {"row", "column", "text", "complete"}.
     nlohmann::json full = nlohmann::json::array();

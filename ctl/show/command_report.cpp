@@ -39,6 +39,13 @@ std::string section(const std::string& heading, const std::string& output) {
 
 }  // namespace
 
+json commandsOf(const json& record) {
+    const auto details = record.find("details");
+    if (details == record.end()) return json::array();
+    const auto commands = details->find("commands");
+    return commands != details->end() && commands->is_array() ? *commands : json::array();
+}
+
 std::string endText(const json& command) {
     if (const std::string error = textOf(command, "error"); !error.empty()) {
         return "could not be run: " + printable(error);

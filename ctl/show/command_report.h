@@ -7,6 +7,9 @@
 
 namespace ctl {
 
+/// The commands in the "details" of a task's record; an empty list if there are none.
+nlohmann::json commandsOf(const nlohmann::json& record);
+
 /// "exit code 3", "killed by signal 9", "could not be run: ..." or "not known".
 std::string endText(const nlohmann::json& command);
 

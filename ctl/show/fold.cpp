@@ -45,9 +45,12 @@ std::vector<std::string> folded(const std::string& line, std::size_t width) {
         if (from + most >= line.size()) break;
         const std::size_t blank = line.rfind(' ', from + most);
         const bool isBroken = blank == std::string::npos || blank <= from;
-        const std::size_t end = isBroken ? from + most : blank;
-        pieces.push_back(line.substr(from, end - from));
-        from = isBroken ? end : line.find_first_not_of(' ', end);
+        std::size_t end = isBroken ? from + most : blank;
+        const std::size_t next = isBroken ? end : line.find_first_not_of(' ', end);
+        while (!isBroken && end > from && line[end - 1] == ' ')
+            --end;
+        if (end > from) pieces.push_back(line.substr(from, end - from));
+        from = next;
         if (from == std::string::npos) return pieces;
     }
     pieces.push_back(line.substr(from));

@@ -50,13 +50,6 @@ Page textPage(const std::string& title, const TaskResult& result) {
 
 }  // namespace
 
-json commandsOf(const json& record) {
-    const auto details = record.find("details");
-    if (details == record.end()) return json::array();
-    const auto commands = details->find("commands");
-    return commands != details->end() && commands->is_array() ? *commands : json::array();
-}
-
 std::string replyLine(const std::string& title, const json& reply) {
     if (returnCodeOf(reply) == 0) return printable(title) + ": accepted\n";
     return printable(title) + ": " + toned("refused", Tone::Bad, standardOutput()) + "; " +

@@ -28,9 +28,6 @@ Page showOutcome(const std::string& title, const nlohmann::json& row,
 /// with "doubt" when a look afterwards belies the success.
 nlohmann::json taskDocument(const TaskResult& result);
 
-/// The commands of a task's record; an empty list if there are none.
-nlohmann::json commandsOf(const nlohmann::json& record);
-
 /// How to look at a task later: "zavctl task show T tells how it ended".
 std::string laterText(const std::string& transid);
 

@@ -82,9 +82,9 @@ void refuseCut(const std::string& product, const Configuration& configuration) {
     if (configuration.isWhole) return;
     throw Failure(
         kHostReportedFailure,
-        "config edit " + product + ": the host gave only the first " +
+        "config edit " + product + ": the host gives no more than " +
             std::to_string(configuration.text.size()) +
-            " bytes of the configuration, so the rest would be lost",
+            " bytes of the configuration as text, so the rest would be lost",
         "Write the whole text to a file and use: zavctl config set " + product + " --file FILE");
 }
 

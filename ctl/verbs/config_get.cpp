@@ -81,8 +81,8 @@ Page showConfiguration(const std::string& product, const Configuration& configur
     Page page;
     page.status = isThere && configuration.isWhole ? kSuccess : kHostReportedFailure;
     if (isThere && !configuration.isWhole) {
-        page.err = complaint("the configuration is cut: the host gave only its first " +
-                             std::to_string(configuration.text.size()) + " bytes");
+        page.err = complaint("the configuration is not whole: the host gives no more than " +
+                             std::to_string(configuration.text.size()) + " bytes of it as text");
     }
     if (format == Format::Json) {
         json document = row;

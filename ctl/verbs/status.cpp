@@ -1,9 +1,12 @@
 #include "ctl/verbs/status.h"
 
+#include <chrono>
+#include <cstdint>
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/host_client.h"
 #include "ctl/show/table.h"
+#include "ctl/show/time_text.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
 
@@ -11,6 +14,16 @@ using nlohmann::json;
 
 namespace ctl {
 namespace {
+
+/// The document for people: how long the host has been there, in place of its seconds.
+json readable(json health) {
+    const auto uptime = health.find("uptime_seconds");
+    if (uptime == health.end() || !uptime->is_number_integer()) return health;
+    const std::chrono::seconds span(uptime->get<std::int64_t>());
+    health.erase(uptime);
+    health["uptime"] = spanText(span);
+    return health;
+}
 
 ExitStatus run(const Invocation& invocation) {
     return print(showStatus(askStatus(invocation), invocation.format));
@@ -29,7 +42,7 @@ json askStatus(const Invocation& invocation) {
 
 Page showStatus(const json& health, Format format) {
     if (format == Format::Json) return jsonPage(health);
-    return {recordsText(json::array({health})), {}};
+    return {recordsText(json::array({readable(health)})), {}};
 }
 
 }  // namespace ctl

@@ -421,7 +421,8 @@ TEST(ControlProgram, ATerminalSeesAClockThatRuns) {
     ManagedHost host(home.path());
     const ProgramResult result =
         runProgram({"/usr/bin/script", "-qec",
-                    zavctlPath() + " --socket " + host.socket() + " start ux", "/dev/null"});
+                    zavctlPath() + " --socket " + host.socket() + " start ux", "/dev/null"},
+                   "", {{"NO_COLOR", "1"}});
     EXPECT_EQ(result.status, 0) << result.out;
     EXPECT_THAT(result.out, ContainsRegex("\rstart ux: waiting, [1-9] s "));
     EXPECT_THAT(result.out, ContainsRegex("start ux: done after [0-9]+ s"));

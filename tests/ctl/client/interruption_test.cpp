@@ -12,6 +12,7 @@ using ctl::InterruptNote;
 TEST(InterruptNoteDeathTest, SaysAllAndEndsInterrupted) {
     EXPECT_EXIT(
         {
+            std::signal(SIGINT, SIG_DFL);  // also where the tests run with it ignored
             const InterruptNote first("first\n");
             const InterruptNote second("second\n");
             std::raise(SIGINT);
@@ -22,6 +23,7 @@ TEST(InterruptNoteDeathTest, SaysAllAndEndsInterrupted) {
 TEST(InterruptNoteDeathTest, IsNotSaidAnyMoreWhenItIsGone) {
     EXPECT_EXIT(
         {
+            std::signal(SIGINT, SIG_DFL);  // also where the tests run with it ignored
             const InterruptNote first("first\n");
             { const InterruptNote second("second\n"); }
             std::raise(SIGINT);
@@ -29,6 +31,7 @@ TEST(InterruptNoteDeathTest, IsNotSaidAnyMoreWhenItIsGone) {
         testing::ExitedWithCode(130), "^first\n$");
     EXPECT_EXIT(
         {
+            std::signal(SIGINT, SIG_DFL);
             { const InterruptNote note("gone\n"); }
             std::raise(SIGINT);
         },

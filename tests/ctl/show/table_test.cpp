@@ -23,13 +23,14 @@ TEST(Table, HasNoBlanksAtTheEndsOfLinesAndNoControlCharacters) {
 }
 
 TEST(Table, FitsEightyColumnsAndLosesNothing) {
-    const json rows = {
-        {{"A", "ux"}, {"B", std::string(30, 'b')}, {"C", std::string(30, 'c') + " end of a text"}}};
+    const json rows = {{{"A", "ux"},
+                        {"B", std::string(30, 'b')},
+                        {"C", std::string(30, 'c') + " end of a text!"}}};
     EXPECT_EQ(ctl::tableText(rows, {{"A", "A"}, {"B", "B"}, {"C", "C"}}),
               "A   B                               C\n"
               "ux  " +
                   std::string(30, 'b') + "  " + std::string(30, 'c') + " end of a\n" +
-                  std::string(36, ' ') + "text\n");
+                  std::string(36, ' ') + "text!\n");
 }
 
 TEST(Records, FitEightyColumnsAndLoseNothing) {

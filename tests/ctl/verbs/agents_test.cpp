@@ -29,11 +29,14 @@ TEST(Agents, ThatAreNoneAreSaid) {
 }
 
 TEST(Agents, ThatCouldNotBeFoundOutAreAFailureThatSaysWhy) {
-    const json warning = {{"command", "/h/bin/cinfo -d"}, {"exit", 3}, {"stderr", "no registry\n"}};
+    const json warning = {{"text", "cinfo \x1b failed"},
+                          {"command", "/h/bin/cinfo -d"},
+                          {"exit", 3},
+                          {"stderr", "no registry\n"}};
     const ctl::Page page = ctl::showAgents({json::array(), json{warning}}, Format::Text);
     EXPECT_EQ(page.out, "");
     EXPECT_EQ(page.err,
-              "zavctl: warning: a program of the home failed\n"
+              "zavctl: warning: cinfo \\x1B failed\n"
               "  command: /h/bin/cinfo -d\n"
               "  end:     exit code 3\n"
               "  standard error:\n"

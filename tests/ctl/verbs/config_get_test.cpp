@@ -39,8 +39,10 @@ TEST(ConfigGet, SaysThatATextIsCut) {
     const auto heard = ctl::configurationIn(answerWith(std::string(5000, 'c'), false));
     const Page page = showConfiguration("ux", heard, Format::Text);
     EXPECT_EQ(page.out, std::string(5000, 'c') + "\n");
-    EXPECT_EQ(page.err,
-              "zavctl: the configuration is cut: the host gave only its first 5000 bytes\n");
+    EXPECT_EQ(
+        page.err,
+        "zavctl: the configuration is not whole: the host gives no more than 5000 bytes of it as "
+        "text\n");
     EXPECT_EQ(page.status, ctl::kHostReportedFailure);
     const json full = {{"RETVAL", 0}, {"CONTEXT", std::string(3072, 'c')}};
     for (const Format format : {Format::Text, Format::Json})
