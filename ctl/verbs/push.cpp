@@ -53,7 +53,7 @@ Failure withRemains(const Failure& failure, const std::vector<std::string>& rema
     std::string text = signal != 0 ? "interrupted" : failure.what();
     for (const std::string& sentence : remains)
         text += "; " + sentence;
-    return {status, text};
+    return {status, text, failure.hint(), failure.guard()};
 }
 
 void sendAll(Pusher& pusher, std::vector<PushedFile>& files) {

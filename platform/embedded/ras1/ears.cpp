@@ -2,6 +2,7 @@
 
 #include <cstring>
 #include <ctime>
+#include <new>
 #include <stdexcept>
 #include <utility>
 
@@ -19,7 +20,10 @@ void pauseShortly() {
 }  // namespace
 
 Ears& Ears::ofProcess() {
-    static Ears& instance = *new Ears;
+    // Never destroyed, because threads trace until the process ends. Constructed in static storage,
+    // because who traces may be out of memory.
+    alignas(Ears) static unsigned char place[sizeof(Ears)];
+    static Ears& instance = *new (place) Ears;
     return instance;
 }
 
