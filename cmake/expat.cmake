@@ -5,7 +5,7 @@
 add_library(zav_expat INTERFACE)
 if(CMAKE_SIZEOF_VOID_P EQUAL 4)
   set(ZAV_I386_ROOT ${CMAKE_SOURCE_DIR}/build/third_party/i386 CACHE PATH
-      "Folder with the unpacked 32-bit expat package")
+      "Folder with the unpacked 32-bit packages")
   find_library(ZAV_EXPAT_I386 libexpat.a
     PATHS ${ZAV_I386_ROOT}/usr/lib/i386-linux-gnu NO_DEFAULT_PATH)
   if(NOT ZAV_EXPAT_I386)

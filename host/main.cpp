@@ -122,6 +122,11 @@ void attendToOrphans(HttpServer& server, int childSignals) {
     });
 }
 
+Journal::Settings journalOf(const HostOptions& options) {
+    return {options.journal ? options.state : std::string(), options.rerunInterrupted,
+            options.keepDays, options.keepRows};
+}
+
 void run(const HostOptions& options) {
     ras1::showSecrets(options.traceSecrets || !options.guarded);
     // Unguarded hosts may share a home, as processes that load the plug-in themselves may.
@@ -138,7 +143,7 @@ void run(const HostOptions& options) {
         depotDirectoryOf(options.home, std::getenv(kDepotVariable), options.guarded);
     provideDepotDirectory(depot);
     Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
-                      options.guarded, {depot.path, options.state});
+                      options.guarded, {depot.path, options.state}, journalOf(options));
     services.checkSubject = [options] { return CheckSubject(options, environmentVariable); };
     Api api(services, routes());
     ncs::Server transfers({}, &services.transfers);
@@ -150,6 +155,7 @@ void run(const HostOptions& options) {
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     server.run();
+    services.journal.endCleanly(services.watch.quiet());
     transfers.stop();
     transferSocket.remove();
     socket.remove();

@@ -8,8 +8,8 @@ set -eu
 cd "$(dirname "$0")/.."
 
 packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev libexpat1-dev
-libssl-dev libboost-dev nlohmann-json3-dev libcli11-dev mksh curl pkgconf procps shellcheck clang
-libclang-rt-dev'
+libsqlite3-dev libssl-dev libboost-dev nlohmann-json3-dev libcli11-dev mksh curl pkgconf procps
+shellcheck clang libclang-rt-dev'
 # Programs that only judge the product from outside; their tests are skipped without them.
 judges='python3-impacket tshark'
 
@@ -90,3 +90,4 @@ unpack_i386() {
 }
 unpack_i386 libexpat1-dev libexpat.a
 unpack_i386 libssl-dev libcrypto.a
+unpack_i386 libsqlite3-dev libsqlite3.a

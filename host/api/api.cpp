@@ -7,6 +7,7 @@
 #include "host/api/services.h"
 #include "host/depot/depot_error.h"
 #include "host/guard/refusal.h"
+#include "host/outcomes/task_keeper.h"
 #include "host/tables/bad_request.h"
 #include "host/tables/query.h"
 
@@ -38,6 +39,8 @@ Answer answerTo(Services& services, Call& call) {
         return guardReply(refused.httpStatus(), refused.what(), refused.guard(), refused.hint());
     } catch (const DepotError& error) {
         return errorReply(statusOf(error.kind()), error.what());
+    } catch (const NotKept& failure) {
+        return errorReply(503, failure.what());
     } catch (const QueryFailed& failed) {
         return errorReply(failed.gone() ? 404 : 500, failed.what());
     }

@@ -20,7 +20,8 @@ Answer getHealth(Services& services, const Call&) {
         {"origin_node", services.codePage.toUtf8(oxa::originNode())},
         {"uptime_seconds", duration_cast<std::chrono::seconds>(uptime).count()},
         {"subscriptions", services.counts.streams.load()},
-        {"guarded", services.guarded}};
+        {"guarded", services.guarded},
+        {"journal", services.journal.identity()}};
     return jsonReply(200, document.dump());
 }
 

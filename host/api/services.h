@@ -16,6 +16,7 @@
 #include "host/depot/transfer_rules.h"
 #include "host/guard/guards.h"
 #include "host/http/server_counts.h"
+#include "host/journal/journal.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task_list.h"
 #include "host/outcomes/task_watch.h"
@@ -34,14 +35,16 @@ struct Places {
 /// Made once, after the plug-in has started, and shared by all requests. Any thread.
 struct Services {
     Services(std::vector<oxa::Table> offered, CodePage localCodePage, std::string homeDirectory,
-             RowQueue::Limits limits = {}, bool isGuarded = true, Places places = {})
+             RowQueue::Limits limits = {}, bool isGuarded = true, Places places = {},
+             const Journal::Settings& journalSettings = {})
         : tables(std::move(offered)),
           codePage(std::move(localCodePage)),
           home(std::move(homeDirectory)),
           eventLimits(limits),
           guarded(isGuarded),
           depotFiles(places.depot.empty() ? home : std::move(places.depot),
-                     {places.state.empty() ? home + "/zavhost" : std::move(places.state)}) {
+                     {places.state.empty() ? home + "/zavhost" : std::move(places.state)}),
+          journal(journalSettings) {
         hearCommands();
     }
 
@@ -59,8 +62,9 @@ struct Services {
     const std::string depot =  ///< its directory, in that code page, too
         depotDirectoryOf(home, std::getenv(kDepotVariable), guarded).path;
     ServerCounts counts;
+    Journal journal;
     OutcomeFeed outcomes{tables};
-    TaskList tasks{tables, outcomes, guarded};
+    TaskList tasks{tables, outcomes, journal, guarded};
     TaskWatch watch{tables, outcomes};
     const Guards guards{{codePage, home, depot}, tasks};  ///< asked if `guarded`
 };

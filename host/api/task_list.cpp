@@ -29,8 +29,8 @@ std::optional<std::string> valueOf(const Call& call, const char* name, const Cod
     return codePage.fromUtf8(*text).value_or(std::string("\xFF"));
 }
 
-TaskList::Filter filterOf(const Call& call, const CodePage& codePage) {
-    TaskList::Filter filter;
+TaskFilter filterOf(const Call& call, const CodePage& codePage) {
+    TaskFilter filter;
     if (const std::string* const state = call.text("state")) filter.state = stateNamed(*state);
     filter.product = valueOf(call, "product", codePage);
     filter.command = valueOf(call, "command", codePage);

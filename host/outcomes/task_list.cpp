@@ -3,29 +3,16 @@
 #include <strings.h>
 
 #include <algorithm>
-#include <cstdio>
 #include <iterator>
-#include <random>
 #include <utility>
 
 #include "host/commands/ear.h"
-#include "host/outcomes/packed_row.h"
+#include "host/outcomes/shown_request.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/row_fields.h"
 
 namespace host {
 namespace {
-
-constexpr std::size_t kLongestValue = 4096;
-/// Of the commands of all tasks that are over.
-constexpr std::size_t kMostWeight = std::size_t{8} << 20;
-
-std::string randomName() {
-    std::random_device source;
-    char text[16];
-    std::snprintf(text, sizeof text, "%08x", static_cast<unsigned>(source()));
-    return text;
-}
 
 const oxa::Column* find(const oxa::Table& table, std::string_view column) {
     return table.find(std::string(column));
@@ -38,48 +25,11 @@ std::string asInRow(const oxa::Column& column, std::string_view value) {
     return text;
 }
 
-/// The plug-in takes the last value of a column that is given more than once.
-std::vector<std::pair<std::string, std::string>> valuesOf(const Query& query) {
-    std::vector<std::pair<std::string, std::string>> values;
-    for (const oxa::Predicate& condition : query.where) {
-        const auto same = std::find_if(values.begin(), values.end(), [&](const auto& value) {
-            return value.first == condition.column;
-        });
-        if (same == values.end()) {
-            values.emplace_back(condition.column, condition.value);
-        } else {
-            same->second = condition.value;
-        }
-    }
-    return values;
-}
-
-/// Leaves out what may be a secret and cuts what is long.
-void makeKeepable(Task& task) {
-    const bool secret = task.value(plugin::kCommandColumn) == plugin::kSetConfiguration;
-    const auto isContext = [](const auto& value) { return value.first == plugin::kContextColumn; };
-    std::vector<std::pair<std::string, std::string>>& values = task.request;
-    if (secret) values.erase(std::remove_if(values.begin(), values.end(), isContext), values.end());
-    for (auto& value : values) {
-        if (value.second.size() > kLongestValue) value.second.resize(kLongestValue);
-        value.second.shrink_to_fit();
-    }
-}
-
 void blank(std::string& row, const oxa::Column& column) {
     const auto offset = static_cast<std::size_t>(std::max(0, column.offset));
     const auto length = static_cast<std::size_t>(std::max(0, column.length));
     if (offset > row.size() || length > row.size() - offset) return;
     std::fill_n(row.begin() + column.offset, length, ' ');
-}
-
-std::size_t weightOf(const std::vector<Command>& commands) {
-    std::size_t bytes = 0;
-    for (const Command& command : commands) {
-        bytes += sizeof command + command.line.size() + command.out.text().size() +
-                 command.err.text().size();
-    }
-    return bytes;
 }
 
 void append(std::vector<Command>& commands, std::vector<Command> more) {
@@ -94,28 +44,8 @@ bool TaskList::Columns::complete() const {
            outcomeRetval != nullptr;
 }
 
-Task TaskList::Entry::whole() const {
-    Task copy = task;
-    copy.reply = unpackRow(reply);
-    for (const std::string& row : outcomes)
-        copy.outcomes.push_back(unpackRow(row));
-    return copy;
-}
-
-Task TaskList::Entry::summary() const {
-    Task copy;
-    copy.id = task.id;
-    copy.asker = task.asker;
-    copy.request = task.request;
-    copy.state = task.state;
-    copy.accepted = task.accepted;
-    copy.started = task.started;
-    copy.ended = task.ended;
-    return copy;
-}
-
-TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, bool seesThrough)
-    : seesThrough_(seesThrough), run_(randomName() + '-') {
+TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, TaskKeeper& keeper, bool guarded)
+    : guarded_(guarded), keeper_(keeper) {
     const oxa::Table* const requests = tables.find(plugin::kRequestTable);
     const oxa::Table* const outcomes = tables.find(plugin::kOutcomeTable);
     if (requests == nullptr || outcomes == nullptr) return;
@@ -135,101 +65,192 @@ TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, bool seesThrough)
 }
 
 TaskList::Request::Request(TaskList& list, const Query& query, std::string asker) : list_(list) {
-    if (list.requests_ == nullptr || query.table->name != list.requests_->name) return;
-    number_ = list.add(query, std::move(asker));
+    if (list_.requests_ == nullptr || query.table->name != list_.requests_->name) return;
+    if (!plugin::runsAtOnce(valueIn(query.where, plugin::kCommandColumn))) {
+        turn_ = std::unique_lock<std::mutex>(list_.turns_);
+    }
+    number_ = list_.add(query, std::move(asker));
 }
+
+TaskList::Request::Request(TaskList& list, Task task)
+    : list_(list), turn_(list.turns_), number_(list.addHandedOver(std::move(task))) {}
 
 TaskList::Request::~Request() {
     if (number_ != 0) list_.forget(number_);
 }
 
 void TaskList::Request::answered(const oxa::Rows& rows, const Heard& heard) {
-    if (number_ == 0) return;
-    const Calls calls = list_.answer(number_, rows, heard);
-    calls();
+    if (number_ != 0) list_.answer(number_, rows, heard);
 }
 
-void TaskList::Calls::operator()() const {
-    for (const WhenOver& waiter : waiters)
-        waiter(task);
-}
-
+/// Returns 0 when it cannot be kept and goes on all the same.
 std::uint64_t TaskList::add(const Query& query, std::string asker) {
+    Task task;
+    task.asker = std::move(asker);
+    task.conditions = query.where;
+    task.request = shownRequest(query.where);
+    task.transid = asInRow(*columns_.transid, task.value(plugin::kTransidColumn));
+    task.accepted = WallClock::now();
+    task.answered = false;
+    if (plugin::runsAtOnce(task.value(plugin::kCommandColumn))) {
+        task.way = TaskWay::AtOnce;
+        return insert(std::move(task));
+    }
+    task.run = keeper_.run();
+    try {
+        keeper_.enter(task);
+    } catch (const NotKept&) {
+        if (guarded_) throw;
+        return 0;
+    }
+    return insert(std::move(task));
+}
+
+std::uint64_t TaskList::addHandedOver(Task task) {
+    task.run = keeper_.run();
+    keeper_.save(task);
+    return insert(std::move(task));
+}
+
+std::uint64_t TaskList::insert(Task task) {
     Entry entry;
-    entry.task.asker = std::move(asker);
-    entry.task.request = valuesOf(query);
-    entry.task.accepted = WallClock::now();
-    entry.transid = asInRow(*columns_.transid, entry.task.value(plugin::kTransidColumn));
-    entry.overAtFirst = entry.task.value(plugin::kCommandColumn) != plugin::kInstall ||
-                        entry.task.value(plugin::kOptionalColumn) != plugin::kWithRestart;
-    makeKeepable(entry.task);
+    entry.overAtFirst = task.value(plugin::kCommandColumn) != plugin::kInstall ||
+                        task.value(plugin::kOptionalColumn) != plugin::kWithRestart;
+    if (task.way != TaskWay::AtOnce) std::vector<oxa::Predicate>().swap(task.conditions);
+    entry.task = std::move(task);
     const embedded::MutexLock lock(lock_);
     const std::uint64_t number = ++lastNumber_;
-    entry.task.id = run_ + std::to_string(number);
     entries_.emplace(number, std::move(entry));
     return number;
 }
 
 void TaskList::forget(std::uint64_t number) {
-    const embedded::MutexLock lock(lock_);
-    const auto found = entries_.find(number);
-    if (found != entries_.end() && !found->second.answered) entries_.erase(found);
+    Task task;
+    {
+        const embedded::MutexLock lock(lock_);
+        const auto found = entries_.find(number);
+        if (found == entries_.end() || found->second.answered) return;
+        task = std::move(found->second.task);
+        entries_.erase(found);
+    }
+    if (task.way == TaskWay::Query) keeper_.forget(task.number);
 }
 
-TaskList::Calls TaskList::answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard) {
-    const embedded::MutexLock lock(lock_);
-    Entry& entry = entries_.at(number);
-    Task& task = entry.task;
+/// Puts down what the answer says. Without a word about it there was none, unless the outcome has
+/// shown already that the request was accepted.
+std::optional<int> TaskList::readAnswer(Entry& entry, const oxa::Rows& rows, const Heard& heard) {
     std::optional<int> retval = heard.answer;
-    const std::string_view command = task.value(plugin::kCommandColumn);
+    Task& task = entry.task;
     if (rows.count() > 0) {
-        std::string reply(rowOf(rows, 0));
-        retval = integerField(*columns_.retval, reply);
-        entry.transid = textField(*columns_.transid, reply);
-        if (plugin::holdsConfiguration(command) && columns_.context != nullptr) {
-            blank(reply, *columns_.context);
+        task.reply = rowOf(rows, 0);
+        retval = integerField(*columns_.retval, task.reply);
+        task.transid = textField(*columns_.transid, task.reply);
+        if (plugin::holdsConfiguration(task.value(plugin::kCommandColumn)) &&
+            columns_.context != nullptr) {
+            blank(task.reply, *columns_.context);
         }
-        entry.reply = packRow(reply);
     }
-    if (!retval && !entry.ended) return {};
-    entry.answered = true;
-    if (plugin::runsAtOnce(command)) {
+    if (!retval && entry.ended) retval = plugin::kAccepted;
+    return retval;
+}
+
+void TaskList::answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard) {
+    Entry over;
+    {
+        const embedded::MutexLock lock(lock_);
+        Entry& entry = entries_.at(number);
+        const std::optional<int> retval = readAnswer(entry, rows, heard);
+        if (!retval) return;
+        entry.answered = true;
+        entry.task.answered = true;
+        const bool refused = *retval != plugin::kAccepted && !entry.ended;
+        const bool isOver = entry.task.way == TaskWay::AtOnce || refused || entry.kept;
+        if (isOver) {
+            over = std::move(entry);
+            entries_.erase(number);
+            if (refused) over.task.state = TaskState::Refused;
+            if (over.task.way == TaskWay::AtOnce) over.retval = *retval;
+        } else {
+            entry.turn = ++lastTurn_;
+            // Handed over with the lock held, so that no later change of the task comes first.
+            if (!entry.ended) keeper_.saveSoon(entry.task);
+            if (auto next = startNext(0)) keeper_.saveSoon(std::move(*next));
+        }
+    }
+    if (over.answered) endAnswered(std::move(over), heard);
+}
+
+/// A task that is over and has been answered now.
+void TaskList::endAnswered(Entry entry, const Heard& heard) {
+    Task& task = entry.task;
+    if (!task.ended) task.ended = WallClock::now();
+    if (task.way == TaskWay::AtOnce) {
         task.started = task.accepted;
         task.commands = heard.commands;
-        if (command == plugin::kGetConfiguration) {
+        if (task.value(plugin::kCommandColumn) == plugin::kGetConfiguration) {
             for (Command& ran : task.commands)
                 ran.out.clear();  // it is the answer
         }
-        entry.retval = retval.value_or(plugin::kAccepted);
-        return finish(number, judge(entry));
+        task.state = judge(entry);
+        keeper_.enterSoon(task);
+    } else {
+        keeper_.saveSoon(task);
     }
-    if (retval && *retval != plugin::kAccepted) return finish(number, TaskState::Refused);
-    entry.turn = ++lastTurn_;
-    task.accepted = std::min(WallClock::now(), task.ended.value_or(WallClock::time_point::max()));
-    if (entry.ended) return finish(number, judge(entry));
-    startNext();
-    return {};
+    tellWaiters(task);
 }
 
 void TaskList::take(const std::string& row, std::vector<Command> commands) {
-    Calls calls;
+    std::vector<Task> changed;
+    std::uint64_t number = 0;
     {
         const embedded::MutexLock lock(lock_);
         const auto found = awaiting(textField(*columns_.outcomeTransid, row));
-        if (found == entries_.end()) return;
-        Entry& entry = found->second;
-        entry.outcomes.push_back(packRow(row));
-        append(entry.task.commands, std::move(commands));
-        entry.retval = integerField(*columns_.outcomeRetval, row);
-        entry.ended =
-            entry.overAtFirst || entry.retval != plugin::kAccepted || entry.outcomes.size() > 1;
-        if (!entry.ended) return;
-        entry.task.ended = WallClock::now();
-        if (!entry.answered) return;  // its thread has yet to come
-        calls = finish(found->first, judge(entry));
-        startNext();
+        if (found != entries_.end()) {
+            number = found->first;
+            changed = takeInto(number, row, std::move(commands));
+        }
     }
-    calls();
+    if (number == 0) {
+        keeper_.keepRow(row);
+        return;
+    }
+    keeper_.saveOutcome(changed);
+    if (isOver(changed.front().state)) noteKept(number, !changed.front().answered);
+}
+
+/// What the outcome changes: its task first, and the one that begins with it.
+std::vector<Task> TaskList::takeInto(std::uint64_t number, const std::string& row,
+                                     std::vector<Command> commands) {
+    Entry& entry = entries_.at(number);
+    Task& task = entry.task;
+    task.outcomes.push_back(row);
+    append(task.commands, std::move(commands));
+    entry.retval = integerField(*columns_.outcomeRetval, row);
+    entry.ended =
+        entry.overAtFirst || entry.retval != plugin::kAccepted || task.outcomes.size() > 1;
+    if (!entry.ended) return {task};
+    task.ended = WallClock::now();
+    task.state = judge(entry);
+    if (!task.started) task.started = task.accepted;
+    std::vector<Task> changed = {task};
+    if (auto next = startNext(number)) changed.push_back(std::move(*next));
+    return changed;
+}
+
+/// The outcome is kept: now everybody may know.
+void TaskList::noteKept(std::uint64_t number, bool answeredMeanwhile) {
+    Task over;
+    {
+        const embedded::MutexLock lock(lock_);
+        Entry& entry = entries_.at(number);
+        entry.kept = true;
+        if (!entry.answered) return;  // its thread has yet to come
+        over = std::move(entry.task);
+        entries_.erase(number);
+        // The answer may have come while the outcome was being written.
+        if (answeredMeanwhile) keeper_.saveSoon(over);
+    }
+    tellWaiters(over);
 }
 
 /// The task that an outcome with this TRANSID ends: the first one accepted, or else one whose
@@ -238,8 +259,8 @@ TaskList::Entries::iterator TaskList::awaiting(std::string_view transid) {
     auto best = entries_.end();
     for (auto at = entries_.begin(); at != entries_.end(); ++at) {
         const Entry& entry = at->second;
-        if (entry.ended || isOver(entry.task.state) || entry.transid != transid) continue;
-        if (plugin::runsAtOnce(entry.task.value(plugin::kCommandColumn))) continue;
+        if (entry.ended || entry.task.way == TaskWay::AtOnce) continue;
+        if (entry.task.transid != transid) continue;
         if (best == entries_.end()) {
             best = at;
         } else if (entry.answered && (!best->second.answered || entry.turn < best->second.turn)) {
@@ -249,15 +270,17 @@ TaskList::Entries::iterator TaskList::awaiting(std::string_view transid) {
     return best;
 }
 
-void TaskList::startNext() {
+/// The task that the executor takes next begins; nothing if there is none or it has begun.
+std::optional<Task> TaskList::startNext(std::uint64_t except) {
     Entry* next = nullptr;
     for (auto& [number, entry] : entries_) {
-        if (entry.turn == 0 || isOver(entry.task.state)) continue;
+        if (number == except || entry.turn == 0 || entry.ended) continue;
         if (next == nullptr || entry.turn < next->turn) next = &entry;
     }
-    if (next == nullptr || next->task.state == TaskState::Running) return;
+    if (next == nullptr || next->task.state == TaskState::Running) return std::nullopt;
     next->task.state = TaskState::Running;
     next->task.started = WallClock::now();
+    return next->task;
 }
 
 TaskState TaskList::judge(const Entry& entry) const {
@@ -265,69 +288,29 @@ TaskState TaskList::judge(const Entry& entry) const {
     const std::vector<Command>& commands = entry.task.commands;
     const bool unseen = std::any_of(commands.begin(), commands.end(),
                                     [](const Command& command) { return command.failedUnseen(); });
-    return seesThrough_ && unseen ? TaskState::Failed : TaskState::Done;
+    return guarded_ && unseen ? TaskState::Failed : TaskState::Done;
 }
 
-TaskList::Calls TaskList::finish(std::uint64_t number, TaskState state) {
-    Entry& entry = entries_.at(number);
-    Task& task = entry.task;
-    task.state = state;
-    if (!task.ended) task.ended = WallClock::now();
-    if (!task.started && state != TaskState::Refused) task.started = task.accepted;
-    Calls calls;
-    for (auto at = waiters_.begin(); at != waiters_.end();) {
-        if (at->second.id != task.id) {
-            ++at;
-            continue;
+void TaskList::end(const Task& task) {
+    keeper_.save(task);
+    tellWaiters(task);
+}
+
+void TaskList::tellWaiters(const Task& task) {
+    std::vector<WhenOver> calls;
+    {
+        const embedded::MutexLock lock(lock_);
+        for (auto at = waiters_.begin(); at != waiters_.end();) {
+            if (at->second.id != task.id) {
+                ++at;
+                continue;
+            }
+            calls.push_back(std::move(at->second.whenOver));
+            at = waiters_.erase(at);
         }
-        calls.waiters.push_back(std::move(at->second.whenOver));
-        at = waiters_.erase(at);
     }
-    if (!calls.waiters.empty()) calls.task = entry.whole();
-    entry.weight = weightOf(task.commands);
-    weight_ += entry.weight;
-    over_.push_back(number);
-    trim();
-    return calls;
-}
-
-void TaskList::trim() {
-    while (over_.size() > kKept) {
-        const auto oldest = entries_.find(over_.front());
-        weight_ -= oldest->second.weight;
-        entries_.erase(oldest);
-        over_.pop_front();
-    }
-    for (const std::uint64_t number : over_) {
-        if (weight_ <= kMostWeight) return;
-        Entry& entry = entries_.at(number);
-        weight_ -= std::exchange(entry.weight, 0);
-        std::vector<Command>().swap(entry.task.commands);
-    }
-}
-
-std::vector<Task> TaskList::newest(const Filter& filter) const {
-    std::vector<Task> found;
-    const embedded::MutexLock lock(lock_);
-    for (auto at = entries_.rbegin(); at != entries_.rend() && found.size() < filter.limit; ++at) {
-        const Task& task = at->second.task;
-        if (!at->second.answered) continue;
-        if (filter.state && task.state != *filter.state) continue;
-        if (filter.product && task.value(plugin::kProductColumn) != *filter.product) continue;
-        if (filter.command && task.value(plugin::kCommandColumn) != *filter.command) continue;
-        found.push_back(at->second.summary());
-    }
-    return found;
-}
-
-TaskList::Entries::const_iterator TaskList::entryOf(std::string_view name) const {
-    auto newest = entries_.end();
-    for (auto at = entries_.begin(); at != entries_.end(); ++at) {
-        if (!at->second.answered) continue;
-        if (at->second.task.id == name) return at;
-        if (at->second.transid == name) newest = at;
-    }
-    return newest;
+    for (const WhenOver& call : calls)
+        call(task);
 }
 
 bool TaskList::unfinished(const std::string& product) const {
@@ -342,32 +325,31 @@ bool TaskList::unfinished(const std::string& product) const {
 }
 
 std::optional<Task> TaskList::find(std::string_view name) const {
-    std::optional<Task> found;
-    bool atWork = false;
-    {
-        const embedded::MutexLock lock(lock_);
-        const auto entry = entryOf(name);
-        if (entry == entries_.end()) return std::nullopt;
-        found = entry->second.whole();
-        atWork = found->state == TaskState::Running;
+    std::optional<Task> found = keeper_.find(name);
+    if (found && found->state == TaskState::Running) {
+        append(found->commands, commandsOfPluginThreads());
     }
-    if (atWork) append(found->commands, commandsOfPluginThreads());
     return found;
 }
 
 std::uint64_t TaskList::awaitEnd(const std::string& id, WhenOver whenOver) {
-    std::optional<Task> over;
+    std::uint64_t number = 0;
     {
         const embedded::MutexLock lock(lock_);
-        const auto entry = entryOf(id);
-        if (entry != entries_.end() && isOver(entry->second.task.state)) {
-            over = entry->second.whole();
-        } else {
-            waiters_.emplace(++lastWaiter_, Waiter{id, std::move(whenOver)});
-            return lastWaiter_;
-        }
+        number = ++lastWaiter_;
+        waiters_.emplace(number, Waiter{id, std::move(whenOver)});
     }
-    whenOver(*over);
+    const std::optional<Task> task = keeper_.find(id);
+    if (!task || !isOver(task->state)) return number;
+    WhenOver call;
+    {
+        const embedded::MutexLock lock(lock_);
+        const auto waiter = waiters_.find(number);
+        if (waiter == waiters_.end()) return 0;  // it has been called meanwhile
+        call = std::move(waiter->second.whenOver);
+        waiters_.erase(waiter);
+    }
+    call(*task);
     return 0;
 }
 

@@ -1,11 +1,11 @@
-/// The tasks of this run of the host, in memory.
+/// The tasks: each request on the request table, followed to its end.
 #pragma once
 
 #include <cstdint>
-#include <deque>
 #include <functional>
 #include <map>
 #include <memory>
+#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -16,34 +16,43 @@
 #include "host/commands/recorder.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task.h"
+#include "host/outcomes/task_keeper.h"
 #include "host/tables/query.h"
 #include "host/tables/table_set.h"
 
 namespace host {
 
-/// Follows each request on the request table to its end. Of tasks that are over only the last ones
-/// are kept, and the commands of the oldest go when all of them together are too large.
+/// Has every change of a task kept before anybody can see it, and holds in memory only what the
+/// plug-in has been given and has not finished.
 ///
 /// The executor takes tasks in the order of their acceptance, so the oldest one without an outcome
 /// is the one that runs, and what is heard on the executor's thread until that outcome is its work.
 /// Any thread may call.
 class TaskList {
 public:
-    static constexpr std::size_t kKept = 1000;
+    using Filter = TaskFilter;
 
-    /// Both outlive this object, and nobody has subscribed to the feed before: whoever gets an
-    /// outcome finds it here. Without a request table and an outcome table that have the columns
-    /// that matter, there are never any tasks.
-    /// `seesThrough`: a success in whose course a command failed unseen counts as failed.
-    TaskList(const TableSet& tables, OutcomeFeed& feed, bool seesThrough);
+    /// All of them outlive this object, and nobody has subscribed to the feed before: an outcome is
+    /// kept before anybody else gets it, and before the executor begins its next task. Without a
+    /// request table and an outcome table that have the columns that matter, there are never any
+    /// tasks.
+    /// `guarded`: a success in whose course a command failed unseen counts as failed, and a request
+    /// that cannot be kept is not handed over.
+    TaskList(const TableSet& tables, OutcomeFeed& feed, TaskKeeper& keeper, bool guarded);
     TaskList(const TaskList&) = delete;
     TaskList& operator=(const TaskList&) = delete;
 
     /// One query, for as long as it runs on its thread; a task if it is one on the request table.
     /// Without an answer there was no task.
+    ///
+    /// A request that will be queued is kept first. Until its query has been answered the next one
+    /// waits, so that the order in which they are kept is the one in which the plug-in gets them.
     class Request {
     public:
+        /// Throws NotKept; unguarded, the request goes on and is no task.
         Request(TaskList& list, const Query& query, std::string asker);
+        /// Hands over a task that has been entered.
+        Request(TaskList& list, Task task);
         ~Request();
         Request(const Request&) = delete;
         Request& operator=(const Request&) = delete;
@@ -52,18 +61,12 @@ public:
 
     private:
         TaskList& list_;
-        std::uint64_t number_ = 0;  ///< 0: not on the request table
+        std::unique_lock<std::mutex> turn_;
+        std::uint64_t number_ = 0;  ///< 0: no task
     };
 
-    struct Filter {
-        std::optional<TaskState> state{};
-        std::optional<std::string> product{};
-        std::optional<std::string> command{};
-        std::size_t limit = kKept;
-    };
-    /// The tasks that satisfy all conditions, newest first, without their rows and
-    /// commands.
-    std::vector<Task> newest(const Filter& filter) const;
+    /// The tasks that satisfy all conditions, newest first, without their commands.
+    std::vector<Task> newest(const TaskFilter& filter) const { return keeper_.newest(filter); }
 
     /// Whether an accepted task for the product, in upper or lower case, is not over. False for no
     /// product.
@@ -72,6 +75,9 @@ public:
     /// The task with this identifier, or else the newest one with this TRANSID. The commands of a
     /// running one are those so far.
     std::optional<Task> find(std::string_view name) const;
+
+    /// A task that has been entered ends without having been handed over. Throws NotKept.
+    void end(const Task& task);
 
     /// Gets the task once it is over, on the thread that ends it. Must return quickly.
     using WhenOver = std::function<void(const Task& task)>;
@@ -91,53 +97,46 @@ private:
         bool complete() const;
     };
     struct Entry {
-        Task task;                          ///< without its rows
-        std::string reply;                  ///< packed
-        std::vector<std::string> outcomes;  ///< packed
-        std::string transid;                ///< as the outcome will have it
-        std::uint64_t turn = 0;  ///< place in the executor's queue; 0: not accepted, or ran at once
-        bool answered = false;
+        Task task;
+        std::uint64_t turn = 0;   ///< place in the executor's queue; 0: not accepted yet
         bool overAtFirst = true;  ///< its first outcome with RETVAL 0 is its last
         int retval = 0;           ///< of its last outcome
-        bool ended = false;       ///< its last outcome has come
-        std::size_t weight = 0;   ///< bytes of its commands, once it is over
-
-        Task whole() const;
-        Task summary() const;  ///< without rows and commands
+        bool answered = false;
+        bool ended = false;  ///< its last outcome has come
+        bool kept = false;   ///< and is durable
     };
     struct Waiter {
         std::string id;
         WhenOver whenOver;
     };
-    /// Waiters and the task that they get, to be called without the lock.
-    struct Calls {
-        std::vector<WhenOver> waiters;
-        Task task;
-        void operator()() const;
-    };
     using Entries = std::map<std::uint64_t, Entry>;
 
     std::uint64_t add(const Query& query, std::string asker);
+    std::uint64_t addHandedOver(Task task);
+    std::uint64_t insert(Task task);
     void forget(std::uint64_t number);
-    Calls answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard);
+    std::optional<int> readAnswer(Entry& entry, const oxa::Rows& rows, const Heard& heard);
+    void answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard);
+    void endAnswered(Entry entry, const Heard& heard);
     void take(const std::string& row, std::vector<Command> commands);
+    std::vector<Task> takeInto(std::uint64_t number, const std::string& row,
+                               std::vector<Command> commands) ZAV_REQUIRES(lock_);
+    void noteKept(std::uint64_t number, bool answeredMeanwhile);
 
     Entries::iterator awaiting(std::string_view transid) ZAV_REQUIRES(lock_);
-    Entries::const_iterator entryOf(std::string_view name) const ZAV_REQUIRES(lock_);
-    void startNext() ZAV_REQUIRES(lock_);
-    Calls finish(std::uint64_t number, TaskState state) ZAV_REQUIRES(lock_);
+    std::optional<Task> startNext(std::uint64_t except) ZAV_REQUIRES(lock_);
     TaskState judge(const Entry& entry) const;
-    void trim() ZAV_REQUIRES(lock_);
+    void tellWaiters(const Task& task);
 
-    const bool seesThrough_;
-    const std::string run_;                 ///< what the identifiers of this run have in common
+    const bool guarded_;
+    TaskKeeper& keeper_;
     const oxa::Table* requests_ = nullptr;  ///< null: there are no tasks
     Columns columns_;
 
+    std::mutex turns_;  ///< held while one request is handed over
+
     mutable embedded::Mutex lock_;
-    Entries entries_ ZAV_GUARDED_BY(lock_);
-    std::deque<std::uint64_t> over_ ZAV_GUARDED_BY(lock_);  ///< in the order of their ends
-    std::size_t weight_ ZAV_GUARDED_BY(lock_) = 0;          ///< of all of them together
+    Entries entries_ ZAV_GUARDED_BY(lock_);  ///< what the plug-in has, in the order of its coming
     std::uint64_t lastNumber_ ZAV_GUARDED_BY(lock_) = 0;
     std::uint64_t lastTurn_ ZAV_GUARDED_BY(lock_) = 0;
     std::map<std::uint64_t, Waiter> waiters_ ZAV_GUARDED_BY(lock_);

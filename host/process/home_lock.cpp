@@ -64,8 +64,8 @@ void writeOwner(const FileDescriptor& file, const std::string& name) {
 
 }  // namespace
 
-HomeLock::HomeLock(const std::string& home) {
-    const std::string name = home + kFileName;
+HomeLock::HomeLock(const std::string& directory, const std::string& what) {
+    const std::string name = directory + kFileName;
     FileDescriptor file = openFile(name);
     std::optional<pid_t> owner;
     const auto deadline = std::chrono::steady_clock::now() + kWritingTime;
@@ -73,7 +73,7 @@ HomeLock::HomeLock(const std::string& home) {
         owner = ownerIn(file);
         if (owner || std::chrono::steady_clock::now() >= deadline) {
             throw StartError(
-                "home " + home + " is in use by " +
+                what + ' ' + directory + " is in use by " +
                 (owner ? "the host with process id " + std::to_string(*owner) : "another host"));
         }
         std::this_thread::sleep_for(kPause);

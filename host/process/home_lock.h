@@ -1,4 +1,4 @@
-/// Keeps a second host off a home.
+/// Keeps a second host off a directory.
 #pragma once
 
 #include <string>
@@ -9,12 +9,14 @@ namespace host {
 
 /// Two hosts on one home would overwrite each other's files and run commands at the same time. The
 /// owner of a home holds a lock on the file .zavhost.lock in it, which contains its process id. The
-/// lock ends with the process, however that ends; the file stays. Children do not inherit it.
+/// lock ends with the process, however that ends; the file stays. Children do not inherit it. The
+/// same goes for the directory of what a host itself keeps.
 class HomeLock {
 public:
     /// Throws StartError when another process holds the lock, with that process's id, or when the
     /// file cannot be made.
-    explicit HomeLock(const std::string& home);
+    /// `what` is the word for the directory in that sentence.
+    explicit HomeLock(const std::string& directory, const std::string& what = "home");
 
 private:
     FileDescriptor file_;

@@ -27,7 +27,12 @@ struct Typed {
     std::optional<std::string> originNode;
     std::optional<std::string> plugin;
     std::optional<std::string> state;
+    std::optional<std::string> maxQueued;
+    std::optional<std::string> keepTasks;
+    std::optional<std::string> keepRows;
+    std::optional<std::string> onInterrupt;
     std::optional<std::string> taskTimeout;
+    bool noJournal = false;
     bool unguarded = false;
     bool traceSecrets = false;
     bool check = false;
@@ -59,6 +64,21 @@ void declare(CLI::App& app, Typed& typed) {
                    "The directory for what the host itself keeps; else STATE_DIRECTORY or "
                    "HOME/zavhost")
         ->type_name("DIR");
+    app.add_flag("--no-journal", typed.noJournal,
+                 "Keep tasks in memory only; they end with the process");
+    app.add_option("--max-queued", typed.maxQueued,
+                   "How many tasks may wait, 1 to 1000000; 1000 if not given")
+        ->type_name("N");
+    app.add_option("--keep-tasks", typed.keepTasks,
+                   "How many days tasks that are over are kept, 1 to 36500; 30 if not given")
+        ->type_name("DAYS");
+    app.add_option("--keep-rows", typed.keepRows,
+                   "How many rows of outcomes are kept, 1 to 100000000; 10000 if not given")
+        ->type_name("N");
+    app.add_option("--on-interrupt", typed.onInterrupt,
+                   "What becomes of a task in whose midst the host was killed: keep notes that, "
+                   "rerun runs it again; keep if not given")
+        ->type_name("keep|rerun");
     app.add_option("--task-timeout", typed.taskTimeout,
                    "How long one command of a task may run; else TIMEOUT says so, else 300")
         ->type_name("SECONDS");
@@ -161,6 +181,34 @@ std::uint16_t portOf(const std::string& text) {
     return static_cast<std::uint16_t>(port);
 }
 
+/// A whole number from 1 to `most`; `otherwise` when the option was not given.
+int countOf(const char* option, const std::optional<std::string>& typed, int most, int otherwise) {
+    if (!typed) return otherwise;
+    int number = 0;
+    const char* const end = typed->data() + typed->size();
+    const auto [rest, error] = std::from_chars(typed->data(), end, number);
+    if (error != std::errc() || rest != end || number < 1 || number > most) {
+        throw StartError(std::string(option) + " takes a number from 1 to " + std::to_string(most) +
+                         ", not \"" + *typed + "\"");
+    }
+    return number;
+}
+
+void chooseJournal(const Typed& typed, HostOptions& options) {
+    if (typed.noJournal && typed.state) {
+        throw StartError("--no-journal and --state exclude each other");
+    }
+    options.journal = !typed.noJournal;
+    options.maxQueued = countOf("--max-queued", typed.maxQueued, 1'000'000, options.maxQueued);
+    options.keepDays = countOf("--keep-tasks", typed.keepTasks, 36'500, options.keepDays);
+    options.keepRows = countOf("--keep-rows", typed.keepRows, 100'000'000, options.keepRows);
+    const std::string onInterrupt = typed.onInterrupt.value_or("keep");
+    if (onInterrupt != "keep" && onInterrupt != "rerun") {
+        throw StartError("--on-interrupt takes keep or rerun, not \"" + onInterrupt + "\"");
+    }
+    options.rerunInterrupted = onInterrupt == "rerun";
+}
+
 void chooseSockets(const Typed& typed, const Environment& environment, HostOptions& options) {
     options.socket = typed.socket ? *typed.socket : defaultSocket(environment);
     options.rpcSocket = typed.rpcSocket ? *typed.rpcSocket : options.socket + ".rpc";
@@ -190,6 +238,7 @@ std::optional<HostOptions> readOptions(int argc, const char* const* argv,
     if (typed->taskTimeout)
         options.taskTimeout = taskTimeoutOf("--task-timeout", *typed->taskTimeout);
     chooseSockets(*typed, environment, options);
+    chooseJournal(*typed, options);
     return options;
 }
 

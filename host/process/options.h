@@ -14,6 +14,11 @@ struct HostOptions {
     std::string socket;
     std::string rpcSocket;
     std::string state;                      ///< the directory of what the host itself keeps
+    bool journal = true;                    ///< false: what was accepted is kept in memory only
+    int maxQueued = 1000;                   ///< tasks that may wait in the journal
+    int keepDays = 30;                      ///< how long tasks that are over are kept
+    int keepRows = 10'000;                  ///< how many rows of outcomes are kept
+    bool rerunInterrupted = false;          ///< the task that an unclean end cut off runs again
     std::optional<std::uint16_t> rpcPort;   ///< absent: no TCP
     std::optional<std::string> originNode;  ///< absent: the platform's own choice
     std::optional<std::string> plugin;      ///< absent: searched for

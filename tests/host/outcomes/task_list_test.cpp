@@ -8,6 +8,7 @@
 #include <thread>
 
 #include "host/commands/ear.h"
+#include "host/journal/journal.h"
 #include "host/made_up_table.h"
 #include "support/scratch_dir.h"
 #include "util/zavutil.h"
@@ -41,12 +42,12 @@ Heard answering(int retval) {
 
 class Tasks : public testing::Test {
 protected:
-    explicit Tasks(bool seesThrough = true) {
+    explicit Tasks(bool guarded = true) {
         requests.RegisterWithManager();
         outcomes.RegisterWithManager();
         tables.emplace(oxa::tables());
         feed.emplace(*tables);
-        list.emplace(*tables, *feed, seesThrough);
+        list.emplace(*tables, *feed, journal, guarded);
         host::hearCommands();
     }
 
@@ -85,6 +86,7 @@ protected:
     MadeUpTable outcomes{"KAGDYST", taskColumns()};
     std::optional<host::TableSet> tables;
     std::optional<host::OutcomeFeed> feed;
+    host::Journal journal{host::Journal::Settings{}};
     std::optional<TaskList> list;
 };
 
@@ -274,33 +276,51 @@ TEST_F(Tasks, AreListedNewestFirstAsAskedFor) {
     EXPECT_THAT(transids({{}, {}, {}, 0}), ElementsAre());
 }
 
-TEST_F(Tasks, OfThoseThatAreOverTheLastAreKept) {
-    ask("waits");
-    for (std::size_t i = 0; i < TaskList::kKept + 5; ++i)
-        ask("r" + std::to_string(i), "NOSUCH", 1003);
-    const std::vector<std::string> kept = transids({{}, {}, {}, 10000});
-    EXPECT_EQ(kept.size(), TaskList::kKept + 1);
-    EXPECT_EQ(kept.back(), "waits");
-    EXPECT_FALSE(list->find("r4").has_value());
-    EXPECT_TRUE(list->find("r5").has_value());
+TEST_F(Tasks, AnOutcomeIsKeptBeforeAnybodyElseSeesIt) {
+    ask("t1");
+    std::vector<TaskState> seen;
+    const auto later = feed->subscribe({}, [&](const oxa::Rows&) {
+        seen.push_back(journal.find("t1")->state);
+        return static_cast<int>(OXA_OK);
+    });
+    publish("t1");
+    EXPECT_THAT(seen, ElementsAre(TaskState::Done));
 }
 
-TEST_F(Tasks, TheOldestLoseTheirCommandsWhenAllTakeTooMuch) {
-    Heard heard = answering(0);
-    for (int i = 0; i < 64; ++i) {
-        host::Command& command = heard.commands.emplace_back();
-        command.out.append(std::string(4096, 'o'));
-        command.err.append(std::string(4096, 'e'));
+TEST_F(Tasks, ARowThatBelongsToNoTaskHoldsNobodyUp) {
+    publish("unknown");
+    ask("t1");
+    publish("t1");
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+}
+
+TEST_F(Tasks, ThoseThatWereEnteredAreHandedOverLater) {
+    Task task;
+    task.transid = "t1";
+    task.way = host::TaskWay::Journal;
+    task.conditions = {{"TRANSID", OPER_EQ, "t1"}, {"COMMAND", OPER_EQ, "START"}};
+    journal.enter(task);
+    EXPECT_EQ(stateOf("t1"), TaskState::Queued);
+    {
+        TaskList::Request request(*list, *journal.nextInLine());
+        request.answered(rows(taskRow("t1", "START", 0)), answering(0));
     }
-    for (int i = 0; i < 40; ++i) {  // about half a MiB each
-        TaskList::Request request(*list, query("t" + std::to_string(i), "COMPLETE_INSTALL"), "");
-        request.answered({}, heard);
-    }
-    EXPECT_EQ(list->find("t39")->commands.size(), 64U);
-    EXPECT_EQ(list->find("t30")->commands.size(), 64U);
-    EXPECT_EQ(list->find("t20")->commands.size(), 0U);
-    EXPECT_EQ(list->find("t0")->commands.size(), 0U);
-    EXPECT_EQ(stateOf("t0"), TaskState::Done);
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(journal.nextInLine(), std::nullopt);
+    publish("t1");
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+}
+
+TEST_F(Tasks, WhoWaitsHearsOfOneThatEndsWithoutHavingRun) {
+    Task task;
+    task.way = host::TaskWay::Journal;
+    journal.enter(task);
+    std::optional<TaskState> heard;
+    list->awaitEnd(task.id, [&heard](const Task& over) { heard = over.state; });
+    task.state = TaskState::Expired;
+    task.ended = host::WallClock::now();
+    list->end(task);
+    EXPECT_EQ(heard, TaskState::Expired);
 }
 
 TEST_F(Tasks, WhoWaitsGetsTheTaskThatIsOver) {
@@ -383,7 +403,8 @@ TEST_F(TasksWithoutGuards, AreJudgedByTheirResultAlone) {
 TEST(TasksWithoutTables, ThereAreNone) {
     const host::TableSet none({});
     host::OutcomeFeed feed(none);
-    TaskList list(none, feed, true);
+    host::Journal journal{host::Journal::Settings{}};
+    TaskList list(none, feed, journal, true);
     EXPECT_TRUE(list.newest({}).empty());
     EXPECT_FALSE(list.find("t1").has_value());
 }

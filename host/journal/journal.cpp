@@ -1,0 +1,265 @@
+#include "host/journal/journal.h"
+
+#include <chrono>
+#include <cstdio>
+#include <thread>
+#include <utility>
+
+#include "host/journal/keyed_hash.h"
+#include "host/journal/schema.h"
+#include "host/journal/task_rows.h"
+#include "host/process/start_error.h"
+
+namespace host {
+namespace {
+
+constexpr std::chrono::seconds kRetry{1};
+/// So many changes of tasks lie between two looks at what is too old.
+constexpr unsigned kPruneEvery = 1000;
+/// Of so many finished tasks the ends of the outputs are kept.
+constexpr int kKeptTails = 1000;
+
+void warn(const std::string& text) {
+    std::fprintf(stderr, "zavhost: %s\n", text.c_str());
+}
+
+void removeOld(Database& database, std::int64_t endedBefore, int rows) {
+    constexpr const char* kOld =
+        "(SELECT number FROM tasks WHERE ended IS NOT NULL AND ended < ?)";
+    for (const char* table : {"conditions", "commands", "outcomes"}) {
+        database.change((std::string("DELETE FROM ") + table + " WHERE task IN " + kOld).c_str(),
+                        endedBefore);
+    }
+    database.change("DELETE FROM tasks WHERE ended IS NOT NULL AND ended < ?", endedBefore);
+    database.change(
+        "DELETE FROM outcomes WHERE id <= (SELECT max(id) FROM outcomes) - ? AND "
+        "(task IS NULL OR task NOT IN (SELECT number FROM tasks WHERE ended IS NULL))",
+        rows);
+    database.change(
+        "UPDATE commands SET out = x'', err = x'' WHERE task IN (SELECT number FROM tasks "
+        "WHERE ended IS NOT NULL ORDER BY ended DESC LIMIT -1 OFFSET ?) "
+        "AND length(out) + length(err) > 0",
+        kKeptTails);
+}
+
+std::string described(const Recovered& recovered) {
+    std::string text;
+    if (!recovered.interrupted.empty()) {
+        text += "task " + recovered.interrupted + " was interrupted" +
+                (recovered.runsAgain ? " and runs again; " : "; ");
+    }
+    return text + std::to_string(recovered.waiting) + " tasks wait";
+}
+
+}  // namespace
+
+Journal::Journal(const Settings& settings) : settings_(settings) {
+    try {
+        if (!settings_.directory.empty()) directory_.emplace(settings_.directory);
+        openOrSetAside();
+        recovered_.clean = !directory_ || directory_->endedCleanly();
+        settleUnfinished(*database_, settings_.rerunInterrupted, recovered_);
+        if (directory_) {
+            // What a kill left of a secret in the log of changes goes now.
+            database_->number("PRAGMA wal_checkpoint(TRUNCATE)");
+            reader_ = std::make_unique<Database>(directory_->database());
+            directory_->takeReserve();
+        }
+    } catch (const NewerSchema& newer) {
+        throw StartError("cannot use the journal " + directory_->database() + ": " + newer.what());
+    } catch (const DatabaseError& error) {
+        throw StartError("cannot use the journal in " + settings_.directory + ": " + error.what());
+    }
+    if (recovered_.waiting > 0 || !recovered_.interrupted.empty()) warn(described(recovered_));
+    writer_ = std::make_unique<Writer>(*database_, reader_ ? nullptr : &readLock_);
+    prune();
+}
+
+Journal::~Journal() = default;
+
+void Journal::open() {
+    database_ = std::make_unique<Database>(directory_ ? directory_->database() : ":memory:");
+    prepareSchema(*database_);
+    identity_ = journalIdentity(*database_);
+    key_ = journalKey(*database_);
+}
+
+void Journal::openOrSetAside() {
+    try {
+        open();
+        if (!directory_ || directory_->endedCleanly()) return;
+        recovered_.fault = integrityFault(*database_);
+    } catch (const DatabaseError& error) {
+        if (!directory_ || !error.damaged()) throw;
+        recovered_.fault = error.what();
+    }
+    if (recovered_.fault.empty()) return;
+    database_.reset();
+    recovered_.setAside = directory_->setAside();
+    open();
+    recovered_.salvaged = salvage(recovered_.setAside, *database_);
+    warn("the journal is damaged (" + recovered_.fault + ") and was set aside as " +
+         recovered_.setAside + "; " + std::to_string(recovered_.salvaged) +
+         " unfinished tasks of it are entered as interrupted");
+}
+
+void Journal::endCleanly(bool quiet) noexcept {
+    try {
+        writer_->flush();
+        commit([quiet, this](Database& database) {
+            if (quiet) takeBackUnfinished(database);
+            database.change("UPDATE runs SET clean = 1 WHERE run = ?", recovered_.run);
+        });
+        writer_.reset();
+        if (directory_) directory_->noteCleanEnd();
+    } catch (const std::exception& error) {
+        warn(std::string("the journal could not be closed in good order: ") + error.what());
+    }
+}
+
+void Journal::commit(Writer::Change change) {
+    try {
+        writer_->submit(std::move(change)).get();
+    } catch (const DatabaseError& error) {
+        throw NotKept(std::string("the journal cannot be written to: ") + error.what());
+    }
+}
+
+/// Without the reserve an outcome might find no room.
+void Journal::insistOnReserve() {
+    if (directory_ && !directory_->takeReserve()) {
+        throw NotKept("the disk with " + directory_->path() + " is full");
+    }
+}
+
+void Journal::enter(Task& task) {
+    insistOnReserve();
+    std::int64_t number = 0;
+    commit([&task, &number](Database& database) { number = insertTask(database, task); });
+    task.number = number;
+    task.id = identity_ + '-' + std::to_string(number);
+}
+
+void Journal::enterSoon(Task task) {
+    writer_->submitLater(
+        [task = std::move(task)](Database& database) { insertTask(database, task); });
+}
+
+Writer::Change Journal::updateOf(std::vector<Task> tasks) {
+    return [&writer = *writer_, tasks = std::move(tasks)](Database& database) {
+        for (const Task& task : tasks) {
+            if (updateTask(database, task)) writer.wipeSoon();
+        }
+    };
+}
+
+void Journal::save(const Task& task) {
+    commit(updateOf({task}));
+}
+
+void Journal::saveSoon(Task task) {
+    writer_->submitLater(updateOf({std::move(task)}));
+}
+
+void Journal::saveOutcome(const std::vector<Task>& tasks) {
+    commitOutcome(updateOf(tasks));
+    const embedded::MutexLock lock(troubleLock_);
+    if (++sincePrune_ % kPruneEvery == 0) prune();
+}
+
+void Journal::keepRow(const std::string& row) {
+    commitOutcome([row](Database& database) { insertRow(database, row); });
+}
+
+void Journal::commitOutcome(const Writer::Change& change) {
+    while (!commitOutcomeOnce(change)) {
+        if (directory_) directory_->freeReserve();
+        if (commitOutcomeOnce(change)) break;
+        std::this_thread::sleep_for(kRetry);
+    }
+    const embedded::MutexLock lock(troubleLock_);
+    trouble_.clear();
+}
+
+bool Journal::commitOutcomeOnce(const Writer::Change& change) {
+    try {
+        commit(change);
+        return true;
+    } catch (const NotKept& failure) {
+        const embedded::MutexLock lock(troubleLock_);
+        if (trouble_.empty()) warn(std::string("an outcome waits: ") + failure.what());
+        trouble_ = failure.what();
+        return false;
+    }
+}
+
+std::string Journal::trouble() const {
+    const embedded::MutexLock lock(troubleLock_);
+    return trouble_;
+}
+
+void Journal::forget(std::int64_t number) {
+    writer_->submitLater([number](Database& database) { deleteTask(database, number); });
+}
+
+void Journal::prune() {
+    const auto days = std::chrono::hours(24) * settings_.keepDays;
+    writer_->submitLater([days, rows = settings_.keepRows](Database& database) {
+        removeOld(database, microseconds(WallClock::now() - days), rows);
+    });
+}
+
+template <typename Reader>
+auto Journal::read(const Reader& reader) {
+    const embedded::MutexLock lock(readLock_);
+    return reader(reader_ ? *reader_ : *database_);
+}
+
+std::vector<Task> Journal::newest(const TaskFilter& filter) {
+    writer_->flush();
+    return read([&](Database& database) { return readTasks(database, identity_, filter); });
+}
+
+std::optional<Task> Journal::find(std::string_view name) {
+    writer_->flush();
+    return read([&](Database& database) -> std::optional<Task> {
+        if (const auto number = numberIn(name, identity_)) {
+            std::optional<Task> task = readTask(database, identity_, *number);
+            if (task) return task;
+        }
+        const auto number = newestWithTransid(database, name);
+        return number ? readTask(database, identity_, *number) : std::nullopt;
+    });
+}
+
+std::optional<Task> Journal::nextInLine() {
+    return read([&](Database& database) -> std::optional<Task> {
+        Statement found = database.ask(
+            "SELECT number FROM tasks WHERE ended IS NULL AND way = 0 AND run IS NULL "
+            "ORDER BY number LIMIT 1");
+        return found.step() ? readTask(database, identity_, found.integer(0)) : std::nullopt;
+    });
+}
+
+std::int64_t Journal::waiting() {
+    return read([](Database& database) {
+        return database.number(
+            "SELECT count(*) FROM tasks WHERE ended IS NULL AND way = 0 AND run IS NULL");
+    });
+}
+
+std::string Journal::hashOf(std::string_view content) const {
+    return keyedHash(key_, content);
+}
+
+std::optional<Task> Journal::findOnce(std::string_view transid) {
+    return read([&](Database& database) -> std::optional<Task> {
+        Statement found = database.ask(
+            "SELECT number FROM tasks WHERE transid = ? AND once IS NOT NULL ORDER BY number "
+            "LIMIT 1",
+            transid);
+        return found.step() ? readTask(database, identity_, found.integer(0)) : std::nullopt;
+    });
+}
+
+}  // namespace host

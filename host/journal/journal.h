@@ -1,0 +1,99 @@
+/// The journal: what was accepted is never forgotten.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "embedded/mutex.h"
+#include "host/journal/database.h"
+#include "host/journal/recovery.h"
+#include "host/journal/state_directory.h"
+#include "host/journal/writer.h"
+#include "host/outcomes/task_keeper.h"
+
+namespace host {
+
+/// All tasks of all runs of the host, with their outcomes, in one SQLite database. One thread writes;
+/// readers have a connection of their own and see only what is durable.
+///
+/// Any thread may call.
+class Journal final : public TaskKeeper {
+public:
+    struct Settings {
+        std::string directory;          ///< empty: in memory, for the life of this object
+        bool rerunInterrupted = false;  ///< the task that an unclean end cut off runs again
+        int keepDays = 30;              ///< tasks that have been over for longer are removed
+        int keepRows = 10'000;          ///< of older outcomes the rows are removed
+    };
+
+    /// Opens the journal or makes a new one, sets a damaged one aside, and settles what the last run
+    /// left unfinished. Throws StartError.
+    explicit Journal(const Settings& settings);
+    ~Journal() override;
+
+    /// What was found at the start.
+    const Recovered& recovered() const { return recovered_; }
+    /// Writes down that this run ends in good order. `quiet`: the plug-in is at work on nothing, so
+    /// what it has in its queue did not begin. Errors are ignored: the next start then looks more
+    /// closely.
+    void endCleanly(bool quiet) noexcept;
+
+    const std::string& identity() const override { return identity_; }
+    std::int64_t run() const override { return recovered_.run; }
+
+    void enter(Task& task) override;
+    void enterSoon(Task task) override;
+    void save(const Task& task) override;
+    void saveOutcome(const std::vector<Task>& tasks) override;
+    void saveSoon(Task task) override;
+    void keepRow(const std::string& row) override;
+    void forget(std::int64_t number) override;
+    std::vector<Task> newest(const TaskFilter& filter) override;
+    std::optional<Task> find(std::string_view name) override;
+
+    /// The oldest task that waits for the host to hand it over.
+    std::optional<Task> nextInLine();
+    /// How many tasks wait so.
+    std::int64_t waiting();
+    /// The hash by which the content of a request is recognised.
+    std::string hashOf(std::string_view content) const;
+    /// The first task with this TRANSID that answers its repetitions.
+    std::optional<Task> findOnce(std::string_view transid);
+
+    /// Why an outcome cannot be written down just now; empty if nothing is wrong.
+    std::string trouble() const;
+    /// Transactions so far.
+    std::uint64_t transactions() const { return writer_->transactions(); }
+
+private:
+    template <typename Reader>
+    auto read(const Reader& reader);
+    void open();
+    void openOrSetAside();
+    void commit(Writer::Change change);
+    void commitOutcome(const Writer::Change& change);
+    bool commitOutcomeOnce(const Writer::Change& change);
+    void insistOnReserve();
+    Writer::Change updateOf(std::vector<Task> tasks);
+    void prune();
+
+    const Settings settings_;
+    std::optional<StateDirectory> directory_;
+    std::unique_ptr<Database> database_;  ///< the writer's
+    std::unique_ptr<Database> reader_;    ///< null: in memory, there is only one
+    std::string identity_;
+    std::string key_;
+    Recovered recovered_;
+
+    mutable embedded::Mutex troubleLock_;
+    std::string trouble_ ZAV_GUARDED_BY(troubleLock_);
+    unsigned sincePrune_ ZAV_GUARDED_BY(troubleLock_) = 0;
+
+    embedded::Mutex readLock_;        ///< around the connection that reads
+    std::unique_ptr<Writer> writer_;  ///< last, so that it ends first
+};
+
+}  // namespace host

@@ -1,0 +1,38 @@
+/// What a new run of the host makes of what the last one left.
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+#include "host/journal/database.h"
+
+namespace host {
+
+struct Recovered {
+    std::int64_t run = 0;        ///< the number of the new run
+    bool clean = true;           ///< the last run ended in good order
+    std::string setAside;        ///< the name that a damaged journal was given; empty: it was sound
+    std::string fault;           ///< what was wrong with it
+    std::int64_t waiting = 0;    ///< tasks that will run
+    std::string interrupted;     ///< identifier of the task that was cut off; empty: there is none
+    bool runsAgain = false;      ///< it will run again
+    std::int64_t salvaged = 0;   ///< unfinished tasks that were read from a damaged journal
+};
+
+/// A task that was in hand at so many unclean ends does not run again: it may be what ends the host.
+inline constexpr int kMostInterruptions = 3;
+
+/// Whatever is unfinished waits for the host to hand it over: the plug-in's queue is gone, or about
+/// to go, and nothing of it has begun.
+void takeBackUnfinished(Database& database);
+
+/// Settles what is unfinished, and begins a new run, in one transaction. Of what had been handed to
+/// the plug-in only the oldest task can have begun: it is interrupted. What waited behind it waits
+/// again, in the old order. Throws DatabaseError.
+void settleUnfinished(Database& database, bool rerunInterrupted, Recovered& recovered);
+
+/// Enters the unfinished tasks that can still be read from a damaged journal as interrupted. Returns
+/// how many; reads as far as the damage lets it.
+std::int64_t salvage(const std::string& damagedFile, Database& database);
+
+}  // namespace host

@@ -1,0 +1,115 @@
+#include "host/journal/state_directory.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <filesystem>
+#include <system_error>
+
+#include "host/process/start_error.h"
+
+namespace host {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr const char* kClean = "/clean";
+constexpr const char* kReserveFile = "/reserve";
+
+[[noreturn]] void fail(const std::string& what, int error) {
+    throw StartError(what + ": " + std::generic_category().message(error));
+}
+
+void makeDirectories(const fs::path& path) {
+    if (path.has_relative_path() && path.parent_path() != path) {
+        std::error_code ignored;
+        if (!fs::exists(path.parent_path(), ignored)) makeDirectories(path.parent_path());
+    }
+    if (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST) {
+        fail("cannot make the state directory " + path.string(), errno);
+    }
+}
+
+/// Whoever may write to it could put another journal in the place of this one.
+void insistOnPrivacy(const std::string& path) {
+    struct stat found {};
+    if (::stat(path.c_str(), &found) != 0) fail("state directory " + path, errno);
+    if (!S_ISDIR(found.st_mode)) throw StartError("state directory " + path + " is a file");
+    if ((found.st_uid != ::geteuid() && found.st_uid != 0) || (found.st_mode & 022U) != 0) {
+        throw StartError("state directory " + path +
+                         " may be written to by others; make it the host's own, with mode 0700");
+    }
+}
+
+void syncDirectory(const std::string& path) {
+    const FileDescriptor directory(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (directory) ::fsync(directory.get());
+}
+
+/// Removes the mark of a clean end; returns whether there was one.
+bool takeMark(const std::string& directory) {
+    const bool found = ::unlink((directory + kClean).c_str()) == 0;
+    if (!found && errno != ENOENT) fail("cannot remove " + directory + kClean, errno);
+    syncDirectory(directory);
+    return found;
+}
+
+std::string firstFreeName(const std::string& name) {
+    for (int number = 1;; ++number) {
+        const std::string candidate = name + ".damaged-" + std::to_string(number);
+        std::error_code ignored;
+        if (!fs::exists(fs::symlink_status(candidate, ignored))) return candidate;
+    }
+}
+
+}  // namespace
+
+StateDirectory::StateDirectory(const std::string& path)
+    : path_(fs::path(path + "/").lexically_normal().parent_path().string()) {
+    makeDirectories(path_);
+    insistOnPrivacy(path_);
+    lock_.emplace(path_, "state directory");
+    std::error_code ignored;
+    endedCleanly_ = takeMark(path_) || !fs::exists(database(), ignored);
+}
+
+void StateDirectory::noteCleanEnd() const noexcept {
+    const FileDescriptor mark(
+        ::open((path_ + kClean).c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (mark) ::fsync(mark.get());
+    const FileDescriptor directory(::open(path_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (directory) ::fsync(directory.get());
+}
+
+std::string StateDirectory::setAside() const {
+    const std::string other = firstFreeName(database());
+    if (::rename(database().c_str(), other.c_str()) != 0) {
+        fail("cannot set the damaged journal " + database() + " aside", errno);
+    }
+    // Changes that are not in the file yet. The index over them is made anew.
+    ::rename((database() + "-wal").c_str(), (other + "-wal").c_str());
+    ::unlink((database() + "-shm").c_str());
+    syncDirectory(path_);
+    return other;
+}
+
+bool StateDirectory::takeReserve() const {
+    const std::string name = path_ + kReserveFile;
+    const FileDescriptor file(
+        ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (!file) return false;
+    struct stat found {};
+    if (::fstat(file.get(), &found) != 0) return false;
+    if (static_cast<long long>(found.st_blocks) * 512 >= kReserve) return true;
+    if (::posix_fallocate(file.get(), 0, static_cast<off_t>(kReserve)) == 0) return true;
+    ::unlink(name.c_str());
+    return false;
+}
+
+void StateDirectory::freeReserve() const {
+    ::unlink((path_ + kReserveFile).c_str());
+}
+
+}  // namespace host

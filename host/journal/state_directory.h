@@ -1,0 +1,52 @@
+/// The directory of what the host itself keeps.
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "host/process/file_descriptor.h"
+#include "host/process/home_lock.h"
+
+namespace host {
+
+/// Belongs to one host at a time, and to nobody but its user. It holds:
+///
+/// | journal.db, journal.db-wal, journal.db-shm | the journal |
+/// | clean | there is one when the last host that used the directory ended in good order |
+/// | reserve | space that is given up when the disk is full, so that outcomes still find room |
+///
+/// One thread at a time.
+class StateDirectory {
+public:
+    static constexpr long long kReserve = 4LL << 20;  // bytes
+
+    /// Makes the directory with mode 0700, and those above it, if they are missing; locks it. Throws
+    /// StartError when it cannot be made, when another user could write to it, or when another host
+    /// uses it.
+    explicit StateDirectory(const std::string& path);
+
+    std::string database() const { return path_ + "/journal.db"; }
+    const std::string& path() const { return path_; }
+
+    /// Whether the last host ended in good order, or there was none. From now on there is one that
+    /// has not.
+    bool endedCleanly() const { return endedCleanly_; }
+    /// This host ends in good order. Errors are ignored: the next start then looks more closely.
+    void noteCleanEnd() const noexcept;
+
+    /// Gives the database another name, with what belongs to it; returns that name. Throws
+    /// StartError.
+    std::string setAside() const;
+
+    /// Takes the reserve unless it is there; false when there is no room for it.
+    bool takeReserve() const;
+    /// Gives it up.
+    void freeReserve() const;
+
+private:
+    const std::string path_;
+    std::optional<HomeLock> lock_;
+    bool endedCleanly_ = false;
+};
+
+}  // namespace host

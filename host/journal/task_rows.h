@@ -1,0 +1,41 @@
+/// Tasks as rows of the journal's tables.
+#pragma once
+
+#include <optional>
+#include <string_view>
+#include <vector>
+
+#include "host/journal/database.h"
+#include "host/outcomes/task.h"
+#include "host/outcomes/task_keeper.h"
+
+namespace host {
+
+/// Enters a new task; returns its number. All of these throw DatabaseError.
+std::int64_t insertTask(Database& database, const Task& task);
+
+/// Writes everything that may have changed. Of a task that is over only what may be kept of its
+/// request stays. Returns whether a secret was removed. Throws StepBack.
+bool updateTask(Database& database, const Task& task);
+
+/// Removes every trace of it.
+void deleteTask(Database& database, std::int64_t number);
+
+/// A row of the outcome table that belongs to no task.
+void insertRow(Database& database, const std::string& row);
+
+/// A task with everything that is known. `identity` is the journal's.
+std::optional<Task> readTask(Database& database, const std::string& identity, std::int64_t number);
+/// The newest task with this TRANSID.
+std::optional<std::int64_t> newestWithTransid(Database& database, std::string_view transid);
+/// Newest first, without rows and commands.
+std::vector<Task> readTasks(Database& database, const std::string& identity,
+                            const TaskFilter& filter);
+
+/// The number in a task's identifier; nothing when it is none of this journal's.
+std::optional<std::int64_t> numberIn(std::string_view id, std::string_view identity);
+
+/// Microseconds since the epoch, in which the tables give times.
+std::int64_t microseconds(WallClock::time_point time);
+
+}  // namespace host

@@ -1,0 +1,213 @@
+#include "host/journal/writer.h"
+
+#include <algorithm>
+#include <chrono>
+#include <cstdio>
+#include <utility>
+
+#include "host/journal/commit_step.h"
+
+namespace host {
+namespace {
+
+constexpr std::chrono::seconds kLater{1};
+/// A reader in the way may delay the log's cutting, which then is tried again.
+constexpr std::chrono::milliseconds kWipeDelay{500};
+
+void rollBack(Database& database) noexcept {
+    try {
+        if (database.inTransaction()) database.run("ROLLBACK");
+    } catch (const DatabaseError&) {
+        // The next BEGIN says what is wrong.
+    }
+}
+
+/// Another try may succeed then.
+bool isDatabasesFault(const std::exception_ptr& failure) {
+    try {
+        if (failure) std::rethrow_exception(failure);
+    } catch (const DatabaseError&) {
+        return true;
+    } catch (const std::exception& error) {
+        std::fprintf(stderr, "zavhost: the journal refused a change: %s\n", error.what());
+    }
+    return false;
+}
+
+}  // namespace
+
+Writer::Writer(Database& database, embedded::Mutex* shared)
+    : database_(database), shared_(shared) {
+    thread_ = std::thread([this] { work(); });
+}
+
+Writer::~Writer() {
+    {
+        const embedded::MutexLock lock(lock_);
+        ending_ = true;
+    }
+    changed_.notify_all();
+    thread_.join();
+}
+
+std::future<void> Writer::submit(Change change) {
+    Job job{std::move(change), {}, nullptr};
+    std::future<void> done = job.done.get_future();
+    {
+        const embedded::MutexLock lock(lock_);
+        jobs_.push_back(std::move(job));
+    }
+    changed_.notify_all();
+    return done;
+}
+
+void Writer::submitLater(Change change) {
+    {
+        const embedded::MutexLock lock(lock_);
+        if (later_.empty()) laterDue_ = Clock::now() + kLater;
+        later_.push_back(std::move(change));
+    }
+    changed_.notify_all();
+}
+
+void Writer::flush() noexcept {
+    try {
+        {
+            const embedded::MutexLock lock(lock_);
+            if (later_.empty()) return;
+        }
+        submit([](Database&) {}).get();
+    } catch (const std::exception&) {
+        // It waits for the next try.
+    }
+}
+
+void Writer::wipeSoon() {
+    {
+        const embedded::MutexLock lock(lock_);
+        if (wiping_) return;
+        wiping_ = true;
+        wipeDue_ = Clock::now() + kWipeDelay;
+    }
+    changed_.notify_all();
+}
+
+std::uint64_t Writer::transactions() const {
+    const embedded::MutexLock lock(lock_);
+    return transactions_;
+}
+
+/// Returns false at the end, when nothing is left to do.
+bool Writer::awaitWork(embedded::MutexLock& lock) {
+    while (jobs_.empty()) {
+        const auto now = Clock::now();
+        const bool due = (!later_.empty() && now >= laterDue_) || (wiping_ && now >= wipeDue_);
+        if (due) return true;
+        if (ending_) return !later_.empty() || wiping_;
+        auto until = Clock::time_point::max();
+        if (!later_.empty()) until = laterDue_;
+        if (wiping_) until = std::min(until, wipeDue_);
+        if (until == Clock::time_point::max()) {
+            lock.wait(changed_);
+        } else {
+            lock.waitUntil(changed_, until);
+        }
+    }
+    return true;
+}
+
+void Writer::work() {
+    embedded::MutexLock lock(lock_);
+    while (awaitWork(lock)) {
+        Jobs jobs = std::exchange(jobs_, {});
+        std::vector<Change> later = std::exchange(later_, {});
+        const bool wipes = wiping_ && (ending_ || Clock::now() >= wipeDue_);
+        lock.unlock();
+        if (!jobs.empty() || !later.empty()) writeAlone(jobs, later);
+        const bool wiped = wipes && wipe();
+        lock.lock();
+        if (wiped || (wipes && ending_)) {
+            wiping_ = false;
+        } else if (wipes) {
+            wipeDue_ = Clock::now() + kWipeDelay;
+        }
+        if (ending_) later.clear();
+        if (!later.empty()) {
+            laterDue_ = Clock::now() + kLater;
+            later_.insert(later_.begin(), std::make_move_iterator(later.begin()),
+                          std::make_move_iterator(later.end()));
+        }
+    }
+}
+
+void Writer::writeAlone(Jobs& jobs, std::vector<Change>& later) {
+    if (shared_ == nullptr) {
+        write(jobs, later);
+    } else {
+        const embedded::MutexLock lock(*shared_);
+        write(jobs, later);
+    }
+}
+
+/// Writes all of them in one transaction. What came later stays in `later` when it could not be
+/// written.
+void Writer::write(Jobs& jobs, std::vector<Change>& later) {
+    std::exception_ptr failure;
+    try {
+        later = tryWrite(jobs, later);
+    } catch (...) {
+        failure = std::current_exception();
+        rollBack(database_);
+    }
+    for (Job& job : jobs) {
+        if (failure || job.failure) {
+            job.done.set_exception(failure ? failure : job.failure);
+        } else {
+            job.done.set_value();
+        }
+    }
+}
+
+/// Throws when nothing of it was written. Returns what of `later` has to be tried again.
+std::vector<Writer::Change> Writer::tryWrite(Jobs& jobs, const std::vector<Change>& later) {
+    database_.run("BEGIN IMMEDIATE");
+    std::vector<Change> again;
+    for (const Change& change : later) {
+        if (isDatabasesFault(attempt(change))) again.push_back(change);
+    }
+    for (Job& job : jobs)
+        job.failure = attempt(job.change);
+    reached(CommitStep::BeforeCommit);
+    database_.run("COMMIT");
+    reached(CommitStep::AfterCommit);
+    const embedded::MutexLock lock(lock_);
+    ++transactions_;
+    return again;
+}
+
+/// One part of the transaction; its failure leaves the others alone, unless SQLite has given up all
+/// of them.
+std::exception_ptr Writer::attempt(const Change& change) {
+    std::exception_ptr failure;
+    database_.run("SAVEPOINT part");
+    try {
+        change(database_);
+    } catch (...) {
+        if (!database_.inTransaction()) throw;
+        failure = std::current_exception();
+        database_.run("ROLLBACK TO part");
+    }
+    database_.run("RELEASE part");
+    return failure;
+}
+
+bool Writer::wipe() noexcept {
+    try {
+        // The first column says whether somebody was in the way.
+        return database_.number("PRAGMA wal_checkpoint(TRUNCATE)") == 0;
+    } catch (const DatabaseError&) {
+        return false;
+    }
+}
+
+}  // namespace host

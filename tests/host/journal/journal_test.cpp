@@ -1,0 +1,293 @@
+// ctest-label: threaded
+#include "host/journal/journal.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+
+#include <csignal>
+#include <filesystem>
+#include <thread>
+
+#include "host/journal/journal_fixture.h"
+#include "support/host/program.h"
+
+namespace {
+
+using host::Journal;
+using host::Task;
+using host::TaskState;
+using host::TaskWay;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+/// No file of this process can grow beyond a few bytes while the object exists.
+class FullDisk {
+public:
+    FullDisk() {
+        ::signal(SIGXFSZ, SIG_IGN);
+        ::getrlimit(RLIMIT_FSIZE, &before_);
+        rlimit none = before_;
+        none.rlim_cur = 1;
+        ::setrlimit(RLIMIT_FSIZE, &none);
+    }
+    ~FullDisk() { ::setrlimit(RLIMIT_FSIZE, &before_); }
+
+private:
+    rlimit before_{};
+};
+
+class Journals : public JournalTest {
+protected:
+    std::vector<std::string> transids(const host::TaskFilter& filter = {}) {
+        std::vector<std::string> found;
+        for (const Task& task : journal->newest(filter))
+            found.push_back(task.transid);
+        return found;
+    }
+    /// Everything in the files of the journal's directory.
+    std::string allBytes() const {
+        std::string bytes;
+        for (const auto& entry : std::filesystem::directory_iterator(scratch.path("state"))) {
+            if (entry.path().filename() != "reserve") {
+                bytes += scratch.read("state/" + entry.path().filename().string());
+            }
+        }
+        return bytes;
+    }
+};
+
+TEST_F(Journals, KeepEverythingAboutATask) {
+    open();
+    Task task = entered("t1");
+    task.run = journal->run();
+    task.state = TaskState::Running;
+    task.started = host::WallClock::now();
+    task.reply = std::string(500, ' ') + "reply";
+    journal->save(task);
+    task.outcomes = {"first", "second"};
+    host::Command& command = task.commands.emplace_back();
+    command.line = "/bin/TovrinAgent";
+    command.pid = 17;
+    command.exit = 3;
+    command.timedOut = true;
+    command.out.append("one\n");
+    command.err.append(std::string("\xFF\0", 2));
+    task = ended(task, TaskState::Failed);
+    journal->saveOutcome({task});
+    open();
+    const std::optional<Task> kept = journal->find(task.id);
+    ASSERT_TRUE(kept.has_value());
+    EXPECT_EQ(kept->transid, "t1");
+    EXPECT_EQ(kept->asker, "somebody");
+    EXPECT_EQ(kept->state, TaskState::Failed);
+    EXPECT_EQ(kept->value("PRODUCT"), "ux");
+    EXPECT_EQ(kept->conditions.size(), 3U);
+    EXPECT_EQ(kept->reply, task.reply);
+    EXPECT_THAT(kept->outcomes, ElementsAre("first", "second"));
+    EXPECT_EQ(host::WallClock::now() > kept->accepted, true);
+    EXPECT_LE(kept->started, kept->ended);
+    ASSERT_EQ(kept->commands.size(), 1U);
+    EXPECT_EQ(kept->commands[0].line, "/bin/TovrinAgent");
+    EXPECT_EQ(kept->commands[0].pid, 17);
+    EXPECT_EQ(kept->commands[0].exit, 3);
+    EXPECT_EQ(kept->commands[0].signal, std::nullopt);
+    EXPECT_TRUE(kept->commands[0].timedOut);
+    EXPECT_EQ(kept->commands[0].out.text(), "one\n");
+    EXPECT_EQ(kept->commands[0].err.text(), std::string("\xFF\0", 2));
+}
+
+TEST_F(Journals, FindTasksByIdentifierAndTheNewestByItsTransaction) {
+    open();
+    const Task first = entered("same");
+    const Task second = entered("same");
+    EXPECT_EQ(first.id, journal->identity() + "-1");
+    EXPECT_EQ(journal->find(first.id)->number, first.number);
+    EXPECT_EQ(journal->find("same")->id, second.id);
+    EXPECT_EQ(journal->find("other"), std::nullopt);
+    EXPECT_EQ(journal->find("0123456789abcdef-1"), std::nullopt);
+}
+
+TEST_F(Journals, ListTasksNewestFirstAsAskedFor) {
+    open();
+    journal->save(ended(entered("t1")));
+    const Task second = entered("t2");
+    entered("t3");
+    EXPECT_THAT(transids(), ElementsAre("t3", "t2", "t1"));
+    EXPECT_THAT(transids({TaskState::Done}), ElementsAre("t1"));
+    EXPECT_THAT(transids({{}, "ux"}), ElementsAre("t3", "t2", "t1"));
+    EXPECT_THAT(transids({{}, "um"}), IsEmpty());
+    EXPECT_THAT(transids({{}, {}, "START"}), ElementsAre("t3", "t2", "t1"));
+    EXPECT_THAT(transids({{}, {}, "STOP"}), IsEmpty());
+    EXPECT_THAT(transids({{}, {}, {}, 2}), ElementsAre("t3", "t2"));
+    EXPECT_THAT(transids({{}, {}, {}, 10, {}, second.number}), ElementsAre("t1"));
+    EXPECT_THAT(transids({{}, {}, {}, 10, host::WallClock::now()}), IsEmpty());
+}
+
+TEST_F(Journals, ShowNobodyATaskThatMayYetBeNone) {
+    open();
+    Task task = asked("t1", TaskWay::Query);
+    task.answered = false;
+    journal->enter(task);
+    EXPECT_THAT(transids(), IsEmpty());
+    journal->forget(task.number);
+    EXPECT_EQ(journal->find(task.id), std::nullopt);
+}
+
+TEST_F(Journals, LetTasksGoForwardOnly) {
+    open();
+    Task task = entered("t1");
+    journal->save(ended(task));
+    EXPECT_THROW(journal->save(task), host::StepBack);
+    EXPECT_THROW(journal->save(ended(task, TaskState::Failed)), host::StepBack);
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+}
+
+TEST_F(Journals, KeepWhatRanAtOnceWithoutACommitOfItsOwn) {
+    open();
+    const std::uint64_t before = journal->transactions();
+    journal->enterSoon(ended(asked("t1", TaskWay::AtOnce)));
+    entered("t2");
+    EXPECT_EQ(journal->transactions(), before + 1);
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+}
+
+TEST_F(Journals, GiveTheNextInLineInTheOrderOfAcceptance) {
+    open();
+    const Task first = entered("t1");
+    entered("q", TaskWay::Query);
+    const Task second = entered("t2");
+    EXPECT_EQ(journal->waiting(), 2);
+    EXPECT_EQ(journal->nextInLine()->id, first.id);
+    journal->save(ended(first, TaskState::Expired));
+    EXPECT_EQ(journal->nextInLine()->id, second.id);
+    journal->save(ended(second, TaskState::Cancelled));
+    EXPECT_EQ(journal->nextInLine(), std::nullopt);
+    EXPECT_EQ(journal->waiting(), 0);
+}
+
+TEST_F(Journals, RecogniseARepetitionByItsContent) {
+    open();
+    Task task = asked("key");
+    task.once = journal->hashOf("content");
+    journal->enter(task);
+    entered("key");
+    EXPECT_EQ(journal->findOnce("key")->id, task.id);
+    EXPECT_EQ(journal->findOnce("key")->once, journal->hashOf("content"));
+    EXPECT_EQ(journal->findOnce("other"), std::nullopt);
+    open();
+    EXPECT_EQ(journal->findOnce("key")->once, journal->hashOf("content"));
+}
+
+TEST_F(Journals, HoldASecretWholeWhileTheTaskNeedsItAndNowhereAfterwards) {
+    open();
+    std::vector<Task> tasks;
+    for (int i = 0; i < 20; ++i) {
+        Task task = asked("t" + std::to_string(i));
+        task.conditions = {{"COMMAND", OPER_EQ, "SETCONFIG"},
+                           {"CONTEXT", OPER_EQ, "<password>Tr0ub4dor</password>"}};
+        journal->enter(task);
+        tasks.push_back(task);
+    }
+    EXPECT_EQ(journal->find("t0")->conditions.at(1).value, "<password>Tr0ub4dor</password>");
+    EXPECT_EQ(journal->find("t0")->value("CONTEXT"), "") << "it is shown to nobody";
+    EXPECT_NE(allBytes().find("Tr0ub4dor"), std::string::npos);
+    for (const Task& task : tasks)
+        journal->saveOutcome({ended(task)});
+    EXPECT_TRUE(eventually([this] { return allBytes().find("Tr0ub4dor") == std::string::npos; }));
+    EXPECT_EQ(journal->find("t0")->conditions.size(), 1U);
+}
+
+TEST_F(Journals, CutLongValuesOfTasksThatAreOver) {
+    open();
+    Task task = asked("t1");
+    task.conditions.push_back({"CONTEXT", OPER_EQ, std::string(100'000, 'x')});
+    journal->enter(task);
+    EXPECT_EQ(journal->find("t1")->conditions.at(3).value.size(), 100'000U);
+    EXPECT_EQ(journal->find("t1")->value("CONTEXT").size(), 4096U);
+    journal->save(ended(task));
+    EXPECT_EQ(journal->find("t1")->conditions.at(3).value.size(), 4096U);
+}
+
+TEST_F(Journals, AcceptNothingOnAFullDiskAndGoOnWhenThereIsRoom) {
+    open();
+    entered("t1");
+    {
+        const FullDisk full;
+        Task task = asked("t2");
+        EXPECT_THROW(journal->enter(task), host::NotKept);
+    }
+    Task task = asked("t3");
+    journal->enter(task);
+    EXPECT_THAT(transids(), ElementsAre("t3", "t1"));
+}
+
+TEST_F(Journals, AnOutcomeWaitsUntilThereIsRoom) {
+    open();
+    const Task task = entered("t1");
+    std::thread executor;
+    {
+        const FullDisk full;
+        executor = std::thread([&] { journal->saveOutcome({ended(task)}); });
+        EXPECT_TRUE(eventually([this] { return !journal->trouble().empty(); }));
+    }
+    executor.join();
+    EXPECT_EQ(journal->trouble(), "");
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+}
+
+TEST_F(Journals, ForgetWhatIsOlderThanTheyKeep) {
+    open();
+    Task old = asked("old");
+    old.state = TaskState::Done;
+    old.ended = host::WallClock::now() - std::chrono::hours(24 * 31);
+    journal->enter(old);
+    journal->save(ended(entered("new")));
+    Task waits = asked("waits");
+    waits.accepted = *old.ended;
+    journal->enter(waits);
+    open();
+    EXPECT_THAT(transids(), ElementsAre("waits", "new"));
+}
+
+TEST_F(Journals, KeepOnlySoManyRowsButTheirTasks) {
+    open();
+    for (int i = 0; i < 5; ++i) {
+        Task task = entered("t" + std::to_string(i));
+        task.outcomes = {"row"};
+        journal->saveOutcome({ended(task)});
+    }
+    host::Journal::Settings few = settings();
+    few.keepRows = 2;
+    open(few);
+    EXPECT_EQ(transids().size(), 5U);
+    EXPECT_THAT(journal->find("t2")->outcomes, IsEmpty());
+    EXPECT_THAT(journal->find("t3")->outcomes, ElementsAre("row"));
+}
+
+TEST_F(Journals, WithoutADirectoryAreInMemory) {
+    Journal memory(Journal::Settings{});
+    Task task = asked("t1");
+    memory.enter(task);
+    EXPECT_EQ(memory.find("t1")->id, task.id);
+    memory.save(ended(task));
+    EXPECT_EQ(memory.newest({}).size(), 1U);
+}
+
+TEST_F(Journals, ManyThreadsMayEnterTasksAndShareCommits) {
+    open();
+    const std::uint64_t before = journal->transactions();
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 8; ++i) {
+        threads.emplace_back([this, i] {
+            for (int k = 0; k < 25; ++k)
+                entered("t" + std::to_string(i));
+        });
+    }
+    for (std::thread& thread : threads)
+        thread.join();
+    EXPECT_EQ(journal->waiting(), 200);
+    EXPECT_LE(journal->transactions() - before, 200U);
+}
+
+}  // namespace

@@ -1,0 +1,38 @@
+#include "host/journal/schema.h"
+
+#include <gtest/gtest.h>
+
+namespace {
+
+using host::Database;
+
+TEST(JournalSchema, ANewJournalGetsAnIdentityOfItsOwn) {
+    Database first(":memory:");
+    Database second(":memory:");
+    host::prepareSchema(first);
+    host::prepareSchema(second);
+    EXPECT_EQ(host::journalIdentity(first).size(), 16U);
+    EXPECT_NE(host::journalIdentity(first), host::journalIdentity(second));
+    EXPECT_EQ(host::journalKey(first).size(), 32U);
+    EXPECT_NE(host::journalKey(first), host::journalKey(second));
+}
+
+TEST(JournalSchema, IsPreparedOnlyOnce) {
+    Database database(":memory:");
+    host::prepareSchema(database);
+    const std::string identity = host::journalIdentity(database);
+    host::prepareSchema(database);
+    EXPECT_EQ(host::journalIdentity(database), identity);
+    EXPECT_EQ(database.number("PRAGMA user_version"), host::kSchemaVersion);
+    EXPECT_EQ(host::integrityFault(database), "");
+}
+
+TEST(JournalSchema, OneOfANewerHostIsLeftAsItIs) {
+    Database database(":memory:");
+    database.run("CREATE TABLE future (a); PRAGMA user_version = 1000");
+    EXPECT_THROW(host::prepareSchema(database), host::NewerSchema);
+    EXPECT_EQ(database.number("SELECT count(*) FROM sqlite_master"), 1);
+    EXPECT_EQ(database.number("PRAGMA user_version"), 1000);
+}
+
+}  // namespace

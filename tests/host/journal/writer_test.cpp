@@ -1,0 +1,116 @@
+// ctest-label: threaded
+#include "host/journal/writer.h"
+
+#include <gtest/gtest.h>
+
+#include "support/gate.h"
+#include "support/scratch_dir.h"
+
+namespace {
+
+using host::Database;
+using host::Writer;
+
+class JournalWriter : public testing::Test {
+protected:
+    JournalWriter() { database.run("CREATE TABLE t (a INTEGER PRIMARY KEY)"); }
+
+    static Writer::Change inserting(int number) {
+        return [number](Database& written) {
+            written.change("INSERT INTO t VALUES (?)", number);
+        };
+    }
+    /// What another connection sees.
+    std::int64_t rows() { return Database(scratch.path("db")).number("SELECT count(*) FROM t"); }
+
+    ScratchDir scratch;
+    Database database{scratch.path("db")};
+};
+
+TEST_F(JournalWriter, AChangeIsWrittenWhenItsFutureIsReady) {
+    Writer writer(database);
+    writer.submit(inserting(1)).get();
+    EXPECT_EQ(rows(), 1);
+}
+
+TEST_F(JournalWriter, ThoseThatWaitShareOneTransaction) {
+    Gate gate;
+    Writer writer(database);
+    auto first = writer.submit([&gate](Database&) { gate.pass(); });
+    ASSERT_TRUE(gate.awaitArrival());
+    std::vector<std::future<void>> others;
+    for (int i = 0; i < 50; ++i)
+        others.push_back(writer.submit(inserting(i)));
+    gate.open();
+    first.get();
+    for (std::future<void>& other : others)
+        other.get();
+    EXPECT_EQ(writer.transactions(), 2U);
+    EXPECT_EQ(rows(), 50);
+}
+
+TEST_F(JournalWriter, OneThatFailsLeavesTheOthersAlone) {
+    Gate gate;
+    Writer writer(database);
+    auto first = writer.submit([&gate](Database&) { gate.pass(); });
+    ASSERT_TRUE(gate.awaitArrival());
+    auto good = writer.submit(inserting(1));
+    auto twice = writer.submit([](Database& written) {
+        written.change("INSERT INTO t VALUES (2)");
+        written.change("INSERT INTO t VALUES (1)");
+    });
+    auto better = writer.submit(inserting(3));
+    gate.open();
+    first.get();
+    good.get();
+    EXPECT_THROW(twice.get(), host::DatabaseError);
+    better.get();
+    EXPECT_EQ(rows(), 2) << "the failed one left nothing";
+}
+
+TEST_F(JournalWriter, WhatCanWaitGoesWithTheNextThatCannot) {
+    Writer writer(database);
+    writer.submitLater(inserting(1));
+    writer.submit(inserting(2)).get();
+    EXPECT_EQ(writer.transactions(), 1U);
+    EXPECT_EQ(rows(), 2);
+}
+
+TEST_F(JournalWriter, WhatCanWaitIsWrittenWhenSomebodyAsks) {
+    Writer writer(database);
+    writer.submitLater(inserting(1));
+    writer.flush();
+    EXPECT_EQ(rows(), 1);
+    writer.flush();
+    EXPECT_EQ(writer.transactions(), 1U);
+}
+
+TEST_F(JournalWriter, WhatCanWaitIsWrittenByTheEnd) {
+    { Writer(database).submitLater(inserting(1)); }
+    EXPECT_EQ(rows(), 1);
+}
+
+TEST_F(JournalWriter, AChangeThatMakesNoSenseIsNotTriedAgain) {
+    Writer writer(database);
+    int tries = 0;
+    writer.submitLater([&tries](Database&) {
+        ++tries;
+        throw std::logic_error("no sense");
+    });
+    writer.flush();
+    writer.submit(inserting(1)).get();
+    EXPECT_EQ(tries, 1);
+}
+
+TEST_F(JournalWriter, TheLogOfChangesIsCutByTheEnd) {
+    {
+        database.run("PRAGMA journal_mode = WAL");
+        Writer writer(database);
+        writer.submit(inserting(1)).get();
+        EXPECT_NE(scratch.read("db-wal"), "");
+        writer.wipeSoon();
+    }
+    EXPECT_EQ(scratch.read("db-wal"), "");
+}
+
+}  // namespace
