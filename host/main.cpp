@@ -122,6 +122,15 @@ void attendToOrphans(HttpServer& server, int childSignals) {
     });
 }
 
+/// At the end, for whoever reads the log.
+void sayWhatWaits(Journal& journal) {
+    const std::int64_t waiting = journal.waiting();
+    if (waiting > 0) {
+        std::fprintf(stderr, "zavhost: %lld tasks wait for the next start\n",
+                     static_cast<long long>(waiting));
+    }
+}
+
 Journal::Settings journalOf(const HostOptions& options) {
     return {options.journal ? options.state : std::string(), options.rerunInterrupted,
             options.keepDays, options.keepRows};
@@ -144,6 +153,7 @@ void run(const HostOptions& options) {
     provideDepotDirectory(depot);
     Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
                       options.guarded, {depot.path, options.state}, journalOf(options));
+    services.maxQueued = options.maxQueued;
     services.checkSubject = [options] { return CheckSubject(options, environmentVariable); };
     Api api(services, routes());
     ncs::Server transfers({}, &services.transfers);
@@ -152,9 +162,11 @@ void run(const HostOptions& options) {
     server.endWhenReadable(endDescriptor, kEndGrace);
     server.whenReadable(reopenDescriptor, [=] { reopenLogs(reopenDescriptor); });
     if (options.guarded) attendToOrphans(server, childDescriptor);
+    services.dispatcher.start(services.leftovers, options.orphanWait);
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     server.run();
+    sayWhatWaits(services.journal);
     services.journal.endCleanly(services.watch.quiet());
     transfers.stop();
     transferSocket.remove();

@@ -40,7 +40,9 @@ Answer answerTo(Services& services, Call& call) {
     } catch (const DepotError& error) {
         return errorReply(statusOf(error.kind()), error.what());
     } catch (const NotKept& failure) {
-        return errorReply(503, failure.what());
+        Reply reply = errorReply(503, failure.what());
+        reply.fields.emplace_back("Retry-After", "5");
+        return reply;
     } catch (const QueryFailed& failed) {
         return errorReply(failed.gone() ? 404 : 500, failed.what());
     }
@@ -60,6 +62,7 @@ std::variant<Answer, Job> Api::handle(Request request) {
 }
 
 void Api::prepareForEnd() {
+    services_.dispatcher.stop();
     services_.outcomes.holdAfterOutcome();
 }
 

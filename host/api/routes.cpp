@@ -3,7 +3,8 @@
 namespace host {
 
 /// The endpoints. Each has a file of its own in this folder and a row below.
-Endpoint getTables, postQuery, getEvents, getTasks, getTask, getDoctor, getHealth;
+Endpoint getTables, postQuery, getEvents, getDoctor, getHealth;
+Endpoint postTask, getTasks, getTask, cancelTask;
 Endpoint getDepot, deleteDepot, getDepotSum, getDepotCheck;
 
 // clang-format off
@@ -23,17 +24,42 @@ std::vector<Route> routes() {
          Access::Read, Runs::OnWorker, getEvents,
          {{"table", Type::Text, Need::Required, "the name of the table"}}, Others::Columns},
 
+        {"POST", "/v1/tasks", "Accepts a command for its turn.",
+         Access::Act, Runs::OnWorker, postTask, {}, Others::None,
+         {{"command", Json::String, Need::Optional, "the command; needed unless refused"},
+          {"product", Json::String, Need::Optional, "a column of the request table"},
+          {"version", Json::String, Need::Optional, "another one"},
+          {"targetmsn", Json::String, Need::Optional, "another one"},
+          {"optional", Json::String, Need::Optional, "another one"},
+          {"context", Json::String, Need::Optional, "another one"},
+          {"uaconfig", Json::String, Need::Optional, "another one"},
+          {"uascript", Json::String, Need::Optional, "another one"},
+          {"transid", Json::String, Need::Optional, "the requester's name for it; else made up"},
+          {"once", Json::Boolean, Need::Optional,
+           "true: a repetition with the same transid gets the first one's task"},
+          {"force", Json::Boolean, Need::Optional,
+           "true sends a command for a product that is not there"},
+          {"expires", Json::String, Need::Optional, "it must have begun by then"},
+          {"journal", Json::String, Need::Optional, "the journal that must be this host's"},
+          {"refused", Json::String, Need::Optional, "why this never runs; recorded only"}}},
+
         {"GET", "/v1/tasks", "Lists tasks, newest first.",
          Access::Read, Runs::OnWorker, getTasks,
          {{"state", Type::Text, Need::Optional, "only those in this state"},
           {"product", Type::Text, Need::Optional, "only those for this product"},
           {"command", Type::Text, Need::Optional, "only those with this command"},
+          {"since", Type::Text, Need::Optional, "only those accepted at this time or later"},
+          {"after", Type::Number, Need::Optional, "only those behind this cursor"},
           {"limit", Type::Number, Need::Optional, "at most so many; 100 if not given"}}},
 
         {"GET", "/v1/tasks/{id}", "Tells everything about one task.",
          Access::Read, Runs::OnWorker, getTask,
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
           {"wait", Type::Number, Need::Optional, "seconds to wait for the task's end"}}},
+
+        {"POST", "/v1/tasks/{id}/cancel", "Cancels a task that waits.",
+         Access::Act, Runs::OnWorker, cancelTask,
+         {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"}}},
 
         {"GET", "/v1/doctor", "Checks the home and the machine.",
          Access::Read, Runs::OnWorker, getDoctor},

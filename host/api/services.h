@@ -4,6 +4,7 @@
 #include <chrono>
 #include <cstdlib>
 #include <functional>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -16,10 +17,12 @@
 #include "host/depot/transfer_rules.h"
 #include "host/guard/guards.h"
 #include "host/http/server_counts.h"
+#include "host/journal/dispatcher.h"
 #include "host/journal/journal.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task_list.h"
 #include "host/outcomes/task_watch.h"
+#include "host/process/leftovers.h"
 #include "host/tables/code_page.h"
 #include "host/tables/row_queue.h"
 #include "host/tables/table_set.h"
@@ -31,6 +34,10 @@ struct Places {
     std::string depot{};  ///< empty: the home itself
     std::string state{};  ///< empty: HOME/zavhost
 };
+
+struct Services;
+/// See api/watched_query.h.
+std::optional<Task> handOver(Services& services, const Task& task);
 
 /// Made once, after the plug-in has started, and shared by all requests. Any thread.
 struct Services {
@@ -67,6 +74,10 @@ struct Services {
     TaskList tasks{tables, outcomes, journal, guarded};
     TaskWatch watch{tables, outcomes};
     const Guards guards{{codePage, home, depot}, tasks};  ///< asked if `guarded`
+    int maxQueued = 1000;                                 ///< tasks that may wait in the journal
+    Leftovers leftovers{journal.identity(), journal.run()};
+    Dispatcher dispatcher{journal, tasks,
+                          [this](const Task& task) { return handOver(*this, task); }};
 };
 
 }  // namespace host

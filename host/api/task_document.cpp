@@ -1,9 +1,8 @@
 #include "host/api/task_document.h"
 
-#include <cstdio>
-#include <ctime>
 #include <nlohmann/json.hpp>
 
+#include "host/api/time_text.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
 
@@ -12,29 +11,8 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-/// RFC 3339 in UTC, with milliseconds.
-std::string timeText(WallClock::time_point time) {
-    using std::chrono::milliseconds;
-    const auto count = std::chrono::floor<milliseconds>(time.time_since_epoch()).count();
-    const std::time_t seconds = static_cast<std::time_t>(count / 1000);
-    std::tm parts{};
-    ::gmtime_r(&seconds, &parts);
-    char date[32];
-    std::strftime(date, sizeof date, "%Y-%m-%dT%H:%M:%S", &parts);
-    char text[48];
-    std::snprintf(text, sizeof text, "%s.%03dZ", date, static_cast<int>(count % 1000));
-    return text;
-}
-
 Json timeOrNull(const std::optional<WallClock::time_point>& time) {
     return time ? Json(timeText(*time)) : Json(nullptr);
-}
-
-std::string_view nameOf(TaskState state) {
-    for (const auto& [known, name] : kTaskStates) {
-        if (known == state) return name;
-    }
-    return {};
 }
 
 std::string lowerCase(std::string name) {
@@ -89,6 +67,11 @@ Json taskSummary(const Task& task, const CodePage& codePage) {
     object["started"] = timeOrNull(task.started);
     object["ended"] = timeOrNull(task.ended);
     object["asker"] = codePage.toUtf8(task.asker);
+    if (task.expires) object["expires"] = timeText(*task.expires);
+    for (const auto& [name, text] :
+         {std::pair{"reason", &task.reason}, {"guard", &task.guard}, {"hint", &task.hint}}) {
+        if (!text->empty()) object[name] = codePage.toUtf8(*text);
+    }
     return object;
 }
 

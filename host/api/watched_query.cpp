@@ -6,6 +6,8 @@
 #include <vector>
 
 #include "host/commands/ear.h"
+#include "host/guard/refusal.h"
+#include "host/outcomes/shown_request.h"
 #include "host/tables/plugin_facts.h"
 
 namespace host {
@@ -14,7 +16,57 @@ namespace {
 /// Of a configuration that is read.
 constexpr std::size_t kMostOutput = std::size_t{4} << 20;
 
-/// The user's name, or else the number.
+bool readsConfiguration(const Query& query) {
+    return query.table->name == plugin::kRequestTable &&
+           std::any_of(query.where.begin(), query.where.end(), [](const oxa::Predicate& condition) {
+               return condition.column == plugin::kCommandColumn &&
+                      condition.value == plugin::kGetConfiguration;
+           });
+}
+
+/// Whether it is a request for a command that the plug-in would queue.
+bool isQueued(const Query& query) {
+    return query.table->name == plugin::kRequestTable &&
+           !plugin::runsAtOnce(valueIn(query.where, plugin::kCommandColumn));
+}
+
+std::string askerOf(const Query& query, const Peer& peer) {
+    return query.table->name == plugin::kRequestTable ? userName(peer.user) : std::string();
+}
+
+/// What the table gets: a request as the guards leave it, other queries as they are.
+Query admitted(Services& services, const Query& query, bool force) {
+    if (!services.guarded || query.table->name != plugin::kRequestTable) return query;
+    CommandRequest request(query.where, force);
+    services.guards.admit(request);
+    return {query.table, request.conditions()};
+}
+
+/// How a task ends that the plug-in did not get.
+Task endOf(Task task, TaskState state, const std::string& reason) {
+    task.state = state;
+    task.reason = reason;
+    task.ended = WallClock::now();
+    return task;
+}
+
+std::optional<Task> tryHandOver(Services& services, const Task& task) {
+    const Query query{services.tables.find(std::string(plugin::kRequestTable)), task.conditions};
+    TaskWatch::Request watched(services.watch, *query.table);
+    const Query handedOn = admitted(services, query, task.forced);
+    TaskList::Request request(services.tasks, task);
+    ThreadEar ear;
+    const oxa::Rows rows = run(handedOn);
+    if (!request.answered(rows, ear.take())) {
+        return endOf(task, TaskState::Failed,
+                     "the plug-in did not say whether it accepts the task");
+    }
+    watched.answered(rows);
+    return std::nullopt;
+}
+
+}  // namespace
+
 std::string userName(uid_t user) {
     passwd entry{};
     passwd* found = nullptr;
@@ -25,29 +77,10 @@ std::string userName(uid_t user) {
     return entry.pw_name;
 }
 
-bool readsConfiguration(const Query& query) {
-    return query.table->name == plugin::kRequestTable &&
-           std::any_of(query.where.begin(), query.where.end(), [](const oxa::Predicate& condition) {
-               return condition.column == plugin::kCommandColumn &&
-                      condition.value == plugin::kGetConfiguration;
-           });
-}
-
-std::string askerOf(const Query& query, const Peer& peer) {
-    return query.table->name == plugin::kRequestTable ? userName(peer.user) : std::string();
-}
-
-/// What the table gets: a request as the guards leave it, other queries as they are.
-Query admitted(const Services& services, const Query& query, bool force) {
-    if (!services.guarded || query.table->name != plugin::kRequestTable) return query;
-    CommandRequest request(query.where, force);
-    services.guards.admit(request);
-    return {query.table, request.conditions()};
-}
-
-}  // namespace
-
 WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer) {
+    if (isQueued(query) && services.guarded && !services.leftovers.gone()) {
+        throw NotKept("commands that an earlier run of the host began have not ended yet");
+    }
     const bool wantsOutput = services.guarded && readsConfiguration(query);
     TaskWatch::Request watched(services.watch, *query.table);
     const Query handedOn = admitted(services, query, force);
@@ -59,6 +92,19 @@ WatchedAnswer runWatched(Services& services, const Query& query, bool force, con
     task.answered(answer.rows, answer.heard);
     watched.answered(answer.rows);
     return answer;
+}
+
+std::optional<Task> handOver(Services& services, const Task& task) {
+    try {
+        return tryHandOver(services, task);
+    } catch (const Refusal& refused) {
+        Task ended = endOf(task, TaskState::Refused, refused.what());
+        ended.guard = refused.guard();
+        ended.hint = refused.hint();
+        return ended;
+    } catch (const QueryFailed& failed) {
+        return endOf(task, TaskState::Failed, failed.what());
+    }
 }
 
 }  // namespace host

@@ -29,11 +29,11 @@ const std::vector<Guard>& guards() {
     return table;
 }
 
-void Guards::admit(CommandRequest& request) const {
+void Guards::admit(CommandRequest& request, bool mayChange) const {
     Machine machine(site_);
-    const bool mayChange = tasks_.unfinished(request.product());
+    const bool skipsMachine = mayChange || tasks_.unfinished(request.product());
     for (const Guard& guard : guards()) {
-        if (guard.asks == Asks::Machine && mayChange) continue;
+        if (guard.asks == Asks::Machine && skipsMachine) continue;
         guard.check(request, machine);
     }
 }

@@ -19,7 +19,8 @@ public:
     /// machine are left out while a task of the same product is unfinished, because what they would
     /// see is not what the request will find. Throws Refusal; otherwise the request is as it should
     /// be handed on. May run programs of the home; holds no lock.
-    void admit(CommandRequest& request) const;
+    /// `mayChange`: what waits elsewhere will change what they would see, too.
+    void admit(CommandRequest& request, bool mayChange = false) const;
 
     /// The refusal of a column that the request table does not have.
     [[noreturn]] static void refuseUnknownColumn(const oxa::Table& table, const std::string& name);

@@ -21,7 +21,8 @@ constexpr int kBusyMilliseconds = 5000;
 /// SQLite would make the file with the mode that the umask leaves; its other files take over this
 /// one's.
 void makePrivate(const std::string& file) {
-    const FileDescriptor made(::open(file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    const FileDescriptor made(
+        ::open(file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!made) {
         throw DatabaseError(file + ": " + std::generic_category().message(errno), SQLITE_CANTOPEN);
     }

@@ -68,8 +68,8 @@ private:
 
 class Database {
 public:
-    /// Opens the file, which is made with mode 0600 if it is missing; ":memory:" stands for one that
-    /// ends with the object. Everything throws DatabaseError. One thread at a time.
+    /// Opens the file, which is made with mode 0600 if it is missing; ":memory:" stands for one
+    /// that ends with the object. Everything throws DatabaseError. One thread at a time.
     explicit Database(const std::string& file);
 
     /// Carries out statements without parameters.

@@ -24,8 +24,7 @@ void warn(const std::string& text) {
 }
 
 void removeOld(Database& database, std::int64_t endedBefore, int rows) {
-    constexpr const char* kOld =
-        "(SELECT number FROM tasks WHERE ended IS NOT NULL AND ended < ?)";
+    constexpr const char* kOld = "(SELECT number FROM tasks WHERE ended IS NOT NULL AND ended < ?)";
     for (const char* table : {"conditions", "commands", "outcomes"}) {
         database.change((std::string("DELETE FROM ") + table + " WHERE task IN " + kOld).c_str(),
                         endedBefore);
@@ -49,6 +48,15 @@ std::string described(const Recovered& recovered) {
                 (recovered.runsAgain ? " and runs again; " : "; ");
     }
     return text + std::to_string(recovered.waiting) + " tasks wait";
+}
+
+/// The first task with this TRANSID that answers its repetitions.
+std::optional<Task> onceIn(Database& database, const std::string& identity,
+                           std::string_view transid) {
+    Statement found = database.ask(
+        "SELECT number FROM tasks WHERE transid = ? AND once IS NOT NULL ORDER BY number LIMIT 1",
+        transid);
+    return found.step() ? readTask(database, identity, found.integer(0)) : std::nullopt;
 }
 
 }  // namespace
@@ -105,12 +113,11 @@ void Journal::openOrSetAside() {
 
 void Journal::endCleanly(bool quiet) noexcept {
     try {
-        writer_->flush();
         commit([quiet, this](Database& database) {
             if (quiet) takeBackUnfinished(database);
             database.change("UPDATE runs SET clean = 1 WHERE run = ?", recovered_.run);
         });
-        writer_.reset();
+        writer_->settle();
         if (directory_) directory_->noteCleanEnd();
     } catch (const std::exception& error) {
         warn(std::string("the journal could not be closed in good order: ") + error.what());
@@ -248,18 +255,45 @@ std::int64_t Journal::waiting() {
     });
 }
 
+bool Journal::waitsFor(const std::string& product) {
+    return read([&](Database& database) {
+        return database.number(
+                   "SELECT count(*) FROM tasks WHERE ended IS NULL AND way = 0 AND run IS NULL AND "
+                   "lower(CAST(product AS TEXT)) = lower(CAST(? AS TEXT))",
+                   product) > 0;
+    });
+}
+
+std::optional<Task> Journal::enterOnce(Task& task) {
+    insistOnReserve();
+    std::optional<Task> first;
+    commit([&task, &first, this](Database& database) {
+        first = onceIn(database, identity_, task.transid);
+        if (!first) task.number = insertTask(database, task);
+    });
+    if (!first) task.id = identity_ + '-' + std::to_string(task.number);
+    return first;
+}
+
+bool Journal::cancel(std::int64_t number) {
+    bool cancelled = false;
+    commit([&cancelled, number, &writer = *writer_, this](Database& database) {
+        std::optional<Task> task = readTask(database, identity_, number);
+        if (!task || isOver(task->state) || task->run || task->way != TaskWay::Journal) return;
+        task->state = TaskState::Cancelled;
+        task->ended = WallClock::now();
+        if (updateTask(database, *task)) writer.wipeSoon();
+        cancelled = true;
+    });
+    return cancelled;
+}
+
 std::string Journal::hashOf(std::string_view content) const {
     return keyedHash(key_, content);
 }
 
 std::optional<Task> Journal::findOnce(std::string_view transid) {
-    return read([&](Database& database) -> std::optional<Task> {
-        Statement found = database.ask(
-            "SELECT number FROM tasks WHERE transid = ? AND once IS NOT NULL ORDER BY number "
-            "LIMIT 1",
-            transid);
-        return found.step() ? readTask(database, identity_, found.integer(0)) : std::nullopt;
-    });
+    return read([&](Database& database) { return onceIn(database, identity_, transid); });
 }
 
 }  // namespace host

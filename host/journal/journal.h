@@ -16,8 +16,8 @@
 
 namespace host {
 
-/// All tasks of all runs of the host, with their outcomes, in one SQLite database. One thread writes;
-/// readers have a connection of their own and see only what is durable.
+/// All tasks of all runs of the host, with their outcomes, in one SQLite database. One thread
+/// writes; readers have a connection of their own and see only what is durable.
 ///
 /// Any thread may call.
 class Journal final : public TaskKeeper {
@@ -29,8 +29,8 @@ public:
         int keepRows = 10'000;          ///< of older outcomes the rows are removed
     };
 
-    /// Opens the journal or makes a new one, sets a damaged one aside, and settles what the last run
-    /// left unfinished. Throws StartError.
+    /// Opens the journal or makes a new one, sets a damaged one aside, and settles what the last
+    /// run left unfinished. Throws StartError.
     explicit Journal(const Settings& settings);
     ~Journal() override;
 
@@ -58,8 +58,16 @@ public:
     std::optional<Task> nextInLine();
     /// How many tasks wait so.
     std::int64_t waiting();
+    /// Whether one of them is for this product, in upper or lower case.
+    bool waitsFor(const std::string& product);
+    /// Ends a task that still waits in line. Returns whether it did, durably; if not, the task has
+    /// been handed over or is over. Throws NotKept.
+    bool cancel(std::int64_t number);
     /// The hash by which the content of a request is recognised.
     std::string hashOf(std::string_view content) const;
+    /// Enters a task unless there is one with the same TRANSID that answers its repetitions;
+    /// returns that one. Throws NotKept.
+    std::optional<Task> enterOnce(Task& task);
     /// The first task with this TRANSID that answers its repetitions.
     std::optional<Task> findOnce(std::string_view transid);
 

@@ -9,17 +9,18 @@
 namespace host {
 
 struct Recovered {
-    std::int64_t run = 0;        ///< the number of the new run
-    bool clean = true;           ///< the last run ended in good order
-    std::string setAside;        ///< the name that a damaged journal was given; empty: it was sound
-    std::string fault;           ///< what was wrong with it
-    std::int64_t waiting = 0;    ///< tasks that will run
-    std::string interrupted;     ///< identifier of the task that was cut off; empty: there is none
-    bool runsAgain = false;      ///< it will run again
-    std::int64_t salvaged = 0;   ///< unfinished tasks that were read from a damaged journal
+    std::int64_t run = 0;       ///< the number of the new run
+    bool clean = true;          ///< the last run ended in good order
+    std::string setAside;       ///< the name that a damaged journal was given; empty: it was sound
+    std::string fault;          ///< what was wrong with it
+    std::int64_t waiting = 0;   ///< tasks that will run
+    std::string interrupted;    ///< identifier of the task that was cut off; empty: there is none
+    bool runsAgain = false;     ///< it will run again
+    std::int64_t salvaged = 0;  ///< unfinished tasks that were read from a damaged journal
 };
 
-/// A task that was in hand at so many unclean ends does not run again: it may be what ends the host.
+/// A task that was in hand at so many unclean ends does not run again: it may be what ends the
+/// host.
 inline constexpr int kMostInterruptions = 3;
 
 /// Whatever is unfinished waits for the host to hand it over: the plug-in's queue is gone, or about
@@ -31,8 +32,8 @@ void takeBackUnfinished(Database& database);
 /// again, in the old order. Throws DatabaseError.
 void settleUnfinished(Database& database, bool rerunInterrupted, Recovered& recovered);
 
-/// Enters the unfinished tasks that can still be read from a damaged journal as interrupted. Returns
-/// how many; reads as far as the damage lets it.
+/// Enters the unfinished tasks that can still be read from a damaged journal as interrupted.
+/// Returns how many; reads as far as the damage lets it.
 std::int64_t salvage(const std::string& damagedFile, Database& database);
 
 }  // namespace host

@@ -9,10 +9,10 @@ namespace {
 
 /// Times are in microseconds since the epoch. Texts are in the local code page, so they are bytes.
 ///
-/// tasks.state and tasks.way are values of TaskState and TaskWay. tasks.run is the run of the host in
-/// which a task was handed to the plug-in, tasks.turn its place among all that were. conditions holds a request as it came; of a task that is
-/// over only what may be shown. outcomes.id numbers the events; task is null for a row that belongs
-/// to none.
+/// tasks.state and tasks.way are values of TaskState and TaskWay. tasks.run is the run of the host
+/// in which a task was handed to the plug-in, tasks.turn its place among all that were. conditions
+/// holds a request as it came; of a task that is over only what may be shown. outcomes.id numbers
+/// the events; task is null for a row that belongs to none.
 constexpr const char* kFirst = R"(
 CREATE TABLE facts (name TEXT PRIMARY KEY, value BLOB NOT NULL) WITHOUT ROWID;
 CREATE TABLE runs (

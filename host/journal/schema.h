@@ -16,8 +16,9 @@ public:
     using std::runtime_error::runtime_error;
 };
 
-/// Sets the connection up and brings the tables to kSchemaVersion, in one transaction. A new journal
-/// gets a random identity. Throws NewerSchema, before anything was changed, and DatabaseError.
+/// Sets the connection up and brings the tables to kSchemaVersion, in one transaction. A new
+/// journal gets a random identity. Throws NewerSchema, before anything was changed, and
+/// DatabaseError.
 void prepareSchema(Database& database);
 
 /// The first line of what the integrity check finds wrong; empty if nothing is.

@@ -20,9 +20,9 @@ class StateDirectory {
 public:
     static constexpr long long kReserve = 4LL << 20;  // bytes
 
-    /// Makes the directory with mode 0700, and those above it, if they are missing; locks it. Throws
-    /// StartError when it cannot be made, when another user could write to it, or when another host
-    /// uses it.
+    /// Makes the directory with mode 0700, and those above it, if they are missing; locks it.
+    /// Throws StartError when it cannot be made, when another user could write to it, or when
+    /// another host uses it.
     explicit StateDirectory(const std::string& path);
 
     std::string database() const { return path_ + "/journal.db"; }

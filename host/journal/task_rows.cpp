@@ -89,8 +89,8 @@ void writeCommands(Database& database, const Task& task) {
     for (const Command& ran : task.commands) {
         database.change("INSERT INTO commands VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)",
                         task.number, place++, ran.line, static_cast<int>(ran.pid),
-                        microseconds(ran.started), maybeMicroseconds(ran.ended), ran.exit, ran.signal,
-                        ran.error, static_cast<int>(ran.timedOut),
+                        microseconds(ran.started), maybeMicroseconds(ran.ended), ran.exit,
+                        ran.signal, ran.error, static_cast<int>(ran.timedOut),
                         static_cast<int>(ran.executedNothing), ran.out.text(), ran.err.text());
     }
 }
@@ -120,8 +120,7 @@ std::vector<Command> readCommands(Database& database, std::int64_t number) {
 
 std::vector<std::string> readOutcomes(Database& database, std::int64_t number) {
     std::vector<std::string> rows;
-    Statement found =
-        database.ask("SELECT row FROM outcomes WHERE task = ? ORDER BY id", number);
+    Statement found = database.ask("SELECT row FROM outcomes WHERE task = ? ORDER BY id", number);
     while (found.step())
         rows.push_back(unpackRow(found.bytes(0)));
     return rows;
@@ -171,11 +170,11 @@ std::int64_t insertTask(Database& database, const Task& task) {
         "started, ended, expires, forced, once, reply, reason, guard, hint) "
         "VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)",
         task.transid, valueIn(task.conditions, plugin::kCommandColumn),
-        valueIn(task.conditions, plugin::kProductColumn), task.asker,
-        static_cast<int>(task.state), static_cast<int>(task.way), static_cast<int>(task.answered),
-        microseconds(task.accepted), maybeMicroseconds(task.started), maybeMicroseconds(task.ended),
+        valueIn(task.conditions, plugin::kProductColumn), task.asker, static_cast<int>(task.state),
+        static_cast<int>(task.way), static_cast<int>(task.answered), microseconds(task.accepted),
+        maybeMicroseconds(task.started), maybeMicroseconds(task.ended),
         maybeMicroseconds(task.expires), static_cast<int>(task.forced), task.once,
-        packRow(task.reply),        task.reason, task.guard, task.hint);
+        packRow(task.reply), task.reason, task.guard, task.hint);
     Task entered = task;
     entered.number = database.lastInserted();
     noteHandOver(database, entered);
@@ -195,8 +194,8 @@ bool updateTask(Database& database, const Task& task) {
         "started = ?5, ended = ?6, reply = iif(length(?7) = 0, reply, ?7), reason = ?8, "
         "guard = ?9, hint = ?10 WHERE number = ?11 AND (state < 2 AND state <= ?2 OR state = ?2)",
         task.transid, state, static_cast<int>(task.answered), microseconds(task.accepted),
-        maybeMicroseconds(task.started), maybeMicroseconds(task.ended), packRow(task.reply), task.reason,
-        task.guard, task.hint, task.number);
+        maybeMicroseconds(task.started), maybeMicroseconds(task.ended), packRow(task.reply),
+        task.reason, task.guard, task.hint, task.number);
     if (changed == 0) {
         throw StepBack("task " + std::to_string(task.number) + " goes forward only");
     }

@@ -36,14 +36,13 @@ bool isDatabasesFault(const std::exception_ptr& failure) {
 
 }  // namespace
 
-Writer::Writer(Database& database, embedded::Mutex* shared)
-    : database_(database), shared_(shared) {
+Writer::Writer(Database& database, embedded::Mutex* shared) : database_(database), shared_(shared) {
     thread_ = std::thread([this] { work(); });
 }
 
 Writer::~Writer() {
     {
-        const embedded::MutexLock lock(lock_);
+        const std::lock_guard<std::mutex> lock(lock_);
         ending_ = true;
     }
     changed_.notify_all();
@@ -54,7 +53,7 @@ std::future<void> Writer::submit(Change change) {
     Job job{std::move(change), {}, nullptr};
     std::future<void> done = job.done.get_future();
     {
-        const embedded::MutexLock lock(lock_);
+        const std::lock_guard<std::mutex> lock(lock_);
         jobs_.push_back(std::move(job));
     }
     changed_.notify_all();
@@ -63,7 +62,7 @@ std::future<void> Writer::submit(Change change) {
 
 void Writer::submitLater(Change change) {
     {
-        const embedded::MutexLock lock(lock_);
+        const std::lock_guard<std::mutex> lock(lock_);
         if (later_.empty()) laterDue_ = Clock::now() + kLater;
         later_.push_back(std::move(change));
     }
@@ -73,7 +72,7 @@ void Writer::submitLater(Change change) {
 void Writer::flush() noexcept {
     try {
         {
-            const embedded::MutexLock lock(lock_);
+            const std::lock_guard<std::mutex> lock(lock_);
             if (later_.empty()) return;
         }
         submit([](Database&) {}).get();
@@ -84,7 +83,7 @@ void Writer::flush() noexcept {
 
 void Writer::wipeSoon() {
     {
-        const embedded::MutexLock lock(lock_);
+        const std::lock_guard<std::mutex> lock(lock_);
         if (wiping_) return;
         wiping_ = true;
         wipeDue_ = Clock::now() + kWipeDelay;
@@ -92,13 +91,24 @@ void Writer::wipeSoon() {
     changed_.notify_all();
 }
 
+void Writer::settle() noexcept {
+    flush();
+    std::unique_lock<std::mutex> lock(lock_);
+    wiping_ = true;
+    wipeDue_ = Clock::now();
+    const std::uint64_t before = wipes_;
+    changed_.notify_all();
+    while (wipes_ == before)
+        changed_.wait(lock);
+}
+
 std::uint64_t Writer::transactions() const {
-    const embedded::MutexLock lock(lock_);
+    const std::lock_guard<std::mutex> lock(lock_);
     return transactions_;
 }
 
 /// Returns false at the end, when nothing is left to do.
-bool Writer::awaitWork(embedded::MutexLock& lock) {
+bool Writer::awaitWork(std::unique_lock<std::mutex>& lock) {
     while (jobs_.empty()) {
         const auto now = Clock::now();
         const bool due = (!later_.empty() && now >= laterDue_) || (wiping_ && now >= wipeDue_);
@@ -108,16 +118,16 @@ bool Writer::awaitWork(embedded::MutexLock& lock) {
         if (!later_.empty()) until = laterDue_;
         if (wiping_) until = std::min(until, wipeDue_);
         if (until == Clock::time_point::max()) {
-            lock.wait(changed_);
+            changed_.wait(lock);
         } else {
-            lock.waitUntil(changed_, until);
+            changed_.wait_until(lock, until);
         }
     }
     return true;
 }
 
 void Writer::work() {
-    embedded::MutexLock lock(lock_);
+    std::unique_lock<std::mutex> lock(lock_);
     while (awaitWork(lock)) {
         Jobs jobs = std::exchange(jobs_, {});
         std::vector<Change> later = std::exchange(later_, {});
@@ -126,6 +136,10 @@ void Writer::work() {
         if (!jobs.empty() || !later.empty()) writeAlone(jobs, later);
         const bool wiped = wipes && wipe();
         lock.lock();
+        if (wipes) {
+            ++wipes_;
+            changed_.notify_all();
+        }
         if (wiped || (wipes && ending_)) {
             wiping_ = false;
         } else if (wipes) {
@@ -180,7 +194,7 @@ std::vector<Writer::Change> Writer::tryWrite(Jobs& jobs, const std::vector<Chang
     reached(CommitStep::BeforeCommit);
     database_.run("COMMIT");
     reached(CommitStep::AfterCommit);
-    const embedded::MutexLock lock(lock_);
+    const std::lock_guard<std::mutex> lock(lock_);
     ++transactions_;
     return again;
 }

@@ -1,11 +1,15 @@
 /// The one thread that changes the journal.
 #pragma once
 
+#include <chrono>
 #include <condition_variable>
+#include <cstdint>
 #include <exception>
 #include <functional>
 #include <future>
+#include <mutex>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include "embedded/mutex.h"
@@ -14,7 +18,8 @@
 namespace host {
 
 /// Carries out changes in the order in which they are handed over. Those that wait while another
-/// transaction is being written to the disk share the next one, so that many callers share its cost.
+/// transaction is being written to the disk share the next one, so that many callers share its
+/// cost.
 ///
 /// Any thread may call; a change may call wipeSoon() only.
 class Writer {
@@ -33,14 +38,18 @@ public:
     /// The future is ready once the change is durable; it throws what the change threw, or
     /// DatabaseError when the transaction could not be written.
     std::future<void> submit(Change change);
-    /// Carried out with the next change that somebody waits for, or after a second. When it fails it
-    /// is tried again, a second later.
+    /// Carried out with the next change that somebody waits for, or after a second. When it fails
+    /// it is tried again, a second later.
     void submitLater(Change change);
     /// Carries out what submitLater() got. Returns when it is durable or could not be written.
     void flush() noexcept;
 
     /// A secret was removed: within a second the log of changes is cut, which still holds it.
     void wipeSoon();
+
+    /// Carries out what is left to do, cutting the log included, and returns then. Somebody who
+    /// reads for long can keep the log from being cut; it is tried once.
+    void settle() noexcept;
 
     /// Transactions that were written so far.
     std::uint64_t transactions() const;
@@ -55,7 +64,7 @@ private:
     using Clock = std::chrono::steady_clock;
 
     void work();
-    bool awaitWork(embedded::MutexLock& lock) ZAV_REQUIRES(lock_);
+    bool awaitWork(std::unique_lock<std::mutex>& lock);
     void writeAlone(Jobs& jobs, std::vector<Change>& later);
     void write(Jobs& jobs, std::vector<Change>& later);
     std::vector<Change> tryWrite(Jobs& jobs, const std::vector<Change>& later);
@@ -65,15 +74,16 @@ private:
     Database& database_;
     embedded::Mutex* const shared_;  ///< may be null
 
-    mutable embedded::Mutex lock_;
+    mutable std::mutex lock_;  // around everything below
     std::condition_variable changed_;
-    Jobs jobs_ ZAV_GUARDED_BY(lock_);
-    std::vector<Change> later_ ZAV_GUARDED_BY(lock_);
-    Clock::time_point laterDue_ ZAV_GUARDED_BY(lock_){};
-    bool wiping_ ZAV_GUARDED_BY(lock_) = false;
-    Clock::time_point wipeDue_ ZAV_GUARDED_BY(lock_){};
-    std::uint64_t transactions_ ZAV_GUARDED_BY(lock_) = 0;
-    bool ending_ ZAV_GUARDED_BY(lock_) = false;
+    Jobs jobs_;
+    std::vector<Change> later_;
+    Clock::time_point laterDue_{};
+    bool wiping_ = false;
+    Clock::time_point wipeDue_{};
+    std::uint64_t transactions_ = 0;
+    std::uint64_t wipes_ = 0;  ///< tries
+    bool ending_ = false;
 
     std::thread thread_;  ///< last, so that it finds everything else
 };

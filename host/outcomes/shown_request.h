@@ -10,7 +10,8 @@
 namespace host {
 
 /// The columns that were asked with and their values; the last one of a column that was given more
-/// than once, as the plug-in takes it. The text of a SETCONFIG is left out, and long values are cut.
+/// than once, as the plug-in takes it. The text of a SETCONFIG is left out, and long values are
+/// cut.
 std::vector<std::pair<std::string, std::string>> shownRequest(
     const std::vector<oxa::Predicate>& conditions);
 

@@ -38,6 +38,10 @@ inline constexpr std::array<std::pair<TaskState, std::string_view>, 8> kTaskStat
      {TaskState::Expired, "expired"},
      {TaskState::Interrupted, "interrupted"}}};
 
+constexpr std::string_view nameOf(TaskState state) {
+    return kTaskStates[static_cast<std::size_t>(state)].second;
+}
+
 constexpr bool isOver(TaskState state) {
     return state != TaskState::Queued && state != TaskState::Running;
 }
@@ -68,13 +72,13 @@ struct Task {
     std::optional<WallClock::time_point> ended;
     std::optional<WallClock::time_point> expires;  ///< it must have been handed over by then
     bool forced = false;                           ///< the guard on the inventory was passed by
-    std::optional<std::int64_t> run;  ///< the run of the host that handed it to the plug-in
-    int interruptions = 0;            ///< unclean ends of the host in the middle of it
-    std::optional<std::string> once;  ///< the content's hash: a repetition gets this task
-    std::string reply;                ///< a row of the request table; empty: there is none
-    std::string reason;               ///< why it ended as it did, where no row says so
-    std::string guard;                ///< the guard that refused it at hand-over
-    std::string hint;                 ///< that guard's way out
+    std::optional<std::int64_t> run;    ///< the run of the host that handed it to the plug-in
+    int interruptions = 0;              ///< unclean ends of the host in the middle of it
+    std::optional<std::string> once;    ///< the content's hash: a repetition gets this task
+    std::string reply;                  ///< a row of the request table; empty: there is none
+    std::string reason;                 ///< why it ended as it did, where no row says so
+    std::string guard;                  ///< the guard that refused it at hand-over
+    std::string hint;                   ///< that guard's way out
     std::vector<std::string> outcomes;  ///< rows of the outcome table
     std::vector<Command> commands;
 

@@ -79,8 +79,8 @@ TaskList::Request::~Request() {
     if (number_ != 0) list_.forget(number_);
 }
 
-void TaskList::Request::answered(const oxa::Rows& rows, const Heard& heard) {
-    if (number_ != 0) list_.answer(number_, rows, heard);
+bool TaskList::Request::answered(const oxa::Rows& rows, const Heard& heard) {
+    return number_ != 0 && list_.answer(number_, rows, heard);
 }
 
 /// Returns 0 when it cannot be kept and goes on all the same.
@@ -154,13 +154,13 @@ std::optional<int> TaskList::readAnswer(Entry& entry, const oxa::Rows& rows, con
     return retval;
 }
 
-void TaskList::answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard) {
+bool TaskList::answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard) {
     Entry over;
     {
         const embedded::MutexLock lock(lock_);
         Entry& entry = entries_.at(number);
         const std::optional<int> retval = readAnswer(entry, rows, heard);
-        if (!retval) return;
+        if (!retval) return false;
         entry.answered = true;
         entry.task.answered = true;
         const bool refused = *retval != plugin::kAccepted && !entry.ended;
@@ -178,6 +178,7 @@ void TaskList::answer(std::uint64_t number, const oxa::Rows& rows, const Heard& 
         }
     }
     if (over.answered) endAnswered(std::move(over), heard);
+    return true;
 }
 
 /// A task that is over and has been answered now.

@@ -56,8 +56,9 @@ public:
         ~Request();
         Request(const Request&) = delete;
         Request& operator=(const Request&) = delete;
-        /// The query has been answered with these rows, and this was heard on its thread.
-        void answered(const oxa::Rows& rows, const Heard& heard);
+        /// The query has been answered with these rows, and this was heard on its thread. Returns
+        /// false when that does not say whether the plug-in has the task.
+        bool answered(const oxa::Rows& rows, const Heard& heard);
 
     private:
         TaskList& list_;
@@ -78,6 +79,8 @@ public:
 
     /// A task that has been entered ends without having been handed over. Throws NotKept.
     void end(const Task& task);
+    /// The same, for one whose end has been kept already.
+    void hasEnded(const Task& task) { tellWaiters(task); }
 
     /// Gets the task once it is over, on the thread that ends it. Must return quickly.
     using WhenOver = std::function<void(const Task& task)>;
@@ -116,7 +119,7 @@ private:
     std::uint64_t insert(Task task);
     void forget(std::uint64_t number);
     std::optional<int> readAnswer(Entry& entry, const oxa::Rows& rows, const Heard& heard);
-    void answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard);
+    bool answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard);
     void endAnswered(Entry entry, const Heard& heard);
     void take(const std::string& row, std::vector<Command> commands);
     std::vector<Task> takeInto(std::uint64_t number, const std::string& row,

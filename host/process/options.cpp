@@ -1,6 +1,7 @@
 #include "host/process/options.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <charconv>
 #include <filesystem>
 #include <system_error>
@@ -31,6 +32,7 @@ struct Typed {
     std::optional<std::string> keepTasks;
     std::optional<std::string> keepRows;
     std::optional<std::string> onInterrupt;
+    std::optional<std::string> orphanWait;
     std::optional<std::string> taskTimeout;
     bool noJournal = false;
     bool unguarded = false;
@@ -75,6 +77,10 @@ void declare(CLI::App& app, Typed& typed) {
     app.add_option("--keep-rows", typed.keepRows,
                    "How many rows of outcomes are kept, 1 to 100000000; 10000 if not given")
         ->type_name("N");
+    app.add_option("--orphan-wait", typed.orphanWait,
+                   "How long the host waits for commands of an earlier run before it kills them, 1 "
+                   "to 86400; as long as a command may run if not given")
+        ->type_name("SECONDS");
     app.add_option("--on-interrupt", typed.onInterrupt,
                    "What becomes of a task in whose midst the host was killed: keep notes that, "
                    "rerun runs it again; keep if not given")
@@ -202,6 +208,9 @@ void chooseJournal(const Typed& typed, HostOptions& options) {
     options.maxQueued = countOf("--max-queued", typed.maxQueued, 1'000'000, options.maxQueued);
     options.keepDays = countOf("--keep-tasks", typed.keepTasks, 36'500, options.keepDays);
     options.keepRows = countOf("--keep-rows", typed.keepRows, 100'000'000, options.keepRows);
+    options.orphanWait = std::chrono::seconds(countOf(
+        "--orphan-wait", typed.orphanWait, 86'400,
+        std::max(1, options.taskTimeout.value_or(static_cast<int>(options.orphanWait.count())))));
     const std::string onInterrupt = typed.onInterrupt.value_or("keep");
     if (onInterrupt != "keep" && onInterrupt != "rerun") {
         throw StartError("--on-interrupt takes keep or rerun, not \"" + onInterrupt + "\"");

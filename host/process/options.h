@@ -1,6 +1,7 @@
 /// The command line and its defaults.
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -13,11 +14,13 @@ struct HostOptions {
     std::string home;
     std::string socket;
     std::string rpcSocket;
-    std::string state;                      ///< the directory of what the host itself keeps
-    bool journal = true;                    ///< false: what was accepted is kept in memory only
-    int maxQueued = 1000;                   ///< tasks that may wait in the journal
-    int keepDays = 30;                      ///< how long tasks that are over are kept
-    int keepRows = 10'000;                  ///< how many rows of outcomes are kept
+    std::string state;      ///< the directory of what the host itself keeps
+    bool journal = true;    ///< false: what was accepted is kept in memory only
+    int maxQueued = 1000;   ///< tasks that may wait in the journal
+    int keepDays = 30;      ///< how long tasks that are over are kept
+    int keepRows = 10'000;  ///< how many rows of outcomes are kept
+    /// How long the commands of an earlier run may go on; then they are killed.
+    std::chrono::seconds orphanWait{300};
     bool rerunInterrupted = false;          ///< the task that an unclean end cut off runs again
     std::optional<std::uint16_t> rpcPort;   ///< absent: no TCP
     std::optional<std::string> originNode;  ///< absent: the platform's own choice

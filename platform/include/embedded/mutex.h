@@ -3,7 +3,6 @@
 /// annotations. With other compilers this is just std::mutex.
 #pragma once
 
-#include <chrono>
 #include <condition_variable>
 #include <mutex>
 
@@ -45,11 +44,6 @@ public:
     /// Releases the mutex until the condition is notified. Wake-ups may be spurious, so callers
     /// loop.
     void wait(std::condition_variable& condition) { condition.wait(lock_); }
-    /// The same, but no longer than until this time.
-    void waitUntil(std::condition_variable& condition,
-                   std::chrono::steady_clock::time_point until) {
-        condition.wait_until(lock_, until);
-    }
 
 private:
     std::unique_lock<std::mutex> lock_;

@@ -68,7 +68,7 @@ TEST_F(Interface, HealthSaysWhatThisHostIs) {
                         R"(,"home":"/home/of/it","origin_node":"node","uptime_seconds":)"),
               0U)
         << body;
-    EXPECT_NE(body.find(R"(,"subscriptions":2,"guarded":true})"), std::string::npos) << body;
+    EXPECT_NE(body.find(R"(,"subscriptions":2,"guarded":true,"journal":")"), std::string::npos) << body;
 }
 
 TEST_F(Interface, IsClosedToPeersWithoutAccess) {

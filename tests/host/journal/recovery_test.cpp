@@ -152,7 +152,8 @@ void damageIndex(const std::string& file) {
     database.run("PRAGMA writable_schema = ON");
     // An index that says it belongs to another column holds entries that are not in order.
     database.change(
-        "UPDATE sqlite_master SET sql = 'CREATE INDEX tasks_by_transid ON tasks (accepted, number)' "
+        "UPDATE sqlite_master SET sql = 'CREATE INDEX tasks_by_transid ON tasks (accepted, "
+        "number)' "
         "WHERE name = 'tasks_by_transid'");
 }
 
@@ -184,7 +185,8 @@ TEST_F(Recovery, AJournalOfANewerHostIsNotTouched) {
     EXPECT_EQ(database.number("PRAGMA user_version"), 1000);
 }
 
-// ---- Kills ---------------------------------------------------------------------------------------
+// ---- Kills
+// ---------------------------------------------------------------------------------------
 
 void killBefore(CommitStep step) {
     if (step == CommitStep::BeforeCommit) ::_exit(9);

@@ -16,9 +16,7 @@ protected:
     JournalWriter() { database.run("CREATE TABLE t (a INTEGER PRIMARY KEY)"); }
 
     static Writer::Change inserting(int number) {
-        return [number](Database& written) {
-            written.change("INSERT INTO t VALUES (?)", number);
-        };
+        return [number](Database& written) { written.change("INSERT INTO t VALUES (?)", number); };
     }
     /// What another connection sees.
     std::int64_t rows() { return Database(scratch.path("db")).number("SELECT count(*) FROM t"); }

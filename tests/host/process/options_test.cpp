@@ -65,6 +65,36 @@ TEST_F(Options, WithoutThemTheHostIsGuardedAndRuns) {
     EXPECT_FALSE(read({})->rpcPort);
 }
 
+TEST_F(Options, TheJournalKeepsWhatItIsToldToKeep) {
+    environment["TOVRINHOME"] = home;
+    const auto usual = read({});
+    EXPECT_TRUE(usual->journal);
+    EXPECT_EQ(usual->maxQueued, 1000);
+    EXPECT_EQ(usual->keepDays, 30);
+    EXPECT_EQ(usual->keepRows, 10'000);
+    EXPECT_FALSE(usual->rerunInterrupted);
+    EXPECT_EQ(usual->orphanWait, std::chrono::seconds(300));
+    const auto given = read({"--max-queued", "7", "--keep-tasks", "8", "--keep-rows", "9",
+                             "--on-interrupt", "rerun", "--orphan-wait", "10"});
+    EXPECT_EQ(given->maxQueued, 7);
+    EXPECT_EQ(given->keepDays, 8);
+    EXPECT_EQ(given->keepRows, 9);
+    EXPECT_TRUE(given->rerunInterrupted);
+    EXPECT_EQ(given->orphanWait, std::chrono::seconds(10));
+    EXPECT_FALSE(read({"--no-journal"})->journal);
+    EXPECT_EQ(read({"--task-timeout", "60"})->orphanWait, std::chrono::seconds(60));
+}
+
+TEST_F(Options, OfTheJournalThatMakeNoSenseAreRefused) {
+    environment["TOVRINHOME"] = home;
+    EXPECT_THROW(read({"--max-queued", "0"}), host::StartError);
+    EXPECT_THROW(read({"--keep-tasks", "1d"}), host::StartError);
+    EXPECT_THROW(read({"--keep-rows", "-1"}), host::StartError);
+    EXPECT_THROW(read({"--orphan-wait", ""}), host::StartError);
+    EXPECT_THROW(read({"--on-interrupt", "maybe"}), host::StartError);
+    EXPECT_THROW(read({"--no-journal", "--state", "/s"}), host::StartError);
+}
+
 TEST_F(Options, HomeComesFromTheEnvironmentWhenItIsNotGiven) {
     environment["TOVRINHOME"] = home;
     EXPECT_EQ(read({})->home, home);

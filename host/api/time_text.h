@@ -1,0 +1,16 @@
+/// Times as RFC 3339 writes them, in UTC.
+#pragma once
+
+#include <string>
+
+#include "host/commands/command.h"
+
+namespace host {
+
+/// With milliseconds: "2025-01-31T12:00:00.000Z".
+std::string timeText(WallClock::time_point time);
+
+/// The time that the text says, with or without a fraction of a second. Throws BadRequest.
+WallClock::time_point timeOf(const std::string& text);
+
+}  // namespace host
