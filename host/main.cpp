@@ -131,9 +131,10 @@ void sayWhatWaits(Journal& journal) {
     }
 }
 
+/// Unguarded hosts may share a home, but not a journal.
 Journal::Settings journalOf(const HostOptions& options) {
     return {options.journal ? options.state : std::string(), options.rerunInterrupted,
-            options.keepDays, options.keepRows};
+            options.keepDays, options.keepRows, !options.guarded && !options.ownState};
 }
 
 void run(const HostOptions& options) {

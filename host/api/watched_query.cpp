@@ -85,7 +85,7 @@ WatchedAnswer runWatched(Services& services, const Query& query, bool force, con
     TaskWatch::Request watched(services.watch, *query.table);
     const Query handedOn = admitted(services, query, force);
     // The task is what was asked for, not what the guards made of it.
-    TaskList::Request task(services.tasks, query, askerOf(query, peer));
+    TaskList::Request task(services.tasks, query, askerOf(query, peer), force);
     ThreadEar ear(wantsOutput ? kMostOutput : 0);
     WatchedAnswer answer{run(handedOn), {}};
     answer.heard = ear.take();

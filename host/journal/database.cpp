@@ -102,6 +102,7 @@ Database::Database(const std::string& file) {
     if (code != SQLITE_OK) fail(opened, code);
     sqlite3_extended_result_codes(opened, 1);
     sqlite3_busy_timeout(opened, kBusyMilliseconds);
+    run("PRAGMA cache_size = -128");  // KiB: what is read is mostly new
 }
 
 void Database::run(const char* sql) {

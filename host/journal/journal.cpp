@@ -63,7 +63,7 @@ std::optional<Task> onceIn(Database& database, const std::string& identity,
 
 Journal::Journal(const Settings& settings) : settings_(settings) {
     try {
-        if (!settings_.directory.empty()) directory_.emplace(settings_.directory);
+        if (!settings_.directory.empty()) takeDirectory();
         openOrSetAside();
         recovered_.clean = !directory_ || directory_->endedCleanly();
         settleUnfinished(*database_, settings_.rerunInterrupted, recovered_);
@@ -84,6 +84,15 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
 }
 
 Journal::~Journal() = default;
+
+void Journal::takeDirectory() {
+    try {
+        directory_.emplace(settings_.directory);
+    } catch (const InUse& inUse) {
+        if (!settings_.mayYield) throw;
+        warn(std::string(inUse.what()) + "; this one keeps its tasks in memory only");
+    }
+}
 
 void Journal::open() {
     database_ = std::make_unique<Database>(directory_ ? directory_->database() : ":memory:");

@@ -27,6 +27,7 @@ public:
         bool rerunInterrupted = false;  ///< the task that an unclean end cut off runs again
         int keepDays = 30;              ///< tasks that have been over for longer are removed
         int keepRows = 10'000;          ///< of older outcomes the rows are removed
+        bool mayYield = false;          ///< in memory, too, when another host uses the directory
     };
 
     /// Opens the journal or makes a new one, sets a damaged one aside, and settles what the last
@@ -79,6 +80,7 @@ public:
 private:
     template <typename Reader>
     auto read(const Reader& reader);
+    void takeDirectory();
     void open();
     void openOrSetAside();
     void commit(Writer::Change change);

@@ -64,12 +64,13 @@ TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, TaskKeeper& keeper
     });
 }
 
-TaskList::Request::Request(TaskList& list, const Query& query, std::string asker) : list_(list) {
+TaskList::Request::Request(TaskList& list, const Query& query, std::string asker, bool forced)
+    : list_(list) {
     if (list_.requests_ == nullptr || query.table->name != list_.requests_->name) return;
     if (!plugin::runsAtOnce(valueIn(query.where, plugin::kCommandColumn))) {
         turn_ = std::unique_lock<std::mutex>(list_.turns_);
     }
-    number_ = list_.add(query, std::move(asker));
+    number_ = list_.add(query, std::move(asker), forced);
 }
 
 TaskList::Request::Request(TaskList& list, Task task)
@@ -84,8 +85,9 @@ bool TaskList::Request::answered(const oxa::Rows& rows, const Heard& heard) {
 }
 
 /// Returns 0 when it cannot be kept and goes on all the same.
-std::uint64_t TaskList::add(const Query& query, std::string asker) {
+std::uint64_t TaskList::add(const Query& query, std::string asker, bool forced) {
     Task task;
+    task.forced = forced;
     task.asker = std::move(asker);
     task.conditions = query.where;
     task.request = shownRequest(query.where);

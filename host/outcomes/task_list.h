@@ -50,7 +50,8 @@ public:
     class Request {
     public:
         /// Throws NotKept; unguarded, the request goes on and is no task.
-        Request(TaskList& list, const Query& query, std::string asker);
+        /// `forced`: with a guard passed by, should it be handed over again after a kill.
+        Request(TaskList& list, const Query& query, std::string asker, bool forced = false);
         /// Hands over a task that has been entered.
         Request(TaskList& list, Task task);
         ~Request();
@@ -114,7 +115,7 @@ private:
     };
     using Entries = std::map<std::uint64_t, Entry>;
 
-    std::uint64_t add(const Query& query, std::string asker);
+    std::uint64_t add(const Query& query, std::string asker, bool forced);
     std::uint64_t addHandedOver(Task task);
     std::uint64_t insert(Task task);
     void forget(std::uint64_t number);

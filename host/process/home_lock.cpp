@@ -72,7 +72,7 @@ HomeLock::HomeLock(const std::string& directory, const std::string& what) {
     while (!tryLock(file, name)) {
         owner = ownerIn(file);
         if (owner || std::chrono::steady_clock::now() >= deadline) {
-            throw StartError(
+            throw InUse(
                 what + ' ' + directory + " is in use by " +
                 (owner ? "the host with process id " + std::to_string(*owner) : "another host"));
         }

@@ -4,8 +4,15 @@
 #include <string>
 
 #include "host/process/file_descriptor.h"
+#include "host/process/start_error.h"
 
 namespace host {
+
+/// Another process holds the lock.
+class InUse : public StartError {
+public:
+    using StartError::StartError;
+};
 
 /// Two hosts on one home would overwrite each other's files and run commands at the same time. The
 /// owner of a home holds a lock on the file .zavhost.lock in it, which contains its process id. The
@@ -13,9 +20,8 @@ namespace host {
 /// same goes for the directory of what a host itself keeps.
 class HomeLock {
 public:
-    /// Throws StartError when another process holds the lock, with that process's id, or when the
-    /// file cannot be made.
-    /// `what` is the word for the directory in that sentence.
+    /// Throws InUse when another process holds the lock, with that process's id, and StartError
+    /// when the file cannot be made. `what` is the word for the directory in that sentence.
     explicit HomeLock(const std::string& directory, const std::string& what = "home");
 
 private:

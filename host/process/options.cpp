@@ -205,6 +205,7 @@ void chooseJournal(const Typed& typed, HostOptions& options) {
         throw StartError("--no-journal and --state exclude each other");
     }
     options.journal = !typed.noJournal;
+    options.ownState = typed.state.has_value();
     options.maxQueued = countOf("--max-queued", typed.maxQueued, 1'000'000, options.maxQueued);
     options.keepDays = countOf("--keep-tasks", typed.keepTasks, 36'500, options.keepDays);
     options.keepRows = countOf("--keep-rows", typed.keepRows, 100'000'000, options.keepRows);

@@ -16,6 +16,7 @@ struct HostOptions {
     std::string rpcSocket;
     std::string state;      ///< the directory of what the host itself keeps
     bool journal = true;    ///< false: what was accepted is kept in memory only
+    bool ownState = false;  ///< it was named for this host
     int maxQueued = 1000;   ///< tasks that may wait in the journal
     int keepDays = 30;      ///< how long tasks that are over are kept
     int keepRows = 10'000;  ///< how many rows of outcomes are kept

@@ -6,6 +6,7 @@
 #include <signal.h>
 #include <sys/stat.h>
 
+#include <map>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <sstream>
@@ -33,9 +34,18 @@ protected:
     std::string gate() const { return home.files().path("gate"); }
     void openGate() const { home.files().write("gate", ""); }
 
-    void start(const std::vector<std::string>& arguments = {}) {
+    void start(const std::vector<std::string>& arguments = {}, Guards guards = Guards::On) {
         host.emplace(home.path(), Environment{{"QVSDEPLOY_AGENTDEPOT", home.depot()}}, arguments,
-                     Guards::On);
+                     guards);
+    }
+    /// A query that asks for a start.
+    static json startOnTheTable(const std::string& product) {
+        json where = json::array();
+        for (const auto& [column, value] : std::map<std::string, std::string>{
+                 {"COMMAND", "START"}, {"PRODUCT", product}, {"TRANSID", "t"}}) {
+            where.push_back({{"column", column}, {"op", "="}, {"value", value}});
+        }
+        return {{"table", "KAGREQT"}, {"where", where}};
     }
     void killAndStart() {
         host->program().signal(SIGKILL);
@@ -111,11 +121,7 @@ TEST_F(JournalOnDisk, WhileACommandOfADeadHostRunsNothingElseIsQueued) {
     accept("ux");
     ASSERT_TRUE(awaitNote("begin ux"));
     killAndStart();
-    const json query = {
-        {"table", "KAGREQT"},
-        {"where", json::array({{{"column", "COMMAND"}, {"op", "="}, {"value", "START"}},
-                               {{"column", "PRODUCT"}, {"op", "="}, {"value", "px"}},
-                               {{"column", "TRANSID"}, {"op", "="}, {"value", "t"}}})}};
+    const json query = startOnTheTable("px");
     post("/v1/query", query, 503);
     openGate();
     ASSERT_TRUE(awaitNote("end ux"));
@@ -123,6 +129,16 @@ TEST_F(JournalOnDisk, WhileACommandOfADeadHostRunsNothingElseIsQueued) {
         RawClient client(host->socket());
         return client.post("/v1/query", query.dump()).status == 200;
     }));
+}
+
+TEST_F(JournalOnDisk, WithoutGuardsARequestIsQueuedBesideACommandOfADeadHost) {
+    start({}, Guards::Off);
+    accept("ux");
+    ASSERT_TRUE(awaitNote("begin ux"));
+    killAndStart();
+    post("/v1/query", startOnTheTable("px"), 200);
+    EXPECT_TRUE(awaitNote("begin px"));
+    openGate();
 }
 
 TEST_F(JournalOnDisk, AnOrphanThatTakesTooLongIsKilled) {

@@ -221,7 +221,8 @@ TEST_F(TaskDetails, WhatIsNotThereIsSaid) {
     EXPECT_EQ(get("/v1/tasks/none")["error"], "there is no task \"none\"");
     EXPECT_EQ(get("/v1/tasks/none?wait=60")["error"], "there is no task \"none\"");
     EXPECT_EQ(get("/v1/tasks?state=dead")["error"],
-              "there is no state \"dead\" but queued, running, done, failed, refused");
+              "there is no state \"dead\" but queued, running, done, failed, refused, "
+              "cancelled, expired, interrupted");
 }
 
 }  // namespace

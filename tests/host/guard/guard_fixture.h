@@ -11,6 +11,7 @@
 
 #include "host/guard/guards.h"
 #include "host/guard/refusal.h"
+#include "host/journal/journal.h"
 #include "host/made_up_table.h"
 #include "support/scratch_dir.h"
 
@@ -26,7 +27,7 @@ protected:
         install({"ax", "um", "ux"});
         tables.emplace(oxa::tables());
         feed.emplace(*tables);
-        tasks.emplace(*tables, *feed, true);
+        tasks.emplace(*tables, *feed, journal, true);
         guards.emplace(host::Site{page, files.path("home"), files.path("depot")}, *tasks);
     }
 
@@ -112,6 +113,7 @@ protected:
         "KAGDYST", {{"transid", 0, 8, OXA_TYPE_CHARACTER}, {"retval", 8, 4, OXA_TYPE_INTEGER}}};
     std::optional<host::TableSet> tables;
     std::optional<host::OutcomeFeed> feed;
+    host::Journal journal{host::Journal::Settings{}};
     std::optional<host::TaskList> tasks;
     std::optional<host::Guards> guards;
 };

@@ -36,8 +36,8 @@ TEST(JournalDatabase, SaysWhatIsWrong) {
 TEST(JournalDatabase, KnowsAFileThatIsNoDatabase) {
     const ScratchDir scratch;
     const std::string file = scratch.write("journal.db", std::string(8192, 'x'));
-    Database database(file);
     try {
+        Database database(file);
         database.number("SELECT count(*) FROM sqlite_master");
         FAIL() << "it was read";
     } catch (const DatabaseError& error) {

@@ -10,6 +10,7 @@
 #include <thread>
 
 #include "host/journal/journal_fixture.h"
+#include "host/process/start_error.h"
 #include "support/host/program.h"
 
 namespace {
@@ -272,6 +273,18 @@ TEST_F(Journals, WithoutADirectoryAreInMemory) {
     EXPECT_EQ(memory.find("t1")->id, task.id);
     memory.save(ended(task));
     EXPECT_EQ(memory.newest({}).size(), 1U);
+}
+
+TEST_F(Journals, OfTwoOnOneDirectoryTheSecondFailsOrIsInMemory) {
+    open();
+    EXPECT_THROW(Journal{settings()}, host::StartError);
+    Journal::Settings yielding = settings();
+    yielding.mayYield = true;
+    Journal second(yielding);
+    EXPECT_NE(second.identity(), journal->identity());
+    Task task = asked("t1");
+    second.enter(task);
+    EXPECT_EQ(journal->find("t1"), std::nullopt);
 }
 
 TEST_F(Journals, ManyThreadsMayEnterTasksAndShareCommits) {

@@ -384,6 +384,34 @@ TEST_F(Tasks, ASuccessWhoseCommandDiedOfASignalIsAFailure) {
     EXPECT_EQ(list->find("t1")->commands.at(0).signal, SIGKILL);
 }
 
+/// A journal on a full disk.
+class FullKeeper final : public host::TaskKeeper {
+public:
+    const std::string& identity() const override { return name_; }
+    std::int64_t run() const override { return 1; }
+    void enter(Task&) override { throw host::NotKept("the disk is full"); }
+    void enterSoon(Task) override {}
+    void save(const Task&) override { throw host::NotKept("the disk is full"); }
+    void saveOutcome(const std::vector<Task>&) override {}
+    void saveSoon(Task) override {}
+    void keepRow(const std::string&) override {}
+    void forget(std::int64_t) override {}
+    std::vector<Task> newest(const host::TaskFilter&) override { return {}; }
+    std::optional<Task> find(std::string_view) override { return std::nullopt; }
+
+private:
+    const std::string name_ = "full";
+};
+
+TEST_F(Tasks, OneThatCannotBeKeptIsHandedOverOnlyWithoutGuards) {
+    FullKeeper full;
+    TaskList guarded(*tables, *feed, full, true);
+    EXPECT_THROW(TaskList::Request(guarded, query("t1", "START"), "somebody"), host::NotKept);
+    TaskList unguarded(*tables, *feed, full, false);
+    TaskList::Request request(unguarded, query("t1", "START"), "somebody");
+    EXPECT_FALSE(request.answered(rows(taskRow("t1", "START", 0)), answering(0)));
+}
+
 class TasksWithoutGuards : public Tasks {
 protected:
     TasksWithoutGuards() : Tasks(false) {}
