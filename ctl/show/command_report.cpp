@@ -51,7 +51,9 @@ std::string endText(const json& command) {
         return "could not be run: " + printable(error);
     }
     if (const std::string signal = textOf(command, "signal"); !signal.empty()) {
-        return "killed by signal " + printable(signal);
+        const bool isLate = command.value("timed_out", json()) == json(true);
+        return (isLate ? "given up after its time-out, " : "") +
+               ("killed by signal " + printable(signal));
     }
     if (const std::string code = textOf(command, "exit"); !code.empty()) {
         return "exit code " + printable(code);

@@ -68,7 +68,7 @@ json reportDocument(const PushReport& report) {
     return document;
 }
 
-std::string counted(std::size_t count, const char* one, const char* many) {
+std::string counted(std::uintmax_t count, const char* one, const char* many) {
     return std::to_string(count) + " " + (count == 1 ? one : many);
 }
 

@@ -20,7 +20,7 @@ constexpr Argument kRestart =
          "Add the metafile's data provider to those that are started, which restarts\n"
          "the agent when it is not among them yet");
 constexpr Argument kArguments[] = {kMetafile, kScripts, kPort,   kRestart,
-                                   kTarget,   kNoWait,  kTransid};
+                                   kTarget,   kForce,   kNoWait, kTransid};
 
 std::string contextOf(const Values& given) {
     std::string text;
@@ -39,6 +39,7 @@ ExitStatus run(const Invocation& invocation) {
     TaskRequest request;
     request.command = "SETCONFIG";
     request.product = "um";
+    request.isForced = given.flag(kForce);
     request.context = contextOf(given);
     request.uaconfig = given.text(kMetafile);
     request.uascript = given.text(kScripts);

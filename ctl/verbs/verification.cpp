@@ -13,13 +13,21 @@ using nlohmann::json;
 namespace ctl {
 namespace {
 
-/// A version's digits without those that only fill its parts up: "063" of "063000000", "6.3" and
-/// "06.30" are all "63".
-std::string significant(const std::string& version) {
-    std::string digits;
-    std::copy_if(version.begin(), version.end(), std::back_inserter(digits),
-                 [](char c) { return c >= '1' && c <= '9'; });
+/// The version as the inventory writes it: two digits before the point, nine in all, so that "6.3"
+/// and "06.30" are "063000000".
+std::string listedForm(const std::string& version) {
+    constexpr std::size_t kBeforeThePoint = 2;
+    constexpr std::size_t kDigits = 9;
+    std::string digits = version;
+    const std::size_t first = std::min(version.find('.'), version.size());
+    if (first < kBeforeThePoint) digits.insert(0, kBeforeThePoint - first, '0');
+    digits.erase(std::remove(digits.begin(), digits.end(), '.'), digits.end());
+    if (digits.size() < kDigits) digits.append(kDigits - digits.size(), '0');
     return digits;
+}
+
+bool isNumeric(const std::string& version) {
+    return version.find_first_not_of("0123456789.") == std::string::npos;
 }
 
 bool endedWell(const TaskResult& result) {
@@ -30,8 +38,8 @@ bool endedWell(const TaskResult& result) {
 }  // namespace
 
 bool isSameVersion(const std::string& asked, const std::string& listed) {
-    if (asked.find_first_not_of("0123456789.") != std::string::npos) return true;
-    return asked == listed || significant(asked) == significant(listed);
+    if (!isNumeric(asked)) return true;
+    return asked == listed || (!asked.empty() && listedForm(asked) == listed);
 }
 
 std::string doubtAboutInstall(const TaskRequest& request, const json& rows) {
@@ -73,6 +81,10 @@ void Verification::check(TaskResult& result) const {
     try {
         if (request_.command == "INSTALL") {
             result.doubt = doubtAboutInstall(request_, inventory());
+            if (result.doubt.empty() && !isNumeric(request_.version)) {
+                result.note =
+                    "not verified: no inventory lists a version such as " + request_.version;
+            }
         } else if (request_.command == "UNINSTALL") {
             result.doubt = doubtAboutUninstall(request_, before_, inventory());
         } else {

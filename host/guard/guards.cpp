@@ -31,7 +31,7 @@ const std::vector<Guard>& guards() {
 
 void Guards::admit(CommandRequest& request, bool mayChange) const {
     Machine machine(site_);
-    const bool skipsMachine = mayChange || tasks_.unfinished(request.product());
+    const bool skipsMachine = mayChange || tasks_.mayChange(request.product());
     for (const Guard& guard : guards()) {
         if (guard.asks == Asks::Machine && skipsMachine) continue;
         guard.check(request, machine);

@@ -316,13 +316,14 @@ void TaskList::tellWaiters(const Task& task) {
         call(task);
 }
 
-bool TaskList::unfinished(const std::string& product) const {
+bool TaskList::mayChange(const std::string& product) const {
     if (product.empty()) return false;
     const embedded::MutexLock lock(lock_);
     return std::any_of(entries_.begin(), entries_.end(), [&product](const auto& each) {
         const Entry& entry = each.second;
         const std::string other(entry.task.value(plugin::kProductColumn));
         return entry.turn != 0 && !isOver(entry.task.state) &&
+               plugin::changesWhatIsInstalled(entry.task.value(plugin::kCommandColumn)) &&
                ::strcasecmp(other.c_str(), product.c_str()) == 0;
     });
 }

@@ -70,9 +70,9 @@ public:
     /// The tasks that satisfy all conditions, newest first, without their commands.
     std::vector<Task> newest(const TaskFilter& filter) const { return keeper_.newest(filter); }
 
-    /// Whether an accepted task for the product, in upper or lower case, is not over. False for no
-    /// product.
-    bool unfinished(const std::string& product) const;
+    /// Whether an accepted task for the product, in upper or lower case, is not over and may change
+    /// whether it is installed or which instances it has. False for no product.
+    bool mayChange(const std::string& product) const;
 
     /// The task with this identifier, or else the newest one with this TRANSID. The commands of a
     /// running one are those so far.

@@ -32,7 +32,13 @@ void chooseTaskTimeout(std::optional<int> given, bool guarded, const Environment
         return;
     }
     const char* const set = environment(kTimeoutVariable);
-    if (set != nullptr && guarded) taskTimeoutOf(kTimeoutVariable, set);
+    if (set == nullptr || !guarded) return;
+    // The plug-in takes an empty one for 0 seconds.
+    if (*set == '\0') {
+        ::unsetenv(kTimeoutVariable);
+        return;
+    }
+    taskTimeoutOf(kTimeoutVariable, set);
 }
 
 }  // namespace host

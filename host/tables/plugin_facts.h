@@ -86,6 +86,11 @@ constexpr bool needsProduct(std::string_view command) {
     return false;
 }
 
+/// Whether the command, until it is over, may change which products and instances there are.
+constexpr bool changesWhatIsInstalled(std::string_view command) {
+    return command != kStart && command != kStop && command != kRestart;
+}
+
 /// These commands have been carried out when their request is answered. All others are queued.
 inline constexpr std::array<std::string_view, 2> kCommandsAtOnce = {kGetConfiguration,
                                                                     "COMPLETE_INSTALL"};

@@ -24,9 +24,14 @@ TaskRequest requestFor(const std::string& command) {
 const json kRow = {{"PRODUCT", "ux"}, {"VERSION", "063000000"}};
 
 TEST(Verification, KnowsAVersionInAllItsForms) {
-    for (const char* asked : {"6.3", "06.30", "06300000", "063000000"})
+    for (const char* asked : {"6.3", "06.30", "06.3", "063", "063000000"})
         EXPECT_TRUE(ctl::isSameVersion(asked, "063000000")) << asked;
-    EXPECT_FALSE(ctl::isSameVersion("6.4", "063000000"));
+    EXPECT_TRUE(ctl::isSameVersion("10", "100000000"));
+    EXPECT_TRUE(ctl::isSameVersion("7", "070000000"));
+    for (const char* asked : {"6.4", "63", "0.63", "60.3", "6.03"})
+        EXPECT_FALSE(ctl::isSameVersion(asked, "063000000")) << asked;
+    for (const char* asked : {"10", "0.1", "1.0.1"})
+        EXPECT_FALSE(ctl::isSameVersion(asked, "010000000")) << asked;
     EXPECT_FALSE(ctl::isSameVersion("", "063000000"));
     EXPECT_TRUE(ctl::isSameVersion("latest", "063000000"));
 }

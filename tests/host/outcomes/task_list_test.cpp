@@ -102,30 +102,34 @@ TEST_F(Tasks, TheOldestRunsAndTheOthersWait) {
     EXPECT_EQ(stateOf("t2"), TaskState::Failed);
 }
 
-TEST_F(Tasks, AProductIsUnfinishedFromTheReplyToTheOutcome) {
-    EXPECT_FALSE(list->unfinished("ux"));
+TEST_F(Tasks, AProductMayChangeFromTheReplyToTheOutcomeOfAnInstall) {
+    EXPECT_FALSE(list->mayChange("ux"));
     {
-        const TaskList::Request asked(*list, query("t0", "START", {{"PRODUCT", OPER_EQ, "ux"}}),
+        const TaskList::Request asked(*list, query("t0", "INSTALL", {{"PRODUCT", OPER_EQ, "ux"}}),
                                       "somebody");
-        EXPECT_FALSE(list->unfinished("ux")) << "nobody has accepted it";
+        EXPECT_FALSE(list->mayChange("ux")) << "nobody has accepted it";
     }
-    ask("t1", "START", 0, {{"PRODUCT", OPER_EQ, "ux"}});
-    ask("t2", "START", 1003, {{"PRODUCT", OPER_EQ, "um"}});
-    EXPECT_TRUE(list->unfinished("ux"));
-    EXPECT_TRUE(list->unfinished("UX"));
-    EXPECT_FALSE(list->unfinished("um")) << "refused";
-    EXPECT_FALSE(list->unfinished(""));
+    ask("t1", "INSTALL", 0, {{"PRODUCT", OPER_EQ, "ux"}});
+    ask("t2", "INSTALL", 1003, {{"PRODUCT", OPER_EQ, "um"}});
+    EXPECT_TRUE(list->mayChange("ux"));
+    EXPECT_TRUE(list->mayChange("UX"));
+    EXPECT_FALSE(list->mayChange("um")) << "refused";
+    EXPECT_FALSE(list->mayChange(""));
     publish("t1", 1024);
-    EXPECT_FALSE(list->unfinished("ux"));
+    EXPECT_FALSE(list->mayChange("ux"));
+    for (const char* command : {"START", "STOP", "RESTART"}) {
+        ask(command, command, 0, {{"PRODUCT", OPER_EQ, "ux"}});
+        EXPECT_FALSE(list->mayChange("ux")) << command;
+    }
 }
 
-TEST_F(Tasks, AnInstallThatRestartsLeavesItsProductUnfinishedUntilItsSecondOutcome) {
+TEST_F(Tasks, AProductMayChangeUntilTheSecondOutcomeOfAnInstallThatRestarts) {
     ask("t1", "INSTALL", 0,
         {{"PRODUCT", OPER_EQ, "ux"}, {"OPTIONAL", OPER_EQ, "REQUIRES_RESTART"}});
     publish("t1");
-    EXPECT_TRUE(list->unfinished("ux"));
+    EXPECT_TRUE(list->mayChange("ux"));
     publish("t1");
-    EXPECT_FALSE(list->unfinished("ux"));
+    EXPECT_FALSE(list->mayChange("ux"));
 }
 
 TEST_F(Tasks, KnowWhoAskedForWhatAndWhen) {
