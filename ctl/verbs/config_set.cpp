@@ -2,6 +2,8 @@
 
 #include <unistd.h>
 
+#include <nlohmann/json.hpp>
+
 #include "ctl/client/failure.h"
 #include "ctl/client/whole_file.h"
 #include "ctl/verbs/common_arguments.h"
@@ -24,6 +26,15 @@ void warnOfUniversalAgent(const std::string& product) {
     print({{},
            complaint("note: the host changes nothing of the universal agent by this; "
                      "ua-config imports metafiles")});
+}
+
+bool isUtf8(const std::string& text) {
+    try {
+        nlohmann::json(text).dump();
+        return true;
+    } catch (const nlohmann::json::type_error&) {
+        return false;
+    }
 }
 
 std::string textToSet(const Values& given) {
@@ -59,6 +70,10 @@ constexpr Verb kConfigSetVerb = {
 TaskRequest configurationRequest(const std::string& product, const std::string& target,
                                  const std::string& text) {
     if (text.empty()) throw Failure(kWrongUsage, "the configuration is empty");
+    if (!isUtf8(text)) {
+        throw Failure(kWrongUsage, "the configuration is not UTF-8, so its letters would be lost",
+                      "iconv -f LATIN1 -t UTF-8 converts one from Latin-1, for example.");
+    }
     warnOfUniversalAgent(product);
     TaskRequest request;
     request.command = "SETCONFIG";

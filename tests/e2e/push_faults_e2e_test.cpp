@@ -70,6 +70,17 @@ TEST_F(PushFaults, NobodyListensIsStatusThree) {
                               files_.path("nobody") + "\n");
 }
 
+TEST_F(PushFaults, WithoutAHostToAskABinaryIsNotSentUnderANameThatCostsItBytes) {
+    start();
+    const std::string file = files_.write("tool", std::string("a\r\0\x1a", 4));
+    const ProgramResult result =
+        runProgram({zavctlPath(), "--socket", files_.path("nobody"), "--rpc-socket",
+                    host_->socket() + ".rpc", "push", file, "install.sh.tar"});
+    EXPECT_EQ(result.status, 1) << result.out;
+    EXPECT_THAT(result.err, testing::HasSubstr("it is no text"));
+    EXPECT_FALSE(files_.exists("depot/install.sh.tar"));
+}
+
 TEST_F(PushFaults, AHostThatDoesNotAnswerIsStatusFour) {
     start();
     const std::string file = files_.write("file", "x");

@@ -78,9 +78,12 @@ PushCheck checkPush(const HostAddress& host, std::vector<PushedFile>& files) {
     try {
         answer = DepotClient(host).check(namesOf(files), bytesOf(files));
     } catch (const Failure& failure) {
-        // The transfer has a socket of its own, and its own words when nobody listens there.
+        // The transfer has a socket of its own, and its own words when nobody listens there. What
+        // the host would do to a file is known without asking, and it may do it all the same.
         check.whyUnknown = failure.what();
-        return check;
+        for (PushedFile& file : files)
+            file.converted = unconvertedName(file.name) != file.name;
+        return checkGuarded(files, std::move(check));
     }
     if (answer.is_null()) {
         check.whyUnknown = "the host cannot compute checksums";

@@ -28,6 +28,11 @@ TEST(ConfigSet, RefusesAnEmptyText) {
     EXPECT_THROW(configurationRequest("ux", "", ""), ctl::Failure);
 }
 
+TEST(ConfigSet, RefusesATextThatIsNotUtf8BecauseItsLettersWouldBeLost) {
+    EXPECT_THROW(configurationRequest("ux", "", "A=gr\xfcn\n"), ctl::Failure);
+    EXPECT_EQ(configurationRequest("ux", "", "A=gr\u00fcn\n").context, "A=gr\u00fcn\n");
+}
+
 TEST(ConfigSet, NotesThatTheUniversalAgentIsNotChanged) {
     for (const char* product : {"um", "UM", "Um", "uM"}) {
         EXPECT_EQ(
