@@ -23,9 +23,7 @@ bool isResolved(const CommandRequest& request) {
     if (request.targetIsInstance() || request.product().empty()) return false;
     // The plug-in itself refuses to remove an instance of the universal agent.
     if (command == plugin::kRemoveInstance) return request.product() != plugin::kUniversalAgent;
-    // A configuration may be set for an instance that is new: its name resolves to itself.
-    return command == plugin::kStart || command == plugin::kStop || command == plugin::kRestart ||
-           command == plugin::kSetConfiguration || command == plugin::kGetConfiguration;
+    return command == plugin::kStart || command == plugin::kStop || command == plugin::kRestart;
 }
 
 /// The host in "INSTANCE:HOST:CODE" or "HOST:CODE"; a name without a colon is one itself.

@@ -77,7 +77,7 @@ TEST_F(PushFaults, WithoutAHostToAskABinaryIsNotSentUnderANameThatCostsItBytes) 
         runProgram({zavctlPath(), "--socket", files_.path("nobody"), "--rpc-socket",
                     host_->socket() + ".rpc", "push", file, "install.sh.tar"});
     EXPECT_EQ(result.status, 1) << result.out;
-    EXPECT_THAT(result.err, testing::HasSubstr("it is no text"));
+    EXPECT_THAT(result.out + result.err, testing::HasSubstr("it is no text"));
     EXPECT_FALSE(files_.exists("depot/install.sh.tar"));
 }
 
