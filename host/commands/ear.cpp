@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <iterator>
+#include <new>
 #include <string_view>
 
 #include "host/commands/trace_texts.h"
@@ -65,9 +66,11 @@ std::vector<ras1::HeardUnit> heardUnits() {
 }
 
 void hearCommands() {
-    static Ear& ear = *new Ear;
-    static const ras1::Listening& listening = *new ras1::Listening(ear, heardUnits());
-    (void)listening;
+    // Never destroyed, because the plug-in's threads trace until the process ends.
+    alignas(Ear) static unsigned char earPlace[sizeof(Ear)];
+    alignas(ras1::Listening) static unsigned char place[sizeof(ras1::Listening)];
+    [[maybe_unused]] static const auto& listening =
+        *new (place) ras1::Listening(*new (earPlace) Ear, heardUnits());
 }
 
 ThreadEar::ThreadEar(std::size_t outputBytes) : recorder_(outputBytes) {
