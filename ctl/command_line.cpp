@@ -8,10 +8,10 @@
 #include <sstream>
 #include <utility>
 
-#include "ctl/verbs/foreign_words.h"
-#include "ctl/verbs/global_arguments.h"
-#include "ctl/verbs/help_page.h"
-#include "ctl/verbs/usage_mistake.h"
+#include "ctl/verbs/arguments/foreign_words.h"
+#include "ctl/verbs/arguments/global_arguments.h"
+#include "ctl/verbs/help/help_page.h"
+#include "ctl/verbs/help/usage_mistake.h"
 #include "ctl/verbs/verb_table.h"
 
 namespace ctl {

@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "ctl/show/page.h"
-#include "ctl/verbs/values.h"
+#include "ctl/verbs/arguments/values.h"
 #include "ctl/verbs/verb.h"
 
 namespace ctl {

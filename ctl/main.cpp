@@ -14,7 +14,7 @@
 #include "ctl/command_line.h"
 #include "ctl/show/page.h"
 #include "ctl/show/terminal.h"
-#include "ctl/verbs/global_arguments.h"
+#include "ctl/verbs/arguments/global_arguments.h"
 #include "ctl/verbs/invocation.h"
 
 namespace {

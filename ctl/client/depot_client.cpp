@@ -4,7 +4,7 @@
 
 #include "ctl/client/failure.h"
 #include "ctl/client/host_client.h"
-#include "ctl/client/percent_encoding.h"
+#include "ctl/client/http/percent_encoding.h"
 
 using nlohmann::json;
 

@@ -3,9 +3,9 @@
 #include <boost/beast/core/flat_buffer.hpp>
 #include <boost/beast/http.hpp>
 
-#include "ctl/client/bounded_json.h"
 #include "ctl/client/failure.h"
-#include "ctl/client/transport.h"
+#include "ctl/client/http/bounded_json.h"
+#include "ctl/client/http/transport.h"
 
 namespace http = boost::beast::http;
 using nlohmann::json;

@@ -2,9 +2,9 @@
 
 #include <utility>
 
-#include "ctl/client/bounded_json.h"
 #include "ctl/client/failure.h"
-#include "ctl/client/percent_encoding.h"
+#include "ctl/client/http/bounded_json.h"
+#include "ctl/client/http/percent_encoding.h"
 #include "ctl/client/row.h"
 
 using nlohmann::json;

@@ -8,9 +8,9 @@
 #include <string>
 
 #include "ctl/client/deadline.h"
-#include "ctl/client/event_stream.h"
 #include "ctl/client/host_address.h"
 #include "ctl/client/host_client.h"
+#include "ctl/client/http/event_stream.h"
 #include "ctl/client/task_request.h"
 
 namespace ctl {

@@ -6,12 +6,12 @@
 #include <cstdio>
 #include <nlohmann/json.hpp>
 
-#include "ctl/client/bounded_json.h"
-#include "ctl/client/event_stream.h"
+#include "ctl/client/http/bounded_json.h"
+#include "ctl/client/http/event_stream.h"
 #include "ctl/client/row.h"
 #include "ctl/show/message_catalogue.h"
 #include "ctl/show/printable.h"
-#include "ctl/verbs/global_arguments.h"
+#include "ctl/verbs/arguments/global_arguments.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
 

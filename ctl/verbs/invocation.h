@@ -4,7 +4,7 @@
 #include "ctl/client/deadline.h"
 #include "ctl/client/host_address.h"
 #include "ctl/show/page.h"
-#include "ctl/verbs/values.h"
+#include "ctl/verbs/arguments/values.h"
 
 namespace ctl {
 

@@ -10,7 +10,7 @@
 #include "ctl/show/message_catalogue.h"
 #include "ctl/show/table.h"
 #include "ctl/show/warnings.h"
-#include "ctl/verbs/condition_text.h"
+#include "ctl/verbs/arguments/condition_text.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
 

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "ctl/client/failure.h"
-#include "ctl/verbs/argument.h"
+#include "ctl/verbs/arguments/argument.h"
 
 namespace ctl {
 

@@ -22,7 +22,7 @@
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task_list.h"
 #include "host/outcomes/task_watch.h"
-#include "host/process/leftovers.h"
+#include "host/process/children/leftovers.h"
 #include "host/tables/code_page.h"
 #include "host/tables/row_queue.h"
 #include "host/tables/table_set.h"

@@ -18,7 +18,7 @@
 
 #include "host/checks/check.h"
 #include "host/depot/depot_directory.h"
-#include "host/process/run_command.h"
+#include "host/process/children/run_command.h"
 #include "host/process/start_error.h"
 #include "host/process/task_timeout.h"
 

@@ -13,7 +13,7 @@
 #include "host/commands/child_end.h"
 #include "host/commands/restart_output.h"
 #include "host/commands/trace_texts.h"
-#include "host/process/orphans.h"
+#include "host/process/children/orphans.h"
 
 namespace host {
 namespace {

@@ -1,6 +1,6 @@
 #include "host/guard/translator.h"
 
-#include "host/process/run_command.h"
+#include "host/process/children/run_command.h"
 
 namespace host {
 namespace {

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "host/process/run_command.h"
+#include "host/process/children/run_command.h"
 
 namespace host {
 

@@ -11,7 +11,7 @@
 
 #include "host/journal/journal.h"
 #include "host/outcomes/task_list.h"
-#include "host/process/leftovers.h"
+#include "host/process/children/leftovers.h"
 
 namespace host {
 

@@ -3,9 +3,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "ctl/verbs/common_arguments.h"
-#include "ctl/verbs/global_arguments.h"
-#include "ctl/verbs/help_page.h"
+#include "ctl/verbs/arguments/common_arguments.h"
+#include "ctl/verbs/arguments/global_arguments.h"
+#include "ctl/verbs/help/help_page.h"
 #include "ctl/verbs/verb_table.h"
 
 namespace {

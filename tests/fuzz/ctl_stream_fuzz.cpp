@@ -5,7 +5,7 @@
 #include <cstring>
 #include <vector>
 
-#include "ctl/client/event_parser.h"
+#include "ctl/client/http/event_parser.h"
 #include "ctl/client/transfer/rpc_wire.h"
 #include "support/fuzz_support.h"
 

@@ -6,7 +6,7 @@
 
 #include <nlohmann/json.hpp>
 
-#include "canned_host.h"
+#include "ctl/client/canned_host.h"
 #include "ctl/client/failure.h"
 
 namespace {

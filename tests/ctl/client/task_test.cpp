@@ -3,7 +3,7 @@
 
 #include <gtest/gtest.h>
 
-#include "canned_host.h"
+#include "ctl/client/canned_host.h"
 #include "ctl/client/failure.h"
 
 namespace {

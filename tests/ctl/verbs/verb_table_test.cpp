@@ -5,7 +5,7 @@
 #include <set>
 #include <string>
 
-#include "ctl/verbs/global_arguments.h"
+#include "ctl/verbs/arguments/global_arguments.h"
 
 namespace {
 

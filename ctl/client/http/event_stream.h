@@ -1,0 +1,38 @@
+/// A live subscription to a table's events.
+#pragma once
+
+#include <deque>
+#include <memory>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "ctl/client/deadline.h"
+#include "ctl/client/http/event_parser.h"
+
+namespace ctl {
+
+class EventStream {
+public:
+    enum class Result { Event, Ended, TimedOut };
+
+    /// Returns when the subscription is live: rows that come from now on are delivered. `where`
+    /// holds pairs of a column and the value that it must have. Throws Failure as HostClient does.
+    EventStream(const std::string& socketPath, const std::string& table,
+                const std::vector<std::pair<std::string, std::string>>& where, Deadline deadline);
+    ~EventStream();
+    EventStream(const EventStream&) = delete;
+    EventStream& operator=(const EventStream&) = delete;
+
+    /// Waits for the next event. Ended means that the host closed the stream or went away. After
+    /// TimedOut the stream is closed.
+    Result next(Deadline deadline, ServerEvent& event, const Ticker& tick = {});
+
+private:
+    struct Connection;
+    std::unique_ptr<Connection> connection_;
+    EventParser parser_;
+    std::deque<ServerEvent> pending_;
+};
+
+}  // namespace ctl

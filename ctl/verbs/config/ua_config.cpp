@@ -1,0 +1,61 @@
+// ua-config: imports a metafile and its scripts from the depot into the universal agent.
+
+#include "ctl/client/failure.h"
+#include "ctl/client/guarded.h"
+#include "ctl/verbs/arguments/common_arguments.h"
+#include "ctl/verbs/invocation.h"
+#include "ctl/verbs/tasks/queued.h"
+#include "ctl/verbs/verb_table.h"
+
+namespace ctl {
+namespace {
+
+constexpr Argument kMetafile =
+    textOption("--metafile", "Metafile in the depot").completedBy(Completion::DepotFile);
+constexpr Argument kScripts =
+    textOption("--scripts", "Scripts in the depot, separated by commas").called("A,B");
+constexpr Argument kPort = numberOption("--port", "Port of the agent's console").between(1, 65535);
+constexpr Argument kRestart =
+    flag("--restart",
+         "Add the metafile's data provider to those that are started, which restarts\n"
+         "the agent when it is not among them yet");
+constexpr Argument kArguments[] = {kMetafile, kScripts, kPort,   kRestart,
+                                   kTarget,   kForce,   kNoWait, kTransid};
+
+std::string contextOf(const Values& given) {
+    std::string text;
+    if (given.number(kPort) != 0) text = "PORT=" + std::to_string(given.number(kPort));
+    if (given.flag(kRestart)) text += std::string(text.empty() ? "" : ",") + "RESTART=Y";
+    return text;
+}
+
+ExitStatus run(const Invocation& invocation) {
+    const Values& given = invocation.given;
+    // The host takes scripts alone for done, and copies none.
+    if (given.text(kMetafile).empty() && isGuarded(invocation.host, invocation.deadline())) {
+        throw Failure(kWrongUsage, "ua-config imports nothing without a metafile",
+                      "Name one of the depot with --metafile.");
+    }
+    TaskRequest request;
+    request.command = "SETCONFIG";
+    request.product = "um";
+    request.isForced = given.flag(kForce);
+    request.context = contextOf(given);
+    request.uaconfig = given.text(kMetafile);
+    request.uascript = given.text(kScripts);
+    request.targetmsn = given.text(kTarget);
+    return runQueued(invocation, queuedCommand(invocation, request, "ua-config"));
+}
+
+}  // namespace
+
+constexpr Verb kUaConfigVerb = {
+    "ua-config",
+    "Import a metafile and its scripts from the depot into the universal agent",
+    kArguments,
+    {"zavctl ua-config --metafile disks.mdl --scripts disks.sh --restart",
+     "zavctl ua-config --metafile disks.mdl --port 7700"},
+    run,
+};
+
+}  // namespace ctl

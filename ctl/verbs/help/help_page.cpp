@@ -1,0 +1,174 @@
+#include "ctl/verbs/help/help_page.h"
+
+#include <algorithm>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "ctl/verbs/arguments/global_arguments.h"
+#include "ctl/verbs/verb_table.h"
+
+namespace ctl {
+namespace {
+
+/// A name and what it stands for.
+using Entry = std::pair<std::string, std::string>;
+using Entries = std::vector<Entry>;
+
+constexpr std::size_t kColumns = 80;
+constexpr std::size_t kWidestName = 24;
+
+constexpr const char* kExitStatuses =
+    "\nExit status: 0 success; 1 the task failed or the host refused it; 2 wrong\n"
+    "usage; 3 no host reached; 4 no outcome within --timeout; 130 interrupted.\n";
+
+/// The text in lines of at most `width` letters, broken at blanks. Its own line ends count as
+/// blanks.
+std::vector<std::string> wrapped(std::string_view text, std::size_t width) {
+    std::vector<std::string> lines(1);
+    while (!text.empty()) {
+        const std::size_t end = std::min(text.find_first_of(" \n"), text.size());
+        const std::string_view word = text.substr(0, end);
+        text.remove_prefix(std::min(end + 1, text.size()));
+        std::string& line = lines.back();
+        if (line.empty()) {
+            line = word;
+        } else if (line.size() + 1 + word.size() <= width) {
+            line += ' ';
+            line += word;
+        } else {
+            lines.emplace_back(word);
+        }
+    }
+    return lines;
+}
+
+/// The entries below a title, in two columns; nothing if there are none.
+std::string section(const std::string& title, const Entries& entries) {
+    if (entries.empty()) return {};
+    std::size_t names = 0;
+    for (const Entry& entry : entries)
+        names = std::max(names, std::min(entry.first.size(), kWidestName));
+    const std::size_t indent = names + 4;
+    std::string text = "\n" + title + ":\n";
+    for (const auto& [name, help] : entries) {
+        text += "  " + name;
+        std::size_t at = name.size() + 2;
+        if (name.size() > kWidestName) {
+            text += '\n';
+            at = 0;
+        }
+        for (const std::string& line : wrapped(help, kColumns - indent)) {
+            text += std::string(indent - at, ' ') + line + '\n';
+            at = 0;
+        }
+    }
+    return text;
+}
+
+std::string valueNameOf(const Argument& argument) {
+    if (argument.valueName != nullptr) return argument.valueName;
+    switch (argument.type) {
+        case Argument::Type::Number:
+            return "N";
+        case Argument::Type::Seconds:
+            return "SECONDS";
+        case Argument::Type::Text:
+        case Argument::Type::Texts:
+            break;
+    }
+    return "TEXT";
+}
+
+std::string nameOf(const Argument& argument) {
+    if (argument.kind != Argument::Kind::Option) return argument.name;
+    return std::string(argument.name) + " " + valueNameOf(argument);
+}
+
+std::string helpOf(const Argument& argument) {
+    std::string help = argument.help;
+    if (argument.fallback != nullptr)
+        help += std::string("; ") + argument.fallback + " if not given";
+    if (argument.excludes != nullptr) help += std::string("; not with ") + argument.excludes;
+    if (argument.needs != nullptr) help += std::string("; only with ") + argument.needs;
+    return help;
+}
+
+Entries entriesOf(const ArgumentList& arguments, bool positionals) {
+    Entries entries;
+    for (const Argument& argument : arguments) {
+        const bool isPositional = argument.kind == Argument::Kind::Positional;
+        if (argument.isHidden || isPositional != positionals) continue;
+        entries.emplace_back(nameOf(argument), helpOf(argument));
+    }
+    return entries;
+}
+
+std::string globalOptions(const std::string& title) {
+    Entries entries = entriesOf(kGlobalArguments, false);
+    entries.emplace_back("-h, --help", "Print the help");
+    entries.emplace_back("--version", "Print the version");
+    return section(title, entries);
+}
+
+/// "PRODUCT [TEXT]", "[VERB...]".
+std::string positionalsOf(const Verb& verb) {
+    std::string words;
+    for (const Argument& argument : verb.arguments) {
+        if (argument.isHidden || argument.kind != Argument::Kind::Positional) continue;
+        std::string word = argument.name;
+        if (argument.type == Argument::Type::Texts) word += "...";
+        words += argument.isRequired ? " " + word : " [" + word + "]";
+    }
+    return words;
+}
+
+/// Whether the verb stands in the group, and is not just called alike.
+bool isIn(const Verb& verb, const VerbGroup& group) {
+    return std::string(verb.name).rfind(std::string(group.name) + " ", 0) == 0;
+}
+
+/// A line for each verb, groups being one line.
+Entries commands() {
+    Entries entries;
+    const VerbGroup* last = nullptr;
+    for (const Verb* const verb : kVerbs) {
+        const auto group = std::find_if(std::begin(kVerbGroups), std::end(kVerbGroups),
+                                        [verb](const VerbGroup& one) { return isIn(*verb, one); });
+        if (group == std::end(kVerbGroups)) {
+            entries.emplace_back(verb->name, verb->help);
+        } else if (last != &*group) {
+            last = &*group;
+            entries.emplace_back(group->name, group->help);
+        }
+    }
+    return entries;
+}
+
+}  // namespace
+
+std::string programHelp() {
+    return "Manages the monitoring agents of one host.\n\nUsage: zavctl [OPTIONS] COMMAND ...\n" +
+           section("Commands", commands()) + globalOptions("Options of every command") +
+           "\nzavctl help COMMAND explains a command, with examples.\n" + kExitStatuses;
+}
+
+std::string groupHelp(const VerbGroup& group) {
+    Entries entries;
+    for (const Verb* const verb : kVerbs) {
+        if (isIn(*verb, group)) entries.emplace_back(verb->name, verb->help);
+    }
+    return std::string(group.help) + ".\n\nUsage: zavctl " + group.name + " COMMAND ...\n" +
+           section("Commands", entries) + "\nzavctl help " + group.name +
+           " COMMAND explains a command, with examples.\n";
+}
+
+std::string verbHelp(const Verb& verb) {
+    return std::string(verb.help) + ".\n\nUsage: zavctl " + verb.name + " [OPTIONS]" +
+           positionalsOf(verb) + "\n" + section("Arguments", entriesOf(verb.arguments, true)) +
+           section("Options", entriesOf(verb.arguments, false)) +
+           globalOptions("Options of every command") + "\nExamples:\n  " + verb.examples[0] +
+           "\n  " + verb.examples[1] + "\n" + kExitStatuses;
+}
+
+}  // namespace ctl

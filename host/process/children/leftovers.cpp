@@ -1,0 +1,83 @@
+#include "host/process/children/leftovers.h"
+
+#include <signal.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <fstream>
+#include <iterator>
+#include <map>
+#include <optional>
+
+#include "host/process/children/process_table.h"
+
+namespace host {
+namespace {
+
+constexpr const char* kVariable = "ZAVHOST_RUN";
+
+/// The environment that a process was started with; empty when it may not be read.
+std::string environmentOf(pid_t pid) {
+    std::ifstream file("/proc/" + std::to_string(pid) + "/environ", std::ios::binary);
+    return {std::istreambuf_iterator<char>(file), {}};
+}
+
+/// "RUN-SESSION" from the mark in an environment; nothing if there is none of this journal.
+std::optional<std::string> runIn(const std::string& environment, const std::string& mark) {
+    const std::string text = '\0' + environment;
+    const std::size_t at = text.find('\0' + mark);
+    if (at == std::string::npos) return std::nullopt;
+    const std::size_t begin = at + 1 + mark.size();
+    return text.substr(begin, text.find('\0', begin) - begin);
+}
+
+pid_t sessionIn(const std::string& run) {
+    return static_cast<pid_t>(std::atol(run.substr(run.find('-') + 1).c_str()));
+}
+
+}  // namespace
+
+Leftovers::Leftovers(const std::string& journal, long long run)
+    : mark_(std::string(kVariable) + '=' + journal + '-'),
+      ownRun_(std::to_string(run) + '-' + std::to_string(::getsid(0))) {
+    ::setenv(kVariable, (journal + '-' + ownRun_).c_str(), 1);
+}
+
+std::vector<pid_t> Leftovers::alive() const {
+    const std::vector<ProcessEntry> processes = readProcesses();
+    std::map<pid_t, pid_t> sessions;  // of those that are left over, the session of their host
+    for (const ProcessEntry& process : processes) {
+        if (!process.isAlive || process.pid == ::getpid()) continue;
+        const auto run = runIn(environmentOf(process.pid), mark_);
+        if (run && *run != ownRun_) sessions[process.pid] = sessionIn(*run);
+    }
+    // Descendants that have another environment: a generation in each round.
+    for (bool grows = !sessions.empty(); grows;) {
+        grows = false;
+        for (const ProcessEntry& process : processes) {
+            const auto parent = sessions.find(process.parent);
+            if (parent == sessions.end() || !process.isAlive) continue;
+            grows = sessions.emplace(process.pid, parent->second).second || grows;
+        }
+    }
+    std::vector<pid_t> found;
+    for (const ProcessEntry& process : processes) {
+        const auto leftOver = sessions.find(process.pid);
+        if (leftOver == sessions.end() || process.pid == ::getpid()) continue;
+        if (process.session == leftOver->second) found.push_back(process.pid);
+    }
+    return found;
+}
+
+bool Leftovers::gone() const {
+    if (!gone_ && alive().empty()) gone_ = true;
+    return gone_;
+}
+
+void Leftovers::end() const {
+    for (const pid_t pid : alive())
+        ::kill(pid, SIGKILL);
+}
+
+}  // namespace host

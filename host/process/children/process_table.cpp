@@ -1,0 +1,81 @@
+#include "host/process/children/process_table.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <charconv>
+#include <memory>
+#include <string>
+
+#include "host/process/file_descriptor.h"
+
+namespace host {
+namespace {
+
+/// Takes the next field off a text whose fields blanks separate.
+std::string_view takeField(std::string_view& text) {
+    text.remove_prefix(std::min(text.find_first_not_of(' '), text.size()));
+    const std::string_view field = text.substr(0, text.find(' '));
+    text.remove_prefix(field.size());
+    return field;
+}
+
+template <typename Number>
+Number numberIn(std::string_view text) {
+    Number number = 0;
+    std::from_chars(text.data(), text.data() + text.size(), number);
+    return number;
+}
+
+struct CloseDirectory {
+    void operator()(DIR* directory) const { ::closedir(directory); }
+};
+
+std::optional<ProcessEntry> readProcess(const char* pid) {
+    const std::string path = std::string("/proc/") + pid + "/stat";
+    const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    if (!file) return std::nullopt;
+    std::array<char, 1024> text{};
+    const ssize_t length = ::read(file.get(), text.data(), text.size());
+    if (length <= 0) return std::nullopt;
+    return processIn({text.data(), static_cast<std::size_t>(length)});
+}
+
+}  // namespace
+
+std::vector<ProcessEntry> readProcesses() {
+    std::vector<ProcessEntry> processes;
+    const std::unique_ptr<DIR, CloseDirectory> directory(::opendir("/proc"));
+    if (directory == nullptr) return processes;
+    while (const dirent* const entry = ::readdir(directory.get())) {
+        if (entry->d_name[0] < '1' || entry->d_name[0] > '9') continue;
+        if (const auto process = readProcess(entry->d_name)) processes.push_back(*process);
+    }
+    return processes;
+}
+
+std::optional<ProcessEntry> processIn(std::string_view stat) {
+    // The second field is the program's name, which may hold blanks and parentheses.
+    const std::size_t nameEnd = stat.rfind(')');
+    if (nameEnd == std::string_view::npos) return std::nullopt;
+    ProcessEntry process;
+    process.pid = numberIn<pid_t>(stat);
+    std::string_view rest = stat.substr(nameEnd + 1);
+    const std::string_view state = takeField(rest);
+    process.isAlive = state != "Z" && state != "X" && state != "x";
+    process.parent = numberIn<pid_t>(takeField(rest));
+    takeField(rest);  // the process group
+    process.session = numberIn<pid_t>(takeField(rest));
+    constexpr int kFieldsBeforeStart = 15;
+    for (int i = 0; i < kFieldsBeforeStart; ++i)
+        takeField(rest);
+    const std::string_view start = takeField(rest);
+    if (start.empty() || process.pid <= 0) return std::nullopt;
+    process.start = numberIn<unsigned long long>(start);
+    return process;
+}
+
+}  // namespace host

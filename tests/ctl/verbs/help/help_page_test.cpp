@@ -1,0 +1,66 @@
+#include "ctl/verbs/help/help_page.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+#include "ctl/verbs/verb_table.h"
+
+namespace {
+
+using testing::HasSubstr;
+using testing::Not;
+
+void expectToFit(const std::string& text) {
+    std::istringstream lines(text);
+    for (std::string line; std::getline(lines, line);)
+        EXPECT_LE(line.size(), 80U) << line;
+}
+
+TEST(Help, ListsEveryVerbAndGroup) {
+    const std::string text = ctl::programHelp();
+    for (const ctl::Verb* const verb : ctl::kVerbs) {
+        const std::string name = verb->name;
+        EXPECT_THAT(text, HasSubstr("\n  " + name.substr(0, name.find(' ')) + " "));
+    }
+    EXPECT_THAT(text, HasSubstr("660 if not"));
+    EXPECT_THAT(text, HasSubstr("  --json "));
+    expectToFit(text);
+}
+
+TEST(Help, OfAVerbHasItsArgumentsThoseOfAllAndTwoExamples) {
+    for (const ctl::Verb* const verb : ctl::kVerbs) {
+        const std::string name = verb->name;
+        const std::string text = ctl::verbHelp(*verb);
+        EXPECT_THAT(text, HasSubstr(verb->help));
+        EXPECT_THAT(text, HasSubstr("Usage: zavctl " + name + " [OPTIONS]"));
+        EXPECT_THAT(text, HasSubstr("\n  --socket PATH"));
+        for (const ctl::Argument& argument : verb->arguments) {
+            const bool isShown =
+                text.find(std::string("\n  ") + argument.name) != std::string::npos;
+            EXPECT_EQ(isShown, !argument.isHidden) << name << " " << argument.name;
+        }
+        for (const char* const example : verb->examples)
+            EXPECT_THAT(text, HasSubstr(std::string("\n  ") + example + "\n"));
+        EXPECT_THAT(text, Not(HasSubstr("FLOAT")));
+        expectToFit(text);
+    }
+}
+
+TEST(Help, SaysWhichArgumentsMayBeLeftOutAndWhichDoNotGoTogether) {
+    EXPECT_THAT(ctl::verbHelp(ctl::kStartVerb),
+                HasSubstr("Usage: zavctl start [OPTIONS] PRODUCT\n"));
+    EXPECT_THAT(ctl::verbHelp(ctl::kConfigSetVerb), HasSubstr(" [OPTIONS] PRODUCT [TEXT]\n"));
+    EXPECT_THAT(ctl::verbHelp(ctl::kHelpVerb), HasSubstr(" [OPTIONS] [VERB...]\n"));
+    EXPECT_THAT(ctl::verbHelp(ctl::kStartVerb), HasSubstr("; not with --target\n"));
+    EXPECT_THAT(ctl::verbHelp(ctl::kInstallVerb), HasSubstr("only with --restart"));
+}
+
+TEST(Help, OfAGroupListsItsVerbs) {
+    const std::string text = ctl::groupHelp(*ctl::findVerbGroup("config"));
+    for (const char* name : {"get", "set", "edit"})
+        EXPECT_THAT(text, HasSubstr(std::string("\n  config ") + name + " "));
+}
+
+}  // namespace
