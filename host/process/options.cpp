@@ -5,6 +5,7 @@
 #include <charconv>
 #include <filesystem>
 #include <system_error>
+#include <variant>
 #include <vector>
 
 #include "host/process/start_error.h"
@@ -21,7 +22,7 @@ constexpr int kHighestPort = 65535;
 
 /// The command line as it was typed; a missing option is an absent value.
 struct Typed {
-    std::string home;
+    std::optional<std::string> home;
     std::optional<std::string> socket;
     std::optional<std::string> rpcSocket;
     std::optional<std::string> rpcPort;
@@ -31,70 +32,84 @@ struct Typed {
     std::optional<std::string> maxQueued;
     std::optional<std::string> keepTasks;
     std::optional<std::string> keepRows;
-    std::optional<std::string> onInterrupt;
     std::optional<std::string> orphanWait;
+    std::optional<std::string> onInterrupt;
     std::optional<std::string> taskTimeout;
     bool noJournal = false;
-    bool unguarded = false;
     bool traceSecrets = false;
     bool check = false;
+    bool unguarded = false;
+};
+
+using ValueOf = std::optional<std::string> Typed::*;
+using FlagOf = bool Typed::*;
+
+/// One option of the command line.
+struct OptionRow {
+    const char* name;
+    const char* value;  ///< the word for its value; null: it is a flag
+    const char* help;
+    std::variant<ValueOf, FlagOf> place;  ///< where it goes
+};
+
+/// In the order of the help.
+const OptionRow kOptions[] = {
+    {"--home", "DIR", "The home directory; else TOVRINHOME names it", &Typed::home},
+    {"--socket", "PATH",
+     "The socket for HTTP; else ZAV_SOCKET, XDG_RUNTIME_DIR/zavhost.sock or /run/zavhost.sock",
+     &Typed::socket},
+    {"--rpc-socket", "PATH",
+     "The socket for file transfers; else the other's name with .rpc appended", &Typed::rpcSocket},
+    {"--rpc-port", "N",
+     "A TCP port, 1 to 65535, that takes file transfers from this machine as well",
+     &Typed::rpcPort},
+    {"--origin-node", "NAME", "The name of the node that this host stands for; else the machine's",
+     &Typed::originNode},
+    {"--plugin", "FILE",
+     "The plug-in; else libzavmgmt.so in ../lib beside this program or where the loader looks",
+     &Typed::plugin},
+    {"--state", "DIR",
+     "The directory for what the host itself keeps; else STATE_DIRECTORY or HOME/zavhost",
+     &Typed::state},
+    {"--no-journal", nullptr, "Keep tasks in memory only; they end with the process",
+     &Typed::noJournal},
+    {"--max-queued", "N", "How many tasks may wait, 1 to 1000000; 1000 if not given",
+     &Typed::maxQueued},
+    {"--keep-tasks", "DAYS",
+     "How many days tasks that are over are kept, 1 to 36500; 30 if not given", &Typed::keepTasks},
+    {"--keep-rows", "N", "How many rows of outcomes are kept, 1 to 100000000; 10000 if not given",
+     &Typed::keepRows},
+    {"--orphan-wait", "SECONDS",
+     "How long the host waits for commands of an earlier run before it kills them, 1 to 86400; as "
+     "long as a command may run if not given",
+     &Typed::orphanWait},
+    {"--on-interrupt", "keep|rerun",
+     "What becomes of a task in whose midst the host was killed: keep notes that, rerun runs it "
+     "again; keep if not given",
+     &Typed::onInterrupt},
+    {"--task-timeout", "SECONDS",
+     "How long one command of a task may run; else TIMEOUT says so, else 300", &Typed::taskTimeout},
+    {"--trace-secrets", nullptr, "Show passwords and configurations in the trace log as they are",
+     &Typed::traceSecrets},
+    {"--check", nullptr,
+     "Check the home and the machine, print what was found, and end; the status is 1 if the host "
+     "would refuse to start",
+     &Typed::check},
+    {"--unguarded", nullptr,
+     "Switch off every guard, so that the plug-in does exactly what it is told", &Typed::unguarded},
 };
 
 void declare(CLI::App& app, Typed& typed) {
     app.set_version_flag("--version", kVersion, "Print the version and end");
     app.set_help_flag("-h,--help", "Print this help and end");
-    app.add_option("--home", typed.home, "The home directory; else TOVRINHOME names it")
-        ->type_name("DIR");
-    app.add_option("--socket", typed.socket,
-                   "The socket for HTTP; else ZAV_SOCKET, XDG_RUNTIME_DIR/zavhost.sock or "
-                   "/run/zavhost.sock")
-        ->type_name("PATH");
-    app.add_option("--rpc-socket", typed.rpcSocket,
-                   "The socket for file transfers; else the other's name with .rpc appended")
-        ->type_name("PATH");
-    app.add_option("--rpc-port", typed.rpcPort,
-                   "A TCP port, 1 to 65535, that takes file transfers from this machine as well")
-        ->type_name("N");
-    app.add_option("--origin-node", typed.originNode,
-                   "The name of the node that this host stands for; else the machine's")
-        ->type_name("NAME");
-    app.add_option("--plugin", typed.plugin,
-                   "The plug-in; else libzavmgmt.so in ../lib beside this program or where the "
-                   "loader looks")
-        ->type_name("FILE");
-    app.add_option("--state", typed.state,
-                   "The directory for what the host itself keeps; else STATE_DIRECTORY or "
-                   "HOME/zavhost")
-        ->type_name("DIR");
-    app.add_flag("--no-journal", typed.noJournal,
-                 "Keep tasks in memory only; they end with the process");
-    app.add_option("--max-queued", typed.maxQueued,
-                   "How many tasks may wait, 1 to 1000000; 1000 if not given")
-        ->type_name("N");
-    app.add_option("--keep-tasks", typed.keepTasks,
-                   "How many days tasks that are over are kept, 1 to 36500; 30 if not given")
-        ->type_name("DAYS");
-    app.add_option("--keep-rows", typed.keepRows,
-                   "How many rows of outcomes are kept, 1 to 100000000; 10000 if not given")
-        ->type_name("N");
-    app.add_option("--orphan-wait", typed.orphanWait,
-                   "How long the host waits for commands of an earlier run before it kills them, 1 "
-                   "to 86400; as long as a command may run if not given")
-        ->type_name("SECONDS");
-    app.add_option("--on-interrupt", typed.onInterrupt,
-                   "What becomes of a task in whose midst the host was killed: keep notes that, "
-                   "rerun runs it again; keep if not given")
-        ->type_name("keep|rerun");
-    app.add_option("--task-timeout", typed.taskTimeout,
-                   "How long one command of a task may run; else TIMEOUT says so, else 300")
-        ->type_name("SECONDS");
-    app.add_flag("--trace-secrets", typed.traceSecrets,
-                 "Show passwords and configurations in the trace log as they are");
-    app.add_flag("--check", typed.check,
-                 "Check the home and the machine, print what was found, and end; the status is 1 "
-                 "if the host would refuse to start");
-    app.add_flag("--unguarded", typed.unguarded,
-                 "Switch off every guard, so that the plug-in does exactly what it is told");
+    for (const OptionRow& row : kOptions) {
+        if (const FlagOf* const flag = std::get_if<FlagOf>(&row.place)) {
+            app.add_flag(row.name, typed.**flag, row.help);
+        } else {
+            app.add_option(row.name, typed.*std::get<ValueOf>(row.place), row.help)
+                ->type_name(row.value);
+        }
+    }
 }
 
 std::vector<std::string> namesOf(const CLI::App& app) {
@@ -152,8 +167,9 @@ std::string absolutePath(const std::string& path) {
     return fs::path(path).is_absolute() ? path : fs::absolute(path).string();
 }
 
-std::string usableHome(const std::string& given, const Environment& environment) {
-    const std::string home = given.empty() ? valueOf(environment, "TOVRINHOME") : given;
+std::string usableHome(const std::optional<std::string>& given, const Environment& environment) {
+    const bool isGiven = given && !given->empty();
+    const std::string home = isGiven ? *given : valueOf(environment, "TOVRINHOME");
     if (home.empty()) throw StartError("no home: give --home DIR or set TOVRINHOME");
     std::error_code error;
     const fs::file_status status = fs::status(home, error);
@@ -175,16 +191,6 @@ std::string stateDirectory(const Typed& typed, const std::string& home,
     const std::string provided = valueOf(environment, "STATE_DIRECTORY");
     return provided.empty() ? home + "/zavhost"
                             : absolutePath(provided.substr(0, provided.find(':')));
-}
-
-std::uint16_t portOf(const std::string& text) {
-    int port = 0;
-    const char* const end = text.data() + text.size();
-    const auto [rest, error] = std::from_chars(text.data(), end, port);
-    if (error != std::errc() || rest != end || port < 1 || port > kHighestPort) {
-        throw StartError("--rpc-port takes a number from 1 to 65535, not \"" + text + "\"");
-    }
-    return static_cast<std::uint16_t>(port);
 }
 
 /// A whole number from 1 to `most`; `otherwise` when the option was not given.
@@ -244,7 +250,10 @@ std::optional<HostOptions> readOptions(int argc, const char* const* argv,
     options.plugin = typed->plugin;
     options.home = usableHome(typed->home, environment);
     options.state = stateDirectory(*typed, options.home, environment);
-    if (typed->rpcPort) options.rpcPort = portOf(*typed->rpcPort);
+    if (typed->rpcPort) {
+        options.rpcPort =
+            static_cast<std::uint16_t>(countOf("--rpc-port", typed->rpcPort, kHighestPort, 1));
+    }
     if (typed->taskTimeout)
         options.taskTimeout = taskTimeoutOf("--task-timeout", *typed->taskTimeout);
     chooseSockets(*typed, environment, options);
