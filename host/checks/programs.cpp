@@ -77,12 +77,13 @@ Finding checkUninstaller(CheckSubject& subject) {
 }
 
 /// Only requests about the universal agent run the console. On a home without that agent nobody
-/// misses it, and such homes have worked without it.
+/// misses it.
 Finding checkConsole(CheckSubject& subject) {
-    const bool needed = subject.inventory().has("um");
-    return look(subject.inHome("bin/um_console"), needed ? Verdict::Error : Verdict::Warning,
-                needed ? "the universal agent cannot be configured"
-                       : "needed once the universal agent um is installed");
+    if (!subject.inventory().has("um")) {
+        return {Verdict::Ok, "only the universal agent um needs it, which is not installed", ""};
+    }
+    return look(subject.inHome("bin/um_console"), Verdict::Error,
+                "the universal agent cannot be configured");
 }
 
 }  // namespace host

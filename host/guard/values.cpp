@@ -34,17 +34,35 @@ constexpr Form kTarget = {plugin::kTargetColumn, "a managed system name", "._-:/
 constexpr Form kInstance = {plugin::kTargetColumn, "the name of an instance", "._-",
                             "letters, digits and . _ -"};
 
+/// Whether a part of it, between the separators of managed system names, is "." or "..". Where such
+/// a part becomes a part of a path, that path names another directory.
+bool namesADirectory(std::string_view value) {
+    while (true) {
+        const std::size_t end = value.find_first_of(":/");
+        const std::string_view part = value.substr(0, end);
+        if (part == "." || part == "..") return true;
+        if (end == std::string_view::npos) return false;
+        value.remove_prefix(end + 1);
+    }
+}
+
 void check(const CommandRequest& request, const Form& form, const CodePage& codePage) {
     const std::string& value = request.value(form.column);
     const bool fits = std::all_of(value.begin(), value.end(), [&form](char c) {
         return isLetterOrDigit(c) || form.others.find(c) != std::string_view::npos;
     });
+    const auto refuse = [&](const std::string& hint) {
+        throw Refusal(
+            "values",
+            std::string(form.column) + " " + quoted(value, codePage) + " is not " + form.what, hint,
+            Refusal::Kind::Malformed);
+    };
     // Programs would take a name that begins with "-" for an option.
-    if (fits && (value.empty() || value.front() != '-')) return;
-    throw Refusal(
-        "values", std::string(form.column) + " " + quoted(value, codePage) + " is not " + form.what,
-        std::string("it is made of ASCII ") + form.described + ", and does not begin with -",
-        Refusal::Kind::Malformed);
+    if (!fits || (!value.empty() && value.front() == '-')) {
+        refuse(std::string("it is made of ASCII ") + form.described +
+               ", and does not begin with -");
+    }
+    if (namesADirectory(value)) refuse("no part of it is . or .., which name directories");
 }
 
 }  // namespace

@@ -51,6 +51,19 @@ TEST_F(ValuesGuard, AnInstanceIsNoManagedSystemName) {
         << "only a START takes an instance's name";
 }
 
+TEST_F(ValuesGuard, RefusesNamesOfDirectories) {
+    EXPECT_EQ(refusalOf(command("INSTALL", "ux", {{"VERSION", ".."}})),
+              "values 400: VERSION \"..\" is not a version; no part of it is . or .., which name "
+              "directories");
+    EXPECT_EQ(refuser(command("INSTALL", "ux", {{"VERSION", "."}})), "values");
+    for (const char* target : {".", "..", "../..", "../x:UX", "a/../b:UX", "..:host:UX", "a:.:UX"})
+        EXPECT_EQ(ofTarget(target), "values") << target;
+    for (const char* name : {".", ".."})
+        EXPECT_EQ(ofInstance(name), "values") << name;
+    EXPECT_EQ(ofInstance("..."), "") << "a name like any other";
+    EXPECT_EQ(ofTarget("a..b:UX"), "");
+}
+
 TEST_F(ValuesGuard, ShowsLongValuesInPart) {
     const std::string refusal = refusalOf(command("START", std::string(100'000, '.')));
     EXPECT_LT(refusal.size(), 400U);
