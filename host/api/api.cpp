@@ -40,7 +40,9 @@ Answer answerTo(Services& services, Call& call) {
     } catch (const DepotError& error) {
         return errorReply(statusOf(error.kind()), error.what());
     } catch (const NotKept& failure) {
-        Reply reply = errorReply(503, failure.what());
+        Reply reply = failure.guard().empty()
+                          ? errorReply(503, failure.what())
+                          : guardReply(503, failure.what(), failure.guard(), "");
         reply.fields.emplace_back("Retry-After", "5");
         return reply;
     } catch (const QueryFailed& failed) {

@@ -6,6 +6,7 @@
 #include <stdexcept>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "host/outcomes/task.h"
@@ -15,7 +16,15 @@ namespace host {
 /// A change could not be kept, so it has not happened; what() says why.
 class NotKept : public std::runtime_error {
 public:
-    using std::runtime_error::runtime_error;
+    /// `guard` is the name of the guard without which the request would have gone on all the same;
+    /// empty if it would not have.
+    explicit NotKept(const std::string& reason, std::string guard = "")
+        : std::runtime_error(reason), guard_(std::move(guard)) {}
+
+    const std::string& guard() const { return guard_; }
+
+private:
+    std::string guard_;
 };
 
 /// The task has gone on meanwhile, so that the change would be a step back.

@@ -101,8 +101,8 @@ std::uint64_t TaskList::add(const Query& query, std::string asker, bool forced) 
     task.run = keeper_.run();
     try {
         keeper_.enter(task);
-    } catch (const NotKept&) {
-        if (guarded_) throw;
+    } catch (const NotKept& failure) {
+        if (guarded_) throw NotKept(failure.what(), "journal");
         return 0;
     }
     return insert(std::move(task));
