@@ -20,6 +20,7 @@
 #include "host/checks/check_list.h"
 #include "host/commands/recorder.h"
 #include "host/depot/depot_directory.h"
+#include "host/home/parameter_copy.h"
 #include "host/home/temporary_directory.h"
 #include "host/http/server.h"
 #include "host/process/children/orphans.h"
@@ -95,12 +96,50 @@ void refuseUnfitHome(const HostOptions& options) {
     std::fputs(warnings.c_str(), stderr);
 }
 
+/// The port can be reached from where the sockets' files cannot, and what comes through it must not
+/// replace the home's programs.
+void refuseHomeOnPort(const HostOptions& options, const DepotDirectory& depot) {
+    if (!options.guarded || !options.rpcPort || !holdsHome(depot, options.home)) return;
+    throw StartError("--rpc-port: the depot " + depot.path +
+                     " holds the home itself, whose programs a transfer could replace; name "
+                     "another directory in " +
+                     kDepotVariable);
+}
+
+/// What a host that was killed has left of the universal agent's start-up parameters.
+void restoreParameters(const std::string& home) {
+    const ParameterCopy copy(home);
+    try {
+        if (!copy.restore()) return;
+    } catch (const std::system_error& error) {
+        throw StartError(error.what());
+    }
+    std::fprintf(
+        stderr,
+        "zavhost: restored %s, which was cut off while a task changed it; look whether the "
+        "change is to be made again\n",
+        copy.file().c_str());
+}
+
 /// What a guarded host does before anything of the home is used. Returns the home's lock.
 HomeLock guardStart(const HostOptions& options) {
+    takeWritePermissionFromOthers();
     HomeLock lock(options.home);
+    restoreParameters(options.home);
     refuseUnfitHome(options);
     provideTemporaryDirectory(options.home);
     return lock;
+}
+
+/// Unguarded hosts may share a home, as processes that load the plug-in themselves may. Their
+/// operator should know.
+void warnOfOwner(const std::string& home) {
+    const std::string owner = HomeLock::ownerOf(home);
+    if (owner.empty()) return;
+    std::fprintf(stderr,
+                 "zavhost: warning: home %s is in use by %s; both will run commands there at the "
+                 "same time\n",
+                 home.c_str(), owner.c_str());
 }
 
 /// The trace is the host's only log; what it prints itself goes to its standard outputs.
@@ -139,10 +178,13 @@ Journal::Settings journalOf(const HostOptions& options) {
 
 void run(const HostOptions& options) {
     ras1::showSecrets(options.traceSecrets || !options.guarded);
-    // Unguarded hosts may share a home, as processes that load the plug-in themselves may.
     std::optional<HomeLock> homeLock;
     chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);
-    if (options.guarded) homeLock.emplace(guardStart(options));
+    if (options.guarded) {
+        homeLock.emplace(guardStart(options));
+    } else {
+        warnOfOwner(options.home);
+    }
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
     SocketFile socket(options.socket);
     SocketFile transferSocket(options.rpcSocket);
@@ -151,6 +193,7 @@ void run(const HostOptions& options) {
     const int childDescriptor = options.guarded ? catchSignals({SIGCHLD}) : -1;
     const DepotDirectory depot =
         depotDirectoryOf(options.home, std::getenv(kDepotVariable), options.guarded);
+    refuseHomeOnPort(options, depot);
     provideDepotDirectory(depot);
     Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
                       options.guarded, {depot.path, options.state}, journalOf(options));

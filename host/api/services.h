@@ -2,7 +2,6 @@
 #pragma once
 
 #include <chrono>
-#include <cstdlib>
 #include <functional>
 #include <optional>
 #include <string>
@@ -12,11 +11,12 @@
 #include "host/checks/check.h"
 #include "host/commands/ear.h"
 #include "host/depot/depot.h"
-#include "host/depot/depot_directory.h"
 #include "host/depot/transfer_gate.h"
 #include "host/depot/transfer_rules.h"
 #include "host/guard/guards.h"
+#include "host/guard/parameter_keeper.h"
 #include "host/http/server_counts.h"
+#include "host/http/worker_pool.h"
 #include "host/journal/dispatcher.h"
 #include "host/journal/journal.h"
 #include "host/outcomes/outcome_feed.h"
@@ -41,6 +41,9 @@ std::optional<Task> handOver(Services& services, const Task& task);
 
 /// Made once, after the plug-in has started, and shared by all requests. Any thread.
 struct Services {
+    static constexpr std::size_t kChecksumsAtOnce = 2;
+    static constexpr std::size_t kWaitingChecksums = 128;
+
     Services(std::vector<oxa::Table> offered, CodePage localCodePage, std::string homeDirectory,
              RowQueue::Limits limits = {}, bool isGuarded = true, Places places = {},
              const Journal::Settings& journalSettings = {})
@@ -66,18 +69,18 @@ struct Services {
     const TransferRules transferRules{depotFiles, home, codePage, guarded};
     TransferGate transfers{transferRules};
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
-    const std::string depot =  ///< its directory, in that code page, too
-        depotDirectoryOf(home, std::getenv(kDepotVariable), guarded).path;
     ServerCounts counts;
     Journal journal;
     OutcomeFeed outcomes{tables};
     TaskList tasks{tables, outcomes, journal, guarded};
     TaskWatch watch{tables, outcomes};
-    const Guards guards{{codePage, home, depot}, tasks};  ///< asked if `guarded`
-    int maxQueued = 1000;                                 ///< tasks that may wait in the journal
+    const Guards guards{{codePage, home, depotFiles.directory()}, tasks};  ///< asked if `guarded`
+    ParameterKeeper startUpParameters{home, outcomes, tasks};              ///< asked if `guarded`
+    int maxQueued = 1000;  ///< tasks that may wait in the journal
     Leftovers leftovers{journal.identity(), journal.run()};
     Dispatcher dispatcher{journal, tasks,
                           [this](const Task& task) { return handOver(*this, task); }};
+    WorkerPool checksums{kChecksumsAtOnce, kWaitingChecksums};  ///< requests for checksums of files
 };
 
 }  // namespace host

@@ -3,6 +3,7 @@
 #include <pwd.h>
 
 #include <algorithm>
+#include <memory>
 #include <vector>
 
 #include "host/commands/ear.h"
@@ -42,6 +43,13 @@ Query admitted(Services& services, const Query& query, bool force) {
     return {query.table, request.conditions()};
 }
 
+/// What protects files of the home while a request of this kind is handed on; null if nothing needs
+/// to.
+std::unique_ptr<ParameterKeeper::Hold> protectionFor(Services& services, const Query& query) {
+    if (!services.guarded || query.table->name != plugin::kRequestTable) return nullptr;
+    return services.startUpParameters.hold(CommandRequest(query.where, false));
+}
+
 /// How a task ends that the plug-in did not get.
 Task endOf(Task task, TaskState state, const std::string& reason) {
     task.state = state;
@@ -54,6 +62,7 @@ std::optional<Task> tryHandOver(Services& services, const Task& task) {
     const Query query{services.tables.find(std::string(plugin::kRequestTable)), task.conditions};
     TaskWatch::Request watched(services.watch, *query.table);
     const Query handedOn = admitted(services, query, task.forced);
+    const auto protection = protectionFor(services, handedOn);
     TaskList::Request request(services.tasks, task);
     ThreadEar ear;
     const oxa::Rows rows = run(handedOn);
@@ -79,11 +88,13 @@ std::string userName(uid_t user) {
 
 WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer) {
     if (isQueued(query) && services.guarded && !services.leftovers.gone()) {
-        throw NotKept("commands that an earlier run of the host began have not ended yet");
+        throw NotKept("commands that an earlier run of the host began have not ended yet",
+                      "leftovers");
     }
     const bool wantsOutput = services.guarded && readsConfiguration(query);
     TaskWatch::Request watched(services.watch, *query.table);
     const Query handedOn = admitted(services, query, force);
+    const auto protection = protectionFor(services, handedOn);
     // The task is what was asked for, not what the guards made of it.
     TaskList::Request task(services.tasks, query, askerOf(query, peer), force);
     ThreadEar ear(wantsOutput ? kMostOutput : 0);

@@ -108,10 +108,12 @@ Finding checkRunAs(CheckSubject& subject) {
 /// A change of the universal agent's configuration leaves these when its last step fails.
 Finding checkLeftovers(CheckSubject& subject) {
     std::vector<std::string> found;
-    std::error_code ignored;
-    for (fs::directory_iterator entry(subject.inHome("config"), ignored), end; entry != end;
-         entry.increment(ignored)) {
-        if (entry->path().extension() == ".copy") found.push_back(entry->path().string());
+    for (const char* const folder : {"config", "config/.ConfigData"}) {
+        std::error_code ignored;
+        for (fs::directory_iterator entry(subject.inHome(folder), ignored), end; entry != end;
+             entry.increment(ignored)) {
+            if (entry->path().extension() == ".copy") found.push_back(entry->path().string());
+        }
     }
     if (found.empty()) return {Verdict::Ok, "no change of a configuration was interrupted", ""};
     return {Verdict::Warning, "an interrupted change of a configuration left " + listed(found),

@@ -6,6 +6,8 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
+#include <system_error>
 
 #include "host/process/start_error.h"
 
@@ -32,6 +34,17 @@ DepotDirectory depotDirectoryOf(const std::string& home, const char* named, bool
     // An empty name is no name: the plug-in would refuse every transfer.
     if (named != nullptr && *named != '\0') return {named, false};
     return {home + "/depot", true};
+}
+
+bool holdsHome(const DepotDirectory& depot, const std::string& home) {
+    std::error_code error;
+    std::filesystem::path at = std::filesystem::canonical(home, error);
+    while (!error) {
+        if (std::filesystem::equivalent(at, depot.path, error)) return true;
+        if (!at.has_relative_path()) return false;
+        at = at.parent_path();
+    }
+    return false;
 }
 
 void provideDepotDirectory(const DepotDirectory& depot) {

@@ -25,4 +25,8 @@ DepotDirectory depotDirectoryOf(const std::string& home, const char* named, bool
 /// when the directory cannot be made.
 void provideDepotDirectory(const DepotDirectory& depot);
 
+/// Whether the depot is the home or a directory around it, so that transfers could replace the
+/// home's programs. Links are followed.
+bool holdsHome(const DepotDirectory& depot, const std::string& home);
+
 }  // namespace host

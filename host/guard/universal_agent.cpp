@@ -14,6 +14,7 @@
 #include "host/guard/listing.h"
 #include "host/guard/refusal.h"
 #include "host/guard/wording.h"
+#include "host/home/parameter_copy.h"
 #include "host/tables/plugin_facts.h"
 
 namespace host {
@@ -108,7 +109,7 @@ void checkConsole(const std::string& home) {
 /// The universal agent's start-up parameters; empty when there are none.
 std::string startUpParameters(const std::string& home) {
     constexpr std::size_t kMost = 1024 * 1024;
-    const std::string file = home + "/config/.ConfigData/kumenv";
+    const std::string file = startUpParametersOf(home);
     struct stat status {};
     if (::stat(file.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return "";
     std::ifstream in(file, std::ios::binary);

@@ -62,7 +62,18 @@ void writeOwner(const FileDescriptor& file, const std::string& name) {
     }
 }
 
+std::string wordsFor(const std::optional<pid_t>& owner) {
+    return owner ? "the host with process id " + std::to_string(*owner) : "another host";
+}
+
 }  // namespace
+
+std::string HomeLock::ownerOf(const std::string& directory) {
+    const FileDescriptor file(
+        ::open((directory + kFileName).c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    if (!file || ::flock(file.get(), LOCK_SH | LOCK_NB) == 0 || errno != EWOULDBLOCK) return "";
+    return wordsFor(ownerIn(file));
+}
 
 HomeLock::HomeLock(const std::string& directory, const std::string& what) {
     const std::string name = directory + kFileName;
@@ -72,9 +83,7 @@ HomeLock::HomeLock(const std::string& directory, const std::string& what) {
     while (!tryLock(file, name)) {
         owner = ownerIn(file);
         if (owner || std::chrono::steady_clock::now() >= deadline) {
-            throw InUse(
-                what + ' ' + directory + " is in use by " +
-                (owner ? "the host with process id " + std::to_string(*owner) : "another host"));
+            throw InUse(what + ' ' + directory + " is in use by " + wordsFor(owner));
         }
         std::this_thread::sleep_for(kPause);
     }

@@ -20,6 +20,11 @@ public:
 /// same goes for the directory of what a host itself keeps.
 class HomeLock {
 public:
+    /// Who holds the lock of that directory: "the host with process id N" or, if it has not said
+    /// so, "another host"; "" when nobody does. Takes the lock itself for an instant, which hosts
+    /// that start wait for.
+    static std::string ownerOf(const std::string& directory);
+
     /// Throws InUse when another process holds the lock, with that process's id, and StartError
     /// when the file cannot be made. `what` is the word for the directory in that sentence.
     explicit HomeLock(const std::string& directory, const std::string& what = "home");

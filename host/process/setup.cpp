@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <malloc.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <clocale>
@@ -65,6 +66,12 @@ void setUpProcess() {
     surviveBrokenPipes();
     chooseLocale();
     giveMemoryBack();
+}
+
+void takeWritePermissionFromOthers() {
+    // More would lock the users of run-as agents out of the programs that are installed.
+    constexpr mode_t kGroupAndOthersWrite = 022;
+    ::umask(::umask(kGroupAndOthersWrite) | kGroupAndOthersWrite);
 }
 
 }  // namespace host

@@ -122,7 +122,7 @@ TEST_F(JournalOnDisk, WhileACommandOfADeadHostRunsNothingElseIsQueued) {
     ASSERT_TRUE(awaitNote("begin ux"));
     killAndStart();
     const json query = startOnTheTable("px");
-    post("/v1/query", query, 503);
+    EXPECT_EQ(post("/v1/query", query, 503)["guard"], "leftovers");
     openGate();
     ASSERT_TRUE(awaitNote("end ux"));
     EXPECT_TRUE(eventually([&] {

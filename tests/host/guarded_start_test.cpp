@@ -2,6 +2,8 @@
 // What a guarded host looks at before it starts, on a home of the starter home's and with the real
 // plug-in; and that an unguarded one does not.
 #include <gtest/gtest.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
 
 #include <algorithm>
 #include <filesystem>
@@ -9,6 +11,7 @@
 #include <vector>
 
 #include "host/checks/check_list.h"
+#include "host/process/file_descriptor.h"
 #include "host/raw_client.h"
 #include "support/host/program.h"
 #include "support/host/starter_home.h"
@@ -39,6 +42,34 @@ protected:
         return runProgram(command("refused", more), "", environment);
     }
 
+    /// The umask of an INSTALL's command when the host is started without any.
+    std::string umaskOfCommands(const std::vector<std::string>& more) const {
+        std::vector<std::string> argv = {"/bin/sh", "-c", "umask 0; exec \"$@\"", "sh"};
+        const std::vector<std::string> host = command("s", more);
+        argv.insert(argv.end(), host.begin(), host.end());
+        Program program(argv, "", home.environment());
+        EXPECT_TRUE(isReady(program, "s")) << program.err();
+        const std::string installer =
+            scratch.script("installer", "umask >'" + scratch.path("umask") + "'");
+        const ProgramResult installed =
+            runProgram({ZAV_BUILD_DIR "/bin/zavctl", "--socket", scratch.path("s"), "install", "ux",
+                        "060100000", "--no-verify", "--", installer});
+        EXPECT_EQ(installed.status, 0) << installed.out << installed.err;
+        return scratch.read("umask");
+    }
+    /// A port of the loopback address that nobody uses.
+    static std::uint16_t freePort() {
+        const host::FileDescriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
+        sockaddr_in address{};
+        address.sin_family = AF_INET;
+        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        socklen_t length = sizeof address;
+        auto* const generic = reinterpret_cast<sockaddr*>(&address);
+        EXPECT_EQ(::bind(socket.get(), generic, length), 0);
+        EXPECT_EQ(::getsockname(socket.get(), generic, &length), 0);
+        return ntohs(address.sin_port);
+    }
+
     StarterHome home{"ux"};
     ScratchDir scratch;
 };
@@ -60,10 +91,24 @@ TEST_F(GuardedStart, ASecondHostOnTheHomeIsRefusedWithTheFirstOnesProcess) {
 TEST_F(GuardedStart, UnguardedHostsMayShareAHome) {
     const auto first = start("first");
     ASSERT_TRUE(isReady(*first, "first")) << first->err();
-    const auto second = start("second", {"--unguarded"});
-    EXPECT_TRUE(isReady(*second, "second")) << second->err();
-    const auto third = start("third", {"--unguarded"});
-    EXPECT_TRUE(isReady(*third, "third")) << third->err();
+    const std::string warning =
+        "zavhost: warning: home " + home.path() + " is in use by the host with process id " +
+        std::to_string(first->pid()) + "; both will run commands there at the same time\n";
+    for (const char* const other : {"second", "third"}) {
+        const auto beside = start(other, {"--unguarded"});
+        EXPECT_TRUE(isReady(*beside, other)) << beside->err();
+        EXPECT_NE(beside->err().find(warning), std::string::npos) << beside->err();
+    }
+}
+
+TEST_F(GuardedStart, AnUnguardedHostThatIsAloneOnItsHomeGivesNoWarning) {
+    const auto guarded = start("first");
+    ASSERT_TRUE(isReady(*guarded, "first")) << guarded->err();
+    guarded->signal(SIGTERM);
+    ASSERT_EQ(guarded->wait().status, 0);
+    const auto alone = start("second", {"--unguarded"});
+    ASSERT_TRUE(isReady(*alone, "second")) << alone->err();
+    EXPECT_EQ(alone->err().find("in use"), std::string::npos) << alone->err();
 }
 
 TEST_F(GuardedStart, OfManyAtOnceExactlyOneServesTheHome) {
@@ -120,6 +165,24 @@ TEST_F(GuardedStart, AnUnguardedHostStartsWithoutADepotAndItsPlugInRefusesEveryC
     EXPECT_NE(answer.body.find("\"RETVAL\":1002"), std::string::npos) << answer.body;
 }
 
+TEST_F(GuardedStart, APortIntoTheHomeItselfIsRefused) {
+    const std::string port = std::to_string(freePort());
+    const Environment depotIsHome = {{"QVSDEPLOY_AGENTDEPOT", home.path()}};
+    const ProgramResult result = refused({"--rpc-port", port}, depotIsHome);
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.err, "zavhost: --rpc-port: the depot " + home.path() +
+                              " holds the home itself, whose programs a transfer could replace; "
+                              "name another directory in QVSDEPLOY_AGENTDEPOT\n");
+    const auto withoutPort = start("s", {}, depotIsHome);
+    EXPECT_TRUE(isReady(*withoutPort, "s")) << withoutPort->err();
+}
+
+TEST_F(GuardedStart, AnUnguardedHostServesAPortIntoTheHome) {
+    const auto program = start("s", {"--unguarded", "--rpc-port", std::to_string(freePort())},
+                               {{"QVSDEPLOY_AGENTDEPOT", home.path()}});
+    EXPECT_TRUE(isReady(*program, "s")) << program->err();
+}
+
 TEST_F(GuardedStart, WarningsAreSaidAndDoNotMatter) {
     const std::string copy = home.files().write("home/config/um.config.copy", "");
     const auto program = start("s");
@@ -134,6 +197,21 @@ TEST_F(GuardedStart, TheTemporaryDirectoryIsMade) {
     const auto program = start("s");
     ASSERT_TRUE(isReady(*program, "s")) << program->err();
     EXPECT_TRUE(std::filesystem::is_directory(home.path("tmp")));
+}
+
+TEST_F(GuardedStart, AnUnguardedHostMakesNoTemporaryDirectory) {
+    std::filesystem::remove_all(home.path("tmp"));
+    const auto program = start("s", {"--unguarded"});
+    ASSERT_TRUE(isReady(*program, "s")) << program->err();
+    EXPECT_FALSE(std::filesystem::exists(home.path("tmp")));
+}
+
+TEST_F(GuardedStart, CommandsGetAUmaskThatTakesWritePermissionFromOthers) {
+    EXPECT_EQ(umaskOfCommands({}), "0022\n");
+}
+
+TEST_F(GuardedStart, CommandsOfAnUnguardedHostGetItsUmask) {
+    EXPECT_EQ(umaskOfCommands({"--unguarded"}), "0000\n");
 }
 
 TEST_F(GuardedStart, AnUnguardedHostChecksNothing) {

@@ -1,5 +1,7 @@
 #include <sys/stat.h>
 
+#include <filesystem>
+
 #include "host/checks/check_fixture.h"
 
 namespace {
@@ -38,8 +40,12 @@ TEST_F(HomeChecks, ARunAsDatabaseMustParse) {
 }
 
 TEST_F(HomeChecks, WhatAnInterruptedConfigurationLeftIsNamed) {
-    const std::string copy = scratch.write("home/config/um.config.copy", "");
-    expectFinding("leftovers", Verdict::Warning, copy);
+    for (const char* name : {"home/config/um.config.copy", "home/config/.ConfigData/kumenv.copy"}) {
+        const std::string copy = scratch.write(name, "");
+        expectFinding("leftovers", Verdict::Warning, copy);
+        std::filesystem::remove(copy);
+    }
+    expectFinding("leftovers", Verdict::Ok, "no change of a configuration was interrupted");
 }
 
 }  // namespace

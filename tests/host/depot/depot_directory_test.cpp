@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 
 #include <cstdlib>
+#include <filesystem>
 
 #include "host/process/start_error.h"
 #include "support/scoped_env.h"
@@ -65,6 +66,20 @@ TEST(DepotDirectory, ThatCannotBeMadeIsAnErrorOfTheStart) {
     } catch (const host::StartError& error) {
         EXPECT_EQ(std::string(error.what()),
                   "cannot make the depot directory " + path + ": Not a directory");
+    }
+}
+
+TEST(DepotDirectory, HoldsTheHomeWhenItIsTheHomeOrAroundIt) {
+    const ScratchDir scratch;
+    const std::string home = scratch.makeDir("srv/home");
+    std::filesystem::create_directory_symlink(home, scratch.path("link"));
+    for (const std::string& depot : {home, home + "/", scratch.path("srv"), std::string("/"),
+                                     scratch.path("link"), home + "/../home"}) {
+        EXPECT_TRUE(host::holdsHome({depot, false}, home)) << depot;
+    }
+    for (const std::string& depot : {scratch.makeDir("srv/home/depot"), scratch.makeDir("other"),
+                                     scratch.path("none"), std::string()}) {
+        EXPECT_FALSE(host::holdsHome({depot, false}, home)) << depot;
     }
 }
 

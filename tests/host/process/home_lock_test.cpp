@@ -45,6 +45,18 @@ TEST_F(HomeLocks, NamesTheOwnerToTheSecond) {
     EXPECT_EQ(complaint(), "");
 }
 
+TEST_F(HomeLocks, TellTheirOwnerToThoseWhoDoNotWantThem) {
+    EXPECT_EQ(HomeLock::ownerOf(home.path()), "");
+    EXPECT_FALSE(home.exists(".zavhost.lock"));
+    {
+        const HomeLock lock(home.path());
+        EXPECT_EQ(HomeLock::ownerOf(home.path()),
+                  "the host with process id " + std::to_string(::getpid()));
+    }
+    EXPECT_EQ(HomeLock::ownerOf(home.path()), "") << "the file is still there";
+    EXPECT_EQ(complaint(), "");
+}
+
 TEST_F(HomeLocks, AFileThatAKilledHostLeftDoesNotMatter) {
     home.write(".zavhost.lock", "1\n and more than the new text\n");
     const HomeLock lock(home.path());
