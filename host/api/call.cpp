@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstdlib>
 #include <nlohmann/json.hpp>
+#include <unordered_set>
 
 #include "host/tables/bad_request.h"
 
@@ -14,13 +15,35 @@ using nlohmann::json;
 /// Deeper documents than any request needs are refused before they are built.
 constexpr int kMaxDepth = 4;
 
-json parse(const std::string& body) {
-    const auto limitDepth = [](int depth, json::parse_event_t, json&) {
+/// Refuses while the parser reads: a document that is nested too deeply, and a member that an
+/// object has already. Of two equal ones a reader would take the first and another the last.
+class Supervisor {
+public:
+    bool operator()(int depth, json::parse_event_t event, const json& value) {
         if (depth > kMaxDepth) throw BadRequest("the body is nested too deeply");
+        if (event == json::parse_event_t::object_start) open_.emplace_back();
+        if (event == json::parse_event_t::object_end) open_.pop_back();
+        if (event == json::parse_event_t::key) {
+            const auto& name = value.get_ref<const std::string&>();
+            if (!open_.back().insert(name).second) {
+                throw BadRequest("the body has the member \"" + name + "\" twice");
+            }
+        }
         return true;
+    }
+
+private:
+    std::vector<std::unordered_set<std::string>>
+        open_;  ///< the names in each object around this place
+};
+
+json parse(const std::string& body) {
+    Supervisor supervisor;
+    const auto supervise = [&supervisor](int depth, json::parse_event_t event, const json& value) {
+        return supervisor(depth, event, value);
     };
     try {
-        return json::parse(body.begin(), body.end(), limitDepth);
+        return json::parse(body.begin(), body.end(), supervise);
     } catch (const json::parse_error& error) {
         throw BadRequest("the body is not JSON: error at byte " + std::to_string(error.byte));
     } catch (const json::exception&) {

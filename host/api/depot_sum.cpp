@@ -1,4 +1,7 @@
 // GET /v1/depot/sum
+//
+// Large files take long, so that threads of their own compute sums, a few requests at a time:
+// however many there are, the workers are free for other requests.
 
 #include <nlohmann/json.hpp>
 
@@ -7,27 +10,57 @@
 #include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/depot/depot_error.h"
+#include "host/http/responder.h"
 
 namespace host {
+namespace {
+
+constexpr std::chrono::hours kLongest{1};
+
+Reply tryAgain(const char* reason) {
+    Reply reply = errorReply(503, reason);
+    reply.fields.emplace_back("Retry-After", "5");
+    return reply;
+}
+
+nlohmann::ordered_json rowOf(const Depot& depot, const std::string& path) {
+    nlohmann::ordered_json file;
+    putName(file, "path", path);
+    try {
+        const Checksum sum = depot.sum(path);
+        file["bytes"] = sum.bytes;
+        file["sha256"] = sum.sha256;
+    } catch (const DepotError& error) {
+        file["error"] = error.what();
+    }
+    return file;
+}
+
+Reply sumsOf(const Depot& depot, const std::vector<std::string>& paths) {
+    nlohmann::ordered_json files = nlohmann::ordered_json::array();
+    for (const std::string& path : paths)
+        files.push_back(rowOf(depot, path));
+    const nlohmann::ordered_json document = {{"files", std::move(files)}};
+    return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+}
+
+}  // namespace
 
 Endpoint getDepotSum;
 
 Answer getDepotSum(Services& services, const Call& call) {
-    nlohmann::ordered_json files = nlohmann::ordered_json::array();
-    for (const std::string& path : call.texts("path")) {
-        nlohmann::ordered_json file;
-        putName(file, "path", path);
-        try {
-            const Checksum sum = services.depotFiles.sum(path);
-            file["bytes"] = sum.bytes;
-            file["sha256"] = sum.sha256;
-        } catch (const DepotError& error) {
-            file["error"] = error.what();
-        }
-        files.push_back(std::move(file));
-    }
-    const nlohmann::ordered_json document = {{"files", std::move(files)}};
-    return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+    const auto begin = [&services, paths = call.texts("path")](const Responder& responder) {
+        const bool taken = services.checksums.submit([&services, paths, responder] {
+            try {
+                responder(sumsOf(services.depotFiles, paths));
+            } catch (const std::exception& error) {
+                responder(errorReply(500, error.what()));
+            }
+        });
+        if (!taken) responder(tryAgain("too many requests for checksums are waiting"));
+    };
+    const auto atLimit = []() -> Answer { return tryAgain("the checksums are not ready"); };
+    return Later{begin, kLongest, atLimit};
 }
 
 }  // namespace host

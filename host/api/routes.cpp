@@ -77,7 +77,7 @@ std::vector<Route> routes() {
           {"recursive", Type::Flag, Need::Optional, "1: a directory with everything in it"}}},
 
         {"GET", "/v1/depot/sum", "The SHA-256 of files of the depot.",
-         Access::Read, Runs::OnWorker, getDepotSum,
+         Access::Read, Runs::AtOnce, getDepotSum,
          {{"path", Type::Texts, Need::Required, "a file; may be given several times"}}},
 
         {"GET", "/v1/depot/check", "Whether the host would take files.",

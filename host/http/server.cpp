@@ -8,11 +8,13 @@
 #include <boost/asio/post.hpp>
 #include <cerrno>
 #include <exception>
+#include <string_view>
 #include <utility>
 #include <vector>
 
 #include "host/http/server_core.h"
 #include "host/http/session.h"
+#include "host/http/turned_away.h"
 #include "host/process/file_descriptor.h"
 #include "host/process/start_error.h"
 
@@ -68,6 +70,9 @@ struct HttpServer::Implementation {
     void awaitConnection();
     void acceptAll();
     void admit(FileDescriptor connection);
+    void refuse(FileDescriptor connection, const Peer& peer, unsigned status,
+                std::string_view text);
+    std::shared_ptr<HttpSession> sessionOn(FileDescriptor connection, const Peer& peer);
     void beginEnd(std::chrono::milliseconds grace);
     void pollEnd();
     void pollFlush(Clock::time_point deadline);
@@ -109,18 +114,31 @@ void HttpServer::Implementation::acceptAll() {
 
 void HttpServer::Implementation::admit(FileDescriptor connection) {
     const Peer peer = peerOf(connection.get());
-    const bool allowed = peer.access != Access::None;
-    const bool full = core.connections.size() - core.refusals >= core.limits.connections;
-    if ((!allowed || full) && core.refusals >= core.limits.refusals) return;
+    if (peer.access == Access::None) {
+        return refuse(std::move(connection), peer, 403, "this host serves its own user only");
+    }
+    if (core.connections.size() - core.refusals >= core.limits.connections) {
+        return refuse(std::move(connection), peer, 503, "too many connections are open");
+    }
+    if (const auto session = sessionOn(std::move(connection), peer)) session->serve();
+}
+
+/// Every client learns why. As many as the limit says may also send their request first.
+void HttpServer::Implementation::refuse(FileDescriptor connection, const Peer& peer,
+                                        unsigned status, std::string_view text) {
+    if (core.refusals >= core.limits.refusals) return turnAway(connection.get(), status, text);
+    if (const auto session = sessionOn(std::move(connection), peer)) session->refuse(status, text);
+}
+
+/// Null when the event loop does not take the connection.
+std::shared_ptr<HttpSession> HttpServer::Implementation::sessionOn(FileDescriptor connection,
+                                                                   const Peer& peer) {
     Stream stream(core.io.get_executor());
     Error error;
     stream.socket().assign(net::local::stream_protocol(), connection.get(), error);
-    if (error) return;
+    if (error) return nullptr;
     connection.release();
-    const auto session = std::make_shared<HttpSession>(core, std::move(stream), peer);
-    if (!allowed) return session->refuse(403, "this host serves its own user only");
-    if (full) return session->refuse(503, "too many connections are open");
-    session->serve();
+    return std::make_shared<HttpSession>(core, std::move(stream), peer);
 }
 
 template <typename Next>

@@ -8,7 +8,7 @@ namespace host {
 
 struct ServerLimits {
     std::size_t connections = 256;      ///< served at a time; further ones get 503
-    std::size_t refusals = 64;          ///< being told so at a time; further ones are just closed
+    std::size_t refusals = 64;          ///< told so with time to read; further ones in passing
     std::size_t workers = 32;           ///< jobs at a time
     std::size_t waitingRequests = 128;  ///< waiting for a worker; further ones get 503
     unsigned headBytes = 16 * 1024;     ///< request line and fields

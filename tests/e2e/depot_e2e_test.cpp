@@ -2,9 +2,13 @@
 // ctest-label: threaded
 
 #include <gmock/gmock.h>
+#include <poll.h>
 #include <unistd.h>
 
+#include <algorithm>
+
 #include "e2e/push_fixture.h"
+#include "host/raw_client.h"
 
 namespace {
 
@@ -64,6 +68,34 @@ TEST_F(DepotVerbs, PrintChecksums) {
               "e3b0c44298fc1c149afbf4c8996fb92427ae41e4649b934ca495991b7852b855  b\n");
     EXPECT_EQ(result.err, "zavctl: the depot holds no none\n");
     EXPECT_EQ(result.status, 1);
+}
+
+TEST_F(DepotVerbs, ChecksumsOfLargeFilesHoldNobodyElseUp) {
+    files_.write("depot/large", "");
+    ASSERT_EQ(::truncate(files_.path("depot/large").c_str(), off_t{1} << 38), 0);
+    std::vector<RawClient> clients;
+    for (int i = 0; i < 150; ++i) {
+        clients.emplace_back(host_->socket());
+        ASSERT_TRUE(
+            clients.back().send("GET /v1/depot/sum?path=large&path=large HTTP/1.1\r\n\r\n"));
+    }
+    const auto answered = [](const RawClient& client) {
+        pollfd entry{client.descriptor(), POLLIN, 0};
+        return ::poll(&entry, 1, 0) > 0;
+    };
+    EXPECT_TRUE(eventually([&] {
+        return std::count_if(clients.begin(), clients.end(), answered) == 150 - 2 - 128;
+    })) << "two are at work and 128 wait";
+    const auto waiting = std::find_if_not(clients.begin(), clients.end(), answered);
+    const RawClient::Answer refused =
+        std::find_if(clients.begin(), clients.end(), answered)->readAnswer();
+    EXPECT_EQ(refused.status, 503);
+    EXPECT_THAT(refused.head, HasSubstr("Retry-After: "));
+    RawClient other(host_->socket());
+    EXPECT_EQ(other.get("/v1/depot?path=ux").status, 200);
+    EXPECT_EQ(other.post("/v1/query", R"({"table":"KINAGT"})").status, 200);
+    EXPECT_EQ(host_->stop().status, 0) << "and not the end of the host";
+    EXPECT_EQ(waiting->readAnswer().status, 503);
 }
 
 TEST_F(DepotVerbs, RemoveFiles) {

@@ -42,6 +42,7 @@ TEST_F(Interface, RefusesEventsThatMakeNoSense) {
     expectError(400, "the parameter \"table\" is given twice", events("?table=PLAIN&table=X"));
     expectError(404, "there is no table \"plain\"", events("?table=plain"));
     expectError(400, "table PLAIN has no column \"name\"", events("?table=PLAIN&name=x"));
+    expectError(400, "table PLAIN has no column \"count\"", events("?table=PLAIN&count=0"));
     expectError(400, "the value of column NUMBER is not a whole number of 32 bits",
                 events("?table=PLAIN&NUMBER=x"));
     expectError(400, "the value of column NAME holds what the host's code page UTF-8 lacks",
@@ -68,7 +69,8 @@ TEST_F(Interface, HealthSaysWhatThisHostIs) {
                         R"(,"home":"/home/of/it","origin_node":"node","uptime_seconds":)"),
               0U)
         << body;
-    EXPECT_NE(body.find(R"(,"subscriptions":2,"guarded":true,"journal":")"), std::string::npos) << body;
+    EXPECT_NE(body.find(R"(,"subscriptions":2,"guarded":true,"journal":")"), std::string::npos)
+        << body;
 }
 
 TEST_F(Interface, IsClosedToPeersWithoutAccess) {

@@ -65,6 +65,21 @@ TEST_F(QueryEndpoint, RefusesWhatIsNotJson) {
     }
 }
 
+TEST_F(QueryEndpoint, RefusesMembersThatAreGivenTwice) {
+    expectError(400, "the body has the member \"table\" twice",
+                post(R"({"table":"PLAIN","where":[],"table":"KAGREQT"})"));
+    expectError(
+        400, "the body has the member \"op\" twice",
+        post(R"({"table":"PLAIN","where":[{"column":"NAME","op":"=","op":"=","value":""}]})"));
+    expectError(400, "the body has the member \"table\" twice",
+                post(R"({"table":"PLAIN","t\u0061ble":"PLAIN"})"));
+    EXPECT_EQ(post(R"({"table":"PLAIN","where":[{"column":"NAME","op":"=","value":""},)"
+                   R"({"column":"NAME","op":"=","value":""}]})")
+                  .status,
+              200U)
+        << "each condition has members of its own";
+}
+
 TEST_F(QueryEndpoint, RefusesEveryTruncatedBody) {
     const std::string whole =
         R"({"table":"PLAIN","where":[{"column":"NAME","op":"=","value":"ux"}]})";

@@ -326,6 +326,34 @@ TEST_F(Connections, BeyondTheLimitGet503UntilOneIsFree) {
     EXPECT_TRUE(eventually([&] { return connect().get("/v1/health").status == 200; }));
 }
 
+TEST_F(Connections, ThatAreIdleBeyondTheLimitAllGet503) {
+    start();
+    std::vector<RawClient> clients;
+    for (int i = 0; i < 600; ++i) {
+        clients.push_back(connect());
+        ASSERT_TRUE(clients.back().connected()) << i;
+    }
+    for (std::size_t i = 256; i < clients.size(); ++i) {
+        const auto answer = clients[i].readAnswer();
+        EXPECT_EQ(answer.status, 503) << i;
+        EXPECT_EQ(answer.body, "{\"error\":\"too many connections are open\"}\n") << i;
+        clients[i].close();
+    }
+    for (std::size_t i = 0; i < 256; ++i)
+        EXPECT_EQ(clients[i].get("/v1/health").status, 200) << i;
+}
+
+TEST_F(Connections, BeyondTheLimitGet503WhateverTheySend) {
+    host::ServerLimits limits;
+    limits.connections = 1;
+    limits.refusals = 0;
+    start(limits);
+    RawClient first = connect();
+    EXPECT_EQ(first.get("/v1/health").status, 200);
+    for (int i = 0; i < 300; ++i)
+        EXPECT_EQ(connect().get("/v1/health").status, 503) << i;
+}
+
 TEST_F(Connections, FarBeyondTheLimitCostNothing) {
     host::ServerLimits limits;
     limits.connections = 2;
