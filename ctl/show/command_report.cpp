@@ -31,7 +31,7 @@ std::string section(const std::string& heading, const std::string& output) {
         const std::size_t end = std::min(lines.find('\n', start), lines.size());
         std::string line = lines.substr(start, end - start);
         if (!line.empty() && line.back() == '\r') line.pop_back();
-        text += "    " + printable(line) + "\n";
+        text += "    " + redacted(line) + "\n";
         start = end + 1;
     }
     return text;
@@ -48,7 +48,7 @@ json commandsOf(const json& record) {
 
 std::string endText(const json& command) {
     if (const std::string error = textOf(command, "error"); !error.empty()) {
-        return "could not be run: " + printable(error);
+        return "could not be run: " + redacted(error);
     }
     if (const std::string signal = textOf(command, "signal"); !signal.empty()) {
         const bool isLate = command.value("timed_out", json()) == json(true);
@@ -71,7 +71,7 @@ bool endedBadly(const json& command) {
 }
 
 std::string commandReport(const json& command) {
-    return "  command: " + printable(textOf(command, "command")) +
+    return "  command: " + redacted(textOf(command, "command")) +
            "\n  end:     " + endText(command) + "\n" +
            section("standard output", textOf(command, "stdout")) +
            section("standard error", textOf(command, "stderr"));

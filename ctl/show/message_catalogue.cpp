@@ -65,7 +65,7 @@ std::string describeResult(int returnCode, const std::string& id, const std::str
     if (id.empty() && returnCode == kNoReturnCode) return "the host gave no return code";
     std::string out = id.empty() ? "return code " + std::to_string(returnCode) : printable(id);
     if (const std::string text = messageText(id); !text.empty()) out += ": " + text;
-    if (!parameter.empty()) out += " [" + printable(parameter) + "]";
+    if (!parameter.empty()) out += " [" + redacted(parameter) + "]";
     return out;
 }
 

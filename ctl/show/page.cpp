@@ -31,7 +31,7 @@ std::string dumped(const json& document, int indent) {
 std::string complaint(const std::string& text) {
     const bool isMild = text.rfind("note: ", 0) == 0 || text.rfind("warning: ", 0) == 0;
     return toned("zavctl:", isMild ? Tone::Attention : Tone::Bad, standardError()) + " " +
-           printable(text) + "\n";
+           redacted(text) + "\n";
 }
 
 Page failurePage(const Failure& failure, Format format) {

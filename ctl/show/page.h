@@ -19,7 +19,7 @@ struct Page {
     bool isVerbatim = false;
 };
 
-/// A line for standard error: "zavctl: text". Control characters are shown as \xNN.
+/// A line for standard error: "zavctl: text". Control characters are shown as \xNN, secrets as ***.
 std::string complaint(const std::string& text);
 
 /// Why a command could not go on: the reason and, on a line of its own, the way out. As JSON there

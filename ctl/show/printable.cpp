@@ -3,6 +3,8 @@
 #include <cstdio>
 #include <string_view>
 
+#include "secrets/masked.h"
+
 namespace ctl {
 namespace {
 
@@ -31,6 +33,10 @@ std::string escaped(const std::string& text, std::string_view prefix, std::strin
 
 std::string printable(const std::string& text) {
     return escaped(text, "\\x", "");
+}
+
+std::string redacted(const std::string& text) {
+    return printable(secrets::masked(text));
 }
 
 std::string printableLines(const std::string& text) {

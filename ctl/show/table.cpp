@@ -79,7 +79,7 @@ std::string recordText(const json& row) {
         widest + 2 + kLeastRoom < kColumns ? kColumns - widest - 2 : kLeastRoom;
     std::string text;
     for (const auto& item : row.items()) {
-        const std::string value = printable(valueText(item.value()));
+        const std::string value = redacted(valueText(item.value()));
         if (value.empty()) continue;
         const Line pieces = folded(value, room);
         for (std::size_t i = 0; i < pieces.size(); ++i)
@@ -97,7 +97,7 @@ std::string tableText(const json& rows, const std::vector<TableColumn>& columns)
     for (const json& row : rows) {
         Line line;
         for (const TableColumn& column : columns)
-            line.push_back(printable(textOf(row, column.column)));
+            line.push_back(redacted(textOf(row, column.column)));
         lines.push_back(std::move(line));
     }
     const std::vector<std::size_t> widths = widthsOf(lines);

@@ -40,8 +40,8 @@ json resultOf(const json& record) {
 std::string processLine(const json& command, WallTime now) {
     const std::string pid = textOf(command, "pid");
     return "  " + (pid.empty() ? "-" : printable(pid)) + "  " +
-           printable(textOf(command, "command")) + " (" +
-           timeText(textOf(command, "started"), now) + ")\n";
+           redacted(textOf(command, "command")) + " (" + timeText(textOf(command, "started"), now) +
+           ")\n";
 }
 
 }  // namespace

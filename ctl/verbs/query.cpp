@@ -13,6 +13,7 @@
 #include "ctl/verbs/arguments/condition_text.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
+#include "secrets/value_reader.h"
 
 using nlohmann::json;
 
@@ -24,7 +25,9 @@ constexpr Argument kTable =
 constexpr Argument kConditions =
     positionals("CONDITION", "COLUMN=VALUE; also !=, <, <=, > and >=, and ~ for a pattern with *");
 constexpr Argument kYes = flag("--yes", "Send a query of KAGREQT, which carries out a command");
-constexpr Argument kArguments[] = {kTable, kConditions, kYes};
+constexpr Argument kForceIt =
+    flag("--force", "Send it although the inventory does not list the product").with("--yes");
+constexpr Argument kArguments[] = {kTable, kConditions, kYes, kForceIt};
 
 struct CommandVerb {
     const char* command;
@@ -53,6 +56,7 @@ std::string valueOf(const TableQuery& query, const char* column) {
 TableQuery queryOf(const Values& given) {
     TableQuery query;
     query.table = given.text(kTable);
+    query.isForced = given.flag(kForceIt);
     for (const std::string& text : given.texts(kConditions))
         query.where.push_back(parseCondition(text));
     return query;
@@ -74,6 +78,17 @@ ExitStatus statusOf(const TableQuery& query, const json& rows) {
         return returnCodeOf(row) == 0;
     });
     return isDone ? kSuccess : kHostReportedFailure;
+}
+
+/// The rows for people. What a configuration says is as secret as the passwords that may be in it;
+/// config get shows it to those who ask for it.
+json withoutConfigurations(json rows) {
+    for (json& row : rows) {
+        if (!row.is_object() || textOf(row, "CONTEXT").empty()) continue;
+        const std::string command = textOf(row, "COMMAND");
+        if (command == "GETCONFIG" || command == "SETCONFIG") row["CONTEXT"] = secrets::kMask;
+    }
+    return rows;
 }
 
 ExitStatus run(const Invocation& invocation) {
@@ -104,7 +119,7 @@ Page showQuery(const TableQuery& query, const QueryAnswer& answer, Format format
         return page;
     }
     const std::string count = std::to_string(rows.size()) + (rows.size() == 1 ? " row" : " rows");
-    page.out = recordsText(rows) + (rows.empty() ? "" : "\n") + count + "\n";
+    page.out = recordsText(withoutConfigurations(rows)) + (rows.empty() ? "" : "\n") + count + "\n";
     page.err = warningsText(answer.warnings);
     if (page.status == kSuccess) return page;
     page.err += complaint(rows.empty() ? "the host gave no reply, so it is not known what became "

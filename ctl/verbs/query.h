@@ -9,7 +9,8 @@ namespace ctl {
 struct Invocation;
 
 QueryAnswer askQuery(const Invocation& invocation);
-/// As for any command, the status of one that the request table carried out is that of its reply.
+/// For people, a configuration and what stands for passwords is "***". As for any command, the
+/// status of one that the request table carried out is that of its reply.
 Page showQuery(const TableQuery& query, const QueryAnswer& answer, Format format);
 
 /// The command line that does what such a query of the request table would do, such as "zavctl stop

@@ -7,17 +7,9 @@
 
 #include <cstddef>
 
-namespace ras1 {
+#include "secrets/value_reader.h"
 
-/// What is known of a text that comes in pieces, at the end of one of them. A name or a value that
-/// is cut there is still recognised in the next piece.
-struct Carried {
-    char tail[24];       ///< the last bytes before
-    std::size_t length;  ///< how many there are
-    bool inValue;        ///< the piece ended before or within a value
-    bool begun;          ///< of which there was at least one byte
-    char quote;          ///< the quotation mark that is open in it, or 0
-};
+namespace ras1 {
 
 /// What the log gets in place of one text.
 class Masking {
@@ -36,9 +28,9 @@ public:
 private:
     const char* const text_;
     const std::size_t textLength_;
-    std::size_t shown_;   ///< as it is, at the beginning
-    bool whole_ = false;  ///< the rest is secret as a whole
-    Carried before_{};    ///< what preceded the rest
+    std::size_t shown_;          ///< as it is, at the beginning
+    bool whole_ = false;         ///< the rest is secret as a whole
+    secrets::Carried before_{};  ///< what preceded the rest
     bool changes_ = false;
     std::size_t length_ = 0;
 };

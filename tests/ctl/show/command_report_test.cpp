@@ -56,4 +56,16 @@ TEST(CommandReport, OfAFailureIsThatOfTheCommandsThatFailedElseOfTheLast) {
     EXPECT_EQ(ctl::failureReport(json()), "");
 }
 
+TEST(CommandReport, HidesSecretsInCommandsAndTheirOutput) {
+    const std::string shown = ctl::commandReport({{"command", "setup --password=hunter2 -q"},
+                                                  {"error", "token=hunter2"},
+                                                  {"stdout", "a\nDB_PWD: hunter2\nb"},
+                                                  {"stderr", "secret = hunter2"}});
+    EXPECT_EQ(shown,
+              "  command: setup --password=*** -q\n"
+              "  end:     could not be run: token=***\n"
+              "  standard output:\n    a\n    DB_PWD: ***\n    b\n"
+              "  standard error:\n    secret = ***\n");
+}
+
 }  // namespace

@@ -33,6 +33,7 @@ TEST(MessageCatalogue, DescribesAResultWithItsParameter) {
               "ZAV1002E: the request has no transaction identifier");
     EXPECT_EQ(ctl::describeResult(1031, "", ""), "return code 1031");
     EXPECT_EQ(ctl::describeResult(1031, "ZAV9999E", "a\x1b"), "ZAV9999E [a\\x1B]");
+    EXPECT_EQ(ctl::describeResult(1031, "ZAV9999E", "x,token=y"), "ZAV9999E [x,token=***]");
 }
 
 TEST(MessageCatalogue, DescribesARow) {

@@ -48,4 +48,12 @@ TEST(Page, OfJsonMendsTextThatIsNoValidUtf8) {
     EXPECT_EQ(ctl::jsonText({{"A", "\xff"}}), "{\n  \"A\": \"\xef\xbf\xbd\"\n}\n");
 }
 
+TEST(Page, OfAFailureHidesSecretsFromPeopleOnly) {
+    const ctl::Failure failure(ctl::kNoHost, "refused: key=hunter2", "zavctl task show key=7");
+    const ctl::Page page = ctl::failurePage(failure, ctl::Format::Json);
+    EXPECT_EQ(page.err, "zavctl: refused: key=***\n  zavctl task show key=7\n")
+        << "a way out is there to be copied";
+    EXPECT_EQ(nlohmann::json::parse(page.out)["error"], "refused: key=hunter2");
+}
+
 }  // namespace

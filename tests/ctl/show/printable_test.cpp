@@ -17,6 +17,12 @@ TEST(Printable, ShowsTheControlCharactersOfLatin1AsEscapesToo) {
     EXPECT_EQ(ctl::printable("\xc2"), "\xc2");
 }
 
+TEST(Printable, RedactedTextHasNoSecretsEither) {
+    EXPECT_EQ(ctl::redacted("a\x1b password=hunter2 b"), "a\\x1B password=*** b");
+    EXPECT_EQ(ctl::redacted("key=a\nnext"), "key=***\\x0Anext") << "a value ends with its line";
+    EXPECT_EQ(ctl::printable("key=a"), "key=a");
+}
+
 TEST(Printable, LinesKeepTheirEndsAndTabs) {
     EXPECT_EQ(ctl::printableLines("a\tb\n\x1b[2J\r"), "a\tb\n\\x1B[2J\\x0D");
 }

@@ -49,4 +49,10 @@ TEST(Records, LeaveEmptyColumnsOut) {
     EXPECT_EQ(ctl::recordsText(json::array()), "");
 }
 
+TEST(Records, HideSecrets) {
+    EXPECT_EQ(ctl::recordsText({{{"CONTEXT", "/bin/setup password=hunter2 -q"}}}),
+              "CONTEXT  /bin/setup password=*** -q\n");
+    EXPECT_EQ(ctl::tableText({{{"A", "pwd=x"}}}, {{"A", "A"}}), "A\npwd=***\n");
+}
+
 }  // namespace

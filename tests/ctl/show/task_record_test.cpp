@@ -26,6 +26,12 @@ const json kRecord = {
 TEST(TaskRecord, AtWorkIsWhatItIsAndItsProcesses) {
     EXPECT_EQ(ctl::workText(kRecord, {}),
               "deploy-7: INSTALL ux 6.3, running since then\n  4711  sh \\x1B (t3)\n");
+    json secret = kRecord;
+    secret["transid"] = "key=7";
+    secret["details"]["commands"][1]["command"] = "sh pwd=x";
+    EXPECT_EQ(ctl::workText(secret, {}),
+              "key=7: INSTALL ux 6.3, running since then\n  4711  sh pwd=*** (t3)\n")
+        << "a task keeps its name";
     EXPECT_EQ(ctl::workText({{"id", "17"}, {"command", "STOP"}, {"state", "running"}}, {}),
               "17: STOP, running\n");
 }

@@ -56,4 +56,16 @@ TEST(Query, GivesRowsAsJson) {
               (json{{"rows", rows}}));
 }
 
+TEST(Query, ShowsNoConfigurationToPeople) {
+    for (const char* command : {"GETCONFIG", "SETCONFIG"}) {
+        const json rows = {{{"COMMAND", command}, {"CONTEXT", "COLOUR=red"}, {"RETVAL", 0}}};
+        const std::string shown = ctl::showQuery(request({}), {rows}, Format::Text).out;
+        EXPECT_NE(shown.find("CONTEXT  ***\n"), std::string::npos) << shown;
+        EXPECT_EQ(json::parse(ctl::showQuery(request({}), {rows}, Format::Json).out)["rows"], rows);
+    }
+    const json rows = {{{"COMMAND", "INSTALL"}, {"CONTEXT", "/bin/x key=y z"}, {"RETVAL", 0}}};
+    EXPECT_NE(ctl::showQuery(request({}), {rows}, Format::Text).out.find("  /bin/x key=*** z\n"),
+              std::string::npos);
+}
+
 }  // namespace

@@ -1,0 +1,40 @@
+#include "secrets/masked.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+
+namespace {
+
+using secrets::masked;
+using secrets::Masker;
+
+TEST(Masked, HasNoSecretValues) {
+    EXPECT_EQ(masked("./install.sh --password=hunter2 -q"), "./install.sh --password=*** -q");
+    EXPECT_EQ(masked("DB_KEY: 'a b'\nPORT=5"), "DB_KEY: ***\nPORT=5");
+    EXPECT_EQ(masked("token=a token=b"), "token=*** token=***");
+    EXPECT_EQ(masked(""), "");
+    EXPECT_EQ(masked("nothing = secret"), "nothing = secret");
+}
+
+TEST(Masked, IsTheSameWhenItIsMaskedAgain) {
+    const std::string once = masked("pwd=x; \"secret\": \"y\" rest");
+    EXPECT_EQ(masked(once), once);
+}
+
+TEST(Masker, MasksAValueOnceWhereverTheTextIsCut) {
+    const std::string text = "a password=hunter2 b\nkey: 'x y' c secret=z";
+    const std::string whole = masked(text);
+    for (std::size_t cut = 0; cut <= text.size(); ++cut) {
+        Masker masker;
+        const std::string first = masker.feed(text.substr(0, cut));
+        EXPECT_EQ(first + masker.feed(text.substr(cut)), whole) << cut;
+    }
+    Masker masker;
+    std::string pieces;
+    for (const char byte : text)
+        pieces += masker.feed({&byte, 1});
+    EXPECT_EQ(pieces, whole);
+}
+
+}  // namespace
