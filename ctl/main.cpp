@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "ctl/client/failure.h"
+#include "ctl/client/peer.h"
 #include "ctl/command_line.h"
 #include "ctl/show/page.h"
 #include "ctl/show/terminal.h"
@@ -32,6 +33,7 @@ void occupyStandardDescriptors() {
 ctl::ExitStatus run(const ctl::CommandLine& line, ctl::Format format) {
     if (line.verb == nullptr) return ctl::print(line.page);
     try {
+        if (line.given.has(ctl::kHostUser)) ctl::trustHostUser(line.given.text(ctl::kHostUser));
         return line.verb->run({line.given, ctl::hostAddressOf(line.given), format});
     } catch (const ctl::Failure& failure) {
         return ctl::print(ctl::failurePage(failure, format));

@@ -2,6 +2,7 @@
 
 #include "ctl/client/http/bounded_json.h"
 #include "ctl/client/no_host.h"
+#include "ctl/client/peer.h"
 
 using nlohmann::json;
 
@@ -9,6 +10,7 @@ namespace ctl {
 namespace {
 
 ExitStatus statusOfRefusal(unsigned status) {
+    if (status < 400) return kNoHost;  // no refusal at all: nothing that a host says
     const bool forNow = status == 403 || status == 409 || status == 429 || status >= 500;
     return forNow ? kHostReportedFailure : kWrongUsage;
 }
@@ -29,6 +31,7 @@ Transport::Transport(const std::string& path) : path_(path), socket_(context_) {
         error = tooLong.code();
     }
     if (error) throw noHost(path, error.value());
+    refuseStranger(socket_.native_handle(), path);
 }
 
 /// The operation's handler refers to its caller's variables, so it is run before the caller
@@ -48,6 +51,7 @@ Failure refusal(unsigned status, const std::string& body) {
     const json answer = objectIn(body);
     std::string text = memberText(answer, "error");
     if (text.empty()) text = "status " + std::to_string(status);
+    if (status < 400) text = "it answers with status " + std::to_string(status);
     return {statusOfRefusal(status), "the host refused the request: " + text,
             memberText(answer, "hint"), memberText(answer, "guard")};
 }

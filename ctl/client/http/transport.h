@@ -19,7 +19,7 @@ public:
     using Error = boost::system::error_code;
     using Socket = boost::asio::local::stream_protocol::socket;
 
-    /// Throws Failure(kNoHost) when nobody listens on the path.
+    /// Throws Failure(kNoHost) when nobody listens on the path, or a user who is not trusted.
     explicit Transport(const std::string& path);
 
     /// Starts an asynchronous operation and waits for its end; `start` gets the handler to start it
@@ -51,6 +51,7 @@ private:
 /// What to throw when the host answered with an HTTP status other than 200. `body` may hold the
 /// reason as {"error": "...", "guard": "...", "hint": "..."}. A request that is wrong is the user's
 /// to mend (kWrongUsage); one that the host does not want now is a failure (kHostReportedFailure).
+/// What is no refusal either, such as a redirection, makes no sense of a host (kNoHost).
 Failure refusal(unsigned status, const std::string& body);
 
 // ---------------------------------------------------------------------------------------------

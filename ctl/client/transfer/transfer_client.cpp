@@ -1,6 +1,6 @@
 #include "ctl/client/transfer/transfer_client.h"
-#include "ctl/client/no_host.h"
 
+#include <poll.h>
 #include <sys/socket.h>
 #include <sys/time.h>
 #include <sys/uio.h>
@@ -12,6 +12,8 @@
 #include <cstring>
 
 #include "ctl/client/failure.h"
+#include "ctl/client/no_host.h"
+#include "ctl/client/peer.h"
 #include "ctl/client/transfer/interruption.h"
 
 namespace ctl {
@@ -25,10 +27,12 @@ constexpr std::size_t kHeldBack = std::size_t{64} << 10;
 /// host writes what it has got of a batch; the kernel gives less if the system's limit is lower.
 constexpr int kSendBuffer = 2 << 20;
 
+Failure late() {
+    return {kNoOutcome, "the host did not take the file within the time-out"};
+}
+
 Failure broken() {
-    if (errno == EAGAIN || errno == EWOULDBLOCK) {
-        return {kNoOutcome, "the host did not take the file within the time-out"};
-    }
+    if (errno == EAGAIN || errno == EWOULDBLOCK) return late();
     return {kNoHost, std::string("the connection to the host broke: ") + std::strerror(errno)};
 }
 
@@ -96,7 +100,7 @@ TransferClient::TransferClient(const std::string& socketPath, std::chrono::milli
     : descriptor_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
     if (descriptor_ == -1) throw broken();
     try {
-        setTimeout(descriptor_, timeout);
+        limitWaits(timeout);
         setSendBuffer(descriptor_);
         connect(socketPath);
         Interruption::watch(descriptor_);
@@ -118,8 +122,13 @@ void TransferClient::close() {
 
 void TransferClient::stopSending(std::chrono::milliseconds timeout) {
     heldBack_.clear();
-    setTimeout(descriptor_, timeout);
+    limitWaits(timeout);
     ::shutdown(descriptor_, SHUT_WR);
+}
+
+void TransferClient::limitWaits(std::chrono::milliseconds timeout) {
+    timeout_ = timeout;
+    setTimeout(descriptor_, timeout);
 }
 
 void TransferClient::connect(const std::string& path) {
@@ -132,6 +141,7 @@ void TransferClient::connect(const std::string& path) {
     if (::connect(descriptor_, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
         throw noHost(path, errno);
     }
+    refuseStranger(descriptor_, path);
 }
 
 void TransferClient::bind() {
@@ -213,6 +223,8 @@ TransferAnswer TransferClient::receive() {
 }
 
 TransferClient::Packet TransferClient::readPacket() {
+    packetDeadline_ = deadlineIn(timeout_);
+    packetBegun_ = false;
     unsigned char bytes[rpc::kCommonHeader];
     readAll(bytes, sizeof bytes);
     Packet packet;
@@ -237,6 +249,8 @@ void TransferClient::readAll(unsigned char* data, std::size_t length) {
 
 /// Waits for bytes; takes all that have come.
 void TransferClient::readMore() {
+    // The socket's own time-out limits the wait for the first bytes, but begins anew with each.
+    if (packetBegun_) awaitRestOfPacket();
     for (;;) {
         const ssize_t got = ::recv(descriptor_, received_, sizeof received_, 0);
         if (got == -1 && errno == EINTR) continue;
@@ -244,7 +258,22 @@ void TransferClient::readMore() {
         if (got == 0) throw Failure(kNoHost, "the host closed the connection");
         at_ = 0;
         end_ = static_cast<std::size_t>(got);
+        packetBegun_ = true;
         return;
+    }
+}
+
+void TransferClient::awaitRestOfPacket() const {
+    for (;;) {
+        const auto left = std::chrono::ceil<std::chrono::milliseconds>(
+            packetDeadline_ - std::chrono::steady_clock::now());
+        if (left.count() <= 0) throw late();
+        constexpr long long kMost = 3'600'000;  // fits poll's int
+        pollfd input{descriptor_, POLLIN, 0};
+        const int ready =
+            ::poll(&input, 1, static_cast<int>(std::min<long long>(left.count(), kMost)));
+        if (ready > 0) return;
+        if (ready == -1 && errno != EINTR) throw broken();
     }
 }
 

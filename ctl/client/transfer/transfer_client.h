@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "ctl/client/deadline.h"
 #include "ctl/client/transfer/chunk_batch.h"
 #include "ctl/client/transfer/rpc_wire.h"
 
@@ -24,8 +25,8 @@ struct TransferAnswer {
 /// connection breaks, kNoOutcome when the host takes longer than the time-out.
 class TransferClient {
 public:
-    /// Connects and binds to the file transfer interface. The time-out is that of each wait for
-    /// the host.
+    /// Connects and binds to the file transfer interface. The time-out is that of each wait for the
+    /// host: for a whole answer, however few bytes of it come at a time, or for room to send in.
     TransferClient(const std::string& socketPath, std::chrono::milliseconds timeout);
     ~TransferClient();
     TransferClient(const TransferClient&) = delete;
@@ -54,8 +55,13 @@ private:
     Packet readPacket();
     void readAll(unsigned char* data, std::size_t length);
     void readMore();
+    void awaitRestOfPacket() const;
+    void limitWaits(std::chrono::milliseconds timeout);
 
     int descriptor_ = -1;
+    std::chrono::milliseconds timeout_{0};
+    Deadline packetDeadline_{};  ///< for the last byte of the packet that is being read
+    bool packetBegun_ = false;   ///< of which some bytes have come
     std::uint32_t nextCall_ = 1;
     std::size_t largestData_ = 0;
     std::vector<unsigned char> heldBack_;  ///< whole requests that are to be sent

@@ -20,6 +20,9 @@ constexpr Argument kRpcSocket =
                "appended")
         .called("PATH")
         .completedBy(Completion::LocalFile);
+constexpr Argument kHostUser =
+    textOption("--host-user", "Trust a host that this user runs, not only one's own or root's")
+        .called("NAME");
 constexpr Argument kJson = flag("--json", "Print one JSON document");
 constexpr Argument kTimeout =
     secondsOption("--timeout", "How long to wait for an answer or an outcome")
@@ -28,7 +31,7 @@ constexpr Argument kTimeout =
         // Room for a stop and a start that each use up the host's own time-out of 300 seconds.
         .otherwise("660");
 
-constexpr Argument kGlobalArgumentList[] = {kSocket, kRpcSocket, kJson, kTimeout};
+constexpr Argument kGlobalArgumentList[] = {kSocket, kRpcSocket, kHostUser, kJson, kTimeout};
 constexpr ArgumentList kGlobalArguments = kGlobalArgumentList;
 
 /// Where the host is by these options and the environment.

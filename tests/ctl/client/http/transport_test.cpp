@@ -17,6 +17,15 @@ TEST(Refusal, OfAWrongRequestIsWrongUsageAndOneForNowIsAFailure) {
     }
 }
 
+TEST(Refusal, ThatIsNoneIsTheAnswerOfNoHost) {
+    for (const unsigned status : {100U, 204U, 302U}) {
+        const ctl::Failure failure = refusal(status, R"({"error": "x"})");
+        EXPECT_EQ(failure.status(), ctl::kNoHost) << status;
+        EXPECT_EQ(failure.what(),
+                  "the host refused the request: it answers with status " + std::to_string(status));
+    }
+}
+
 TEST(Refusal, GivesTheHostsReasonElseItsStatus) {
     EXPECT_STREQ(refusal(400, R"({"error": "no such table"})").what(),
                  "the host refused the request: no such table");

@@ -42,6 +42,10 @@ public:
     void send(const std::string& bytes) const {
         ::send(socket_.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
     }
+    /// Sends a single byte; false when the client has gone.
+    bool trySend(const char* byte) const {
+        return ::send(socket_.get(), byte, 1, MSG_NOSIGNAL) == 1;
+    }
     /// Takes a bind and accepts it, with the largest fragment that is taken.
     void bind(unsigned largest) const {
         packet();

@@ -9,6 +9,7 @@
 #include "ctl/client/chunks.h"
 #include "ctl/client/failure.h"
 #include "ctl/client/transfer/made_up_host.h"
+#include "support/host/program.h"
 #include "support/scratch_dir.h"
 
 namespace {
@@ -141,6 +142,19 @@ TEST(TransferClient, AHostThatSaysNothingRunsIntoTheTimeOut) {
         EXPECT_EQ(failure.first, ctl::kNoOutcome);
         EXPECT_EQ(failure.second, "the host did not take the file within the time-out");
     }
+}
+
+TEST(TransferClient, AnAnswerThatComesByteByByteRunsIntoTheTimeOut) {
+    MadeUpHost host([](HostConnection& self) {
+        self.bind(65528);
+        self.send(std::string("\5\0\2\3\x10\0\0\0\xff\xff\0\0\2\0\0\0", 16));
+        // Each byte comes in time, and the answer in five minutes.
+        while (self.trySend("\0"))
+            sleepBriefly();
+    });
+    TransferClient client(host.path(), std::chrono::milliseconds(200));
+    const auto failure = failureOf([&] { client.receive(); });
+    EXPECT_EQ(failure.first, ctl::kNoOutcome);
 }
 
 TEST(TransferClient, AHostThatRefusesTheBindOffersNoFileTransfer) {
