@@ -179,12 +179,13 @@ Journal::Settings journalOf(const HostOptions& options) {
 void run(const HostOptions& options) {
     ras1::showSecrets(options.traceSecrets || !options.guarded);
     std::optional<HomeLock> homeLock;
-    chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);
+    // The checks look at the time-out too, and name it beside whatever else is wrong.
     if (options.guarded) {
         homeLock.emplace(guardStart(options));
     } else {
         warnOfOwner(options.home);
     }
+    chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
     SocketFile socket(options.socket);
     SocketFile transferSocket(options.rpcSocket);

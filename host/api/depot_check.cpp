@@ -17,8 +17,8 @@ using nlohmann::ordered_json;
 
 std::optional<Objection> objectionTo(Services& services, const std::string& name) {
     // The plug-in refuses this by itself, guarded or not.
-    if (services.transferRules.leadsOut(name)) {
-        return Objection{"", "the name leads out of the depot", ""};
+    if (std::string reason = services.transferRules.whyImpossible(name); !reason.empty()) {
+        return Objection{"", std::move(reason), ""};
     }
     return services.transfers.objectionTo(name);
 }
@@ -36,6 +36,8 @@ bool putFile(ordered_json& files, Services& services, const std::string& name) {
     const auto objection = objectionTo(services, name);
     file["taken"] = !objection;
     file["converted"] = services.transferRules.isConverted(name);
+    const auto arrival = services.transferRules.arrivalName(name);
+    file["replaces"] = arrival && services.depotFiles.holds(*arrival);
     if (objection) putObjection(file, *objection);
     files.push_back(std::move(file));
     return !objection;

@@ -10,10 +10,14 @@
 
 #include "host/depot/beneath.h"
 #include "host/depot/conversion_probe.h"
+#include "host/depot/obstacle.h"
 #include "host/depot/real_path.h"
 
 namespace host {
 namespace {
+
+/// Of the path of a file that the plug-in receives, in characters.
+constexpr std::size_t kLongestPath = 1024;
 
 bool isLink(const std::string& path) {
     struct stat found {};
@@ -65,6 +69,16 @@ dev_t deviceOf(std::string path) {
             path.pop_back();
     }
     return 0;
+}
+
+/// As the plug-in counts characters.
+std::size_t utf16Units(const std::string& utf8) {
+    std::size_t units = 0;
+    for (const char c : utf8) {
+        const auto byte = static_cast<unsigned char>(c);
+        if ((byte & 0xC0U) != 0x80U) units += byte >= 0xF0 ? 2U : 1U;
+    }
+    return units;
 }
 
 std::vector<std::string> realPaths(const std::vector<std::string>& paths) {
@@ -120,6 +134,17 @@ bool TransferRules::isConverted(const std::string& name) const {
 bool TransferRules::leadsOut(const std::string& name) const {
     const std::string path = arrivalName(name).value_or(name);
     return climbsOut(depot_.directory(), path) || linksOut(depot_.directory(), path);
+}
+
+std::string TransferRules::whyImpossible(const std::string& name) const {
+    if (leadsOut(name)) return "the name leads out of the depot";
+    const std::string path = pathOf(name);
+    const std::size_t length = utf16Units(codePage_.toUtf8(path));
+    if (length > kLongestPath) {
+        return "the name is too long: with the depot's path it has " + std::to_string(length) +
+               " characters, and " + std::to_string(kLongestPath) + " are the most";
+    }
+    return obstacleAt(depot_.directory(), arrivalName(name).value_or(name));
 }
 
 /// A batch that is appended follows a link in the place of the file.

@@ -48,6 +48,10 @@ public:
     /// Whether the plug-in will refuse the name because it leads out of the depot.
     bool leadsOut(const std::string& name) const;
 
+    /// Why the plug-in cannot take a transfer of that name whatever the host says: it leads out, is
+    /// too long, or something is in its way. Empty when it can.
+    std::string whyImpossible(const std::string& name) const;
+
 private:
     bool isKept(const std::string& name, const std::string& destination, bool startsFile) const;
     bool canConvertAt(const std::string& name) const;

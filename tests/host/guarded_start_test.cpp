@@ -257,10 +257,20 @@ TEST_F(GuardedStart, TheDoctorSaysWhatCheckPrints) {
 TEST_F(GuardedStart, ATimeOutThatIsNoNumberIsRefused) {
     const ProgramResult result = refused({}, {{"TIMEOUT", "five"}});
     EXPECT_EQ(result.status, 1);
-    EXPECT_EQ(result.err,
-              "zavhost: TIMEOUT takes a number of seconds from 1 to 2147483646, not \"five\"\n");
+    EXPECT_EQ(
+        result.err,
+        "zavhost: not started (see --check); time-out: TIMEOUT takes a number of seconds from "
+        "1 to 2147483646, not \"five\"; every command would be given up at once; correct "
+        "TIMEOUT, unset it, or give --task-timeout\n");
     const auto corrected = start("s", {"--task-timeout", "20"}, {{"TIMEOUT", "five"}});
     EXPECT_TRUE(isReady(*corrected, "s")) << corrected->err();
+}
+
+TEST_F(GuardedStart, ATimeOutThatIsNoNumberHidesNothingElseThatIsWrong) {
+    std::filesystem::remove(home.path("bin/TovrinAgent"));
+    const std::string said = refused({}, {{"TIMEOUT", "five"}}).err;
+    EXPECT_NE(said.find("; agent-script: "), std::string::npos) << said;
+    EXPECT_NE(said.find("; time-out: "), std::string::npos) << said;
 }
 
 TEST_F(GuardedStart, AnUnguardedHostStartsWithSuchATimeOut) {
