@@ -5,6 +5,7 @@
 #include "ctl/client/failure.h"
 #include "ctl/client/host_client.h"
 #include "ctl/client/http/percent_encoding.h"
+#include "ctl/client/row.h"
 
 using nlohmann::json;
 
@@ -38,8 +39,8 @@ json askInParts(const std::vector<std::string>& paths, const std::string& begin,
             whole = answer;
         } else {
             // Together they may replace what each request knows only a part of.
-            whole["replaced_bytes"] = whole.value("replaced_bytes", std::uint64_t{0}) +
-                                      answer.value("replaced_bytes", std::uint64_t{0});
+            whole["replaced_bytes"] =
+                countOf(whole, "replaced_bytes") + countOf(answer, "replaced_bytes");
             whole["files"].insert(whole["files"].end(), answer["files"].begin(),
                                   answer["files"].end());
         }

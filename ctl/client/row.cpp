@@ -19,6 +19,16 @@ std::string textOf(const json& row, const std::string& column) {
     return found == row.end() ? std::string() : valueText(*found);
 }
 
+bool flagOf(const json& object, const std::string& member, bool fallback) {
+    const auto found = object.find(member);
+    return found != object.end() && found->is_boolean() ? found->get<bool>() : fallback;
+}
+
+std::uint64_t countOf(const json& object, const std::string& member) {
+    const auto found = object.find(member);
+    return found != object.end() && found->is_number_unsigned() ? found->get<std::uint64_t>() : 0;
+}
+
 int returnCodeOf(const json& row) {
     const auto found = row.find("RETVAL");
     if (found == row.end() || !found->is_number_integer()) return kNoReturnCode;

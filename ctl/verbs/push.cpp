@@ -23,7 +23,9 @@ constexpr Argument kDestination =
 constexpr Argument kChecksum = flag("--checksum", "Print the SHA-256 of what arrives");
 constexpr Argument kNoVerify =
     flag("--no-verify", "Do not compare the files in the depot with what was sent");
-constexpr Argument kArguments[] = {kFile, kDestination, kChecksum, kNoVerify};
+constexpr Argument kFollow =
+    flag("--follow", "Push files outside the folder too that links in it lead to");
+constexpr Argument kArguments[] = {kFile, kDestination, kChecksum, kNoVerify, kFollow};
 
 ExitStatus run(const Invocation& invocation) {
     return print(showPush(askPush(invocation), invocation.format));
@@ -86,6 +88,10 @@ void send(const Invocation& invocation, const PushCheck& check, Pusher::Sums sum
 }
 
 void verify(const HostAddress& host, const PushCheck& check, PushReport& report) {
+    if (check.isOlder) {
+        report.verification = Verification::NotOffered;
+        return;
+    }
     if (!check.known) {
         report.verification = Verification::Unknown;
         report.whyUnknown = check.whyUnknown;
@@ -105,7 +111,9 @@ constexpr Verb kPushVerb = {
 };
 
 PushReport askPush(const Invocation& invocation) {
-    PushPlan plan = filesToPush(invocation.given.text(kFile), invocation.given.text(kDestination));
+    const Links links = invocation.given.flag(kFollow) ? Links::All : Links::Inside;
+    PushPlan plan =
+        filesToPush(invocation.given.text(kFile), invocation.given.text(kDestination), links);
     PushReport report;
     report.files = std::move(plan.files);
     report.notes = std::move(plan.skipped);

@@ -54,6 +54,13 @@ bool allArrived(const PushReport& report) {
     return !report.refused && std::all_of(report.files.begin(), report.files.end(), hasArrived);
 }
 
+/// A push that nobody could verify although that was wanted may have gone wrong unnoticed.
+ExitStatus statusOf(const PushReport& report) {
+    return allArrived(report) && report.verification != Verification::Unknown
+               ? kSuccess
+               : kHostReportedFailure;
+}
+
 json reportDocument(const PushReport& report) {
     json files = json::array();
     for (const PushedFile& file : report.files)
@@ -64,6 +71,9 @@ json reportDocument(const PushReport& report) {
     if (!report.notes.empty()) document["notes"] = report.notes;
     if (report.verification != Verification::None) {
         document["verified"] = report.verification == Verification::Done && allArrived(report);
+    }
+    if (report.verification == Verification::Unknown) {
+        document["error"] = "not verified: " + report.whyUnknown;
     }
     return document;
 }
@@ -104,7 +114,9 @@ std::string verificationText(const PushReport& report) {
             return "verified: " + counted(report.files.size(), "file", "files") + ", " +
                    counted(sum(report.files, &PushedFile::kept), "byte", "bytes") + "\n";
         case Verification::Unknown:
-            return "not verified: " + report.whyUnknown + "\n";
+            return "not verified: " + redacted(report.whyUnknown) + "\n";
+        case Verification::NotOffered:
+            return "note: not verified: the host cannot compute checksums\n";
         case Verification::None:
             break;
     }
@@ -117,7 +129,7 @@ std::size_t addFailures(const PushReport& report, std::string& text) {
     for (const PushedFile& file : report.files) {
         if (hasArrived(file)) continue;
         ++failed;
-        text += printable(file.name) + ": " + meaningOf(file, report.refused) + "\n";
+        text += printable(file.name) + ": " + redacted(meaningOf(file, report.refused)) + "\n";
         if (!file.hint.empty()) text += "  " + printable(file.hint) + "\n";
     }
     return failed;
@@ -144,7 +156,7 @@ std::string reportText(const PushReport& report) {
 }  // namespace
 
 Page showPush(const PushReport& report, Format format) {
-    const ExitStatus status = allArrived(report) ? kSuccess : kHostReportedFailure;
+    const ExitStatus status = statusOf(report);
     if (format == Format::Json) return jsonPage(reportDocument(report), status);
     return {reportText(report), {}, status};
 }

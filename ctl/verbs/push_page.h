@@ -11,9 +11,10 @@ namespace ctl {
 
 /// What is known of the files' arrival beyond the host's answers.
 enum class Verification {
-    None,     ///< nobody looked
-    Done,     ///< the host computed the files' checksums
-    Unknown,  ///< it could not be asked
+    None,        ///< nobody looked
+    Done,        ///< the host computed the files' checksums
+    Unknown,     ///< it could not be asked: what was wanted was not done
+    NotOffered,  ///< it is older and cannot be asked
 };
 
 struct PushReport {

@@ -9,6 +9,8 @@
 #include <csignal>
 #include <filesystem>
 
+#include "ctl/client/canned_host.h"
+#include "ctl/client/http/percent_encoding.h"
 #include "e2e/push_fixture.h"
 
 namespace {
@@ -257,16 +259,30 @@ TEST_F(GuardedPush, NothingIsVerifiedUnguarded) {
     EXPECT_FALSE(pushJson(files_.path("file")).contains("verified"));
 }
 
-TEST_F(GuardedPush, AHostThatCannotBeAskedLeavesItUnverified) {
+TEST_F(GuardedPush, ThatCannotBeVerifiedIsNoSuccess) {
     startGuarded();
     const std::string nobody = files_.path("nobody");
     const ProgramResult result =
         runProgram({zavctlPath(), "--socket", nobody, "--rpc-socket", host_->socket() + ".rpc",
                     "push", files_.write("file", "abc")});
-    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.status, 1);
     EXPECT_THAT(result.out, EndsWith("\nnot verified: no host reached at " + nobody +
                                      ": No such file or directory\n"));
     EXPECT_EQ(depot("file"), "abc");
+}
+
+TEST_F(GuardedPush, ToAHostThatKnowsNoChecksumsIsASuccessWithANote) {
+    startGuarded();
+    const ctl_test::CannedHost older([](const ctl_test::CannedHost& self) {
+        const ctl_test::Peer peer = self.accept();
+        peer.request();
+        peer.answer(404, R"({"error": "there is nothing at /v1/depot/check"})");
+    });
+    const ProgramResult result =
+        runProgram({zavctlPath(), "--socket", older.path(), "--rpc-socket",
+                    host_->socket() + ".rpc", "push", files_.write("file", "abc")});
+    EXPECT_EQ(result.status, 0);
+    EXPECT_THAT(result.out, EndsWith("\nnote: not verified: the host cannot compute checksums\n"));
 }
 
 // Pushes that break off ---------------------------------------------------------------------------
@@ -281,6 +297,17 @@ TEST_F(GuardedPush, AnInterruptedPushRemovesItsPartialFile) {
         EXPECT_EQ(result.err, "zavctl: interrupted; what had arrived of large is removed\n");
         EXPECT_FALSE(inDepot("large"));
     }
+}
+
+TEST_F(GuardedPush, AnInterruptedPushSaysThatTheFormerFileIsGone) {
+    files_.write("depot/large", "former");
+    startGuarded();
+    const auto program = startEndless();
+    program->signal(SIGINT);
+    EXPECT_EQ(program->wait().err,
+              "zavctl: interrupted; what had arrived of large is removed; the file that was there "
+              "before is gone\n");
+    EXPECT_FALSE(inDepot("large"));
 }
 
 TEST_F(GuardedPush, AnInterruptedPushLeavesItsPartialFileUnguarded) {
@@ -387,6 +414,72 @@ TEST_F(GuardedPush, NamesThatLeadOutAreSaidToDoSo) {
     EXPECT_EQ(result.status, 1);
     EXPECT_EQ(result.out,
               "../x: the name leads out of the depot\npush ../x: refused; nothing was sent\n");
+}
+
+/// What is said in words beforehand, and what the transfer then does.
+struct Takes {
+    bool said;
+    bool done;
+};
+
+class Names : public GuardedPush {
+protected:
+    Takes takes(const std::string& name) const {
+        const std::string answer =
+            host_->exchange("GET /v1/depot/check?path=" + ctl::percentEncoded(name) +
+                            " HTTP/1.1\r\nHost: localhost\r\nConnection: close\r\n\r\n");
+        const json document = json::parse(answer.substr(answer.find("\r\n\r\n")));
+        // Without the HTTP socket nobody is asked first.
+        const ProgramResult sent = runProgram({zavctlPath(), "--socket", files_.path("nobody"),
+                                               "--rpc-socket", host_->socket() + ".rpc", "push",
+                                               "--no-verify", files_.path("file"), name});
+        return {document["files"][0]["taken"] == true, sent.status == 0};
+    }
+    /// A path below the depot of that length together with the depot's, which ends in a slash.
+    std::string pathOfLength(std::size_t length) const {
+        std::string path;
+        while (files_.path("depot").size() + 1 + path.size() < length)
+            path += path.size() % 100 == 99 ? '/' : 'n';
+        return path;
+    }
+};
+
+TEST_F(Names, AreCheckedByTheRulesOfTheTransfer) {
+    files_.write("file", "x");
+    files_.makeDir("depot/folder");
+    files_.write("depot/plain", "x");
+    ASSERT_EQ(::symlink("nowhere", files_.path("depot/dangling").c_str()), 0);
+    ASSERT_EQ(::symlink("folder", files_.path("depot/link").c_str()), 0);
+    startGuarded();
+    for (const std::string& name :
+         {std::string("new"), std::string("new/a/b"), std::string("plain"), std::string("dangling"),
+          std::string("link/a"), std::string("folder\\b"), std::string(255, 'n'),
+          pathOfLength(1024), std::string("link")}) {
+        const Takes result = takes(name);
+        EXPECT_TRUE(result.said) << name;
+        EXPECT_TRUE(result.done) << name;
+    }
+    for (const std::string& name :
+         {std::string("folder"), std::string("folder/."), std::string("plain/a"),
+          std::string("plain/a/b"), std::string(256, 'n'), std::string(256, 'n') + "/a",
+          pathOfLength(1025), std::string("../a")}) {
+        const Takes result = takes(name);
+        EXPECT_FALSE(result.said) << name;
+        EXPECT_FALSE(result.done) << name;
+    }
+}
+
+TEST_F(Names, ThatATransferCannotTakeAreRefusedInWords) {
+    files_.makeDir("depot/folder");
+    files_.write("depot/plain", "x");
+    startGuarded();
+    const std::string file = files_.write("file", "x");
+    EXPECT_EQ(push(file, "folder").out,
+              "folder: a directory of that name is there\n"
+              "push folder: refused; nothing was sent\n");
+    EXPECT_EQ(push(file, "plain/a").out,
+              "plain/a: plain is no directory\npush plain/a: refused; nothing was sent\n");
+    EXPECT_THAT(push(file, pathOfLength(1025)).out, HasSubstr("the name is too long: with the "));
 }
 
 }  // namespace

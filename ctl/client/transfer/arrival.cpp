@@ -4,6 +4,7 @@
 
 #include "ctl/client/depot_client.h"
 #include "ctl/client/failure.h"
+#include "ctl/client/row.h"
 
 using nlohmann::json;
 
@@ -11,17 +12,24 @@ namespace ctl {
 namespace {
 
 void compare(const json& row, PushedFile& file) {
-    file.arrived = row.value("sha256", "");
+    file.arrived = textOf(row, "sha256");
     if (file.arrived == file.sha256) return;
     file.guard = "depot-verify";
-    file.problem = file.arrived.empty()
-                       ? "it cannot be verified: " + row.value("error", "the host gives no sum")
-                       : "it is not in the depot as it was sent: SHA-256 " + file.arrived +
-                             " in place of " + file.sha256;
+    const std::string error = textOf(row, "error");
+    file.problem = file.arrived.empty() ? "it cannot be verified: " +
+                                              (error.empty() ? "the host gives no sum" : error)
+                                        : "it is not in the depot as it was sent: SHA-256 " +
+                                              file.arrived + " in place of " + file.sha256;
 }
 
 std::string mayBePartial(const PushedFile& file) {
     return file.name + " may be in the depot in part";
+}
+
+/// The host empties a file when its first batch comes, and no operation of the transfer renames
+/// one, so what was there before cannot be had back. A half of each would be worse than nothing.
+std::string lossOf(const PushedFile& file) {
+    return file.replaces ? "; the file that was there before is gone" : "";
 }
 
 }  // namespace
@@ -53,9 +61,10 @@ std::vector<std::string> removePartialFiles(const HostAddress& host,
         if (!file.isPartial()) continue;
         try {
             DepotClient(host).remove(pathInDepot(file.name), false);
-            said.push_back("what had arrived of " + file.name + " is removed");
+            said.push_back("what had arrived of " + file.name + " is removed" + lossOf(file));
         } catch (const Failure& failure) {
-            said.push_back(mayBePartial(file) + ", and cannot be removed: " + failure.what());
+            said.push_back(mayBePartial(file) + ", and cannot be removed: " + failure.what() +
+                           lossOf(file));
         }
     }
     return said;
@@ -64,7 +73,7 @@ std::vector<std::string> removePartialFiles(const HostAddress& host,
 std::vector<std::string> namePartialFiles(const std::vector<PushedFile>& files) {
     std::vector<std::string> said;
     for (const PushedFile& file : files) {
-        if (file.isPartial()) said.push_back(mayBePartial(file));
+        if (file.isPartial()) said.push_back(mayBePartial(file) + lossOf(file));
     }
     return said;
 }

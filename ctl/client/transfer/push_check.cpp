@@ -5,6 +5,7 @@
 
 #include "ctl/client/depot_client.h"
 #include "ctl/client/failure.h"
+#include "ctl/client/row.h"
 #include "ctl/client/transfer/content.h"
 
 using nlohmann::json;
@@ -29,16 +30,17 @@ std::uintmax_t bytesOf(const std::vector<PushedFile>& files) {
 }
 
 void store(const json& row, PushedFile& file) {
-    file.converted = row.value("converted", false);
-    if (row.value("taken", true)) return;
-    file.problem = row.value("error", "the host does not take it");
-    file.guard = row.value("guard", "");
-    file.hint = row.value("hint", "");
+    file.converted = flagOf(row, "converted", false);
+    file.replaces = flagOf(row, "replaces", false);
+    if (flagOf(row, "taken", true)) return;
+    file.problem = textOf(row, "error");
+    if (file.problem.empty()) file.problem = "the host does not take it";
+    file.guard = textOf(row, "guard");
+    file.hint = textOf(row, "hint");
 }
 
 void refuseForSpace(const json& answer, std::uintmax_t needed) {
-    const std::uintmax_t room = answer.value("free_bytes", std::uintmax_t{0}) +
-                                answer.value("replaced_bytes", std::uintmax_t{0});
+    const std::uintmax_t room = countOf(answer, "free_bytes") + countOf(answer, "replaced_bytes");
     if (needed <= room) return;
     throw Failure(kHostReportedFailure,
                   "the push needs " + std::to_string(needed) +
@@ -86,11 +88,11 @@ PushCheck checkPush(const HostAddress& host, std::vector<PushedFile>& files) {
         return checkGuarded(files, std::move(check));
     }
     if (answer.is_null()) {
-        check.whyUnknown = "the host cannot compute checksums";
+        check.isOlder = true;
         return check;
     }
     check.known = true;
-    check.guarded = answer.value("guarded", false);
+    check.guarded = flagOf(answer, "guarded", false);
     for (std::size_t i = 0; i < files.size(); ++i)
         store(answer["files"][i], files[i]);
     if (!check.guarded) return check;

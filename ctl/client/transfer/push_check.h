@@ -10,9 +10,10 @@
 namespace ctl {
 
 struct PushCheck {
-    /// False when the host could not be asked: it is older, or nobody answers its HTTP requests.
+    /// False when the host could not be asked.
     bool known = false;
-    std::string whyUnknown;
+    bool isOlder = false;    ///< it knows neither this question nor checksums
+    std::string whyUnknown;  ///< why nobody answers; empty when somebody does
     bool guarded = false;
     bool taken = true;               ///< false: nothing should be sent
     std::vector<std::string> notes;  ///< sentences about files that change on their way

@@ -45,10 +45,20 @@ std::string whySkipped(const fs::directory_entry& entry) {
     }
 }
 
-PushPlan filesOfFolder(const std::string& folder, const std::string& destination) {
+/// Where a link to a file leads when that is outside the folder; else nothing. `root` is the
+/// folder's path without links.
+fs::path outsideTarget(const fs::directory_entry& entry, const fs::path& root) {
+    if (!entry.is_symlink()) return {};
+    fs::path target = fs::canonical(entry.path());
+    const auto [end, rest] = std::mismatch(root.begin(), root.end(), target.begin(), target.end());
+    return end == root.end() ? fs::path() : target;
+}
+
+PushPlan filesOfFolder(const std::string& folder, const std::string& destination, Links links) {
     // What the folder's path stands before; taken off as text, which is a tenth of the work of
     // comparing paths.
     const std::size_t prefix = folder == "/" ? 1 : folder.size() + 1;
+    const fs::path root = fs::canonical(folder);
     PushPlan plan;
     std::vector<PushedFile>& files = plan.files;
     for (const auto& entry : fs::recursive_directory_iterator(folder)) {
@@ -60,6 +70,13 @@ PushPlan filesOfFolder(const std::string& folder, const std::string& destination
             if (!why.empty()) plan.skipped.push_back(relative + " is not pushed: " + why);
             continue;
         }
+        const fs::path outside = links == Links::All ? fs::path() : outsideTarget(entry, root);
+        if (!outside.empty()) {
+            plan.skipped.push_back(relative +
+                                   " is not pushed: the link leads out of the folder, to " +
+                                   outside.native() + "; --follow pushes that file");
+            continue;
+        }
         refuseBackslash(relative);
         files.push_back({source, destination + "/" + relative, entry.file_size(), 0, {}});
     }
@@ -69,14 +86,16 @@ PushPlan filesOfFolder(const std::string& folder, const std::string& destination
     return plan;
 }
 
-PushPlan filesOf(const std::string& source, const std::string& destination) {
+PushPlan filesOf(const std::string& source, const std::string& destination, Links links) {
     const fs::path path = withoutTrailingSlashes(source);
     std::error_code error;
     const fs::file_status found = fs::status(path, error);
     if (!fs::exists(found)) throw Failure(kWrongUsage, "there is no " + source);
     const std::string base = fs::absolute(path).filename().string();
     const std::string name = nameInDepot(base, destination);
-    if (fs::is_directory(found)) return filesOfFolder(path.native(), withoutTrailingSlashes(name));
+    if (fs::is_directory(found)) {
+        return filesOfFolder(path.native(), withoutTrailingSlashes(name), links);
+    }
     if (!fs::is_regular_file(found)) throw Failure(kWrongUsage, source + " is no regular file");
     refuseBackslash(base);
     return {{{path.native(), name, fs::file_size(path), 0, {}}}, {}};
@@ -102,10 +121,13 @@ bool leadsOutOfDepot(const std::string& name) {
     return false;
 }
 
-PushPlan filesToPush(const std::string& source, const std::string& destination) {
+PushPlan filesToPush(const std::string& source, const std::string& destination, Links links) {
     try {
-        PushPlan plan = filesOf(source, destination);
-        if (plan.files.empty()) throw Failure(kWrongUsage, source + " holds no files");
+        PushPlan plan = filesOf(source, destination, links);
+        if (plan.files.empty()) {
+            const std::string why = plan.skipped.empty() ? std::string() : plan.skipped.front();
+            throw Failure(kWrongUsage, source + " holds no files", why);
+        }
         return plan;
     } catch (const fs::filesystem_error& error) {
         throw Failure(kWrongUsage,

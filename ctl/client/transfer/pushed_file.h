@@ -16,6 +16,7 @@ struct PushedFile {
     std::uintmax_t sent = 0;  ///< bytes that the host took
     TransferAnswer worst;     ///< for the first batch that the host did not take
 
+    bool replaces = false;    ///< the depot holds a file of this name already
     bool converted = false;   ///< the host will drop carriage returns and Ctrl-Z
     std::string sha256{};     ///< of what the depot shall hold; empty when it is not computed
     std::uintmax_t kept = 0;  ///< bytes of that
@@ -47,11 +48,18 @@ struct PushPlan {
     std::vector<std::string> skipped;
 };
 
-/// The files below `source` in the order of their names, or the one file that it is. Links to files
-/// count as files. `destination` is the name in the depot: the source's own name if empty, and a
+/// Which links to files count as files when a folder is pushed.
+enum class Links {
+    Inside,  ///< those that stay inside it: others may give away what nobody meant to send
+    All,
+};
+
+/// The files below `source` in the order of their names, or the one file that it is, whatever link
+/// leads to that. `destination` is the name in the depot: the source's own name if empty, and a
 /// directory to put it in if it ends in "/". Throws Failure(kWrongUsage) when there is nothing to
 /// push or it cannot be read.
-PushPlan filesToPush(const std::string& source, const std::string& destination);
+PushPlan filesToPush(const std::string& source, const std::string& destination,
+                     Links links = Links::Inside);
 
 /// The path of a pushed file below the depot, as the host's HTTP interface takes it: slashes for
 /// backslashes, and none at the start.

@@ -35,4 +35,15 @@ TEST(Row, GivesAnObjectWithBytesThatAreNoTextAsMendedJson) {
     EXPECT_EQ(ctl::valueText(json{{"A", "\xff"}}), "{\"A\":\"\xef\xbf\xbd\"}");
 }
 
+TEST(Row, TakesMembersOfAnotherTypeForMissingOnes) {
+    const json row = {{"YES", true}, {"SIZE", 7}, {"WORD", "x"}, {"LESS", -1}};
+    EXPECT_TRUE(ctl::flagOf(row, "YES", false));
+    EXPECT_TRUE(ctl::flagOf(row, "WORD", true));
+    EXPECT_FALSE(ctl::flagOf(json::array({1}), "YES", false));
+    EXPECT_EQ(ctl::countOf(row, "SIZE"), 7U);
+    for (const char* member : {"WORD", "LESS", "NONE"})
+        EXPECT_EQ(ctl::countOf(row, member), 0U) << member;
+    EXPECT_EQ(ctl::countOf(json(7), "SIZE"), 0U);
+}
+
 }  // namespace

@@ -87,16 +87,32 @@ TEST(Push, IsAFailureWhenAFileIsNotInTheDepotAsItWasSent) {
     EXPECT_EQ(document["files"][1]["meaning"], "it changed");
 }
 
-TEST(Push, SaysWhyNothingIsVerified) {
+TEST(Push, ThatCouldNotBeVerifiedIsAFailureAndSaysWhy) {
     PushReport report;
     report.files = {arrived("a", "aa")};
     report.seconds = 1;
     report.verification = ctl::Verification::Unknown;
-    report.whyUnknown = "the host cannot compute checksums";
+    report.whyUnknown = "no answer within the time-out";
     const Page page = ctl::showPush(report, Format::Text);
     EXPECT_EQ(page.out,
               "push a: done; 10 B in 1.00 s, 10 B/s\n"
-              "not verified: the host cannot compute checksums\n");
+              "not verified: no answer within the time-out\n");
+    EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+    const Page asJson = ctl::showPush(report, Format::Json);
+    EXPECT_EQ(asJson.status, ctl::kHostReportedFailure);
+    EXPECT_EQ(json::parse(asJson.out)["verified"], false);
+    EXPECT_EQ(json::parse(asJson.out)["error"], "not verified: no answer within the time-out");
+}
+
+TEST(Push, ToAHostThatKnowsNoChecksumsIsASuccessWithANote) {
+    PushReport report;
+    report.files = {arrived("a", "aa")};
+    report.seconds = 1;
+    report.verification = ctl::Verification::NotOffered;
+    const Page page = ctl::showPush(report, Format::Text);
+    EXPECT_EQ(page.out,
+              "push a: done; 10 B in 1.00 s, 10 B/s\n"
+              "note: not verified: the host cannot compute checksums\n");
     EXPECT_EQ(page.status, ctl::kSuccess);
     EXPECT_EQ(json::parse(ctl::showPush(report, Format::Json).out)["verified"], false);
 }

@@ -90,6 +90,25 @@ TEST(RemovePartialFiles, TouchesNoFileThatIsWholeOrNotOurs) {
               std::vector<std::string>{"begun may be in the depot in part"});
 }
 
+TEST(RemovePartialFiles, SayThatTheFormerFileIsGone) {
+    std::vector<PushedFile> files = {fileWithSum("begun", "")};
+    files[0].isSent = false;
+    files[0].replaces = true;
+    {
+        const CannedHost host(answering(200, "{}"));
+        EXPECT_EQ(
+            ctl::removePartialFiles(addressOf(host), files),
+            std::vector<std::string>{"what had arrived of begun is removed; the file that was "
+                                     "there before is gone"});
+    }
+    EXPECT_EQ(ctl::namePartialFiles(files),
+              std::vector<std::string>{"begun may be in the depot in part; the file that was there "
+                                       "before is gone"});
+    const CannedHost host(answering(409, R"({"error": "busy"})"));
+    EXPECT_THAT(ctl::removePartialFiles(addressOf(host), files).at(0),
+                testing::EndsWith("busy; the file that was there before is gone"));
+}
+
 TEST(RemovePartialFiles, NamesWhatCannotBeRemoved) {
     std::vector<PushedFile> files = {fileWithSum("begun", "")};
     files[0].isSent = false;

@@ -81,6 +81,54 @@ TEST(FilesToPush, NamesWhatAFolderHoldsBesideFiles) {
                                    "to_nothing is not pushed: the link leads nowhere"}));
 }
 
+TEST(FilesToPush, LeaveOutLinksThatLeadOutOfTheFolderUnlessTheyAreToBeFollowed) {
+    const ScratchDir scratch;
+    const std::string secret = scratch.write("secret", "x");
+    scratch.write("bundle/file", "x");
+    scratch.makeDir("bundle/sub");
+    scratch.write("bundle-2/near", "x");
+    ASSERT_EQ(::symlink("../secret", scratch.path("bundle/out").c_str()), 0);
+    ASSERT_EQ(::symlink(secret.c_str(), scratch.path("bundle/sub/absolute").c_str()), 0);
+    ASSERT_EQ(::symlink("../bundle-2/near", scratch.path("bundle/near").c_str()), 0);
+    ASSERT_EQ(::symlink("../file", scratch.path("bundle/sub/inside").c_str()), 0);
+    ASSERT_EQ(::symlink("bundle", scratch.path("alias").c_str()), 0);
+    const auto note = [](const std::string& name, const std::string& target) {
+        return name + " is not pushed: the link leads out of the folder, to " + target +
+               "; --follow pushes that file";
+    };
+    for (const char* source : {"bundle", "alias"}) {
+        const ctl::PushPlan plan = filesToPush(scratch.path(source), "b");
+        EXPECT_EQ(namesOf(plan), (Names{"b/file", "b/sub/inside"}));
+        EXPECT_EQ(plan.skipped, (Names{note("near", scratch.path("bundle-2/near")),
+                                       note("out", secret), note("sub/absolute", secret)}));
+    }
+    const ctl::PushPlan all = filesToPush(scratch.path("bundle"), "b", ctl::Links::All);
+    EXPECT_EQ(namesOf(all), (Names{"b/file", "b/near", "b/out", "b/sub/absolute", "b/sub/inside"}));
+    EXPECT_EQ(all.skipped, Names{});
+}
+
+TEST(FilesToPush, FollowTheLinkThatIsNamed) {
+    const ScratchDir scratch;
+    scratch.write("elsewhere/file", "x");
+    scratch.makeDir("here");
+    ASSERT_EQ(::symlink("../elsewhere/file", scratch.path("here/link").c_str()), 0);
+    EXPECT_EQ(namesOf(filesToPush(scratch.path("here/link"), "")), Names{"link"});
+}
+
+TEST(FilesToPush, OfAFolderOfWhichNothingIsPushedSaysWhy) {
+    const ScratchDir scratch;
+    scratch.write("secret", "x");
+    scratch.makeDir("bundle");
+    ASSERT_EQ(::symlink("../secret", scratch.path("bundle/out").c_str()), 0);
+    try {
+        filesToPush(scratch.path("bundle"), "");
+        FAIL();
+    } catch (const ctl::Failure& failure) {
+        EXPECT_EQ(failure.what(), scratch.path("bundle") + " holds no files");
+        EXPECT_NE(failure.hint().find("out is not pushed: "), std::string::npos) << failure.hint();
+    }
+}
+
 TEST(PushedFile, IsPartialOnceSomethingOfItHasArrived) {
     PushedFile file;
     file.unanswered = 1;
