@@ -1,5 +1,6 @@
 #include "ctl/client/host_client.h"
 
+#include <algorithm>
 #include <boost/beast/core/flat_buffer.hpp>
 #include <boost/beast/http.hpp>
 
@@ -99,6 +100,9 @@ QueryAnswer HostClient::query(const TableQuery& query, Deadline deadline,
     json answer = documentOf(exchange(socketPath_, request, deadline, tick));
     const auto rows = answer.find("rows");
     if (rows == answer.end() || !rows->is_array()) throw senseless("has no rows");
+    const bool areRows =
+        std::all_of(rows->begin(), rows->end(), [](const json& row) { return row.is_object(); });
+    if (!areRows) throw senseless("has rows that are none");
     if (rows->size() > kMostRows) throw senseless("has more than 1,000,000 rows");
     return {std::move(*rows), listIn(answer, "warnings"), listIn(answer, "full")};
 }

@@ -22,19 +22,22 @@ namespace {
 
 constexpr Argument kOnlyTransid =
     textOption("--transid", "Only this transaction").completedBy(Completion::Transaction);
-constexpr Argument kCount = numberOption("--count", "End after so many");
+constexpr Argument kCount = numberOption("--count", "End after so many").between(1, 1e9);
 constexpr Argument kArguments[] = {kOnlyTransid, kCount};
 
-/// An interrupted stream is a finished one: the document is closed and the status is success. Makes
-/// only async-signal-safe calls. Nothing waits in a buffer, because every event was flushed.
-void endDocument(int) {
+/// Shells know a program that was ended by a signal by this status.
+constexpr int kSignalled = 128;
+
+/// The document is whole however the stream ends. Makes only async-signal-safe calls. Nothing waits
+/// in a buffer, because every event was flushed.
+void endDocument(int signal) {
     static const char kEnd[] = "\n]}\n";
     [[maybe_unused]] const ssize_t written = ::write(STDOUT_FILENO, kEnd, sizeof kEnd - 1);
-    ::_exit(kSuccess);
+    ::_exit(kSignalled + signal);
 }
 
-void endStream(int) {
-    ::_exit(kSuccess);
+void endStream(int signal) {
+    ::_exit(kSignalled + signal);
 }
 
 /// Prints events as they come. As JSON they are one document, which is whole however the stream

@@ -41,6 +41,7 @@ json askStatus(const Invocation& invocation) {
 }
 
 Page showStatus(const json& health, Format format) {
+    if (!health.is_object()) throw Failure(kNoHost, "the host's answer does not say how it is");
     if (format == Format::Json) return jsonPage(health);
     return {recordsText(json::array({readable(health)})), {}};
 }

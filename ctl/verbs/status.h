@@ -11,6 +11,7 @@ struct Invocation;
 
 /// The host's health document.
 nlohmann::json askStatus(const Invocation& invocation);
+/// Throws Failure when it is no such document.
 Page showStatus(const nlohmann::json& health, Format format);
 
 }  // namespace ctl

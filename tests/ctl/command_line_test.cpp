@@ -212,4 +212,20 @@ TEST(CommandLine, AnswersWhatNeedsNoVerb) {
               ctl::groupHelp(*ctl::findVerbGroup("config")));
 }
 
+TEST(CommandLine, TakesNoCountOfNoEventsAtAll) {
+    const CommandLine line = parseCommandLine({"events", "--count", "0"});
+    EXPECT_EQ(line.verb, nullptr);
+    EXPECT_EQ(line.page.status, ctl::kWrongUsage);
+    EXPECT_NE(line.page.err.find("\"0\" is not a whole number from 1"), std::string::npos)
+        << line.page.err;
+    EXPECT_EQ(parseCommandLine({"events", "--count", "1"}).verb, &ctl::kEventsVerb);
+}
+
+TEST(CommandLine, ForcesNoQueryThatDoesNotAct) {
+    const CommandLine line = parseCommandLine({"query", "KAGREQT", "COMMAND=STOP", "--force"});
+    EXPECT_EQ(line.verb, nullptr);
+    EXPECT_NE(line.page.err.find("--force goes only with --yes"), std::string::npos)
+        << line.page.err;
+}
+
 }  // namespace

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include <csignal>
+#include <filesystem>
 #include <nlohmann/json.hpp>
 #include <optional>
 
@@ -68,6 +69,18 @@ TEST_F(ControlGuards, AnUnguardedHostGetsAQueryThatActs) {
         << "the reply's RETVAL";
 }
 
+TEST_F(ControlGuards, AQueryThatActsIsForcedPastTheInventoryOnlyWhenAsked) {
+    start(Guards::On);
+    const std::vector<std::string> query = {"query",      "KAGREQT",   "COMMAND=STOP",
+                                            "PRODUCT=no", "TRANSID=T", "--yes"};
+    EXPECT_EQ(zavctl(query).status, 1);
+    EXPECT_TRUE(home.agentCalls().empty());
+    std::vector<std::string> forced = query;
+    forced.emplace_back("--force");
+    EXPECT_EQ(zavctl(forced).status, 0);
+    EXPECT_TRUE(eventually([&] { return home.agentCalls().size() == 1; }));
+}
+
 TEST_F(ControlGuards, AnImportWithoutAMetafileIsWrongUsage) {
     start(Guards::On);
     for (const std::vector<std::string>& line :
@@ -121,6 +134,39 @@ TEST_F(ControlGuards, AFailureComesWithTheCommandsLastWords) {
     EXPECT_THAT(result.out, HasSubstr("  end:     exit code 3\n"));
     EXPECT_THAT(result.out, HasSubstr("  standard output:\n    3\n    4\n"));
     EXPECT_THAT(result.out, HasSubstr("    12\n  standard error:\n    no licence\n"));
+}
+
+TEST_F(ControlGuards, PasswordsInCommandsAndTheirOutputAreNotShownToPeople) {
+    start(Guards::On);
+    const ProgramResult result =
+        zavctl({"install", "ux", "6.1", "--transid", "T", "--", "/bin/sh", "-c",
+                "echo token: hunter2; exit 3", "--password=hunter2"});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_THAT(result.out, HasSubstr("--password=***"));
+    EXPECT_THAT(result.out, HasSubstr("    token: ***\n"));
+    EXPECT_THAT(result.out + result.err, Not(HasSubstr("hunter2")));
+    EXPECT_THAT(zavctl({"task", "show", "T"}).out, Not(HasSubstr("hunter2")));
+}
+
+TEST_F(ControlGuards, AConfigurationThatCannotBeReadComesWithTheCommandsLastWords) {
+    home.products({"ux"}, "echo no licence >&2; exit 3");
+    start(Guards::On);
+    const ProgramResult result = zavctl({"config", "get", "ux"});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "");
+    EXPECT_THAT(result.err, ContainsRegex("^zavctl: config get ux: failed; ZAV1008E: "));
+    EXPECT_THAT(result.err, HasSubstr("/zav_xa "));
+    EXPECT_THAT(result.err, HasSubstr("  end:     exit code 3\n"));
+    EXPECT_THAT(result.err, HasSubstr("  standard error:\n    no licence\n"));
+    const json document = json::parse(zavctl({"--json", "config", "get", "ux"}).out);
+    EXPECT_EQ(document["details"]["commands"].at(0)["exit"], 3);
+}
+
+TEST_F(ControlGuards, AFetchedOutcomeNamesTheTransactionThatWasAskedWith) {
+    start(Guards::On);
+    const ProgramResult result = zavctl({"complete-install", "--transid", "night run"});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_THAT(result.out, HasSubstr("complete-install (night run): failed after "));
 }
 
 TEST_F(ControlGuards, AnInstallThatTheInventoryDoesNotShowIsNoSuccess) {
@@ -190,6 +236,12 @@ protected:
 
 constexpr const char* kChange = "sed -i s/INTERVAL=5/INTERVAL=6/ \"$1\"";
 
+/// An editor whose user takes so long that somebody else sets another configuration meanwhile.
+std::string slowChange(const ManagedHost& host) {
+    return std::string(kChange) + "; " + zavctlPath() + " --socket " + host.socket() +
+           " config set ux 'INSTANCE=\nINTERVAL=7\n'";
+}
+
 TEST_F(LongConfiguration, IsReadAndEditedWhole) {
     start(Guards::On);
     const std::string before = host->zavctl({"config", "get", "ux"}).out;
@@ -207,6 +259,28 @@ TEST_F(LongConfiguration, IsCutByAnUnguardedHost) {
     const ProgramResult result = host->zavctl({"config", "get", "ux"});
     EXPECT_EQ(result.status, 0);
     EXPECT_LE(result.out.size(), 3073U);
+}
+
+TEST_F(LongConfiguration, ThatChangedWhileItWasEditedIsNotOverwritten) {
+    start(Guards::On);
+    const ProgramResult result = edit(slowChange(*host));
+    EXPECT_EQ(result.status, 1) << result.out;
+    EXPECT_THAT(
+        result.err,
+        HasSubstr("zavctl: config edit ux: the configuration has changed on the host while "
+                  "it was edited\n  zavctl config get ux shows it as it is now; your text is "
+                  "kept in " +
+                  home.files().path("edits") + "/zavctl."));
+    EXPECT_THAT(host->zavctl({"config", "get", "ux"}).out, HasSubstr("INTERVAL=7\n"));
+    const std::string path = result.err.substr(result.err.find(home.files().path("edits")));
+    EXPECT_THAT(runProgram({"/bin/cat", path.substr(0, path.find('\n'))}).out,
+                HasSubstr("INTERVAL=6\n"));
+}
+
+TEST_F(LongConfiguration, ThatChangedWhileItWasEditedIsOverwrittenOnAnUnguardedHost) {
+    start(Guards::Off);
+    EXPECT_EQ(edit(slowChange(*host)).status, 0);
+    EXPECT_THAT(host->zavctl({"config", "get", "ux"}).out, HasSubstr("INTERVAL=6\n"));
 }
 
 TEST_F(LongConfiguration, ThatWasNotTakenIsKeptForItsAuthor) {
@@ -244,6 +318,44 @@ TEST_F(ControlGuards, CtrlCNamesTheTaskAndTheWayToItsOutcome) {
     EXPECT_THAT(work.out, HasSubstr("/bin/TovrinAgent "));
     ASSERT_TRUE(eventually([&] { return zavctl({"ps"}).out == "Nothing is at work.\n"; }));
     EXPECT_THAT(zavctl({"task", "show", "T-1"}).out, HasSubstr("T-1: START ux, done\n"));
+}
+
+/// zavctl with SIGINT as a terminal's user has it: where the tests run in the background, it may be
+/// ignored.
+std::vector<std::string> interruptible(const ManagedHost& host,
+                                       const std::vector<std::string>& verb) {
+    std::vector<std::string> line = {"/usr/bin/env", "--default-signal=INT", zavctlPath(),
+                                     "--socket", host.socket()};
+    line.insert(line.end(), verb.begin(), verb.end());
+    return line;
+}
+
+/// Whether a process has a connection.
+bool isConnected(pid_t pid) {
+    const std::string descriptors = "/proc/" + std::to_string(pid) + "/fd";
+    std::error_code gone;
+    for (const auto& entry : std::filesystem::directory_iterator(descriptors, gone)) {
+        const auto target = std::filesystem::read_symlink(entry, gone).string();
+        if (target.rfind("socket:", 0) == 0) return true;
+    }
+    return false;
+}
+
+TEST_F(ControlGuards, CtrlCNamesTheRequestOfVerbsThatAreAnsweredAtOnceToo) {
+    start(Guards::On);
+    ::kill(host->pid(), SIGSTOP);
+    for (const std::vector<std::string>& verb :
+         {std::vector<std::string>{"complete-install", "--transid", "T-2"},
+          {"config", "get", "ux"}}) {
+        Program waiting(interruptible(*host, verb));
+        ASSERT_TRUE(eventually([&] { return isConnected(waiting.pid()); }));
+        waiting.signal(SIGINT);
+        const ProgramResult result = waiting.wait();
+        EXPECT_EQ(result.status, 130);
+        EXPECT_THAT(result.err, ContainsRegex("^zavctl: interrupted; the host goes on with task "
+                                              "(T-2|zavctl-[-0-9a-f]+)\n  zavctl task "));
+    }
+    ::kill(host->pid(), SIGCONT);
 }
 
 TEST_F(ControlGuards, OnlyATerminalIsColouredUnlessItIsNotWanted) {

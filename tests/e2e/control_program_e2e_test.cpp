@@ -286,7 +286,7 @@ TEST(ControlProgram, EventsThatEndWithTheHostAreStatusThreeAndAWholeDocument) {
     EXPECT_EQ(json::parse(result.out)["events"].size(), 1U);
 }
 
-TEST(ControlProgram, InterruptedEventsAreASuccessAndAWholeDocument) {
+TEST(ControlProgram, InterruptedEventsEndAsSignalledAndAreAWholeDocument) {
     ScriptHome home;
     ManagedHost host(home.path());
     for (const int number : {SIGINT, SIGTERM}) {
@@ -296,7 +296,7 @@ TEST(ControlProgram, InterruptedEventsAreASuccessAndAWholeDocument) {
         ASSERT_TRUE(events->awaitOutput("\"T\"", std::chrono::seconds(20)));
         events->signal(number);
         const ProgramResult result = events->wait();
-        EXPECT_EQ(result.status, 0);
+        EXPECT_EQ(result.status, 128 + number);
         EXPECT_EQ(json::parse(result.out)["events"].size(), 1U);
     }
 }

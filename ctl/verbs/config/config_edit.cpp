@@ -7,6 +7,7 @@
 #include <optional>
 
 #include "ctl/client/failure.h"
+#include "ctl/client/guarded.h"
 #include "ctl/client/interruption.h"
 #include "ctl/client/row.h"
 #include "ctl/client/whole_file.h"
@@ -88,6 +89,26 @@ void refuseCut(const std::string& product, const Configuration& configuration) {
         "Write the whole text to a file and use: zavctl config set " + product + " --file FILE");
 }
 
+/// The failure with a hint that says where the text is.
+Failure keeping(EditedFile& file, const Failure& failure) {
+    const std::string hint = failure.hint().empty() ? "" : failure.hint() + "; ";
+    return {failure.status(), failure.what(), hint + file.keep(), failure.guard()};
+}
+
+/// What somebody else has set while the editor was open would be lost without a word. Between this
+/// look and the change is a moment that no request of the host's closes.
+void refuseIfChanged(const Invocation& invocation, const std::string& product,
+                     const Configuration& before) {
+    if (!isGuarded(invocation.host, invocation.deadline())) return;
+    const Configuration now = askConfiguration(invocation.host, invocation.format, product,
+                                               invocation.given.text(kTarget));
+    if (returnCodeOf(now.row) == 0 && now.text == before.text) return;
+    throw Failure(kHostReportedFailure,
+                  "config edit " + product +
+                      ": the configuration has changed on the host while it was edited",
+                  "zavctl config get " + product + " shows it as it is now");
+}
+
 /// Sends the new text; keeps it where it is unless the host has taken it.
 ExitStatus send(const Invocation& invocation, const TaskRequest& request, EditedFile& file) {
     const QueuedCommand command{request, "config edit " + request.product};
@@ -98,8 +119,7 @@ ExitStatus send(const Invocation& invocation, const TaskRequest& request, Edited
         if (page.status != kSuccess) page.err += complaint(file.keep());
         return print(page);
     } catch (const Failure& failure) {
-        const std::string hint = failure.hint().empty() ? "" : failure.hint() + "; ";
-        throw Failure(failure.status(), failure.what(), hint + file.keep(), failure.guard());
+        throw keeping(file, failure);
     }
 }
 
@@ -109,13 +129,20 @@ ExitStatus run(const Invocation& invocation) {
     const Configuration configuration =
         askConfiguration(invocation.host, invocation.format, product, target);
     const json& row = configuration.row;
-    if (returnCodeOf(row) != 0) return print(showNoConfiguration("config edit " + product, row));
+    if (returnCodeOf(row) != 0) {
+        return print(showNoConfiguration("config edit " + product, configuration));
+    }
     refuseCut(product, configuration);
     std::string before = configuration.text;
     if (before.empty() || before.back() != '\n') before += '\n';
     EditedFile file(before);
     const std::string after = file.edit();
     if (after == before) return print(showUnchanged(product, row, invocation.format));
+    try {
+        refuseIfChanged(invocation, product, configuration);
+    } catch (const Failure& failure) {
+        throw keeping(file, failure);
+    }
     return send(invocation, configurationRequest(product, target, after), file);
 }
 

@@ -5,12 +5,14 @@
 #include "ctl/client/guarded.h"
 #include "ctl/client/row.h"
 #include "ctl/client/task.h"
+#include "ctl/show/command_report.h"
 #include "ctl/show/message_catalogue.h"
 #include "ctl/show/printable.h"
 #include "ctl/show/running_clock.h"
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/arguments/common_arguments.h"
 #include "ctl/verbs/invocation.h"
+#include "ctl/verbs/tasks/queued.h"
 #include "ctl/verbs/verb_table.h"
 
 using nlohmann::json;
@@ -49,7 +51,7 @@ constexpr Verb kConfigGetVerb = {
 };
 
 Configuration configurationIn(const QueryAnswer& answer) {
-    Configuration configuration{answer.rows.front(), answer.full, {}};
+    Configuration configuration{answer.rows.front(), answer.full, {}, true, nullptr};
     if (const json* const whole = fullContext(answer.full)) {
         configuration.text = (*whole)["text"].get<std::string>();
         configuration.isWhole = whole->value("complete", json()) == true;
@@ -67,9 +69,12 @@ Configuration askConfiguration(const HostAddress& host, Format format, const std
     request.command = "GETCONFIG";
     request.product = product;
     request.targetmsn = target;
+    request.transid = makeTransid();
+    const InterruptNote note = interruptNote(request.transid, format);
     RunningClock clock("config get " + product, format == Format::Text);
     Task task(host, request, [&clock] { clock.tick(); });
     Configuration configuration = configurationIn(task.askNow());
+    if (returnCodeOf(configuration.row) != 0) configuration.record = task.record();
     if (!configuration.isWhole) configuration.isWhole = !isGuarded(host, task.deadline());
     return configuration;
 }
@@ -87,18 +92,24 @@ Page showConfiguration(const std::string& product, const Configuration& configur
     if (format == Format::Json) {
         json document = row;
         if (!configuration.full.empty()) document["full"] = configuration.full;
+        if (const json commands = commandsOf(configuration.record); !commands.empty()) {
+            document["details"] = {{"commands", commands}};
+        }
         page.out = jsonText(document);
         return page;
     }
-    if (!isThere) return showNoConfiguration("config get " + product, row);
+    if (!isThere) return showNoConfiguration("config get " + product, configuration);
     page.isVerbatim = true;
     page.out = configuration.text;
     if (!page.out.empty() && page.out.back() != '\n') page.out += '\n';
     return page;
 }
 
-Page showNoConfiguration(const std::string& title, const json& row) {
-    return {{}, complaint(title + ": failed; " + describeRow(row)), kHostReportedFailure};
+Page showNoConfiguration(const std::string& title, const Configuration& configuration) {
+    const std::string reason = title + ": failed; " + describeRow(configuration.row);
+    return {{},
+            complaint(reason) + failureReport(commandsOf(configuration.record)),
+            kHostReportedFailure};
 }
 
 }  // namespace ctl

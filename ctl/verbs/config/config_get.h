@@ -20,13 +20,15 @@ struct Configuration {
     nlohmann::json full;  ///< the texts beside it, see QueryAnswer
     std::string text;     ///< as much as there is of it
     bool isWhole = true;  ///< false if it is cut, or may be
+    /// What the host knows of a request that failed, see Task::record(); else null.
+    nlohmann::json record = nullptr;
 };
 
 /// What an answer to a request for a configuration holds. The answer has a row.
 Configuration configurationIn(const QueryAnswer& answer);
 
 /// Asks the host for a configuration. An empty target means the default instance. An unguarded
-/// host's text counts as whole, whatever its length.
+/// host's text counts as whole, whatever its length. Ctrl-C meanwhile names the task.
 Configuration askConfiguration(const HostAddress& host, Format format, const std::string& product,
                                const std::string& target);
 
@@ -34,7 +36,8 @@ Configuration askConfiguration(const HostAddress& host, Format format, const std
 Page showConfiguration(const std::string& product, const Configuration& configuration,
                        Format format);
 
-/// What is said when the host could not give a configuration; `title` is the command.
-Page showNoConfiguration(const std::string& title, const nlohmann::json& row);
+/// What is said when the host could not give a configuration: why, and the commands that it ran.
+/// `title` is the command.
+Page showNoConfiguration(const std::string& title, const Configuration& configuration);
 
 }  // namespace ctl

@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/depot_client.h"
+#include "ctl/client/row.h"
 #include "ctl/client/transfer/pushed_file.h"
 #include "ctl/show/printable.h"
 #include "ctl/show/table.h"
@@ -23,12 +24,12 @@ constexpr Argument kArguments[] = {kPath, kLong};
 ExitStatus run(const Invocation& invocation) {
     const std::string path = pathInDepot(invocation.given.text(kPath));
     return print(showDepot(DepotClient(invocation.host).list(path), invocation.given.flag(kLong),
-                           invocation.format));
+                           invocation.format, std::chrono::system_clock::now()));
 }
 
 /// Folders are marked as such.
 std::string nameOf(const json& entry) {
-    return printable(entry.value("name", "")) + (entry.value("type", "") == "directory" ? "/" : "");
+    return printable(textOf(entry, "name")) + (textOf(entry, "type") == "directory" ? "/" : "");
 }
 
 std::string namesText(const json& entries) {
@@ -38,12 +39,12 @@ std::string namesText(const json& entries) {
     return text;
 }
 
-std::string longText(const json& entries) {
+std::string longText(const json& entries, WallTime now) {
     json rows = json::array();
     for (const json& entry : entries) {
-        rows.push_back({{"type", entry.value("type", "")},
-                        {"bytes", std::to_string(entry.value("bytes", std::uint64_t{0}))},
-                        {"modified", entry.value("modified", "")},
+        rows.push_back({{"type", textOf(entry, "type")},
+                        {"bytes", textOf(entry, "bytes")},
+                        {"modified", timeText(textOf(entry, "modified"), now)},
                         {"name", nameOf(entry)}});
     }
     return tableText(
@@ -58,12 +59,16 @@ constexpr Verb kDepotLsVerb = {
     run,
 };
 
-Page showDepot(const json& listing, bool isLong, Format format) {
+Page showDepot(const json& listing, bool isLong, Format format, WallTime now) {
+    const auto found = listing.find("entries");
+    if (found == listing.end() || !found->is_array()) {
+        throw Failure(kNoHost, "the host's answer is not a list of what the depot holds");
+    }
     if (format == Format::Json) return jsonPage(listing);
-    const json entries = listing.value("entries", json::array());
+    const json& entries = *found;
     Page page;
-    if (!entries.empty()) page.out = isLong ? longText(entries) : namesText(entries);
-    if (!listing.value("complete", true)) {
+    if (!entries.empty()) page.out = isLong ? longText(entries, now) : namesText(entries);
+    if (!flagOf(listing, "complete", true)) {
         page.err = complaint("the folder holds more; these are " + std::to_string(entries.size()) +
                              " of its entries");
     }

@@ -4,7 +4,6 @@
 
 #include "ctl/client/depot_client.h"
 #include "ctl/client/transfer/pushed_file.h"
-#include "ctl/show/printable.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
 
@@ -31,8 +30,9 @@ ExitStatus run(const Invocation& invocation) {
         } catch (const Failure& failure) {
             if (failure.status() == kNoHost || failure.status() == kNoOutcome) throw;
             failed.push_back({{"path", given}, {"error", failure.what()}});
-            page.err += complaint(printable(failure.what()));
-            page.status = kHostReportedFailure;
+            page.err += failurePage(failure, Format::Text).err;
+            // Of several the first, as if the others had not been asked for.
+            if (page.status == kSuccess) page.status = failure.status();
         }
     }
     if (invocation.format == Format::Text) return print(page);

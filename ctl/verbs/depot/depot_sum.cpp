@@ -4,6 +4,7 @@
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/depot_client.h"
+#include "ctl/client/row.h"
 #include "ctl/client/transfer/pushed_file.h"
 #include "ctl/show/printable.h"
 #include "ctl/verbs/invocation.h"
@@ -37,11 +38,12 @@ constexpr Verb kDepotSumVerb = {
 Page showSums(const json& rows, Format format) {
     Page page;
     for (const json& row : rows) {
-        if (row.contains("sha256")) {
-            page.out += row.value("sha256", "") + "  " + printable(row.value("path", "")) + "\n";
+        if (const std::string sum = textOf(row, "sha256"); !sum.empty()) {
+            page.out += printable(sum) + "  " + printable(textOf(row, "path")) + "\n";
             continue;
         }
-        page.err += complaint(printable(row.value("error", "a file has no sum")));
+        const std::string error = textOf(row, "error");
+        page.err += complaint(error.empty() ? "a file has no sum" : error);
         page.status = kHostReportedFailure;
     }
     if (format == Format::Json) return jsonPage({{"files", rows}}, page.status);
