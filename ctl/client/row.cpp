@@ -26,7 +26,10 @@ bool flagOf(const json& object, const std::string& member, bool fallback) {
 
 std::uint64_t countOf(const json& object, const std::string& member) {
     const auto found = object.find(member);
-    return found != object.end() && found->is_number_unsigned() ? found->get<std::uint64_t>() : 0;
+    if (found == object.end() || !found->is_number_integer()) return 0;
+    // A number too large for the signed type is kept as an unsigned one.
+    if (!found->is_number_unsigned() && found->get<std::int64_t>() < 0) return 0;
+    return found->get<std::uint64_t>();
 }
 
 int returnCodeOf(const json& row) {

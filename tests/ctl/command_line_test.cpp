@@ -139,7 +139,7 @@ TEST(CommandLine, SaysWhatIsWrong) {
          "--port: \"65536\" is not a whole number from 1 to 65535",
          ua},
         {{"events", "--count", "x"},
-         "--count: \"x\" is not a whole number",
+         "--count: \"x\" is not a whole number from 1 to 1000000000",
          "zavctl help events shows how it is used"},
         {{"--timeout", "-1", "status"},
          "--timeout: \"-1\" is not a number of seconds from 0 to 1000000000",
