@@ -34,7 +34,7 @@ public:
         EXPECT_EQ(::seteuid(idOf(user)), 0);
         host_.emplace([](const Victim& victim) {
             victim.hear();
-            victim.send("HTTP/1.1 200 OK\r\nContent-Length: 18\r\n\r\n{\"version\": \"fake\"}");
+            victim.send("HTTP/1.1 200 OK\r\nContent-Length: 19\r\n\r\n{\"version\": \"fake\"}");
         });
         EXPECT_EQ(::seteuid(0), 0);
         // The directory was made for its owner alone.

@@ -452,7 +452,7 @@ TEST_F(Names, AreCheckedByTheRulesOfTheTransfer) {
     ASSERT_EQ(::symlink("folder", files_.path("depot/link").c_str()), 0);
     startGuarded();
     for (const std::string& name :
-         {std::string("new"), std::string("new/a/b"), std::string("plain"), std::string("dangling"),
+         {std::string("new"), std::string("fresh/a/b"), std::string("plain"), std::string("dangling"),
           std::string("link/a"), std::string("folder\\b"), std::string(255, 'n'),
           pathOfLength(1024), std::string("link")}) {
         const Takes result = takes(name);
