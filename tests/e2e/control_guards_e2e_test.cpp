@@ -180,6 +180,33 @@ TEST_F(ControlGuards, AnInstallThatTheInventoryDoesNotShowIsNoSuccess) {
     EXPECT_EQ(zavctl({"install", "lost", "6.3", "--no-verify", "--", "/bin/true"}).status, 0);
 }
 
+TEST_F(ControlGuards, AnInstalledBundleIsVerifiedForItsProductInTheVersionThatWasAskedFor) {
+    StarterHome starter("um");
+    const std::string version = starter.makeBundle("ux", starter.path("depot/ux/bundle"));
+    // The same bundle once more, where somebody takes it for a newer version.
+    std::filesystem::copy(starter.path("depot/ux/bundle"), starter.path("depot/ux/990000000"),
+                          std::filesystem::copy_options::recursive);
+    std::filesystem::rename(starter.path("depot/ux/bundle"), starter.path("depot/ux/" + version));
+    const ManagedHost agents(starter.path(), starter.environment(), {}, Guards::On);
+    const auto install = [&agents](const std::string& product, const std::string& asked) {
+        return agents.zavctl({"install", product, asked, "--", "/bin/sh", "|DEPLOYDIR|/install.sh",
+                              "-h", "|TOVRINHOME|"});
+    };
+    const ProgramResult wrong = install("ux", "990000000");
+    EXPECT_EQ(wrong.status, 1);
+    EXPECT_THAT(wrong.out, HasSubstr("install ux: done after"));
+    EXPECT_EQ(wrong.err,
+              "zavctl: install ux: the host reported success, but ux 990000000 is not in the "
+              "inventory, which lists " +
+                  version + "\n");
+    const ProgramResult right = install("ux", version);
+    EXPECT_EQ(right.status, 0);
+    EXPECT_EQ(right.err, "");
+    const ProgramResult removed = agents.zavctl({"uninstall", "ux"});
+    EXPECT_EQ(removed.status, 0) << removed.out;
+    EXPECT_EQ(removed.err, "");
+}
+
 TEST_F(ControlGuards, AnUnguardedHostsInstallIsNotVerified) {
     start(Guards::Off);
     const ProgramResult result = zavctl({"install", "lost", "6.3", "--", "/bin/true"});
