@@ -4,6 +4,7 @@
 #
 #   scripts/bootstrap.sh            installs
 #   scripts/bootstrap.sh --list     prints the names of the packages, one a line, and installs nothing
+#   scripts/bootstrap.sh --analyze  installs what scripts/analyze.sh needs as well
 set -eu
 cd "$(dirname "$0")/.."
 
@@ -20,8 +21,9 @@ case $#/${1-} in
     printf '%s\n' $packages $judges
     exit
     ;;
+1/--analyze) packages="$packages clang-tidy cppcheck" ;;
 *)
-    sed -n '5,6s/^# \{0,1\}//p' "$0" >&2
+    sed -n '5,7s/^# \{0,1\}//p' "$0" >&2
     exit 2
     ;;
 esac

@@ -63,7 +63,7 @@ apt-config dump | grep -E '^Acquire::(https?|Retries|Check-Valid-Until|Check-Dat
     >"$root.apt.conf" || true
 
 echo "== a root file system with nothing but what bootstrap lists"
-# shellcheck source=/dev/null
+# shellcheck source=/dev/null disable=SC2154
 suite=$(. /etc/os-release && echo "$VERSION_CODENAME")
 unshare --mount --pid --fork --kill-child --mount-proc \
     mmdebstrap --quiet --variant=minbase --aptopt="$root.apt.conf" \

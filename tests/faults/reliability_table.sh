@@ -38,4 +38,4 @@ fi
     echo "hardly any test is named in docs/reliability.md"
     status=1
 }
-exit $status
+exit "$status"

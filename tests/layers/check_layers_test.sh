@@ -146,4 +146,4 @@ make_tree
 rm -r plugin platform host tests
 refuses "a tree without sources" 'there are no sources here'
 
-exit $failed
+exit "$failed"
