@@ -1,5 +1,6 @@
 #include "ctl/verbs/push.h"
 
+#include <algorithm>
 #include <chrono>
 #include <numeric>
 
@@ -53,8 +54,13 @@ Failure withRemains(const Failure& failure, const std::vector<std::string>& rema
     // Shells know a program that was ended by a signal by this status.
     const auto status = signal != 0 ? static_cast<ExitStatus>(128 + signal) : failure.status();
     std::string text = signal != 0 ? "interrupted" : failure.what();
-    for (const std::string& sentence : remains)
-        text += "; " + sentence;
+    // Of many small files, more than a hundred may be on their way.
+    constexpr std::size_t kMost = 5;
+    for (std::size_t i = 0; i < std::min(remains.size(), kMost); ++i)
+        text += "; " + remains[i];
+    if (remains.size() > kMost) {
+        text += "; and so on for " + std::to_string(remains.size() - kMost) + " more files";
+    }
     return {status, text, failure.hint(), failure.guard()};
 }
 

@@ -32,6 +32,15 @@ std::string lossOf(const PushedFile& file) {
     return file.replaces ? "; the file that was there before is gone" : "";
 }
 
+/// The host may have emptied the file for a first batch that it has not answered.
+bool isFormerInDoubt(const PushedFile& file) {
+    return file.replaces && file.unanswered > 0 && !file.isPartial();
+}
+
+std::string doubtAbout(const PushedFile& file) {
+    return "the " + file.name + " that was there before may be gone";
+}
+
 }  // namespace
 
 std::string verifyArrival(const HostAddress& host, std::vector<PushedFile>& files) {
@@ -58,6 +67,7 @@ std::vector<std::string> removePartialFiles(const HostAddress& host,
                                             const std::vector<PushedFile>& files) {
     std::vector<std::string> said;
     for (const PushedFile& file : files) {
+        if (isFormerInDoubt(file)) said.push_back(doubtAbout(file));
         if (!file.isPartial()) continue;
         try {
             DepotClient(host).remove(pathInDepot(file.name), false);
@@ -73,6 +83,7 @@ std::vector<std::string> removePartialFiles(const HostAddress& host,
 std::vector<std::string> namePartialFiles(const std::vector<PushedFile>& files) {
     std::vector<std::string> said;
     for (const PushedFile& file : files) {
+        if (isFormerInDoubt(file)) said.push_back(doubtAbout(file));
         if (file.isPartial()) said.push_back(mayBePartial(file) + lossOf(file));
     }
     return said;

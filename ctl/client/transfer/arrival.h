@@ -14,11 +14,13 @@ namespace ctl {
 /// not be asked; empty when it could.
 std::string verifyArrival(const HostAddress& host, std::vector<PushedFile>& files);
 
-/// Removes from the depot what arrived of files only in part. Returns a sentence about each.
+/// Removes from the depot what arrived of files only in part. Returns a sentence about each, and
+/// about each file that was there before and may be gone.
 std::vector<std::string> removePartialFiles(const HostAddress& host,
                                             const std::vector<PushedFile>& files);
 
-/// A sentence about each file of which a part may lie in the depot.
+/// A sentence about each file of which a part may lie in the depot, or which may be gone from
+/// there.
 std::vector<std::string> namePartialFiles(const std::vector<PushedFile>& files);
 
 }  // namespace ctl

@@ -109,6 +109,19 @@ TEST(RemovePartialFiles, SayThatTheFormerFileIsGone) {
                 testing::EndsWith("busy; the file that was there before is gone"));
 }
 
+TEST(RemovePartialFiles, SayThatAFormerFileMayBeGoneWhenTheHostHasNotAnswered) {
+    std::vector<PushedFile> files(3);
+    for (PushedFile& file : files)
+        file.name = "small";
+    files[0].unanswered = 1;
+    files[0].replaces = true;
+    files[1].unanswered = 1;   // there was none
+    files[2].replaces = true;  // nothing of it has been sent
+    const std::vector<std::string> doubt = {"the small that was there before may be gone"};
+    EXPECT_EQ(ctl::namePartialFiles(files), doubt);
+    EXPECT_EQ(ctl::removePartialFiles({"/nobody", "", std::chrono::seconds(1)}, files), doubt);
+}
+
 TEST(RemovePartialFiles, NamesWhatCannotBeRemoved) {
     std::vector<PushedFile> files = {fileWithSum("begun", "")};
     files[0].isSent = false;
