@@ -4,8 +4,10 @@
 #include <sys/types.h>
 
 #include <chrono>
+#include <cstdint>
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "host/commands/tail.h"
 
@@ -15,6 +17,7 @@ using WallClock = std::chrono::system_clock;
 
 /// Texts are in the local code page, as the command wrote them.
 struct Command {
+    std::uint64_t number = 0;  ///< of those that were heard, in their order; 0: not known
     std::string line;
     pid_t pid = 0;  ///< 0: there is no process
     WallClock::time_point started{};
@@ -34,6 +37,14 @@ struct Command {
     bool failedUnseen() const { return executedNothing || (signal && !timedOut); }
     /// Whether it ended in any other way than with exit status 0.
     bool failed() const { return timedOut || signal || !error.empty() || (exit && *exit != 0); }
+};
+
+/// A piece of what a command wrote.
+struct OutputPiece {
+    std::uint64_t command;  ///< the command's number
+    bool isError;           ///< it came on the standard error
+    std::string_view text;
+    std::uint64_t end;  ///< how many bytes that output has had with it
 };
 
 }  // namespace host

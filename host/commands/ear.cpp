@@ -5,34 +5,11 @@
 #include <new>
 #include <string_view>
 
+#include "host/commands/plugin_threads.h"
 #include "host/commands/trace_texts.h"
 
 namespace host {
 namespace {
-
-using OwnRecorders = std::vector<std::shared_ptr<Recorder>>;
-
-/// The recorders of threads that have no ThreadEar. Never destroyed: such threads live as long as
-/// the process.
-class PluginThreads {
-public:
-    static PluginThreads& ofProcess() {
-        static PluginThreads& instance = *new PluginThreads;
-        return instance;
-    }
-    Recorder* add() {
-        const embedded::MutexLock lock(lock_);
-        return recorders_.emplace_back(std::make_shared<Recorder>()).get();
-    }
-    OwnRecorders all() const {
-        const embedded::MutexLock lock(lock_);
-        return recorders_;
-    }
-
-private:
-    mutable embedded::Mutex lock_;
-    OwnRecorders recorders_ ZAV_GUARDED_BY(lock_);
-};
 
 thread_local Recorder* current = nullptr;
 

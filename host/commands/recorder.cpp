@@ -1,5 +1,6 @@
 #include "host/commands/recorder.h"
 
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -8,11 +9,13 @@
 #include <csignal>
 #include <ctime>
 #include <system_error>
+#include <thread>
 #include <utility>
 
 #include "host/commands/child_end.h"
 #include "host/commands/restart_output.h"
 #include "host/commands/trace_texts.h"
+#include "host/process/children/descendants.h"
 #include "host/process/children/orphans.h"
 
 namespace host {
@@ -21,7 +24,12 @@ namespace {
 constexpr std::size_t kMostCommands = 64;
 constexpr std::size_t kLongestLine = 16 * 1024;
 
+/// What an ended command left in its pipes may still be read.
+constexpr std::uint64_t kLeftInPipes = 256 * 1024;
+constexpr std::uint64_t kUsualLimit = std::uint64_t{16} << 20;
+
 std::atomic<bool> endsDescendants{false};
+std::atomic<std::uint64_t> mostOutput{kUsualLimit};
 
 bool begins(std::string_view text, std::string_view with) {
     return text.substr(0, with.size()) == with;
@@ -60,6 +68,10 @@ void endWhatGivenUpCommandsStarted() {
     endsDescendants.store(true);
 }
 
+void limitOutput(std::uint64_t bytes) {
+    mostOutput.store(bytes);
+}
+
 void Recorder::hear(const ras1::HeardLine& line) noexcept {
     const std::string_view text(line.text, line.length);
     if (hearInChild(line, text)) return;
@@ -87,6 +99,11 @@ bool Recorder::hearInChild(const ras1::HeardLine& line, std::string_view text) {
     if (const auto pid = after(text, trace::kInChild)) {
         notes_.started.store(nanoseconds());
         notes_.pid.store(numberIn(*pid));
+        // Looked at after the process can be seen: who ends commands sees it, or it sees that.
+        if (ending_.wanted.load() || ending_.tooMuch.load()) {
+            ending_.reached.store(true);
+            ::kill(::getpid(), SIGKILL);
+        }
         return true;
     }
     if (begins(text, trace::kNotConnected)) {
@@ -104,10 +121,9 @@ void Recorder::hearRunner(std::string_view text) {
     if (const auto command = after(text, trace::kCommand)) {
         begin(command->substr(0, command->rfind(trace::kCommandEnd)));
     } else if (const auto out = after(text, trace::kOutput)) {
-        keepOutput(*out);
+        keep(*out, false);
     } else if (const auto errors = after(text, trace::kErrors)) {
-        const embedded::MutexLock lock(lock_);
-        if (open_) commands_.back().err.append(*errors);
+        keep(*errors, true);
     } else if (begins(text, trace::kNotStarted)) {
         close({});
     } else if (begins(text, trace::kTimedOut)) {
@@ -147,23 +163,66 @@ void Recorder::begin(std::string_view line) {
     notes_.notExecuted.store(0);
     notes_.notConnected.store(false);
     const embedded::MutexLock lock(lock_);
+    if (commands_.empty()) orphansBeforeFirst_ = orphansBefore_;
     if (commands_.size() == kMostCommands) commands_.pop_front();
+    reaped_ = false;
+    thread_ = static_cast<pid_t>(::syscall(SYS_gettid));
     Command& command = commands_.emplace_back();
     open_ = true;
+    static std::atomic<std::uint64_t> commandsHeard{0};
+    command.number = ++commandsHeard;
     command.line = line.substr(0, kLongestLine);
     command.started = WallClock::now();
     others_.output.clear();
     others_.outputComplete = true;
 }
 
-void Recorder::keepOutput(std::string_view piece) {
+/// The plug-in holds all that its command writes in memory, several times over.
+void Recorder::count(std::size_t bytes) {
+    written_ += bytes;
+    const std::uint64_t most = mostOutput.load();
+    if (written_ <= most) return;
+    ending_.tooMuch.store(true);
+    endForOutput();
+    // Whoever still writes is out of reach. The plug-in reads on until the command's time is over.
+    if (written_ > most + kLeftInPipes) std::this_thread::sleep_until(began_ + timeout_);
+}
+
+/// Kills at once: what a command writes while it makes up its mind would fill the memory.
+void Recorder::endForOutput() {
+    constexpr int kMostRounds = 200;
+    Descendants descendants(orphansBeforeFirst().value_or(std::vector<pid_t>()));
+    for (int round = 0; round < kMostRounds; ++round) {
+        std::size_t reached = 0;
+        withCommandInHand([&](pid_t command) {
+            descendants.look(command, true);
+            reached = descendants.send(SIGKILL);
+        });
+        if (reached == 0) return;
+    }
+}
+
+void Recorder::keep(std::string_view text, bool isError) {
+    const std::optional<OutputPiece> piece = store(text, isError);
+    if (!piece) return;
+    if (sink_) sink_(*piece);
+    count(text.size());
+}
+
+std::optional<OutputPiece> Recorder::store(std::string_view text, bool isError) {
     const embedded::MutexLock lock(lock_);
-    if (!open_) return;
-    commands_.back().out.append(piece);
-    if (outputBytes_ == 0) return;
+    if (!open_) return std::nullopt;
+    Command& command = commands_.back();
+    Tail& tail = isError ? command.err : command.out;
+    tail.append(text);
+    if (!isError && outputBytes_ != 0) keepWhole(text);
+    return OutputPiece{command.number, isError, text, tail.total()};
+}
+
+void Recorder::keepWhole(std::string_view text) {
     const std::size_t room = outputBytes_ - others_.output.size();
-    others_.output.append(piece.substr(0, room));
-    if (piece.size() > room) others_.outputComplete = false;
+    others_.output.append(text.substr(0, room));
+    if (text.size() > room) others_.outputComplete = false;
 }
 
 void Recorder::waitForEnd(pid_t pid, bool onlyLook) {
@@ -174,11 +233,14 @@ void Recorder::waitForEnd(pid_t pid, bool onlyLook) {
     const auto until = onlyLook ? std::chrono::steady_clock::now() : began_ + timeout_;
     const std::optional<ChildEnd> end = awaitChildEnd(pid, until);
     const embedded::MutexLock lock(lock_);
+    reaped_ = true;  // as soon as the plug-in goes on
     Command& command = commands_.back();
     command.pid = pid;
     if (!end) return;
     command.ended = WallClock::now();
     (end->bySignal ? command.signal : command.exit) = end->number;
+    // Where the child has a memory of its own, this is all that shows.
+    if (end->bySignal && ending_.wanted.load()) ending_.reached.store(true);
 }
 
 void Recorder::close(std::string_view status) {
@@ -220,7 +282,38 @@ Heard Recorder::take() {
                           std::make_move_iterator(commands_.end()));
     commands_.clear();
     open_ = false;
+    written_ = 0;
+    heard.tooMuchOutput = ending_.tooMuch.exchange(false);
     return heard;
+}
+
+void Recorder::endCommands() {
+    ending_.reached.store(false);
+    ending_.wanted.store(true);
+}
+
+bool Recorder::letCommandsRun() {
+    ending_.wanted.store(false);
+    return ending_.reached.exchange(false);
+}
+
+void Recorder::withCommandInHand(const std::function<void(pid_t)>& look) const {
+    const embedded::MutexLock lock(lock_);
+    look(commandInHand());
+}
+
+/// Where a child has a memory of its own, it cannot say which it is.
+pid_t Recorder::commandInHand() const {
+    if (!open_ || reaped_) return 0;
+    if (const pid_t pid = notes_.pid.load()) return pid;
+    const std::vector<pid_t> children = childrenOf(thread_);
+    return children.empty() ? 0 : children.front();
+}
+
+std::optional<std::vector<pid_t>> Recorder::orphansBeforeFirst() const {
+    const embedded::MutexLock lock(lock_);
+    if (commands_.empty()) return std::nullopt;
+    return orphansBeforeFirst_;
 }
 
 std::vector<Command> Recorder::commands() const {

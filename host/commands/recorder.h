@@ -5,9 +5,11 @@
 #include <chrono>
 #include <cstdint>
 #include <deque>
+#include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "embedded/mutex.h"
@@ -26,6 +28,8 @@ struct Heard {
     /// The last command's whole standard output, if it was asked for.
     std::string output;
     bool outputComplete = true;  ///< false: the output was longer than it is kept
+    /// The commands wrote more than they may, and were ended.
+    bool tooMuchOutput = false;
 };
 
 /// From now on, when the plug-in gives up a command because its time is over, what that command has
@@ -33,10 +37,17 @@ struct Heard {
 /// orphans. Any thread.
 void endWhatGivenUpCommandsStarted();
 
+/// So many bytes may the commands of one task write; 16 MiB if nothing is set. Any thread.
+void limitOutput(std::uint64_t bytes);
+
 class Recorder {
 public:
-    /// Keeps up to `outputBytes` of the last command's standard output.
-    explicit Recorder(std::size_t outputBytes = 0) : outputBytes_(outputBytes) {}
+    using OutputSink = std::function<void(const OutputPiece& piece)>;
+
+    /// Keeps up to `outputBytes` of the last command's standard output. `sink` gets what commands
+    /// write, piece by piece, on the recorder's thread and without a lock.
+    explicit Recorder(std::size_t outputBytes = 0, OutputSink sink = {})
+        : outputBytes_(outputBytes), sink_(std::move(sink)) {}
     Recorder(const Recorder&) = delete;
     Recorder& operator=(const Recorder&) = delete;
 
@@ -50,7 +61,25 @@ public:
     /// The commands since the last take(), the running one among them. Any thread.
     std::vector<Command> commands() const;
 
+    /// From now on each command that the thread starts is killed at its start. Any thread.
+    void endCommands();
+    /// No more. Returns whether that was the end of any. Any thread.
+    bool letCommandsRun();
+    /// Calls `look` with the process of the command in hand, which nobody reaps meanwhile; with 0
+    /// if there is none. It must not trace. Any thread.
+    void withCommandInHand(const std::function<void(pid_t command)>& look) const;
+    /// The adopted orphans when the first command since the last take() started; nothing if there
+    /// was none. Any thread.
+    std::optional<std::vector<pid_t>> orphansBeforeFirst() const;
+
 private:
+    /// Read and written by a child between fork and exec, too.
+    struct Ending {
+        std::atomic<bool> wanted{false};   ///< somebody wants the commands to be over
+        std::atomic<bool> tooMuch{false};  ///< they wrote too much
+        std::atomic<bool> reached{false};  ///< that was the end of one
+    };
+
     /// What a child says between fork and exec. Others may read it while the child writes.
     struct ChildNotes {
         std::atomic<pid_t> pid{0};
@@ -63,24 +92,35 @@ private:
     void hearRunner(std::string_view text);
     void hearProcess(const ras1::HeardLine& line, std::string_view text);
     void begin(std::string_view line);
-    void keepOutput(std::string_view piece);
+    void keep(std::string_view piece, bool isError);
+    void keepWhole(std::string_view piece) ZAV_REQUIRES(lock_);
+    std::optional<OutputPiece> store(std::string_view piece, bool isError);
+    void count(std::size_t bytes);
+    void endForOutput();
     void waitForEnd(pid_t pid, bool onlyLook);
     void close(std::string_view status);
     /// The command in hand with what its child has said.
     Command withNotes(const Command& command) const;
+    pid_t commandInHand() const ZAV_REQUIRES(lock_);
 
     const std::size_t outputBytes_;
+    const OutputSink sink_;
 
     // Of the thread alone.
     std::chrono::steady_clock::time_point began_{};
     std::chrono::seconds timeout_{0};
     std::vector<pid_t> orphansBefore_;  ///< that were there when the command began
+    std::uint64_t written_ = 0;         ///< bytes since the last take()
 
     ChildNotes notes_;
+    Ending ending_;
     mutable embedded::Mutex lock_;  // never held in a child, nor while waiting
     std::deque<Command> commands_ ZAV_GUARDED_BY(lock_);
-    bool open_ ZAV_GUARDED_BY(lock_) = false;  ///< the last command has not ended
-    Heard others_ ZAV_GUARDED_BY(lock_);       ///< all but the commands
+    bool open_ ZAV_GUARDED_BY(lock_) = false;   ///< the last command has not ended
+    bool reaped_ ZAV_GUARDED_BY(lock_) = true;  ///< its process may have been reaped
+    pid_t thread_ ZAV_GUARDED_BY(lock_) = 0;    ///< the thread's number in the system
+    std::vector<pid_t> orphansBeforeFirst_ ZAV_GUARDED_BY(lock_);
+    Heard others_ ZAV_GUARDED_BY(lock_);  ///< all but the commands
 };
 
 }  // namespace host

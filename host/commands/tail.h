@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <string_view>
 
@@ -13,6 +14,7 @@ public:
     static constexpr std::size_t kBytes = 4096;
 
     void append(std::string_view piece) {
+        total_ += piece.size();
         if (piece.size() >= kBytes) {
             text_.assign(piece.substr(piece.size() - kBytes));
             return;
@@ -23,10 +25,13 @@ public:
         text_.append(piece);
     }
     const std::string& text() const { return text_; }
+    /// How many bytes have come.
+    std::uint64_t total() const { return total_; }
     void clear() { std::string().swap(text_); }
 
 private:
     std::string text_;
+    std::uint64_t total_ = 0;
 };
 
 }  // namespace host

@@ -40,9 +40,12 @@ inline constexpr std::array<std::string_view, 3> kTextColumns = {kContextColumn,
                                                                  kScriptsColumn};
 /// In the request table: the node that answers. No parameter.
 inline constexpr std::string_view kOriginNodeColumn = "ORIGINNODE";
+/// In the answer: the message that says why, and its values.
+inline constexpr std::string_view kMessageColumn = "RETMSGID";
+inline constexpr std::string_view kMessageValuesColumn = "RETMSGPARM";
 /// In the request table: what only the answer has.
-inline constexpr std::array<std::string_view, 3> kResultColumns = {kRetvalColumn, "RETMSGID",
-                                                                   "RETMSGPARM"};
+inline constexpr std::array<std::string_view, 3> kResultColumns = {kRetvalColumn, kMessageColumn,
+                                                                   kMessageValuesColumn};
 /// The commands that guards tell apart.
 inline constexpr std::string_view kStart = "START";
 inline constexpr std::string_view kStop = "STOP";
@@ -65,6 +68,13 @@ inline constexpr std::string_view kTargetIsInstance = "INSTANCE";
 /// An INSTALL with this OPTIONAL has two outcomes: one with kAccepted when it begins, since it may
 /// end the process, and one at its end. One that cannot begin has only that outcome.
 inline constexpr std::string_view kWithRestart = "REQUIRES_RESTART";
+
+constexpr bool mayRestart(std::string_view command, std::string_view optional) {
+    return command == kInstall && optional == kWithRestart;
+}
+
+/// Answers with the result that such an install left in the depot.
+inline constexpr std::string_view kCompleteInstall = "COMPLETE_INSTALL";
 /// Stands for the product's folder of the depot in the command of an INSTALL.
 inline constexpr std::string_view kDeployFolderToken = "|DEPLOYDIR|";
 
@@ -93,7 +103,7 @@ constexpr bool changesWhatIsInstalled(std::string_view command) {
 
 /// These commands have been carried out when their request is answered. All others are queued.
 inline constexpr std::array<std::string_view, 2> kCommandsAtOnce = {kGetConfiguration,
-                                                                    "COMPLETE_INSTALL"};
+                                                                    kCompleteInstall};
 
 constexpr bool runsAtOnce(std::string_view command) {
     for (const std::string_view atOnce : kCommandsAtOnce) {

@@ -75,9 +75,9 @@ bool Leftovers::gone() const {
     return gone_;
 }
 
-void Leftovers::end() const {
+void Leftovers::end(int signal) const {
     for (const pid_t pid : alive())
-        ::kill(pid, SIGKILL);
+        ::kill(pid, signal);
 }
 
 }  // namespace host

@@ -5,6 +5,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <csignal>
 #include <string>
 #include <vector>
 
@@ -23,8 +24,8 @@ public:
     /// Whether none of them lives. Once that is so it stays so. Any thread.
     bool gone() const;
 
-    /// Kills them. Any thread.
-    void end() const;
+    /// Sends them the signal. Any thread.
+    void end(int signal = SIGKILL) const;
 
 private:
     std::vector<pid_t> alive() const;

@@ -20,18 +20,11 @@ void adoptOrphans();
 /// Reaps the adopted orphans that have ended; waits for none. On the main thread.
 void reapOrphans();
 
-/// The adopted orphans of this moment, those that have ended among them. Any thread.
+/// The adopted orphans of this moment, those that have ended among them; none in a process that
+/// adopts none. Any thread.
 std::vector<pid_t> orphans();
 
-/// Kills everything that a command has started, down to the last descendant, because it has run too
-/// long: its own processes, and those of the orphans that came after `orphansBefore` was taken,
-/// just before the command started. Spares what has made a session of its own, as agents do. The
-/// command itself is only stopped, so that it starts nothing more; whoever has started it must kill
-/// it. Any thread.
-///
-/// While another command runs at the same time, an orphan may be of either: both are the host's
-/// children then. Commands that leave a child behind without a session of its own are rare, and so
-/// are time-outs.
-void killDescendants(pid_t command, const std::vector<pid_t>& orphansBefore);
+/// The children that this thread of the process has started and nobody has reaped. Any thread.
+std::vector<pid_t> childrenOf(pid_t thread);
 
 }  // namespace host

@@ -12,6 +12,7 @@
 #include <thread>
 #include <vector>
 
+#include "host/process/children/descendants.h"
 #include "host/process/children/process_table.h"
 #include "support/host/program.h"
 #include "support/scratch_dir.h"

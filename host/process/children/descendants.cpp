@@ -1,0 +1,90 @@
+#include "host/process/children/descendants.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+
+#include "host/process/children/orphans.h"
+
+namespace host {
+namespace {
+
+/// A process that starts others faster than they can be killed does not hold the caller up for
+/// ever.
+constexpr int kMostRounds = 200;
+
+bool contains(const std::vector<pid_t>& pids, pid_t pid) {
+    return std::find(pids.begin(), pids.end(), pid) != pids.end();
+}
+
+}  // namespace
+
+Descendants::Descendants(std::vector<pid_t> orphansBefore)
+    : orphansBefore_(std::move(orphansBefore)), session_(::getsid(0)) {}
+
+void Descendants::look(pid_t command, bool itself) {
+    command_ = command;
+    const std::vector<pid_t> orphansNow = orphans();
+    processes_ = readProcesses();
+    if (itself) addCommand();
+    while (addGeneration(orphansNow)) {
+    }
+}
+
+/// Only a child of this process can be the command: any other has got its id since.
+void Descendants::addCommand() {
+    for (const ProcessEntry& process : processes_) {
+        if (process.pid != command_ || process.parent != ::getpid()) continue;
+        if (process.session == session_) known_.insert(nameOf(process));
+    }
+}
+
+bool Descendants::hasKnownParent(const ProcessEntry& process) const {
+    const auto at = known_.lower_bound({process.parent, 0});
+    return (command_ != 0 && process.parent == command_) ||
+           (at != known_.end() && at->first == process.parent);
+}
+
+/// True when there was something to add.
+bool Descendants::addGeneration(const std::vector<pid_t>& orphansNow) {
+    bool added = false;
+    for (const ProcessEntry& process : processes_) {
+        if (process.session != session_ || process.pid == command_) continue;
+        const bool isNewOrphan =
+            contains(orphansNow, process.pid) && !contains(orphansBefore_, process.pid);
+        if (!isNewOrphan && !hasKnownParent(process)) continue;
+        added = known_.insert(nameOf(process)).second || added;
+    }
+    return added;
+}
+
+std::size_t Descendants::send(int signal) {
+    std::size_t reached = 0;
+    for (const ProcessEntry& process : processes_) {
+        if (!process.isAlive || !isKnown(process)) continue;
+        const bool first = signalled_.insert(nameOf(process)).second;
+        if (!first && signal != SIGKILL) continue;
+        // What may not be killed belongs to another user, as root started it; it is not ours.
+        if (::kill(process.pid, signal) == 0) ++reached;
+    }
+    return reached;
+}
+
+std::size_t Descendants::living() const {
+    return static_cast<std::size_t>(std::count_if(
+        processes_.begin(), processes_.end(),
+        [this](const ProcessEntry& process) { return process.isAlive && isKnown(process); }));
+}
+
+void killDescendants(pid_t command, const std::vector<pid_t>& orphansBefore) {
+    if (command <= 0) return;
+    ::kill(command, SIGSTOP);
+    Descendants descendants(orphansBefore);
+    for (int round = 0; round < kMostRounds; ++round) {
+        descendants.look(command, false);
+        if (descendants.send(SIGKILL) == 0) return;
+    }
+}
+
+}  // namespace host
