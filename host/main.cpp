@@ -36,9 +36,6 @@
 namespace host {
 namespace {
 
-/// How long the host waits for the task in hand when it is told to end.
-constexpr std::chrono::seconds kEndGrace{10};
-
 /// Starts the plug-in; returns its tables.
 std::vector<oxa::Table> startPlugin(const HostOptions& options) {
     const Plugin plugin(options.plugin);
@@ -163,7 +160,7 @@ void attendToOrphans(HttpServer& server, int childSignals) {
 
 /// At the end, for whoever reads the log.
 void sayWhatWaits(Journal& journal) {
-    const std::int64_t waiting = journal.waiting();
+    const std::int64_t waiting = journal.notBegun();
     if (waiting > 0) {
         std::fprintf(stderr, "zavhost: %lld tasks wait for the next start\n",
                      static_cast<long long>(waiting));
@@ -196,6 +193,7 @@ void run(const HostOptions& options) {
         depotDirectoryOf(options.home, std::getenv(kDepotVariable), options.guarded);
     refuseHomeOnPort(options, depot);
     provideDepotDirectory(depot);
+    limitOutput(static_cast<std::uint64_t>(options.maxOutput));
     Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
                       options.guarded, {depot.path, options.state}, journalOf(options));
     services.maxQueued = options.maxQueued;
@@ -204,15 +202,15 @@ void run(const HostOptions& options) {
     ncs::Server transfers({}, &services.transfers);
     serveTransfers(transfers, transferSocket, options);
     HttpServer server(socket.listen(), api, services.counts);
-    server.endWhenReadable(endDescriptor, kEndGrace);
+    server.endWhenReadable(endDescriptor, options.grace);
     server.whenReadable(reopenDescriptor, [=] { reopenLogs(reopenDescriptor); });
     if (options.guarded) attendToOrphans(server, childDescriptor);
     services.dispatcher.start(services.leftovers, options.orphanWait);
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     server.run();
+    services.journal.endCleanly(api.quiet());
     sayWhatWaits(services.journal);
-    services.journal.endCleanly(services.watch.quiet());
     transfers.stop();
     transferSocket.remove();
     socket.remove();

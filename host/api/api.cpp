@@ -69,7 +69,7 @@ void Api::prepareForEnd() {
 }
 
 bool Api::quiet() const {
-    return services_.watch.quiet();
+    return services_.watch.quiet(services_.tasks.restartsHost());
 }
 
 }  // namespace host

@@ -3,7 +3,7 @@
 namespace host {
 
 /// The endpoints. Each has a file of its own in this folder and a row below.
-Endpoint getTables, postQuery, getEvents, getDoctor, getHealth;
+Endpoint getTables, postQuery, getEvents, getDoctor, getHealth, getReady, getTaskOutput;
 Endpoint postTask, getTasks, getTask, cancelTask;
 Endpoint getDepot, deleteDepot, getDepotSum, getDepotCheck;
 
@@ -57,7 +57,12 @@ std::vector<Route> routes() {
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
           {"wait", Type::Number, Need::Optional, "seconds to wait for the task's end"}}},
 
-        {"POST", "/v1/tasks/{id}/cancel", "Cancels a task that waits.",
+        {"GET", "/v1/tasks/{id}/output", "Streams what a task's commands write.",
+         Access::Read, Runs::OnWorker, getTaskOutput,
+         {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
+          {"follow", Type::Flag, Need::Optional, "1: goes on until the task is over"}}},
+
+        {"POST", "/v1/tasks/{id}/cancel", "Cancels a task.",
          Access::Act, Runs::OnWorker, cancelTask,
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"}}},
 
@@ -66,6 +71,9 @@ std::vector<Route> routes() {
 
         {"GET", "/v1/health", "What the host says about itself.",
          Access::Read, Runs::AtOnce, getHealth},
+
+        {"GET", "/v1/ready", "Whether the host takes and carries out commands, and why not.",
+         Access::Read, Runs::OnWorker, getReady},
 
         {"GET", "/v1/depot", "What the depot holds.",
          Access::Read, Runs::OnWorker, getDepot,

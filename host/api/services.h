@@ -38,6 +38,8 @@ struct Places {
 struct Services;
 /// See api/watched_query.h.
 std::optional<Task> handOver(Services& services, const Task& task);
+/// See api/restart_install.h.
+Task endOfRestartInstall(Services& services, Task task);
 
 /// Made once, after the plug-in has started, and shared by all requests. Any thread.
 struct Services {
@@ -78,8 +80,9 @@ struct Services {
     ParameterKeeper startUpParameters{home, outcomes, tasks};              ///< asked if `guarded`
     int maxQueued = 1000;  ///< tasks that may wait in the journal
     Leftovers leftovers{journal.identity(), journal.run()};
-    Dispatcher dispatcher{journal, tasks,
-                          [this](const Task& task) { return handOver(*this, task); }};
+    Dispatcher dispatcher{
+        journal, tasks, [this](const Task& task) { return handOver(*this, task); },
+        [this](Task task) { return endOfRestartInstall(*this, std::move(task)); }};
     WorkerPool checksums{kChecksumsAtOnce, kWaitingChecksums};  ///< requests for checksums of files
 };
 

@@ -67,6 +67,7 @@ Json taskSummary(const Task& task, const CodePage& codePage) {
     object["started"] = timeOrNull(task.started);
     object["ended"] = timeOrNull(task.ended);
     object["asker"] = codePage.toUtf8(task.asker);
+    if (task.cancel && !isOver(task.state)) object["cancelling"] = true;
     if (task.expires) object["expires"] = timeText(*task.expires);
     for (const auto& [name, text] :
          {std::pair{"reason", &task.reason}, {"guard", &task.guard}, {"hint", &task.hint}}) {

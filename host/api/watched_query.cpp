@@ -6,6 +6,7 @@
 #include <memory>
 #include <vector>
 
+#include "host/api/restart_install.h"
 #include "host/commands/ear.h"
 #include "host/guard/refusal.h"
 #include "host/outcomes/shown_request.h"
@@ -50,6 +51,18 @@ std::unique_ptr<ParameterKeeper::Hold> protectionFor(Services& services, const Q
     return services.startUpParameters.hold(CommandRequest(query.where, false));
 }
 
+/// A request goes to the plug-in at once, and would run beside what it must not meet.
+void insistOnTurn(Services& services, const Query& query) {
+    if (!services.leftovers.gone()) {
+        throw NotKept("commands that an earlier run of the host began have not ended yet",
+                      "leftovers");
+    }
+    const bool install = services.dispatcher.awaitsInstall() || services.tasks.restartsHost();
+    if (install || (mayRestart(query) && services.tasks.mayRestartHost())) {
+        throw NotKept("an install that may restart the host has not ended yet", "restart-turn");
+    }
+}
+
 /// How a task ends that the plug-in did not get.
 Task endOf(Task task, TaskState state, const std::string& reason) {
     task.state = state;
@@ -63,6 +76,8 @@ std::optional<Task> tryHandOver(Services& services, const Task& task) {
     TaskWatch::Request watched(services.watch, *query.table);
     const Query handedOn = admitted(services, query, task.forced);
     const auto protection = protectionFor(services, handedOn);
+    const std::string fault = mayRestart(query) ? forgetOlderResult(services) : std::string();
+    if (!fault.empty()) return endOf(task, TaskState::Failed, fault);
     TaskList::Request request(services.tasks, task);
     ThreadEar ear;
     const oxa::Rows rows = run(handedOn);
@@ -87,13 +102,14 @@ std::string userName(uid_t user) {
 }
 
 WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer) {
-    if (isQueued(query) && services.guarded && !services.leftovers.gone()) {
-        throw NotKept("commands that an earlier run of the host began have not ended yet",
-                      "leftovers");
-    }
+    if (isQueued(query) && services.guarded) insistOnTurn(services, query);
     const bool wantsOutput = services.guarded && readsConfiguration(query);
     TaskWatch::Request watched(services.watch, *query.table);
     const Query handedOn = admitted(services, query, force);
+    if (services.guarded && mayRestart(query)) {
+        const std::string fault = forgetOlderResult(services);
+        if (!fault.empty()) throw NotKept(fault, "old-result");
+    }
     const auto protection = protectionFor(services, handedOn);
     // The task is what was asked for, not what the guards made of it.
     TaskList::Request task(services.tasks, query, askerOf(query, peer), force);

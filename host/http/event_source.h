@@ -27,6 +27,10 @@ public:
 
     /// Whether take() would return nothing. I/O thread.
     virtual bool empty() const = 0;
+
+    /// Whether nothing more will ever come: the stream then ends once everything is sent. `wake`
+    /// has been called since that is so. I/O thread.
+    virtual bool over() const { return false; }
 };
 
 /// One event. Texts that are empty are left out.

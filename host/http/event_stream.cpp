@@ -76,7 +76,8 @@ void EventStream::write(std::string text) {
 void EventStream::pump() {
     if (writing_ || closed_) return;
     std::string text = source_->take();
-    if (!text.empty()) write(std::move(text));
+    if (!text.empty()) return write(std::move(text));
+    if (source_->over()) close();
 }
 
 void EventStream::onWritten(Error error) {

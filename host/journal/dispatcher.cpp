@@ -1,8 +1,11 @@
 #include "host/journal/dispatcher.h"
 
 #include <algorithm>
+#include <csignal>
 #include <cstdio>
 #include <utility>
+
+#include "host/commands/command_ending.h"
 
 namespace host {
 namespace {
@@ -13,8 +16,17 @@ constexpr std::chrono::milliseconds kLook{100};
 
 }  // namespace
 
-Dispatcher::Dispatcher(Journal& journal, TaskList& tasks, HandOver handOver)
-    : journal_(journal), tasks_(tasks), handOver_(std::move(handOver)) {}
+Dispatcher::Dispatcher(Journal& journal, TaskList& tasks, HandOver handOver, Complete complete)
+    : journal_(journal),
+      tasks_(tasks),
+      handOver_(std::move(handOver)),
+      complete_(std::move(complete)) {
+    const std::string& begun = journal_.recovered().begun;
+    const std::optional<Task> install = begun.empty() ? std::nullopt : journal_.find(begun);
+    if (!complete_ || !install) return;
+    install_ = install->number;
+    completing_ = true;
+}
 
 Dispatcher::~Dispatcher() {
     stop();
@@ -24,6 +36,8 @@ Dispatcher::~Dispatcher() {
 void Dispatcher::start(const Leftovers& leftovers, std::chrono::seconds patience) {
     thread_ = std::thread([this, &leftovers, patience] {
         awaitEndOf(leftovers, patience);
+        completeInstall();
+        journal_.handOverWithOutcomes(true);
         work();
     });
 }
@@ -31,12 +45,52 @@ void Dispatcher::start(const Leftovers& leftovers, std::chrono::seconds patience
 void Dispatcher::awaitEndOf(const Leftovers& leftovers, std::chrono::seconds patience) {
     const auto until = std::chrono::steady_clock::now() + patience;
     while (!leftovers.gone()) {
-        if (std::chrono::steady_clock::now() >= until) leftovers.end();
+        endLeftovers(leftovers, std::chrono::steady_clock::now() >= until);
         if (!pause(kLook)) return;
     }
 }
 
+/// Somebody may have cancelled the install to which they belong.
+void Dispatcher::endLeftovers(const Leftovers& leftovers, bool patienceIsOver) {
+    const auto now = std::chrono::steady_clock::now();
+    if (install_ != 0 && !killAt_ && journal_.isToBeCancelled(install_)) {
+        leftovers.end(SIGTERM);
+        killAt_ = now + CommandEnding::kPatience;
+    }
+    if (patienceIsOver || (killAt_ && now >= *killAt_)) leftovers.end(SIGKILL);
+}
+
+void Dispatcher::completeInstall() {
+    while (install_ != 0 && !tryComplete()) {
+        if (!pause(kRetry)) return;
+    }
+    const std::lock_guard<std::mutex> lock(lock_);
+    completing_ = false;
+}
+
+/// True when the install is over, or it is time to stop.
+bool Dispatcher::tryComplete() {
+    {
+        const std::lock_guard<std::mutex> lock(lock_);
+        if (stopping_) return true;
+    }
+    try {
+        const std::optional<Task> task = journal_.find(journal_.recovered().begun);
+        if (task && !isOver(task->state)) tasks_.end(complete_(*task));
+        return true;
+    } catch (const std::exception& error) {
+        std::fprintf(stderr, "zavhost: the end of an install waits: %s\n", error.what());
+        return false;
+    }
+}
+
+bool Dispatcher::awaitsInstall() const {
+    const std::lock_guard<std::mutex> lock(lock_);
+    return completing_;
+}
+
 void Dispatcher::stop() {
+    journal_.handOverWithOutcomes(false);
     {
         const std::lock_guard<std::mutex> lock(lock_);
         stopping_ = true;
@@ -73,25 +127,32 @@ void Dispatcher::work() {
 }
 
 bool Dispatcher::handOverNext() {
-    const std::optional<Task> task = journal_.nextInLine();
+    if (recorded_ == 0) recorded_ = journal_.takeHandedOver();
+    const std::optional<Task> task =
+        recorded_ != 0 ? journal_.byNumber(recorded_) : journal_.nextInLine();
     if (!task) return false;
     try {
-        handOver(*task);
+        // Whether it was too late has been looked at when its hand-over was recorded.
+        if (recorded_ != 0 || !expires(*task)) handOver(*task);
     } catch (const StepBack&) {
         // It was cancelled at the last moment: the next one, then.
     }
+    recorded_ = 0;
+    return true;
+}
+
+/// Ends a task whose time is over; returns whether it was.
+bool Dispatcher::expires(const Task& task) {
+    if (!task.expires || journal_.latestTime() <= *task.expires) return false;
+    Task expired = task;
+    expired.state = TaskState::Expired;
+    expired.ended = WallClock::now();
+    expired.reason = "its turn came after the time until which it could begin";
+    tasks_.end(expired);
     return true;
 }
 
 void Dispatcher::handOver(const Task& task) {
-    if (isLate(task)) {
-        Task expired = task;
-        expired.state = TaskState::Expired;
-        expired.ended = WallClock::now();
-        expired.reason = "its turn came after the time until which it could begin";
-        tasks_.end(expired);
-        return;
-    }
     {
         const std::lock_guard<std::mutex> lock(lock_);
         inHand_ = true;
@@ -111,11 +172,6 @@ void Dispatcher::handOver(const Task& task) {
         isOver(task);
         throw;
     }
-}
-
-bool Dispatcher::isLate(const Task& task) {
-    latest_ = std::max(latest_, WallClock::now());
-    return task.expires && latest_ > *task.expires;
 }
 
 /// False when it is time to stop.

@@ -1,7 +1,9 @@
 #include "host/journal/journal.h"
 
+#include <algorithm>
 #include <chrono>
 #include <cstdio>
+#include <memory>
 #include <thread>
 #include <utility>
 
@@ -66,7 +68,8 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
         if (!settings_.directory.empty()) takeDirectory();
         openOrSetAside();
         recovered_.clean = !directory_ || directory_->endedCleanly();
-        settleUnfinished(*database_, settings_.rerunInterrupted, recovered_);
+        settleUnfinished(*database_, settings_.rerunInterrupted,
+                         settings_.boot.empty() ? bootName() : settings_.boot, recovered_);
         if (directory_) {
             // What a kill left of a secret in the log of changes goes now.
             database_->number("PRAGMA wal_checkpoint(TRUNCATE)");
@@ -124,6 +127,8 @@ void Journal::endCleanly(bool quiet) noexcept {
     try {
         commit([quiet, this](Database& database) {
             if (quiet) takeBackUnfinished(database);
+            database.change("UPDATE tasks SET run = NULL, turn = NULL WHERE number = ?",
+                            handedOver_.load());  // nobody has handed it over
             database.change("UPDATE runs SET clean = 1 WHERE run = ?", recovered_.run);
         });
         writer_->settle();
@@ -137,8 +142,19 @@ void Journal::commit(Writer::Change change) {
     try {
         writer_->submit(std::move(change)).get();
     } catch (const DatabaseError& error) {
-        throw NotKept(std::string("the journal cannot be written to: ") + error.what());
+        const std::string trouble =
+            std::string("the journal cannot be written to: ") + error.what();
+        noteTrouble(trouble);
+        throw NotKept(trouble);
     }
+    if (troubled_.load()) noteTrouble({});
+}
+
+void Journal::noteTrouble(const std::string& trouble) {
+    const embedded::MutexLock lock(troubleLock_);
+    if (trouble_.empty() && !trouble.empty()) warn(trouble);
+    trouble_ = trouble;
+    troubled_.store(!trouble.empty());
 }
 
 /// Without the reserve an outcome might find no room.
@@ -178,7 +194,14 @@ void Journal::saveSoon(Task task) {
 }
 
 void Journal::saveOutcome(const std::vector<Task>& tasks) {
-    commitOutcome(updateOf(tasks));
+    const Task& over = tasks.front();
+    const bool handsOver = handsOver_.load() && isOver(over.state) && over.way == TaskWay::Journal;
+    const auto next = std::make_shared<std::int64_t>(0);
+    commitOutcome([update = updateOf(tasks), handsOver, next, this](Database& database) {
+        update(database);
+        *next = handsOver ? handOverNext(database) : 0;
+    });
+    if (*next != 0) handedOver_.store(*next);
     const embedded::MutexLock lock(troubleLock_);
     if (++sincePrune_ % kPruneEvery == 0) prune();
 }
@@ -193,23 +216,26 @@ void Journal::commitOutcome(const Writer::Change& change) {
         if (commitOutcomeOnce(change)) break;
         std::this_thread::sleep_for(kRetry);
     }
-    const embedded::MutexLock lock(troubleLock_);
-    trouble_.clear();
 }
 
 bool Journal::commitOutcomeOnce(const Writer::Change& change) {
     try {
         commit(change);
         return true;
-    } catch (const NotKept& failure) {
-        const embedded::MutexLock lock(troubleLock_);
-        if (trouble_.empty()) warn(std::string("an outcome waits: ") + failure.what());
-        trouble_ = failure.what();
+    } catch (const NotKept&) {
         return false;
     }
 }
 
-std::string Journal::trouble() const {
+std::string Journal::trouble() {
+    if (!troubled_.load()) return {};
+    try {
+        commit([](Database& database) {
+            database.change("INSERT OR REPLACE INTO facts VALUES ('written', randomblob(8))");
+        });
+    } catch (const NotKept&) {
+        // It is still so.
+    }
     const embedded::MutexLock lock(troubleLock_);
     return trouble_;
 }
@@ -257,10 +283,42 @@ std::optional<Task> Journal::nextInLine() {
     });
 }
 
+/// Returns its number; 0: nothing waits, or its time is over, which the dispatcher will see.
+std::int64_t Journal::handOverNext(Database& database) {
+    Statement found = database.ask(
+        "SELECT number, expires FROM tasks WHERE ended IS NULL AND way = 0 AND run IS NULL "
+        "ORDER BY number LIMIT 1");
+    if (!found.step()) return 0;
+    const std::int64_t number = found.integer(0);
+    const auto expires = found.maybeInteger(1);
+    if (expires && microseconds(latestTime()) > *expires) return 0;
+    noteHandOver(database, number, recovered_.run);
+    return number;
+}
+
+std::optional<Task> Journal::byNumber(std::int64_t number) {
+    return read([&](Database& database) { return readTask(database, identity_, number); });
+}
+
+WallClock::time_point Journal::latestTime() {
+    const WallClock::rep now = WallClock::now().time_since_epoch().count();
+    WallClock::rep latest = latest_.load();
+    while (latest < now && !latest_.compare_exchange_weak(latest, now)) {
+    }
+    return WallClock::time_point(WallClock::duration(std::max(latest, now)));
+}
+
 std::int64_t Journal::waiting() {
     return read([](Database& database) {
         return database.number(
             "SELECT count(*) FROM tasks WHERE ended IS NULL AND way = 0 AND run IS NULL");
+    });
+}
+
+std::int64_t Journal::notBegun() {
+    writer_->flush();
+    return read([](Database& database) {
+        return database.number("SELECT count(*) FROM tasks WHERE ended IS NULL AND state = 0");
     });
 }
 
@@ -284,17 +342,31 @@ std::optional<Task> Journal::enterOnce(Task& task) {
     return first;
 }
 
-bool Journal::cancel(std::int64_t number) {
-    bool cancelled = false;
-    commit([&cancelled, number, &writer = *writer_, this](Database& database) {
+Journal::Cancel Journal::cancel(std::int64_t number) {
+    Cancel result = Cancel::Unknown;
+    commit([&result, number, &writer = *writer_, this](Database& database) {
         std::optional<Task> task = readTask(database, identity_, number);
-        if (!task || isOver(task->state) || task->run || task->way != TaskWay::Journal) return;
+        if (!task) return;
+        result = Cancel::Over;
+        if (isOver(task->state)) return;
+        if (task->run) {
+            const bool waits = task->way == TaskWay::Query && task->state == TaskState::Queued;
+            result = waits ? Cancel::InPlugin : Cancel::Asked;
+            if (!waits) database.change("UPDATE tasks SET cancel = 1 WHERE number = ?", number);
+            return;
+        }
         task->state = TaskState::Cancelled;
         task->ended = WallClock::now();
         if (updateTask(database, *task)) writer.wipeSoon();
-        cancelled = true;
+        result = Cancel::Ended;
     });
-    return cancelled;
+    return result;
+}
+
+bool Journal::isToBeCancelled(std::int64_t number) {
+    return read([&](Database& database) {
+        return database.number("SELECT cancel FROM tasks WHERE number = ?", number) != 0;
+    });
 }
 
 std::string Journal::hashOf(std::string_view content) const {

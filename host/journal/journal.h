@@ -1,6 +1,7 @@
 /// The journal: what was accepted is never forgotten.
 #pragma once
 
+#include <atomic>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -28,6 +29,7 @@ public:
         int keepDays = 30;              ///< tasks that have been over for longer are removed
         int keepRows = 10'000;          ///< of older outcomes the rows are removed
         bool mayYield = false;          ///< in memory, too, when another host uses the directory
+        std::string boot{};             ///< names the start of the machine; empty: the system says
     };
 
     /// Opens the journal or makes a new one, sets a damaged one aside, and settles what the last
@@ -57,13 +59,33 @@ public:
 
     /// The oldest task that waits for the host to hand it over.
     std::optional<Task> nextInLine();
+    /// With `wanted`, the transaction that records the end of a task which was handed over in its
+    /// turn also records that the next in line is handed over, unless that is too late.
+    void handOverWithOutcomes(bool wanted) { handsOver_.store(wanted); }
+    /// The number of the task that was so recorded, which is to be handed over now; 0: none.
+    std::int64_t takeHandedOver() { return handedOver_.exchange(0); }
+    /// The task with this number, as far as it is durable.
+    std::optional<Task> byNumber(std::int64_t number);
+    /// The time by which tasks expire. It never goes back.
+    WallClock::time_point latestTime();
     /// How many tasks wait so.
     std::int64_t waiting();
+    /// How many have not begun, those in the plug-in's queue among them.
+    std::int64_t notBegun();
     /// Whether one of them is for this product, in upper or lower case.
     bool waitsFor(const std::string& product);
-    /// Ends a task that still waits in line. Returns whether it did, durably; if not, the task has
-    /// been handed over or is over. Throws NotKept.
-    bool cancel(std::int64_t number);
+    /// What becomes of the wish that a task be over.
+    enum class Cancel {
+        Ended,     ///< it waited in line and never runs
+        Asked,     ///< it is in hand; the wish is durable, and after a kill the task is cancelled
+        InPlugin,  ///< the plug-in has it in its queue and cannot be told to forget it
+        Over,      ///< it is over
+        Unknown,   ///< there is no such task
+    };
+    /// Returns when that is durable. Throws NotKept.
+    Cancel cancel(std::int64_t number);
+    /// Whether somebody wants this task, which is in hand, to be over.
+    bool isToBeCancelled(std::int64_t number);
     /// The hash by which the content of a request is recognised.
     std::string hashOf(std::string_view content) const;
     /// Enters a task unless there is one with the same TRANSID that answers its repetitions;
@@ -72,8 +94,11 @@ public:
     /// The first task with this TRANSID that answers its repetitions.
     std::optional<Task> findOnce(std::string_view transid);
 
-    /// Why an outcome cannot be written down just now; empty if nothing is wrong.
-    std::string trouble() const;
+    /// Why the last change could not be written down; empty if nothing is wrong. Writes something
+    /// to see whether that is still so.
+    std::string trouble();
+    /// Whether there is room for what an outcome may need.
+    bool hasRoom() const { return !directory_ || directory_->takeReserve(); }
     /// Transactions so far.
     std::uint64_t transactions() const { return writer_->transactions(); }
 
@@ -84,10 +109,12 @@ private:
     void open();
     void openOrSetAside();
     void commit(Writer::Change change);
+    void noteTrouble(const std::string& trouble);
     void commitOutcome(const Writer::Change& change);
     bool commitOutcomeOnce(const Writer::Change& change);
     void insistOnReserve();
     Writer::Change updateOf(std::vector<Task> tasks);
+    std::int64_t handOverNext(Database& database);
     void prune();
 
     const Settings settings_;
@@ -98,8 +125,13 @@ private:
     std::string key_;
     Recovered recovered_;
 
+    std::atomic<bool> handsOver_{false};
+    std::atomic<std::int64_t> handedOver_{0};
+    std::atomic<WallClock::rep> latest_{0};
+
     mutable embedded::Mutex troubleLock_;
     std::string trouble_ ZAV_GUARDED_BY(troubleLock_);
+    std::atomic<bool> troubled_{false};  ///< whether there is any
     unsigned sincePrune_ ZAV_GUARDED_BY(troubleLock_) = 0;
 
     embedded::Mutex readLock_;        ///< around the connection that reads

@@ -16,16 +16,10 @@ constexpr const char* kCutOff =
     "the host ended while this task was in hand; it may have run in part";
 constexpr const char* kCutOffTooOften =
     "the host ended three times while this task was in hand; it is not run again";
+constexpr const char* kCancelled =
+    "it was cancelled while it was in hand, and then the host ended; it may have run in part";
 constexpr const char* kUnreadable =
     "the journal that held this task was damaged; whether it ran is not known";
-
-/// Changes with each start of the machine.
-std::string bootName() {
-    std::ifstream file("/proc/sys/kernel/random/boot_id");
-    std::string name;
-    std::getline(file, name);
-    return name;
-}
 
 /// The oldest task without an outcome that the plug-in had been given.
 std::optional<std::int64_t> oldestHandedOver(Database& database) {
@@ -36,8 +30,8 @@ std::optional<std::int64_t> oldestHandedOver(Database& database) {
     return found.integer(0);
 }
 
-void interrupt(Database& database, Task& task, const char* reason) {
-    task.state = TaskState::Interrupted;
+void end(Database& database, Task& task, TaskState state, const char* reason) {
+    task.state = state;
     task.answered = true;
     task.reason = reason;
     task.ended = WallClock::now();
@@ -45,21 +39,47 @@ void interrupt(Database& database, Task& task, const char* reason) {
     updateTask(database, task);
 }
 
-void settleOldest(Database& database, std::int64_t number, bool rerun, Recovered& recovered) {
+/// The start of the machine in which the run began.
+std::string bootOf(Database& database, std::int64_t run) {
+    Statement found = database.ask("SELECT boot FROM runs WHERE run = ?", run);
+    return found.step() ? found.bytes(0) : std::string();
+}
+
+void settleOldest(Database& database, std::int64_t number, bool rerun, const std::string& boot,
+                  Recovered& recovered) {
     std::optional<Task> task = readTask(database, journalIdentity(database), number);
-    if (!task) return;
+    if (!task || isOver(task->state)) return;
+    if (task->begun) {
+        recovered.begun = task->id;
+        recovered.bootedAnew = bootOf(database, task->run.value_or(0)) != boot;
+        return;
+    }
     const int interruptions = task->interruptions + 1;
     database.change("UPDATE tasks SET interruptions = ? WHERE number = ?", interruptions, number);
     recovered.interrupted = task->id;
     const bool tooOften = interruptions >= kMostInterruptions;
     recovered.runsAgain = rerun && !tooOften && task->outcomes.empty();
     if (!recovered.runsAgain) {
-        interrupt(database, *task, tooOften && rerun ? kCutOffTooOften : kCutOff);
+        end(database, *task, TaskState::Interrupted, tooOften && rerun ? kCutOffTooOften : kCutOff);
     }
 }
 
-std::int64_t beginRun(Database& database) {
-    database.change("INSERT INTO runs (boot, session, started) VALUES (?, ?, ?)", bootName(),
+/// What was handed over and was to be cancelled, whether it had begun or not.
+void settleCancelled(Database& database) {
+    Statement found = database.ask(
+        "SELECT number FROM tasks WHERE ended IS NULL AND cancel = 1 AND begun = 0 "
+        "ORDER BY number");
+    std::vector<std::int64_t> numbers;
+    while (found.step())
+        numbers.push_back(found.integer(0));
+    for (const std::int64_t number : numbers) {
+        std::optional<Task> task = readTask(database, journalIdentity(database), number);
+        if (task) end(database, *task, TaskState::Cancelled, kCancelled);
+    }
+}
+
+std::int64_t beginRun(Database& database, const std::string& boot) {
+    database.change("INSERT INTO runs (boot, session, started) VALUES (?, ?, ?)", boot,
                     static_cast<std::int64_t>(::getsid(0)), microseconds(WallClock::now()));
     return database.lastInserted();
 }
@@ -85,21 +105,30 @@ std::vector<Task> unfinishedIn(Database& damaged) {
 
 }  // namespace
 
+std::string bootName() {
+    std::ifstream file("/proc/sys/kernel/random/boot_id");
+    std::string name;
+    std::getline(file, name);
+    return name;
+}
+
 void takeBackUnfinished(Database& database) {
     database.run(
         "UPDATE tasks SET state = 0, way = 0, answered = 1, run = NULL, turn = NULL, "
-        "started = NULL WHERE ended IS NULL");
+        "started = NULL WHERE ended IS NULL AND begun = 0");
 }
 
-void settleUnfinished(Database& database, bool rerunInterrupted, Recovered& recovered) {
+void settleUnfinished(Database& database, bool rerunInterrupted, const std::string& boot,
+                      Recovered& recovered) {
     database.run("BEGIN IMMEDIATE");
-    if (const auto oldest = oldestHandedOver(database)) {
-        settleOldest(database, *oldest, rerunInterrupted, recovered);
-    }
+    const auto oldest = oldestHandedOver(database);
+    settleCancelled(database);
+    if (oldest) settleOldest(database, *oldest, rerunInterrupted, boot, recovered);
     takeBackUnfinished(database);
     database.run("UPDATE tasks SET answered = 1 WHERE answered = 0");
-    recovered.waiting = database.number("SELECT count(*) FROM tasks WHERE ended IS NULL");
-    recovered.run = beginRun(database);
+    recovered.waiting =
+        database.number("SELECT count(*) FROM tasks WHERE ended IS NULL AND begun = 0");
+    recovered.run = beginRun(database, boot);
     database.run("COMMIT");
 }
 
@@ -114,7 +143,7 @@ std::int64_t salvage(const std::string& damagedFile, Database& database) {
     database.run("BEGIN IMMEDIATE");
     for (Task& task : tasks) {
         task.number = insertTask(database, task);
-        interrupt(database, task, kUnreadable);
+        end(database, task, TaskState::Interrupted, kUnreadable);
     }
     database.run("COMMIT");
     return static_cast<std::int64_t>(tasks.size());

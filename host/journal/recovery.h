@@ -16,6 +16,8 @@ struct Recovered {
     std::int64_t waiting = 0;   ///< tasks that will run
     std::string interrupted;    ///< identifier of the task that was cut off; empty: there is none
     bool runsAgain = false;     ///< it will run again
+    std::string begun;          ///< identifier of the install that may go on by itself; empty: none
+    bool bootedAnew = false;    ///< the machine was started anew in its midst
     std::int64_t salvaged = 0;  ///< unfinished tasks that were read from a damaged journal
 };
 
@@ -23,14 +25,19 @@ struct Recovered {
 /// host.
 inline constexpr int kMostInterruptions = 3;
 
+/// Names the present start of the machine.
+std::string bootName();
+
 /// Whatever is unfinished waits for the host to hand it over: the plug-in's queue is gone, or about
-/// to go, and nothing of it has begun.
+/// to go, and nothing of it has begun. Only an install that restarts the host goes on by itself.
 void takeBackUnfinished(Database& database);
 
 /// Settles what is unfinished, and begins a new run, in one transaction. Of what had been handed to
 /// the plug-in only the oldest task can have begun: it is interrupted. What waited behind it waits
-/// again, in the old order. Throws DatabaseError.
-void settleUnfinished(Database& database, bool rerunInterrupted, Recovered& recovered);
+/// again, in the old order. An install that had begun and may restart the host stays in hand.
+/// `boot` names the present start of the machine. Throws DatabaseError.
+void settleUnfinished(Database& database, bool rerunInterrupted, const std::string& boot,
+                      Recovered& recovered);
 
 /// Enters the unfinished tasks that can still be read from a damaged journal as interrupted.
 /// Returns how many; reads as far as the damage lets it.

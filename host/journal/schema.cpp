@@ -23,7 +23,8 @@ CREATE TABLE tasks (
     product BLOB NOT NULL, asker BLOB NOT NULL, state INTEGER NOT NULL, way INTEGER NOT NULL,
     answered INTEGER NOT NULL, accepted INTEGER NOT NULL, started INTEGER, ended INTEGER,
     expires INTEGER, forced INTEGER NOT NULL, run INTEGER, turn INTEGER, interruptions INTEGER NOT NULL DEFAULT 0,
-    once BLOB, reply BLOB NOT NULL, reason BLOB NOT NULL, guard BLOB NOT NULL, hint BLOB NOT NULL);
+    once BLOB, reply BLOB NOT NULL, reason BLOB NOT NULL, guard BLOB NOT NULL, hint BLOB NOT NULL,
+    cancel INTEGER NOT NULL DEFAULT 0, begun INTEGER NOT NULL DEFAULT 0);
 CREATE INDEX tasks_by_transid ON tasks (transid, number);
 CREATE INDEX tasks_unfinished ON tasks (number) WHERE ended IS NULL;
 CREATE INDEX tasks_by_turn ON tasks (turn);

@@ -13,7 +13,7 @@ namespace {
 
 constexpr const char* kColumns =
     "number, transid, asker, state, way, answered, accepted, started, ended, expires, forced, run, "
-    "interruptions, once, reply, reason, guard, hint";
+    "interruptions, once, reply, reason, guard, hint, cancel, begun";
 
 std::optional<std::int64_t> maybeMicroseconds(const std::optional<WallClock::time_point>& time) {
     if (!time) return std::nullopt;
@@ -62,15 +62,6 @@ bool removeSecrets(Database& database, std::int64_t number) {
     database.change("DELETE FROM conditions WHERE task = ?", number);
     writeConditions(database, number, conditions);
     return removed;
-}
-
-/// The first time that a task is known to have been handed over it gets its turn.
-void noteHandOver(Database& database, const Task& task) {
-    if (!task.run) return;
-    database.change(
-        "UPDATE tasks SET run = ?, turn = (SELECT coalesce(max(turn), 0) + 1 FROM tasks) "
-        "WHERE number = ? AND run IS NULL",
-        task.run, task.number);
 }
 
 void writeOutcomes(Database& database, const Task& task) {
@@ -148,6 +139,8 @@ Task taskOf(Database& database, const Statement& row, const std::string& identit
     task.reason = row.bytes(15);
     task.guard = row.bytes(16);
     task.hint = row.bytes(17);
+    task.cancel = row.integer(18) != 0;
+    task.begun = row.integer(19) != 0;
     task.conditions = readConditions(database, task.number);
     task.request = shownRequest(task.conditions);
     return task;
@@ -177,7 +170,7 @@ std::int64_t insertTask(Database& database, const Task& task) {
         packRow(task.reply), task.reason, task.guard, task.hint);
     Task entered = task;
     entered.number = database.lastInserted();
-    noteHandOver(database, entered);
+    if (entered.run) noteHandOver(database, entered.number, *entered.run);
     if (isOver(task.state)) makeKeepable(entered.conditions);
     writeConditions(database, entered.number, entered.conditions);
     writeOutcomes(database, entered);
@@ -192,17 +185,25 @@ bool updateTask(Database& database, const Task& task) {
     const int changed = database.change(
         "UPDATE tasks SET transid = ?1, state = ?2, answered = max(answered, ?3), accepted = ?4, "
         "started = ?5, ended = ?6, reply = iif(length(?7) = 0, reply, ?7), reason = ?8, "
-        "guard = ?9, hint = ?10 WHERE number = ?11 AND (state < 2 AND state <= ?2 OR state = ?2)",
+        "guard = ?9, hint = ?10, begun = max(begun, ?12) WHERE number = ?11 AND (state < 2 AND "
+        "state <= ?2 OR state = ?2)",
         task.transid, state, static_cast<int>(task.answered), microseconds(task.accepted),
         maybeMicroseconds(task.started), maybeMicroseconds(task.ended), packRow(task.reply),
-        task.reason, task.guard, task.hint, task.number);
+        task.reason, task.guard, task.hint, task.number, static_cast<int>(task.begun));
     if (changed == 0) {
         throw StepBack("task " + std::to_string(task.number) + " goes forward only");
     }
-    noteHandOver(database, task);
+    if (task.run) noteHandOver(database, task.number, *task.run);
     writeOutcomes(database, task);
     writeCommands(database, task);
     return isOver(task.state) && removeSecrets(database, task.number);
+}
+
+void noteHandOver(Database& database, std::int64_t number, std::int64_t run) {
+    database.change(
+        "UPDATE tasks SET run = ?, turn = (SELECT coalesce(max(turn), 0) + 1 FROM tasks) "
+        "WHERE number = ? AND run IS NULL",
+        run, number);
 }
 
 void deleteTask(Database& database, std::int64_t number) {

@@ -18,6 +18,9 @@ std::int64_t insertTask(Database& database, const Task& task);
 /// request stays. Returns whether a secret was removed. Throws StepBack.
 bool updateTask(Database& database, const Task& task);
 
+/// Writes down that this run of the host hands it over; the first time it gets its turn.
+void noteHandOver(Database& database, std::int64_t number, std::int64_t run);
+
 /// Removes every trace of it.
 void deleteTask(Database& database, std::int64_t number);
 

@@ -23,7 +23,7 @@ enum class TaskState {
     Done = 2,
     Failed = 3,       ///< RETVAL is not 0, or a command of it failed without the plug-in noticing
     Refused = 4,      ///< by the plug-in's reply, or by a guard at hand-over
-    Cancelled = 5,    ///< never ran
+    Cancelled = 5,    ///< never ran, or a signal ended its commands
     Expired = 6,      ///< its turn came too late
     Interrupted = 7,  ///< the host ended in the middle of it: it may have run in part
 };
@@ -72,7 +72,10 @@ struct Task {
     std::optional<WallClock::time_point> ended;
     std::optional<WallClock::time_point> expires;  ///< it must have been handed over by then
     bool forced = false;                           ///< the guard on the inventory was passed by
-    std::optional<std::int64_t> run;    ///< the run of the host that handed it to the plug-in
+    std::optional<std::int64_t> run;  ///< the run of the host that handed it to the plug-in
+    /// An install that may restart the host has begun; its second outcome is its end.
+    bool begun = false;
+    bool cancel = false;                ///< somebody wants it to be over, while it is in hand
     int interruptions = 0;              ///< unclean ends of the host in the middle of it
     std::optional<std::string> once;    ///< the content's hash: a repetition gets this task
     std::string reply;                  ///< a row of the request table; empty: there is none

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "host/commands/ear.h"
+#include "host/commands/plugin_threads.h"
 #include "host/outcomes/shown_request.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/row_fields.h"
@@ -56,10 +57,13 @@ TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, TaskKeeper& keeper
                 host::find(*outcomes, plugin::kRetvalColumn)};
     if (!columns_.complete()) return;
     requests_ = requests;
+    heard_ = std::make_shared<const Follower>(
+        [this](const OutputPiece& piece) { tellFollowers(piece); });
+    PluginThreads::ofProcess().hearOutput(heard_);
     outcomes_ = feed.subscribe({}, [this](const oxa::Rows& rows) {
-        std::vector<Command> commands = takeOfPluginThread().commands;
+        Heard heard = takeOfPluginThread();
         for (std::size_t i = 0; i < rows.count(); ++i)
-            take(std::string(rowOf(rows, i)), std::exchange(commands, {}));
+            take(std::string(rowOf(rows, i)), std::exchange(heard, {}));
         return static_cast<int>(OXA_OK);
     });
 }
@@ -109,19 +113,23 @@ std::uint64_t TaskList::add(const Query& query, std::string asker, bool forced) 
 }
 
 std::uint64_t TaskList::addHandedOver(Task task) {
-    task.run = keeper_.run();
-    keeper_.save(task);
+    // The transaction that recorded the outcome of the one before may have recorded it.
+    if (task.run != keeper_.run()) {
+        task.run = keeper_.run();
+        keeper_.save(task);
+    }
     return insert(std::move(task));
 }
 
 std::uint64_t TaskList::insert(Task task) {
     Entry entry;
-    entry.overAtFirst = task.value(plugin::kCommandColumn) != plugin::kInstall ||
-                        task.value(plugin::kOptionalColumn) != plugin::kWithRestart;
+    entry.overAtFirst = !plugin::mayRestart(task.value(plugin::kCommandColumn),
+                                            task.value(plugin::kOptionalColumn));
     if (task.way != TaskWay::AtOnce) std::vector<oxa::Predicate>().swap(task.conditions);
     entry.task = std::move(task);
     const embedded::MutexLock lock(lock_);
     const std::uint64_t number = ++lastNumber_;
+    if (entry.task.number != 0) entry.cancelled = cancelled_.erase(entry.task.number) != 0;
     entries_.emplace(number, std::move(entry));
     return number;
 }
@@ -194,7 +202,9 @@ void TaskList::endAnswered(Entry entry, const Heard& heard) {
             for (Command& ran : task.commands)
                 ran.out.clear();  // it is the answer
         }
+        entry.tooMuchOutput = heard.tooMuchOutput;
         task.state = judge(entry);
+        task.reason = reasonOf(entry);
         keeper_.enterSoon(task);
     } else {
         keeper_.saveSoon(task);
@@ -202,39 +212,64 @@ void TaskList::endAnswered(Entry entry, const Heard& heard) {
     tellWaiters(task);
 }
 
-void TaskList::take(const std::string& row, std::vector<Command> commands) {
+/// Whether the outcome ends its task.
+bool TaskList::isLast(const Entry& entry, const std::string& row) const {
+    return entry.overAtFirst || integerField(*columns_.outcomeRetval, row) != plugin::kAccepted ||
+           !entry.task.outcomes.empty();
+}
+
+/// If the outcome ends its task, it is too late to cancel that from now on.
+TaskList::Addressee TaskList::close(const std::string& row) {
+    const embedded::MutexLock lock(lock_);
+    const auto found = awaiting(textField(*columns_.outcomeTransid, row));
+    if (found == entries_.end()) return {};
+    Addressee addressee{found->first, nullptr};
+    if (isLast(found->second, row)) {
+        found->second.closing = true;
+        if (endingOf_ == found->first) addressee.ending = std::move(ending_);
+    }
+    return addressee;
+}
+
+void TaskList::take(const std::string& row, Heard heard) {
+    const Addressee addressee = close(row);
+    // Nothing of a cancelled task lives when it is over. Without the lock: this may take long.
+    const bool reached = addressee.ending && addressee.ending->finish();
     std::vector<Task> changed;
-    std::uint64_t number = 0;
     {
         const embedded::MutexLock lock(lock_);
-        const auto found = awaiting(textField(*columns_.outcomeTransid, row));
+        const auto found = entries_.find(addressee.number);
         if (found != entries_.end()) {
-            number = found->first;
-            changed = takeInto(number, row, std::move(commands));
+            found->second.reached = reached;
+            changed = takeInto(addressee.number, row, std::move(heard));
         }
     }
-    if (number == 0) {
+    if (changed.empty()) {
         keeper_.keepRow(row);
         return;
     }
     keeper_.saveOutcome(changed);
-    if (isOver(changed.front().state)) noteKept(number, !changed.front().answered);
+    if (isOver(changed.front().state)) noteKept(addressee.number, !changed.front().answered);
 }
 
 /// What the outcome changes: its task first, and the one that begins with it.
-std::vector<Task> TaskList::takeInto(std::uint64_t number, const std::string& row,
-                                     std::vector<Command> commands) {
+std::vector<Task> TaskList::takeInto(std::uint64_t number, const std::string& row, Heard heard) {
     Entry& entry = entries_.at(number);
     Task& task = entry.task;
+    entry.ended = isLast(entry, row);
     task.outcomes.push_back(row);
-    append(task.commands, std::move(commands));
+    append(task.commands, std::move(heard.commands));
+    entry.tooMuchOutput = entry.tooMuchOutput || heard.tooMuchOutput;
     entry.retval = integerField(*columns_.outcomeRetval, row);
-    entry.ended =
-        entry.overAtFirst || entry.retval != plugin::kAccepted || task.outcomes.size() > 1;
-    if (!entry.ended) return {task};
+    if (!task.started) task.started = task.accepted;
+    if (!entry.ended) {
+        task.begun = true;
+        task.state = TaskState::Running;
+        return {task};
+    }
     task.ended = WallClock::now();
     task.state = judge(entry);
-    if (!task.started) task.started = task.accepted;
+    task.reason = reasonOf(entry);
     std::vector<Task> changed = {task};
     if (auto next = startNext(number)) changed.push_back(std::move(*next));
     return changed;
@@ -275,23 +310,57 @@ TaskList::Entries::iterator TaskList::awaiting(std::string_view transid) {
 
 /// The task that the executor takes next begins; nothing if there is none or it has begun.
 std::optional<Task> TaskList::startNext(std::uint64_t except) {
-    Entry* next = nullptr;
-    for (auto& [number, entry] : entries_) {
-        if (number == except || entry.turn == 0 || entry.ended) continue;
-        if (next == nullptr || entry.turn < next->turn) next = &entry;
+    auto next = entries_.end();
+    for (auto at = entries_.begin(); at != entries_.end(); ++at) {
+        const Entry& entry = at->second;
+        if (at->first == except || entry.turn == 0 || entry.ended) continue;
+        if (next == entries_.end() || entry.turn < next->second.turn) next = at;
     }
-    if (next == nullptr || next->task.state == TaskState::Running) return std::nullopt;
-    next->task.state = TaskState::Running;
-    next->task.started = WallClock::now();
-    return next->task;
+    if (next == entries_.end()) return std::nullopt;
+    Entry& entry = next->second;
+    if (entry.task.state == TaskState::Running) return std::nullopt;
+    entry.task.state = TaskState::Running;
+    entry.task.started = WallClock::now();
+    if (entry.cancelled) beginEnding(next->first, entry);
+    return entry.task;
+}
+
+void TaskList::beginEnding(std::uint64_t number, Entry& entry) {
+    if (entry.closing || entry.ended || ending_) return;
+    try {
+        ending_ = std::make_unique<CommandEnding>();
+        endingOf_ = number;
+    } catch (const std::exception&) {
+        // There is no memory for it, or no thread. The task goes on and ends as it would have.
+    }
+}
+
+void TaskList::endCommandsOf(std::int64_t number) {
+    const embedded::MutexLock lock(lock_);
+    for (auto& [place, entry] : entries_) {
+        if (entry.task.number != number || entry.task.way == TaskWay::AtOnce) continue;
+        entry.cancelled = true;
+        if (entry.task.state == TaskState::Running) beginEnding(place, entry);
+        return;
+    }
+    cancelled_.insert(number);
 }
 
 TaskState TaskList::judge(const Entry& entry) const {
+    if (entry.reached) return TaskState::Cancelled;
+    if (entry.tooMuchOutput) return TaskState::Failed;
     if (entry.retval != plugin::kAccepted) return TaskState::Failed;
     const std::vector<Command>& commands = entry.task.commands;
     const bool unseen = std::any_of(commands.begin(), commands.end(),
                                     [](const Command& command) { return command.failedUnseen(); });
     return guarded_ && unseen ? TaskState::Failed : TaskState::Done;
+}
+
+/// Where the task's row does not say why it ended so.
+std::string TaskList::reasonOf(const Entry& entry) {
+    if (entry.reached) return "it was cancelled while it ran, and its commands were ended";
+    if (entry.tooMuchOutput) return "its commands wrote more than they may, and were ended";
+    return entry.task.reason;
 }
 
 void TaskList::end(const Task& task) {
@@ -316,6 +385,44 @@ void TaskList::tellWaiters(const Task& task) {
         call(task);
 }
 
+std::uint64_t TaskList::follow(std::int64_t number, Follower follower) {
+    Following following{number, std::make_shared<const Follower>(std::move(follower))};
+    const embedded::MutexLock lock(lock_);
+    followers_.emplace(++lastWaiter_, std::move(following));
+    return lastWaiter_;
+}
+
+void TaskList::unfollow(std::uint64_t follower) {
+    const embedded::MutexLock lock(lock_);
+    followers_.erase(follower);
+}
+
+/// The number of the task that the executor carries out: the one that runs, or one that it took
+/// before its request was answered.
+std::int64_t TaskList::atWork() const {
+    std::int64_t number = 0;
+    for (const auto& [place, entry] : entries_) {
+        if (entry.ended || entry.task.way == TaskWay::AtOnce) continue;
+        if (entry.task.state == TaskState::Running) return entry.task.number;
+        if (number == 0) number = entry.task.number;
+    }
+    return number;
+}
+
+void TaskList::tellFollowers(const OutputPiece& piece) {
+    std::vector<std::shared_ptr<const Follower>> calls;
+    {
+        const embedded::MutexLock lock(lock_);
+        if (followers_.empty()) return;
+        const std::int64_t number = atWork();
+        for (const auto& [id, following] : followers_) {
+            if (following.number == number) calls.push_back(following.follower);
+        }
+    }
+    for (const auto& call : calls)
+        (*call)(piece);
+}
+
 bool TaskList::mayChange(const std::string& product) const {
     if (product.empty()) return false;
     const embedded::MutexLock lock(lock_);
@@ -325,6 +432,20 @@ bool TaskList::mayChange(const std::string& product) const {
         return entry.turn != 0 && !isOver(entry.task.state) &&
                plugin::changesWhatIsInstalled(entry.task.value(plugin::kCommandColumn)) &&
                ::strcasecmp(other.c_str(), product.c_str()) == 0;
+    });
+}
+
+bool TaskList::restartsHost() const {
+    const embedded::MutexLock lock(lock_);
+    return std::any_of(entries_.begin(), entries_.end(), [](const auto& each) {
+        return each.second.task.begun && !each.second.ended;
+    });
+}
+
+bool TaskList::mayRestartHost() const {
+    const embedded::MutexLock lock(lock_);
+    return std::any_of(entries_.begin(), entries_.end(), [](const auto& each) {
+        return !each.second.overAtFirst && !each.second.ended;
     });
 }
 

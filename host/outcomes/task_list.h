@@ -7,12 +7,14 @@
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "embedded/mutex.h"
 #include "embedded/oxa_host.h"
+#include "host/commands/command_ending.h"
 #include "host/commands/recorder.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task.h"
@@ -74,6 +76,12 @@ public:
     /// whether it is installed or which instances it has. False for no product.
     bool mayChange(const std::string& product) const;
 
+    /// Whether an install has begun that may restart the host: it waits for the host's end, or for
+    /// its own.
+    bool restartsHost() const;
+    /// Whether the plug-in has such an install, begun or not.
+    bool mayRestartHost() const;
+
     /// The task with this identifier, or else the newest one with this TRANSID. The commands of a
     /// running one are those so far.
     std::optional<Task> find(std::string_view name) const;
@@ -82,6 +90,20 @@ public:
     void end(const Task& task);
     /// The same, for one whose end has been kept already.
     void hasEnded(const Task& task) { tellWaiters(task); }
+
+    /// Ends what this task's commands have started, and each further one at its start: now, or when
+    /// the task begins. That somebody wants it has been kept. The task is cancelled if a signal
+    /// reached any of it; if none did, it ends as it would have. Nothing happens when it is too
+    /// late.
+    void endCommandsOf(std::int64_t number);
+
+    /// Gets what the commands of a task write, on the thread that runs them. Must return quickly.
+    using Follower = std::function<void(const OutputPiece& piece)>;
+    /// From now on calls `follower` with what the commands of the task with this number write.
+    /// Returns a number for unfollow().
+    std::uint64_t follow(std::int64_t number, Follower follower);
+    /// Forgets it; a call may be in progress.
+    void unfollow(std::uint64_t follower);
 
     /// Gets the task once it is over, on the thread that ends it. Must return quickly.
     using WhenOver = std::function<void(const Task& task)>;
@@ -106,12 +128,20 @@ private:
         bool overAtFirst = true;  ///< its first outcome with RETVAL 0 is its last
         int retval = 0;           ///< of its last outcome
         bool answered = false;
-        bool ended = false;  ///< its last outcome has come
-        bool kept = false;   ///< and is durable
+        bool cancelled = false;  ///< somebody wants it to be over
+        bool closing = false;    ///< its last outcome is on its way: nothing runs for it any more
+        bool reached = false;    ///< a signal reached what its commands had started
+        bool tooMuchOutput = false;  ///< its commands wrote too much, and were ended
+        bool ended = false;          ///< its last outcome has come
+        bool kept = false;           ///< and is durable
     };
     struct Waiter {
         std::string id;
         WhenOver whenOver;
+    };
+    struct Following {
+        std::int64_t number = 0;  ///< the task's
+        std::shared_ptr<const Follower> follower;
     };
     using Entries = std::map<std::uint64_t, Entry>;
 
@@ -122,15 +152,26 @@ private:
     std::optional<int> readAnswer(Entry& entry, const oxa::Rows& rows, const Heard& heard);
     bool answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard);
     void endAnswered(Entry entry, const Heard& heard);
-    void take(const std::string& row, std::vector<Command> commands);
-    std::vector<Task> takeInto(std::uint64_t number, const std::string& row,
-                               std::vector<Command> commands) ZAV_REQUIRES(lock_);
+    void take(const std::string& row, Heard heard);
+    std::vector<Task> takeInto(std::uint64_t number, const std::string& row, Heard heard)
+        ZAV_REQUIRES(lock_);
+    bool isLast(const Entry& entry, const std::string& row) const;
+    /// The task that an outcome ends or tells of; 0: none.
+    struct Addressee {
+        std::uint64_t number = 0;
+        std::unique_ptr<CommandEnding> ending;  ///< of its commands; null if nobody wants that
+    };
+    Addressee close(const std::string& row);
+    void beginEnding(std::uint64_t number, Entry& entry) ZAV_REQUIRES(lock_);
     void noteKept(std::uint64_t number, bool answeredMeanwhile);
 
     Entries::iterator awaiting(std::string_view transid) ZAV_REQUIRES(lock_);
     std::optional<Task> startNext(std::uint64_t except) ZAV_REQUIRES(lock_);
     TaskState judge(const Entry& entry) const;
+    static std::string reasonOf(const Entry& entry);
     void tellWaiters(const Task& task);
+    void tellFollowers(const OutputPiece& piece);
+    std::int64_t atWork() const ZAV_REQUIRES(lock_);
 
     const bool guarded_;
     TaskKeeper& keeper_;
@@ -143,8 +184,15 @@ private:
     Entries entries_ ZAV_GUARDED_BY(lock_);  ///< what the plug-in has, in the order of its coming
     std::uint64_t lastNumber_ ZAV_GUARDED_BY(lock_) = 0;
     std::uint64_t lastTurn_ ZAV_GUARDED_BY(lock_) = 0;
+    std::unique_ptr<CommandEnding> ending_ ZAV_GUARDED_BY(lock_);  ///< null: nothing is ended
+    std::uint64_t endingOf_ ZAV_GUARDED_BY(lock_) = 0;             ///< whose commands end
+    /// Numbers of cancelled tasks that are on their way to the plug-in, or went on without the
+    /// host.
+    std::set<std::int64_t> cancelled_ ZAV_GUARDED_BY(lock_);
     std::map<std::uint64_t, Waiter> waiters_ ZAV_GUARDED_BY(lock_);
     std::uint64_t lastWaiter_ ZAV_GUARDED_BY(lock_) = 0;
+    std::map<std::uint64_t, Following> followers_ ZAV_GUARDED_BY(lock_);
+    std::shared_ptr<const Follower> heard_;  ///< gets what all tasks' commands write
 
     std::unique_ptr<OutcomeFeed::Subscription> outcomes_;  ///< last, so that it ends first
 };

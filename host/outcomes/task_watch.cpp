@@ -87,12 +87,13 @@ void TaskWatch::published(const oxa::Rows& rows) {
     }
 }
 
-bool TaskWatch::quiet() const {
+bool TaskWatch::quiet(bool willNotEnd) const {
     const bool held = feed_.holding();
     const embedded::MutexLock lock(lock_);
     if (running_ > 0) return false;
-    return held || std::all_of(outstanding_.begin(), outstanding_.end(),
-                               [](const auto& entry) { return entry.second <= 0; });
+    return held || willNotEnd ||
+           std::all_of(outstanding_.begin(), outstanding_.end(),
+                       [](const auto& entry) { return entry.second <= 0; });
 }
 
 }  // namespace host

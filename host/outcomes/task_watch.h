@@ -41,8 +41,9 @@ public:
     };
 
     /// True when no query runs and either no task is outstanding or the feed holds the executor.
-    /// Any thread.
-    bool quiet() const;
+    /// `willNotEnd`: the task in hand waits for the host's end, so it is not waited for. Any
+    /// thread.
+    bool quiet(bool willNotEnd = false) const;
 
 private:
     struct Columns {

@@ -35,6 +35,8 @@ struct Typed {
     std::optional<std::string> orphanWait;
     std::optional<std::string> onInterrupt;
     std::optional<std::string> taskTimeout;
+    std::optional<std::string> grace;
+    std::optional<std::string> maxOutput;
     bool noJournal = false;
     bool traceSecrets = false;
     bool check = false;
@@ -89,6 +91,13 @@ const OptionRow kOptions[] = {
      &Typed::onInterrupt},
     {"--task-timeout", "SECONDS",
      "How long one command of a task may run; else TIMEOUT says so, else 300", &Typed::taskTimeout},
+    {"--grace", "SECONDS",
+     "How long the task in hand may take when the host is told to end, 1 to 86400; 10 if not given",
+     &Typed::grace},
+    {"--max-output", "BYTES",
+     "How much the commands of one task may write before they are ended, 1 to 1000000000; 16777216 "
+     "if not given",
+     &Typed::maxOutput},
     {"--trace-secrets", nullptr, "Show passwords and configurations in the trace log as they are",
      &Typed::traceSecrets},
     {"--check", nullptr,
@@ -256,6 +265,9 @@ std::optional<HostOptions> readOptions(int argc, const char* const* argv,
     }
     if (typed->taskTimeout)
         options.taskTimeout = taskTimeoutOf("--task-timeout", *typed->taskTimeout);
+    options.grace = std::chrono::seconds(
+        countOf("--grace", typed->grace, 86'400, static_cast<int>(options.grace.count())));
+    options.maxOutput = countOf("--max-output", typed->maxOutput, 1'000'000'000, options.maxOutput);
     chooseSockets(*typed, environment, options);
     chooseJournal(*typed, options);
     return options;

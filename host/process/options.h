@@ -22,6 +22,9 @@ struct HostOptions {
     int keepRows = 10'000;  ///< how many rows of outcomes are kept
     /// How long the commands of an earlier run may go on; then they are killed.
     std::chrono::seconds orphanWait{300};
+    /// How long the host waits for the task in hand when it is told to end.
+    std::chrono::seconds grace{10};
+    int maxOutput = 16 << 20;               ///< bytes that the commands of one task may write
     bool rerunInterrupted = false;          ///< the task that an unclean end cut off runs again
     std::optional<std::uint16_t> rpcPort;   ///< absent: no TCP
     std::optional<std::string> originNode;  ///< absent: the platform's own choice

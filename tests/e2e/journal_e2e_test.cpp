@@ -197,17 +197,45 @@ TEST_F(JournalOnDisk, ARefusalIsRememberedForItsRepetition) {
     EXPECT_EQ(get("/v1/tasks/never")["reason"], "not on Sundays");
 }
 
-TEST_F(JournalOnDisk, WhatWaitsCanBeCancelledAndWhatIsInHandCannot) {
+TEST_F(JournalOnDisk, WhatWaitsCanBeCancelled) {
     start();
     const std::string first = accept("ux");
     const std::string second = accept("px");
     ASSERT_TRUE(awaitNote("begin ux"));
     EXPECT_EQ(post("/v1/tasks/" + second + "/cancel", nullptr, 200)["state"], "cancelled");
     post("/v1/tasks/" + second + "/cancel", nullptr, 409);
-    post("/v1/tasks/" + first + "/cancel", nullptr, 409);
     openGate();
     EXPECT_EQ(stateOf(first, "?wait=60"), "done");
     EXPECT_THAT(allNotes(), ElementsAre("begin ux", "end ux"));
+}
+
+TEST_F(JournalOnDisk, WhatTheGraceCutsOffIsInterruptedAndTheQueueStays) {
+    start({"--grace", "1"});
+    const std::string first = accept("ux");
+    const std::string second = accept("px");
+    ASSERT_TRUE(awaitNote("begin ux"));
+    host->program().signal(SIGTERM);
+    const ProgramResult result = host->program().wait();
+    EXPECT_EQ(result.status, 0);
+    EXPECT_NE(result.err.find("1 tasks wait"), std::string::npos) << result.err;
+    openGate();
+    host->start();
+    EXPECT_EQ(stateOf(first), "interrupted");
+    EXPECT_EQ(stateOf(second, "?wait=60"), "done");
+}
+
+TEST_F(JournalOnDisk, AHostSaysWhetherItIsReady) {
+    start();
+    EXPECT_EQ(get("/v1/ready"), (json{{"ready", true}, {"reasons", json::array()}}));
+    accept("ux");
+    ASSERT_TRUE(awaitNote("begin ux"));
+    killAndStart();
+    RawClient client(host->socket());
+    const auto reply = client.get("/v1/ready");
+    EXPECT_EQ(reply.status, 503U);
+    EXPECT_EQ(json::parse(reply.body)["reasons"][0]["part"], "leftovers") << reply.body;
+    openGate();
+    EXPECT_TRUE(eventually([&] { return get("/v1/ready")["ready"] == true; }));
 }
 
 TEST_F(JournalOnDisk, ATaskWhoseTimeIsOverExpires) {

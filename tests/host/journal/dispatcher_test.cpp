@@ -4,11 +4,15 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <unistd.h>
+
+#include <csignal>
 #include <future>
 
 #include "host/made_up_table.h"
 #include "support/gate.h"
 #include "support/host/program.h"
+#include "support/scratch_dir.h"
 
 namespace {
 
@@ -146,7 +150,7 @@ TEST_F(Dispatching, ACancelledTaskIsPassedOver) {
     Dispatcher dispatcher(journal, *list, [&](const Task& task) {
         // Somebody cancels it after it was chosen and before it is handed over.
         if (task.id == first.id) {
-            EXPECT_TRUE(journal.cancel(task.number));
+            EXPECT_EQ(journal.cancel(task.number), host::Journal::Cancel::Ended);
         }
         accept(task);
         outcomes.publish(row(task.transid));
@@ -156,6 +160,146 @@ TEST_F(Dispatching, ACancelledTaskIsPassedOver) {
     EXPECT_EQ(endOf(second), TaskState::Done);
     EXPECT_EQ(journal.find(first.id)->state, TaskState::Cancelled);
     EXPECT_THAT(handedOver, ElementsAre("t2"));
+}
+
+TEST_F(Dispatching, TheOutcomeOfOneTaskRecordsTheHandOverOfTheNext) {
+    constexpr unsigned kTasks = 20;
+    Task last;
+    for (unsigned i = 0; i < kTasks; ++i)
+        last = enter("t" + std::to_string(i));
+    const std::uint64_t before = journal.transactions();
+    Dispatcher dispatcher(journal, *list, [this](const Task& task) {
+        accept(task);
+        EXPECT_EQ(journal.byNumber(task.number)->run, journal.run());
+        outcomes.publish(row(task.transid));
+        return std::optional<Task>();
+    });
+    start(dispatcher);
+    EXPECT_EQ(endOf(last), TaskState::Done);
+    EXPECT_LE(journal.transactions() - before, kTasks * 13U / 10U) << "beside the acceptance";
+}
+
+TEST_F(Dispatching, ALoneTaskTakesThreeCommitsFromItsAcceptanceToItsOutcome) {
+    constexpr unsigned kTasks = 4;
+    Dispatcher dispatcher(journal, *list, [this](const Task& task) {
+        accept(task);
+        outcomes.publish(row(task.transid));
+        return std::optional<Task>();
+    });
+    start(dispatcher);
+    const std::uint64_t before = journal.transactions();
+    for (unsigned i = 0; i < kTasks; ++i) {
+        const Task task = enter("t" + std::to_string(i));
+        dispatcher.wake();
+        EXPECT_EQ(endOf(task), TaskState::Done);
+    }
+    // Now and then what can wait is written by itself.
+    EXPECT_LE(journal.transactions() - before, kTasks * 35U / 10U);
+}
+
+TEST_F(Dispatching, OneThatIsTooLateIsNotHandedOverWithTheOutcomeBefore) {
+    const Task first = enter("t1");
+    Task late;
+    late.transid = "t2";
+    late.way = host::TaskWay::Journal;
+    late.conditions = {{"TRANSID", OPER_EQ, "t2"}, {"COMMAND", OPER_EQ, "START"}};
+    late.expires = host::WallClock::now() - std::chrono::hours(1);
+    journal.enter(late);
+    Dispatcher dispatcher(journal, *list, [this](const Task& task) {
+        accept(task);
+        outcomes.publish(row(task.transid));
+        return std::optional<Task>();
+    });
+    start(dispatcher);
+    EXPECT_EQ(endOf(late), TaskState::Expired);
+    EXPECT_EQ(journal.find(first.id)->state, TaskState::Done);
+    EXPECT_THAT(handedOver, ElementsAre("t1"));
+}
+
+/// With an install that had begun when the last run ended.
+class DispatchingAfterInstall : public Dispatching {
+protected:
+    DispatchingAfterInstall() {
+        {
+            host::Journal before{host::Journal::Settings{scratch.path("state")}};
+            Task task;
+            task.transid = "install";
+            task.way = host::TaskWay::Journal;
+            before.enter(task);
+            task.state = TaskState::Running;
+            task.run = before.run();
+            task.begun = true;
+            before.save(task);
+            Task next;
+            next.transid = "t1";
+            next.way = host::TaskWay::Journal;
+            next.conditions = {{"TRANSID", OPER_EQ, "t1"}, {"COMMAND", OPER_EQ, "START"}};
+            before.enter(next);
+        }
+        kept.emplace(host::Journal::Settings{scratch.path("state")});
+        keptFeed.emplace(*tables);
+        keptList.emplace(*tables, *keptFeed, *kept, true);
+    }
+    static Task endedAs(Task task, TaskState state) {
+        task.state = state;
+        task.ended = host::WallClock::now();
+        return task;
+    }
+
+    ScratchDir scratch;
+    std::optional<host::Journal> kept;
+    std::optional<host::OutcomeFeed> keptFeed;
+    std::optional<host::TaskList> keptList;
+};
+
+TEST_F(DispatchingAfterInstall, NothingBeginsBeforeItIsOver) {
+    int tries = 0;
+    Gate handingOver;
+    std::optional<TaskState> stateThen;
+    Dispatcher dispatcher(
+        *kept, *keptList,
+        [&](const Task& task) {
+            EXPECT_EQ(task.transid, "t1");
+            stateThen = kept->find("install")->state;
+            handingOver.pass();
+            return std::optional<Task>(endedAs(task, TaskState::Refused));
+        },
+        [&](Task task) {
+            EXPECT_EQ(task.transid, "install");
+            if (++tries == 1) throw host::QueryFailed("not yet", false);
+            return endedAs(std::move(task), TaskState::Failed);
+        });
+    EXPECT_TRUE(dispatcher.awaitsInstall());
+    start(dispatcher);
+    ASSERT_TRUE(handingOver.awaitArrival());
+    EXPECT_FALSE(dispatcher.awaitsInstall());
+    handingOver.open();
+    EXPECT_EQ(stateThen, TaskState::Failed);
+    EXPECT_EQ(tries, 2);
+}
+
+TEST_F(DispatchingAfterInstall, WhatIsLeftOfACancelledOneGetsTheSignalToEnd) {
+    const Task task = *kept->find("install");
+    EXPECT_EQ(kept->cancel(task.number), host::Journal::Cancel::Asked);
+    const std::string mark = kept->identity() + "-1-" + std::to_string(::getsid(0));
+    Program left({"/bin/sh", "-c", "echo begun; exec sleep 60"}, "", {{"ZAVHOST_RUN", mark}});
+    ASSERT_TRUE(left.awaitOutput("begun", std::chrono::seconds(20)));
+    const host::Leftovers found(kept->identity(), kept->run());
+    Gate completing;
+    Dispatcher dispatcher(
+        *kept, *keptList,
+        [](const Task& waiting) {
+            return std::optional<Task>(endedAs(waiting, TaskState::Refused));
+        },
+        [&](Task install) {
+            EXPECT_TRUE(install.cancel);
+            completing.pass();
+            return endedAs(std::move(install), TaskState::Cancelled);
+        });
+    dispatcher.start(found, std::chrono::hours(1));
+    ASSERT_TRUE(completing.awaitArrival());
+    EXPECT_EQ(left.wait().status, 128 + SIGTERM);
+    completing.open();
 }
 
 TEST_F(Dispatching, NothingIsHandedOverAfterTheStop) {

@@ -5,12 +5,15 @@
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 
+#include <atomic>
 #include <csignal>
 #include <filesystem>
 #include <thread>
 
+#include "host/journal/commit_step.h"
 #include "host/journal/journal_fixture.h"
 #include "host/process/start_error.h"
+#include "support/gate.h"
 #include "support/host/program.h"
 
 namespace {
@@ -301,6 +304,36 @@ TEST_F(Journals, ManyThreadsMayEnterTasksAndShareCommits) {
         thread.join();
     EXPECT_EQ(journal->waiting(), 200);
     EXPECT_LE(journal->transactions() - before, 200U);
+}
+
+/// Holds up the first commit.
+Gate firstCommit;
+
+TEST_F(Journals, OfTwoHundredWhoSubmitAtOnceTenShareEachCommitAtLeast) {
+    constexpr int kSubmitters = 200;
+    open();
+    journal->newest({});
+    const std::uint64_t before = journal->transactions();
+    host::commitHook = [](host::CommitStep step) {
+        if (step == host::CommitStep::BeforeCommit) firstCommit.pass();
+    };
+    std::atomic<int> begun{0};
+    std::vector<std::thread> submitters;
+    for (int i = 0; i < kSubmitters; ++i) {
+        submitters.emplace_back([this, i, &begun] {
+            Task task = asked("t" + std::to_string(i));
+            ++begun;
+            journal->enter(task);
+        });
+    }
+    EXPECT_TRUE(firstCommit.awaitArrival());
+    EXPECT_TRUE(eventually([&] { return begun == kSubmitters; }));
+    firstCommit.open();
+    for (std::thread& submitter : submitters)
+        submitter.join();
+    host::commitHook = nullptr;
+    EXPECT_EQ(journal->waiting(), kSubmitters);
+    EXPECT_LE(journal->transactions() - before, kSubmitters / 10U);
 }
 
 }  // namespace

@@ -120,6 +120,55 @@ TEST_F(Recovery, AnEndThatCutsATaskOffInterruptsIt) {
     EXPECT_EQ(stateOf("q2"), TaskState::Queued);
 }
 
+TEST_F(Recovery, WhatWasToBeCancelledIs) {
+    open();
+    const Task first = running("q1");
+    const Task second = running("t1", TaskWay::Journal);
+    entered("q2", TaskWay::Query);
+    EXPECT_EQ(journal->cancel(first.number), host::Journal::Cancel::Asked);
+    EXPECT_EQ(journal->cancel(second.number), host::Journal::Cancel::Asked);
+    EXPECT_TRUE(journal->find("q1")->cancel);
+    open();
+    EXPECT_EQ(stateOf("q1"), TaskState::Cancelled);
+    EXPECT_EQ(stateOf("t1"), TaskState::Cancelled);
+    EXPECT_EQ(stateOf("q2"), TaskState::Queued);
+    EXPECT_EQ(journal->recovered().interrupted, "");
+}
+
+TEST_F(Recovery, AnInstallThatHasBegunStaysInHand) {
+    host::Journal::Settings here = settings();
+    here.boot = "one";
+    open(here);
+    Task task = running("t1", TaskWay::Journal);
+    task.begun = true;
+    journal->save(task);
+    entered("t2");
+    open(here);
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(journal->recovered().begun, task.id);
+    EXPECT_FALSE(journal->recovered().bootedAnew);
+    EXPECT_EQ(journal->recovered().interrupted, "");
+    EXPECT_EQ(journal->recovered().waiting, 1);
+    EXPECT_EQ(journal->nextInLine()->transid, "t2");
+    here.boot = "two";
+    open(here);
+    EXPECT_EQ(journal->recovered().begun, task.id);
+    EXPECT_TRUE(journal->recovered().bootedAnew);
+}
+
+TEST_F(Recovery, AQuietEndLeavesAnInstallThatHasBegunInHand) {
+    open();
+    Task task = running("t1", TaskWay::Journal);
+    task.begun = true;
+    journal->save(task);
+    entered("q1", TaskWay::Query);
+    journal->endCleanly(true);
+    EXPECT_EQ(journal->notBegun(), 1);
+    open();
+    EXPECT_EQ(journal->recovered().begun, task.id);
+    EXPECT_THAT(line(), testing::ElementsAre("q1"));
+}
+
 TEST_F(Recovery, EachRunHasANumberOfItsOwnAndTheIdentityStays) {
     open();
     const std::string identity = journal->identity();

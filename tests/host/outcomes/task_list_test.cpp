@@ -10,6 +10,7 @@
 #include "host/commands/ear.h"
 #include "host/journal/journal.h"
 #include "host/made_up_table.h"
+#include "support/host/program.h"
 #include "support/scratch_dir.h"
 #include "util/zavutil.h"
 
@@ -375,6 +376,131 @@ TEST_F(Tasks, GetTheCommandsThatTheExecutorRanForThem) {
     ASSERT_EQ(ofSecond.size(), 2U);
     EXPECT_EQ(ofSecond[0].exit, 3);
     EXPECT_EQ(ofSecond[1].exit, 0);
+}
+
+TEST_F(Tasks, OneThatIsCancelledWhileItRunsKeepsItsRow) {
+    const ScratchDir scratch;
+    const std::string script =
+        scratch.script("script", "echo >'" + scratch.path("begun") + "'\nexec sleep 60");
+    ask("t1");
+    std::thread executor([&] {
+        work(script);
+        publish("t1");
+    });
+    EXPECT_TRUE(eventually([&] { return scratch.exists("begun"); }));
+    const std::int64_t number = list->find("t1")->number;
+    EXPECT_EQ(journal.cancel(number), host::Journal::Cancel::Asked);
+    list->endCommandsOf(number);
+    executor.join();
+    const std::optional<Task> task = list->find("t1");
+    EXPECT_EQ(task->state, TaskState::Cancelled);
+    EXPECT_NE(task->reason, "");
+    EXPECT_THAT(task->outcomes, ElementsAre(taskRow("t1", "START", 0)));
+    EXPECT_EQ(task->commands.at(0).signal, SIGTERM);
+    EXPECT_EQ(journal.cancel(number), host::Journal::Cancel::Over);
+}
+
+TEST_F(Tasks, OneThatIsCancelledTooLateEndsAsItWouldHave) {
+    ask("t1");
+    const std::int64_t number = list->find("t1")->number;
+    EXPECT_EQ(journal.cancel(number), host::Journal::Cancel::Asked);
+    list->endCommandsOf(number);
+    publish("t1");  // no command of it ran any more
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+}
+
+TEST_F(Tasks, OneThatIsCancelledInTheQueueEndsWhenItBegins) {
+    const ScratchDir scratch;
+    const std::string script = scratch.script("script", "echo >'" + scratch.path("ran") + "'");
+    ask("t1");
+    Task task;
+    task.transid = "t2";
+    task.way = host::TaskWay::Journal;
+    task.conditions = {{"TRANSID", OPER_EQ, "t2"}, {"COMMAND", OPER_EQ, "START"}};
+    journal.enter(task);
+    {
+        TaskList::Request request(*list, *journal.nextInLine());
+        request.answered(rows(taskRow("t2", "START", 0)), answering(0));
+    }
+    EXPECT_EQ(journal.cancel(task.number), host::Journal::Cancel::Asked);
+    list->endCommandsOf(task.number);
+    std::thread([&] {
+        publish("t1");
+        work(script);
+        publish("t2");
+    }).join();
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+    EXPECT_EQ(stateOf("t2"), TaskState::Cancelled);
+    EXPECT_FALSE(scratch.exists("ran"));
+}
+
+TEST_F(Tasks, OneThatIsCancelledOnItsWayToThePluginEndsWhenItBegins) {
+    const ScratchDir scratch;
+    const std::string script = scratch.script("script", "echo >'" + scratch.path("ran") + "'");
+    Task task;
+    task.transid = "t1";
+    task.way = host::TaskWay::Journal;
+    task.conditions = {{"TRANSID", OPER_EQ, "t1"}, {"COMMAND", OPER_EQ, "START"}};
+    journal.enter(task);
+    task.run = journal.run();
+    journal.save(task);
+    EXPECT_EQ(journal.cancel(task.number), host::Journal::Cancel::Asked);
+    list->endCommandsOf(task.number);
+    {
+        TaskList::Request request(*list, task);
+        request.answered(rows(taskRow("t1", "START", 0)), answering(0));
+    }
+    std::thread([&] {
+        work(script);
+        publish("t1");
+    }).join();
+    EXPECT_EQ(stateOf("t1"), TaskState::Cancelled);
+    EXPECT_FALSE(scratch.exists("ran"));
+}
+
+TEST_F(Tasks, WhatThePluginHoldsInItsQueueCannotBeCancelled) {
+    ask("t1");
+    ask("t2");
+    EXPECT_EQ(journal.cancel(list->find("t2")->number), host::Journal::Cancel::InPlugin);
+    EXPECT_EQ(journal.cancel(99), host::Journal::Cancel::Unknown);
+    EXPECT_EQ(stateOf("t2"), TaskState::Queued);
+}
+
+TEST_F(Tasks, AnInstallThatMayRestartTheHostIsKnown) {
+    EXPECT_FALSE(list->mayRestartHost());
+    ask("t1", "INSTALL", 0, {{"OPTIONAL", OPER_EQ, "REQUIRES_RESTART"}});
+    EXPECT_TRUE(list->mayRestartHost());
+    EXPECT_FALSE(list->restartsHost()) << "it has not begun";
+    publish("t1");
+    EXPECT_TRUE(list->restartsHost());
+    EXPECT_TRUE(list->find("t1")->begun);
+    publish("t1");
+    EXPECT_FALSE(list->mayRestartHost());
+    EXPECT_FALSE(list->restartsHost());
+}
+
+TEST_F(Tasks, WhoFollowsOneHearsWhatItsCommandsWrite) {
+    const ScratchDir scratch;
+    const std::string script = scratch.script("script", "echo out; echo bad >&2");
+    ask("t1");
+    ask("t2");
+    std::string heard;
+    const std::uint64_t follower =
+        list->follow(list->find("t2")->number, [&heard](const host::OutputPiece& piece) {
+            heard += (piece.isError ? "err:" : "out:") + std::string(piece.text) + '@' +
+                     std::to_string(piece.end) + ' ';
+        });
+    std::thread([&] {
+        work(script);  // of another task
+        publish("t1");
+        work(script);
+        publish("t2");
+    }).join();
+    EXPECT_EQ(heard, "out:out\n@4 err:bad\n@4 ");
+    list->unfollow(follower);
+    ask("t3");
+    std::thread([&] { work(script); }).join();
+    EXPECT_EQ(heard, "out:out\n@4 err:bad\n@4 ");
 }
 
 TEST_F(Tasks, ASuccessWhoseCommandDiedOfASignalIsAFailure) {

@@ -81,6 +81,11 @@ TEST_F(Options, TheJournalKeepsWhatItIsToldToKeep) {
     EXPECT_EQ(given->keepRows, 9);
     EXPECT_TRUE(given->rerunInterrupted);
     EXPECT_EQ(given->orphanWait, std::chrono::seconds(10));
+    EXPECT_EQ(usual->grace, std::chrono::seconds(10));
+    EXPECT_EQ(usual->maxOutput, 16 * 1024 * 1024);
+    const auto bounded = read({"--grace", "3", "--max-output", "1000"});
+    EXPECT_EQ(bounded->grace, std::chrono::seconds(3));
+    EXPECT_EQ(bounded->maxOutput, 1000);
     EXPECT_FALSE(read({"--no-journal"})->journal);
     EXPECT_EQ(read({"--task-timeout", "60"})->orphanWait, std::chrono::seconds(60));
 }
@@ -91,6 +96,8 @@ TEST_F(Options, OfTheJournalThatMakeNoSenseAreRefused) {
     EXPECT_THROW(read({"--keep-tasks", "1d"}), host::StartError);
     EXPECT_THROW(read({"--keep-rows", "-1"}), host::StartError);
     EXPECT_THROW(read({"--orphan-wait", ""}), host::StartError);
+    EXPECT_THROW(read({"--grace", "0"}), host::StartError);
+    EXPECT_THROW(read({"--max-output", "16M"}), host::StartError);
     EXPECT_THROW(read({"--on-interrupt", "maybe"}), host::StartError);
     EXPECT_THROW(read({"--no-journal", "--state", "/s"}), host::StartError);
 }

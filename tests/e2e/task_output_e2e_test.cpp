@@ -1,0 +1,109 @@
+// What a task's commands write, while they write it.
+// ctest-label: threaded
+
+#include <gtest/gtest.h>
+#include <signal.h>
+
+#include <fstream>
+#include <nlohmann/json.hpp>
+#include <optional>
+
+#include "host/raw_client.h"
+#include "support/host/managed_host.h"
+#include "support/host/script_home.h"
+
+namespace {
+
+using nlohmann::json;
+
+class TaskOutput : public testing::Test {
+protected:
+    void start(const std::vector<std::string>& arguments = {}) {
+        host.emplace(home.path(), Environment{{"QVSDEPLOY_AGENTDEPOT", home.depot()}}, arguments,
+                     ManagedHost::Guards::On);
+    }
+    std::string path(const std::string& name) const { return home.files().path(name); }
+    RawClient::Answer post(const json& body) const {
+        RawClient client(host->socket());
+        return client.post("/v1/tasks", body.dump());
+    }
+    /// An install that runs this script.
+    std::string install(const std::string& script) const {
+        const auto reply = post({{"command", "INSTALL"},
+                                 {"product", "ux"},
+                                 {"version", "010000000"},
+                                 {"context", "/bin/sh " + script}});
+        EXPECT_EQ(reply.status, 202U) << reply.body;
+        return json::parse(reply.body)["id"];
+    }
+    json task(const std::string& id, const std::string& wait = "") const {
+        RawClient client(host->socket());
+        return json::parse(client.get("/v1/tasks/" + id + wait).body);
+    }
+
+    ScriptHome home;
+    std::optional<ManagedHost> host;
+};
+
+TEST_F(TaskOutput, IsFollowedToItsEnd) {
+    start();
+    const std::string id =
+        install(home.files().script("script", "echo one; until [ -e '" + path("go") +
+                                                  "' ]; do sleep 0.02; done; echo two >&2"));
+    RawClient client(host->socket());
+    client.send("GET /v1/tasks/" + id + "/output?follow=1 HTTP/1.1\r\nHost: x\r\n\r\n");
+    EXPECT_NE(client.readUntil("\r\n\r\n").find("text/event-stream"), std::string::npos);
+    EXPECT_EQ(client.readUntil("\n\n"), "data: {\"stream\":\"stdout\",\"text\":\"one\\n\"}\n\n");
+    home.files().write("go", "");
+    EXPECT_EQ(client.readUntil("\n\n"), "data: {\"stream\":\"stderr\",\"text\":\"two\\n\"}\n\n");
+    EXPECT_EQ(client.readUntil("\n\n"), "event: end\ndata: {\"state\":\"done\"}\n\n");
+    EXPECT_TRUE(client.isClosed()) << "the stream is over";
+}
+
+TEST_F(TaskOutput, OfATaskThatIsOverIsWhatWasKept) {
+    start();
+    const std::string id = install(home.files().script("script", "echo one; exit 3"));
+    EXPECT_EQ(task(id, "?wait=60")["state"], "failed");
+    for (const char* follow : {"", "?follow=1"}) {
+        RawClient client(host->socket());
+        client.send("GET /v1/tasks/" + id + "/output" + follow + " HTTP/1.1\r\nHost: x\r\n\r\n");
+        client.readUntil("\r\n\r\n");
+        EXPECT_EQ(client.readUntil("\n\n"),
+                  "data: {\"stream\":\"stdout\",\"text\":\"one\\n\"}\n\n");
+        EXPECT_EQ(client.readUntil("\n\n"), "event: end\ndata: {\"state\":\"failed\"}\n\n");
+    }
+}
+
+/// The most memory that the process has used, in KiB.
+long mostMemory(pid_t pid) {
+    std::ifstream status("/proc/" + std::to_string(pid) + "/status");
+    for (std::string line; std::getline(status, line);) {
+        if (line.rfind("VmHWM:", 0) == 0) return std::stol(line.substr(6));
+    }
+    return -1;
+}
+
+TEST_F(TaskOutput, WithoutEndEndsTheTaskAndNotTheHostsMemory) {
+    start();
+    const std::string id = install(home.files().script("script", "exec yes"));
+    const json over = task(id, "?wait=100");
+    EXPECT_EQ(over["state"], "failed");
+    EXPECT_NE(over["reason"].get<std::string>().find("more than they may"), std::string::npos);
+    EXPECT_EQ(over["details"]["commands"][0]["signal"], SIGKILL);
+    EXPECT_LT(mostMemory(host->pid()), 200 * 1024);
+    const std::string next = install(home.files().script("next", "exit 0"));
+    EXPECT_EQ(task(next, "?wait=60")["state"], "done") << "the next task may write again";
+}
+
+TEST_F(TaskOutput, BeyondTheLimitEndsEachFurtherCommandToo) {
+    start({"--max-output", "1000"});
+    home.products({"ux"}, "exit 0");
+    home.agentScript("echo $verb >>'" + path("verbs") + "'\nhead -c 2000 /dev/zero | tr '\\0' x");
+    const auto reply = post({{"command", "RESTART"}, {"product", "ux"}});
+    ASSERT_EQ(reply.status, 202U) << reply.body;
+    const json over = task(json::parse(reply.body)["id"], "?wait=60");
+    EXPECT_EQ(over["state"], "failed");
+    EXPECT_EQ(home.files().read("verbs"), "stop\n");
+}
+
+}  // namespace
