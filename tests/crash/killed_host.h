@@ -1,0 +1,160 @@
+/// A host that is killed while it gets work in both ways, and what its tasks wrote down themselves.
+#pragma once
+
+#include <gtest/gtest.h>
+#include <signal.h>
+
+#include <chrono>
+#include <map>
+#include <nlohmann/json.hpp>
+#include <optional>
+#include <sstream>
+#include <string>
+#include <thread>
+#include <utility>
+#include <vector>
+
+#include "host/raw_client.h"
+#include "support/host/managed_host.h"
+#include "support/host/script_home.h"
+
+class KilledHost : public testing::Test {
+protected:
+    using json = nlohmann::json;
+
+    static constexpr int kTasksPerRound = 5;
+
+    explicit KilledHost(const Environment& environment = {}) {
+        home.products({}, "exit 0");
+        // A directory can be made only once, so two tasks at a time are seen.
+        const std::string notes = home.files().path("notes");
+        const std::string busy = home.files().path("busy");
+        home.agentScript("mkdir '" + busy + "' 2>/dev/null || echo overlap $product >>'" + notes +
+                         "'\n" + "echo begin $product >>'" + notes + "'\n" + "sleep 0.01\n" +
+                         "echo end $product >>'" + notes + "'\n" + "rmdir '" + busy + "'");
+        Environment whole = environment;
+        whole.emplace_back("QVSDEPLOY_AGENTDEPOT", home.depot());
+        host.emplace(home.path(), whole, std::vector<std::string>{"--max-queued", "1000000"},
+                     ManagedHost::Guards::On);
+    }
+
+    /// Status 0 when the host died before it answered.
+    RawClient::Answer post(const std::string& path, const json& body) const {
+        RawClient client(host->socket());
+        if (!client.connected()) return {};
+        return client.post(path, body.dump());
+    }
+    /// Whether the host says that it has accepted a task of this name; nothing: it said nothing.
+    std::optional<bool> askInTurn(const std::string& name) const {
+        const auto reply =
+            post("/v1/tasks",
+                 {{"command", "START"}, {"product", name}, {"transid", name}, {"force", true}});
+        if (reply.status == 0) return std::nullopt;
+        EXPECT_EQ(reply.status, 202U) << reply.body;
+        return reply.status == 202;
+    }
+    std::optional<bool> askOnTheTable(const std::string& name) const {
+        json where = json::array();
+        for (const auto& [column, value] : std::map<std::string, std::string>{
+                 {"COMMAND", "START"}, {"PRODUCT", name}, {"TRANSID", name}}) {
+            where.push_back({{"column", column}, {"op", "="}, {"value", value}});
+        }
+        const auto reply =
+            post("/v1/query", {{"table", "KAGREQT"}, {"where", where}, {"force", true}});
+        if (reply.status == 0) return std::nullopt;
+        // What the killed host was doing may not have ended yet.
+        EXPECT_TRUE(reply.status == 200 || reply.status == 503) << reply.body;
+        return reply.status == 200;
+    }
+    /// Asks for tasks until there are enough or the host is dead. Names are letter and number.
+    void load(char letter, int first, std::vector<std::string>& names) const {
+        for (int i = 0; i < kTasksPerRound; ++i) {
+            const std::string name = letter + std::to_string(first + i);
+            const auto answer = letter == 'j' ? askInTurn(name) : askOnTheTable(name);
+            if (!answer) return;
+            if (*answer) names.push_back(name);
+        }
+    }
+    /// Loads the host in both ways and kills it after this time.
+    void loadAndKill(int round, std::chrono::microseconds delay) {
+        std::vector<std::string> inTurn;
+        std::vector<std::string> onTheTable;
+        const int first = round * kTasksPerRound;
+        std::thread one([&] { load('j', first, inTurn); });
+        std::thread other([&] { load('q', first, onTheTable); });
+        std::this_thread::sleep_for(delay);
+        host->program().signal(SIGKILL);
+        one.join();
+        other.join();
+        EXPECT_EQ(host->program().wait().status, 128 + SIGKILL);
+        accepted.insert(accepted.end(), inTurn.begin(), inTurn.end());
+        accepted.insert(accepted.end(), onTheTable.begin(), onTheTable.end());
+        host->start();
+    }
+
+    json get(const std::string& path) const {
+        RawClient client(host->socket());
+        return json::parse(client.get(path).body);
+    }
+    bool isIdle() const {
+        return get("/v1/tasks?state=queued")["tasks"].empty() &&
+               get("/v1/tasks?state=running")["tasks"].empty();
+    }
+    /// All tasks, by name. Names that were given twice are faults.
+    std::map<std::string, json> allTasks(std::vector<std::string>& faults) const {
+        std::map<std::string, json> tasks;
+        std::string after;
+        for (;;) {
+            const json page = get("/v1/tasks?limit=1000" + after);
+            for (const json& task : page["tasks"]) {
+                const std::string name = task["transid"];
+                if (!tasks.emplace(name, task).second) faults.push_back(name + " is there twice");
+            }
+            if (page["next"].is_null()) return tasks;
+            after = "&after=" + page["next"].dump();
+        }
+    }
+    std::vector<std::pair<std::string, std::string>> notes() const {
+        std::istringstream text(home.files().read("notes"));
+        std::vector<std::pair<std::string, std::string>> lines;
+        for (std::string what, name; text >> what >> name;)
+            lines.emplace_back(what, name);
+        return lines;
+    }
+
+    /// Where journal, acceptances and the tasks' own notes do not agree.
+    std::vector<std::string> faults() const {
+        std::vector<std::string> found;
+        const std::map<std::string, json> tasks = allTasks(found);
+        for (const std::string& name : accepted) {
+            if (tasks.count(name) == 0) found.push_back(name + " was accepted and is missing");
+        }
+        std::map<std::string, int> begun;
+        std::map<std::string, int> ended;
+        int last = -1;
+        for (const auto& [what, name] : notes()) {
+            if (what == "overlap") found.push_back(name + " ran beside another one");
+            if (what == "end") ++ended[name];
+            if (what != "begin") continue;
+            ++begun[name];
+            if (tasks.count(name) == 0) found.push_back(name + " ran without being known");
+            if (name.front() != 'j') continue;
+            const int number = std::stoi(name.substr(1));
+            if (number <= last) found.push_back(name + " ran out of its turn");
+            last = number;
+        }
+        for (const auto& [name, task] : tasks) {
+            const std::string state = task["state"];
+            const bool done = state == "done" && begun[name] == 1 && ended[name] == 1;
+            const bool interrupted = state == "interrupted" && begun[name] <= 1;
+            if (done || interrupted) continue;
+            found.push_back(name + " is " + state + ", began " + std::to_string(begun[name]) +
+                            " times and ended " + std::to_string(ended[name]) + " times");
+        }
+        return found;
+    }
+
+    ScriptHome home;
+    std::optional<ManagedHost> host;
+    std::vector<std::string> accepted;
+};
