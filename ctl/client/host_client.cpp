@@ -43,7 +43,10 @@ Response exchange(const std::string& path, const Request& request, Deadline dead
     transport.runInTime(deadline, tick, error, [&](auto done) {
         http::async_read(transport.socket(), buffer, parser, done);
     });
-    if (error == http::error::body_limit) throw senseless("is larger than 64 MiB");
+    // A length that no text can have is found out another way.
+    const bool isTooLarge =
+        error == http::error::body_limit || error == http::error::buffer_overflow;
+    if (isTooLarge) throw senseless("is larger than 64 MiB");
     if (error) throw transport.broken(error);
     return parser.release();
 }

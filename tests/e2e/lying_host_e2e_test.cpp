@@ -1,6 +1,7 @@
-// zavctl believes nothing that a host says: whatever it is, zavctl ends with an error that says
-// why, obeys no escape sequence in it, and takes no more memory than its limits allow. ctest-label:
-// threaded
+// ctest-label: threaded
+//
+// zavctl believes nothing that a host says. Whatever it is, zavctl ends with an error that says
+// why, obeys no escape sequence in it, and takes no more memory than its limits allow.
 
 #include <gmock/gmock.h>
 #include <sys/resource.h>
@@ -180,7 +181,9 @@ TEST(LyingHost, WhoseAnswerIsNoneIsAFailureOfEveryVerb) {
             expectHarmless(result);
             EXPECT_THAT(result.status, AnyOf(1, 3, 4)) << result.err;
             EXPECT_THAT(result.err, testing::StartsWith("zavctl: "));
-            if (verb.front() == "agents") EXPECT_THAT(result.err, HasSubstr(lie.said));
+            if (verb.front() == "agents") {
+                EXPECT_THAT(result.err, HasSubstr(lie.said));
+            }
         }
     }
 }
