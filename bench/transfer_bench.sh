@@ -4,12 +4,13 @@
 #
 #   bench/transfer_bench.sh [--mib N] [--files N] [--rounds N] [--build DIR] [--out FILE]
 #
-# Peers: cp, rsync with a daemon on loopback, scp and scp -r with a server on loopback that has
-# throw-away keys; what is not installed is left out. In each of --rounds rounds every program runs
-# once, each time another one first, on a quiet machine with free memory at hand; its time is compared
-# with that of the push in the same round, and the median of these ratios counts. Ends with status 1
-# when what arrived is not what was sent or the host's memory grew by 32 MiB. --out FILE appends the
-# figures: seconds, ratios, and MiB for the growth.
+# The push is measured without the check of the sums afterwards, which the peers leave out as well,
+# and with it as `verified`. Peers: cp, rsync with a daemon on loopback, scp and scp -r with a server
+# on loopback that has throw-away keys; what is not installed is left out. In each of --rounds rounds
+# every program runs once, each time another one first, on a quiet machine with free memory at hand;
+# its time is compared with that of the push in the same round, and the median of these ratios counts.
+# Ends with status 1 when what arrived is not what was sent or the host's memory grew by 32 MiB.
+# --out FILE appends the figures: seconds, ratios, and MiB for the growth.
 set -eu
 cd "$(dirname "$0")/.."
 # shellcheck source=bench/peers.sh
@@ -24,7 +25,7 @@ while [ $# -gt 0 ]; do
     --build) build=$2 ;;
     --out) out=$2 ;;
     *)
-        sed -n '2,13s/^# \{0,1\}//p' "$0" >&2
+        sed -n '2,14s/^# \{0,1\}//p' "$0" >&2
         exit 2
         ;;
     esac
@@ -44,12 +45,13 @@ done
 
 # --- who takes it -------------------------------------------------------------------------------
 start_host "$build"
-ways='push copy'
+ways='push verified copy'
 if start_rsync; then ways="$ways sync"; fi
 if start_sshd; then ways="$ways secure"; fi
 
 # --- how ----------------------------------------------------------------------------------------
-push() { "$build/bin/zavctl" --socket "$host_socket" push "$1"; }
+push() { "$build/bin/zavctl" --socket "$host_socket" push --no-verify "$1"; }
+verified() { "$build/bin/zavctl" --socket "$host_socket" push "$1"; }
 copy() { cp -r "$1" "$scratch/target/"; }
 sync() { rsync -r "$1" "rsync://127.0.0.1:$rsync_port/target/"; }
 secure() {
@@ -61,7 +63,7 @@ memory() { awk '/^VmHWM:/ {print $2}' "/proc/$host/status"; }
 declare -A times # "WHAT WAY": nanoseconds, one line per round
 run() {          # WHAT WAY
     local from to where=target
-    [ "$2" != push ] || where=depot
+    case $2 in push | verified) where=depot ;; esac
     rm -rf "$scratch/target/$1" "$scratch/depot/$1"
     await_quiet
     have_pages "$mib"
@@ -94,7 +96,7 @@ growth=$((($(memory) - before) / 1024))
 run_rounds many
 
 # --- what came out ------------------------------------------------------------------------------
-declare -A names=([push]='zavctl push' [copy]=cp [sync]='rsync --daemon' [secure]=scp)
+declare -A names=([push]='zavctl push' [verified]='push, verified' [copy]=cp [sync]='rsync --daemon' [secure]=scp)
 report() { # WHAT TITLE
     local way ratio
     echo "$2"

@@ -157,6 +157,10 @@ class Table:
         yield row("many", "secure", "`scp -r`", 1 / 6, "at most 0.17")
         yield row("many", "sync", "`rsync` to a daemon", 1)
         yield row("many", "copy", "`cp -r`", 1.5)
+        for what, title in (("large", "one file of 1 GiB"),
+                            ("many", "a folder of 10,000 files of 4 KiB")):
+            yield Row(f"push of {title}, verified", "the push alone",
+                      [self._ratio(f"transfer/{what}/verified", f"transfer/{what}/push")])
         yield Row("push of one file of 1 GiB: growth of the host's memory", "32 MiB",
                   [None if "transfer/growth" not in self._figures else
                    self._figures["transfer/growth"] / 32], 1, strict=True)
@@ -185,8 +189,8 @@ class Table:
                    self._figures["rest/resident_kib"] / (12 * 1024)], 1, strict=True)
 
     def rows(self):
-        for part in (self._commands, self._requests, self._processes, self._conversions, self._texts, self._files,
-                     self._transfers, self._growth, self._rest):
+        for part in (self._commands, self._requests, self._processes, self._conversions,
+                     self._texts, self._files, self._transfers, self._growth, self._rest):
             yield from part()
 
 

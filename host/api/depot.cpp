@@ -32,7 +32,8 @@ Answer getDepot(Services& services, const Call& call) {
 
 Answer deleteDepot(Services& services, const Call& call) {
     const std::string& path = call.required("path");
-    if (services.guarded && services.transfers.isReceiving(path)) {
+    if (services.guarded &&
+        services.transfers.isReceiving(services.transferRules.destination(path))) {
         throw Refusal("depot-transfers", "a client is just sending " + path,
                       "Wait until it has ended, and remove it then.");
     }

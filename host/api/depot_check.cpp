@@ -1,5 +1,7 @@
 // GET /v1/depot/check
 
+#include <sys/stat.h>
+
 #include <nlohmann/json.hpp>
 
 #include "host/api/call.h"
@@ -15,12 +17,19 @@ namespace {
 
 using nlohmann::ordered_json;
 
-std::optional<Objection> objectionTo(Services& services, const std::string& name) {
+/// A name of the request, and its directory, which it mostly shares with the names around it.
+struct Arrival {
+    const std::string& name;
+    const std::string file;
+    const ArrivalDirectory& directory;
+};
+
+std::optional<Objection> objectionTo(Services& services, const Arrival& arrival) {
     // The plug-in refuses this by itself, guarded or not.
-    if (std::string reason = services.transferRules.whyImpossible(name); !reason.empty()) {
-        return Objection{"", std::move(reason), ""};
-    }
-    return services.transfers.objectionTo(name);
+    std::string reason = services.transferRules.whyImpossible(arrival.name, arrival.directory);
+    if (!reason.empty()) return Objection{"", std::move(reason), ""};
+    return services.transfers.objectionTo(arrival.name,
+                                          arrival.directory.realPath() + "/" + arrival.file);
 }
 
 void putObjection(ordered_json& document, const Objection& objection) {
@@ -29,29 +38,42 @@ void putObjection(ordered_json& document, const Objection& objection) {
     if (!objection.hint.empty()) document["hint"] = objection.hint;
 }
 
-/// False when the file would not be taken.
-bool putFile(ordered_json& files, Services& services, const std::string& name) {
-    ordered_json file;
-    putName(file, "path", name);
-    const auto objection = objectionTo(services, name);
-    file["taken"] = !objection;
-    file["converted"] = services.transferRules.isConverted(name);
-    const auto arrival = services.transferRules.arrivalName(name);
-    file["replaces"] = arrival && services.depotFiles.holds(*arrival);
-    if (objection) putObjection(file, *objection);
-    files.push_back(std::move(file));
-    return !objection;
+/// What becomes of the files of a push.
+struct PushVerdict {
+    ordered_json files = ordered_json::array();
+    bool taken = true;
+    std::uint64_t freed = 0;  ///< bytes of what they would replace
+};
+
+/// Of the file that a push would replace. Another name keeps its blocks in use.
+std::uint64_t freedBy(const struct stat& replaced) {
+    const bool isOnlyName = S_ISREG(replaced.st_mode) && replaced.st_nlink == 1;
+    return isOnlyName ? static_cast<std::uint64_t>(replaced.st_blocks) * 512 : 0;
 }
 
-/// What the files occupy that the push would replace.
-std::uint64_t replaced(const Services& services, const std::vector<std::string>& names) {
-    std::uint64_t bytes = 0;
+void putFile(PushVerdict& verdict, Services& services, const Arrival& arrival) {
+    ordered_json file;
+    putName(file, "path", arrival.name);
+    const auto objection = objectionTo(services, arrival);
+    file["taken"] = !objection;
+    file["converted"] = services.transferRules.isConverted(arrival.name);
+    const auto there = arrival.directory.find(arrival.file);
+    file["replaces"] = there && !S_ISDIR(there->st_mode);
+    if (there) verdict.freed += freedBy(*there);
+    if (objection) putObjection(file, *objection);
+    verdict.taken = verdict.taken && !objection;
+    verdict.files.push_back(std::move(file));
+}
+
+PushVerdict lookAt(Services& services, const std::vector<std::string>& names) {
+    const TransferRules& rules = services.transferRules;
+    PushVerdict verdict;
+    ArrivalDirectory directory = rules.directoryOf("");
     for (const std::string& name : names) {
-        if (const auto arrival = services.transferRules.arrivalName(name)) {
-            bytes += services.depotFiles.bytesAt(*arrival);
-        }
+        if (!rules.isIn(name, directory)) directory = rules.directoryOf(name);
+        putFile(verdict, services, {name, rules.fileOf(name), directory});
     }
-    return bytes;
+    return verdict;
 }
 
 Objection tooLittleSpace(std::uint64_t needed, std::uint64_t free) {
@@ -64,22 +86,17 @@ Objection tooLittleSpace(std::uint64_t needed, std::uint64_t free) {
 }  // namespace
 
 Answer getDepotCheck(Services& services, const Call& call) {
-    const std::vector<std::string> names = call.texts("path");
     const std::uint64_t free = services.depotFiles.freeBytes();
-    ordered_json files = ordered_json::array();
-    bool taken = true;
-    for (const std::string& name : names)
-        taken = putFile(files, services, name) && taken;
+    PushVerdict verdict = lookAt(services, call.texts("path"));
     ordered_json document;
     const auto needed = static_cast<std::uint64_t>(call.number("bytes", 0));
-    const std::uint64_t freed = replaced(services, names);
-    const bool fits = !services.guarded || needed <= free + freed;
+    const bool fits = !services.guarded || needed <= free + verdict.freed;
     document["guarded"] = services.guarded;
-    document["taken"] = taken && fits;
+    document["taken"] = verdict.taken && fits;
     document["free_bytes"] = free;
-    document["replaced_bytes"] = freed;
-    if (!fits) putObjection(document, tooLittleSpace(needed, free + freed));
-    document["files"] = std::move(files);
+    document["replaced_bytes"] = verdict.freed;
+    if (!fits) putObjection(document, tooLittleSpace(needed, free + verdict.freed));
+    document["files"] = std::move(verdict.files);
     return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
 }
 

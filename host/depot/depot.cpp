@@ -209,19 +209,4 @@ std::uint64_t Depot::freeBytes() const {
     return std::uint64_t{found.f_bavail} * found.f_frsize;
 }
 
-bool Depot::holds(const std::string& given) const {
-    const FileDescriptor top = root();
-    const FileDescriptor found = openBeneath(top.get(), withoutSlashes(given), O_PATH | O_NOFOLLOW);
-    struct stat status {};
-    return found && ::fstat(found.get(), &status) == 0 && !S_ISDIR(status.st_mode);
-}
-
-std::uint64_t Depot::bytesAt(const std::string& given) const {
-    const FileDescriptor top = root();
-    const FileDescriptor file = openBeneath(top.get(), withoutSlashes(given), O_PATH | O_NOFOLLOW);
-    struct stat found {};
-    const bool isFile = file && ::fstat(file.get(), &found) == 0 && S_ISREG(found.st_mode);
-    return isFile && found.st_nlink == 1 ? static_cast<std::uint64_t>(found.st_blocks) * 512 : 0;
-}
-
 }  // namespace host

@@ -49,10 +49,6 @@ public:
 
     /// Bytes that the host's user may still write.
     std::uint64_t freeBytes() const;
-    /// Whether a transfer to this path would replace something: a file or a link.
-    bool holds(const std::string& path) const;
-    /// The bytes that replacing this file would set free; 0 when there is none.
-    std::uint64_t bytesAt(const std::string& path) const;
 
 private:
     FileDescriptor root() const;

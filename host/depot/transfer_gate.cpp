@@ -31,28 +31,59 @@ std::optional<std::string> TransferGate::before(const ncs::Call& call) {
     if (!isTransfer(call)) return std::nullopt;
     const std::optional<TransferCall> transfer = readTransferCall(call);
     if (!transfer) return std::nullopt;
-    std::string destination = rules_.destination(transfer->name);
+    // Where a name leads is looked up in the file system, which ten thousand small files would
+    // feel.
+    const std::string destination =
+        rules_.keepsAny() ? rules_.destination(transfer->name) : std::string();
     std::optional<Objection> objection =
         rules_.objectionTo(transfer->name, destination, transfer->startsFile);
-    if (!objection && rules_.guarded()) {
-        objection = begin(call.association, {std::move(destination), transfer->endsFile});
-    }
+    if (!objection && rules_.guarded()) objection = begin(call.association, *transfer);
     if (!objection) return std::nullopt;
     traceRefusal(__func__, __LINE__, transfer->name, *objection);
     return transferReply(kTransferRefused);
 }
 
-std::optional<Objection> TransferGate::begin(std::uint64_t association, Transfer transfer) {
+/// The files are compared without the lock, because that asks the file system. Of two that begin at
+/// the same time the later one finds the earlier one noted already.
+std::optional<Objection> TransferGate::begin(std::uint64_t association, const TransferCall& call) {
+    std::uint64_t number = 0;
+    std::vector<std::string> others;
+    {
+        const embedded::MutexLock lock(lock_);
+        number = enter(association, call);
+        others = rivals(association);
+    }
+    if (!isOneOf(call.name, others)) return std::nullopt;
     const embedded::MutexLock lock(lock_);
-    if (isSentByOther(association, transfer.destination)) return beingSent();
-    underWay_[association] = std::move(transfer);
-    return std::nullopt;
+    const auto own = underWay_.find(association);
+    if (own != underWay_.end() && own->second.number == number) underWay_.erase(own);
+    return beingSent();
+}
+
+std::uint64_t TransferGate::enter(std::uint64_t association, const TransferCall& call) {
+    Transfer& own = underWay_[association];
+    if (own.number == 0 || own.name != call.name) own.number = ++begun_;
+    own.name = call.name;
+    own.endsFile = call.endsFile;
+    return own.number;
 }
 
 /// There are at most as many as the server has connections.
-bool TransferGate::isSentByOther(std::uint64_t association, const std::string& destination) const {
-    return std::any_of(underWay_.begin(), underWay_.end(), [&](const auto& entry) {
-        return entry.first != association && entry.second.destination == destination;
+std::vector<std::string> TransferGate::rivals(std::uint64_t association) const {
+    const Transfer& own = underWay_.at(association);
+    std::vector<std::string> names;
+    for (const auto& [other, transfer] : underWay_) {
+        const bool isRival = other != association && transfer.number < own.number;
+        if (isRival && rules_.mayBeOne(transfer.name, own.name)) names.push_back(transfer.name);
+    }
+    return names;
+}
+
+bool TransferGate::isOneOf(const std::string& name, const std::vector<std::string>& others) const {
+    if (others.empty()) return false;
+    const std::string destination = rules_.destination(name);
+    return std::any_of(others.begin(), others.end(), [&](const std::string& other) {
+        return rules_.destination(other) == destination;
     });
 }
 
@@ -68,19 +99,23 @@ void TransferGate::ended(std::uint64_t association) noexcept {
     underWay_.erase(association);
 }
 
-std::optional<Objection> TransferGate::objectionTo(const std::string& name) const {
-    if (auto objection = rules_.objectionTo(name, rules_.destination(name), true)) {
+std::optional<Objection> TransferGate::objectionTo(const std::string& name,
+                                                   const std::string& destination) const {
+    if (auto objection = rules_.objectionTo(name, destination, true)) {
         return objection;
     }
-    if (rules_.guarded() && isReceiving(name)) return beingSent();
+    if (rules_.guarded() && isReceiving(destination)) return beingSent();
     return std::nullopt;
 }
 
-bool TransferGate::isReceiving(const std::string& name) const {
-    const std::string destination = rules_.destination(name);
-    const embedded::MutexLock lock(lock_);
-    return std::any_of(underWay_.begin(), underWay_.end(), [&](const auto& entry) {
-        return isWithin(entry.second.destination, destination);
+bool TransferGate::isReceiving(const std::string& destination) const {
+    Transfers underWay;
+    {
+        const embedded::MutexLock lock(lock_);
+        underWay = underWay_;
+    }
+    return std::any_of(underWay.begin(), underWay.end(), [&](const auto& entry) {
+        return isWithin(rules_.destination(entry.second.name), destination);
     });
 }
 

@@ -5,9 +5,11 @@
 #include <map>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "embedded/mutex.h"
 #include "embedded/ncs_host.h"
+#include "host/depot/transfer_call.h"
 #include "host/depot/transfer_rules.h"
 
 namespace host {
@@ -25,24 +27,33 @@ public:
     void after(const ncs::Call& call, const std::string& reply) noexcept override;
     void ended(std::uint64_t association) noexcept override;
 
-    /// What stands against a push of that name now.
-    std::optional<Objection> objectionTo(const std::string& name) const;
-    /// Whether some client is just sending this file, or one below it if it is a directory.
-    bool isReceiving(const std::string& name) const;
+    /// What stands against a push of that name to that destination now.
+    std::optional<Objection> objectionTo(const std::string& name,
+                                         const std::string& destination) const;
+    /// Whether some client is just sending the file at this destination, or one below it if it is a
+    /// directory.
+    bool isReceiving(const std::string& destination) const;
 
 private:
     struct Transfer {
-        std::string destination;
+        std::string name;
         bool endsFile = false;
+        std::uint64_t number = 0;  ///< counts up with each file that somebody begins
     };
-    std::optional<Objection> begin(std::uint64_t association, Transfer transfer);
-    bool isSentByOther(std::uint64_t association, const std::string& destination) const
-        ZAV_REQUIRES(lock_);
+    using Transfers = std::map<std::uint64_t, Transfer>;
+
+    std::optional<Objection> begin(std::uint64_t association, const TransferCall& call);
+    /// Notes the transfer, and returns its number.
+    std::uint64_t enter(std::uint64_t association, const TransferCall& call) ZAV_REQUIRES(lock_);
+    /// What others began to send before it and could be the same file.
+    std::vector<std::string> rivals(std::uint64_t association) const ZAV_REQUIRES(lock_);
+    bool isOneOf(const std::string& name, const std::vector<std::string>& others) const;
 
     const TransferRules& rules_;
     mutable embedded::Mutex lock_;
     /// What each association is sending.
-    std::map<std::uint64_t, Transfer> underWay_ ZAV_GUARDED_BY(lock_);
+    Transfers underWay_ ZAV_GUARDED_BY(lock_);
+    std::uint64_t begun_ ZAV_GUARDED_BY(lock_) = 0;
 };
 
 }  // namespace host

@@ -8,9 +8,7 @@
 #include <initializer_list>
 #include <utility>
 
-#include "host/depot/beneath.h"
 #include "host/depot/conversion_probe.h"
-#include "host/depot/obstacle.h"
 #include "host/depot/real_path.h"
 
 namespace host {
@@ -46,19 +44,6 @@ bool climbsOut(const std::string& depot, const std::string& path) {
     return false;
 }
 
-/// Whether a link among the directories that exist leads out.
-bool linksOut(const std::string& depot, const std::string& path) {
-    const FileDescriptor root(::open(depot.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-    if (!root) return false;
-    for (std::string directory = split(path).first; !directory.empty();) {
-        if (openBeneath(root.get(), directory, O_PATH)) return false;
-        if (errno != ENOENT) return errno == EXDEV;
-        directory.resize(directory.find_last_not_of('/') + 1);
-        directory = split(directory).first;
-    }
-    return false;
-}
-
 /// The file system of a path, or of what exists above it; 0 when that cannot be told.
 dev_t deviceOf(std::string path) {
     struct stat found {};
@@ -81,11 +66,16 @@ std::size_t utf16Units(const std::string& utf8) {
     return units;
 }
 
-std::vector<std::string> realPaths(const std::vector<std::string>& paths) {
-    std::vector<std::string> real;
-    for (const std::string& path : paths)
-        real.push_back(realPath(path));
-    return real;
+/// Those of the paths, without links, that lie in the depot or hold it.
+std::vector<std::string> reachable(const std::vector<std::string>& paths,
+                                   const std::string& depot) {
+    std::vector<std::string> found;
+    const std::string top = realPath(depot);
+    for (const std::string& path : paths) {
+        const std::string real = realPath(path);
+        if (isWithin(real, top) || isWithin(top, real)) found.push_back(real);
+    }
+    return found;
 }
 
 const char* const kConversionHint =
@@ -97,7 +87,7 @@ const char* const kConversionHint =
 TransferRules::TransferRules(const Depot& depot, const std::string& home, CodePage codePage,
                              bool guarded)
     : depot_(depot),
-      kept_(realPaths(depot.keptOut())),
+      kept_(reachable(depot.keptOut(), depot.directory())),
       temporaries_(home + "/tmp"),
       codePage_(std::move(codePage)),
       guarded_(guarded),
@@ -115,7 +105,23 @@ std::optional<std::string> TransferRules::arrivalName(const std::string& name) c
 
 std::string TransferRules::pathOf(const std::string& name) const {
     // A name that is no text gets other letters in its place, which lead nowhere else.
-    return depot_.directory() + "/" + arrivalName(name).value_or(name);
+    return depot_.directory() + "/" + textOf(name);
+}
+
+ArrivalDirectory TransferRules::directoryOf(const std::string& name) const {
+    return ArrivalDirectory(depot_.directory(), split(textOf(name)).first);
+}
+
+bool TransferRules::isIn(const std::string& name, const ArrivalDirectory& directory) const {
+    return split(textOf(name)).first == directory.name();
+}
+
+std::string TransferRules::fileOf(const std::string& name) const {
+    return split(textOf(name)).second;
+}
+
+bool TransferRules::mayBeOne(const std::string& name, const std::string& other) const {
+    return fileOf(name) == fileOf(other);
 }
 
 std::string TransferRules::destination(const std::string& name) const {
@@ -131,20 +137,19 @@ bool TransferRules::isConverted(const std::string& name) const {
                        [&path](const char* mark) { return path.find(mark) != std::string::npos; });
 }
 
-bool TransferRules::leadsOut(const std::string& name) const {
-    const std::string path = arrivalName(name).value_or(name);
-    return climbsOut(depot_.directory(), path) || linksOut(depot_.directory(), path);
+bool TransferRules::leadsOut(const std::string& name, const ArrivalDirectory& directory) const {
+    return directory.leadsOut() || climbsOut(depot_.directory(), textOf(name));
 }
 
-std::string TransferRules::whyImpossible(const std::string& name) const {
-    if (leadsOut(name)) return "the name leads out of the depot";
-    const std::string path = pathOf(name);
-    const std::size_t length = utf16Units(codePage_.toUtf8(path));
+std::string TransferRules::whyImpossible(const std::string& name,
+                                         const ArrivalDirectory& directory) const {
+    if (leadsOut(name, directory)) return "the name leads out of the depot";
+    const std::size_t length = utf16Units(codePage_.toUtf8(pathOf(name)));
     if (length > kLongestPath) {
         return "the name is too long: with the depot's path it has " + std::to_string(length) +
                " characters, and " + std::to_string(kLongestPath) + " are the most";
     }
-    return obstacleAt(depot_.directory(), arrivalName(name).value_or(name));
+    return directory.obstacleTo(fileOf(name));
 }
 
 /// A batch that is appended follows a link in the place of the file.

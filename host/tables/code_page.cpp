@@ -3,6 +3,7 @@
 #include <iconv.h>
 #include <langinfo.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <stdexcept>
 #include <utility>
@@ -57,11 +58,13 @@ private:
     iconv_t handle_;
 };
 
-bool isAscii(std::string_view text) {
-    for (const char c : text) {
-        if (static_cast<unsigned char>(c) >= 0x80) return false;
-    }
-    return true;
+/// Control characters are left out: some are the escapes of stateful code pages.
+bool isPlain(char c) {
+    return c >= ' ' && c <= '~';
+}
+
+bool isPlain(std::string_view text) {
+    return std::all_of(text.begin(), text.end(), [](char c) { return isPlain(c); });
 }
 
 /// The position of the first sequence that encodes a number beyond Unicode, or the text's length.
@@ -85,12 +88,23 @@ void appendMended(const Converter& converter, std::string_view text, std::string
     }
 }
 
+/// Whether a conversion leaves plain texts as they are.
+bool keepsPlain(const char* to, const char* from) {
+    std::string plain;
+    for (char c = ' '; isPlain(c); ++c)
+        plain += c;
+    std::string_view rest = plain;
+    std::string out;
+    return Converter(to, from).run(rest, out) == 0 && out == plain;
+}
+
 }  // namespace
 
 CodePage::CodePage(std::string name) : name_(std::move(name)) {
     if (!Converter(kUtf8, name_.c_str()).usable() || !Converter(name_.c_str(), kUtf8).usable()) {
         throw std::runtime_error("the C library has no converter for the code page " + name_);
     }
+    keepsPlain_ = keepsPlain(kUtf8, name_.c_str()) && keepsPlain(name_.c_str(), kUtf8);
 }
 
 CodePage CodePage::ofProcess() {
@@ -98,7 +112,7 @@ CodePage CodePage::ofProcess() {
 }
 
 std::string CodePage::toUtf8(std::string_view text) const {
-    if (name_ == kUtf8 && isAscii(text)) return std::string(text);
+    if (keepsPlain_ && isPlain(text)) return std::string(text);
     const Converter converter(kUtf8, name_.c_str());
     std::string out;
     out.reserve(text.size());
@@ -114,6 +128,7 @@ std::string CodePage::toUtf8(std::string_view text) const {
 }
 
 std::optional<std::string> CodePage::fromUtf8(std::string_view text) const {
+    if (keepsPlain_ && isPlain(text)) return std::string(text);
     if (startBeyondUnicode(text) != text.size()) return std::nullopt;
     const Converter converter(name_.c_str(), kUtf8);
     std::string out;

@@ -24,6 +24,7 @@ public:
 
 private:
     std::string name_;
+    bool keepsPlain_ = false;  ///< printable ASCII is the same bytes in it
 };
 
 }  // namespace host

@@ -40,14 +40,19 @@ private:
     /// The directory that a path's last component is in, for the calls that end in "at", none of
     /// which follows a link there.
     struct Place {
-        FileDescriptor directory;  ///< not open, with errno set, when it cannot be reached
-        std::string name;          ///< the last component
+        int directory;     ///< -1, with errno set, when it cannot be reached
+        std::string name;  ///< the last component
     };
     Place placeOf(const std::string& path);
+    /// A directory below the depot, open. The one that was reached last is remembered until a file
+    /// is opened, because a transfer asks for its file's directory more than once.
+    const FileDescriptor& reach(const char* path, const std::string& directory);
     FileDescriptor openRelative(const char* path, const char* name, int flags, mode_t mode);
 
     const std::string depot_;
     FileDescriptor top_;
+    std::string reachedName_;  ///< what `reached_` is called below the depot
+    FileDescriptor reached_;
 };
 
 }  // namespace ZAV

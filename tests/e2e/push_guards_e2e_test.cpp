@@ -444,6 +444,22 @@ protected:
     }
 };
 
+TEST_F(Names, ThatAreThereSayWhatTheirReplacementSetsFree) {
+    startGuarded();
+    files_.write("depot/sub/a", std::string(8192, 'x'));
+    ASSERT_EQ(::symlink("sub/a", files_.path("depot/link").c_str()), 0);
+    const std::string answer = host_->exchange(
+        "GET /v1/depot/check?path=sub/a&path=sub/none&path=link&path=none/a HTTP/1.1\r\n"
+        "Host: localhost\r\nConnection: close\r\n\r\n");
+    const json document = json::parse(answer.substr(answer.find("\r\n\r\n")));
+    EXPECT_GE(document["replaced_bytes"], 8192);
+    EXPECT_LT(document["replaced_bytes"], 65536);
+    std::vector<bool> replaces;
+    for (const json& file : document["files"])
+        replaces.push_back(file["replaces"]);
+    EXPECT_EQ(replaces, (std::vector<bool>{true, false, true, false}));
+}
+
 TEST_F(Names, AreCheckedByTheRulesOfTheTransfer) {
     files_.write("file", "x");
     files_.makeDir("depot/folder");
@@ -452,9 +468,9 @@ TEST_F(Names, AreCheckedByTheRulesOfTheTransfer) {
     ASSERT_EQ(::symlink("folder", files_.path("depot/link").c_str()), 0);
     startGuarded();
     for (const std::string& name :
-         {std::string("new"), std::string("fresh/a/b"), std::string("plain"), std::string("dangling"),
-          std::string("link/a"), std::string("folder\\b"), std::string(255, 'n'),
-          pathOfLength(1024), std::string("link")}) {
+         {std::string("new"), std::string("fresh/a/b"), std::string("plain"),
+          std::string("dangling"), std::string("link/a"), std::string("folder\\b"),
+          std::string(255, 'n'), pathOfLength(1024), std::string("link")}) {
         const Takes result = takes(name);
         EXPECT_TRUE(result.said) << name;
         EXPECT_TRUE(result.done) << name;

@@ -154,14 +154,6 @@ TEST_F(ADepot, CutsAListingThatIsTooLong) {
     EXPECT_EQ(small.list("many").entries.size(), 3U);
 }
 
-TEST_F(ADepot, KnowsItsRoom) {
-    EXPECT_GT(depot_.freeBytes(), 0U);
-    EXPECT_GT(depot_.bytesAt("ux/7.1/a"), 0U);
-    EXPECT_EQ(depot_.bytesAt("none"), 0U);
-    EXPECT_EQ(depot_.bytesAt("ux"), 0U);
-    EXPECT_EQ(depot_.bytesAt("escape"), 0U);
-}
-
 TEST(ADepotThatIsMissing, SaysSo) {
     const Depot depot("/nowhere/depot");
     try {

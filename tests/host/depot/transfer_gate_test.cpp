@@ -94,17 +94,34 @@ TEST_F(AGate, TakesATransferAsOverWhenABatchFails) {
 
 TEST_F(AGate, SaysWhatStandsAgainstAPush) {
     send(1, "sub/a", true, false);
-    EXPECT_EQ(gate_->objectionTo("sub/a")->guard, "depot-transfers");
-    EXPECT_FALSE(gate_->objectionTo("sub/b"));
-    EXPECT_TRUE(gate_->isReceiving("sub/a"));
-    EXPECT_TRUE(gate_->isReceiving("sub"));
-    EXPECT_FALSE(gate_->isReceiving("su"));
+    const auto at = [this](const char* name) { return rules_->destination(name); };
+    EXPECT_EQ(gate_->objectionTo("sub/a", at("sub/a"))->guard, "depot-transfers");
+    EXPECT_FALSE(gate_->objectionTo("sub/b", at("sub/b")));
+    EXPECT_TRUE(gate_->isReceiving(at("sub/a")));
+    EXPECT_TRUE(gate_->isReceiving(at("sub")));
+    EXPECT_FALSE(gate_->isReceiving(at("su")));
 }
 
 TEST_F(AGate, RefusesWhatTheRulesForbid) {
     EXPECT_EQ(send(1, "bad\xFFname", true, true), 6);
+}
+
+TEST_F(AGate, RefusesTheHostsOwnFilesInADepotThatHoldsThem) {
+    const host::Depot home(scratch_.path("home"), {scratch_.path("home/zavhost")});
+    const host::TransferRules rules(home, scratch_.path("home"), host::CodePage("UTF-8"), true);
+    gate_.emplace(rules);
     ASSERT_EQ(::symlink("../zavhost", scratch_.path("home/depot/link").c_str()), 0);
-    EXPECT_EQ(send(1, "link/a", true, true), 6);
+    for (const char* name : {"zavhost/a", "depot/link/a", "depot/../zavhost/new/a"})
+        EXPECT_EQ(send(1, name, true, true), 6) << name;
+    EXPECT_EQ(send(1, "depot/a", true, true), 0);
+    gate_.emplace(*rules_);
+}
+
+TEST_F(AGate, LeavesTwoFilesOfOneNameInTwoDirectoriesAlone) {
+    EXPECT_EQ(send(1, "one/a", true, false), 0);
+    EXPECT_EQ(send(2, "two/a", true, false), 0);
+    EXPECT_EQ(send(1, "one/a", false, true), 0);
+    EXPECT_EQ(send(2, "two/a", false, true), 0);
 }
 
 TEST_F(AGate, LeavesWhatItDoesNotUnderstandToTheStub) {
@@ -138,12 +155,15 @@ protected:
 TEST_F(AnUnguardedGate, LetsTransfersMix) {
     EXPECT_EQ(send(1, "a", true, false), 0);
     EXPECT_EQ(send(2, "a", true, false), 0);
-    EXPECT_FALSE(gate_->objectionTo("a"));
+    EXPECT_FALSE(gate_->objectionTo("a", rules_->destination("a")));
 }
 
 TEST_F(AnUnguardedGate, StillProtectsTheHostsOwnFiles) {
-    ASSERT_EQ(::symlink("../zavhost", scratch_.path("home/depot/link").c_str()), 0);
-    EXPECT_EQ(send(1, "link/a", true, true), 6);
+    const host::Depot home(scratch_.path("home"), {scratch_.path("home/zavhost")});
+    const host::TransferRules rules(home, scratch_.path("home"), host::CodePage("UTF-8"), false);
+    gate_.emplace(rules);
+    EXPECT_EQ(send(1, "zavhost/a", true, true), 6);
+    gate_.emplace(*rules_);
 }
 
 }  // namespace

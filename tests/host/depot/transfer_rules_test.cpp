@@ -79,13 +79,27 @@ TEST_F(Rules, KnowWhichNamesLeadOut) {
     ASSERT_EQ(::symlink("../tmp", scratch_.path("home/depot/out").c_str()), 0);
     ASSERT_EQ(::symlink("/tmp", scratch_.path("home/depot/absolute").c_str()), 0);
     const TransferRules known = rules();
+    const auto leadsOut = [&](const char* name) {
+        return known.leadsOut(name, known.directoryOf(name));
+    };
     for (const char* name : {"out/a", "out/new/sub/a", "absolute/a"})
-        EXPECT_TRUE(known.leadsOut(name)) << name;
-    EXPECT_FALSE(known.leadsOut("out")) << "the link itself is replaced";
+        EXPECT_TRUE(leadsOut(name)) << name;
+    EXPECT_FALSE(leadsOut("out")) << "the link itself is replaced";
     for (const char* name : {"..", "../a", "a/../../b", "..\\a", "/../a", "link/../a"})
-        EXPECT_TRUE(known.leadsOut(name)) << name;
+        EXPECT_TRUE(leadsOut(name)) << name;
     for (const char* name : {"a", "sub/../a", "a/..b", "./a", "link/a"})
-        EXPECT_FALSE(known.leadsOut(name)) << name;
+        EXPECT_FALSE(leadsOut(name)) << name;
+}
+
+TEST_F(Rules, LookADirectoryUpForAllOfItsFiles) {
+    const TransferRules known = rules();
+    const host::ArrivalDirectory sub = known.directoryOf("\\sub\\a");
+    EXPECT_TRUE(known.isIn("sub/b", sub));
+    for (const char* name : {"b", "sub/deeper/b", "subs/b"})
+        EXPECT_FALSE(known.isIn(name, sub)) << name;
+    EXPECT_EQ(known.fileOf("\\sub\\a"), "a");
+    EXPECT_TRUE(known.mayBeOne("sub/a", "\\link\\a"));
+    EXPECT_FALSE(known.mayBeOne("sub/a", "sub/b"));
 }
 
 TEST_F(Rules, LetNoTransferReachTheHostsOwnFiles) {

@@ -18,6 +18,16 @@ TEST(CodePage, KeepsAsciiInEveryCodePage) {
     }
 }
 
+TEST(CodePage, ConvertsAsciiWhereItIsOtherBytes) {
+    const CodePage mainframe("IBM037");
+    EXPECT_EQ(mainframe.fromUtf8("ux"), "\xA4\xA7");
+    EXPECT_EQ(mainframe.toUtf8("\xA4\xA7"), "ux");
+    EXPECT_EQ(mainframe.toUtf8("a"), "/");
+    const CodePage stateful("ISO-2022-JP");
+    EXPECT_EQ(stateful.toUtf8("\x1B$BF|\x1B(B"), "\xE6\x97\xA5") << "all bytes are ASCII's";
+    EXPECT_EQ(stateful.fromUtf8("\xE6\x97\xA5"), "\x1B$BF|\x1B(B");
+}
+
 TEST(CodePage, ConvertsBothWays) {
     EXPECT_EQ(CodePage("ISO-8859-1").toUtf8("Gr\xF6\xDF\x65"), "Gr\xC3\xB6\xC3\x9F\x65");
     EXPECT_EQ(CodePage("ISO-8859-1").fromUtf8("Gr\xC3\xB6\xC3\x9F\x65"), "Gr\xF6\xDF\x65");

@@ -1,4 +1,4 @@
-#include "host/depot/obstacle.h"
+#include "host/depot/arrival_directory.h"
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -9,6 +9,12 @@
 #include "support/scratch_dir.h"
 
 namespace {
+
+/// What stands in the way of a file.
+std::string obstacleAt(const std::string& depot, const std::string& path) {
+    const std::size_t file = path.rfind('/') + 1;  // npos + 1 is 0
+    return host::ArrivalDirectory(depot, path.substr(0, file)).obstacleTo(path.substr(file));
+}
 
 class Obstacle : public testing::Test {
 protected:
@@ -23,7 +29,7 @@ protected:
         EXPECT_EQ(::symlink(to, scratch_.path(from).c_str()), 0);
     }
     std::string at(const std::string& path) const {
-        return host::obstacleAt(scratch_.path("depot"), path);
+        return obstacleAt(scratch_.path("depot"), path);
     }
     ScratchDir scratch_;
 };
@@ -59,8 +65,8 @@ TEST_F(Obstacle, IsAPartThatNoFileSystemTakes) {
 TEST_F(Obstacle, IsADirectoryThatTheUserMayNotWriteTo) {
     if (::geteuid() == 0) {
         ASSERT_EQ(::seteuid(65534), 0);
-        EXPECT_EQ(host::obstacleAt("/usr", "new"), "the host's user may not write to the depot");
-        EXPECT_EQ(host::obstacleAt("/usr", "lib/new/a"), "the host's user may not write to lib");
+        EXPECT_EQ(obstacleAt("/usr", "new"), "the host's user may not write to the depot");
+        EXPECT_EQ(obstacleAt("/usr", "lib/new/a"), "the host's user may not write to lib");
         ASSERT_EQ(::seteuid(0), 0);
         return;
     }
@@ -70,7 +76,25 @@ TEST_F(Obstacle, IsADirectoryThatTheUserMayNotWriteTo) {
 }
 
 TEST_F(Obstacle, IsNotLookedForInADepotThatCannotBeOpened) {
-    EXPECT_EQ(host::obstacleAt(scratch_.path("none"), "a"), "");
+    EXPECT_EQ(obstacleAt(scratch_.path("none"), "a"), "");
+}
+
+TEST_F(Obstacle, MayBeAFileThatIsReplaced) {
+    const host::ArrivalDirectory directory(scratch_.path("depot"), "");
+    EXPECT_EQ(directory.find("plain")->st_size, 1);
+    EXPECT_TRUE(S_ISLNK(directory.find("dangling")->st_mode)) << "not what it leads to";
+    EXPECT_FALSE(directory.find("none"));
+    EXPECT_FALSE(host::ArrivalDirectory(scratch_.path("depot"), "none/").find("plain"));
+}
+
+TEST_F(Obstacle, LeadsOutByALinkOnTheWay) {
+    link("..", "depot/folder/out");
+    link("../..", "depot/folder/further");
+    EXPECT_FALSE(host::ArrivalDirectory(scratch_.path("depot"), "folder/out/").leadsOut());
+    EXPECT_TRUE(host::ArrivalDirectory(scratch_.path("depot"), "folder/further/").leadsOut());
+    EXPECT_TRUE(host::ArrivalDirectory(scratch_.path("depot"), "folder/further/new/").leadsOut());
+    EXPECT_EQ(host::ArrivalDirectory(scratch_.path("depot"), "folder/out/").realPath(),
+              scratch_.path("depot"));
 }
 
 }  // namespace
