@@ -83,9 +83,11 @@ Task endOfRestartInstall(Services& services, Task task) {
         case InstallResult::Content::Missing:
             break;
     }
+    const bool bootedAnew = services.journal.recovered().bootedAnew;
     return ended(std::move(task), TaskState::Interrupted,
-                 "the host ended while this install was in hand; nothing of it runs any more, and "
-                 "it left no result");
+                 std::string(bootedAnew ? "the machine was started anew" : "the host ended") +
+                     " while this install was in hand; nothing of it runs any more, and it left no "
+                     "result");
 }
 
 }  // namespace host

@@ -35,6 +35,25 @@ TEST_F(RestartInstall, WithoutAResultWasInterrupted) {
     EXPECT_TRUE(task.ended.has_value());
 }
 
+TEST_F(RestartInstall, IsInterruptedByANewStartOfTheMachineToo) {
+    host::Journal::Settings kept;
+    kept.directory = scratch.path("state");
+    kept.boot = "one";
+    {
+        host::Journal before(kept);
+        before.enter(begun);
+        begun.run = before.run();
+        before.save(begun);
+    }
+    kept.boot = "two";
+    host::Services later(std::vector<oxa::Table>{}, host::CodePage("UTF-8"), scratch.path("home"),
+                         host::RowQueue::Limits{}, true, host::Places{scratch.path(), ""}, kept);
+    EXPECT_EQ(later.journal.recovered().begun, begun.id);
+    const Task task = host::endOfRestartInstall(later, begun);
+    EXPECT_EQ(task.state, TaskState::Interrupted);
+    EXPECT_NE(task.reason.find("the machine was started anew"), std::string::npos) << task.reason;
+}
+
 TEST_F(RestartInstall, WithAResultThatIsNoNumberHasFailed) {
     for (const char* text : {"", "killed\n"}) {
         scratch.write("rc.txt", text);
