@@ -178,7 +178,7 @@ TEST_F(Push, AFileThatCannotBeWrittenIsStatusFive) {
 
 TEST_F(Push, ADirectoryThatCannotBeMadeIsStatusSix) {
     files_.write("depot/file", "x");
-    expectRefused("file/below/x", 6, "the host could not make the file's directory");
+    expectRefused("file/below/x", 6, "file/below is no directory");
 }
 
 TEST_F(Push, NothingLeavesTheDepot) {

@@ -95,7 +95,12 @@ PushCheck checkPush(const HostAddress& host, std::vector<PushedFile>& files) {
     check.guarded = flagOf(answer, "guarded", false);
     for (std::size_t i = 0; i < files.size(); ++i)
         store(answer["files"][i], files[i]);
-    if (!check.guarded) return check;
+    if (!check.guarded) {
+        // Nothing is held back, so that what the transfer itself says counts.
+        for (PushedFile& file : files)
+            file.problem = file.guard = file.hint = std::string();
+        return check;
+    }
     refuseForSpace(answer, bytesOf(files));
     return checkGuarded(files, std::move(check));
 }
