@@ -75,21 +75,33 @@ protected:
             if (*answer) names.push_back(name);
         }
     }
-    /// Loads the host in both ways and kills it after this time.
-    void loadAndKill(int round, std::chrono::microseconds delay) {
+    /// Loads the host in both ways and does this to it after a time.
+    template <typename Disturb>
+    void loadAndDisturb(int round, std::chrono::microseconds delay, Disturb disturb) {
         std::vector<std::string> inTurn;
         std::vector<std::string> onTheTable;
         const int first = round * kTasksPerRound;
         std::thread one([&] { load('j', first, inTurn); });
         std::thread other([&] { load('q', first, onTheTable); });
         std::this_thread::sleep_for(delay);
-        host->program().signal(SIGKILL);
+        disturb();
         one.join();
         other.join();
-        EXPECT_EQ(host->program().wait().status, 128 + SIGKILL);
         accepted.insert(accepted.end(), inTurn.begin(), inTurn.end());
         accepted.insert(accepted.end(), onTheTable.begin(), onTheTable.end());
+    }
+    void loadAndKill(int round, std::chrono::microseconds delay) {
+        loadAndDisturb(round, delay, [this] { host->program().signal(SIGKILL); });
+        EXPECT_EQ(host->program().wait().status, 128 + SIGKILL);
         host->start();
+    }
+    /// Its commands go on while it is stopped.
+    void loadAndStop(int round, std::chrono::microseconds delay, std::chrono::microseconds pause) {
+        loadAndDisturb(round, delay, [this, pause] {
+            host->program().signal(SIGSTOP);
+            std::this_thread::sleep_for(pause);
+            host->program().signal(SIGCONT);
+        });
     }
 
     json get(const std::string& path) const {

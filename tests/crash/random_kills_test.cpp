@@ -31,4 +31,20 @@ TEST_F(RandomKills, LoseNothingAndRepeatNothing) {
     EXPECT_THAT(faults(), testing::IsEmpty());
 }
 
+TEST_F(RandomKills, NoStopMattersEither) {
+    const unsigned stops = variableOr("ZAV_CRASH_KILLS", 3);
+    const unsigned seed = variableOr("ZAV_CRASH_SEED", std::random_device()());
+    std::cout << stops << " stops with the seed " << seed << std::endl;
+    std::mt19937 random(seed);
+    std::uniform_int_distribution<int> delays(0, 300'000);
+    for (unsigned round = 0; round < stops; ++round) {
+        loadAndStop(static_cast<int>(round), std::chrono::microseconds(delays(random)),
+                    std::chrono::microseconds(delays(random)));
+    }
+    ASSERT_TRUE(eventually([this] { return isIdle(); }, std::chrono::minutes(1 + stops)));
+    EXPECT_THAT(faults(), testing::IsEmpty());
+    EXPECT_EQ(accepted.size(), 2U * stops * kTasksPerRound);
+    EXPECT_EQ(get("/v1/tasks?state=interrupted")["tasks"].size(), 0U);
+}
+
 }  // namespace
