@@ -1,8 +1,8 @@
 #!/bin/sh
 # Shows the main job from a clean clone: builds the programs, makes a home, starts the host, starts
-# and stops an agent, deploys a real agent that nobody here wrote, configures and removes it, and
-# imports a metafile into the universal agent. Asks nothing, leaves no process behind, and ends with
-# status 0 when all of it worked.
+# and stops an agent, deploys a real agent that nobody here wrote, configures and removes it, imports
+# a metafile into the universal agent, and shows that a killed host forgets nothing. Asks nothing,
+# leaves no process behind, and ends with status 0 when all of it worked.
 set -eu
 cd "$(dirname "$0")/.."
 
@@ -42,19 +42,25 @@ ZAV_SOCKET=$scratch/host.sock
 QVSDEPLOY_AGENTDEPOT=$home/depot
 KBB_RAS1_LOG=$scratch/trace.log
 export ZAV_SOCKET QVSDEPLOY_AGENTDEPOT
-KBB_RAS1='ERROR (UNIT:zavtasks DETAIL) (UNIT:zavtqelm DETAIL)' KBB_RAS1_LOG=$KBB_RAS1_LOG \
-    zavhost --home "$home" --origin-node "$(hostname):DEMO" >"$scratch/host.out" 2>&1 &
-host=$!
-tries=0
-until grep -q '^ready:' "$scratch/host.out" 2>/dev/null; do
-    tries=$((tries + 1))
-    if [ "$tries" -gt 100 ] || ! kill -0 "$host" 2>/dev/null; then
-        cat "$scratch/host.out"
-        exit 1
-    fi
-    sleep 0.1
-done
-cat "$scratch/host.out"
+
+# Starts the host and waits until it is ready.
+start_host() {
+    KBB_RAS1='ERROR (UNIT:zavtasks DETAIL) (UNIT:zavtqelm DETAIL)' KBB_RAS1_LOG=$KBB_RAS1_LOG \
+        zavhost --home "$home" --origin-node "$(hostname):DEMO" >"$scratch/host.out" 2>&1 &
+    host=$!
+    tries=0
+    until grep -q '^ready:' "$scratch/host.out" 2>/dev/null; do
+        tries=$((tries + 1))
+        if [ "$tries" -gt 100 ] || ! kill -0 "$host" 2>/dev/null; then
+            cat "$scratch/host.out"
+            exit 1
+        fi
+        sleep 0.1
+    done
+    cat "$scratch/host.out"
+}
+
+start_host
 run zavctl status
 
 say "The tables it serves"
@@ -167,6 +173,36 @@ run zavctl ua-config --metafile disks.mdl --scripts disks.sh --restart
 echo "What it collects:"
 first_lines "$home/data/um/DISKS.csv"
 run zavctl stop um
+
+# ---- A host that is killed -----------------------------------------------------------------------
+
+say "Queue three installs, and kill the host with -9 in the first one"
+# shellcheck disable=SC2016
+printf '#!/bin/sh\necho "installing $1"\nsleep 2\necho "installed $1"\n' >"$scratch/install.sh"
+for number in 1 2 3; do
+    run zavctl push "$scratch/install.sh" "w$number/1.0/install.sh"
+done
+for number in 1 2 3; do
+    run zavctl install "w$number" 1.0 --no-wait --transid "wave-$number" -- \
+        /bin/sh '|DEPLOYDIR|/install.sh' "w$number"
+done
+tries=0
+until zavctl tasks --state running | grep -q 'wave-1$'; do
+    tries=$((tries + 1))
+    [ "$tries" -le 50 ]
+    sleep 0.1
+done
+run zavctl ps
+kill -9 "$host"
+wait "$host" 2>/dev/null || true
+
+say "Start it again: each install has its outcome"
+start_host
+# The first one may have run in part, so it is not run again.
+run zavctl task wait wave-1 || true
+run zavctl task wait wave-2
+run zavctl task wait wave-3
+run zavctl tasks --limit 3
 
 say "End the host"
 kill "$host"

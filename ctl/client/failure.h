@@ -38,4 +38,10 @@ private:
     std::string guard_;
 };
 
+/// The connection ended before the answer was whole: the host may have done what it was asked.
+class BrokenConnection : public Failure {
+public:
+    explicit BrokenConnection(const std::string& text) : Failure(kNoHost, text) {}
+};
+
 }  // namespace ctl

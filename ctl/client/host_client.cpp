@@ -51,12 +51,29 @@ Response exchange(const std::string& path, const Request& request, Deadline dead
     return parser.release();
 }
 
-/// The document in an answer that is no refusal.
-json documentOf(const Response& response) {
-    if (response.result_int() != 200) throw refusal(response.result_int(), response.body());
-    ParsedJson answer = parseBounded(response.body());
-    if (answer.fault != nullptr) throw senseless(answer.fault);
-    return std::move(answer.document);
+/// A number of seconds from now; a date is as good as nothing.
+std::optional<std::chrono::seconds> retryAfterOf(const Response& response) {
+    constexpr std::size_t kMostDigits = 6;
+    const std::string text(response[http::field::retry_after]);
+    const bool isNumber = !text.empty() && text.size() <= kMostDigits &&
+                          text.find_first_not_of("0123456789") == std::string::npos;
+    if (!isNumber) return std::nullopt;
+    return std::chrono::seconds(std::stol(text));
+}
+
+Answer answerOf(Response response) {
+    return {response.result_int(), std::move(response.body()), retryAfterOf(response)};
+}
+
+/// A request with a document. Arguments come from a terminal or a file and may be in any encoding.
+Request makePost(const std::string& target, const json& document) {
+    Request request = makeRequest(http::verb::post, target);
+    if (!document.is_null()) {
+        request.set(http::field::content_type, "application/json");
+        request.body() = document.dump(-1, ' ', false, json::error_handler_t::replace);
+    }
+    request.prepare_payload();
+    return request;
 }
 
 json queryDocument(const TableQuery& query) {
@@ -78,29 +95,39 @@ json listIn(json& answer, const char* name) {
 
 }  // namespace
 
+json Answer::document() const {
+    if (!isSuccess()) throw refusal(status, body);
+    ParsedJson answer = parseBounded(body);
+    if (answer.fault != nullptr) throw senseless(answer.fault);
+    return std::move(answer.document);
+}
+
+Answer HostClient::ask(const std::string& target, Deadline deadline, const Ticker& tick) const {
+    return answerOf(exchange(socketPath_, makeRequest(http::verb::get, target), deadline, tick));
+}
+
+Answer HostClient::post(const std::string& target, const json& document, Deadline deadline,
+                        const Ticker& tick) const {
+    return answerOf(exchange(socketPath_, makePost(target, document), deadline, tick));
+}
+
 json HostClient::get(const std::string& target, Deadline deadline) const {
-    return documentOf(exchange(socketPath_, makeRequest(http::verb::get, target), deadline, {}));
+    return ask(target, deadline).document();
 }
 
 json HostClient::getIfThere(const std::string& target, Deadline deadline) const {
-    const Response response =
-        exchange(socketPath_, makeRequest(http::verb::get, target), deadline, {});
-    return response.result() == http::status::not_found ? json() : documentOf(response);
+    const Answer answer = ask(target, deadline);
+    return answer.status == 404 ? json() : answer.document();
 }
 
 json HostClient::remove(const std::string& target, Deadline deadline) const {
-    return documentOf(
-        exchange(socketPath_, makeRequest(http::verb::delete_, target), deadline, {}));
+    const Request request = makeRequest(http::verb::delete_, target);
+    return answerOf(exchange(socketPath_, request, deadline, {})).document();
 }
 
 QueryAnswer HostClient::query(const TableQuery& query, Deadline deadline,
                               const Ticker& tick) const {
-    Request request = makeRequest(http::verb::post, "/v1/query");
-    request.set(http::field::content_type, "application/json");
-    // Arguments come from a terminal or a file and may be in any encoding.
-    request.body() = queryDocument(query).dump(-1, ' ', false, json::error_handler_t::replace);
-    request.prepare_payload();
-    json answer = documentOf(exchange(socketPath_, request, deadline, tick));
+    json answer = post("/v1/query", queryDocument(query), deadline, tick).document();
     const auto rows = answer.find("rows");
     if (rows == answer.end() || !rows->is_array()) throw senseless("has no rows");
     const bool areRows =

@@ -61,6 +61,7 @@ void changeNotes(Change change) {
 
 InterruptNote::InterruptNote(std::string err, std::string out) {
     changeNotes([&] {
+        place_ = notes.size();
         notes.push_back({std::move(err), std::move(out)});
         if (notes.size() > 1) return;
         struct sigaction action {};
@@ -70,6 +71,10 @@ InterruptNote::InterruptNote(std::string err, std::string out) {
         // wants it so.
         if (before.sa_handler == SIG_IGN) ::sigaction(SIGINT, &before, nullptr);
     });
+}
+
+void InterruptNote::change(std::string err, std::string out) {
+    changeNotes([&] { notes[place_] = {std::move(err), std::move(out)}; });
 }
 
 InterruptNote::~InterruptNote() {

@@ -1,6 +1,7 @@
 /// What is said when the user ends the program with Ctrl-C.
 #pragma once
 
+#include <cstddef>
 #include <string>
 
 namespace ctl {
@@ -13,8 +14,13 @@ public:
     /// `err` is for standard error, `out` for standard output; both are whole lines.
     explicit InterruptNote(std::string err, std::string out = {});
     ~InterruptNote();
+    /// Says other lines from now on.
+    void change(std::string err, std::string out);
     InterruptNote(const InterruptNote&) = delete;
     InterruptNote& operator=(const InterruptNote&) = delete;
+
+private:
+    std::size_t place_ = 0;  ///< among all notes
 };
 
 }  // namespace ctl

@@ -15,8 +15,34 @@ using nlohmann::json;
 namespace ctl {
 namespace {
 
+/// Why a task is over whose end no row tells, where the host does not say.
+const char* usualReason(const std::string& state) {
+    if (state == "interrupted")
+        return "the host ended in the middle of it: it may have run in part";
+    if (state == "expired") return "its turn came too late";
+    if (state == "refused") return "the host did not hand it over";
+    return "";
+}
+
+Page statePage(const std::string& title, const TaskResult& result) {
+    const bool isDone = textOf(result.record, "state") == "done";
+    Page page{stateLine(title, result.record, result.elapsed),
+              {},
+              isDone ? kSuccess : kHostReportedFailure};
+    if (!isDone && !commandsOf(result.record).empty()) {
+        page.out += failureReport(commandsOf(result.record));
+    }
+    addDoubts(page, title, result);
+    return page;
+}
+
+/// The row that says how the command itself ended.
+const json& lastRow(const TaskResult& result) {
+    return result.completion.is_null() ? result.events.back() : result.completion;
+}
+
 Page outcomePage(const std::string& title, const TaskResult& result) {
-    const json& row = result.events.back();
+    const json& row = lastRow(result);
     const std::string fault = returnCodeOf(row) == 0 ? faultOf(result.record) : std::string();
     Page page = showOutcome(title, row, result.elapsed, Format::Text);
     if (!fault.empty()) {
@@ -38,20 +64,23 @@ Page textPage(const std::string& title, const TaskResult& result) {
             return {};
         case TaskResult::End::Outcome:
             return outcomePage(title, result);
+        case TaskResult::End::Over:
+            return statePage(title, result);
         case TaskResult::End::HostGone:
             return {{}, complaint("the host went away before the outcome came"), kNoHost};
         case TaskResult::End::TimedOut:
             break;
     }
+    const std::string transid = textOf(result.record, "transid");
     const Failure late(kNoOutcome, "no outcome within the time-out",
-                       laterText(textOf(result.reply, "TRANSID")));
+                       laterText(transid.empty() ? textOf(result.reply, "TRANSID") : transid));
     return failurePage(late, Format::Text);
 }
 
 }  // namespace
 
 std::string replyLine(const std::string& title, const json& reply) {
-    if (returnCodeOf(reply) == 0) return printable(title) + ": accepted\n";
+    if (reply.is_null() || returnCodeOf(reply) == 0) return printable(title) + ": accepted\n";
     return printable(title) + ": " + toned("refused", Tone::Bad, standardOutput()) + "; " +
            describeRow(reply) + "\n";
 }
@@ -65,6 +94,22 @@ std::string outcomeLine(const std::string& title, const json& row,
     // A restart whose stop failed and whose start succeeded is a success with a message.
     if (!ok || !textOf(row, "RETMSGID").empty()) line += "; " + describeRow(row);
     return line + "\n";
+}
+
+std::string stateLine(const std::string& title, const json& record,
+                      std::chrono::milliseconds elapsed) {
+    const std::string state = textOf(record, "state");
+    const Tone tone = state == "done" ? Tone::Good : Tone::Bad;
+    std::string line = printable(title) + ": " + toned(printable(state), tone, standardOutput()) +
+                       " after " + elapsedText(elapsed);
+    std::string reason = textOf(record, "reason");
+    if (reason.empty()) reason = usualReason(state);
+    if (!reason.empty()) line += "; " + printable(reason);
+    line += "\n";
+    if (const std::string hint = textOf(record, "hint"); !hint.empty()) {
+        line += "  " + printable(hint) + "\n";
+    }
+    return line;
 }
 
 ExitStatus statusOf(const json& row) {
@@ -87,6 +132,7 @@ json taskDocument(const TaskResult& result) {
             task.erase(elsewhere);
         document["task"] = std::move(task);
     }
+    if (!result.completion.is_null()) document["completion"] = result.completion;
     if (!result.doubt.empty()) document["doubt"] = result.doubt;
     return document;
 }

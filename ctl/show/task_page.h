@@ -5,12 +5,13 @@
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
-#include "ctl/client/task.h"
+#include "ctl/client/tasks/task_result.h"
 #include "ctl/show/page.h"
 
 namespace ctl {
 
-/// "start ux: accepted", or how the host refused it. `title` names the command here and below.
+/// "start ux: accepted", or how the host refused it. A null reply, which is still to come, is no
+/// refusal. `title` names the command here and below.
 std::string replyLine(const std::string& title, const nlohmann::json& reply);
 
 /// "start ux: done after 3 s", or how it failed.
@@ -27,6 +28,10 @@ Page showOutcome(const std::string& title, const nlohmann::json& row,
 /// {"reply": {...}, "events": [...]}, with "task" and "details" when the host keeps a record, and
 /// with "doubt" when a look afterwards belies the success.
 nlohmann::json taskDocument(const TaskResult& result);
+
+/// "start ux: cancelled after 3 s", for a task that is over and whose end no row tells.
+std::string stateLine(const std::string& title, const nlohmann::json& record,
+                      std::chrono::milliseconds elapsed);
 
 /// How to look at a task later: "zavctl task show T tells how it ended".
 std::string laterText(const std::string& transid);

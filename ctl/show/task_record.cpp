@@ -47,9 +47,10 @@ std::string processLine(const json& command, WallTime now) {
 }  // namespace
 
 std::string workText(const json& record, WallTime now) {
-    const std::string started = textOf(record, "started");
+    std::string since = textOf(record, "started");
+    if (since.empty()) since = textOf(record, "accepted");
     std::string text = headOf(record) + ", " + printable(textOf(record, "state"));
-    if (!started.empty()) text += " since " + timeText(started, now);
+    if (!since.empty()) text += " since " + timeText(since, now);
     text += "\n";
     for (const json& command : commandsOf(record)) {
         if (textOf(command, "ended").empty()) text += processLine(command, now);
@@ -65,6 +66,10 @@ std::string recordText(const json& record, WallTime now) {
     text += timeLine("accepted ", textOf(record, "accepted"), now) +
             timeLine("started  ", textOf(record, "started"), now) +
             timeLine("ended    ", textOf(record, "ended"), now);
+    for (const char* const words : {"reason", "hint"}) {
+        const std::string value = textOf(record, words);
+        if (!value.empty()) text += "  " + printable(value) + "\n";
+    }
     const json result = resultOf(record);
     if (result.is_object() && returnCodeOf(result) != 0) text += "  " + describeRow(result) + "\n";
     for (const json& command : commandsOf(record))

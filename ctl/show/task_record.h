@@ -8,7 +8,7 @@
 
 namespace ctl {
 
-/// A task that is at work: what it is, since when, and a line for each of its processes.
+/// A task that is at work or waits: what it is, since when, and a line for each of its processes.
 std::string workText(const nlohmann::json& record, WallTime now);
 
 /// All about a task: what it is, its times, how it ended and the commands that it ran.

@@ -6,7 +6,7 @@
 #include "ctl/client/failure.h"
 #include "ctl/client/guarded.h"
 #include "ctl/client/row.h"
-#include "ctl/client/task_request.h"
+#include "ctl/client/tasks/task_request.h"
 #include "ctl/show/message_catalogue.h"
 #include "ctl/show/table.h"
 #include "ctl/show/warnings.h"

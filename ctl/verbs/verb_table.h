@@ -28,7 +28,11 @@ extern const Verb kEventsVerb;
 extern const Verb kStatusVerb;
 extern const Verb kDoctorVerb;
 extern const Verb kPsVerb;
+extern const Verb kTasksVerb;
 extern const Verb kTaskShowVerb;
+extern const Verb kTaskWaitVerb;
+extern const Verb kTaskOutputVerb;
+extern const Verb kTaskCancelVerb;
 extern const Verb kVersionVerb;
 extern const Verb kHelpVerb;
 
@@ -55,7 +59,11 @@ constexpr const Verb* kVerbs[] = {
     &kStatusVerb,           //
     &kDoctorVerb,           //
     &kPsVerb,               //
+    &kTasksVerb,            //
     &kTaskShowVerb,         //
+    &kTaskWaitVerb,         //
+    &kTaskOutputVerb,       //
+    &kTaskCancelVerb,       //
     &kVersionVerb,          //
     &kHelpVerb,
 };
@@ -63,7 +71,7 @@ constexpr const Verb* kVerbs[] = {
 constexpr VerbGroup kVerbGroups[] = {
     {"config", "Read and change an agent's configuration"},
     {"depot", "Look into the depot and remove files from it"},
-    {"task", "Look at what the host was asked for"},
+    {"task", "Look at a task, wait for it or cancel it"},
 };
 
 /// The verb of a full name such as "config get"; null if there is none.

@@ -39,10 +39,10 @@ protected:
                      guards);
     }
     /// A query that asks for a start.
-    static json startOnTheTable(const std::string& product) {
+    static json startOnTheTable(const std::string& product, const std::string& transid = "t") {
         json where = json::array();
         for (const auto& [column, value] : std::map<std::string, std::string>{
-                 {"COMMAND", "START"}, {"PRODUCT", product}, {"TRANSID", "t"}}) {
+                 {"COMMAND", "START"}, {"PRODUCT", product}, {"TRANSID", transid}}) {
             where.push_back({{"column", column}, {"op", "="}, {"value", value}});
         }
         return {{"table", "KAGREQT"}, {"where", where}};
@@ -104,11 +104,8 @@ TEST_F(JournalOnDisk, AKilledHostRunsWhatWaitedInItsOldOrderExactlyOnce) {
 
 TEST_F(JournalOnDisk, RequestsOnTheTableAreNotForgottenEither) {
     start();
-    for (const char* product : {"ux", "px"}) {
-        const ProgramResult result =
-            host->zavctl({"start", product, "--no-wait", "--transid", product});
-        ASSERT_EQ(result.status, 0) << result.err;
-    }
+    for (const char* product : {"ux", "px"})
+        post("/v1/query", startOnTheTable(product, product), 200);
     ASSERT_TRUE(awaitNote("begin ux"));
     killAndStart();
     openGate();

@@ -2,7 +2,7 @@
 // outcome fetched afterwards.
 // ctest-label: threaded
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 #include <signal.h>
 #include <unistd.h>
 
@@ -87,24 +87,19 @@ TEST_F(RestartInstallTest, TheRealOutcomeIsFetchedFromTheHostThatCameBack) {
 TEST_F(RestartInstallTest, CompleteFollowsAFailingInstallToItsEndByItself) {
     const auto host = startHost();
     const std::string command = installer("installer", *host, 65);
-    const auto watching = host->startZavctl({"events", "--transid", "it", "--count", "1"});
-    ASSERT_TRUE(eventually([&host] {
-        return json::parse(host->zavctl({"--json", "status"}).out)["subscriptions"] == 1;
-    }));
-    const auto waiting = host->startZavctl({"install", "ux", "010000000", "--restart", "--complete",
-                                            "--transid", "it", "--", "/bin/sh", command});
-    EXPECT_EQ(watching->wait(std::chrono::seconds(40)).status, 0);
-    letItRun();  // both have been told of the outcome by the same turn of the host's loop
+    Program waiting({zavctlPath(), "--socket", host->socket(), "install", "ux", "010000000",
+                     "--restart", "--complete", "--transid", "it", "--", "/bin/sh", command});
+    ASSERT_TRUE(waiting.awaitOutput("install ux (it): begun\n", std::chrono::seconds(40)));
+    letItRun();
     EXPECT_EQ(host->program().wait(std::chrono::seconds(40)).status, 128 + SIGKILL);
     host->start();
-    const ProgramResult result = waiting->wait(std::chrono::seconds(60));
+    const ProgramResult result = waiting.wait(std::chrono::seconds(60));
     EXPECT_EQ(result.status, 1) << result.err;
-    const json document = json::parse(result.out);
-    EXPECT_EQ(document["events"][0]["RETVAL"], 0);
-    const json& row = document["completion"];
-    EXPECT_EQ(row["RETVAL"], 1031);
-    EXPECT_EQ(row["RETMSGID"], "ZAV1031E");
-    EXPECT_EQ(row["RETMSGPARM"], depot() + "rc.txt,65");
+    EXPECT_THAT(result.out, testing::StartsWith("install ux (it): accepted\n"
+                                                "install ux (it): begun\n"
+                                                "install ux (it): failed after "));
+    EXPECT_THAT(result.out, testing::HasSubstr("ZAV1031E"));
+    EXPECT_THAT(result.out, testing::HasSubstr(depot() + "rc.txt,65"));
     EXPECT_FALSE(files().exists("translator"));
 }
 

@@ -11,6 +11,17 @@
 namespace http = boost::beast::http;
 
 namespace ctl {
+namespace {
+
+std::string tableTarget(const std::string& table,
+                        const std::vector<std::pair<std::string, std::string>>& where) {
+    std::string target = "/v1/events?table=" + percentEncoded(table);
+    for (const auto& [column, value] : where)
+        target += "&" + percentEncoded(column) + "=" + percentEncoded(value);
+    return target;
+}
+
+}  // namespace
 
 struct EventStream::Connection {
     explicit Connection(const std::string& path) : transport(path) {
@@ -60,11 +71,11 @@ void EventStream::Connection::readHeader(Deadline deadline) {
 EventStream::EventStream(const std::string& socketPath, const std::string& table,
                          const std::vector<std::pair<std::string, std::string>>& where,
                          Deadline deadline)
+    : EventStream(socketPath, tableTarget(table, where), deadline) {}
+
+EventStream::EventStream(const std::string& socketPath, const std::string& target,
+                         Deadline deadline)
     : connection_(std::make_unique<Connection>(socketPath)) {
-    std::string target = "/v1/events?table=" + percentEncoded(table);
-    for (const auto& [column, value] : where) {
-        target += "&" + percentEncoded(column) + "=" + percentEncoded(value);
-    }
     connection_->sendRequest(target, deadline);
     connection_->readHeader(deadline);
 }

@@ -1,4 +1,4 @@
-/// A live subscription to a table's events.
+/// Events as the host sends them: a live subscription to a table, or what another path streams.
 #pragma once
 
 #include <deque>
@@ -20,6 +20,8 @@ public:
     /// holds pairs of a column and the value that it must have. Throws Failure as HostClient does.
     EventStream(const std::string& socketPath, const std::string& table,
                 const std::vector<std::pair<std::string, std::string>>& where, Deadline deadline);
+    /// The events of any other path, such as "/v1/tasks/1/output?follow=1".
+    EventStream(const std::string& socketPath, const std::string& target, Deadline deadline);
     ~EventStream();
     EventStream(const EventStream&) = delete;
     EventStream& operator=(const EventStream&) = delete;

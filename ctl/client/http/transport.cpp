@@ -43,8 +43,9 @@ void Transport::abandon() {
     context_.run();
 }
 
-Failure Transport::broken(const Error& error) const {
-    return {kNoHost, "the connection to the host at " + path_ + " broke: " + error.message()};
+BrokenConnection Transport::broken(const Error& error) const {
+    return BrokenConnection("the connection to the host at " + path_ +
+                            " broke: " + error.message());
 }
 
 Failure refusal(unsigned status, const std::string& body) {

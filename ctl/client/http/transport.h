@@ -38,7 +38,7 @@ public:
     Socket& socket() { return socket_; }
 
     /// What to throw when the connection failed.
-    Failure broken(const Error& error) const;
+    BrokenConnection broken(const Error& error) const;
 
 private:
     void abandon();
@@ -48,7 +48,7 @@ private:
     Socket socket_;
 };
 
-/// What to throw when the host answered with an HTTP status other than 200. `body` may hold the
+/// What to throw when the host answered with an HTTP status that is no success. `body` may hold the
 /// reason as {"error": "...", "guard": "...", "hint": "..."}. A request that is wrong is the user's
 /// to mend (kWrongUsage); one that the host does not want now is a failure (kHostReportedFailure).
 /// What is no refusal either, such as a redirection, makes no sense of a host (kNoHost).

@@ -14,6 +14,13 @@ constexpr Argument kTarget =
 constexpr Argument kNoWait = flag("--no-wait", "Do not wait for the outcome");
 constexpr Argument kTransid = textOption("--transid", "The transaction identifier to use")
                                   .completedBy(Completion::Transaction);
+constexpr Argument kOnce =
+    textOption("--once",
+               "A transaction identifier that makes a repetition harmless: it shows what\n"
+               "became of the first request, and does nothing")
+        .called("KEY")
+        .without("--transid")
+        .completedBy(Completion::Transaction);
 constexpr Argument kForce =
     flag("--force", "Send it although the inventory does not list the product");
 constexpr Argument kNoVerify =

@@ -31,7 +31,10 @@ constexpr Argument kTimeout =
         // Room for a stop and a start that each use up the host's own time-out of 300 seconds.
         .otherwise("660");
 
-constexpr Argument kGlobalArgumentList[] = {kSocket, kRpcSocket, kHostUser, kJson, kTimeout};
+constexpr Argument kVerbose = flag("-v", "Show what a task's commands write while they run");
+
+constexpr Argument kGlobalArgumentList[] = {kSocket, kRpcSocket, kHostUser,
+                                            kJson,   kTimeout,   kVerbose};
 constexpr ArgumentList kGlobalArguments = kGlobalArgumentList;
 
 /// Where the host is by these options and the environment.

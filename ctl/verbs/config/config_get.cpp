@@ -4,7 +4,7 @@
 
 #include "ctl/client/guarded.h"
 #include "ctl/client/row.h"
-#include "ctl/client/task.h"
+#include "ctl/client/tasks/queried_task.h"
 #include "ctl/show/command_report.h"
 #include "ctl/show/message_catalogue.h"
 #include "ctl/show/printable.h"
@@ -12,7 +12,7 @@
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/arguments/common_arguments.h"
 #include "ctl/verbs/invocation.h"
-#include "ctl/verbs/tasks/queued.h"
+#include "ctl/verbs/tasks/waiting.h"
 #include "ctl/verbs/verb_table.h"
 
 using nlohmann::json;

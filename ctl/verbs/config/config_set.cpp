@@ -17,7 +17,8 @@ namespace {
 constexpr Argument kFile =
     textOption("--file", "File with the configuration").completedBy(Completion::LocalFile);
 constexpr Argument kText = positional("TEXT", "The configuration itself, or - for standard input");
-constexpr Argument kArguments[] = {kProduct, kText, kTarget, kFile, kForce, kNoWait, kTransid};
+constexpr Argument kArguments[] = {kProduct, kText,   kTarget,  kFile,
+                                   kForce,   kNoWait, kTransid, kOnce};
 
 /// The host takes SETCONFIG for the universal agent as the import of a metafile, whatever the
 /// context says. Without a metafile it changes nothing and reports success.

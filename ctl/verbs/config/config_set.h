@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "ctl/client/task_request.h"
+#include "ctl/client/tasks/task_request.h"
 
 namespace ctl {
 

@@ -19,8 +19,8 @@ constexpr Argument kRestart =
     flag("--restart",
          "Add the metafile's data provider to those that are started, which restarts\n"
          "the agent when it is not among them yet");
-constexpr Argument kArguments[] = {kMetafile, kScripts, kPort,   kRestart,
-                                   kTarget,   kForce,   kNoWait, kTransid};
+constexpr Argument kArguments[] = {kMetafile, kScripts, kPort,    kRestart, kTarget,
+                                   kForce,    kNoWait,  kTransid, kOnce};
 
 std::string contextOf(const Values& given) {
     std::string text;

@@ -2,15 +2,15 @@
 
 #include <nlohmann/json.hpp>
 
-#include "ctl/client/install_outcome.h"
 #include "ctl/client/row.h"
-#include "ctl/client/task.h"
+#include "ctl/client/tasks/install_outcome.h"
+#include "ctl/client/tasks/queried_task.h"
 #include "ctl/show/command_report.h"
 #include "ctl/show/running_clock.h"
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/arguments/common_arguments.h"
 #include "ctl/verbs/invocation.h"
-#include "ctl/verbs/tasks/queued.h"
+#include "ctl/verbs/tasks/waiting.h"
 #include "ctl/verbs/verb_table.h"
 
 using nlohmann::json;

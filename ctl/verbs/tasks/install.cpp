@@ -1,17 +1,13 @@
 #include "ctl/verbs/tasks/install.h"
 
-#include "ctl/client/failure.h"
-#include "ctl/client/install_outcome.h"
+#include <nlohmann/json.hpp>
+
 #include "ctl/client/row.h"
-#include "ctl/show/running_clock.h"
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/arguments/common_arguments.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/tasks/queued.h"
-#include "ctl/verbs/tasks/verification.h"
 #include "ctl/verbs/verb_table.h"
-
-using nlohmann::json;
 
 namespace ctl {
 namespace {
@@ -33,7 +29,7 @@ constexpr Argument kComplete =
     flag("--complete", "With --restart: wait for the host to come back and fetch the final outcome")
         .with("--restart");
 constexpr Argument kArguments[] = {kProduct,  kVersion,  kCommand, kOptional, kRestart,
-                                   kComplete, kNoVerify, kNoWait,  kTransid};
+                                   kComplete, kNoVerify, kNoWait,  kTransid,  kOnce};
 
 TaskRequest requestOf(const Values& given) {
     TaskRequest request;
@@ -43,57 +39,6 @@ TaskRequest requestOf(const Values& given) {
     request.context = joinedCommand(given.texts(kCommand));
     request.optional = given.flag(kRestart) ? "REQUIRES_RESTART" : given.text(kOptional);
     return request;
-}
-
-TaskResult resultOf(const Task& task, TaskResult::End end) {
-    TaskResult result{end, task.reply(), task.events(), task.elapsed()};
-    if (end == TaskResult::End::Outcome) result.record = task.record();
-    return result;
-}
-
-/// Waits for the first outcome. It must come: without it nothing is known of the install.
-void awaitBegin(Task& task) {
-    switch (task.awaitOutcome()) {
-        case EventStream::Result::Event:
-            return;
-        case EventStream::Result::Ended:
-            throw Failure(kNoHost, "the host went away");
-        case EventStream::Result::TimedOut:
-            throw Failure(kNoOutcome, "no outcome within the time-out");
-    }
-}
-
-/// Either the install restarts the host, which ends the stream, or it leaves it running and a
-/// second outcome comes. Both mean that the install's own result is on record, or soon will be.
-void awaitRestart(Task& task) {
-    if (task.awaitOutcome() == EventStream::Result::TimedOut) {
-        throw Failure(kNoOutcome, "the install was not over within the time-out");
-    }
-}
-
-CompletedInstall askCompleted(const Invocation& invocation, const QueuedCommand& command) {
-    const std::string& title = command.title;
-    const Verification verification(invocation.host, command.request, command.isVerified);
-    TaskRequest request = command.request;
-    if (request.transid.empty()) request.transid = makeTransid();
-    const InterruptNote note = interruptNote(request.transid, invocation.format);
-    RunningClock clock(title, invocation.format == Format::Text);
-    const Ticker tick = [&clock] { clock.tick(); };
-    Task task(invocation.host, request, tick);
-    if (!task.submit(true)) return {resultOf(task, TaskResult::End::Refused), {}};
-    awaitBegin(task);
-    if (returnCodeOf(task.events().back()) != 0) {
-        return {resultOf(task, TaskResult::End::Outcome), {}};
-    }
-    if (invocation.format == Format::Text) {
-        clock.erase();
-        print({title + ": begun\n", {}});
-    }
-    awaitRestart(task);
-    json completion = fetchInstallOutcome(invocation.host.socket, task.deadline(), tick);
-    CompletedInstall install{resultOf(task, TaskResult::End::Outcome), std::move(completion)};
-    if (returnCodeOf(install.completion) == 0) verification.check(install.task);
-    return install;
 }
 
 ExitStatus runWithRestart(const Invocation& invocation, const QueuedCommand& command) {
@@ -112,13 +57,12 @@ ExitStatus run(const Invocation& invocation) {
     const Values& given = invocation.given;
     QueuedCommand command =
         queuedCommand(invocation, requestOf(given), "install " + given.text(kProduct));
+    command.isVerified = !given.flag(kNoVerify);
     // The first outcome of an install that restarts the host says only that it has begun.
     const bool isSeenToItsEnd = !given.flag(kRestart) || given.flag(kComplete);
-    command.isVerified = isSeenToItsEnd && !given.flag(kNoVerify);
-    if (!given.flag(kRestart)) return runQueued(invocation, command);
-    if (!given.flag(kComplete) || given.flag(kNoWait)) return runWithRestart(invocation, command);
-    return print(
-        showCompletedInstall(command.title, askCompleted(invocation, command), invocation.format));
+    if (isSeenToItsEnd || command.await == Await::Reply) return runQueued(invocation, command);
+    command.await = Await::FirstOutcome;
+    return runWithRestart(invocation, command);
 }
 
 }  // namespace
@@ -141,25 +85,6 @@ std::string joinedCommand(const std::vector<std::string>& words) {
         text += quote ? '"' + word + '"' : word;
     }
     return text;
-}
-
-Page showCompletedInstall(const std::string& title, const CompletedInstall& install,
-                          Format format) {
-    const TaskResult& task = install.task;
-    if (install.completion.is_null()) {
-        Page page = showTask(title, task, format);
-        if (format == Format::Text && task.end == TaskResult::End::Refused) {
-            page.out = replyLine(title, task.reply);
-        }
-        return page;
-    }
-    Page page = showOutcome(title, install.completion, task.elapsed, Format::Text);
-    addDoubts(page, title, task);
-    if (format == Format::Text) return page;
-    json document = taskDocument(task);
-    document["completion"] = install.completion;
-    page.out = jsonText(document);
-    return page;
 }
 
 }  // namespace ctl

@@ -1,11 +1,12 @@
 #include "ctl/verbs/tasks/ps.h"
 
 #include <nlohmann/json.hpp>
+#include <vector>
 
-#include "ctl/client/failure.h"
 #include "ctl/client/host_client.h"
 #include "ctl/client/http/percent_encoding.h"
 #include "ctl/client/row.h"
+#include "ctl/client/tasks/task_list.h"
 #include "ctl/show/task_record.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
@@ -15,6 +16,15 @@ using nlohmann::json;
 namespace ctl {
 namespace {
 
+/// More than any host lets wait.
+constexpr std::size_t kMost = 1'000'000;
+
+std::vector<json> oldestFirst(const HostClient& client, const char* state, Deadline deadline) {
+    const json list = listTasks(client, {state, {}, kMost}, deadline);
+    const json& tasks = list.at("tasks");
+    return {tasks.rbegin(), tasks.rend()};
+}
+
 ExitStatus run(const Invocation& invocation) {
     return print(
         showWork(askWork(invocation), std::chrono::system_clock::now(), invocation.format));
@@ -23,24 +33,23 @@ ExitStatus run(const Invocation& invocation) {
 }  // namespace
 
 constexpr Verb kPsVerb = {
-    "ps", "Show what is at work on the host now", {}, {"zavctl ps", "zavctl --json ps"}, run,
+    "ps", "Show what the host works at, and what waits for it",
+    {},   {"zavctl ps", "zavctl --json ps"},
+    run,
 };
 
 json askWork(const Invocation& invocation) {
     const HostClient client(invocation.host.socket);
     const Deadline deadline = invocation.deadline();
-    const json answer = client.getIfThere("/v1/tasks?state=running", deadline);
-    const auto list = answer.find("tasks");
-    if (list == answer.end() || !list->is_array()) {
-        throw Failure(kHostReportedFailure, "this host does not list its tasks");
-    }
     json tasks = json::array();
-    for (auto summary = list->rbegin(); summary != list->rend(); ++summary) {
+    for (const json& summary : oldestFirst(client, "running", deadline)) {
         // The list has no processes. A task that is forgotten meanwhile is not at work any more.
-        const std::string path = "/v1/tasks/" + percentEncoded(textOf(*summary, "id"));
+        const std::string path = "/v1/tasks/" + percentEncoded(textOf(summary, "id"));
         json record = client.getIfThere(path, deadline);
         if (record.is_object()) tasks.push_back(std::move(record));
     }
+    for (json& summary : oldestFirst(client, "queued", deadline))
+        tasks.push_back(std::move(summary));
     return tasks;
 }
 

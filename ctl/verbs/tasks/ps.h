@@ -1,4 +1,4 @@
-/// ps: what is at work on the host now.
+/// ps: what the host works at, and what waits for it.
 #pragma once
 
 #include <nlohmann/json_fwd.hpp>
@@ -10,8 +10,8 @@ namespace ctl {
 
 struct Invocation;
 
-/// The records of the tasks that run, a list, oldest first. Throws Failure when the host does not
-/// list its tasks.
+/// The tasks that run with their commands, and those that wait, a list, oldest first. Throws
+/// Failure when the host does not list its tasks.
 nlohmann::json askWork(const Invocation& invocation);
 Page showWork(const nlohmann::json& tasks, WallTime now, Format format);
 

@@ -2,27 +2,23 @@
 
 #include <utility>
 
-#include "ctl/client/failure.h"
-#include "ctl/show/running_clock.h"
+#include "ctl/client/tasks/run_task.h"
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/arguments/common_arguments.h"
 #include "ctl/verbs/tasks/verification.h"
+#include "ctl/verbs/tasks/waiting.h"
 
 using nlohmann::json;
 
 namespace ctl {
 
 QueuedCommand queuedCommand(const Invocation& invocation, TaskRequest request, std::string title) {
-    request.transid = invocation.given.text(kTransid);
+    const Values& given = invocation.given;
+    request.isOnce = given.has(kOnce);
+    request.transid = given.text(request.isOnce ? kOnce : kTransid);
     if (!request.transid.empty()) title += " (" + request.transid + ")";
-    return {std::move(request), std::move(title), !invocation.given.flag(kNoWait)};
-}
-
-InterruptNote interruptNote(const std::string& transid, Format format) {
-    const Failure interrupted(kInterrupted, "interrupted; the host goes on with task " + transid,
-                              laterText(transid));
-    const Page page = failurePage(interrupted, format);
-    return InterruptNote(page.err, page.out);
+    const Await await = given.flag(kNoWait) ? Await::Reply : Await::End;
+    return {std::move(request), std::move(title), await};
 }
 
 OnReply replyShown(const std::string& title, Format format) {
@@ -32,19 +28,21 @@ OnReply replyShown(const std::string& title, Format format) {
 
 TaskResult askQueued(const Invocation& invocation, const QueuedCommand& command,
                      const OnReply& onReply) {
-    const Verification verification(invocation.host, command.request,
-                                    command.isVerified && command.isAwaited);
+    const bool isVerified = command.isVerified && command.await == Await::End;
+    const Verification verification(invocation.host, command.request, isVerified);
     TaskRequest request = command.request;
-    if (request.transid.empty()) request.transid = makeTransid();
-    const InterruptNote note = interruptNote(request.transid, invocation.format);
-    RunningClock clock(command.title, invocation.format == Format::Text);
-    TaskWatch watch;
-    watch.tick = [&clock] { clock.tick(); };
+    request.isUnique = request.transid.empty();
+    if (request.isUnique) request.transid = makeTransid();
+    Waiting waiting(invocation, command.title, request.transid);
+    TaskWatch watch = waiting.watch();
     watch.onReply = [&](const json& reply) {
-        clock.erase();
+        waiting.show({});
         if (onReply) onReply(reply);
     };
-    TaskResult result = runTask(invocation.host, request, command.isAwaited, watch);
+    if (invocation.format == Format::Text) {
+        watch.onBegun = [&] { waiting.show({command.title + ": begun\n", {}}); };
+    }
+    TaskResult result = runTask(invocation.host, request, command.await, watch);
     verification.check(result);
     return result;
 }

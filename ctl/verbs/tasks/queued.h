@@ -2,11 +2,13 @@
 /// both.
 #pragma once
 
+#include <functional>
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
 #include "ctl/client/interruption.h"
-#include "ctl/client/task.h"
+#include "ctl/client/tasks/task_request.h"
+#include "ctl/client/tasks/task_result.h"
 #include "ctl/show/page.h"
 #include "ctl/verbs/invocation.h"
 
@@ -16,18 +18,16 @@ namespace ctl {
 struct QueuedCommand {
     TaskRequest request;
     std::string title;  ///< such as "start ux"
-    bool isAwaited = true;
+    Await await = Await::End;
     bool isVerified = false;  ///< look afterwards whether a success is one
 };
 
-/// The command with what the user said about it. The verb must declare kNoWait and kTransid. A
-/// transaction identifier that the user has chosen becomes part of the title.
+/// The command with what the user said about it. The verb must declare kNoWait, kTransid and kOnce.
+/// A transaction identifier that the user has chosen becomes part of the title.
 QueuedCommand queuedCommand(const Invocation& invocation, TaskRequest request, std::string title);
 
-/// As long as the object exists, Ctrl-C names the task and says how to find its outcome.
-InterruptNote interruptNote(const std::string& transid, Format format);
-
-/// Called when the reply is there, which may be long before the outcome.
+/// Called when the host has accepted the command or has refused it, which may be long before the
+/// outcome; see TaskWatch.
 using OnReply = std::function<void(const nlohmann::json& reply)>;
 
 /// Shows the line that the reply is, for people only.

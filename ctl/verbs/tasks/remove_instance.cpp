@@ -11,7 +11,7 @@ namespace {
 constexpr Argument kTargetName =
     positional("TARGET", "Managed system name").required().completedBy(Completion::Instance);
 constexpr Argument kContext = textOption("--context", "Text for the translator's standard input");
-constexpr Argument kArguments[] = {kProduct, kTargetName, kContext, kNoWait, kTransid};
+constexpr Argument kArguments[] = {kProduct, kTargetName, kContext, kNoWait, kTransid, kOnce};
 
 ExitStatus run(const Invocation& invocation) {
     TaskRequest request;

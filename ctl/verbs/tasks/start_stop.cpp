@@ -13,10 +13,11 @@ constexpr Argument kInstance = textOption("--instance", "Name of the instance it
                                    .without("--target")
                                    .completedBy(Completion::Instance);
 constexpr Argument kStartArguments[] = {
-    kProduct, kTarget.without("--instance"), kInstance, kForce, kNoVerify, kNoWait, kTransid};
+    kProduct, kTarget.without("--instance"), kInstance, kForce, kNoVerify, kNoWait, kTransid,
+    kOnce};
 /// --instance is known only to say that --target takes its place.
-constexpr Argument kArguments[] = {kProduct, kTarget, kInstance.hidden(), kForce, kNoVerify,
-                                   kNoWait,  kTransid};
+constexpr Argument kArguments[] = {kProduct,  kTarget, kInstance.hidden(), kForce,
+                                   kNoVerify, kNoWait, kTransid,           kOnce};
 
 TaskRequest requestOf(const Values& given, const std::string& command) {
     TaskRequest request;

@@ -6,6 +6,7 @@
 #include "ctl/client/http/percent_encoding.h"
 #include "ctl/show/task_record.h"
 #include "ctl/verbs/invocation.h"
+#include "ctl/verbs/tasks/task_argument.h"
 #include "ctl/verbs/verb_table.h"
 
 using nlohmann::json;
@@ -13,10 +14,6 @@ using nlohmann::json;
 namespace ctl {
 namespace {
 
-constexpr Argument kTask =
-    positional("ID", "Transaction identifier, or the host's own identifier of the task")
-        .required()
-        .completedBy(Completion::Transaction);
 constexpr Argument kArguments[] = {kTask};
 
 ExitStatus run(const Invocation& invocation) {

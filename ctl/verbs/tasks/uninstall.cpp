@@ -8,7 +8,7 @@
 namespace ctl {
 namespace {
 
-constexpr Argument kArguments[] = {kProduct, kForce, kNoVerify, kNoWait, kTransid};
+constexpr Argument kArguments[] = {kProduct, kForce, kNoVerify, kNoWait, kTransid, kOnce};
 
 ExitStatus run(const Invocation& invocation) {
     TaskRequest request;

@@ -31,8 +31,9 @@ bool isNumeric(const std::string& version) {
 }
 
 bool endedWell(const TaskResult& result) {
-    return result.end == TaskResult::End::Outcome && !result.events.empty() &&
-           returnCodeOf(result.events.back()) == 0;
+    if (result.end != TaskResult::End::Outcome || result.events.empty()) return false;
+    const json& row = result.completion.is_null() ? result.events.back() : result.completion;
+    return returnCodeOf(row) == 0;
 }
 
 }  // namespace

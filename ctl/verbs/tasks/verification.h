@@ -6,8 +6,8 @@
 
 #include "ctl/client/deadline.h"
 #include "ctl/client/host_address.h"
-#include "ctl/client/task.h"
-#include "ctl/client/task_request.h"
+#include "ctl/client/tasks/task_request.h"
+#include "ctl/client/tasks/task_result.h"
 
 namespace ctl {
 

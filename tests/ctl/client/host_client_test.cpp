@@ -98,6 +98,48 @@ TEST(HostClient, TakesNothingThereForNoDocumentAndARefusalForOne) {
     EXPECT_THROW(HostClient(busy.path()).getIfThere("/v1/tasks/T", soon()), ctl::Failure);
 }
 
+TEST(HostClient, GivesAnAnswerAsItCame) {
+    std::string request;
+    CannedHost host([&request](const CannedHost& self) {
+        const Peer peer = self.accept();
+        request = peer.request();
+        peer.send("HTTP/1.1 429 Too Many\r\nRetry-After: 7\r\nContent-Length: 2\r\n\r\n{}");
+    });
+    const ctl::Answer answer = HostClient(host.path()).post("/v1/tasks", {{"a", 1}}, soon());
+    host.join();
+    EXPECT_EQ(answer.status, 429U);
+    EXPECT_EQ(answer.retryAfter, std::chrono::seconds(7));
+    EXPECT_FALSE(answer.isSuccess());
+    EXPECT_THROW(answer.document(), ctl::Failure);
+    EXPECT_EQ(request.rfind("POST /v1/tasks HTTP/1.1\r\n", 0), 0U);
+    EXPECT_EQ(json::parse(request.substr(request.find("\r\n\r\n"))), (json{{"a", 1}}));
+}
+
+TEST(HostClient, TakesOnlySecondsForATimeToAskAgain) {
+    for (const char* text : {"", "Sun, 22 Nov 2026 05:00:00 GMT", "-1", "1234567", "1.5"}) {
+        const CannedHost host([text](const CannedHost& self) {
+            const Peer peer = self.accept();
+            peer.request();
+            peer.send(std::string("HTTP/1.1 503 X\r\nRetry-After: ") + text +
+                      "\r\nContent-Length: 0\r\n\r\n");
+        });
+        EXPECT_FALSE(HostClient(host.path()).ask("/v1/health", soon()).retryAfter) << text;
+    }
+}
+
+TEST(HostClient, TellsAHostThatMayHaveBeenAskedFromOneThatWasNot) {
+    const CannedHost host([](const CannedHost& self) { self.accept().request(); });
+    EXPECT_THROW(HostClient(host.path()).post("/v1/tasks", nullptr, soon()), ctl::BrokenConnection);
+    try {
+        HostClient("/none").post("/v1/tasks", nullptr, soon());
+        FAIL();
+    } catch (const ctl::BrokenConnection&) {
+        FAIL() << "it was never there";
+    } catch (const ctl::Failure& failure) {
+        EXPECT_EQ(failure.status(), ctl::kNoHost);
+    }
+}
+
 TEST(HostClient, DoesNotReadAnAnswerBeyondItsLimits) {
     const std::string deep(200'000, '[');
     EXPECT_EQ(failureOfQuery(answering(200, deep)).second,

@@ -38,6 +38,18 @@ TEST(InterruptNoteDeathTest, IsNotSaidAnyMoreWhenItIsGone) {
         testing::KilledBySignal(SIGINT), "^$");
 }
 
+TEST(InterruptNoteDeathTest, SaysWhatIsTrueByThen) {
+    EXPECT_EXIT(
+        {
+            std::signal(SIGINT, SIG_DFL);
+            InterruptNote first("first\n");
+            const InterruptNote second("second\n");
+            first.change("changed\n", "");
+            std::raise(SIGINT);
+        },
+        testing::ExitedWithCode(130), "^changed\nsecond\n$");
+}
+
 TEST(InterruptNoteDeathTest, LeavesAnIgnoredSignalIgnored) {
     EXPECT_EXIT(
         {

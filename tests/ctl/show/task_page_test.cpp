@@ -30,6 +30,7 @@ TEST(TaskPage, SaysWhetherTheCommandWasAccepted) {
     EXPECT_EQ(ctl::replyLine("start ux", kAccepted), "start ux: accepted\n");
     EXPECT_EQ(ctl::replyLine("start ux", kRefused),
               "start ux: refused; ZAV1003E: the request names no product\n");
+    EXPECT_EQ(ctl::replyLine("start ux", nullptr), "start ux: accepted\n") << "still to come";
 }
 
 TEST(TaskPage, SaysHowAndAfterWhatTimeTheTaskEnded) {
@@ -149,6 +150,55 @@ TEST(TaskPage, SaysWhyThereIsNoOutcome) {
               "zavctl: no outcome within the time-out\n"
               "  zavctl task show T tells how it ended\n");
     EXPECT_EQ(late.status, ctl::kNoOutcome);
+}
+
+/// A task that ended in a way that no row tells.
+TaskResult over(const json& kept) {
+    TaskResult result;
+    result.end = TaskResult::End::Over;
+    result.record = kept;
+    result.elapsed = seconds(3);
+    return result;
+}
+
+TEST(TaskPage, TellsInWordsOfEndsWithoutARow) {
+    const std::pair<json, std::string> cases[] = {
+        {{{"state", "cancelled"}}, "install ux: cancelled after 3 s\n"},
+        {{{"state", "expired"}}, "install ux: expired after 3 s; its turn came too late\n"},
+        {{{"state", "interrupted"}, {"reason", "the power failed"}},
+         "install ux: interrupted after 3 s; the power failed\n"},
+        {{{"state", "interrupted"}},
+         "install ux: interrupted after 3 s; the host ended in the middle of it: it may have run "
+         "in "
+         "part\n"},
+        {{{"state", "refused"}, {"reason", "no such product"}, {"hint", "Push it."}},
+         "install ux: refused after 3 s; no such product\n  Push it.\n"}};
+    for (const auto& [kept, words] : cases) {
+        const Page page = ctl::showTask("install ux", over(kept), Format::Text);
+        EXPECT_EQ(page.out, words);
+        EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+    }
+    EXPECT_EQ(ctl::showTask("install ux", over({{"state", "done"}}), Format::Text).status,
+              ctl::kSuccess);
+}
+
+TEST(TaskPage, ShowsTheCommandsOfATaskThatWasCutOff) {
+    const Page page =
+        ctl::showTask("install ux", over(record("interrupted", kKilled)), Format::Text);
+    EXPECT_NE(page.out.find("  command: run\n  end:     killed by signal 9\n"), std::string::npos)
+        << page.out;
+}
+
+TEST(TaskPage, OfAnInstallThatRestartedTheHostIsItsOwnResult) {
+    TaskResult result = outcome(kDone);
+    result.completion = kFailed;
+    const Page text = ctl::showTask("install ux", result, Format::Text);
+    EXPECT_EQ(text.out.rfind("install ux: failed after 3 s; ZAV1024E: ", 0), 0U) << text.out;
+    EXPECT_EQ(text.status, ctl::kHostReportedFailure);
+    const Page asJson = ctl::showTask("install ux", result, Format::Json);
+    EXPECT_EQ(json::parse(asJson.out),
+              (json{{"reply", kAccepted}, {"events", {kDone}}, {"completion", kFailed}}));
+    EXPECT_EQ(asJson.status, ctl::kHostReportedFailure);
 }
 
 TEST(TaskPage, IsOneDocumentAsJsonHoweverTheCommandEnded) {

@@ -34,6 +34,10 @@ TEST(TaskRecord, AtWorkIsWhatItIsAndItsProcesses) {
         << "a task keeps its name";
     EXPECT_EQ(ctl::workText({{"id", "17"}, {"command", "STOP"}, {"state", "running"}}, {}),
               "17: STOP, running\n");
+    EXPECT_EQ(
+        ctl::workText(
+            {{"id", "17"}, {"command", "STOP"}, {"state", "queued"}, {"accepted", "then"}}, {}),
+        "17: STOP, queued since then\n");
 }
 
 TEST(TaskRecord, HasItsTimesAndHowItEnded) {
@@ -61,6 +65,12 @@ TEST(TaskRecord, ThatWasRefusedSaysWhy) {
                          {"reply", {{"RETVAL", 1003}, {"RETMSGID", "ZAV1003E"}}}};
     EXPECT_EQ(ctl::recordText(record, {}),
               "1: START, refused\n  ZAV1003E: the request names no product\n");
+}
+
+TEST(TaskRecord, WithoutARowSaysWhatTheHostSays) {
+    const json record = {{"id", "1"},         {"command", "START"},    {"state", "refused"},
+                         {"reason", "no ux"}, {"hint", "Install it."}, {"reply", nullptr}};
+    EXPECT_EQ(ctl::recordText(record, {}), "1: START, refused\n  no ux\n  Install it.\n");
 }
 
 TEST(TaskRecord, OfAnyShapeIsText) {

@@ -30,11 +30,12 @@ json workWith(const Answers& answers) {
     return ctl::askWork({{}, {host.path(), "", std::chrono::seconds(20)}, Format::Text});
 }
 
-TEST(Ps, GivesTheTasksThatRunOldestFirst) {
+TEST(Ps, GivesTheTasksThatRunAndThoseThatWaitOldestFirst) {
     EXPECT_EQ(workWith({{200, R"({"tasks": [{"id": "2"}, {"id": "1"}], "next": null})"},
                         {200, R"({"id": "1", "state": "running"})"},
-                        {404, "{}"}}),
-              (json{{{"id", "1"}, {"state", "running"}}}));
+                        {404, "{}"},
+                        {200, R"({"tasks": [{"id": "4"}, {"id": "3"}], "next": null})"}}),
+              (json{{{"id", "1"}, {"state", "running"}}, {{"id", "3"}}, {{"id", "4"}}}));
 }
 
 TEST(Ps, NeedsAHostThatListsItsTasks) {

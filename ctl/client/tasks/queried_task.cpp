@@ -1,4 +1,4 @@
-#include "ctl/client/task.h"
+#include "ctl/client/tasks/queried_task.h"
 
 #include <utility>
 
@@ -6,6 +6,7 @@
 #include "ctl/client/http/bounded_json.h"
 #include "ctl/client/http/percent_encoding.h"
 #include "ctl/client/row.h"
+#include "ctl/client/tasks/install_outcome.h"
 
 using nlohmann::json;
 
@@ -22,6 +23,24 @@ TaskResult::End endOf(EventStream::Result result) {
             break;
     }
     return TaskResult::End::TimedOut;
+}
+
+TaskResult resultOf(const Task& task, TaskResult::End end) {
+    TaskResult result;
+    result.end = end;
+    result.reply = task.reply();
+    result.events = task.events();
+    result.elapsed = task.elapsed();
+    if (end == TaskResult::End::Outcome) result.record = task.record();
+    return result;
+}
+
+/// Either the install restarts the host, which ends the stream, or it leaves it running and a
+/// second outcome comes. Both mean that the install's own result is on record, or soon will be.
+void awaitRestart(Task& task) {
+    if (task.awaitOutcome() == EventStream::Result::TimedOut) {
+        throw Failure(kNoOutcome, "the install was not over within the time-out");
+    }
 }
 
 }  // namespace
@@ -71,7 +90,7 @@ EventStream::Result Task::awaitOutcome() {
 json Task::record() const {
     // The outcome may be seen here before the host has closed its record. An install that restarts
     // the host stays open after its first outcome, so it is not waited for.
-    const bool staysOpen = request_.optional == "REQUIRES_RESTART";
+    const bool staysOpen = restartsHost(request_);
     const std::string path =
         "/v1/tasks/" + percentEncoded(request_.transid) + (staysOpen ? "" : "?wait=5");
     try {
@@ -87,18 +106,23 @@ std::chrono::milliseconds Task::elapsed() const {
                                                                  begin_);
 }
 
-TaskResult runTask(const HostAddress& host, const TaskRequest& request, bool wait,
-                   const TaskWatch& watch) {
+TaskResult runQueried(const HostAddress& host, const TaskRequest& request, Await await,
+                      const TaskWatch& watch) {
     Task task(host, request, watch.tick);
-    const bool accepted = task.submit(wait);
+    const bool accepted = task.submit(await != Await::Reply);
     if (watch.onReply) watch.onReply(task.reply());
-    TaskResult result;
-    result.end = accepted ? TaskResult::End::Accepted : TaskResult::End::Refused;
-    if (accepted && wait) result.end = endOf(task.awaitOutcome());
-    result.reply = task.reply();
-    result.events = task.events();
-    result.elapsed = task.elapsed();
-    if (result.end == TaskResult::End::Outcome) result.record = task.record();
+    if (!accepted) return resultOf(task, TaskResult::End::Refused);
+    if (await == Await::Reply) return resultOf(task, TaskResult::End::Accepted);
+    TaskResult result = resultOf(task, endOf(task.awaitOutcome()));
+    const bool hasBegun = await == Await::End && restartsHost(request) &&
+                          result.end == TaskResult::End::Outcome &&
+                          returnCodeOf(result.events.back()) == 0;
+    if (!hasBegun) return result;
+    if (watch.onBegun) watch.onBegun();
+    awaitRestart(task);
+    json completion = fetchInstallOutcome(host.socket, task.deadline(), watch.tick);
+    result = resultOf(task, TaskResult::End::Outcome);
+    result.completion = std::move(completion);
     return result;
 }
 

@@ -1,4 +1,4 @@
-#include "ctl/client/install_outcome.h"
+#include "ctl/client/tasks/install_outcome.h"
 
 #include <nlohmann/json.hpp>
 #include <optional>
@@ -31,6 +31,10 @@ std::optional<json> askOnce(const HostClient& client, Deadline deadline, const T
 }
 
 }  // namespace
+
+bool restartsHost(const TaskRequest& request) {
+    return request.command == "INSTALL" && request.optional == "REQUIRES_RESTART";
+}
 
 TaskRequest completeInstallRequest(const std::string& transid) {
     TaskRequest request;

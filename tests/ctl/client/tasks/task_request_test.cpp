@@ -1,7 +1,8 @@
-#include "ctl/client/task_request.h"
+#include "ctl/client/tasks/task_request.h"
 
 #include <gtest/gtest.h>
 
+#include <nlohmann/json.hpp>
 #include <set>
 
 namespace {
@@ -31,6 +32,25 @@ TEST(TaskRequest, HasAColumnForEachOfItsValues) {
               (std::set<std::string>{"COMMAND", "TRANSID", "PRODUCT", "CONTEXT", "OPTIONAL",
                                      "UACONFIG", "UASCRIPT", "VERSION", "TARGETMSN"}));
     EXPECT_EQ(values.size(), 9U);
+}
+
+TEST(TaskRequest, IsADocumentWithItsColumnsInLowerCase) {
+    ctl::TaskRequest request;
+    request.command = "START";
+    request.targetmsn = "a:h:UX";
+    EXPECT_EQ(request.document(), (nlohmann::json{{"command", "START"}, {"targetmsn", "a:h:UX"}}));
+    request.isForced = true;
+    request.isOnce = true;
+    EXPECT_EQ(request.document(),
+              (nlohmann::json{
+                  {"command", "START"}, {"targetmsn", "a:h:UX"}, {"force", true}, {"once", true}}));
+}
+
+TEST(Transid, ThatWasMadeUpIsKnown) {
+    EXPECT_TRUE(ctl::isMadeUp(ctl::makeTransid()));
+    for (const char* chosen :
+         {"", "deploy-7", "zavctl-", "zavctl-1-2", "zavctl-1-0123456789abcdeg"})
+        EXPECT_FALSE(ctl::isMadeUp(chosen)) << chosen;
 }
 
 TEST(Transid, IsAnotherOneEachTimeAndShortEnoughForItsColumn) {

@@ -5,9 +5,13 @@
 #include <string>
 
 #include "ctl/client/deadline.h"
-#include "ctl/client/task_request.h"
+#include "ctl/client/tasks/task_request.h"
 
 namespace ctl {
+
+/// Whether the request is an install that restarts the host: its first outcome says only that it
+/// has begun.
+bool restartsHost(const TaskRequest& request);
 
 /// The request for the outcome of the last such install.
 TaskRequest completeInstallRequest(const std::string& transid);

@@ -1,5 +1,5 @@
 // ctest-label: threaded
-#include "ctl/client/task.h"
+#include "ctl/client/tasks/queried_task.h"
 
 #include <gtest/gtest.h>
 
@@ -8,7 +8,8 @@
 
 namespace {
 
-using ctl::runTask;
+using ctl::Await;
+using ctl::runQueried;
 using ctl::TaskResult;
 using ctl_test::CannedHost;
 using ctl_test::Peer;
@@ -53,7 +54,7 @@ TaskResult resultWith(const std::string& reply, const std::string& events, Recor
         record->request = peer.request();
         peer.answer(record->status, record->body);
     });
-    TaskResult result = runTask(addressOf(host), request(), true);
+    TaskResult result = runQueried(addressOf(host), request(), Await::FirstOutcome);
     host.join();
     return result;
 }
@@ -113,8 +114,8 @@ TEST(Task, ThatNobodyWaitsForEndsWithItsReply) {
         peer.answer(200, kAccepted);
     });
     json seen;
-    const TaskResult result = runTask(addressOf(host), request(), false,
-                                      {{}, [&seen](const json& reply) { seen = reply; }});
+    const TaskResult result = runQueried(addressOf(host), request(), Await::Reply,
+                                         {{}, [&seen](const json& reply) { seen = reply; }});
     EXPECT_EQ(result.end, TaskResult::End::Accepted);
     EXPECT_EQ(seen, result.reply);
 }
@@ -126,7 +127,7 @@ TEST(Task, WhoseReplyIsFilteredOutIsAFailure) {
         peer.answer(200, R"({"rows": []})");
     });
     try {
-        runTask(addressOf(host), request(), false);
+        runQueried(addressOf(host), request(), Await::Reply);
         FAIL();
     } catch (const ctl::Failure& failure) {
         EXPECT_EQ(failure.status(), ctl::kHostReportedFailure);

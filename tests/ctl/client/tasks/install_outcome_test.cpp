@@ -1,4 +1,4 @@
-#include "ctl/client/install_outcome.h"
+#include "ctl/client/tasks/install_outcome.h"
 
 #include <gtest/gtest.h>
 
@@ -14,6 +14,16 @@ TEST(InstallOutcome, IsNotThereYetWhileTheHostFindsNoResult) {
     EXPECT_FALSE(ctl::isNotThereYet(json{{"RETMSGPARM", "NOTFOUND"}}));
     EXPECT_FALSE(ctl::isNotThereYet(json{{"RETMSGPARM", ""}}));
     EXPECT_FALSE(ctl::isNotThereYet(json::object()));
+}
+
+TEST(InstallOutcome, IsThatOfAnInstallThatRestartsTheHost) {
+    ctl::TaskRequest request;
+    request.command = "INSTALL";
+    EXPECT_FALSE(ctl::restartsHost(request));
+    request.optional = "REQUIRES_RESTART";
+    EXPECT_TRUE(ctl::restartsHost(request));
+    request.command = "START";
+    EXPECT_FALSE(ctl::restartsHost(request));
 }
 
 TEST(InstallOutcome, IsAskedForWithoutAProduct) {

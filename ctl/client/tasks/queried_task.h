@@ -1,8 +1,7 @@
-/// Sending a command to the host and seeing how it ended.
+/// A command as a query on the request table, and its outcome as a row of the outcome table.
 #pragma once
 
 #include <chrono>
-#include <functional>
 #include <memory>
 #include <nlohmann/json.hpp>
 #include <string>
@@ -11,7 +10,8 @@
 #include "ctl/client/host_address.h"
 #include "ctl/client/host_client.h"
 #include "ctl/client/http/event_stream.h"
-#include "ctl/client/task_request.h"
+#include "ctl/client/tasks/task_request.h"
+#include "ctl/client/tasks/task_result.h"
 
 namespace ctl {
 
@@ -53,35 +53,9 @@ private:
     nlohmann::json events_ = nlohmann::json::array();
 };
 
-/// What became of a queued command.
-struct TaskResult {
-    enum class End {
-        Refused,   ///< the reply says why
-        Accepted,  ///< nobody waited for more
-        Outcome,   ///< the last of the events says how the task ended
-        HostGone,  ///< after the reply
-        TimedOut,  ///< after the reply
-    };
-    End end = End::Accepted;
-    nlohmann::json reply;
-    nlohmann::json events = nlohmann::json::array();
-    std::chrono::milliseconds elapsed{0};
-    /// Task::record(), with the commands that ran, after an outcome; null if there is none.
-    nlohmann::json record = nullptr;
-    /// What a look afterwards found that belies a success; empty if nothing.
-    std::string doubt = {};
-    /// Why there was no such look although one was wanted; empty if there was.
-    std::string note = {};
-};
-
-/// Who wants to know how a command proceeds. Both functions may be empty.
-struct TaskWatch {
-    Ticker tick;
-    std::function<void(const nlohmann::json& reply)> onReply;
-};
-
-/// Runs a queued command: to its reply, or to its first outcome when `wait` is set.
-TaskResult runTask(const HostAddress& host, const TaskRequest& request, bool wait,
-                   const TaskWatch& watch = {});
+/// Runs a queued command on a host that keeps no tasks: its outcome comes as a row, and only while
+/// the host stays there. The result's record is null unless the host knows the task all the same.
+TaskResult runQueried(const HostAddress& host, const TaskRequest& request, Await await,
+                      const TaskWatch& watch = {});
 
 }  // namespace ctl

@@ -1,0 +1,79 @@
+/// A task in the host's journal, followed to its end whatever becomes of the connection.
+#pragma once
+
+#include <chrono>
+#include <nlohmann/json.hpp>
+#include <string>
+
+#include "ctl/client/deadline.h"
+#include "ctl/client/host_address.h"
+#include "ctl/client/host_client.h"
+#include "ctl/client/tasks/task_request.h"
+#include "ctl/client/tasks/task_result.h"
+
+namespace ctl {
+
+/// Its deadline is the host's time-out from when the object is made. While the host is not there,
+/// or does not serve for now, the object asks again until the deadline. Operations throw Failure
+/// for what no waiting mends.
+class JournalTask {
+public:
+    enum class Wait {
+        Reached,
+        TimedOut,
+        Forgotten,  ///< the host is there, but without this task
+    };
+
+    /// `watch` outlives the object. It calls `tick` and `onNote` while it waits.
+    JournalTask(const HostAddress& host, const TaskWatch& watch);
+
+    /// Has the host accept a request. Returns false when the host accepts no tasks: nothing was
+    /// done then. A host that has no room for now is asked again if `isPatient`. When the answer is
+    /// lost the host is asked again, unless it could take that for another request.
+    bool submit(const TaskRequest& request, bool isPatient);
+
+    /// Takes a task that the host has already, by its identifier or TRANSID.
+    void find(const std::string& name);
+
+    /// Waits until the task is over.
+    Wait awaitEnd();
+    /// The same for a second at most: Reached says no more than that the task is there.
+    Wait glance();
+    /// Waits until the first outcome is there, or the task is over without one.
+    Wait awaitFirstOutcome();
+    /// Waits until the plug-in has seen the task. Returns at once when others are before it.
+    void awaitReply();
+
+    /// Passes on what the commands write until the task is over. Returns false when the host went
+    /// away before there was anything: it may be asked again when it is back.
+    bool streamOutput();
+
+    bool isOver() const;
+    bool hasReply() const;
+    /// What the host said last; an object.
+    const nlohmann::json& record() const { return record_; }
+    Deadline deadline() const { return deadline_; }
+    std::chrono::milliseconds left() const;
+    std::chrono::milliseconds elapsed() const;
+
+private:
+    enum class Look { Seen, NotThere, TooLate, Forgotten };
+
+    void acceptedAs(const Answer& answer);
+    Look look(std::chrono::seconds wait);
+    bool isFirstInLine();
+    void pause(std::chrono::milliseconds time);
+    void note(const std::string& text);
+    void noteAway();
+    std::string path() const;
+
+    std::chrono::steady_clock::time_point begin_ = std::chrono::steady_clock::now();
+    HostClient client_;
+    std::string socket_;
+    Deadline deadline_;
+    const TaskWatch& watch_;
+    nlohmann::json record_ = nlohmann::json::object();
+    bool isAway_ = false;
+};
+
+}  // namespace ctl
