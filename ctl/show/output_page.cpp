@@ -6,12 +6,13 @@
 
 namespace ctl {
 
-Page outputPage(const std::string& stream, const std::string& text, Format format) {
-    const bool isError = stream == "stderr" || format == Format::Json;
-    const bool isTerminal = ::isatty(isError ? STDERR_FILENO : STDOUT_FILENO) == 1;
-    const std::string shown = isTerminal ? printableLines(text) : text;
+Page OutputPages::next(const std::string& stream, const std::string& text) {
+    const bool isError = stream == "stderr";
+    const std::string shown = (isError ? err_ : out_).feed(text);
+    const bool goesToError = isError || format_ == Format::Json;
+    const bool isTerminal = ::isatty(goesToError ? STDERR_FILENO : STDOUT_FILENO) == 1;
     Page page;
-    (isError ? page.err : page.out) = shown;
+    (goesToError ? page.err : page.out) = isTerminal ? printableLines(shown) : shown;
     page.isVerbatim = true;
     return page;
 }

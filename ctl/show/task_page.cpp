@@ -104,7 +104,7 @@ std::string stateLine(const std::string& title, const json& record,
                        " after " + elapsedText(elapsed);
     std::string reason = textOf(record, "reason");
     if (reason.empty()) reason = usualReason(state);
-    if (!reason.empty()) line += "; " + printable(reason);
+    if (!reason.empty()) line += "; " + redacted(reason);
     line += "\n";
     if (const std::string hint = textOf(record, "hint"); !hint.empty()) {
         line += "  " + printable(hint) + "\n";

@@ -68,7 +68,7 @@ std::string recordText(const json& record, WallTime now) {
             timeLine("ended    ", textOf(record, "ended"), now);
     for (const char* const words : {"reason", "hint"}) {
         const std::string value = textOf(record, words);
-        if (!value.empty()) text += "  " + printable(value) + "\n";
+        if (!value.empty()) text += "  " + redacted(value) + "\n";
     }
     const json result = resultOf(record);
     if (result.is_object() && returnCodeOf(result) != 0) text += "  " + describeRow(result) + "\n";

@@ -1,5 +1,7 @@
+// ctest-label: threaded
+//
 // zavctl on the host's journal: what it waits for outlives the connection and the host, and what it
-// asks for runs once. ctest-label: threaded
+// asks for runs once.
 
 #include <gmock/gmock.h>
 #include <signal.h>
@@ -19,6 +21,7 @@ using testing::ContainsRegex;
 using testing::ElementsAre;
 using testing::HasSubstr;
 using Guards = ManagedHost::Guards;
+using Words = std::vector<std::string>;
 
 class ControlJournal : public testing::Test {
 protected:
@@ -54,6 +57,14 @@ protected:
     std::unique_ptr<Program> install(int code) const {
         return host->startZavctl({"install", "ux", "060100", "--transid", "T", "--no-verify", "--",
                                   "/bin/sh", installer(code)});
+    }
+    /// The words of an install whose command writes before the gate opens and behind it.
+    Words talkingInstall(const std::string& transid) const {
+        const std::string script =
+            home.files().script("depot/talk.sh", "echo one; echo password=hidden; echo two >&2\n" +
+                                                     untilReleased(gate()) + "echo three\n");
+        return {"install", "ux", "060100",  "--no-verify", "--transid",
+                transid,   "--", "/bin/sh", script};
     }
     bool awaitRun() const {
         return eventually([&] { return home.files().read("runs") == "run\n"; });
@@ -258,6 +269,55 @@ TEST_F(ControlJournal, AQueueThatIsFullIsWaitedForOrIsAFailure) {
     openGate();
     EXPECT_EQ(waiting->wait().status, 0);
     EXPECT_EQ(stateOf("T"), "done");
+}
+
+// ---- Output and running tasks -------------------------------------------------------------------
+
+TEST_F(ControlJournal, OutputIsShownWhileTheCommandsRunIfItIsWanted) {
+    start();
+    Words line = {zavctlPath(), "--socket", host->socket(), "-v"};
+    const Words install = talkingInstall("T");
+    line.insert(line.end(), install.begin(), install.end());
+    Program waiting(line);
+    ASSERT_TRUE(waiting.awaitOutput("install ux (T): accepted\none\n", std::chrono::seconds(20)));
+    openGate();
+    const ProgramResult result = waiting.wait();
+    EXPECT_EQ(result.status, 0) << result.err;
+    EXPECT_THAT(result.out, ContainsRegex("^install ux \\(T\\): accepted\none\n(.*\n)*three\n"
+                                          "install ux \\(T\\): done after"));
+    EXPECT_THAT(result.err, HasSubstr("two\n"));
+    const ProgramResult quiet = zavctl(talkingInstall("quiet"));
+    EXPECT_THAT(quiet.out, testing::Not(HasSubstr("three")));
+}
+
+TEST_F(ControlJournal, OutputCanBeAskedForAndFollowed) {
+    start();
+    const auto waiting = host->startZavctl(talkingInstall("T"));
+    ASSERT_TRUE(eventually([&] { return stateOf("T") == "running"; }));
+    Program following({zavctlPath(), "--socket", host->socket(), "task", "output", "-f", "T"});
+    ASSERT_TRUE(following.awaitOutput("password=***\n", std::chrono::seconds(20)));
+    openGate();
+    const ProgramResult result = following.wait();
+    EXPECT_EQ(result.status, 0) << result.err;
+    EXPECT_EQ(result.out, "one\npassword=***\nthree\n");
+    EXPECT_EQ(result.err, "two\n");
+    EXPECT_EQ(waiting->wait().status, 0);
+    EXPECT_EQ(zavctl({"task", "output", "T"}).out, result.out) << "what was kept";
+    const json pieces = document({"task", "output", "T"})["output"];
+    EXPECT_EQ(pieces.at(0)["stream"], "stdout");
+    EXPECT_EQ(zavctl({"task", "output", "unknown"}).status, 2);
+}
+
+TEST_F(ControlJournal, WhatRunsCanBeEnded) {
+    start();
+    const auto waiting = install(0);
+    ASSERT_TRUE(awaitRun());
+    const ProgramResult cancelled = zavctl({"task", "cancel", "T"});
+    EXPECT_EQ(cancelled.status, 0) << cancelled.err;
+    EXPECT_EQ(cancelled.out, "install ux (T): cancelled\n");
+    const ProgramResult result = waiting->wait();
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(json::parse(result.out)["task"]["state"], "cancelled");
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 #include "ctl/client/tasks/journal_task.h"
 
 #include <algorithm>
+#include <optional>
 #include <thread>
 #include <utility>
 
@@ -108,35 +109,42 @@ void JournalTask::acceptedAs(const Answer& answer) {
     throw Failure(kNoHost, "the host's answer is no task");
 }
 
+/// The host's answer. Nothing when there was none and the host may be asked again.
+std::optional<Answer> JournalTask::send(const TaskRequest& request, Sending& sending) {
+    try {
+        Answer answer = client_.post(kTasks, request.document(), deadline_, watch_.tick);
+        sending.isReached = true;
+        return answer;
+    } catch (const BrokenConnection&) {
+        if (!request.isUnique && !request.isOnce) throw answerLost(request);
+        if (left() <= kPause) throw;
+        sending.isLost = true;
+    } catch (const Failure& failure) {
+        // A host that was never there is not waited for.
+        const bool wasThere = sending.isReached || sending.isLost;
+        if (!wasThere || failure.status() != kNoHost || left() <= kPause) throw;
+    }
+    noteAway();
+    pause(kPause);
+    return std::nullopt;
+}
+
 bool JournalTask::submit(const TaskRequest& request, bool isPatient) {
-    bool isReached = false;
-    bool isLost = false;
+    Sending sending;
     bool isToldToWait = false;
     for (;;) {
-        try {
-            const Answer answer = client_.post(kTasks, request.document(), deadline_, watch_.tick);
-            isReached = true;
-            if (isUnknownToHost(answer.status) && !isLost) return false;
-            const bool isLater = isPatient && answer.retryAfter && isServedLater(answer.status);
-            if (!isLater || left() <= *answer.retryAfter) {
-                acceptedAs(answer);
-                return true;
-            }
-            if (!isToldToWait) note("the host has no room for the request now; asking again");
-            isToldToWait = true;
-            pause(std::max<milliseconds>(*answer.retryAfter, kPause));
-        } catch (const BrokenConnection&) {
-            if (!request.isUnique && !request.isOnce) throw answerLost(request);
-            if (left() <= kPause) throw;
-            isLost = true;
-            noteAway();
-            pause(kPause);
-        } catch (const Failure& failure) {
-            // A host that was never there is not waited for.
-            if (!(isReached || isLost) || failure.status() != kNoHost || left() <= kPause) throw;
-            noteAway();
-            pause(kPause);
+        const std::optional<Answer> answer = send(request, sending);
+        if (!answer) continue;
+        if (isUnknownToHost(answer->status) && !sending.isLost) return false;
+        const bool isLater = isPatient && answer->retryAfter && isServedLater(answer->status);
+        if (!isLater || left() <= *answer->retryAfter) {
+            acceptedAs(*answer);
+            isAway_ = false;
+            return true;
         }
+        if (!isToldToWait) note("the host has no room for the request now; asking again");
+        isToldToWait = true;
+        pause(std::max<milliseconds>(*answer->retryAfter, kPause));
     }
 }
 
@@ -151,16 +159,9 @@ void JournalTask::find(const std::string& name) {
 JournalTask::Look JournalTask::look(seconds wait) {
     const std::string target =
         path() + (wait.count() > 0 ? "?wait=" + std::to_string(wait.count()) : std::string());
+    Answer answer;
     try {
-        const Answer answer = client_.ask(target, deadline_, watch_.tick);
-        if (answer.status == 404) return Look::Forgotten;
-        if (isServedLater(answer.status)) {
-            pause(kPause);
-            return Look::NotThere;
-        }
-        acceptedAs(answer);
-        isAway_ = false;
-        return Look::Seen;
+        answer = client_.ask(target, deadline_, watch_.tick);
     } catch (const Failure& failure) {
         if (failure.status() == kNoOutcome) return Look::TooLate;
         if (failure.status() != kNoHost) throw;
@@ -168,6 +169,14 @@ JournalTask::Look JournalTask::look(seconds wait) {
         pause(kPause);
         return Look::NotThere;
     }
+    if (answer.status == 404) return Look::Forgotten;
+    if (isServedLater(answer.status)) {
+        pause(kPause);
+        return Look::NotThere;
+    }
+    acceptedAs(answer);
+    isAway_ = false;
+    return Look::Seen;
 }
 
 JournalTask::Wait JournalTask::awaitEnd() {

@@ -3,6 +3,7 @@
 
 #include <chrono>
 #include <nlohmann/json.hpp>
+#include <optional>
 #include <string>
 
 #include "ctl/client/deadline.h"
@@ -52,13 +53,19 @@ public:
     bool hasReply() const;
     /// What the host said last; an object.
     const nlohmann::json& record() const { return record_; }
-    Deadline deadline() const { return deadline_; }
     std::chrono::milliseconds left() const;
     std::chrono::milliseconds elapsed() const;
 
 private:
     enum class Look { Seen, NotThere, TooLate, Forgotten };
 
+    /// How far a request has come.
+    struct Sending {
+        bool isReached = false;  ///< the host has answered once
+        bool isLost = false;     ///< an answer was lost: the host may have the task
+    };
+
+    std::optional<Answer> send(const TaskRequest& request, Sending& sending);
     void acceptedAs(const Answer& answer);
     Look look(std::chrono::seconds wait);
     bool isFirstInLine();

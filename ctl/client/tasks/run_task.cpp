@@ -112,6 +112,23 @@ TaskResult awaitFirstOutcome(JournalTask& task, ReplyTeller& reply) {
     return resultOf(task, wait);
 }
 
+/// The row with the own result of an install that ended while the host was away, which the host
+/// keeps no row of. Asking for it changes nothing. One that says otherwise than the host is of
+/// another install, or of none.
+void takeCompletion(const HostAddress& host, std::chrono::milliseconds time, TaskResult& result) {
+    const std::string state = textOf(result.record, "state");
+    if (state != "done" && state != "failed") return;
+    try {
+        const TaskRequest request = completeInstallRequest(makeTransid());
+        const json rows = HostClient(host.socket).query(request.query(), deadlineIn(time)).rows;
+        if (rows.empty() || (returnCodeOf(rows.front()) == 0) != (state == "done")) return;
+        result.completion = rows.front();
+        result.end = End::Outcome;
+    } catch (const Failure&) {
+        // How the install ended is known without it.
+    }
+}
+
 /// An install that restarts the host, to its own end.
 TaskResult awaitCompletion(const HostAddress& host, JournalTask& task, ReplyTeller& reply,
                            const TaskWatch& watch) {
@@ -121,10 +138,8 @@ TaskResult awaitCompletion(const HostAddress& host, JournalTask& task, ReplyTell
     result = resultOf(task, awaitEnd(task, reply, watch));
     if (result.events.size() > 1) {
         result.completion = result.events.back();
-    } else if (textOf(result.record, "state") == "interrupted") {
-        // The host lost sight of it; the plug-in has its result, or soon will.
-        result.completion = fetchInstallOutcome(host.socket, task.deadline(), watch.tick);
-        result.end = End::Outcome;
+    } else if (task.isOver()) {
+        takeCompletion(host, task.left(), result);
     }
     return result;
 }

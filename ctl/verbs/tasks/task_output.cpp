@@ -53,8 +53,9 @@ ExitStatus takeOutput(const Invocation& invocation, const Take& take) {
 ExitStatus run(const Invocation& invocation) {
     const InterruptNote ending({});
     if (invocation.format == Format::Text) {
-        return takeOutput(invocation, [](const json& piece) {
-            print(outputPage(textOf(piece, "stream"), textOf(piece, "text"), Format::Text));
+        OutputPages pages(Format::Text);
+        return takeOutput(invocation, [&pages](const json& piece) {
+            print(pages.next(textOf(piece, "stream"), textOf(piece, "text")));
             return std::ferror(stdout) == 0;
         });
     }

@@ -3,7 +3,6 @@
 #include <utility>
 
 #include "ctl/client/failure.h"
-#include "ctl/show/output_page.h"
 #include "ctl/show/shell_quoted.h"
 #include "ctl/show/task_page.h"
 #include "ctl/verbs/arguments/global_arguments.h"
@@ -39,6 +38,7 @@ Waiting::Waiting(const Invocation& invocation, const std::string& title, std::st
       isVerbose_(invocation.given.flag(kVerbose)),
       transid_(std::move(transid)),
       clock_(title, invocation.format == Format::Text),
+      output_(format_),
       note_(notAcceptedYet(transid_, format_).err, notAcceptedYet(transid_, format_).out) {}
 
 TaskWatch Waiting::watch() {
@@ -68,7 +68,7 @@ void Waiting::accepted(const std::string& id) {
 
 void Waiting::showOutput(const std::string& stream, const std::string& text) {
     hasOutput_ = true;
-    show(outputPage(stream, text, format_));
+    show(output_.next(stream, text));
 }
 
 }  // namespace ctl

@@ -5,6 +5,7 @@
 
 #include "ctl/client/interruption.h"
 #include "ctl/client/tasks/task_result.h"
+#include "ctl/show/output_page.h"
 #include "ctl/show/page.h"
 #include "ctl/show/running_clock.h"
 #include "ctl/verbs/invocation.h"
@@ -37,6 +38,7 @@ private:
     bool isVerbose_;
     std::string transid_;
     RunningClock clock_;
+    OutputPages output_;
     bool hasOutput_ = false;  ///< the clock would stand in the middle of it
     InterruptNote note_;
 };

@@ -19,6 +19,9 @@
 #include "ctl/verbs/query.h"
 #include "ctl/verbs/status.h"
 #include "ctl/verbs/tasks/complete_install.h"
+#include "ctl/verbs/tasks/task_cancel.h"
+#include "ctl/verbs/tasks/task_wait.h"
+#include "ctl/verbs/tasks/tasks.h"
 #include "ctl/verbs/version.h"
 
 namespace {
@@ -192,6 +195,18 @@ TEST(OddDocuments, OfTasksAreShown) {
     tryAllVariants(kTask, [](const json& document, Format) {
         return Page{ctl::recordText(document, {}), ctl::workText(document, {})};
     });
+    tryAllVariants(kTask, [](const json& document, Format format) {
+        return ctl::showTasks({{"tasks", json::array({document})}, {"next", nullptr}}, {}, format);
+    });
+    tryAllVariants(kTask, ctl::showCancelled);
+    for (const auto end : {ctl::TaskResult::End::Over, ctl::TaskResult::End::TimedOut}) {
+        tryAllVariants(kTask, [end](const json& document, Format format) {
+            ctl::TaskResult result;
+            result.end = end;
+            result.record = document;
+            return ctl::showAwaited(result, format);
+        });
+    }
     tryAllVariants({{"row", kRow}, {"record", kTask}}, [](const json& document, Format format) {
         const auto member = [&document](const char* name) {
             return document.is_object() && document.contains(name) ? document[name] : json();

@@ -176,6 +176,15 @@ TEST(RunTask, EndsWithARefusalThatNoWaitingMends) {
     }
 }
 
+TEST(RunTask, DoesNotRepeatItselfToAHostThatMakesNoSense) {
+    for (const json& senseless : {json::array(), json::object(), json{{"id", ""}}}) {
+        const TurnHost host({answers(202, senseless)});
+        EXPECT_EQ(failureOf(host, request()).first, ctl::kNoHost);
+        const TurnHost later({answers(202, kQueued), answers(200, senseless)});
+        EXPECT_EQ(failureOf(later, request()).first, ctl::kNoHost);
+    }
+}
+
 TEST(RunTask, SendsAQueryToAHostThatKeepsNoTasks) {
     for (const int unknown : {404, 405}) {
         TurnHost host(
@@ -321,9 +330,23 @@ TEST(RunTask, FollowsAnInstallThroughTheRestartToItsOwnResult) {
 TEST(RunTask, KnowsOfAnInstallThatFailedWhileTheHostWasAway) {
     json failed = task("failed", kReply, json::array({kRow}));
     failed["reason"] = "it ended with 9";
-    const TurnHost host({answers(202, kQueued), answers(200, kBegun), answers(200, failed)});
+    const json row = {{"RETVAL", 1031}};
+    TurnHost host({answers(202, kQueued), answers(200, kBegun), answers(200, failed),
+                   answers(200, {{"rows", json::array({row})}})});
+    const TaskResult result = ctl::runTask(host.address(), restartingInstall(), Await::End);
+    EXPECT_EQ(result.end, End::Outcome);
+    EXPECT_EQ(result.completion, row);
+    EXPECT_EQ(host.targets().at(3), "POST /v1/query");
+}
+
+TEST(RunTask, TakesTheHostsWordForHowAnInstallEndedWhileItWasAway) {
+    json failed = task("failed", kReply, json::array({kRow}));
+    failed["reason"] = "no number";
+    const TurnHost host({answers(202, kQueued), answers(200, kBegun), answers(200, failed),
+                         answers(200, {{"rows", json::array({kRow})}})});
     const TaskResult result = ctl::runTask(host.address(), restartingInstall(), Await::End);
     EXPECT_EQ(result.end, End::Over) << "the only row says that it has begun";
+    EXPECT_EQ(result.completion, json());
 }
 
 TEST(RunTask, DoesNotSayThatAnInstallHasBegunThatHasNot) {
