@@ -3,11 +3,12 @@
 #include <unistd.h>
 
 #include <csignal>
+#include <cstdint>
 #include <cstdio>
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/http/bounded_json.h"
-#include "ctl/client/http/event_stream.h"
+#include "ctl/client/resumed_events.h"
 #include "ctl/client/row.h"
 #include "ctl/show/message_catalogue.h"
 #include "ctl/show/printable.h"
@@ -23,7 +24,10 @@ namespace {
 constexpr Argument kOnlyTransid =
     textOption("--transid", "Only this transaction").completedBy(Completion::Transaction);
 constexpr Argument kCount = numberOption("--count", "End after so many").between(1, 1e9);
-constexpr Argument kArguments[] = {kOnlyTransid, kCount};
+constexpr Argument kSince =
+    textOption("--since", "Begin behind the event with this identifier").called("ID");
+constexpr Argument kIds = flag("--ids", "Show the identifier of each event");
+constexpr Argument kArguments[] = {kOnlyTransid, kCount, kSince, kIds};
 
 /// Shells know a program that was ended by a signal by this status.
 constexpr int kSignalled = 128;
@@ -53,9 +57,10 @@ public:
     EventPrinter(const EventPrinter&) = delete;
     EventPrinter& operator=(const EventPrinter&) = delete;
 
-    /// Returns false when nobody reads the output any more.
-    bool add(const json& row) {
-        print({showEvent(row, count_ == 0, format_), {}});
+    /// `id` is shown beside the row unless it is empty. Returns false when nobody reads the output
+    /// any more.
+    bool add(const json& row, const std::string& id) {
+        print({showEvent(row, count_ == 0, format_, id), {}});
         ++count_;
         return std::ferror(stdout) == 0;
     }
@@ -76,7 +81,9 @@ ExitStatus atTimeOut(unsigned count, unsigned wanted) {
 }
 
 /// Prints up to `wanted` events; without end if it is 0.
-ExitStatus streamEvents(EventStream& stream, EventPrinter& printer, unsigned wanted, Deadline end) {
+ExitStatus streamEvents(ResumedEvents& stream, EventPrinter& printer, const Values& given,
+                        Deadline end) {
+    const unsigned wanted = given.number(kCount);
     while (wanted == 0 || printer.count() < wanted) {
         ServerEvent event;
         const auto result = stream.next(end, event);
@@ -85,20 +92,28 @@ ExitStatus streamEvents(EventStream& stream, EventPrinter& printer, unsigned wan
             return print({{}, complaint("the host closed the stream"), kNoHost});
         }
         if (event.type != "message") {
-            print({{}, complaint(event.type + ": " + event.data)});
+            print({{}, complaint(wordsFor(event))});
             continue;
         }
         const json row = objectIn(event.data);
-        if (row.is_object() && !printer.add(row)) break;
+        const std::string id = given.flag(kIds) ? event.id : std::string();
+        if (row.is_object() && !printer.add(row, id)) break;
     }
     return kSuccess;
+}
+
+void sayThatItIsLost() {
+    print({{}, complaint("the connection to the host is lost; trying again")});
 }
 
 ExitStatus run(const Invocation& invocation) {
     const Values& given = invocation.given;
     std::vector<std::pair<std::string, std::string>> where;
     if (!given.text(kOnlyTransid).empty()) where.emplace_back("TRANSID", given.text(kOnlyTransid));
-    EventStream stream(invocation.host.socket, "KAGDYST", where, invocation.deadline());
+    ResumedEvents stream(
+        {invocation.host.socket, where, given.text(kSince), invocation.host.timeout},
+        invocation.deadline());
+    stream.onLoss = sayThatItIsLost;
     const bool isJson = invocation.format == Format::Json;
     std::signal(SIGINT, isJson ? endDocument : endStream);
     std::signal(SIGTERM, isJson ? endDocument : endStream);
@@ -106,7 +121,7 @@ ExitStatus run(const Invocation& invocation) {
     const Deadline end = given.has(kTimeout) ? invocation.deadline() : Deadline::max();
     EventPrinter printer(invocation.format);
     try {
-        return streamEvents(stream, printer, given.number(kCount), end);
+        return streamEvents(stream, printer, given, end);
     } catch (const Failure& failure) {
         // As JSON the document has begun already, and there is only one.
         return print(failurePage(failure, Format::Text));
@@ -121,11 +136,27 @@ constexpr Verb kEventsVerb = {
     run,
 };
 
-std::string showEvent(const json& row, bool isFirst, Format format) {
-    if (format == Format::Json) {
-        return std::string(isFirst ? "" : ",") + "\n  " + jsonLine(row);
+std::string wordsFor(const ServerEvent& event) {
+    if (event.type != "gap") return event.type + ": " + event.data;
+    const json gap = objectIn(event.data);
+    const auto missing = gap.find("missing");
+    if (missing == gap.end() || !missing->is_number_unsigned()) {
+        return "the host does not know that identifier: it has another journal. Some events may be "
+               "missing; those that it keeps follow";
     }
-    std::string line = textOf(row, "TRANSID") + "  " + textOf(row, "COMMAND") + "  ";
+    const auto count = missing->get<std::uint64_t>();
+    return std::to_string(count) + (count == 1 ? " event is" : " events are") +
+           " missing here: the host does not keep " + (count == 1 ? "it" : "them") + " any more";
+}
+
+std::string showEvent(const json& row, bool isFirst, Format format, const std::string& id) {
+    if (format == Format::Json) {
+        json shown = row;
+        if (!id.empty()) shown["id"] = id;
+        return std::string(isFirst ? "" : ",") + "\n  " + jsonLine(shown);
+    }
+    std::string line = id.empty() ? "" : id + "  ";
+    line += textOf(row, "TRANSID") + "  " + textOf(row, "COMMAND") + "  ";
     line += returnCodeOf(row) == 0 ? "done" : "failed; " + describeRow(row);
     const std::string target = textOf(row, "TARGETMSN");
     if (!target.empty()) line += "  target " + target;

@@ -22,7 +22,10 @@ std::vector<Route> routes() {
 
         {"GET", "/v1/events", "Streams the rows of a table as they come.",
          Access::Read, Runs::OnWorker, getEvents,
-         {{"table", Type::Text, Need::Required, "the name of the table"}}, Others::Columns},
+         {{"table", Type::Text, Need::Required, "the name of the table"},
+          {"after", Type::Text, Need::Optional, "of outcomes: the event after which to continue"},
+          {"tasks", Type::Flag, Need::Optional, "of outcomes: 1 sends the ends of tasks, too"}},
+         Others::Columns},
 
         {"POST", "/v1/tasks", "Accepts a command for its turn.",
          Access::Act, Runs::OnWorker, postTask, {}, Others::None,

@@ -8,6 +8,7 @@
 #include <utility>
 #include <vector>
 
+#include "host/api/events/event_pump.h"
 #include "host/checks/check.h"
 #include "host/commands/ear.h"
 #include "host/depot/depot.h"
@@ -73,6 +74,7 @@ struct Services {
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
     ServerCounts counts;
     Journal journal;
+    EventPump events{journal};
     OutcomeFeed outcomes{tables};
     TaskList tasks{tables, outcomes, journal, guarded};
     TaskWatch watch{tables, outcomes};

@@ -35,6 +35,10 @@ bool begins(std::string_view text, std::string_view with) {
     return text.substr(0, with.size()) == with;
 }
 
+bool contains(std::string_view text, std::string_view word) {
+    return text.find(word) != std::string_view::npos;
+}
+
 /// The rest of a text that begins so; nothing if it does not.
 std::optional<std::string_view> after(std::string_view text, std::string_view beginning) {
     if (!begins(text, beginning)) return std::nullopt;
@@ -60,6 +64,12 @@ std::int64_t nanoseconds() {
 WallClock::time_point wallTime(std::int64_t sinceEpoch) {
     return WallClock::time_point(
         std::chrono::duration_cast<WallClock::duration>(std::chrono::nanoseconds(sinceEpoch)));
+}
+
+/// Not before: a line tells where the output of an install goes.
+void maskLines(std::vector<Command>& commands) {
+    for (Command& command : commands)
+        command.line = secrets::masked(command.line);
 }
 
 }  // namespace
@@ -171,6 +181,10 @@ void Recorder::begin(std::string_view line) {
     open_ = true;
     static std::atomic<std::uint64_t> commandsHeard{0};
     command.number = ++commandsHeard;
+    hidesOutput_ =
+        contains(line, trace::kReadsConfiguration) || contains(line, trace::kWritesConfiguration);
+    out_ = {};
+    err_ = {};
     command.line = line.substr(0, kLongestLine);
     command.started = WallClock::now();
     others_.output.clear();
@@ -203,20 +217,24 @@ void Recorder::endForOutput() {
 }
 
 void Recorder::keep(std::string_view text, bool isError) {
-    const std::optional<OutputPiece> piece = store(text, isError);
+    std::string shown;
+    const std::optional<OutputPiece> piece = store(text, isError, shown);
     if (!piece) return;
-    if (sink_) sink_(*piece);
+    if (sink_ && !shown.empty()) sink_(*piece);
     count(text.size());
 }
 
-std::optional<OutputPiece> Recorder::store(std::string_view text, bool isError) {
+/// Sets `shown` to what of the text may be kept and shown; the piece that it returns is that.
+std::optional<OutputPiece> Recorder::store(std::string_view text, bool isError,
+                                           std::string& shown) {
     const embedded::MutexLock lock(lock_);
     if (!open_) return std::nullopt;
     Command& command = commands_.back();
+    shown = isError ? err_.feed(text) : hidesOutput_ ? std::string() : out_.feed(text);
     Tail& tail = isError ? command.err : command.out;
-    tail.append(text);
+    tail.append(shown);
     if (!isError && outputBytes_ != 0) keepWhole(text);
-    return OutputPiece{command.number, isError, text, tail.total()};
+    return OutputPiece{command.number, isError, shown, tail.total()};
 }
 
 void Recorder::keepWhole(std::string_view text) {
@@ -284,6 +302,7 @@ Heard Recorder::take() {
     open_ = false;
     written_ = 0;
     heard.tooMuchOutput = ending_.tooMuch.exchange(false);
+    maskLines(heard.commands);
     return heard;
 }
 
@@ -324,6 +343,7 @@ std::vector<Command> Recorder::commands() const {
     lock.unlock();
     if (running) addRestartOutput(found.back());
     lock.lock();
+    maskLines(found);
     return found;
 }
 

@@ -15,17 +15,19 @@
 #include "embedded/mutex.h"
 #include "embedded/ras1_listener.h"
 #include "host/commands/command.h"
+#include "secrets/masked.h"
 
 namespace host {
 
-/// What has been heard on a thread.
+/// What has been heard on a thread. The texts of the commands are masked: they hold no values of
+/// passwords and the like, and no configuration.
 struct Heard {
     std::vector<Command> commands;  ///< in their order; of very many only the last ones
     /// RETVAL of the last request that was answered.
     std::optional<int> answer;
     /// What the inventory program printed is no inventory.
     bool noInventory = false;
-    /// The last command's whole standard output, if it was asked for.
+    /// The last command's whole standard output as it came, if it was asked for.
     std::string output;
     bool outputComplete = true;  ///< false: the output was longer than it is kept
     /// The commands wrote more than they may, and were ended.
@@ -94,7 +96,7 @@ private:
     void begin(std::string_view line);
     void keep(std::string_view piece, bool isError);
     void keepWhole(std::string_view piece) ZAV_REQUIRES(lock_);
-    std::optional<OutputPiece> store(std::string_view piece, bool isError);
+    std::optional<OutputPiece> store(std::string_view piece, bool isError, std::string& shown);
     void count(std::size_t bytes);
     void endForOutput();
     void waitForEnd(pid_t pid, bool onlyLook);
@@ -116,7 +118,10 @@ private:
     Ending ending_;
     mutable embedded::Mutex lock_;  // never held in a child, nor while waiting
     std::deque<Command> commands_ ZAV_GUARDED_BY(lock_);
-    bool open_ ZAV_GUARDED_BY(lock_) = false;   ///< the last command has not ended
+    bool open_ ZAV_GUARDED_BY(lock_) = false;         ///< the last command has not ended
+    bool hidesOutput_ ZAV_GUARDED_BY(lock_) = false;  ///< its output is a configuration
+    secrets::Masker out_ ZAV_GUARDED_BY(lock_);       ///< of its texts, as far as they have come
+    secrets::Masker err_ ZAV_GUARDED_BY(lock_);
     bool reaped_ ZAV_GUARDED_BY(lock_) = true;  ///< its process may have been reaped
     pid_t thread_ ZAV_GUARDED_BY(lock_) = 0;    ///< the thread's number in the system
     std::vector<pid_t> orphansBeforeFirst_ ZAV_GUARDED_BY(lock_);

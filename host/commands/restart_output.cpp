@@ -10,6 +10,7 @@
 
 #include "host/commands/trace_texts.h"
 #include "host/process/file_descriptor.h"
+#include "secrets/masked.h"
 
 namespace host {
 namespace {
@@ -18,11 +19,12 @@ void addEnd(const std::string& path, Tail& tail) {
     const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_CLOEXEC));
     struct stat found {};
     if (!file || ::fstat(file.get(), &found) != 0 || !S_ISREG(found.st_mode)) return;
-    constexpr off_t kEnd = Tail::kBytes;
-    char bytes[Tail::kBytes];
+    // More than is kept: a secret that begins before the end of the file that is kept is one, too.
+    constexpr off_t kEnd = 2 * Tail::kBytes;
+    char bytes[kEnd];
     const off_t from = std::max<off_t>(0, found.st_size - kEnd);
     const ssize_t got = ::pread(file.get(), bytes, sizeof bytes, from);
-    if (got > 0) tail.append({bytes, static_cast<std::size_t>(got)});
+    if (got > 0) tail.append(secrets::masked({bytes, static_cast<std::size_t>(got)}));
 }
 
 }  // namespace

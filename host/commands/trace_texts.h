@@ -21,6 +21,10 @@ inline constexpr char kInventoryUnit[] = "zav03agt";
 /// Followed by the command line and kCommandEnd.
 inline constexpr std::string_view kCommand = "Command to run is \"";
 inline constexpr std::string_view kCommandEnd = "\"";
+/// In the command line of the translator when it reads or writes a configuration: what it prints
+/// then is one, or may repeat one.
+inline constexpr std::string_view kReadsConfiguration = "/zav_xa -g ";
+inline constexpr std::string_view kWritesConfiguration = "/zav_xa -p ";
 /// The process was not started at all.
 inline constexpr std::string_view kNotStarted = "Failed to start process for cmd ";
 /// Followed by a piece of the standard output, or of the standard error, as it was read.

@@ -25,12 +25,16 @@ public:
     /// I/O thread.
     virtual std::string take() = 0;
 
-    /// Whether take() would return nothing. I/O thread.
+    /// Whether all that has been published so far has been taken. I/O thread.
     virtual bool empty() const = 0;
 
     /// Whether nothing more will ever come: the stream then ends once everything is sent. `wake`
     /// has been called since that is so. I/O thread.
     virtual bool over() const { return false; }
+
+    /// What a client that gets no event at all names to continue; empty if this source numbers no
+    /// events. One line. I/O thread.
+    virtual std::string position() const { return {}; }
 };
 
 /// One event. Texts that are empty are left out.

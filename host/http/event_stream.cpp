@@ -58,6 +58,8 @@ void EventStream::writeHead() {
     head_.version(11);
     head_.set(http::field::content_type, "text/event-stream");
     head_.set(http::field::cache_control, "no-cache");
+    const std::string position = source_->position();
+    if (!position.empty()) head_.set("Last-Event-ID", position);
     head_.keep_alive(false);  // the stream is as long as the connection
     headWriter_.emplace(head_);
     http::async_write_header(

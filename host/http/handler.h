@@ -39,6 +39,7 @@ struct Request {
     std::string target;
     std::string body;
     Peer peer;
+    std::string lastEventId{};  ///< the field of this name; empty if there is none
 };
 
 /// The application behind a server. Everything is called on the I/O thread and must not block.

@@ -10,14 +10,15 @@
 #include "host/journal/keyed_hash.h"
 #include "host/journal/schema.h"
 #include "host/journal/task_rows.h"
+#include "host/outcomes/packed_row.h"
 #include "host/process/start_error.h"
 
 namespace host {
 namespace {
 
 constexpr std::chrono::seconds kRetry{1};
-/// So many changes of tasks lie between two looks at what is too old.
-constexpr unsigned kPruneEvery = 1000;
+/// So many events lie between two looks at what is too old.
+constexpr std::size_t kPruneEvery = 1000;
 /// Of so many finished tasks the ends of the outputs are kept.
 constexpr int kKeptTails = 1000;
 
@@ -32,10 +33,13 @@ void removeOld(Database& database, std::int64_t endedBefore, int rows) {
                         endedBefore);
     }
     database.change("DELETE FROM tasks WHERE ended IS NOT NULL AND ended < ?", endedBefore);
-    database.change(
-        "DELETE FROM outcomes WHERE id <= (SELECT max(id) FROM outcomes) - ? AND "
-        "(task IS NULL OR task NOT IN (SELECT number FROM tasks WHERE ended IS NULL))",
-        rows);
+    for (const EventKind kind : {EventKind::Row, EventKind::TaskEnd}) {
+        database.change(
+            "DELETE FROM outcomes WHERE kind = ?1 AND id <= "
+            "(SELECT id FROM outcomes WHERE kind = ?1 ORDER BY id DESC LIMIT 1 OFFSET ?2) AND "
+            "(task IS NULL OR task NOT IN (SELECT number FROM tasks WHERE ended IS NULL))",
+            static_cast<int>(kind), rows);
+    }
     database.change(
         "UPDATE commands SET out = x'', err = x'' WHERE task IN (SELECT number FROM tasks "
         "WHERE ended IS NOT NULL ORDER BY ended DESC LIMIT -1 OFFSET ?) "
@@ -50,6 +54,22 @@ std::string described(const Recovered& recovered) {
                 (recovered.runsAgain ? " and runs again; " : "; ");
     }
     return text + std::to_string(recovered.waiting) + " tasks wait";
+}
+
+std::int64_t newestEvent(Database& database) {
+    return database.number("SELECT seq FROM sqlite_sequence WHERE name = 'outcomes'");
+}
+
+std::vector<JournalEvent> eventsIn(Database& database, std::int64_t after, std::int64_t most) {
+    std::vector<JournalEvent> events;
+    Statement found = database.ask(
+        "SELECT id, kind, coalesce(task, 0), row FROM outcomes WHERE id > ? ORDER BY id LIMIT ?",
+        after, most);
+    while (found.step()) {
+        events.push_back({found.integer(0), static_cast<EventKind>(found.integer(1)),
+                          found.integer(2), unpackRow(found.bytes(3))});
+    }
+    return events;
 }
 
 /// The first task with this TRANSID that answers its repetitions.
@@ -82,7 +102,11 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
         throw StartError("cannot use the journal in " + settings_.directory + ": " + error.what());
     }
     if (recovered_.waiting > 0 || !recovered_.interrupted.empty()) warn(described(recovered_));
-    writer_ = std::make_unique<Writer>(*database_, reader_ ? nullptr : &readLock_);
+    events_.emplace(newestEvent(*database_));
+    writer_ = std::make_unique<Writer>(
+        *database_, reader_ ? nullptr : &readLock_,
+        Writer::Watch{[this] { asGiven_.clear(); },
+                      [this](Database& database) { tellOfEvents(database); }});
     prune();
 }
 
@@ -193,21 +217,41 @@ void Journal::saveSoon(Task task) {
     writer_->submitLater(updateOf({std::move(task)}));
 }
 
-void Journal::saveOutcome(const std::vector<Task>& tasks) {
+void Journal::saveOutcome(const std::vector<Task>& tasks, const std::string& row) {
     const Task& over = tasks.front();
     const bool handsOver = handsOver_.load() && isOver(over.state) && over.way == TaskWay::Journal;
     const auto next = std::make_shared<std::int64_t>(0);
-    commitOutcome([update = updateOf(tasks), handsOver, next, this](Database& database) {
+    commitOutcome([update = updateOf(tasks), number = over.number, row, handsOver, next,
+                   this](Database& database) {
         update(database);
+        asGiven_[newestRow(database, number)] = row;
         *next = handsOver ? handOverNext(database) : 0;
     });
     if (*next != 0) handedOver_.store(*next);
-    const embedded::MutexLock lock(troubleLock_);
-    if (++sincePrune_ % kPruneEvery == 0) prune();
 }
 
-void Journal::keepRow(const std::string& row) {
-    commitOutcome([row](Database& database) { insertRow(database, row); });
+void Journal::keepRow(const std::string& kept, const std::string& row) {
+    commitOutcome([this, kept, row](Database& database) {
+        insertRow(database, kept);
+        asGiven_[database.lastInserted()] = row;
+    });
+}
+
+/// On the writer's thread, after each transaction.
+void Journal::tellOfEvents(Database& database) {
+    constexpr std::int64_t kAll = -1;
+    std::vector<JournalEvent> events = eventsIn(database, events_->last(), kAll);
+    if (events.empty()) return;
+    for (JournalEvent& event : events) {
+        const auto given = asGiven_.find(event.number);
+        if (given != asGiven_.end()) event.row = std::move(given->second);
+    }
+    events_->append(events);
+    sincePrune_ += events.size();
+    if (sincePrune_ >= kPruneEvery) {
+        sincePrune_ = 0;
+        prune();
+    }
 }
 
 void Journal::commitOutcome(const Writer::Change& change) {
@@ -255,6 +299,13 @@ template <typename Reader>
 auto Journal::read(const Reader& reader) {
     const embedded::MutexLock lock(readLock_);
     return reader(reader_ ? *reader_ : *database_);
+}
+
+std::vector<JournalEvent> Journal::eventsAfter(std::int64_t position, std::size_t most) {
+    if (auto recent = events_->after(position, most)) return *std::move(recent);
+    return read([&](Database& database) {
+        return eventsIn(database, position, static_cast<std::int64_t>(most));
+    });
 }
 
 std::vector<Task> Journal::newest(const TaskFilter& filter) {

@@ -2,7 +2,9 @@
 #pragma once
 
 #include <atomic>
+#include <cstddef>
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -10,6 +12,8 @@
 
 #include "embedded/mutex.h"
 #include "host/journal/database.h"
+#include "host/journal/event_log.h"
+#include "host/journal/event_position.h"
 #include "host/journal/recovery.h"
 #include "host/journal/state_directory.h"
 #include "host/journal/writer.h"
@@ -50,12 +54,23 @@ public:
     void enter(Task& task) override;
     void enterSoon(Task task) override;
     void save(const Task& task) override;
-    void saveOutcome(const std::vector<Task>& tasks) override;
+    void saveOutcome(const std::vector<Task>& tasks, const std::string& row) override;
     void saveSoon(Task task) override;
-    void keepRow(const std::string& row) override;
+    void keepRow(const std::string& kept, const std::string& row) override;
     void forget(std::int64_t number) override;
     std::vector<Task> newest(const TaskFilter& filter) override;
     std::optional<Task> find(std::string_view name) override;
+
+    /// Every row of the outcome table and every end of a task is an event, once it is durable.
+    /// Their numbers have gaps only where some are not kept any more. The position behind the
+    /// newest one.
+    EventPosition lastEvent() const { return {identity_, events_->last()}; }
+    /// The oldest events behind this position of this journal that are still kept, at most `most`
+    /// of them. Rows are as the plug-in gave them while memory has them, else masked. Throws
+    /// DatabaseError.
+    std::vector<JournalEvent> eventsAfter(std::int64_t position, std::size_t most);
+    /// See EventLog::whenNew().
+    void whenEvents(std::function<void()> call) { events_->whenNew(std::move(call)); }
 
     /// The oldest task that waits for the host to hand it over.
     std::optional<Task> nextInLine();
@@ -115,6 +130,7 @@ private:
     void insistOnReserve();
     Writer::Change updateOf(std::vector<Task> tasks);
     std::int64_t handOverNext(Database& database);
+    void tellOfEvents(Database& database);
     void prune();
 
     const Settings settings_;
@@ -129,10 +145,14 @@ private:
     std::atomic<std::int64_t> handedOver_{0};
     std::atomic<WallClock::rep> latest_{0};
 
+    std::optional<EventLog> events_;
+    // Of the writer's thread alone.
+    std::map<std::int64_t, std::string> asGiven_;  ///< rows of the transaction, by their events
+    std::size_t sincePrune_ = 0;                   ///< events
+
     mutable embedded::Mutex troubleLock_;
     std::string trouble_ ZAV_GUARDED_BY(troubleLock_);
     std::atomic<bool> troubled_{false};  ///< whether there is any
-    unsigned sincePrune_ ZAV_GUARDED_BY(troubleLock_) = 0;
 
     embedded::Mutex readLock_;        ///< around the connection that reads
     std::unique_ptr<Writer> writer_;  ///< last, so that it ends first

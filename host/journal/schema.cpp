@@ -12,7 +12,7 @@ namespace {
 /// tasks.state and tasks.way are values of TaskState and TaskWay. tasks.run is the run of the host
 /// in which a task was handed to the plug-in, tasks.turn its place among all that were. conditions
 /// holds a request as it came; of a task that is over only what may be shown. outcomes.id numbers
-/// the events; task is null for a row that belongs to none.
+/// the events; task is null for a row that belongs to none. outcomes.kind is a value of EventKind.
 constexpr const char* kFirst = R"(
 CREATE TABLE facts (name TEXT PRIMARY KEY, value BLOB NOT NULL) WITHOUT ROWID;
 CREATE TABLE runs (
@@ -41,8 +41,10 @@ CREATE TABLE commands (
     err BLOB NOT NULL, PRIMARY KEY (task, place)) WITHOUT ROWID;
 )";
 
+constexpr const char* kSecond = "ALTER TABLE outcomes ADD COLUMN kind INTEGER NOT NULL DEFAULT 0";
+
 /// What brings version N to version N + 1, from 0 on. A row is never changed once it was released.
-constexpr std::array<const char*, kSchemaVersion> kMigrations = {kFirst};
+constexpr std::array<const char*, kSchemaVersion> kMigrations = {kFirst, kSecond};
 
 std::string randomBytes(std::size_t count) {
     std::random_device source;

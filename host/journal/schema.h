@@ -8,7 +8,7 @@
 namespace host {
 
 /// The version of the tables that this host writes.
-inline constexpr int kSchemaVersion = 1;
+inline constexpr int kSchemaVersion = 2;
 
 /// The journal was written by a newer host; what() says so.
 class NewerSchema : public std::runtime_error {

@@ -7,6 +7,7 @@
 #include "host/outcomes/packed_row.h"
 #include "host/outcomes/shown_request.h"
 #include "host/tables/plugin_facts.h"
+#include "secrets/masked.h"
 
 namespace host {
 namespace {
@@ -66,11 +67,20 @@ bool removeSecrets(Database& database, std::int64_t number) {
 
 void writeOutcomes(Database& database, const Task& task) {
     const auto there = static_cast<std::size_t>(
-        database.number("SELECT count(*) FROM outcomes WHERE task = ?", task.number));
+        database.number("SELECT count(*) FROM outcomes WHERE task = ? AND kind = 0", task.number));
     for (std::size_t i = there; i < task.outcomes.size(); ++i) {
         database.change("INSERT INTO outcomes (task, row) VALUES (?, ?)", task.number,
                         packRow(task.outcomes[i]));
     }
+}
+
+/// The end of a task is an event, once.
+void noteEnd(Database& database, const Task& task) {
+    if (!isOver(task.state)) return;
+    database.change(
+        "INSERT INTO outcomes (task, row, kind) SELECT ?1, x'', 1 WHERE NOT EXISTS "
+        "(SELECT 1 FROM outcomes WHERE task = ?1 AND kind = 1)",
+        task.number);
 }
 
 void writeCommands(Database& database, const Task& task) {
@@ -111,7 +121,8 @@ std::vector<Command> readCommands(Database& database, std::int64_t number) {
 
 std::vector<std::string> readOutcomes(Database& database, std::int64_t number) {
     std::vector<std::string> rows;
-    Statement found = database.ask("SELECT row FROM outcomes WHERE task = ? ORDER BY id", number);
+    Statement found =
+        database.ask("SELECT row FROM outcomes WHERE task = ? AND kind = 0 ORDER BY id", number);
     while (found.step())
         rows.push_back(unpackRow(found.bytes(0)));
     return rows;
@@ -167,13 +178,14 @@ std::int64_t insertTask(Database& database, const Task& task) {
         static_cast<int>(task.way), static_cast<int>(task.answered), microseconds(task.accepted),
         maybeMicroseconds(task.started), maybeMicroseconds(task.ended),
         maybeMicroseconds(task.expires), static_cast<int>(task.forced), task.once,
-        packRow(task.reply), task.reason, task.guard, task.hint);
+        packRow(task.reply), secrets::masked(task.reason), task.guard, secrets::masked(task.hint));
     Task entered = task;
     entered.number = database.lastInserted();
     if (entered.run) noteHandOver(database, entered.number, *entered.run);
     if (isOver(task.state)) makeKeepable(entered.conditions);
     writeConditions(database, entered.number, entered.conditions);
     writeOutcomes(database, entered);
+    noteEnd(database, entered);
     writeCommands(database, entered);
     return entered.number;
 }
@@ -189,12 +201,14 @@ bool updateTask(Database& database, const Task& task) {
         "state <= ?2 OR state = ?2)",
         task.transid, state, static_cast<int>(task.answered), microseconds(task.accepted),
         maybeMicroseconds(task.started), maybeMicroseconds(task.ended), packRow(task.reply),
-        task.reason, task.guard, task.hint, task.number, static_cast<int>(task.begun));
+        secrets::masked(task.reason), task.guard, secrets::masked(task.hint), task.number,
+        static_cast<int>(task.begun));
     if (changed == 0) {
         throw StepBack("task " + std::to_string(task.number) + " goes forward only");
     }
     if (task.run) noteHandOver(database, task.number, *task.run);
     writeOutcomes(database, task);
+    noteEnd(database, task);
     writeCommands(database, task);
     return isOver(task.state) && removeSecrets(database, task.number);
 }
@@ -214,6 +228,10 @@ void deleteTask(Database& database, std::int64_t number) {
 
 void insertRow(Database& database, const std::string& row) {
     database.change("INSERT INTO outcomes (task, row) VALUES (NULL, ?)", packRow(row));
+}
+
+std::int64_t newestRow(Database& database, std::int64_t task) {
+    return database.number("SELECT max(id) FROM outcomes WHERE task = ? AND kind = 0", task);
 }
 
 std::optional<Task> readTask(Database& database, const std::string& identity, std::int64_t number) {

@@ -11,11 +11,12 @@
 
 namespace host {
 
-/// Enters a new task; returns its number. All of these throw DatabaseError.
+/// Enters a new task; returns its number. One that is over gets its event. All of these throw
+/// DatabaseError.
 std::int64_t insertTask(Database& database, const Task& task);
 
-/// Writes everything that may have changed. Of a task that is over only what may be kept of its
-/// request stays. Returns whether a secret was removed. Throws StepBack.
+/// Writes everything that may have changed. With its end a task gets an event, and only what may be
+/// kept of its request stays. Returns whether a secret was removed. Throws StepBack.
 bool updateTask(Database& database, const Task& task);
 
 /// Writes down that this run of the host hands it over; the first time it gets its turn.
@@ -26,6 +27,9 @@ void deleteTask(Database& database, std::int64_t number);
 
 /// A row of the outcome table that belongs to no task.
 void insertRow(Database& database, const std::string& row);
+/// The number of the newest row of the outcome table that belongs to this task; 0 when there is
+/// none.
+std::int64_t newestRow(Database& database, std::int64_t task);
 
 /// A task with everything that is known. `identity` is the journal's.
 std::optional<Task> readTask(Database& database, const std::string& identity, std::int64_t number);

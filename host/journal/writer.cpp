@@ -36,7 +36,8 @@ bool isDatabasesFault(const std::exception_ptr& failure) {
 
 }  // namespace
 
-Writer::Writer(Database& database, embedded::Mutex* shared) : database_(database), shared_(shared) {
+Writer::Writer(Database& database, embedded::Mutex* shared, Watch watch)
+    : database_(database), shared_(shared), watch_(std::move(watch)) {
     thread_ = std::thread([this] { work(); });
 }
 
@@ -184,6 +185,7 @@ void Writer::write(Jobs& jobs, std::vector<Change>& later) {
 
 /// Throws when nothing of it was written. Returns what of `later` has to be tried again.
 std::vector<Writer::Change> Writer::tryWrite(Jobs& jobs, const std::vector<Change>& later) {
+    if (watch_.begins) watch_.begins();
     database_.run("BEGIN IMMEDIATE");
     std::vector<Change> again;
     for (const Change& change : later) {
@@ -194,6 +196,7 @@ std::vector<Writer::Change> Writer::tryWrite(Jobs& jobs, const std::vector<Chang
     reached(CommitStep::BeforeCommit);
     database_.run("COMMIT");
     reached(CommitStep::AfterCommit);
+    tellOfCommit();
     const std::lock_guard<std::mutex> lock(lock_);
     ++transactions_;
     return again;
@@ -213,6 +216,15 @@ std::exception_ptr Writer::attempt(const Change& change) {
     }
     database_.run("RELEASE part");
     return failure;
+}
+
+/// The transaction is durable, whatever happens here.
+void Writer::tellOfCommit() noexcept {
+    try {
+        if (watch_.committed) watch_.committed(database_);
+    } catch (const std::exception& error) {
+        std::fprintf(stderr, "zavhost: events of the journal come late: %s\n", error.what());
+    }
 }
 
 bool Writer::wipe() noexcept {

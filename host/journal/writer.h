@@ -27,9 +27,18 @@ public:
     /// One part of a transaction: it is carried out as a whole or not at all.
     using Change = std::function<void(Database& database)>;
 
+    /// Who wants to know how a transaction proceeds, on the writer's thread. Both may be empty.
+    struct Watch {
+        std::function<void()> begins;
+        /// It is durable, and nobody who waits for it has been told yet.
+        std::function<void(Database& database)> committed;
+    };
+
     /// The database outlives the writer, which alone uses it from now on; unless `shared` is given,
     /// which it holds whenever it does.
-    explicit Writer(Database& database, embedded::Mutex* shared = nullptr);
+    explicit Writer(Database& database, embedded::Mutex* shared = nullptr)
+        : Writer(database, shared, Watch()) {}
+    Writer(Database& database, embedded::Mutex* shared, Watch watch);
     /// Carries out what was handed over, and ends.
     ~Writer();
     Writer(const Writer&) = delete;
@@ -69,10 +78,12 @@ private:
     void write(Jobs& jobs, std::vector<Change>& later);
     std::vector<Change> tryWrite(Jobs& jobs, const std::vector<Change>& later);
     std::exception_ptr attempt(const Change& change);
+    void tellOfCommit() noexcept;
     bool wipe() noexcept;
 
     Database& database_;
     embedded::Mutex* const shared_;  ///< may be null
+    const Watch watch_;
 
     mutable std::mutex lock_;  // around everything below
     std::condition_variable changed_;

@@ -1,5 +1,6 @@
 #include "host/outcomes/outcome_feed.h"
 
+#include <new>
 #include <utility>
 
 #include "host/tables/plugin_facts.h"
@@ -21,12 +22,18 @@ oxa::Rows chosen(oxa::Filter& filter, const oxa::Rows& rows) {
 
 OutcomeFeed::OutcomeFeed(const TableSet& tables) : table_(tables.find(plugin::kOutcomeTable)) {
     if (table_ == nullptr) return;
-    source_ =
-        oxa::subscribe(table_->name, {}, [this](const oxa::Rows& rows) { return deliver(rows); });
+    source_ = oxa::subscribe(table_->name, {}, [this](const oxa::Rows& rows) {
+        deliver(rows);
+        return static_cast<int>(OXA_OK);
+    });
 }
 
 OutcomeFeed::~OutcomeFeed() {
     release();
+    source_.reset();
+    embedded::MutexLock lock(lock_);
+    while (delivered_ != came_)
+        lock.wait(changed_);
 }
 
 std::unique_ptr<OutcomeFeed::Subscription> OutcomeFeed::subscribe(
@@ -53,16 +60,32 @@ void OutcomeFeed::remove(std::uint64_t number) {
     lock.unlock();
 }
 
-int OutcomeFeed::deliver(const oxa::Rows& rows) {
-    const int status = deliverToAll(rows);
-    holdIfWanted();
-    return status;
+/// Under the table's lock, which sees to it that dispatches come one after the other. A subscriber
+/// may take long, if only because a disk is full, so nobody is called before the lock is free.
+void OutcomeFeed::deliver(const oxa::Rows& rows) {
+    embedded::MutexLock lock(lock_);
+    const std::uint64_t place = came_++;
+    lock.unlock();
+    try {
+        oxa::whenUnlocked([this, place, rows] { deliverInTurn(place, rows); });
+    } catch (const std::bad_alloc&) {
+        deliverInTurn(place, rows);  // then the lock has to wait: better than a lost outcome
+    }
 }
 
-/// The last status that a subscriber answered and that is not 0. The table's own lock sees to it
-/// that rows come one dispatch after the other.
-int OutcomeFeed::deliverToAll(const oxa::Rows& rows) {
-    int result = OXA_OK;
+void OutcomeFeed::deliverInTurn(std::uint64_t place, const oxa::Rows& rows) {
+    embedded::MutexLock lock(lock_);
+    while (delivered_ != place)
+        lock.wait(changed_);
+    lock.unlock();
+    deliverToAll(rows);
+    holdIfWanted();
+    lock.lock();
+    ++delivered_;
+    changed_.notify_all();
+}
+
+void OutcomeFeed::deliverToAll(const oxa::Rows& rows) {
     embedded::MutexLock lock(lock_);
     const std::uint64_t end = nextNumber_;  // who subscribes from now on gets the next row
     auto at = subscribers_.begin();
@@ -70,23 +93,20 @@ int OutcomeFeed::deliverToAll(const oxa::Rows& rows) {
         called_ = at->first;
         const Subscriber& subscriber = at->second;
         lock.unlock();
-        const int status = deliverTo(subscriber, rows);
+        deliverTo(subscriber, rows);
         lock.lock();
-        if (status != OXA_OK) result = status;
         ++at;  // the one that was called is still there: who removes it waits until now
         called_ = 0;
         changed_.notify_all();
     }
-    return result;
 }
 
-int OutcomeFeed::deliverTo(const Subscriber& subscriber, const oxa::Rows& rows) noexcept {
+void OutcomeFeed::deliverTo(const Subscriber& subscriber, const oxa::Rows& rows) noexcept {
     try {
-        if (!subscriber.filter) return subscriber.sink(rows);
-        const oxa::Rows wanted = chosen(*subscriber.filter, rows);
-        return wanted.count() == 0 ? static_cast<int>(OXA_OK) : subscriber.sink(wanted);
+        const oxa::Rows wanted = subscriber.filter ? chosen(*subscriber.filter, rows) : rows;
+        if (wanted.count() > 0) subscriber.sink(wanted);
     } catch (...) {
-        return OXA_OVERFLOW;
+        // The others get the rows all the same.
     }
 }
 

@@ -17,12 +17,14 @@ namespace host {
 /// subscribers, one after the other, in the order in which they came.
 ///
 /// Any thread may use it. Subscribers are called on the thread that publishes the row, the
-/// plug-in's executor, which must not be kept waiting; no lock of the feed is held meanwhile.
+/// plug-in's executor, which goes on when the last of them has returned. No lock is held meanwhile,
+/// neither the feed's nor the table's.
 class OutcomeFeed {
 public:
     /// `tables` outlives the feed. Without an outcome table among them nothing ever comes.
     explicit OutcomeFeed(const TableSet& tables);
-    /// Lets a held executor go. Every subscription has ended before.
+    /// Lets a held executor go, and waits for rows on their way. Every subscription has ended
+    /// before.
     ~OutcomeFeed();
     OutcomeFeed(const OutcomeFeed&) = delete;
     OutcomeFeed& operator=(const OutcomeFeed&) = delete;
@@ -43,8 +45,8 @@ public:
     };
 
     /// Subscribes to the rows that satisfy all conditions, judged as the table judges them. Rows
-    /// whose publication begins after the return reach the sink. A sink that throws counts as one
-    /// that answered OXA_OVERFLOW. Null when there is no outcome table or it makes no filter.
+    /// whose publication begins after the return reach the sink. What it answers, or throws, is
+    /// nobody's affair. Null when there is no outcome table or it makes no filter.
     std::unique_ptr<Subscription> subscribe(const std::vector<oxa::Predicate>& where,
                                             oxa::Sink sink);
 
@@ -62,9 +64,10 @@ private:
         oxa::Sink sink;
     };
 
-    int deliver(const oxa::Rows& rows);
-    int deliverToAll(const oxa::Rows& rows);
-    static int deliverTo(const Subscriber& subscriber, const oxa::Rows& rows) noexcept;
+    void deliver(const oxa::Rows& rows);
+    void deliverInTurn(std::uint64_t place, const oxa::Rows& rows);
+    void deliverToAll(const oxa::Rows& rows);
+    static void deliverTo(const Subscriber& subscriber, const oxa::Rows& rows) noexcept;
     void remove(std::uint64_t number);
     void holdIfWanted();
 
@@ -75,12 +78,14 @@ private:
     /// By number, and numbers grow: so this is the order in which they came.
     std::map<std::uint64_t, Subscriber> subscribers_ ZAV_GUARDED_BY(lock_);
     std::uint64_t nextNumber_ ZAV_GUARDED_BY(lock_) = 1;
-    std::uint64_t called_ ZAV_GUARDED_BY(lock_) = 0;  ///< whose sink runs now; 0: none
+    std::uint64_t called_ ZAV_GUARDED_BY(lock_) = 0;     ///< whose sink runs now; 0: none
+    std::uint64_t came_ ZAV_GUARDED_BY(lock_) = 0;       ///< dispatches so far
+    std::uint64_t delivered_ ZAV_GUARDED_BY(lock_) = 0;  ///< those that everybody has got
     bool wanted_ ZAV_GUARDED_BY(lock_) = false;
     bool holding_ ZAV_GUARDED_BY(lock_) = false;
     bool released_ ZAV_GUARDED_BY(lock_) = false;
 
-    std::unique_ptr<oxa::Subscription> source_;  ///< last, so that it ends first
+    std::unique_ptr<oxa::Subscription> source_;
 };
 
 }  // namespace host

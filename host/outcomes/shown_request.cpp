@@ -1,13 +1,24 @@
 #include "host/outcomes/shown_request.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "host/tables/plugin_facts.h"
+#include "secrets/masked.h"
 
 namespace host {
 namespace {
 
 constexpr std::size_t kLongestValue = 4096;
+
+/// Returns whether the value changed. Names stay as they are: tasks are found by them.
+bool maskText(oxa::Predicate& condition) {
+    if (!plugin::holdsFreeText(condition.column)) return false;
+    std::string shown = secrets::masked(condition.value);
+    if (shown == condition.value) return false;
+    condition.value = std::move(shown);
+    return true;
+}
 
 }  // namespace
 
@@ -25,13 +36,14 @@ bool makeKeepable(std::vector<oxa::Predicate>& conditions) {
         return secret && condition.column == plugin::kContextColumn;
     };
     const auto from = std::remove_if(conditions.begin(), conditions.end(), isSecret);
-    const bool removed = from != conditions.end();
+    bool found = from != conditions.end();
     conditions.erase(from, conditions.end());
     for (oxa::Predicate& condition : conditions) {
+        found = maskText(condition) || found;
         if (condition.value.size() > kLongestValue) condition.value.resize(kLongestValue);
         condition.value.shrink_to_fit();
     }
-    return removed;
+    return found;
 }
 
 std::vector<std::pair<std::string, std::string>> shownRequest(

@@ -53,7 +53,9 @@ enum class TaskWay {
     AtOnce = 2,   ///< a query whose command had been carried out with its answer
 };
 
-/// Texts and rows are in the local code page.
+/// Texts and rows are in the local code page. Except for `conditions` of a task that is not over
+/// there are no secrets in it: a configuration is left out, and what follows "password=" and the
+/// like is "***".
 struct Task {
     std::int64_t number = 0;  ///< in the order of acceptance; 0: not entered yet
     std::string id;           ///< no two tasks have the same, not even of two runs of the host

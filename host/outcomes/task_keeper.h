@@ -59,13 +59,15 @@ public:
     virtual void enterSoon(Task task) = 0;
     /// Changes a task. Returns when that is durable. Throws NotKept, and StepBack.
     virtual void save(const Task& task) = 0;
-    /// Changes these tasks, which an outcome has changed, in one transaction. Returns when that is
-    /// durable, however long it takes.
-    virtual void saveOutcome(const std::vector<Task>& tasks) = 0;
+    /// Changes these tasks, which an outcome has changed, in one transaction; the first one is its
+    /// own. `row` is the outcome as the plug-in gave it, for those who listen now: it is not kept.
+    /// Returns when that is durable, however long it takes.
+    virtual void saveOutcome(const std::vector<Task>& tasks, const std::string& row) = 0;
     /// Changes a task without waiting.
     virtual void saveSoon(Task task) = 0;
-    /// A row of the outcome table that belongs to no task. Returns when it is durable.
-    virtual void keepRow(const std::string& row) = 0;
+    /// A row of the outcome table that belongs to no task, as it may be kept and as it came.
+    /// Returns when it is durable.
+    virtual void keepRow(const std::string& kept, const std::string& row) = 0;
     /// It was no task after all.
     virtual void forget(std::int64_t number) = 0;
 

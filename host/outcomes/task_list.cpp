@@ -9,6 +9,7 @@
 #include "host/commands/ear.h"
 #include "host/commands/plugin_threads.h"
 #include "host/outcomes/shown_request.h"
+#include "host/tables/masked_row.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/row_fields.h"
 
@@ -45,21 +46,25 @@ bool TaskList::Columns::complete() const {
            outcomeRetval != nullptr;
 }
 
+TaskList::Columns TaskList::columnsOf(const oxa::Table& requests, const oxa::Table& outcomes) {
+    return {
+        host::find(requests, plugin::kTransidColumn), host::find(requests, plugin::kRetvalColumn),
+        host::find(requests, plugin::kContextColumn), host::find(outcomes, plugin::kTransidColumn),
+        host::find(outcomes, plugin::kRetvalColumn)};
+}
+
 TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, TaskKeeper& keeper, bool guarded)
     : guarded_(guarded), keeper_(keeper) {
     const oxa::Table* const requests = tables.find(plugin::kRequestTable);
-    const oxa::Table* const outcomes = tables.find(plugin::kOutcomeTable);
-    if (requests == nullptr || outcomes == nullptr) return;
-    columns_ = {host::find(*requests, plugin::kTransidColumn),
-                host::find(*requests, plugin::kRetvalColumn),
-                host::find(*requests, plugin::kContextColumn),
-                host::find(*outcomes, plugin::kTransidColumn),
-                host::find(*outcomes, plugin::kRetvalColumn)};
-    if (!columns_.complete()) return;
-    requests_ = requests;
-    heard_ = std::make_shared<const Follower>(
-        [this](const OutputPiece& piece) { tellFollowers(piece); });
-    PluginThreads::ofProcess().hearOutput(heard_);
+    outcomeTable_ = tables.find(plugin::kOutcomeTable);
+    if (outcomeTable_ == nullptr) return;
+    if (requests != nullptr) columns_ = columnsOf(*requests, *outcomeTable_);
+    if (columns_.complete()) {
+        requests_ = requests;
+        heard_ = std::make_shared<const Follower>(
+            [this](const OutputPiece& piece) { tellFollowers(piece); });
+        PluginThreads::ofProcess().hearOutput(heard_);
+    }
     outcomes_ = feed.subscribe({}, [this](const oxa::Rows& rows) {
         Heard heard = takeOfPluginThread();
         for (std::size_t i = 0; i < rows.count(); ++i)
@@ -152,7 +157,7 @@ std::optional<int> TaskList::readAnswer(Entry& entry, const oxa::Rows& rows, con
     std::optional<int> retval = heard.answer;
     Task& task = entry.task;
     if (rows.count() > 0) {
-        task.reply = rowOf(rows, 0);
+        task.reply = maskedRow(*requests_, std::string(rowOf(rows, 0)));
         retval = integerField(*columns_.retval, task.reply);
         task.transid = textField(*columns_.transid, task.reply);
         if (plugin::holdsConfiguration(task.value(plugin::kCommandColumn)) &&
@@ -200,7 +205,7 @@ void TaskList::endAnswered(Entry entry, const Heard& heard) {
         task.commands = heard.commands;
         if (task.value(plugin::kCommandColumn) == plugin::kGetConfiguration) {
             for (Command& ran : task.commands)
-                ran.out.clear();  // it is the answer
+                ran.out.clear();  // it is the answer, whatever program gave it
         }
         entry.tooMuchOutput = heard.tooMuchOutput;
         task.state = judge(entry);
@@ -232,7 +237,7 @@ TaskList::Addressee TaskList::close(const std::string& row) {
 }
 
 void TaskList::take(const std::string& row, Heard heard) {
-    const Addressee addressee = close(row);
+    const Addressee addressee = requests_ == nullptr ? Addressee{} : close(row);
     // Nothing of a cancelled task lives when it is over. Without the lock: this may take long.
     const bool reached = addressee.ending && addressee.ending->finish();
     std::vector<Task> changed;
@@ -245,10 +250,10 @@ void TaskList::take(const std::string& row, Heard heard) {
         }
     }
     if (changed.empty()) {
-        keeper_.keepRow(row);
+        keeper_.keepRow(maskedRow(*outcomeTable_, row), row);
         return;
     }
-    keeper_.saveOutcome(changed);
+    keeper_.saveOutcome(changed, row);
     if (isOver(changed.front().state)) noteKept(addressee.number, !changed.front().answered);
 }
 
@@ -257,7 +262,7 @@ std::vector<Task> TaskList::takeInto(std::uint64_t number, const std::string& ro
     Entry& entry = entries_.at(number);
     Task& task = entry.task;
     entry.ended = isLast(entry, row);
-    task.outcomes.push_back(row);
+    task.outcomes.push_back(maskedRow(*outcomeTable_, row));
     append(task.commands, std::move(heard.commands));
     entry.tooMuchOutput = entry.tooMuchOutput || heard.tooMuchOutput;
     entry.retval = integerField(*columns_.outcomeRetval, row);

@@ -37,7 +37,7 @@ public:
     /// All of them outlive this object, and nobody has subscribed to the feed before: an outcome is
     /// kept before anybody else gets it, and before the executor begins its next task. Without a
     /// request table and an outcome table that have the columns that matter, there are never any
-    /// tasks.
+    /// tasks, and outcomes belong to none.
     /// `guarded`: a success in whose course a command failed unseen counts as failed, and a request
     /// that cannot be kept is not handed over.
     TaskList(const TableSet& tables, OutcomeFeed& feed, TaskKeeper& keeper, bool guarded);
@@ -122,6 +122,7 @@ private:
         const oxa::Column* outcomeRetval = nullptr;
         bool complete() const;
     };
+    static Columns columnsOf(const oxa::Table& requests, const oxa::Table& outcomes);
     struct Entry {
         Task task;
         std::uint64_t turn = 0;   ///< place in the executor's queue; 0: not accepted yet
@@ -176,6 +177,7 @@ private:
     const bool guarded_;
     TaskKeeper& keeper_;
     const oxa::Table* requests_ = nullptr;  ///< null: there are no tasks
+    const oxa::Table* outcomeTable_ = nullptr;
     Columns columns_;
 
     std::mutex turns_;  ///< held while one request is handed over

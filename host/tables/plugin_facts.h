@@ -38,6 +38,17 @@ inline constexpr std::string_view kScriptsColumn = "UASCRIPT";
 /// These hold text or names of files; all others hold names in ASCII.
 inline constexpr std::array<std::string_view, 3> kTextColumns = {kContextColumn, kMetafileColumn,
                                                                  kScriptsColumn};
+/// In both tables: these hold whatever somebody wrote, so there may be passwords in them.
+inline constexpr std::array<std::string_view, 5> kFreeTextColumns = {
+    kContextColumn, kOptionalColumn, kMetafileColumn, kScriptsColumn, "RETMSGPARM"};
+
+constexpr bool holdsFreeText(std::string_view column) {
+    for (const std::string_view free : kFreeTextColumns) {
+        if (column == free) return true;
+    }
+    return false;
+}
+
 /// In the request table: the node that answers. No parameter.
 inline constexpr std::string_view kOriginNodeColumn = "ORIGINNODE";
 /// In the answer: the message that says why, and its values.

@@ -126,6 +126,15 @@ protected:
             after = "&after=" + page["next"].dump();
         }
     }
+    /// The identifier of the newest event.
+    std::string lastEvent() const {
+        RawClient client(host->socket());
+        client.send("GET /v1/events?table=KAGDYST HTTP/1.1\r\n\r\n");
+        const std::string head = client.readUntil("\r\n\r\n");
+        const std::string field = "Last-Event-ID: ";
+        const std::size_t at = head.find(field) + field.size();
+        return head.substr(at, head.find("\r\n", at) - at);
+    }
     std::vector<std::pair<std::string, std::string>> notes() const {
         std::istringstream text(home.files().read("notes"));
         std::vector<std::pair<std::string, std::string>> lines;

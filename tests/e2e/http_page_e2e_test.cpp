@@ -78,9 +78,9 @@ protected:
         return {"/bin/sh", "-c", "exec " + command};
     }
     Environment environment() const { return {{"ZAV_SOCKET", host.socket()}}; }
-    bool subscribed() const {
-        return host.exchange("GET /v1/health HTTP/1.0\r\n\r\n").find("\"subscriptions\":1") !=
-               std::string::npos;
+    bool subscribed(std::size_t streams) const {
+        return host.exchange("GET /v1/health HTTP/1.0\r\n\r\n")
+                   .find("\"subscriptions\":" + std::to_string(streams)) != std::string::npos;
     }
 
     ScriptHome home;
@@ -100,14 +100,14 @@ TEST_F(HttpPage, EveryCommandAnswersAsThePageSays) {
         if (example.isStream()) {
             streams.emplace_back(
                 example, std::make_unique<Program>(shell(example.command), "", environment()));
-            ASSERT_TRUE(eventually([&] { return subscribed(); }));
+            ASSERT_TRUE(eventually([&] { return subscribed(streams.size()); }));
             continue;
         }
         const ProgramResult result = runProgram(shell(example.command), "", environment());
         EXPECT_EQ(result.status, 0) << result.err;
         EXPECT_TRUE(matches(result.out, example.answer)) << result.out;
     }
-    EXPECT_EQ(streams.size(), 1U);
+    EXPECT_EQ(streams.size(), 2U);
     for (const auto& [example, program] : streams) {
         EXPECT_TRUE(program->awaitOutput("\n\n", std::chrono::seconds(30))) << program->err();
         EXPECT_TRUE(matches(program->out(), example.answer + "\n")) << program->out();

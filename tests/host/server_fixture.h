@@ -43,7 +43,8 @@ protected:
 
     void start(const host::ServerLimits& limits = {}) {
         socket.emplace(scratch.path("s"));
-        services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+        services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it",
+                         host::RowQueue::Limits{}, true, host::Places{}, journal);
         api.emplace(*services, host::routes());
         server =
             std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts, limits);
@@ -80,6 +81,7 @@ protected:
 
     ScratchDir scratch;
     MadeUpTable table{"PLAIN", plainColumns()};
+    host::Journal::Settings journal;  ///< in memory unless the test says otherwise
     std::optional<host::SocketFile> socket;
     std::optional<host::Services> services;
     std::optional<host::Api> api;

@@ -151,6 +151,41 @@ TEST_F(Host, ASinkThatThrowsLosesItsRowsAndDisturbsNobody) {
     EXPECT_THAT(other.get(), ElementsAre("a", "b"));
 }
 
+TEST_F(Host, WhatASinkLeavesForLaterRunsWithoutTheTablesLock) {
+    std::vector<std::string> order;
+    const auto live = oxa::subscribe("SAMPLE", {}, [&](const oxa::Rows&) {
+        for (const char* name : {"first", "second"}) {
+            oxa::whenUnlocked([&, name] {
+                // Were the lock held, this would wait for ever.
+                EXPECT_EQ(manager.liveNumbers().size(), 1U);
+                order.emplace_back(name);
+            });
+        }
+        order.emplace_back("sink");
+        return static_cast<int>(OXA_OK);
+    });
+    EXPECT_EQ(manager.publish(sampleRow("a", 1)), OXA_OK);
+    EXPECT_THAT(order, ElementsAre("sink", "first", "second"));
+}
+
+TEST_F(Host, WhatIsLeftForLaterWithoutALockRunsAtOnce) {
+    bool ran = false;
+    oxa::whenUnlocked([&ran] { ran = true; });
+    EXPECT_TRUE(ran);
+}
+
+TEST_F(Host, WithLocksOfSeveralTablesTheLastOneCounts) {
+    SampleManager other("OTHER");
+    bool ran = false;
+    manager.lock();
+    other.lock();
+    oxa::whenUnlocked([&ran] { ran = true; });
+    manager.unlock();
+    EXPECT_FALSE(ran);
+    other.unlock();
+    EXPECT_TRUE(ran);
+}
+
 TEST_F(Host, ASubscriptionWithoutASinkHasNoRequester) {
     const auto live = oxa::subscribe("SAMPLE", {}, nullptr);
     ASSERT_NE(live, nullptr);

@@ -50,6 +50,8 @@ void EventParser::endLine(std::vector<ServerEvent>& complete) {
         hasData_ = true;
     } else if (takeField(line_, "event", value)) {
         event_.type = value;
+    } else if (takeField(line_, "id", value)) {
+        event_.id = value;
     }
     line_.clear();
 }

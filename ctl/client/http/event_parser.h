@@ -9,6 +9,7 @@ namespace ctl {
 struct ServerEvent {
     std::string type = "message";
     std::string data;
+    std::string id;  ///< what to name to continue behind this event; empty if it has none
 };
 
 class EventParser {

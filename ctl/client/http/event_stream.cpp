@@ -21,6 +21,10 @@ std::string tableTarget(const std::string& table,
     return target;
 }
 
+std::string behind(const std::string& event) {
+    return event.empty() ? std::string() : "&after=" + percentEncoded(event);
+}
+
 }  // namespace
 
 struct EventStream::Connection {
@@ -70,14 +74,16 @@ void EventStream::Connection::readHeader(Deadline deadline) {
 
 EventStream::EventStream(const std::string& socketPath, const std::string& table,
                          const std::vector<std::pair<std::string, std::string>>& where,
-                         Deadline deadline)
-    : EventStream(socketPath, tableTarget(table, where), deadline) {}
+                         Deadline deadline, const std::string& after)
+    : EventStream(socketPath, tableTarget(table, where) + behind(after), deadline) {}
 
 EventStream::EventStream(const std::string& socketPath, const std::string& target,
                          Deadline deadline)
     : connection_(std::make_unique<Connection>(socketPath)) {
     connection_->sendRequest(target, deadline);
     connection_->readHeader(deadline);
+    const auto begin = connection_->parser.get()["Last-Event-ID"];
+    position_.assign(begin.data(), begin.size());
 }
 
 EventStream::~EventStream() = default;
@@ -100,6 +106,7 @@ EventStream::Result EventStream::next(Deadline deadline, ServerEvent& event, con
     }
     event = std::move(pending_.front());
     pending_.pop_front();
+    if (!event.id.empty()) position_ = event.id;
     return Result::Event;
 }
 

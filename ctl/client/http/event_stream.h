@@ -17,9 +17,11 @@ public:
     enum class Result { Event, Ended, TimedOut };
 
     /// Returns when the subscription is live: rows that come from now on are delivered. `where`
-    /// holds pairs of a column and the value that it must have. Throws Failure as HostClient does.
+    /// holds pairs of a column and the value that it must have. `after` is the identifier of the
+    /// event to continue behind; empty: from now on. Throws Failure as HostClient does.
     EventStream(const std::string& socketPath, const std::string& table,
-                const std::vector<std::pair<std::string, std::string>>& where, Deadline deadline);
+                const std::vector<std::pair<std::string, std::string>>& where, Deadline deadline,
+                const std::string& after = {});
     /// The events of any other path, such as "/v1/tasks/1/output?follow=1".
     EventStream(const std::string& socketPath, const std::string& target, Deadline deadline);
     ~EventStream();
@@ -30,11 +32,16 @@ public:
     /// TimedOut the stream is closed.
     Result next(Deadline deadline, ServerEvent& event, const Ticker& tick = {});
 
+    /// The identifier to continue behind: that of the last event that next() gave, or of the
+    /// stream's beginning. Empty when the host gives none.
+    const std::string& position() const { return position_; }
+
 private:
     struct Connection;
     std::unique_ptr<Connection> connection_;
     EventParser parser_;
     std::deque<ServerEvent> pending_;
+    std::string position_;
 };
 
 }  // namespace ctl

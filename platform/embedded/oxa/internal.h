@@ -84,6 +84,11 @@ struct Release {
 };
 using OwnedObject = std::unique_ptr<rtoxa, Release>;
 
+/// The calling thread has taken the lock of a table, or has given it back; then what waits for that
+/// runs.
+void tableLocked();
+void tableUnlocked() noexcept;
+
 /// The table of these names, which is made if there is none yet.
 OxaTable& tableNamed(const std::string& application, const std::string& table);
 

@@ -102,10 +102,12 @@ int TableManager::RegisterWithManager() {
 
 void TableManager::lock() {
     table_.liveLock.lock();
+    oxa::tableLocked();
 }
 
 void TableManager::unlock() {
     table_.liveLock.unlock();
+    oxa::tableUnlocked();
 }
 
 const char* TableManager::ApplicationName() const {

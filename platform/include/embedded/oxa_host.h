@@ -80,6 +80,12 @@ std::unique_ptr<Filter> makeFilter(const std::string& table, const std::vector<P
 /// delivered.
 using Sink = std::function<int(const Rows& rows)>;
 
+/// In a sink: has `call` run on this thread as soon as the thread has given the table's lock back;
+/// at once when it holds none. The call may take as long as it likes and may use the framework.
+/// Several run in the order in which they came. What a call throws ends the process. Throws
+/// std::bad_alloc, and then `call` does not run.
+void whenUnlocked(std::function<void()> call);
+
 /// A live subscription. Its sink may be called as long as it exists; when the destructor returns,
 /// the sink has been destroyed. The destructor waits for the table's lock: do not destroy a
 /// subscription in a sink, nor while holding a lock that a sink takes.

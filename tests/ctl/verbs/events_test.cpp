@@ -9,6 +9,7 @@ namespace {
 
 using ctl::Format;
 using ctl::showEvent;
+using ctl::wordsFor;
 using nlohmann::json;
 
 const json kDone = {{"TRANSID", "T"}, {"COMMAND", "START"}, {"RETVAL", 0}};
@@ -30,6 +31,25 @@ TEST(Events, ShowNoControlCharactersAndTakeAMissingReturnCodeForNoSuccess) {
     EXPECT_EQ(showEvent(row, true, Format::Text),
               "T\\x1B[2J  START  failed; the host gave no return code\n");
     EXPECT_EQ(showEvent({{"A", "\x7f"}}, true, Format::Json), "\n  {\"A\":\"\\u007F\"}");
+}
+
+TEST(Events, HaveTheirIdentifierBesideThemOnRequest) {
+    EXPECT_EQ(showEvent(kDone, true, Format::Text, "abc-7"), "abc-7  T  START  done\n");
+    json shown = kDone;
+    shown["id"] = "abc-7";
+    EXPECT_EQ(json::parse(showEvent(kDone, true, Format::Json, "abc-7")), shown);
+}
+
+TEST(Events, ThatAreMissingAreToldInWords) {
+    EXPECT_EQ(wordsFor({"gap", R"({"missing":5})", "abc-7"}),
+              "5 events are missing here: the host does not keep them any more");
+    EXPECT_EQ(wordsFor({"gap", R"({"missing":1})", "abc-7"}),
+              "1 event is missing here: the host does not keep it any more");
+    for (const char* unknown : {R"({"missing":null})", "{}", "[]", "x", R"({"missing":-1})"}) {
+        EXPECT_EQ(wordsFor({"gap", unknown, ""}).find("the host does not know that identifier"), 0U)
+            << unknown;
+    }
+    EXPECT_EQ(wordsFor({"overflow", "3 lost", ""}), "overflow: 3 lost");
 }
 
 TEST(Events, AreElementsOfOneListAsJson) {

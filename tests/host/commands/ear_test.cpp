@@ -167,6 +167,33 @@ TEST_F(Ear, KeepsTheEndOfALongOutputAndAllOfItWhenAsked) {
     EXPECT_TRUE(heard.outputComplete);
 }
 
+TEST_F(Ear, HearsNoValuesOfPasswords) {
+    ThreadEar ear(1000);
+    outcome = run(scratch.script("script",
+                                 "echo password=; printf 'hunter2 token='; sleep 0.1\n"
+                                 "printf 'abc def\\n'; echo key: xyz >&2") +
+                  " --secret=mellon");
+    const Heard heard = ear.take();
+    ASSERT_EQ(heard.commands.size(), 1U);
+    const Command& command = heard.commands.front();
+    EXPECT_EQ(command.line, scratch.path("script") + " --secret=***");
+    EXPECT_EQ(command.out.text(), "password=\nhunter2 token=*** def\n");
+    EXPECT_EQ(command.err.text(), "key: ***\n");
+    EXPECT_EQ(heard.output, "password=\nhunter2 token=abc def\n") << "asked for, so as it came";
+}
+
+TEST_F(Ear, KeepsNoConfigurationThatTheTranslatorPrints) {
+    scratch.script("zav_xa", "echo COLOUR=auburn; echo no such product >&2; exit 1");
+    for (const char* verb : {" -g ux", " -p ux"}) {
+        ThreadEar ear;
+        outcome = run(scratch.path("zav_xa") + verb);
+        const Heard heard = ear.take();
+        ASSERT_EQ(heard.commands.size(), 1U);
+        EXPECT_EQ(heard.commands.front().out.text(), "") << verb;
+        EXPECT_EQ(heard.commands.front().err.text(), "no such product\n") << verb;
+    }
+}
+
 TEST_F(Ear, SaysThatAnOutputIsLongerThanItIsKept) {
     const Heard heard = hear("echo 123456789", 5);
     EXPECT_EQ(heard.output, "12345");

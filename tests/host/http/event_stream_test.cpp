@@ -178,8 +178,11 @@ TEST_F(Events, OfTheOutcomeTableComeThroughOneSubscriptionHoweverManyFollow) {
     EXPECT_EQ(outcomes.liveObjects(), 1U);
     outcomes.publish(plainRow("a", 1, "first"));
     outcomes.publish(plainRow("b", 2, "second"));
-    const std::string first = "data: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"first\"}\n\n";
-    const std::string second = "data: {\"NAME\":\"b\",\"NUMBER\":2,\"TEXT\":\"second\"}\n\n";
+    const std::string journalId = "id: " + services->journal.identity();
+    const std::string first =
+        journalId + "-1\ndata: {\"NAME\":\"a\",\"NUMBER\":1,\"TEXT\":\"first\"}\n\n";
+    const std::string second =
+        journalId + "-2\ndata: {\"NAME\":\"b\",\"NUMBER\":2,\"TEXT\":\"second\"}\n\n";
     EXPECT_EQ(clients[0].readUntil("\n\n"), first);
     EXPECT_EQ(clients[0].readUntil("\n\n"), second);
     EXPECT_EQ(clients[1].readUntil("\n\n"), first);

@@ -3,16 +3,15 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 
 #include <atomic>
-#include <csignal>
 #include <filesystem>
 #include <thread>
 
 #include "host/journal/commit_step.h"
 #include "host/journal/journal_fixture.h"
 #include "host/process/start_error.h"
+#include "support/full_disk.h"
 #include "support/gate.h"
 #include "support/host/program.h"
 
@@ -25,22 +24,6 @@ using host::TaskWay;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-/// No file of this process can grow beyond a few bytes while the object exists.
-class FullDisk {
-public:
-    FullDisk() {
-        ::signal(SIGXFSZ, SIG_IGN);
-        ::getrlimit(RLIMIT_FSIZE, &before_);
-        rlimit none = before_;
-        none.rlim_cur = 1;
-        ::setrlimit(RLIMIT_FSIZE, &none);
-    }
-    ~FullDisk() { ::setrlimit(RLIMIT_FSIZE, &before_); }
-
-private:
-    rlimit before_{};
-};
-
 class Journals : public JournalTest {
 protected:
     std::vector<std::string> transids(const host::TaskFilter& filter = {}) {
@@ -48,6 +31,16 @@ protected:
         for (const Task& task : journal->newest(filter))
             found.push_back(task.transid);
         return found;
+    }
+    /// Events as texts.
+    std::vector<std::string> events(std::int64_t after = 0, std::size_t most = 100) {
+        std::vector<std::string> texts;
+        for (const host::JournalEvent& event : journal->eventsAfter(after, most)) {
+            const bool isRow = event.kind == host::EventKind::Row;
+            texts.push_back(std::to_string(event.number) + (isRow ? " row of " : " end of ") +
+                            std::to_string(event.task) + (isRow ? ": " + event.row : ""));
+        }
+        return texts;
     }
     /// Everything in the files of the journal's directory.
     std::string allBytes() const {
@@ -78,7 +71,7 @@ TEST_F(Journals, KeepEverythingAboutATask) {
     command.out.append("one\n");
     command.err.append(std::string("\xFF\0", 2));
     task = ended(task, TaskState::Failed);
-    journal->saveOutcome({task});
+    journal->saveOutcome({task}, "row");
     open();
     const std::optional<Task> kept = journal->find(task.id);
     ASSERT_TRUE(kept.has_value());
@@ -197,9 +190,33 @@ TEST_F(Journals, HoldASecretWholeWhileTheTaskNeedsItAndNowhereAfterwards) {
     EXPECT_EQ(journal->find("t0")->value("CONTEXT"), "") << "it is shown to nobody";
     EXPECT_NE(allBytes().find("Tr0ub4dor"), std::string::npos);
     for (const Task& task : tasks)
-        journal->saveOutcome({ended(task)});
+        journal->saveOutcome({ended(task)}, "row");
     EXPECT_TRUE(eventually([this] { return allBytes().find("Tr0ub4dor") == std::string::npos; }));
     EXPECT_EQ(journal->find("t0")->conditions.size(), 1U);
+}
+
+TEST_F(Journals, HoldPasswordsOfACommandWholeWhileTheTaskNeedsThemAndNowhereAfterwards) {
+    open();
+    Task task = asked("key:t1");
+    task.conditions = {{"COMMAND", OPER_EQ, "INSTALL"},
+                       {"TRANSID", OPER_EQ, "key:t1"},
+                       {"CONTEXT", OPER_EQ, "./install.sh --password=Tr0ub4dor now"},
+                       {"UASCRIPT", OPER_EQ, "pwd: 'Tr0ub4dor 2'"}};
+    journal->enter(task);
+    EXPECT_EQ(journal->find("key:t1")->conditions.at(2).value,
+              "./install.sh --password=Tr0ub4dor now");
+    EXPECT_EQ(journal->find("key:t1")->value("CONTEXT"), "./install.sh --password=*** now")
+        << "it is shown to nobody";
+    task.reason = "token=Tr0ub4dor is wrong";
+    task.hint = "no secret: Tr0ub4dor";
+    journal->saveOutcome({ended(task, TaskState::Failed)}, "row");
+    EXPECT_TRUE(eventually([this] { return allBytes().find("Tr0ub4dor") == std::string::npos; }));
+    const std::optional<Task> kept = journal->find("key:t1");
+    EXPECT_EQ(kept->conditions.at(2).value, "./install.sh --password=*** now");
+    EXPECT_EQ(kept->value("UASCRIPT"), "pwd: ***");
+    EXPECT_EQ(kept->value("TRANSID"), "key:t1") << "a task is found by it";
+    EXPECT_EQ(kept->reason, "token=*** is wrong");
+    EXPECT_EQ(kept->hint, "no secret: ***");
 }
 
 TEST_F(Journals, CutLongValuesOfTasksThatAreOver) {
@@ -232,7 +249,7 @@ TEST_F(Journals, AnOutcomeWaitsUntilThereIsRoom) {
     std::thread executor;
     {
         const FullDisk full;
-        executor = std::thread([&] { journal->saveOutcome({ended(task)}); });
+        executor = std::thread([&] { journal->saveOutcome({ended(task)}, "row"); });
         EXPECT_TRUE(eventually([this] { return !journal->trouble().empty(); }));
     }
     executor.join();
@@ -259,7 +276,7 @@ TEST_F(Journals, KeepOnlySoManyRowsButTheirTasks) {
     for (int i = 0; i < 5; ++i) {
         Task task = entered("t" + std::to_string(i));
         task.outcomes = {"row"};
-        journal->saveOutcome({ended(task)});
+        journal->saveOutcome({ended(task)}, "row");
     }
     host::Journal::Settings few = settings();
     few.keepRows = 2;
@@ -267,6 +284,55 @@ TEST_F(Journals, KeepOnlySoManyRowsButTheirTasks) {
     EXPECT_EQ(transids().size(), 5U);
     EXPECT_THAT(journal->find("t2")->outcomes, IsEmpty());
     EXPECT_THAT(journal->find("t3")->outcomes, ElementsAre("row"));
+}
+
+TEST_F(Journals, MakeAnEventOfEveryRowAndEveryEnd) {
+    open();
+    EXPECT_EQ(journal->lastEvent().number, 0);
+    Task task = entered("t1");
+    task.state = TaskState::Running;
+    task.outcomes = {"begun ***"};
+    journal->saveOutcome({task}, "begun abc");
+    task.outcomes.push_back("over ***");
+    journal->saveOutcome({ended(task)}, "over abc");
+    journal->keepRow("nobody's ***", "nobody's abc");
+    EXPECT_EQ(journal->cancel(entered("t2").number), Journal::Cancel::Ended);
+    EXPECT_EQ(journal->lastEvent().journal, journal->identity());
+    EXPECT_THAT(events(), ElementsAre("1 row of 1: begun abc", "2 row of 1: over abc", "3 end of 1",
+                                      "4 row of 0: nobody's abc", "5 end of 2"));
+    open();
+    EXPECT_EQ(journal->lastEvent().number, 5);
+    EXPECT_THAT(events(), ElementsAre("1 row of 1: begun ***", "2 row of 1: over ***", "3 end of 1",
+                                      "4 row of 0: nobody's ***", "5 end of 2"));
+    EXPECT_THAT(events(3, 1), ElementsAre("4 row of 0: nobody's ***"));
+    EXPECT_EQ(journal->byNumber(2)->state, TaskState::Cancelled);
+    entered("t3", TaskWay::Query);
+    open();
+    EXPECT_THAT(events(5), ElementsAre("6 end of 3")) << "it was interrupted";
+}
+
+TEST_F(Journals, TellOfEventsBeforeTheOutcomeIsReportedAsKept) {
+    open();
+    std::int64_t last = 0;
+    journal->whenEvents([&] { last = journal->lastEvent().number; });
+    journal->saveOutcome({ended(entered("t1"))}, "row");
+    EXPECT_EQ(last, 1);
+    journal->whenEvents({});
+}
+
+TEST_F(Journals, GiveARowThatHadToWaitAsItCame) {
+    open();
+    Task task = entered("t1");
+    task.outcomes = {"***"};
+    std::thread executor;
+    {
+        const FullDisk full;
+        executor = std::thread([&] { journal->saveOutcome({ended(task)}, "abc"); });
+        EXPECT_TRUE(eventually([this] { return !journal->trouble().empty(); }));
+        EXPECT_EQ(journal->lastEvent().number, 0);
+    }
+    executor.join();
+    EXPECT_THAT(events(), ElementsAre("1 row of 1: abc", "2 end of 1"));
 }
 
 TEST_F(Journals, WithoutADirectoryAreInMemory) {

@@ -65,7 +65,7 @@ TEST_F(PowerLoss, TakesWhatWasNotSynced) {
 TEST_F(PowerLoss, LeavesWhatWasAcceptedHandedOverAndEnded) {
     withPowerLoss([this] {
         open();
-        journal->saveOutcome({ended(entered("over"))});
+        journal->saveOutcome({ended(entered("over"))}, "row");
         Task task = entered("running");
         task.run = journal->run();
         journal->save(task);
@@ -110,7 +110,7 @@ TEST_F(PowerLoss, AtAnyMomentLosesNothingThatWasAnsweredAndKeepsTheJournalSound)
             for (int i = 0; i < 20; ++i) {
                 const Task task = entered("t" + std::to_string(number + i));
                 scratch.write(answered, std::to_string(i + 1));
-                if (i % 3 == 0) journal->saveOutcome({ended(task)});
+                if (i % 3 == 0) journal->saveOutcome({ended(task)}, "row");
             }
         });
         open();

@@ -293,7 +293,7 @@ TEST_F(Kills, BeforeTheCommitOfTheOutcomeTheTaskIsInterruptedAndTheNextWaits) {
         const Task task = running("q1");
         entered("q2", TaskWay::Query);
         host::commitHook = hook;
-        journal->saveOutcome({ended(task)});
+        journal->saveOutcome({ended(task)}, "row");
     });
     EXPECT_EQ(stateOf("q1"), TaskState::Interrupted);
     EXPECT_EQ(stateOf("q2"), TaskState::Queued);
@@ -306,7 +306,7 @@ TEST_F(Kills, AfterTheCommitOfTheOutcomeTheTaskIsDoneAndTheNextInterrupted) {
         next.state = TaskState::Running;
         next.started = host::WallClock::now();
         host::commitHook = hook;
-        journal->saveOutcome({ended(task), next});
+        journal->saveOutcome({ended(task), next}, "row");
     });
     EXPECT_EQ(stateOf("q1"), TaskState::Done);
     EXPECT_EQ(stateOf("q2"), TaskState::Interrupted);

@@ -27,6 +27,21 @@ TEST(JournalSchema, IsPreparedOnlyOnce) {
     EXPECT_EQ(host::integrityFault(database), "");
 }
 
+TEST(JournalSchema, RowsOfTheFirstVersionBecomeEvents) {
+    Database database(":memory:");
+    database.run(
+        "CREATE TABLE facts (name TEXT PRIMARY KEY, value BLOB NOT NULL) WITHOUT ROWID;"
+        "CREATE TABLE outcomes (id INTEGER PRIMARY KEY AUTOINCREMENT, task INTEGER, row BLOB NOT "
+        "NULL);"
+        "INSERT INTO facts VALUES ('identity', x'61');"
+        "INSERT INTO outcomes VALUES (7, 1, x'62');"
+        "PRAGMA user_version = 1");
+    host::prepareSchema(database);
+    EXPECT_EQ(database.number("PRAGMA user_version"), host::kSchemaVersion);
+    EXPECT_EQ(host::journalIdentity(database), "a");
+    EXPECT_EQ(database.number("SELECT id FROM outcomes WHERE kind = 0 AND row = x'62'"), 7);
+}
+
 TEST(JournalSchema, OneOfANewerHostIsLeftAsItIs) {
     Database database(":memory:");
     database.run("CREATE TABLE future (a); PRAGMA user_version = 1000");

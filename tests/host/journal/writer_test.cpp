@@ -47,6 +47,24 @@ TEST_F(JournalWriter, ThoseThatWaitShareOneTransaction) {
     EXPECT_EQ(rows(), 50);
 }
 
+TEST_F(JournalWriter, TellsOfACommitBeforeWhoeverWaitsForIt) {
+    std::string told;
+    Writer writer(database, nullptr,
+                  {[&told] { told += "begins "; },
+                   [this, &told](Database&) { told += std::to_string(rows()) + " rows "; }});
+    writer.submit(inserting(1)).get();
+    EXPECT_EQ(told, "begins 1 rows ");
+    EXPECT_THROW(writer.submit([](Database& written) { written.run("nonsense"); }).get(),
+                 host::DatabaseError);
+    EXPECT_EQ(told, "begins 1 rows begins 1 rows ") << "the others of a transaction count";
+}
+
+TEST_F(JournalWriter, AWatchThatFailsTakesNothingBack) {
+    Writer writer(database, nullptr, {{}, [](Database& written) { written.run("nonsense"); }});
+    EXPECT_NO_THROW(writer.submit(inserting(1)).get());
+    EXPECT_EQ(rows(), 1);
+}
+
 TEST_F(JournalWriter, OneThatFailsLeavesTheOthersAlone) {
     Gate gate;
     Writer writer(database);

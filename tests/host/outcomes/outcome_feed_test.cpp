@@ -90,18 +90,46 @@ TEST_F(Feed, SubscribersThatFailDisturbNobodyElse) {
     const auto thrower =
         feed->subscribe({}, [](const oxa::Rows&) -> int { throw std::runtime_error("no memory"); });
     const auto other = feed->subscribe({}, into(seen));
-    EXPECT_EQ(publish("a"), OXA_OVERFLOW);
-    EXPECT_EQ(publish("b"), OXA_OVERFLOW);
+    EXPECT_EQ(publish("a"), OXA_OK);
+    EXPECT_EQ(publish("b"), OXA_OK);
     EXPECT_EQ(seen, "ab");
 }
 
-TEST_F(Feed, TellsThePublisherOfALoss) {
-    std::string seen;
-    auto full = feed->subscribe({}, into(seen, OXA_OVERFLOW));
-    const auto other = feed->subscribe({}, into(seen));
-    EXPECT_EQ(publish("a"), OXA_OVERFLOW);
-    full.reset();
-    EXPECT_EQ(publish("b"), OXA_OK);
+TEST_F(Feed, HoldsNoLockOfTheTableWhileASubscriberTakesItsTime) {
+    std::promise<void> entered, leave;
+    const auto slow = feed->subscribe({}, [&](const oxa::Rows&) {
+        entered.set_value();
+        leave.get_future().wait();
+        return static_cast<int>(OXA_OK);
+    });
+    std::atomic<bool> next{false};
+    std::thread executor([&] {
+        publish("a");
+        next = true;
+    });
+    entered.get_future().wait();
+    EXPECT_EQ(outcomes.liveObjects(), 1U) << "which takes the table's lock";
+    EXPECT_NE(oxa::subscribe("KAGDYST", {}, [](const oxa::Rows&) { return 0; }), nullptr);
+    EXPECT_FALSE(next) << "the executor waits all the same";
+    leave.set_value();
+    executor.join();
+}
+
+TEST_F(Feed, RowsOfSeveralPublishersKeepTheirOrderForEverybody) {
+    std::string first, second;
+    const auto one = feed->subscribe({}, into(first));
+    const auto two = feed->subscribe({}, into(second));
+    std::vector<std::thread> publishers;
+    for (const char* name : {"a", "b", "c"}) {
+        publishers.emplace_back([&, name] {
+            for (int i = 0; i < 50; ++i)
+                publish(name);
+        });
+    }
+    for (std::thread& publisher : publishers)
+        publisher.join();
+    EXPECT_EQ(first.size(), 150U);
+    EXPECT_EQ(first, second);
 }
 
 TEST_F(Feed, WaitsForACallInProgressBeforeASubscriptionEnds) {

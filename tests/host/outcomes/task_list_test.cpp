@@ -4,12 +4,14 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <optional>
 #include <thread>
 
 #include "host/commands/ear.h"
 #include "host/journal/journal.h"
 #include "host/made_up_table.h"
+#include "support/full_disk.h"
 #include "support/host/program.h"
 #include "support/scratch_dir.h"
 #include "util/zavutil.h"
@@ -292,6 +294,37 @@ TEST_F(Tasks, AnOutcomeIsKeptBeforeAnybodyElseSeesIt) {
     EXPECT_THAT(seen, ElementsAre(TaskState::Done));
 }
 
+TEST_F(Tasks, WhileAnOutcomeCannotBeKeptTheExecutorWaitsAndTheTableIsFree) {
+    ScratchDir scratch;
+    host::Journal onDisk({scratch.path("state")});
+    list.reset();
+    list.emplace(*tables, *feed, onDisk, true);
+    ask("t1");
+    std::atomic<bool> seen{false};
+    std::atomic<bool> next{false};
+    const auto other = feed->subscribe({}, [&](const oxa::Rows&) {
+        EXPECT_EQ(stateOf("t1"), TaskState::Done) << "it is kept before anybody else gets it";
+        seen = true;
+        return static_cast<int>(OXA_OK);
+    });
+    std::thread executor;
+    {
+        const FullDisk full;
+        executor = std::thread([&] {
+            publish("t1");
+            next = true;
+        });
+        EXPECT_TRUE(eventually([&] { return !onDisk.trouble().empty(); }));
+        EXPECT_EQ(outcomes.liveObjects(), 1U) << "which takes the table's lock";
+        EXPECT_FALSE(seen);
+        EXPECT_FALSE(next) << "the next task waits";
+    }
+    executor.join();
+    EXPECT_TRUE(seen);
+    EXPECT_EQ(onDisk.trouble(), "");
+    list.reset();
+}
+
 TEST_F(Tasks, ARowThatBelongsToNoTaskHoldsNobodyUp) {
     publish("unknown");
     ask("t1");
@@ -522,9 +555,9 @@ public:
     void enter(Task&) override { throw host::NotKept("the disk is full"); }
     void enterSoon(Task) override {}
     void save(const Task&) override { throw host::NotKept("the disk is full"); }
-    void saveOutcome(const std::vector<Task>&) override {}
+    void saveOutcome(const std::vector<Task>&, const std::string&) override {}
     void saveSoon(Task) override {}
-    void keepRow(const std::string&) override {}
+    void keepRow(const std::string&, const std::string&) override {}
     void forget(std::int64_t) override {}
     std::vector<Task> newest(const host::TaskFilter&) override { return {}; }
     std::optional<Task> find(std::string_view) override { return std::nullopt; }

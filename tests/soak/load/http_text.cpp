@@ -1,5 +1,6 @@
 #include "soak/load/http_text.h"
 
+#include <algorithm>
 #include <cstdlib>
 #include <nlohmann/json.hpp>
 #include <stdexcept>
@@ -80,13 +81,15 @@ std::optional<EventMessage> takeEvent(std::string& in) {
         text = in.substr(0, end);
         in.erase(0, end + 2);
     } while (text.rfind(':', 0) == 0);
-    const std::string overflow = "event: overflow\ndata: ";
+    const std::string id = "id: ";
+    const std::string gap = "event: gap\ndata: ";
     const std::string data = "data: ";
+    if (text.rfind(id, 0) == 0) text.erase(0, std::min(text.size(), text.find('\n')) + 1);
     EventMessage message;
     try {
-        if (text.rfind(overflow, 0) == 0) {
-            message.overflow = true;
-            message.lost = json::parse(text.substr(overflow.size())).at("lost").get<std::size_t>();
+        if (text.rfind(gap, 0) == 0) {
+            message.gap = true;
+            message.lost = json::parse(text.substr(gap.size())).at("missing").get<std::size_t>();
         } else if (text.rfind(data, 0) == 0) {
             message.row = outcomeOf(json::parse(text.substr(data.size())));
         } else {

@@ -27,9 +27,9 @@ std::string queryBody(const std::string& table,
 /// the status -1.
 std::optional<Answer> takeAnswer(std::string& in);
 
-/// One message of an event stream: a row, or how many were lost.
+/// One message of an event stream: a row, or how many events are not kept any more.
 struct EventMessage {
-    bool overflow = false;
+    bool gap = false;
     std::size_t lost = 0;
     OutcomeRow row;
 };

@@ -38,7 +38,7 @@ bool ControlSubscriber::proceed(bool readable, bool) {
         live_ = head.has_value();
     }
     while (const auto message = live_ ? takeEvent(connection_.in()) : std::nullopt) {
-        if (message->overflow) {
+        if (message->gap) {
             world_.tally.fault("the control subscription lost " + std::to_string(message->lost) +
                                " rows although it always reads");
         } else {
@@ -116,9 +116,9 @@ bool Subscriber::takeHead() {
 
 void Subscriber::takeRows() {
     while (const auto message = takeEvent(connection_.in())) {
-        if (message->overflow) {
-            world_.tally.count("overflows told");
-            world_.tally.count("rows told lost", message->lost);
+        if (message->gap) {
+            world_.tally.count("gaps told");
+            world_.tally.count("events told missing", message->lost);
             record_.items.push_back({Ledger::kNone, 0, message->lost});
             continue;
         }

@@ -18,6 +18,7 @@ TEST(EventParser, ReturnsAnEventWhenItsEmptyLineHasCome) {
     ASSERT_EQ(events.size(), 1U);
     EXPECT_EQ(events[0].type, "message");
     EXPECT_EQ(events[0].data, "{\"A\": 1}");
+    EXPECT_EQ(events[0].id, "");
 }
 
 TEST(EventParser, GivesTheSameEventsForEverySplitOfTheBytes) {

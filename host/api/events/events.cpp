@@ -1,0 +1,100 @@
+// GET /v1/events
+//
+// Each row is one event, "data: {...}", in the order in which the rows came. Outcomes come from the
+// journal, so a slow reader loses none. Rows of other tables are not kept: when their reader is too
+// slow, one event "event: overflow" with "data: {"lost": N}" stands in the place of those that are
+// lost, and the stream goes on.
+
+#include "host/api/call.h"
+#include "host/api/events/outcome_events.h"
+#include "host/api/services.h"
+#include "host/tables/bad_request.h"
+#include "host/tables/conditions.h"
+#include "host/tables/plugin_facts.h"
+#include "host/tables/table_documents.h"
+
+namespace host {
+namespace {
+
+class RowEvents final : public EventSource {
+public:
+    /// `table` and `codePage` outlive the source.
+    RowEvents(const oxa::Table& table, const CodePage& codePage, RowQueue::Limits limits)
+        : table_(table), codePage_(codePage), queue_(std::make_shared<RowQueue>(limits)) {}
+
+    /// Opens the subscription: rows are kept from now on. False when the table takes none. Runs the
+    /// table's code.
+    bool subscribe(const std::vector<oxa::Predicate>& where) {
+        subscription_ = oxa::subscribe(table_.name, where, [queue = queue_](const oxa::Rows& rows) {
+            return queue->push(rows);
+        });
+        return subscription_ != nullptr;
+    }
+
+    void start(std::function<void()> wake) override { queue_->onContent(std::move(wake)); }
+    bool empty() const override { return queue_->empty(); }
+    std::string take() override {
+        const RowQueue::Batch batch = queue_->take();
+        std::string text;
+        for (std::size_t i = 0; i < batch.rows.count(); ++i) {
+            appendEvent(text, {rowDocument(table_, rowOf(batch.rows, i), codePage_), {}, {}});
+        }
+        if (batch.lost > 0) {
+            appendEvent(text, {"{\"lost\":" + std::to_string(batch.lost) + "}", "overflow", {}});
+        }
+        return text;
+    }
+
+private:
+    const oxa::Table& table_;
+    const CodePage& codePage_;
+    const std::shared_ptr<RowQueue> queue_;
+    std::unique_ptr<oxa::Subscription> subscription_;
+};
+
+std::unique_ptr<EventSource> rowEvents(Services& services, const oxa::Table& table,
+                                       const std::vector<oxa::Predicate>& where) {
+    auto source = std::make_unique<RowEvents>(table, services.codePage, services.eventLimits);
+    if (!source->subscribe(where)) return nullptr;
+    return source;
+}
+
+/// Rows of other tables have no identifiers.
+void checkOutcomeParameters(const Call& call, const std::string& table) {
+    for (const char* const name : {"after", "tasks"}) {
+        if (call.text(name) != nullptr && table != plugin::kOutcomeTable) {
+            throw BadRequest("\"" + std::string(name) + "\" goes with the table " +
+                             std::string(plugin::kOutcomeTable) + " only");
+        }
+    }
+}
+
+/// The field of a client that reconnects by itself is newer than the parameter, which it repeats.
+std::string wantedPosition(const Call& call) {
+    if (!call.lastEventId().empty()) return call.lastEventId();
+    const std::string* const after = call.text("after");
+    return after == nullptr ? std::string() : *after;
+}
+
+}  // namespace
+
+Endpoint getEvents;
+
+Answer getEvents(Services& services, const Call& call) {
+    const std::string& name = call.required("table");
+    const oxa::Table* const table = services.tables.find(name);
+    if (table == nullptr) return errorReply(404, "there is no table \"" + name + "\"");
+    const ConditionReader reader(*table, services.codePage);
+    std::vector<oxa::Predicate> where;
+    for (const auto& [column, text] : call.columns())
+        where.push_back(reader.equality(column, text));
+    checkOutcomeParameters(call, name);
+    auto source = name == plugin::kOutcomeTable
+                      ? outcomeEvents(services, *table,
+                                      {std::move(where), call.flag("tasks"), wantedPosition(call)})
+                      : rowEvents(services, *table, where);
+    if (!source) return errorReply(500, "the table takes no subscription");
+    return Answer(std::move(source));
+}
+
+}  // namespace host
