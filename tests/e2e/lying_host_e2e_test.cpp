@@ -172,6 +172,9 @@ TEST(LyingHost, WhoseAnswerIsNoneIsAFailureOfEveryVerb) {
                            {"depot", "rm", "file"},
                            {"doctor"},
                            {"ps"},
+                           {"tasks"},
+                           {"task", "show", "T"},
+                           {"task", "cancel", "T"},
                            {"events", "--count", "1"}};
     for (const Lie& lie : answersThatAreNone()) {
         const LyingHost host(lie.tell);
