@@ -3,6 +3,7 @@
 // Large files take long, so that threads of their own compute sums, a few requests at a time:
 // however many there are, the workers are free for other requests.
 
+#include <memory>
 #include <nlohmann/json.hpp>
 
 #include "host/api/call.h"
@@ -36,12 +37,33 @@ nlohmann::ordered_json rowOf(const Depot& depot, const std::string& path) {
     return file;
 }
 
-Reply sumsOf(const Depot& depot, const std::vector<std::string>& paths) {
+/// One request in the course of its computation.
+struct Sums {
+    Services& services;
+    const std::vector<std::string> paths;
+    const Responder responder;
     nlohmann::ordered_json files = nlohmann::ordered_json::array();
-    for (const std::string& path : paths)
-        files.push_back(rowOf(depot, path));
+};
+
+Reply replyWith(nlohmann::ordered_json files) {
     const nlohmann::ordered_json document = {{"files", std::move(files)}};
     return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+}
+
+/// Computes the next sum. Between two of them other requests have their turn, if there is room to
+/// wait for another one.
+void advance(const std::shared_ptr<Sums>& sums) {
+    try {
+        do {
+            const std::string& path = sums->paths[sums->files.size()];
+            sums->files.push_back(rowOf(sums->services.depotFiles, path));
+            if (sums->files.size() == sums->paths.size()) {
+                return sums->responder(replyWith(std::move(sums->files)));
+            }
+        } while (!sums->services.checksums.submit([sums] { advance(sums); }));
+    } catch (const std::exception& error) {
+        sums->responder(errorReply(500, error.what()));
+    }
 }
 
 }  // namespace
@@ -50,13 +72,8 @@ Endpoint getDepotSum;
 
 Answer getDepotSum(Services& services, const Call& call) {
     const auto begin = [&services, paths = call.texts("path")](const Responder& responder) {
-        const bool taken = services.checksums.submit([&services, paths, responder] {
-            try {
-                responder(sumsOf(services.depotFiles, paths));
-            } catch (const std::exception& error) {
-                responder(errorReply(500, error.what()));
-            }
-        });
+        const auto sums = std::make_shared<Sums>(Sums{services, paths, responder});
+        const bool taken = services.checksums.submit([sums] { advance(sums); });
         if (!taken) responder(tryAgain("too many requests for checksums are waiting"));
     };
     const auto atLimit = []() -> Answer { return tryAgain("the checksums are not ready"); };

@@ -25,6 +25,10 @@ protected:
         EXPECT_EQ(::symlink("../secret", files_.path("depot/escape").c_str()), 0);
         start({}, "depot", ManagedHost::Guards::On);
     }
+    static bool answered(const RawClient& client) {
+        pollfd entry{client.descriptor(), POLLIN, 0};
+        return ::poll(&entry, 1, 0) > 0;
+    }
     ProgramResult depotVerb(std::vector<std::string> words) const {
         words.insert(words.begin(), "depot");
         return host_->zavctl(words);
@@ -86,10 +90,6 @@ TEST_F(DepotVerbs, ChecksumsOfLargeFilesHoldNobodyElseUp) {
         ASSERT_TRUE(
             clients.back().send("GET /v1/depot/sum?path=large&path=large HTTP/1.1\r\n\r\n"));
     }
-    const auto answered = [](const RawClient& client) {
-        pollfd entry{client.descriptor(), POLLIN, 0};
-        return ::poll(&entry, 1, 0) > 0;
-    };
     EXPECT_TRUE(eventually([&] {
         return std::count_if(clients.begin(), clients.end(), answered) == 150 - 2 - 128;
     })) << "two are at work and 128 wait";
@@ -103,6 +103,21 @@ TEST_F(DepotVerbs, ChecksumsOfLargeFilesHoldNobodyElseUp) {
     EXPECT_EQ(other.post("/v1/query", R"({"table":"KINAGT"})").status, 200);
     EXPECT_EQ(host_->stop().status, 0) << "and not the end of the host";
     EXPECT_EQ(waiting->readAnswer().status, 503);
+}
+
+TEST_F(DepotVerbs, ManyChecksumsAtOnceLetOthersHaveTheirTurn) {
+    files_.write("depot/m", std::string(8 << 20, 'm'));
+    std::string many = "GET /v1/depot/sum?path=m";
+    for (int i = 1; i < 1'500; ++i)
+        many += "&path=m";
+    RawClient first(host_->socket());
+    RawClient second(host_->socket());
+    for (RawClient* const client : {&first, &second})
+        ASSERT_TRUE(client->send(many + " HTTP/1.1\r\n\r\n"));
+    RawClient third(host_->socket());
+    EXPECT_THAT(third.get("/v1/depot/sum?path=b").body, HasSubstr("\"bytes\":0"));
+    for (const RawClient* const client : {&first, &second})
+        EXPECT_FALSE(answered(*client)) << "they have as many files before them as ever";
 }
 
 TEST_F(DepotVerbs, RemoveFiles) {

@@ -1,8 +1,10 @@
 #include "host/home/parameter_copy.h"
 
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 
+#include <csignal>
 #include <filesystem>
 #include <system_error>
 
@@ -138,6 +140,24 @@ TEST_F(SavedParameters, ThatCannotBeKeptAreAnError) {
     home.makeDir("config/.ConfigData/.kumenv.saved/in the way");
     EXPECT_THROW(copy.save(), std::system_error);
     EXPECT_EQ(text(), kBefore);
+}
+
+TEST_F(SavedParameters, StayTheOlderOnesWhereverTheDiskIsFull) {
+    copy.save();
+    damage(kAfter);
+    std::signal(SIGXFSZ, SIG_IGN);  // as on a full disk, writing beyond the limit is an error then
+    rlimit usual{};
+    ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &usual), 0);
+    for (rlim_t room = 0; room < kAfter.size(); ++room) {
+        const rlimit little{room, usual.rlim_max};
+        ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &little), 0);
+        EXPECT_THROW(copy.save(), std::system_error);
+        ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &usual), 0);
+        ASSERT_EQ(home.read(kCopy), kBefore) << room;
+    }
+    EXPECT_EQ(text(), kAfter);
+    copy.save();
+    EXPECT_EQ(home.read(kCopy), kAfter);
 }
 
 }  // namespace
