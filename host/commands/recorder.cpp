@@ -204,15 +204,15 @@ void Recorder::count(std::size_t bytes) {
 
 /// Kills at once: what a command writes while it makes up its mind would fill the memory.
 void Recorder::endForOutput() {
-    constexpr int kMostRounds = 200;
+    constexpr int kMostRounds = 1000;
     Descendants descendants(orphansBeforeFirst().value_or(std::vector<pid_t>()));
     for (int round = 0; round < kMostRounds; ++round) {
-        std::size_t reached = 0;
+        bool goOn = false;
         withCommandInHand([&](pid_t command) {
             descendants.look(command, true);
-            reached = descendants.send(SIGKILL);
+            goOn = descendants.kill();
         });
-        if (reached == 0) return;
+        if (!goOn) return;
     }
 }
 

@@ -43,7 +43,13 @@ InstallResult::Content InstallResult::look() const {
 }
 
 bool InstallResult::remove() const {
-    return ::unlink(path_.c_str()) == 0 || errno == ENOENT || errno == ENOTDIR;
+    if (::unlink(path_.c_str()) == 0) return true;
+    // A file system that is read-only says so whether or not the file is there.
+    const int fault = errno;
+    struct stat found {};
+    if (::lstat(path_.c_str(), &found) != 0 && (errno == ENOENT || errno == ENOTDIR)) return true;
+    errno = fault;
+    return false;
 }
 
 }  // namespace host

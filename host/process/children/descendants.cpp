@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <csignal>
 
 #include "host/process/children/orphans.h"
@@ -12,7 +13,8 @@ namespace {
 
 /// A process that starts others faster than they can be killed does not hold the caller up for
 /// ever.
-constexpr int kMostRounds = 200;
+constexpr int kMostRounds = 1000;
+constexpr int kQuietLooks = 2;
 
 bool contains(const std::vector<pid_t>& pids, pid_t pid) {
     return std::find(pids.begin(), pids.end(), pid) != pids.end();
@@ -71,6 +73,17 @@ std::size_t Descendants::send(int signal) {
     return reached;
 }
 
+bool Descendants::kill() {
+    bool found = false;
+    for (const ProcessEntry& process : processes_) {
+        if (!process.isAlive || !isKnown(process)) continue;
+        // One that has ended since the look may have started others before.
+        if (::kill(process.pid, SIGKILL) == 0 || errno == ESRCH) found = true;
+    }
+    quietLooks_ = found ? 0 : quietLooks_ + 1;
+    return quietLooks_ < kQuietLooks;
+}
+
 std::size_t Descendants::living() const {
     return static_cast<std::size_t>(std::count_if(
         processes_.begin(), processes_.end(),
@@ -83,7 +96,7 @@ void killDescendants(pid_t command, const std::vector<pid_t>& orphansBefore) {
     Descendants descendants(orphansBefore);
     for (int round = 0; round < kMostRounds; ++round) {
         descendants.look(command, false);
-        if (descendants.send(SIGKILL) == 0) return;
+        if (!descendants.kill()) return;
     }
 }
 

@@ -31,6 +31,10 @@ public:
     /// Sends the signal to those that lived at the last look: SIGKILL to all of them, another one
     /// only to those that have got none. Returns how many it reached.
     std::size_t send(int signal);
+    /// Kills those that lived at the last look. False once there has been nobody to kill for two
+    /// looks in a row: while one look reads the table of processes, a process that it has not come
+    /// to may start another one with an id that it has passed, and end.
+    bool kill();
     /// How many lived at the last look.
     std::size_t living() const;
 
@@ -49,6 +53,7 @@ private:
     std::vector<ProcessEntry> processes_;  ///< of the last look
     std::set<Name> known_;
     std::set<Name> signalled_;
+    int quietLooks_ = 0;  ///< in a row
 };
 
 /// Kills everything that a command has started, down to the last descendant, because it has run too
