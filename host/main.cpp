@@ -175,6 +175,8 @@ Journal::Settings journalOf(const HostOptions& options) {
 
 void run(const HostOptions& options) {
     ras1::showSecrets(options.traceSecrets || !options.guarded);
+    constexpr int kOlderLogs = 3;
+    ras1::limitLog(static_cast<std::uint64_t>(options.logSize), kOlderLogs);
     std::optional<HomeLock> homeLock;
     // The checks look at the time-out too, and name it beside whatever else is wrong.
     if (options.guarded) {

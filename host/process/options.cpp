@@ -19,6 +19,7 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr int kHighestPort = 65535;
+constexpr int kSmallestLog = 4096;
 
 /// The command line as it was typed; a missing option is an absent value.
 struct Typed {
@@ -37,6 +38,7 @@ struct Typed {
     std::optional<std::string> taskTimeout;
     std::optional<std::string> grace;
     std::optional<std::string> maxOutput;
+    std::optional<std::string> logSize;
     bool noJournal = false;
     bool traceSecrets = false;
     bool check = false;
@@ -98,6 +100,10 @@ const OptionRow kOptions[] = {
      "How much the commands of one task may write before they are ended, 1 to 1000000000; 16777216 "
      "if not given",
      &Typed::maxOutput},
+    {"--log-size", "BYTES",
+     "How long the trace log gets before a new one is begun, 4096 to 1000000000; 10485760 if not "
+     "given",
+     &Typed::logSize},
     {"--trace-secrets", nullptr, "Show passwords and configurations in the trace log as they are",
      &Typed::traceSecrets},
     {"--check", nullptr,
@@ -202,15 +208,16 @@ std::string stateDirectory(const Typed& typed, const std::string& home,
                             : absolutePath(provided.substr(0, provided.find(':')));
 }
 
-/// A whole number from 1 to `most`; `otherwise` when the option was not given.
-int countOf(const char* option, const std::optional<std::string>& typed, int most, int otherwise) {
+/// A whole number from `least` to `most`; `otherwise` when the option was not given.
+int countOf(const char* option, const std::optional<std::string>& typed, int most, int otherwise,
+            int least = 1) {
     if (!typed) return otherwise;
     int number = 0;
     const char* const end = typed->data() + typed->size();
     const auto [rest, error] = std::from_chars(typed->data(), end, number);
-    if (error != std::errc() || rest != end || number < 1 || number > most) {
-        throw StartError(std::string(option) + " takes a number from 1 to " + std::to_string(most) +
-                         ", not \"" + *typed + "\"");
+    if (error != std::errc() || rest != end || number < least || number > most) {
+        throw StartError(std::string(option) + " takes a number from " + std::to_string(least) +
+                         " to " + std::to_string(most) + ", not \"" + *typed + "\"");
     }
     return number;
 }
@@ -268,6 +275,8 @@ std::optional<HostOptions> readOptions(int argc, const char* const* argv,
     options.grace = std::chrono::seconds(
         countOf("--grace", typed->grace, 86'400, static_cast<int>(options.grace.count())));
     options.maxOutput = countOf("--max-output", typed->maxOutput, 1'000'000'000, options.maxOutput);
+    options.logSize =
+        countOf("--log-size", typed->logSize, 1'000'000'000, options.logSize, kSmallestLog);
     chooseSockets(*typed, environment, options);
     chooseJournal(*typed, options);
     return options;

@@ -25,6 +25,7 @@ struct HostOptions {
     /// How long the host waits for the task in hand when it is told to end.
     std::chrono::seconds grace{10};
     int maxOutput = 16 << 20;               ///< bytes that the commands of one task may write
+    int logSize = 10 << 20;                 ///< bytes, after which a new trace log is begun
     bool rerunInterrupted = false;          ///< the task that an unclean end cut off runs again
     std::optional<std::uint16_t> rpcPort;   ///< absent: no TCP
     std::optional<std::string> originNode;  ///< absent: the platform's own choice

@@ -12,7 +12,9 @@
 #include <climits>
 #include <cstdio>
 #include <cstdlib>
+#include <sstream>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "embedded/ras1_control.h"
@@ -23,6 +25,7 @@
 namespace {
 
 using testing::ElementsAre;
+using testing::HasSubstr;
 using testing::MatchesRegex;
 
 constexpr unsigned kAll = RAS1_DETAIL | RAS1_FLOW | RAS1_ERROR;
@@ -233,6 +236,84 @@ TEST(Log, GoesOnInTheOldFileWhenItCannotBeOpenedAnew) {
     EXPECT_FALSE(ras1::reopenLog());
     RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "still");
     EXPECT_THAT(scratch.read("moved/log"), MatchesRegex("[^\n]*still\n"));
+    ras1::configureFromEnvironment();
+}
+
+/// The number of lines in a file, each of which must be whole.
+std::size_t wholeLines(const std::string& text) {
+    std::size_t count = 0;
+    std::istringstream lines(text);
+    for (std::string line; std::getline(lines, line); ++count)
+        EXPECT_THAT(line, MatchesRegex(".* E .*: line [0-9]+"));
+    EXPECT_TRUE(text.empty() || text.back() == '\n');
+    return count;
+}
+
+class ALimitedLog : public testing::Test {
+protected:
+    ALimitedLog() {
+        ras1::limitLog(4096, 3);
+        ras1::configure("ERROR", scratch_.path("log"));
+    }
+    ~ALimitedLog() override {
+        ras1::limitLog(0, 3);
+        ras1::configureFromEnvironment();
+    }
+    static void trace(int lines) {
+        for (int i = 0; i < lines; ++i)
+            RAS1_Printf(&block, RAS1_ERROR, 1, "line %d", i);
+    }
+    ScratchDir scratch_;
+};
+
+TEST_F(ALimitedLog, IsBegunAnewAndThreeOlderOnesAreKept) {
+    trace(1000);
+    for (const char* name : {"log.1", "log.2", "log.3"}) {
+        const std::string text = scratch_.read(name);
+        EXPECT_GE(text.size(), 4096U) << name;
+        EXPECT_LT(text.size(), 4096U + 200U) << name;
+        wholeLines(text);
+    }
+    EXPECT_LT(scratch_.read("log").size(), 4096U);
+    EXPECT_FALSE(scratch_.exists("log.4"));
+    EXPECT_THAT(scratch_.read("log.1") + scratch_.read("log"), HasSubstr("line 999\n"));
+}
+
+TEST_F(ALimitedLog, LosesNoLineWhenManyThreadsFillIt) {
+    std::vector<std::thread> threads;
+    for (int i = 0; i < 4; ++i)
+        threads.emplace_back([] { trace(40); });
+    for (std::thread& thread : threads)
+        thread.join();
+    std::size_t lines = 0;
+    for (const char* name : {"log", "log.1", "log.2", "log.3"}) {
+        if (scratch_.exists(name)) lines += wholeLines(scratch_.read(name));
+    }
+    EXPECT_EQ(lines, 160U);
+}
+
+TEST_F(ALimitedLog, IsNotRenamedByAChild) {
+    EXPECT_EQ(inChild([] { trace(100); }), 0);
+    EXPECT_FALSE(scratch_.exists("log.1"));
+    trace(100);
+    EXPECT_TRUE(scratch_.exists("log.1"));
+}
+
+TEST_F(ALimitedLog, GrowsOnWhereItCannotBeRenamed) {
+    scratch_.makeDir("log.1/full");
+    trace(200);
+    EXPECT_EQ(wholeLines(scratch_.read("log")), 200U);
+}
+
+TEST(Log, MayBeTheNullDeviceWhateverItsLimit) {
+    ras1::limitLog(1, 3);
+    ras1::configure("ERROR", "/dev/null");
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "text");
+    RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "text");
+    struct stat found {};
+    ASSERT_EQ(::lstat("/dev/null", &found), 0);
+    EXPECT_TRUE(S_ISCHR(found.st_mode));
+    ras1::limitLog(0, 3);
     ras1::configureFromEnvironment();
 }
 

@@ -1,17 +1,16 @@
 // Trace lines. Each event is one line, written with one call, so that lines of several threads and
-// processes do not mix in an append-mode file. Nothing here takes a lock, and a line with the
-// format
-// "%s" needs async-signal-safe calls only, so that a child can trace between fork and exec.
+// processes do not mix in an append-mode file. Nobody waits for a lock here, and a line with the
+// format "%s" needs async-signal-safe calls only, so that a child can trace between fork and exec.
 //
 //   2026-01-31 12:34:56.123456 4711 E zavtasks:123 runTask: text
 
 #include "platform/ras1.h"
 
 #include <fcntl.h>
+#include <sched.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
-#include <sys/sysmacros.h>
 #include <sys/uio.h>
 #include <unistd.h>
 
@@ -28,48 +27,13 @@
 
 #include "embedded/ras1_control.h"
 #include "ras1/ears.h"
+#include "ras1/log_file.h"
 #include "ras1/secrets.h"
 #include "ras1/selection.h"
 
 std::atomic<unsigned> RAS1_Generation{1};
 
 namespace {
-
-// The null device's numbers, which are the same on every Linux.
-constexpr unsigned kMemoryMajor = 1;
-constexpr unsigned kNullMinor = 3;
-
-/// Duplicates a descriptor to a number above those of the standard streams; -1 on failure. If the
-/// process closes descriptor 2 and a file or pipe gets that number, traces must not end up there.
-/// Nor may the log become a child's standard stream.
-int ownDescriptor(int descriptor) {
-    return ::fcntl(descriptor, F_DUPFD_CLOEXEC, 3);
-}
-
-/// A regular file, or the null device, which many choose for no log at all.
-bool canBeLog(int descriptor) {
-    struct stat found {};
-    if (::fstat(descriptor, &found) != 0) return false;
-    return S_ISREG(found.st_mode) ||
-           (S_ISCHR(found.st_mode) && found.st_rdev == ::makedev(kMemoryMajor, kNullMinor));
-}
-
-/// Follows no link in the log's place and waits for no pipe: who may write to the directory must
-/// not choose what is appended to.
-int openLog(const std::string& path) {
-    if (path.empty()) return -1;
-    constexpr int kFlags =
-        O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY;
-    const int opened = ::open(path.c_str(), kFlags, 0640);
-    if (opened != -1 && !canBeLog(opened)) {
-        ::close(opened);
-        return -1;
-    }
-    if (opened == -1 || opened > STDERR_FILENO) return opened;
-    const int moved = ownDescriptor(opened);
-    ::close(opened);
-    return moved;
-}
 
 /// Whether a write may raise SIGPIPE.
 bool hasReader(int descriptor) {
@@ -80,25 +44,58 @@ bool hasReader(int descriptor) {
 /// The settings in force. Only configure() replaces them, on one thread at a time, while others may
 /// be tracing. Never destroyed, because threads trace until the process ends.
 class Facility {
+    /// One of those who change where lines go.
+    class Turn {
+    public:
+        explicit Turn(std::atomic_flag& taken) : taken_(taken) {
+            while (taken_.test_and_set(std::memory_order_acquire))
+                ::sched_yield();
+        }
+        ~Turn() { taken_.clear(std::memory_order_release); }
+        Turn(const Turn&) = delete;
+        Turn& operator=(const Turn&) = delete;
+
+    private:
+        std::atomic_flag& taken_;
+    };
+
 public:
     Facility() { configureFromEnvironment(); }
 
     void configure(const std::string& selectionText, const std::string& logPath) {
+        const Turn turn(changing_);
         selections_.push_back(
             std::make_unique<const ras1::Selection>(ras1::parseSelection(selectionText)));
         selection_.store(selections_.back().get(), std::memory_order_release);
         logPath_ = logPath;
-        redirect(openLog(logPath));
-        readerMayGo_.store(hasReader(descriptor()), std::memory_order_relaxed);
+        redirect(ras1::openLog(logPath));
     }
 
     bool reopenLog() {
         if (logPath_.empty()) return true;
-        const int log = openLog(logPath_);
+        const int log = ras1::openLog(logPath_);
         if (log == -1) return false;
         redirect(log);
-        readerMayGo_.store(hasReader(descriptor()), std::memory_order_relaxed);
         return true;
+    }
+
+    void limitLog(std::uint64_t bytes, int kept) {
+        process_.store(::getpid(), std::memory_order_relaxed);
+        kept_.store(kept, std::memory_order_relaxed);
+        mostBytes_.store(bytes, std::memory_order_relaxed);
+    }
+
+    /// To be told of every line. The one that fills the file makes room for the next: its thread
+    /// only, and nobody waits for it.
+    void wrote(std::size_t bytes) {
+        const std::uint64_t size = bytes_.fetch_add(bytes, std::memory_order_relaxed) + bytes;
+        const std::uint64_t most = mostBytes_.load(std::memory_order_relaxed);
+        if (most == 0 || size < most) return;
+        // A child between fork and exec must not, and shares this memory with its parent.
+        if (::getpid() != process_.load(std::memory_order_relaxed)) return;
+        if (changing_.test_and_set(std::memory_order_acquire)) return;
+        startOver();
+        changing_.clear(std::memory_order_release);
     }
 
     void configureFromEnvironment() {
@@ -121,7 +118,7 @@ private:
         const int target = log != -1 ? log : standardError_;
         const int current = descriptor();
         if (current == -1) {
-            lines_.store(log != -1 ? log : ownDescriptor(standardError_),
+            lines_.store(log != -1 ? log : ras1::ownDescriptor(standardError_),
                          std::memory_order_relaxed);
         } else if (target == -1) {
             lines_.store(-1, std::memory_order_relaxed);
@@ -130,14 +127,31 @@ private:
             ::dup3(target, current, O_CLOEXEC);
             if (log != -1) ::close(log);
         }
+        readerMayGo_.store(hasReader(descriptor()), std::memory_order_relaxed);
+        bytes_.store(log != -1 ? ras1::sizeOf(descriptor()) : 0, std::memory_order_relaxed);
+    }
+
+    /// Lines go on to the old file, whatever it is called then, when no new one can be made.
+    void startOver() {
+        bytes_.store(0, std::memory_order_relaxed);
+        if (logPath_.empty() || !ras1::shiftLogs(logPath_, kept_.load(std::memory_order_relaxed)))
+            return;
+        const int log = ras1::openLog(logPath_);
+        if (log != -1) redirect(log);
     }
 
     /// The last one is in force; threads may still be reading earlier ones.
     std::vector<std::unique_ptr<const ras1::Selection>> selections_;
     std::atomic<const ras1::Selection*> selection_{nullptr};
-    std::string logPath_;  ///< of the thread that configures
-    const int standardError_ = ownDescriptor(STDERR_FILENO);
-    std::atomic<int> lines_{-1};  ///< where lines go
+    /// Set while somebody changes where lines go.
+    std::atomic_flag changing_ = ATOMIC_FLAG_INIT;
+    std::string logPath_;  ///< of whoever has set `changing_`
+    const int standardError_ = ras1::ownDescriptor(STDERR_FILENO);
+    std::atomic<int> lines_{-1};               ///< where lines go
+    std::atomic<std::uint64_t> bytes_{0};      ///< in the log
+    std::atomic<std::uint64_t> mostBytes_{0};  ///< 0: no limit
+    std::atomic<int> kept_{0};
+    std::atomic<pid_t> process_{0};
     std::atomic<bool> secretsShown_{false};
     std::atomic<bool> readerMayGo_{false};  ///< lines go to a pipe or a socket
 };
@@ -330,8 +344,10 @@ void writeLine(const RAS1_BLOCK& block, char letter, int line, const char* text,
     iovec parts[3] = {{head, headLength}, {const_cast<char*>(text), length}, {&newline, 1}};
     {
         const SigpipeShield shield(facility().readerMayGo());
-        while (::writev(facility().descriptor(), parts, 3) == -1 && errno == EINTR) {
+        ssize_t written;
+        while ((written = ::writev(facility().descriptor(), parts, 3)) == -1 && errno == EINTR) {
         }
+        if (written > 0) facility().wrote(static_cast<std::size_t>(written));
     }
     errno = savedErrno;
 }
@@ -439,6 +455,10 @@ void configure(const std::string& selection, const std::string& logPath) {
 
 bool reopenLog() {
     return facility().reopenLog();
+}
+
+void limitLog(std::uint64_t bytes, int kept) {
+    facility().limitLog(bytes, kept);
 }
 
 void configureFromEnvironment() {

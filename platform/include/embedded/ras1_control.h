@@ -1,6 +1,7 @@
 /// Lets the host process configure the embedded trace. Tests capture traces with it.
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 namespace ras1 {
@@ -18,6 +19,12 @@ void configure(const std::string& selection, const std::string& logPath);
 /// false, and lines go where they went, when it cannot be opened. Does nothing for standard error.
 /// To be called as configure() is.
 bool reopenLog();
+
+/// Bounds the file that lines go to: one that has got `bytes` long is renamed, and a new one begun.
+/// `kept` older ones stay, at least one, called like it with ".1", ".2" and so on, the newest
+/// first; 0 bytes are no limit, as at the start. Lines of children that have not executed their
+/// program yet may go a little beyond. Any thread.
+void limitLog(std::uint64_t bytes, int kept);
 
 /// Returns to the settings of the environment as it is now.
 void configureFromEnvironment();

@@ -82,6 +82,8 @@ TEST_F(Options, TheJournalKeepsWhatItIsToldToKeep) {
     EXPECT_TRUE(given->rerunInterrupted);
     EXPECT_EQ(given->orphanWait, std::chrono::seconds(10));
     EXPECT_EQ(usual->grace, std::chrono::seconds(10));
+    EXPECT_EQ(usual->logSize, 10 << 20);
+    EXPECT_EQ(read({"--log-size", "4096"})->logSize, 4096);
     EXPECT_EQ(usual->maxOutput, 16 * 1024 * 1024);
     const auto bounded = read({"--grace", "3", "--max-output", "1000"});
     EXPECT_EQ(bounded->grace, std::chrono::seconds(3));
@@ -98,6 +100,7 @@ TEST_F(Options, OfTheJournalThatMakeNoSenseAreRefused) {
     EXPECT_THROW(read({"--orphan-wait", ""}), host::StartError);
     EXPECT_THROW(read({"--grace", "0"}), host::StartError);
     EXPECT_THROW(read({"--max-output", "16M"}), host::StartError);
+    EXPECT_THROW(read({"--log-size", "4095"}), host::StartError);
     EXPECT_THROW(read({"--on-interrupt", "maybe"}), host::StartError);
     EXPECT_THROW(read({"--no-journal", "--state", "/s"}), host::StartError);
 }
