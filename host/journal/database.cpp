@@ -19,11 +19,12 @@ constexpr int kBusyMilliseconds = 5000;
 }
 
 /// SQLite would make the file with the mode that the umask leaves; its other files take over this
-/// one's.
+/// one's. A file that is there is not touched: when a process closes any descriptor of a file, the
+/// system drops all locks that the process has on it, those of other connections among them.
 void makePrivate(const std::string& file) {
     const FileDescriptor made(
-        ::open(file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
-    if (!made) {
+        ::open(file.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (!made && errno != EEXIST) {
         throw DatabaseError(file + ": " + std::generic_category().message(errno), SQLITE_CANTOPEN);
     }
 }
