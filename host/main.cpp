@@ -9,6 +9,7 @@
 #include <optional>
 #include <string>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 #include "embedded/ncs_host.h"
@@ -196,8 +197,10 @@ void run(const HostOptions& options) {
     refuseHomeOnPort(options, depot);
     provideDepotDirectory(depot);
     limitOutput(static_cast<std::uint64_t>(options.maxOutput));
-    Services services(startPlugin(options), CodePage::ofProcess(), options.home, {},
-                      options.guarded, {depot.path, options.state}, journalOf(options));
+    std::vector<oxa::Table> tables = startPlugin(options);
+    if (options.guarded) requireDepotDirectory(depot);
+    Services services(std::move(tables), CodePage::ofProcess(), options.home, {}, options.guarded,
+                      {depot.path, options.state}, journalOf(options));
     services.maxQueued = options.maxQueued;
     services.checkSubject = [options] { return CheckSubject(options, environmentVariable); };
     Api api(services, routes());

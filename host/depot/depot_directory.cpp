@@ -14,15 +14,17 @@
 namespace host {
 namespace {
 
-bool isDirectory(const std::string& path) {
+/// 0, or why there is no such directory.
+int faultOf(const std::string& path) {
     struct stat found {};
-    return ::stat(path.c_str(), &found) == 0 && S_ISDIR(found.st_mode);
+    if (::stat(path.c_str(), &found) != 0) return errno;
+    return S_ISDIR(found.st_mode) ? 0 : ENOTDIR;
 }
 
 void makeDirectory(const std::string& path) {
     if (::mkdir(path.c_str(), 0700) == 0) return;
     const int reason = errno;
-    if (reason == EEXIST && isDirectory(path)) return;
+    if (reason == EEXIST && faultOf(path) == 0) return;
     throw StartError("cannot make the depot directory " + path + ": " +
                      std::strerror(reason == EEXIST ? ENOTDIR : reason));
 }
@@ -53,6 +55,16 @@ void provideDepotDirectory(const DepotDirectory& depot) {
     ::setenv(kDepotVariable, depot.path.c_str(), 1);
     std::fprintf(stderr, "zavhost: %s is not set; the depot is %s\n", kDepotVariable,
                  depot.path.c_str());
+}
+
+void requireDepotDirectory(const DepotDirectory& depot) {
+    const int fault = faultOf(depot.path);
+    if (fault == 0) return;
+    throw StartError("the depot " + depot.path + " is not there and could not be made (" +
+                     std::strerror(fault) +
+                     "); every command and every push would be refused; name a directory that the "
+                     "host's user may write to in " +
+                     kDepotVariable);
 }
 
 }  // namespace host

@@ -25,6 +25,10 @@ DepotDirectory depotDirectoryOf(const std::string& home, const char* named, bool
 /// when the directory cannot be made.
 void provideDepotDirectory(const DepotDirectory& depot);
 
+/// Throws StartError when the depot is no directory. The plug-in makes the one that somebody named
+/// when it starts; if it cannot, it says nothing and refuses every command from then on.
+void requireDepotDirectory(const DepotDirectory& depot);
+
 /// Whether the depot is the home or a directory around it, so that transfers could replace the
 /// home's programs. Links are followed.
 bool holdsHome(const DepotDirectory& depot, const std::string& home);

@@ -35,14 +35,8 @@ std::string hostIn(const std::string& name) {
     return name.substr(begin, last - begin);
 }
 
-bool sameHost(const std::string& a, const std::string& b) {
+bool equalIgnoringCase(const std::string& a, const std::string& b) {
     return !a.empty() && ::strcasecmp(a.c_str(), b.c_str()) == 0;
-}
-
-bool namesThisMachine(const std::string& target) {
-    const std::string host = hostIn(target);
-    return target.find(':') != std::string::npos &&
-           (sameHost(host, Machine::shortName()) || sameHost(host, hostIn(oxa::originNode())));
 }
 
 /// What stands at the end of a product's managed system names.
@@ -51,6 +45,17 @@ std::string codeOf(std::string product) {
     std::transform(product.begin(), product.end(), product.begin(),
                    [](unsigned char c) { return static_cast<char>(std::toupper(c)); });
     return product;
+}
+
+/// Whether it is the default instance's own name: "HOST:CODE" of this machine or of the origin
+/// node. A name with another code, or with an instance before the host, means something else.
+bool namesDefaultInstance(const std::string& product, const std::string& target) {
+    const std::size_t colon = target.find(':');
+    if (colon == std::string::npos || colon != target.rfind(':')) return false;
+    const std::string host = target.substr(0, colon);
+    return equalIgnoringCase(target.substr(colon + 1), codeOf(product)) &&
+           (equalIgnoringCase(host, Machine::shortName()) ||
+            equalIgnoringCase(host, hostIn(oxa::originNode())));
 }
 
 /// The default instance and those that have a configuration file.
@@ -76,7 +81,7 @@ void checkTarget(CommandRequest& request, Machine& machine) {
     const std::string& target = request.target();
     if (target.empty() || !isResolved(request)) return;
     const Resolution resolved = machine.resolve(request.product(), target);
-    if (!resolved.instance.empty() || namesThisMachine(target)) return;
+    if (!resolved.instance.empty() || namesDefaultInstance(request.product(), target)) return;
     const std::vector<std::string> known = knownNames(machine.site(), request.product());
     throw Refusal("target",
                   quoted(target, machine.site().codePage) + " names no instance of " +

@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/utsname.h>
 
 #include <filesystem>
 #include <nlohmann/json.hpp>
@@ -242,6 +243,14 @@ TEST(GuardedRequests, AnInstallNeedsItsFolderOfTheDepot) {
 
 // ---- Targets ------------------------------------------------------------------------------------
 
+/// The name of this machine as managed system names have it.
+std::string thisMachine() {
+    utsname names{};
+    if (::uname(&names) != 0) return "";
+    const std::string name = names.nodename;
+    return name.substr(0, name.find('.'));
+}
+
 TEST(GuardedRequests, ATypingSlipStopsNoOtherInstance) {
     StarterHome home("ux");
     {
@@ -253,11 +262,21 @@ TEST(GuardedRequests, ATypingSlipStopsNoOtherInstance) {
         EXPECT_NE(reply.body.value("hint", "").find(":UX"), std::string::npos);
         EXPECT_EQ(command(host, "REMOVEINSTANCE", "ux", {{"TARGETMSN", "typo:UX"}}).guard(),
                   "target");
+        const std::string here = thisMachine();
+        for (const std::string& target :
+             {"db1:" + here + ":UY", here + ":UM", "a:b:" + here + ":UX"})
+            EXPECT_EQ(command(host, "STOP", "ux", {{"TARGETMSN", target}}).guard(), "target")
+                << target;
         EXPECT_TRUE(home.runs("ux"));
     }
     ManagedHost unguarded(home.path(), home.environment());
-    EXPECT_TRUE(command(unguarded, "STOP", "ux", {{"TARGETMSN", "typo:UX"}}).accepted());
-    EXPECT_TRUE(eventually([&] { return !home.runs("ux"); })) << "the default instance";
+    for (const char* const target : {"typo:UX", "db1:elsewhere:UY"}) {
+        if (!home.runs("ux")) {
+            ASSERT_EQ(unguarded.zavctl({"start", "ux"}).status, 0);
+        }
+        EXPECT_TRUE(command(unguarded, "STOP", "ux", {{"TARGETMSN", target}}).accepted());
+        EXPECT_TRUE(eventually([&] { return !home.runs("ux"); })) << "the default instance";
+    }
 }
 
 TEST(GuardedRequests, TargetsThatAreKnownPass) {

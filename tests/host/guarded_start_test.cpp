@@ -154,6 +154,16 @@ TEST_F(GuardedStart, ADepotThatCannotBeUsedIsRefused) {
         << result.err;
 }
 
+TEST_F(GuardedStart, ADepotThatThePlugInCannotMakeIsRefused) {
+    // Nothing about /proc says that no directory can be made there.
+    const ProgramResult result = refused({}, {{"QVSDEPLOY_AGENTDEPOT", "/proc/depot"}});
+    EXPECT_EQ(result.status, 1);
+    EXPECT_EQ(result.out, "");
+    EXPECT_NE(result.err.find("/proc/depot"), std::string::npos) << result.err;
+    const auto unguarded = start("s", {"--unguarded"}, {{"QVSDEPLOY_AGENTDEPOT", "/proc/depot"}});
+    EXPECT_TRUE(isReady(*unguarded, "s")) << unguarded->err();
+}
+
 TEST_F(GuardedStart, AnUnguardedHostStartsWithoutADepotAndItsPlugInRefusesEveryCommand) {
     const std::string file = scratch.write("file", "");
     const auto program = start("s", {"--unguarded"}, {{"QVSDEPLOY_AGENTDEPOT", file + "/depot"}});

@@ -42,7 +42,7 @@ TEST_F(TargetGuard, TheDefaultInstanceIsNamedByThisMachineOrItsNode) {
     translator("exit 0");
     const std::string node = oxa::originNode();
     EXPECT_EQ(of("STOP", here + ":UX"), "");
-    EXPECT_EQ(of("STOP", "inst1:" + here + ":UX"), "");
+    EXPECT_EQ(of("STOP", here + ":ux"), "") << "case does not matter";
     EXPECT_EQ(of("STOP", here), "target") << "no managed system name";
     EXPECT_EQ(of("STOP", here + "x:UX"), "target");
     oxa::setOriginNode("Primary:node7:NT");
@@ -52,6 +52,18 @@ TEST_F(TargetGuard, TheDefaultInstanceIsNamedByThisMachineOrItsNode) {
     EXPECT_EQ(of("STOP", "node8:UX"), "");
     EXPECT_EQ(of("STOP", "node7:UX"), "target");
     oxa::setOriginNode(node);
+}
+
+TEST_F(TargetGuard, AnotherCodeOrAnUnknownInstanceOfThisMachineIsNotTheDefaultInstance) {
+    translator("exit 0");
+    for (const char* const name : kResolving) {
+        for (const std::string& target :
+             {here + ":UM", here + ":", ":" + here + ":UX", "inst1:" + here + ":UX",
+              "inst1:" + here + ":UY", "a:b:" + here + ":UX", here + ":UX:UX"})
+            EXPECT_EQ(of(name, target), "target") << name << " " << target;
+    }
+    EXPECT_EQ(of("STOP", here + ":UM", "um"), "target");
+    EXPECT_EQ(of("STOP", "inst1:" + here + ":UX", "um"), "target");
 }
 
 TEST_F(TargetGuard, SaysWhyTheTranslatorRefused) {
