@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <csignal>
+#include <iterator>
 
 #include "host/process/children/orphans.h"
 
@@ -14,7 +15,7 @@ namespace {
 /// A process that starts others faster than they can be killed does not hold the caller up for
 /// ever.
 constexpr int kMostRounds = 1000;
-constexpr int kQuietLooks = 2;
+constexpr int kQuietLooks = 3;
 
 bool contains(const std::vector<pid_t>& pids, pid_t pid) {
     return std::find(pids.begin(), pids.end(), pid) != pids.end();
@@ -27,11 +28,43 @@ Descendants::Descendants(std::vector<pid_t> orphansBefore)
 
 void Descendants::look(pid_t command, bool itself) {
     command_ = command;
-    const std::vector<pid_t> orphansNow = orphans();
+    const std::size_t knownBefore = known_.size();
+    sawTraces_ = false;
     processes_ = readProcesses();
+    const std::vector<pid_t> orphansNow = orphansOfLook();
     if (itself) addCommand();
     while (addGeneration(orphansNow)) {
     }
+    sawTraces_ = sawTraces_ || known_.size() != knownBefore;
+}
+
+/// The table has nobody who started while it was read. In a line of processes of which each starts
+/// the next one and ends, there is one orphan that lives at any moment, and this finds it.
+std::vector<pid_t> Descendants::orphansOfLook() {
+    std::vector<pid_t> found = orphans();
+    if (!adoptsOrphans()) return found;
+    std::vector<pid_t> gone;
+    for (const ProcessEntry& process : processes_) {
+        if (process.parent == ::getpid() && !contains(found, process.pid)) {
+            gone.push_back(process.pid);
+        }
+    }
+    for (const pid_t orphan : found) {
+        if (isInTable(orphan)) continue;
+        const std::optional<ProcessEntry> process = readProcess(orphan);
+        if (process) processes_.push_back(*process);
+        sawTraces_ = sawTraces_ || !process;
+    }
+    if (gone.empty()) return found;
+    const std::vector<pid_t> inHand = commands();
+    std::copy_if(gone.begin(), gone.end(), std::back_inserter(found),
+                 [&](pid_t pid) { return !contains(inHand, pid); });
+    return found;
+}
+
+bool Descendants::isInTable(pid_t pid) const {
+    return std::any_of(processes_.begin(), processes_.end(),
+                       [pid](const ProcessEntry& process) { return process.pid == pid; });
 }
 
 /// Only a child of this process can be the command: any other has got its id since.
@@ -74,7 +107,7 @@ std::size_t Descendants::send(int signal) {
 }
 
 bool Descendants::kill() {
-    bool found = false;
+    bool found = sawTraces_;
     for (const ProcessEntry& process : processes_) {
         if (!process.isAlive || !isKnown(process)) continue;
         // One that has ended since the look may have started others before.

@@ -31,9 +31,9 @@ public:
     /// Sends the signal to those that lived at the last look: SIGKILL to all of them, another one
     /// only to those that have got none. Returns how many it reached.
     std::size_t send(int signal);
-    /// Kills those that lived at the last look. False once there has been nobody to kill for two
-    /// looks in a row: while one look reads the table of processes, a process that it has not come
-    /// to may start another one with an id that it has passed, and end.
+    /// Kills those that lived at the last look. False once there has been nobody to kill, and
+    /// nobody new, for some looks in a row: one that has ended may have started another one, which
+    /// a single look can miss.
     bool kill();
     /// How many lived at the last look.
     std::size_t living() const;
@@ -44,6 +44,8 @@ private:
     static Name nameOf(const ProcessEntry& process) { return {process.pid, process.start}; }
     bool isKnown(const ProcessEntry& process) const { return known_.count(nameOf(process)) != 0; }
     bool hasKnownParent(const ProcessEntry& process) const;
+    std::vector<pid_t> orphansOfLook();
+    bool isInTable(pid_t pid) const;
     bool addGeneration(const std::vector<pid_t>& orphansNow);
     void addCommand();
 
@@ -53,7 +55,8 @@ private:
     std::vector<ProcessEntry> processes_;  ///< of the last look
     std::set<Name> known_;
     std::set<Name> signalled_;
-    int quietLooks_ = 0;  ///< in a row
+    bool sawTraces_ = false;  ///< of processes that were not known before, at the last look
+    int quietLooks_ = 0;      ///< in a row
 };
 
 /// Kills everything that a command has started, down to the last descendant, because it has run too

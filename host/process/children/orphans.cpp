@@ -1,5 +1,6 @@
 #include "host/process/children/orphans.h"
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <sys/prctl.h>
 #include <sys/wait.h>
@@ -8,6 +9,7 @@
 #include <array>
 #include <cerrno>
 #include <charconv>
+#include <memory>
 #include <string>
 #include <system_error>
 
@@ -31,6 +33,21 @@ std::vector<pid_t> numbersIn(const std::string& text) {
     return numbers;
 }
 
+struct CloseDirectory {
+    void operator()(DIR* directory) const { ::closedir(directory); }
+};
+
+/// Of this process.
+std::vector<pid_t> threads() {
+    std::vector<pid_t> threads;
+    const std::unique_ptr<DIR, CloseDirectory> directory(::opendir("/proc/self/task"));
+    while (const dirent* const entry = directory ? ::readdir(directory.get()) : nullptr) {
+        const std::vector<pid_t> number = numbersIn(entry->d_name);
+        threads.insert(threads.end(), number.begin(), number.end());
+    }
+    return threads;
+}
+
 }  // namespace
 
 void adoptOrphans() {
@@ -50,10 +67,23 @@ void reapOrphans() {
     }
 }
 
-std::vector<pid_t> orphans() {
+bool adoptsOrphans() {
     int adopts = 0;
-    if (::prctl(PR_GET_CHILD_SUBREAPER, &adopts, 0, 0, 0) != 0 || adopts == 0) return {};
-    return childrenOf(::getpid());
+    return ::prctl(PR_GET_CHILD_SUBREAPER, &adopts, 0, 0, 0) == 0 && adopts != 0;
+}
+
+std::vector<pid_t> orphans() {
+    return adoptsOrphans() ? childrenOf(::getpid()) : std::vector<pid_t>();
+}
+
+std::vector<pid_t> commands() {
+    std::vector<pid_t> children;
+    for (const pid_t thread : threads()) {
+        if (thread == ::getpid()) continue;
+        const std::vector<pid_t> more = childrenOf(thread);
+        children.insert(children.end(), more.begin(), more.end());
+    }
+    return children;
 }
 
 std::vector<pid_t> childrenOf(pid_t thread) {

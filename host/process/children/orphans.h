@@ -24,6 +24,13 @@ void reapOrphans();
 /// adopts none. Any thread.
 std::vector<pid_t> orphans();
 
+/// Whether this process adopts orphans. Any thread.
+bool adoptsOrphans();
+
+/// The children that threads other than the main one have started and nobody has reaped. Any
+/// thread.
+std::vector<pid_t> commands();
+
 /// The children that this thread of the process has started and nobody has reaped. Any thread.
 std::vector<pid_t> childrenOf(pid_t thread);
 

@@ -34,8 +34,8 @@ struct CloseDirectory {
     void operator()(DIR* directory) const { ::closedir(directory); }
 };
 
-std::optional<ProcessEntry> readProcess(const char* pid) {
-    const std::string path = std::string("/proc/") + pid + "/stat";
+std::optional<ProcessEntry> readEntry(const std::string& pid) {
+    const std::string path = "/proc/" + pid + "/stat";
     const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
     if (!file) return std::nullopt;
     std::array<char, 1024> text{};
@@ -52,9 +52,13 @@ std::vector<ProcessEntry> readProcesses() {
     if (directory == nullptr) return processes;
     while (const dirent* const entry = ::readdir(directory.get())) {
         if (entry->d_name[0] < '1' || entry->d_name[0] > '9') continue;
-        if (const auto process = readProcess(entry->d_name)) processes.push_back(*process);
+        if (const auto process = readEntry(entry->d_name)) processes.push_back(*process);
     }
     return processes;
+}
+
+std::optional<ProcessEntry> readProcess(pid_t pid) {
+    return readEntry(std::to_string(pid));
 }
 
 std::optional<ProcessEntry> processIn(std::string_view stat) {

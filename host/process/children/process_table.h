@@ -17,8 +17,12 @@ struct ProcessEntry {
     unsigned long long start = 0;  ///< clock ticks since boot: with the pid it names one process
 };
 
-/// All processes that can be seen, in no order. One that ends meanwhile may be missing.
+/// All processes that can be seen, in no order. One that ends meanwhile may be missing, and so may
+/// one that starts meanwhile.
 std::vector<ProcessEntry> readProcesses();
+
+/// Nothing if there is none any more.
+std::optional<ProcessEntry> readProcess(pid_t pid);
 
 /// The entry in the text of a file /proc/PID/stat; nothing if the text is not of its form.
 std::optional<ProcessEntry> processIn(std::string_view stat);
