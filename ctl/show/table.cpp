@@ -46,15 +46,18 @@ std::string joinedCells(const Line& cells, const std::vector<std::size_t>& width
     return text;
 }
 
-/// Takes from the widest columns until all fit beside each other.
+/// Takes from the widest columns until all fit beside each other. The first one is what a line is
+/// called by and is typed or copied from here, so it stays whole if it is not too long.
 void fit(std::vector<std::size_t>& widths) {
     constexpr std::size_t kLeast = 8;
+    constexpr std::size_t kLongestName = 40;
     std::size_t total = 2 * (widths.size() - 1);
     for (const std::size_t width : widths)
         total += width;
-    while (total > kColumns) {
+    const auto last = widths.front() <= kLongestName ? widths.rend() - 1 : widths.rend();
+    while (total > kColumns && last != widths.rbegin()) {
         // Of equals the last, which is the one with the text to read.
-        const auto widest = std::max_element(widths.rbegin(), widths.rend());
+        const auto widest = std::max_element(widths.rbegin(), last);
         if (*widest <= kLeast) return;
         --*widest;
         --total;

@@ -8,6 +8,7 @@
 #include "ctl/client/row.h"
 #include "ctl/client/tasks/task_request.h"
 #include "ctl/show/message_catalogue.h"
+#include "ctl/show/shell_quoted.h"
 #include "ctl/show/table.h"
 #include "ctl/show/warnings.h"
 #include "ctl/verbs/arguments/condition_text.h"
@@ -29,21 +30,25 @@ constexpr Argument kForceIt =
     flag("--force", "Send it although the inventory does not list the product").with("--yes");
 constexpr Argument kArguments[] = {kTable, kConditions, kYes, kForceIt};
 
+/// Where a verb takes the managed system name.
+enum class TargetPlace { Nowhere, Option, Word };
+
 struct CommandVerb {
     const char* command;
     const char* verb;
-    const char* rest;  ///< of the arguments, behind the product
+    TargetPlace target;
+    const char* rest;  ///< of the arguments
 };
 constexpr CommandVerb kCommandVerbs[] = {
-    {"START", "start PRODUCT", ""},
-    {"STOP", "stop PRODUCT", ""},
-    {"RESTART", "restart PRODUCT", ""},
-    {"INSTALL", "install PRODUCT", " VERSION -- COMMAND"},
-    {"COMPLETE_INSTALL", "complete-install", ""},
-    {"UNINSTALL", "uninstall PRODUCT", ""},
-    {"REMOVEINSTANCE", "remove-instance PRODUCT", " TARGET"},
-    {"GETCONFIG", "config get PRODUCT", ""},
-    {"SETCONFIG", "config set PRODUCT", ""},
+    {"START", "start PRODUCT", TargetPlace::Option, ""},
+    {"STOP", "stop PRODUCT", TargetPlace::Option, ""},
+    {"RESTART", "restart PRODUCT", TargetPlace::Option, ""},
+    {"INSTALL", "install PRODUCT", TargetPlace::Nowhere, " VERSION -- COMMAND"},
+    {"COMPLETE_INSTALL", "complete-install", TargetPlace::Nowhere, ""},
+    {"UNINSTALL", "uninstall PRODUCT", TargetPlace::Nowhere, ""},
+    {"REMOVEINSTANCE", "remove-instance PRODUCT", TargetPlace::Word, ""},
+    {"GETCONFIG", "config get PRODUCT", TargetPlace::Option, ""},
+    {"SETCONFIG", "config set PRODUCT", TargetPlace::Option, " --file FILE"},
 };
 
 std::string valueOf(const TableQuery& query, const char* column) {
@@ -51,6 +56,23 @@ std::string valueOf(const TableQuery& query, const char* column) {
         if (condition.column == column) return condition.value;
     }
     return {};
+}
+
+/// A value of the query as a word of a command line, or the name of what is missing.
+std::string wordOf(const TableQuery& query, const char* column, const char* name) {
+    const std::string value = valueOf(query, column);
+    return value.empty() ? name : shellQuoted(value);
+}
+
+/// Without its target the command would mean the default instance.
+std::string targetWords(const TableQuery& query, TargetPlace place) {
+    if (place == TargetPlace::Nowhere) return {};
+    if (place == TargetPlace::Word) return " " + wordOf(query, "TARGETMSN", "TARGET");
+    const std::string target = valueOf(query, "TARGETMSN");
+    if (target.empty()) return {};
+    const bool isInstance =
+        valueOf(query, "COMMAND") == "START" && valueOf(query, "OPTIONAL") == "INSTANCE";
+    return (isInstance ? " --instance " : " --target ") + shellQuoted(target);
 }
 
 TableQuery queryOf(const Values& given) {
@@ -132,13 +154,16 @@ std::string verbInPlaceOf(const TableQuery& query) {
     const std::string command = valueOf(query, "COMMAND");
     const std::string product = valueOf(query, "PRODUCT");
     const bool isUniversalAgent = product == "um" || product == "UM";
-    if (command == "SETCONFIG" && isUniversalAgent) return "zavctl ua-config --metafile FILE";
+    if (command == "SETCONFIG" && isUniversalAgent) {
+        return "zavctl ua-config --metafile " + wordOf(query, "UACONFIG", "FILE") +
+               targetWords(query, TargetPlace::Option);
+    }
     for (const CommandVerb& known : kCommandVerbs) {
         if (command != known.command) continue;
         std::string line = std::string("zavctl ") + known.verb;
         const std::size_t place = line.find("PRODUCT");
-        if (place != std::string::npos && !product.empty()) line.replace(place, 7, product);
-        return line + known.rest;
+        if (place != std::string::npos) line.replace(place, 7, wordOf(query, "PRODUCT", "PRODUCT"));
+        return line + targetWords(query, known.target) + known.rest;
     }
     return {};
 }

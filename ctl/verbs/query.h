@@ -13,8 +13,8 @@ QueryAnswer askQuery(const Invocation& invocation);
 /// status of one that the request table carried out is that of its reply.
 Page showQuery(const TableQuery& query, const QueryAnswer& answer, Format format);
 
-/// The command line that does what such a query of the request table would do, such as "zavctl stop
-/// ux"; empty if there is none.
+/// The command line that does what such a query of the request table would do, to the same instance,
+/// such as "zavctl stop ux"; empty if there is none.
 std::string verbInPlaceOf(const TableQuery& query);
 
 }  // namespace ctl

@@ -33,6 +33,18 @@ TEST(Table, FitsEightyColumnsAndLosesNothing) {
                   std::string(36, ' ') + "text!\n");
 }
 
+TEST(Table, BreaksNoNameInTheFirstColumn) {
+    const std::string name = std::string(40, 'i');
+    const std::string text(30, 'x');
+    const std::vector<ctl::TableColumn> columns = {{"A", "A"}, {"B", "B"}, {"C", "C"}};
+    EXPECT_EQ(ctl::tableText({{{"A", name}, {"B", text}, {"C", text}}}, columns),
+              "A" + std::string(41, ' ') + "B" + std::string(19, ' ') + "C\n" + name + "  " +
+                  std::string(18, 'x') + "  " + std::string(18, 'x') + "\n" + std::string(42, ' ') +
+                  std::string(12, 'x') + "        " + std::string(12, 'x') + "\n");
+    EXPECT_EQ(ctl::tableText({{{"A", std::string(100, 'i')}}}, {{"A", "A"}}),
+              "A\n" + std::string(80, 'i') + "\n" + std::string(20, 'i') + "\n");
+}
+
 TEST(Records, FitEightyColumnsAndLoseNothing) {
     const json rows = {{{"NAME", std::string(100, 'x')}}};
     EXPECT_EQ(ctl::recordsText(rows),

@@ -42,12 +42,39 @@ TEST(Query, ThatActsHasAVerbInItsPlace) {
         {{{"COMMAND", "=", "INSTALL"}}, "zavctl install PRODUCT VERSION -- COMMAND"},
         {{{"COMMAND", "=", "SETCONFIG"}, {"PRODUCT", "=", "um"}},
          "zavctl ua-config --metafile FILE"},
+        {{{"COMMAND", "=", "SETCONFIG"}, {"PRODUCT", "=", "ux"}},
+         "zavctl config set ux --file FILE"},
         {{{"COMMAND", "=", "COMPLETE_INSTALL"}}, "zavctl complete-install"},
         {{{"COMMAND", "=", "NOPE"}}, ""},
         {{}, ""},
     };
     for (const auto& [where, line] : cases)
         EXPECT_EQ(ctl::verbInPlaceOf(request(where)), line);
+}
+
+TEST(Query, ThatActsOnAnInstanceHasAVerbThatActsOnTheSameOne) {
+    const auto verbFor = [](const std::string& command, const std::string& target,
+                            const std::string& optional = "") {
+        return ctl::verbInPlaceOf(request({{"COMMAND", "=", command},
+                                           {"PRODUCT", "=", "ux"},
+                                           {"TARGETMSN", "=", target},
+                                           {"OPTIONAL", "=", optional}}));
+    };
+    EXPECT_EQ(verbFor("STOP", "db1:h:UX"), "zavctl stop ux --target db1:h:UX");
+    EXPECT_EQ(verbFor("START", "db1:h:UX"), "zavctl start ux --target db1:h:UX");
+    EXPECT_EQ(verbFor("START", "db1", "INSTANCE"), "zavctl start ux --instance db1");
+    EXPECT_EQ(verbFor("RESTART", "a b"), "zavctl restart ux --target 'a b'");
+    EXPECT_EQ(verbFor("GETCONFIG", "db1:h:UX"), "zavctl config get ux --target db1:h:UX");
+    EXPECT_EQ(verbFor("SETCONFIG", "db1:h:UX"),
+              "zavctl config set ux --target db1:h:UX --file FILE");
+    EXPECT_EQ(verbFor("REMOVEINSTANCE", "db1:h:UX"), "zavctl remove-instance ux db1:h:UX");
+    EXPECT_EQ(verbFor("REMOVEINSTANCE", ""), "zavctl remove-instance ux TARGET");
+    EXPECT_EQ(verbFor("UNINSTALL", "db1:h:UX"), "zavctl uninstall ux") << "it takes the product";
+    EXPECT_EQ(ctl::verbInPlaceOf(request({{"COMMAND", "=", "SETCONFIG"},
+                                          {"PRODUCT", "=", "um"},
+                                          {"TARGETMSN", "=", "db1:h:UA"},
+                                          {"UACONFIG", "=", "disks.mdl"}})),
+              "zavctl ua-config --metafile disks.mdl --target db1:h:UA");
 }
 
 TEST(Query, GivesRowsAsJson) {
