@@ -19,6 +19,7 @@
 #include "host/checks/check.h"
 #include "host/depot/depot_directory.h"
 #include "host/process/children/run_command.h"
+#include "host/process/socket_file.h"
 #include "host/process/start_error.h"
 #include "host/process/task_timeout.h"
 
@@ -27,12 +28,15 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// What would keep the host from making a socket; "" if nothing would.
+/// What would keep the host from making a socket, or lets others replace the one that it has made;
+/// "" if nothing does.
 std::string socketFault(const std::string& path) {
     if (path.size() >= sizeof(sockaddr_un::sun_path)) {
         return path + " is longer than " + std::to_string(sizeof(sockaddr_un::sun_path) - 1) +
                " bytes";
     }
+    const std::string fault = folderFaultOf(path);
+    if (!fault.empty()) return path + ": " + fault;
     struct stat found {};
     if (::lstat(path.c_str(), &found) == 0) {
         return S_ISSOCK(found.st_mode) ? "" : path + " exists and is not a socket";
@@ -99,8 +103,9 @@ Finding checkSockets(CheckSubject& subject) {
     for (const std::string& path : {options.socket, options.rpcSocket}) {
         const std::string fault = socketFault(path);
         if (fault.empty()) continue;
-        return {Verdict::Warning, "the socket cannot be made: " + fault,
-                "name another path with --socket or --rpc-socket"};
+        return {
+            Verdict::Warning, "the socket cannot be used: " + fault,
+            "name another path with --socket or --rpc-socket, or take the directory from others"};
     }
     return {Verdict::Ok, options.socket + " and " + options.rpcSocket, ""};
 }

@@ -5,9 +5,11 @@
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
 #include <system_error>
 
 #include "host/process/start_error.h"
@@ -44,19 +46,6 @@ FileDescriptor newSocket(const std::string& path) {
     return made;
 }
 
-/// Where everybody may replace files, everybody could put a host of his own in the socket's place.
-/// The sticky bit keeps others from that.
-void checkFolder(const std::string& path) {
-    const std::size_t slash = path.rfind('/');
-    const std::string folder = slash == std::string::npos ? "." : path.substr(0, slash + 1);
-    struct stat found {};
-    if (::stat(folder.c_str(), &found) != 0) return;  // making the lock says why
-    if ((found.st_mode & S_IWOTH) != 0 && (found.st_mode & S_ISVTX) == 0) {
-        throw StartError("socket " + path + ": everybody may replace files in its directory; " +
-                         "put it elsewhere or remove that permission");
-    }
-}
-
 /// Whether the open file is still the one with this name. The last owner removes it, and a lock on
 /// a file that nobody else can find protects nothing.
 bool isStill(int descriptor, const std::string& name) {
@@ -83,8 +72,23 @@ FileDescriptor takeLock(const std::string& path) {
 
 }  // namespace
 
+std::string folderFaultOf(const std::string& socketPath) {
+    const std::string parent = std::filesystem::path(socketPath).parent_path().string();
+    const std::string folder = parent.empty() ? "." : parent;
+    struct stat found {};
+    if (::stat(folder.c_str(), &found) != 0) return "";  // making the socket says why
+    if (found.st_uid != ::geteuid() && found.st_uid != 0) {
+        return "its directory " + folder + " belongs to another user, " +
+               std::to_string(found.st_uid) + ", who could replace it";
+    }
+    const bool others = (found.st_mode & (S_IWGRP | S_IWOTH)) != 0;
+    if (!others || (found.st_mode & S_ISVTX) != 0) return "";
+    return "others may write to its directory " + folder + " and could replace it";
+}
+
 SocketFile::SocketFile(const std::string& path) : path_(path) {
-    checkFolder(path_);
+    const std::string fault = folderFaultOf(path_);
+    if (!fault.empty()) throw StartError("socket " + path_ + ": " + fault);
     addressOf(path_);  // throws before a lock file is made for an impossible name
     lock_ = takeLock(path_);
     try {

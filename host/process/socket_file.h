@@ -9,6 +9,11 @@
 
 namespace host {
 
+/// Who else than this user and root could replace a socket at that path, because the directory is
+/// his or lets him write, in words that name the directory; "" if nobody could, or if there is no
+/// such directory. The sticky bit keeps others from replacing what is not theirs.
+std::string folderFaultOf(const std::string& socketPath);
+
 /// Binds a socket at a path, and removes it in the end.
 ///
 /// The owner of a path holds a lock on the file PATH.lock beside it. So when two processes start at
@@ -16,7 +21,8 @@ namespace host {
 class SocketFile {
 public:
     /// Binds with mode 0600. Replaces a socket that no process serves. Throws StartError when one
-    /// does, when another kind of file stands there, or when anything else fails. Nobody can
+    /// does, when another kind of file stands there, when others could replace the socket, or when
+    /// anything else fails. Nobody can
     /// connect before listen().
     explicit SocketFile(const std::string& path);
     ~SocketFile();

@@ -1,4 +1,5 @@
 #include <sys/resource.h>
+#include <sys/stat.h>
 #include <utime.h>
 
 #include <clocale>
@@ -20,6 +21,15 @@ TEST_F(MachineChecks, SocketsMustBePossible) {
     expectFinding("sockets", Verdict::Warning, "exists and is not a socket");
     options.rpcSocket = scratch.path("lost/socket");
     expectFinding("sockets", Verdict::Warning, "No such file or directory");
+}
+
+TEST_F(MachineChecks, SocketsThatOthersCouldReplaceAreAWarning) {
+    const std::string folder = scratch.makeDir("shared");
+    options.socket = scratch.write("shared/taken", "");
+    ASSERT_EQ(::chmod(folder.c_str(), 0770), 0);
+    expectFinding("sockets", Verdict::Warning, "others may write to its directory " + folder);
+    ASSERT_EQ(::chmod(folder.c_str(), 01770), 0);
+    expectFinding("sockets", Verdict::Warning, "exists and is not a socket");
 }
 
 TEST_F(MachineChecks, ATimeOutThatIsNoneIsAnError) {

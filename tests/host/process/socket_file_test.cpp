@@ -4,7 +4,9 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
+#include <unistd.h>
 
+#include <filesystem>
 #include <optional>
 
 #include "host/process/start_error.h"
@@ -14,6 +16,8 @@
 namespace {
 
 using host::SocketFile;
+
+constexpr uid_t kNobody = 65534;
 
 std::string errorOf(const std::string& path) {
     try {
@@ -130,18 +134,43 @@ TEST_F(Socket, NameMayBeAsLongAsAnAddressHolds) {
     EXPECT_FALSE(scratch.exists(longest.substr(scratch.path().size() + 1) + "s.lock"));
 }
 
-TEST_F(Socket, WhereEverybodyMayReplaceItIsRefused) {
+TEST_F(Socket, WhereOthersMayReplaceItIsRefused) {
     const std::string folder = scratch.makeDir("open");
     const std::string inside = folder + "/host.sock";
-    ASSERT_EQ(::chmod(folder.c_str(), 0777), 0);
-    EXPECT_EQ(errorOf(inside),
-              "socket " + inside +
-                  ": everybody may replace files in its directory; put it elsewhere "
-                  "or remove that permission");
-    ASSERT_EQ(::chmod(folder.c_str(), 01777), 0);
-    EXPECT_EQ(errorOf(inside), "");
-    ASSERT_EQ(::chmod(folder.c_str(), 0775), 0);
-    EXPECT_EQ(errorOf(inside), "");
+    for (const mode_t mode : {0777U, 0775U, 0770U, 0720U}) {
+        ASSERT_EQ(::chmod(folder.c_str(), mode), 0);
+        EXPECT_EQ(errorOf(inside), "socket " + inside + ": others may write to its directory " +
+                                       folder + " and could replace it")
+            << std::oct << mode;
+        EXPECT_FALSE(scratch.exists("open/host.sock.lock"));
+    }
+    for (const mode_t mode : {01777U, 01770U, 0755U, 0700U}) {
+        ASSERT_EQ(::chmod(folder.c_str(), mode), 0);
+        EXPECT_EQ(errorOf(inside), "") << std::oct << mode;
+    }
+}
+
+TEST_F(Socket, InTheDirectoryOfSomebodyElseIsRefused) {
+    if (::geteuid() != 0) GTEST_SKIP() << "only root can give a directory away";
+    const std::string folder = scratch.makeDir("others");
+    const std::string inside = folder + "/host.sock";
+    for (const mode_t mode : {0700U, 01777U}) {
+        ASSERT_EQ(::chown(folder.c_str(), kNobody, kNobody), 0);
+        ASSERT_EQ(::chmod(folder.c_str(), mode), 0);
+        EXPECT_EQ(errorOf(inside), "socket " + inside + ": its directory " + folder +
+                                       " belongs to another user, 65534, who could replace it");
+    }
+    EXPECT_FALSE(scratch.exists("others/host.sock.lock"));
+}
+
+TEST_F(Socket, MayBeInTheWorkingDirectory) {
+    const std::filesystem::path before = std::filesystem::current_path();
+    std::filesystem::current_path(scratch.path());
+    EXPECT_EQ(errorOf("host.sock"), "");
+    ASSERT_EQ(::chmod(scratch.path().c_str(), 0777), 0);
+    EXPECT_EQ(errorOf("host.sock"),
+              "socket host.sock: others may write to its directory . and could replace it");
+    std::filesystem::current_path(before);
 }
 
 TEST_F(Socket, InADirectoryThatIsNotThereIsAnError) {
