@@ -1,38 +1,30 @@
 // The home as a whole, and single files in it.
 
+#include <pwd.h>
 #include <sys/stat.h>
-#include <sys/utsname.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstddef>
 #include <filesystem>
+#include <iterator>
 #include <string>
 #include <system_error>
 #include <vector>
 
 #include "host/checks/check.h"
-#include "host/checks/xml_file.h"
+#include "host/checks/wording.h"
+#include "host/home/run_as_list.h"
 
 namespace host {
 namespace {
 
 namespace fs = std::filesystem;
 
-constexpr std::size_t kMostNames = 5;
-
-/// The first names of a list, for a line of text.
-std::string listed(std::vector<std::string> names) {
-    std::sort(names.begin(), names.end());
-    std::string text;
-    for (std::size_t i = 0; i < std::min(names.size(), kMostNames); ++i) {
-        text += (i == 0 ? "" : ", ") + names[i];
-    }
-    if (names.size() > kMostNames) {
-        text += " and " + std::to_string(names.size() - kMostNames) + " more";
-    }
-    return text;
-}
+/// For what the system knows of one user, in bytes.
+constexpr std::size_t kRoom = std::size_t{16} << 10;
+constexpr std::size_t kMostRoom = std::size_t{1} << 20;
 
 bool isTrusted(const struct stat& found) {
     return (found.st_uid == ::geteuid() || found.st_uid == 0) && (found.st_mode & S_IWOTH) == 0;
@@ -44,16 +36,27 @@ bool isLoose(const std::string& path) {
     return ::stat(path.c_str(), &found) == 0 && !isTrusted(found);
 }
 
-std::string runAsFile(CheckSubject& subject) {
-    struct utsname names {};
-    if (::uname(&names) != 0) return "";
-    const std::string node = names.nodename;
-    return subject.inHome("config/" + node.substr(0, node.find('.')) + "_zavrunas.cfg");
+/// Whether certainly nobody of that name is known here.
+bool isNobody(const std::string& name) {
+    struct passwd entry {};
+    struct passwd* found = nullptr;
+    std::vector<char> room(kRoom);
+    while (true) {
+        const int error = ::getpwnam_r(name.c_str(), &entry, room.data(), room.size(), &found);
+        if (error != ERANGE || room.size() >= kMostRoom) return error == 0 && found == nullptr;
+        room.resize(room.size() * 2);
+    }
+}
+
+std::vector<std::string> unknownUsersOf(const RunAsList& list) {
+    std::vector<std::string> unknown;
+    std::copy_if(list.users.begin(), list.users.end(), std::back_inserter(unknown), isNobody);
+    return unknown;
 }
 
 }  // namespace
 
-CheckFunction checkHome, checkOwners, checkRunAs, checkLeftovers;
+CheckFunction checkHome, checkOwners, checkRunAs;
 
 Finding checkHome(CheckSubject& subject) {
     const std::string& home = subject.options.home;
@@ -93,31 +96,23 @@ Finding checkOwners(CheckSubject& subject) {
 }
 
 Finding checkRunAs(CheckSubject& subject) {
-    const std::string path = runAsFile(subject);
-    std::error_code ignored;
-    if (!fs::exists(path, ignored)) {
-        return {Verdict::Ok, path + " does not exist; every agent runs as the host's user", ""};
+    const RunAsList list = readRunAsList(subject.options.home);
+    if (!list.fault.empty()) {
+        return {Verdict::Error,
+                list.path + ": " + list.fault +
+                    "; agents would run as the host's user instead of their own",
+                "correct the file, or remove it"};
     }
-    const std::string fault = xmlFaultOf(path);
-    if (fault.empty()) return {Verdict::Ok, path, ""};
-    return {Verdict::Error,
-            path + ": " + fault + "; agents would run as the host's user instead of their own",
-            "correct the file, or remove it"};
-}
-
-/// A change of the universal agent's configuration leaves these when its last step fails.
-Finding checkLeftovers(CheckSubject& subject) {
-    std::vector<std::string> found;
-    for (const char* const folder : {"config", "config/.ConfigData"}) {
-        std::error_code ignored;
-        for (fs::directory_iterator entry(subject.inHome(folder), ignored), end; entry != end;
-             entry.increment(ignored)) {
-            if (entry->path().extension() == ".copy") found.push_back(entry->path().string());
-        }
+    if (!list.isThere) {
+        return {Verdict::Ok, list.path + " does not exist; every agent runs as the host's user",
+                ""};
     }
-    if (found.empty()) return {Verdict::Ok, "no change of a configuration was interrupted", ""};
-    return {Verdict::Warning, "an interrupted change of a configuration left " + listed(found),
-            "compare it with the file without .copy, keep the right one and remove the other"};
+    const std::vector<std::string> unknown = unknownUsersOf(list);
+    if (unknown.empty()) return {Verdict::Ok, list.path, ""};
+    return {Verdict::Warning,
+            list.path + " names users who do not exist here: " + listed(unknown) +
+                "; their agents cannot be started",
+            "make these users, or correct the file"};
 }
 
 }  // namespace host

@@ -8,7 +8,7 @@ namespace host {
 
 /// What a guard looks at.
 enum class Asks {
-    Request,  ///< the request alone: its answer is always the same
+    Request,  ///< the request, and nothing that tasks that wait may change
     Machine,  ///< what is there now; tasks that wait may still change it
 };
 

@@ -8,7 +8,7 @@ namespace host {
 /// Each family has a file of its own in this folder and its rows below.
 using Check = void(CommandRequest& request, Machine& machine);
 Check checkConditions, checkAscii, checkValues, checkImportNames;
-Check checkProduct, checkDeployFolder, checkTarget, checkImport;
+Check checkProduct, checkDeployFolder, checkTarget, checkImport, checkRunAsList;
 Check mendText;
 
 const std::vector<Guard>& guards() {
@@ -22,6 +22,8 @@ const std::vector<Guard>& guards() {
         {"deploy-folder", Asks::Machine, checkDeployFolder},
         {"target",        Asks::Machine, checkTarget},
         {"import",        Asks::Machine, checkImport},
+        // Asked of every request: no task that waits is meant to mend the list.
+        {"run-as",        Asks::Request, checkRunAsList},
         // Last, so that all others see what the client sent.
         {"text",          Asks::Request, mendText},
     };

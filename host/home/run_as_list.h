@@ -1,12 +1,22 @@
-/// Whether a file is XML that the plug-in can read.
+/// The list of users whom agents run as, config/<host>_zavrunas.cfg in the home.
 #pragma once
 
+#include <set>
 #include <string>
 
 namespace host {
 
-/// What is wrong with the file, in words; "" if nothing is. Reads it as the plug-in does, up to
-/// 16 MiB.
-std::string xmlFaultOf(const std::string& path);
+struct RunAsList {
+    std::string path;
+    bool isThere = false;  ///< whatever is there, also what cannot be read
+    /// Why the plug-in would overlook the list or an entry of it and start agents as the host's
+    /// user, in words; "" if it would not.
+    std::string fault;
+    /// The users named in it, in the code page of the process's locale, as far as it could be read.
+    std::set<std::string> users;
+};
+
+/// Reads the list as the plug-in does, up to 16 MiB. Never waits for a pipe. Any thread.
+RunAsList readRunAsList(const std::string& home);
 
 }  // namespace host

@@ -294,6 +294,40 @@ TEST(GuardedRequests, TargetsThatAreKnownPass) {
     EXPECT_TRUE(home.runs("ux_third"));
 }
 
+// ---- The list of run-as users -------------------------------------------------------------------
+
+/// Where the list is in a home.
+std::string runAsList() {
+    struct utsname names {};
+    ::uname(&names);
+    const std::string node = names.nodename;
+    return "home/config/" + node.substr(0, node.find('.')) + "_zavrunas.cfg";
+}
+
+TEST(GuardedRequests, StartNothingWhileTheListOfRunAsUsersIsDamaged) {
+    TranslatorHome home;
+    const std::string list = runAsList();
+    {
+        ManagedHost host(home.path(), home.environment(), {}, Guards::On);
+        home.files().write(list, "<runas><agent>");  // a whole one is a condition of the start
+        for (const char* name : {"START", "RESTART"}) {
+            const Reply reply = command(host, name, "ux");
+            EXPECT_EQ(reply.status, 409) << name;
+            EXPECT_EQ(reply.guard(), "run-as") << name;
+            EXPECT_NE(reply.body.value("error", "").find(list), std::string::npos) << name;
+        }
+        EXPECT_TRUE(command(host, "STOP", "ux").accepted());
+        EXPECT_TRUE(home.awaitCalls(1));
+        home.files().write(list, "<runas></runas>");
+        EXPECT_TRUE(command(host, "START", "ux").accepted());
+        EXPECT_TRUE(home.awaitCalls(2));
+    }
+    home.files().write(list, "<runas><agent>");
+    ManagedHost unguarded(home.path(), home.environment());
+    EXPECT_TRUE(command(unguarded, "START", "ux").accepted());
+    EXPECT_TRUE(home.awaitCalls(3)) << "as the host's user";
+}
+
 // ---- When a guard is asked ----------------------------------------------------------------------
 
 TEST(GuardedRequests, AnInstallAndAStartOfTheSameProductCanBeSentTogether) {

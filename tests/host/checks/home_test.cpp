@@ -1,6 +1,7 @@
 #include <sys/stat.h>
+#include <unistd.h>
 
-#include <filesystem>
+#include <cstdio>
 
 #include "host/checks/check_fixture.h"
 
@@ -39,13 +40,46 @@ TEST_F(HomeChecks, ARunAsDatabaseMustParse) {
     expectFinding("run-as", Verdict::Error, "it does not parse: ");
 }
 
-TEST_F(HomeChecks, WhatAnInterruptedConfigurationLeftIsNamed) {
-    for (const char* name : {"home/config/um.config.copy", "home/config/.ConfigData/kumenv.copy"}) {
-        const std::string copy = scratch.write(name, "");
-        expectFinding("leftovers", Verdict::Warning, copy);
-        std::filesystem::remove(copy);
+TEST_F(HomeChecks, ARunAsDatabaseThatCannotBeReadIsAnError) {
+    const std::string file = scratch.path(runAsFile());
+    ASSERT_EQ(::symlink("nowhere", file.c_str()), 0);
+    expectFinding("run-as", Verdict::Error, "it cannot be read: No such file or directory");
+    ASSERT_EQ(::unlink(file.c_str()), 0);
+    ASSERT_EQ(::mkfifo(file.c_str(), 0600), 0);
+    expectFinding("run-as", Verdict::Error, "it is not a file");
+    ASSERT_EQ(::unlink(file.c_str()), 0);
+    ASSERT_EQ(std::rename((home + "/config").c_str(), (home + "/other").c_str()), 0);
+    ASSERT_EQ(::symlink("config", (home + "/config").c_str()), 0);
+    expectFinding("run-as", Verdict::Error, "it cannot be read: Too many levels");
+}
+
+TEST_F(HomeChecks, EntriesOfTheRunAsDatabaseThatWouldBeOverlookedAreAnError) {
+    const std::string file = runAsFile();
+    const std::string instance = "<instance><name>a</name><user>root</user></instance>";
+    scratch.write(file, "<runas><agent>" + instance + "</agent></runas>");
+    expectFinding("run-as", Verdict::Error, "it has an agent without a productCode");
+    scratch.write(file, "<runas><agent><o><productCode>ux</productCode></o></agent></runas>");
+    expectFinding("run-as", Verdict::Error, "it has an agent without a productCode");
+    for (const char* part : {"<name>a</name>", "<user>root</user>", "<o><name/><user/></o>", ""}) {
+        scratch.write(file, "<runas><agent><productCode>ux</productCode><instance>" +
+                                std::string(part) + "</instance></agent></runas>");
+        expectFinding("run-as", Verdict::Error, "it has an instance without a name or a user");
     }
-    expectFinding("leftovers", Verdict::Ok, "no change of a configuration was interrupted");
+    scratch.write(file, "<runas><agent><productCode>ux</productCode>" + instance +
+                            "<instance><name/><user/></instance></agent><note/></runas>");
+    expectFinding("run-as", Verdict::Ok, file);
+}
+
+TEST_F(HomeChecks, UsersOfTheRunAsDatabaseWhoDoNotExistAreNamed) {
+    std::string instances;
+    for (const char* user : {" root\n", "no-such-user", "-c id", "no-such-&amp;"}) {
+        instances += "<instance><name>" + std::to_string(instances.size()) + "</name><user>" +
+                     user + "</user></instance>";
+    }
+    scratch.write(runAsFile(),
+                  "<runas><agent><productCode>ux</productCode>" + instances + "</agent></runas>");
+    expectFinding("run-as", Verdict::Warning,
+                  "names users who do not exist here: -c id, no-such-&, no-such-user;");
 }
 
 }  // namespace
