@@ -132,8 +132,14 @@ bool Dispatcher::handOverNext() {
         recorded_ != 0 ? journal_.byNumber(recorded_) : journal_.nextInLine();
     if (!task) return false;
     try {
-        // Whether it was too late has been looked at when its hand-over was recorded.
-        if (recorded_ != 0 || !expires(*task)) handOver(*task);
+        // With its hand-over it was recorded that it was not too late.
+        if (recorded_ == 0 && journal_.isTooLate(*task)) {
+            expire(*task);
+        } else {
+            handOver(*task);
+        }
+    } catch (const TooLate&) {
+        expire(*task);  // while the guards looked at it
     } catch (const StepBack&) {
         // It was cancelled at the last moment: the next one, then.
     }
@@ -141,15 +147,11 @@ bool Dispatcher::handOverNext() {
     return true;
 }
 
-/// Ends a task whose time is over; returns whether it was.
-bool Dispatcher::expires(const Task& task) {
-    if (!task.expires || journal_.latestTime() <= *task.expires) return false;
-    Task expired = task;
-    expired.state = TaskState::Expired;
-    expired.ended = WallClock::now();
-    expired.reason = "its turn came after the time until which it could begin";
-    tasks_.end(expired);
-    return true;
+void Dispatcher::expire(Task task) {
+    task.state = TaskState::Expired;
+    task.ended = journal_.latestTime();
+    task.reason = "its turn came after the time until which it could begin";
+    tasks_.end(task);
 }
 
 void Dispatcher::handOver(const Task& task) {

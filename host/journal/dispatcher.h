@@ -24,7 +24,8 @@ namespace host {
 class Dispatcher {
 public:
     /// Calls the plug-in, on the dispatcher's thread. Returns how the task ends if the plug-in did
-    /// not get it. Throws NotKept, after which it is tried again, and StepBack.
+    /// not get it. Throws NotKept, after which it is tried again, StepBack
+    /// and TooLate.
     using HandOver = std::function<std::optional<Task>(const Task& task)>;
 
     /// How an install ends that had begun in an earlier run and went on while the host was away; on
@@ -57,7 +58,7 @@ private:
     /// False when nothing waits.
     bool handOverNext();
     void handOver(const Task& task);
-    bool expires(const Task& task);
+    void expire(Task task);
     bool pause(std::chrono::milliseconds time);
 
     Journal& journal_;

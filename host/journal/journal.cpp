@@ -102,6 +102,7 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
         throw StartError("cannot use the journal in " + settings_.directory + ": " + error.what());
     }
     if (recovered_.waiting > 0 || !recovered_.interrupted.empty()) warn(described(recovered_));
+    latest_.store(newestTime(*database_).time_since_epoch().count());
     events_.emplace(newestEvent(*database_));
     writer_ = std::make_unique<Writer>(
         *database_, reader_ ? nullptr : &readLock_,
@@ -211,6 +212,13 @@ Writer::Change Journal::updateOf(std::vector<Task> tasks) {
 
 void Journal::save(const Task& task) {
     commit(updateOf({task}));
+}
+
+void Journal::handOver(const Task& task) {
+    commit([task, this](Database& database) {
+        if (isTooLate(task)) throw TooLate("task " + task.id + " was to begin earlier");
+        updateTask(database, task);
+    });
 }
 
 void Journal::saveSoon(Task task) {
@@ -332,6 +340,10 @@ std::optional<Task> Journal::nextInLine() {
             "ORDER BY number LIMIT 1");
         return found.step() ? readTask(database, identity_, found.integer(0)) : std::nullopt;
     });
+}
+
+bool Journal::isTooLate(const Task& task) {
+    return task.expires && latestTime() > *task.expires;
 }
 
 /// Returns its number; 0: nothing waits, or its time is over, which the dispatcher will see.

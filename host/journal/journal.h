@@ -54,6 +54,7 @@ public:
     void enter(Task& task) override;
     void enterSoon(Task task) override;
     void save(const Task& task) override;
+    void handOver(const Task& task) override;
     void saveOutcome(const std::vector<Task>& tasks, const std::string& row) override;
     void saveSoon(Task task) override;
     void keepRow(const std::string& kept, const std::string& row) override;
@@ -81,8 +82,11 @@ public:
     std::int64_t takeHandedOver() { return handedOver_.exchange(0); }
     /// The task with this number, as far as it is durable.
     std::optional<Task> byNumber(std::int64_t number);
-    /// The time by which tasks expire. It never goes back.
+    /// The time by which tasks expire. It never goes back, not even behind what an earlier run has
+    /// written down.
     WallClock::time_point latestTime();
+    /// Whether it must not begin any more.
+    bool isTooLate(const Task& task);
     /// How many tasks wait so.
     std::int64_t waiting();
     /// How many have not begun, those in the plug-in's queue among them.

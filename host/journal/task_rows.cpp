@@ -252,6 +252,13 @@ std::optional<std::int64_t> newestWithTransid(Database& database, std::string_vi
     return found.integer(0);
 }
 
+WallClock::time_point newestTime(Database& database) {
+    return timeOf(database.number(
+        "SELECT max((SELECT coalesce(max(ended), 0) FROM tasks WHERE ended IS NOT NULL), "
+        "(SELECT coalesce(max(max(accepted, coalesce(started, 0))), 0) FROM tasks "
+        "WHERE ended IS NULL), (SELECT coalesce(max(started), 0) FROM runs))"));
+}
+
 std::vector<Task> readTasks(Database& database, const std::string& identity,
                             const TaskFilter& filter) {
     const std::string sql = std::string("SELECT ") + kColumns +

@@ -42,6 +42,9 @@ std::vector<Task> readTasks(Database& database, const std::string& identity,
 /// The number in a task's identifier; nothing when it is none of this journal's.
 std::optional<std::int64_t> numberIn(std::string_view id, std::string_view identity);
 
+/// The newest time that is stored; tasks that are over count with their ends.
+WallClock::time_point newestTime(Database& database);
+
 /// Microseconds since the epoch, in which the tables give times.
 std::int64_t microseconds(WallClock::time_point time);
 

@@ -33,6 +33,12 @@ public:
     using std::logic_error::logic_error;
 };
 
+/// The time until which the task could begin is over; nothing was changed.
+class TooLate : public std::runtime_error {
+public:
+    using std::runtime_error::runtime_error;
+};
+
 /// Which tasks are wanted.
 struct TaskFilter {
     std::optional<TaskState> state{};
@@ -59,6 +65,9 @@ public:
     virtual void enterSoon(Task task) = 0;
     /// Changes a task. Returns when that is durable. Throws NotKept, and StepBack.
     virtual void save(const Task& task) = 0;
+    /// This run of the host hands over a task that waited for its turn. Returns when that is
+    /// durable. Throws NotKept, StepBack, and TooLate, which the same transaction decides.
+    virtual void handOver(const Task& task) = 0;
     /// Changes these tasks, which an outcome has changed, in one transaction; the first one is its
     /// own. `row` is the outcome as the plug-in gave it, for those who listen now: it is not kept.
     /// Returns when that is durable, however long it takes.

@@ -121,7 +121,7 @@ std::uint64_t TaskList::addHandedOver(Task task) {
     // The transaction that recorded the outcome of the one before may have recorded it.
     if (task.run != keeper_.run()) {
         task.run = keeper_.run();
-        keeper_.save(task);
+        keeper_.handOver(task);
     }
     return insert(std::move(task));
 }

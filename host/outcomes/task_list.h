@@ -54,7 +54,7 @@ public:
         /// Throws NotKept; unguarded, the request goes on and is no task.
         /// `forced`: with a guard passed by, should it be handed over again after a kill.
         Request(TaskList& list, const Query& query, std::string asker, bool forced = false);
-        /// Hands over a task that has been entered.
+        /// Hands over a task that has been entered. Throws what TaskKeeper::handOver() throws.
         Request(TaskList& list, Task task);
         ~Request();
         Request(const Request&) = delete;

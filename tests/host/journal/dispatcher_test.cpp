@@ -216,6 +216,21 @@ TEST_F(Dispatching, OneThatIsTooLateIsNotHandedOverWithTheOutcomeBefore) {
     EXPECT_THAT(handedOver, ElementsAre("t1"));
 }
 
+TEST_F(Dispatching, OneThatExpiresWhileTheGuardsLookAtItIsNotHandedOver) {
+    const Task late = enter("t1");
+    const Task second = enter("t2");
+    Dispatcher dispatcher(journal, *list, [&](const Task& task) {
+        if (task.id == late.id) throw host::TooLate("it took too long");
+        accept(task);
+        outcomes.publish(row(task.transid));
+        return std::optional<Task>();
+    });
+    start(dispatcher);
+    EXPECT_EQ(endOf(late), TaskState::Expired);
+    EXPECT_EQ(endOf(second), TaskState::Done);
+    EXPECT_THAT(handedOver, ElementsAre("t2"));
+}
+
 /// With an install that had begun when the last run ended.
 class DispatchingAfterInstall : public Dispatching {
 protected:

@@ -555,6 +555,7 @@ public:
     void enter(Task&) override { throw host::NotKept("the disk is full"); }
     void enterSoon(Task) override {}
     void save(const Task&) override { throw host::NotKept("the disk is full"); }
+    void handOver(const Task&) override { throw host::TooLate("it expired"); }
     void saveOutcome(const std::vector<Task>&, const std::string&) override {}
     void saveSoon(Task) override {}
     void keepRow(const std::string&, const std::string&) override {}
@@ -579,6 +580,16 @@ TEST_F(Tasks, OneThatCannotBeKeptIsHandedOverOnlyWithoutGuards) {
     TaskList unguarded(*tables, *feed, full, false);
     TaskList::Request request(unguarded, query("t1", "START"), "somebody");
     EXPECT_FALSE(request.answered(rows(taskRow("t1", "START", 0)), answering(0)));
+}
+
+TEST_F(Tasks, OneThatExpiresBeforeItsHandOverIsRecordedIsNotHandedOver) {
+    FullKeeper keeper;
+    TaskList guarded(*tables, *feed, keeper, true);
+    Task task;
+    task.transid = "t1";
+    task.way = host::TaskWay::Journal;
+    EXPECT_THROW(TaskList::Request(guarded, task), host::TooLate);
+    EXPECT_FALSE(guarded.mayRestartHost());
 }
 
 class TasksWithoutGuards : public Tasks {

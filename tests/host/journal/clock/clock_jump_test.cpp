@@ -31,6 +31,33 @@ TEST_F(JournalsDate, NeverGoesBackForTasksThatExpire) {
     }
 }
 
+TEST_F(JournalsDate, NeverGoesBackBehindWhatAnEarlierRunWroteDown) {
+    open();
+    const auto tomorrow = host::WallClock::now() + std::chrono::hours(24);
+    Task task = ended(entered("t1"));
+    task.ended = tomorrow;
+    journal->save(task);
+    open();
+    EXPECT_GE(journal->latestTime(), tomorrow - std::chrono::microseconds(1));
+}
+
+TEST_F(JournalsDate, IsLookedAtInTheTransactionThatRecordsAHandOver) {
+    open();
+    Task late = asked("t1");
+    late.expires = host::WallClock::now() + std::chrono::hours(1);
+    journal->enter(late);
+    Task handedOver = late;
+    handedOver.run = journal->run();
+    {
+        const faults::JumpingDate jumping(kDay);
+        for (int look = 0; look < 10; ++look)
+            journal->latestTime();
+        EXPECT_THROW(journal->handOver(handedOver), host::TooLate);
+    }
+    EXPECT_EQ(journal->find("t1")->run, std::nullopt);
+    EXPECT_EQ(stateOf("t1"), TaskState::Queued);
+}
+
 TEST_F(JournalsDate, DoesNotDecideWhatComesNext) {
     open();
     std::vector<std::string> line;
