@@ -49,6 +49,9 @@ private:
     std::optional<Inventory> inventory_;
 };
 
+/// The depot that the host uses, whether it exists or not.
+std::string depotOf(CheckSubject& subject);
+
 /// Looks at one thing. Changes nothing. Only what keeps the host from its work is an error: a
 /// program of the home that is missing or cannot be executed, a directory that cannot be used, a
 /// run-as database that does not parse, a time-out that is none, and a plug-in that does not fit.

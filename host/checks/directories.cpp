@@ -20,13 +20,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-std::string depotOf(CheckSubject& subject) {
-    const std::string named = subject.variable(kDepotVariable);
-    return depotDirectoryOf(subject.options.home, named.empty() ? nullptr : named.c_str(),
-                            subject.options.guarded)
-        .path;
-}
-
 /// The directory itself, or the nearest one above it that exists.
 std::string nearestExisting(const std::string& path) {
     fs::path at = fs::absolute(path).lexically_normal();
@@ -88,6 +81,13 @@ bool hasFewFilesLeft(const std::string& path) {
 }  // namespace
 
 CheckFunction checkDepot, checkTemporary, checkState, checkFilesystem, checkSpace;
+
+std::string depotOf(CheckSubject& subject) {
+    const std::string named = subject.variable(kDepotVariable);
+    return depotDirectoryOf(subject.options.home, named.empty() ? nullptr : named.c_str(),
+                            subject.options.guarded)
+        .path;
+}
 
 Finding checkDepot(CheckSubject& subject) {
     Finding finding = usable(depotOf(subject), "every command and every push would be refused");

@@ -9,6 +9,7 @@
 #include <cstddef>
 #include <filesystem>
 #include <iterator>
+#include <set>
 #include <string>
 #include <system_error>
 #include <vector>
@@ -16,6 +17,7 @@
 #include "host/checks/check.h"
 #include "host/checks/wording.h"
 #include "host/home/run_as_list.h"
+#include "host/home/temporary_directory.h"
 
 namespace host {
 namespace {
@@ -27,13 +29,32 @@ constexpr std::size_t kRoom = std::size_t{16} << 10;
 constexpr std::size_t kMostRoom = std::size_t{1} << 20;
 
 bool isTrusted(const struct stat& found) {
-    return (found.st_uid == ::geteuid() || found.st_uid == 0) && (found.st_mode & S_IWOTH) == 0;
+    return (found.st_uid == ::geteuid() || found.st_uid == 0) &&
+           (found.st_mode & (S_IWGRP | S_IWOTH)) == 0;
 }
 
 /// Whether others than the host's user and root own the file or may write to it.
 bool isLoose(const std::string& path) {
     struct stat found {};
     return ::stat(path.c_str(), &found) == 0 && !isTrusted(found);
+}
+
+/// What the host runs, reads and trusts: the home and its programs, their libraries and the
+/// configuration with all their files, and the directories that the host works in.
+std::set<std::string> pathsToProtect(CheckSubject& subject) {
+    std::set<std::string> paths = {subject.options.home, depotOf(subject),
+                                   temporaryDirectoryOf(subject.options.home),
+                                   subject.options.state};
+    for (const char* const folder : {"bin", "lib", "registry", "config", "config/.ConfigData"}) {
+        paths.insert(subject.inHome(folder));
+        std::error_code ignored;
+        for (fs::directory_iterator entry(subject.inHome(folder), ignored), end; entry != end;
+             entry.increment(ignored)) {
+            paths.insert(entry->path().string());
+        }
+    }
+    paths.insert(translatorPath(subject.options.home, subject.inventory()));
+    return paths;
 }
 
 /// Whether certainly nobody of that name is known here.
@@ -78,21 +99,21 @@ Finding checkHome(CheckSubject& subject) {
             "make the home with prepare-home, or make them by hand"};
 }
 
-/// The host runs these programs, so whoever can change them has the host's rights.
+/// Whoever can change these has the host's rights. A directory is as good as the files in it: who
+/// may write to it can put another file in a file's place.
 Finding checkOwners(CheckSubject& subject) {
     std::vector<std::string> loose;
-    for (const char* const name : {"", "bin", "config", "bin/TovrinAgent", "bin/cinfo",
-                                   "bin/uninstall.sh", "bin/um_console", "bin/TovrinGetJavaHome"}) {
-        const std::string path = *name == '\0' ? subject.options.home : subject.inHome(name);
+    for (const std::string& path : pathsToProtect(subject)) {
         if (isLoose(path)) loose.push_back(path);
     }
-    const std::string translator = translatorPath(subject.options.home, subject.inventory());
-    if (!translator.empty() && isLoose(translator)) loose.push_back(translator);
     if (loose.empty()) {
-        return {Verdict::Ok, "programs and configuration belong to the host's user or to root", ""};
+        return {Verdict::Ok,
+                "programs, configuration and the host's directories belong to its user or to root",
+                ""};
     }
     return {Verdict::Warning, "others own or may write to " + listed(loose),
-            "give them to the host's user and take the write permission from others"};
+            "give them to the host's user, and take the write permission from group and others "
+            "(chmod go-w)"};
 }
 
 Finding checkRunAs(CheckSubject& subject) {

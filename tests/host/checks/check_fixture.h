@@ -2,6 +2,7 @@
 #pragma once
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <sys/utsname.h>
 
 #include <clocale>
@@ -29,7 +30,10 @@ protected:
         options.plugin = ZAV_BUILD_DIR "/lib/libzavmgmt.so";
     }
 
-    ~CheckTest() override { std::setlocale(LC_CTYPE, "C"); }
+    ~CheckTest() override {
+        ::umask(formerMask);
+        std::setlocale(LC_CTYPE, "C");
+    }
 
     /// Makes the inventory list these products for one platform.
     void installed(const std::vector<std::string>& products) const {
@@ -67,6 +71,7 @@ protected:
         return "home/config/" + node.substr(0, node.find('.')) + "_zavrunas.cfg";
     }
 
+    const mode_t formerMask = ::umask(022);  ///< before the directories are made
     ScratchDir scratch;
     const std::string home = scratch.makeDir("home");
     std::map<std::string, std::string> environment;

@@ -27,6 +27,24 @@ TEST_F(HomeChecks, WhatOthersMayWriteToIsAWarning) {
     expectFinding("owners", Verdict::Warning, script);
 }
 
+TEST_F(HomeChecks, WhatGroupOrOthersMayChangeIsAWarningInEveryDirectoryThatTheHostTrusts) {
+    expectFinding("owners", Verdict::Ok, "belong to its user or to root");
+    const std::string file = scratch.write("home/lib/common.sh", "");
+    const std::string parameters = scratch.write("home/config/.ConfigData/kumenv", "");
+    for (const std::string& path :
+         {home, home + "/bin", home + "/lib", file, home + "/config", parameters, home + "/tmp",
+          scratch.path("depot"), scratch.makeDir("home/zavhost"), home + "/bin/cinfo"}) {
+        struct stat before {};
+        ASSERT_EQ(::stat(path.c_str(), &before), 0) << path;
+        for (const mode_t bit : {mode_t{S_IWGRP}, mode_t{S_IWOTH}}) {
+            ASSERT_EQ(::chmod(path.c_str(), before.st_mode | bit), 0);
+            expectFinding("owners", Verdict::Warning, "may write to " + path);
+        }
+        ASSERT_EQ(::chmod(path.c_str(), before.st_mode), 0);
+    }
+    expectFinding("owners", Verdict::Ok, "belong to its user or to root");
+}
+
 TEST_F(HomeChecks, ARunAsDatabaseMustParse) {
     const std::string file = runAsFile();
     scratch.write(file, "<runas>\n</runas>\n");
