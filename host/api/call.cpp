@@ -6,6 +6,7 @@
 #include <unordered_set>
 
 #include "host/tables/bad_request.h"
+#include "host/text/nearest_name.h"
 
 namespace host {
 namespace {
@@ -83,12 +84,21 @@ const char* nameOf(Json type) {
     return "";
 }
 
+[[noreturn]] void refuseMember(const std::string& name, const std::vector<Member>& members) {
+    std::vector<std::string> known;
+    for (const Member& member : members)
+        known.emplace_back(member.name);
+    const std::string nearest = nearestName(name, known);
+    throw BadRequest("unknown member \"" + name + "\" in the body" +
+                     (nearest.empty() ? "" : "; did you mean \"" + nearest + "\"?"));
+}
+
 void checkNames(const json& document, const std::vector<Member>& members) {
     for (const auto& given : document.items()) {
         const bool known =
             std::any_of(members.begin(), members.end(),
                         [&given](const Member& member) { return given.key() == member.name; });
-        if (!known) throw BadRequest("unknown member \"" + given.key() + "\" in the body");
+        if (!known) refuseMember(given.key(), members);
     }
 }
 

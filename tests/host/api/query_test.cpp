@@ -48,7 +48,8 @@ TEST_F(QueryEndpoint, RefusesBodiesOfTheWrongShape) {
     expectError(400, "\"table\" is not a string", post(R"({"table":1})"));
     expectError(400, "\"where\" is not an array", post(R"({"table":"PLAIN","where":{}})"));
     expectError(400, "\"where\" is not an array", post(R"({"table":"PLAIN","where":null})"));
-    expectError(400, "unknown member \"were\" in the body", post(R"({"table":"PLAIN","were":[]})"));
+    expectError(400, "unknown member \"were\" in the body; did you mean \"where\"?",
+                post(R"({"table":"PLAIN","were":[]})"));
 }
 
 TEST_F(QueryEndpoint, RefusesWhatIsNotJson) {

@@ -205,7 +205,9 @@ TEST_F(Calls, CheckTheTypesOfTheBodysMembers) {
     EXPECT_EQ(refusal(R"({"name":"x","where":{}})"), "\"where\" is not an array");
     EXPECT_EQ(refusal(R"({"name":"x","more":[]})"), "\"more\" is not an object");
     EXPECT_EQ(refusal(R"({"count":1})"), "the body lacks \"name\"");
-    EXPECT_EQ(refusal(R"({"nome":"x"})"), "unknown member \"nome\" in the body");
+    EXPECT_EQ(refusal(R"({"nome":"x"})"),
+              "unknown member \"nome\" in the body; did you mean \"name\"?");
+    EXPECT_EQ(refusal(R"({"name":"x","sundry":1})"), "unknown member \"sundry\" in the body");
 }
 
 TEST_F(Calls, IgnoreABodyThatTheRouteDoesNotDescribe) {
