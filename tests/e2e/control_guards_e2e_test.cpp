@@ -12,6 +12,7 @@
 #include "support/host/script_home.h"
 #include "support/host/starter_home.h"
 #include "support/left_running.h"
+#include "support/scratch_dir.h"
 
 namespace {
 
@@ -97,6 +98,55 @@ TEST_F(ControlGuards, AnImportWithoutAMetafileIsWrongUsage) {
 TEST_F(ControlGuards, AnUnguardedHostTakesAnImportWithoutAMetafileForDone) {
     start(Guards::Off);
     EXPECT_THAT(zavctl({"ua-config"}).out, HasSubstr("ua-config: done"));
+}
+
+TEST_F(ControlGuards, AFilesNameIsNoConfiguration) {
+    start(Guards::On);
+    const ScratchDir files;
+    const std::string file = files.write("ux.config", "INSTANCE=\nA=1\n");
+    const ProgramResult result = zavctl({"config", "set", "ux", file});
+    EXPECT_EQ(result.status, 2);
+    EXPECT_EQ(result.err, "zavctl: " + file +
+                              " is the name of a file, and no configuration\n"
+                              "  To send what is in it: zavctl config set ux --file " +
+                              file + "\n");
+    EXPECT_THAT(zavctl({"tasks"}).out, Not(HasSubstr("SETCONFIG")));
+    zavctl({"config", "set", "ux", "A=" + file});
+    EXPECT_THAT(zavctl({"tasks"}).out, HasSubstr("SETCONFIG")) << "this is one";
+}
+
+TEST_F(ControlGuards, AnUnguardedHostGetsAFilesNameForAConfiguration) {
+    start(Guards::Off);
+    const ScratchDir files;
+    zavctl({"config", "set", "ux", files.write("ux.config", "A=1\n")});
+    EXPECT_THAT(zavctl({"tasks"}).out, HasSubstr("SETCONFIG"));
+}
+
+const std::vector<std::string> kInstallWithOption = {"install", "ux", "6.3", "/bin/echo", "-q"};
+
+/// Sent behind "--", the option is the command's.
+void expectInstallWithDashes(const ManagedHost& host) {
+    std::vector<std::string> line = kInstallWithOption;
+    line.insert(line.begin() + 3, {"--no-verify", "--"});
+    EXPECT_EQ(host.zavctl(line).status, 0);
+    EXPECT_THAT(host.zavctl({"--json", "tasks"}).out, HasSubstr("/bin/echo -q"));
+}
+
+TEST_F(ControlGuards, AnInstallCommandWithOptionsStandsBehindDashes) {
+    start(Guards::On);
+    const ProgramResult result = zavctl(kInstallWithOption);
+    EXPECT_EQ(result.status, 2);
+    EXPECT_THAT(result.err, HasSubstr("put the install command behind --\n"));
+    EXPECT_THAT(result.err, HasSubstr(" install ux 6.3 -- /bin/echo -q\n"));
+    EXPECT_THAT(zavctl({"tasks"}).out, Not(HasSubstr("INSTALL")));
+    expectInstallWithDashes(*host);
+}
+
+TEST_F(ControlGuards, AnUnguardedHostMakesNoDifferenceToTheWordsOfALine) {
+    start(Guards::Off);
+    EXPECT_EQ(zavctl(kInstallWithOption).status, 2);
+    EXPECT_THAT(zavctl({"tasks"}).out, Not(HasSubstr("INSTALL")));
+    expectInstallWithDashes(*host);
 }
 
 // ---- Successes that are none --------------------------------------------------------------------

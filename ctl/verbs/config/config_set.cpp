@@ -2,10 +2,14 @@
 
 #include <unistd.h>
 
+#include <filesystem>
 #include <nlohmann/json.hpp>
+#include <system_error>
 
 #include "ctl/client/failure.h"
+#include "ctl/client/guarded.h"
 #include "ctl/client/whole_file.h"
+#include "ctl/show/shell_quoted.h"
 #include "ctl/verbs/arguments/common_arguments.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/tasks/queued.h"
@@ -38,6 +42,23 @@ bool isUtf8(const std::string& text) {
     }
 }
 
+/// Whether a text that has no form of a configuration is the name of a file here.
+bool isFileName(const std::string& text) {
+    std::error_code ignored;
+    return text.find_first_of("=\n") == std::string::npos &&
+           std::filesystem::is_regular_file(text, ignored);
+}
+
+/// Somebody who forgets --file would replace the agent's configuration by a file's name.
+void refuseFileName(const Invocation& invocation) {
+    const std::string& text = invocation.given.text(kText);
+    if (!isFileName(text) || !isGuarded(invocation.host, invocation.deadline())) return;
+    throw Failure(kWrongUsage, text + " is the name of a file, and no configuration",
+                  "To send what is in it: zavctl config set " +
+                      shellQuoted(invocation.given.text(kProduct)) + " --file " +
+                      shellQuoted(text));
+}
+
 std::string textToSet(const Values& given) {
     const std::string& file = given.text(kFile);
     const std::string& text = given.text(kText);
@@ -50,6 +71,7 @@ std::string textToSet(const Values& given) {
 
 ExitStatus run(const Invocation& invocation) {
     const Values& given = invocation.given;
+    refuseFileName(invocation);
     TaskRequest request =
         configurationRequest(given.text(kProduct), given.text(kTarget), textToSet(given));
     request.isForced = given.flag(kForce);

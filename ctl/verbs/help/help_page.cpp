@@ -19,8 +19,9 @@ constexpr std::size_t kColumns = 80;
 constexpr std::size_t kWidestName = 24;
 
 constexpr const char* kExitStatuses =
-    "\nExit status: 0 success; 1 the task failed or the host refused it; 2 wrong\n"
-    "usage; 3 no host reached; 4 no outcome within --timeout; 130 interrupted.\n";
+    "\nExit status: 0 done; 1 failed, cancelled, interrupted or expired, not known to\n"
+    "be done, refused by a guard or for now, or errors found by doctor; 2 wrong\n"
+    "usage; 3 no host reached; 4 no outcome within --timeout; 130 ended by Ctrl-C.\n";
 
 /// The text in lines of at most `width` letters, broken at blanks. Its own line ends count as
 /// blanks.
@@ -155,12 +156,15 @@ std::string programHelp() {
 
 std::string groupHelp(const VerbGroup& group) {
     Entries entries;
+    std::string examples;
     for (const Verb* const verb : kVerbs) {
-        if (isIn(*verb, group)) entries.emplace_back(verb->name, verb->help);
+        if (!isIn(*verb, group)) continue;
+        entries.emplace_back(verb->name, verb->help);
+        examples += std::string("  ") + verb->examples[0] + "\n";
     }
     return std::string(group.help) + ".\n\nUsage: zavctl " + group.name + " COMMAND ...\n" +
-           section("Commands", entries) + "\nzavctl help " + group.name +
-           " COMMAND explains a command, with examples.\n";
+           section("Commands", entries) + "\nExamples:\n" + examples + "\nzavctl help " +
+           group.name + " COMMAND explains a command, with more examples.\n";
 }
 
 std::string verbHelp(const Verb& verb) {

@@ -57,10 +57,27 @@ TEST(Help, SaysWhichArgumentsMayBeLeftOutAndWhichDoNotGoTogether) {
     EXPECT_THAT(ctl::verbHelp(ctl::kInstallVerb), HasSubstr("only with --restart"));
 }
 
-TEST(Help, OfAGroupListsItsVerbs) {
-    const std::string text = ctl::groupHelp(*ctl::findVerbGroup("config"));
+TEST(Help, OfAGroupListsItsVerbsWithAnExampleOfEach) {
+    const std::string config = ctl::groupHelp(*ctl::findVerbGroup("config"));
     for (const char* name : {"get", "set", "edit"})
-        EXPECT_THAT(text, HasSubstr(std::string("\n  config ") + name + " "));
+        EXPECT_THAT(config, HasSubstr(std::string("\n  config ") + name + " "));
+    for (const ctl::VerbGroup& group : ctl::kVerbGroups) {
+        const std::string text = ctl::groupHelp(group);
+        for (const ctl::Verb* const verb : ctl::kVerbs) {
+            if (std::string(verb->name).rfind(std::string(group.name) + " ", 0) != 0) continue;
+            EXPECT_THAT(text, HasSubstr(std::string("\n  ") + verb->examples[0] + "\n"));
+        }
+        expectToFit(text);
+    }
+}
+
+TEST(Help, NamesEveryExitStatus) {
+    const std::string text = ctl::programHelp();
+    for (const char* const status :
+         {" 0 done;", " 1 failed, ", " 2 wrong\n", " 3 no host", " 4 no outcome", " 130 ended"})
+        EXPECT_THAT(text, HasSubstr(status));
+    for (const char* const reason : {"cancelled", "interrupted", "expired", "guard", "doctor"})
+        EXPECT_THAT(text, HasSubstr(reason));
 }
 
 }  // namespace
