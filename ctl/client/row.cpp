@@ -32,6 +32,16 @@ std::uint64_t countOf(const json& object, const std::string& member) {
     return found->get<std::uint64_t>();
 }
 
+bool isBetween(const json& object, const std::string& member, std::int64_t least,
+               std::int64_t most) {
+    const auto found = object.find(member);
+    if (found == object.end() || !found->is_number_integer()) return false;
+    constexpr auto kMost = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
+    if (found->is_number_unsigned() && found->get<std::uint64_t>() > kMost) return false;
+    const auto number = found->get<std::int64_t>();
+    return number >= least && number <= most;
+}
+
 int returnCodeOf(const json& row) {
     const auto found = row.find("RETVAL");
     if (found == row.end() || !found->is_number_integer()) return kNoReturnCode;

@@ -23,6 +23,10 @@ bool flagOf(const nlohmann::json& object, const std::string& member, bool fallba
 /// A member that is a whole number, not negative; 0 when there is none, or it is something else.
 std::uint64_t countOf(const nlohmann::json& object, const std::string& member);
 
+/// Whether a member is a whole number from `least` to `most`.
+bool isBetween(const nlohmann::json& object, const std::string& member, std::int64_t least,
+               std::int64_t most);
+
 /// The row's RETVAL, 0 for success. kNoReturnCode when it has none or one that is no 32-bit
 /// number: nothing is known then, and that is no success.
 int returnCodeOf(const nlohmann::json& row);

@@ -1,5 +1,6 @@
 #include "ctl/show/command_report.h"
 
+#include <cstdint>
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/row.h"
@@ -37,6 +38,16 @@ std::string section(const std::string& heading, const std::string& output) {
     return text;
 }
 
+constexpr std::int64_t kMostExit = 255;
+constexpr std::int64_t kMostSignal = 64;
+
+/// What the host says of an end, and that it makes no sense if no system could have said so.
+std::string numberText(const std::string& what, const json& command, const std::string& member,
+                       std::int64_t least, std::int64_t most) {
+    const std::string text = what + printable(textOf(command, member));
+    return isBetween(command, member, least, most) ? text : text + ", which makes no sense";
+}
+
 }  // namespace
 
 json commandsOf(const json& record) {
@@ -53,10 +64,10 @@ std::string endText(const json& command) {
     if (const std::string signal = textOf(command, "signal"); !signal.empty()) {
         const bool isLate = command.value("timed_out", json()) == json(true);
         return (isLate ? "given up after its time-out, " : "") +
-               ("killed by signal " + printable(signal));
+               numberText("killed by signal ", command, "signal", 1, kMostSignal);
     }
     if (const std::string code = textOf(command, "exit"); !code.empty()) {
-        return "exit code " + printable(code);
+        return numberText("exit code ", command, "exit", 0, kMostExit);
     }
     return "not known";
 }
@@ -66,8 +77,8 @@ bool diedUnnoticed(const json& command) {
 }
 
 bool endedBadly(const json& command) {
-    const std::string code = textOf(command, "exit");
-    return diedUnnoticed(command) || (!code.empty() && code != "0");
+    const bool isGood = textOf(command, "exit").empty() || isBetween(command, "exit", 0, 0);
+    return diedUnnoticed(command) || !isGood;
 }
 
 std::string commandReport(const json& command) {

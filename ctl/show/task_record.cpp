@@ -1,5 +1,6 @@
 #include "ctl/show/task_record.h"
 
+#include <cstdint>
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/row.h"
@@ -37,11 +38,16 @@ json resultOf(const json& record) {
     return reply != record.end() ? *reply : json();
 }
 
+/// The process's number, as long as it can be one: it is there to be given to other programs.
+std::string processText(const json& command) {
+    constexpr std::int64_t kMost = 1 << 22;  // no Linux has a larger one
+    if (isBetween(command, "pid", 1, kMost)) return textOf(command, "pid");
+    return textOf(command, "pid").empty() ? "-" : "(no process number)";
+}
+
 std::string processLine(const json& command, WallTime now) {
-    const std::string pid = textOf(command, "pid");
-    return "  " + (pid.empty() ? "-" : printable(pid)) + "  " +
-           redacted(textOf(command, "command")) + " (" + timeText(textOf(command, "started"), now) +
-           ")\n";
+    return "  " + processText(command) + "  " + redacted(textOf(command, "command")) + " (" +
+           timeText(textOf(command, "started"), now) + ")\n";
 }
 
 }  // namespace

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdint>
 #include <nlohmann/json.hpp>
 
 namespace {
@@ -44,6 +45,17 @@ TEST(Row, TakesMembersOfAnotherTypeForMissingOnes) {
     for (const char* member : {"WORD", "LESS", "NONE"})
         EXPECT_EQ(ctl::countOf(row, member), 0U) << member;
     EXPECT_EQ(ctl::countOf(json(7), "SIZE"), 0U);
+}
+
+TEST(Row, KnowsWhichNumbersAreInARange) {
+    const json row = {{"A", 7}, {"MANY", 18446744073709551615ULL}, {"LESS", -1}, {"HALF", 7.0}};
+    EXPECT_TRUE(ctl::isBetween(row, "A", 7, 7));
+    EXPECT_FALSE(ctl::isBetween(row, "A", 8, 9));
+    EXPECT_FALSE(ctl::isBetween(row, "A", 0, 6));
+    EXPECT_TRUE(ctl::isBetween(row, "LESS", -1, 0));
+    for (const char* member : {"MANY", "HALF", "NONE"})
+        EXPECT_FALSE(ctl::isBetween(row, member, INT64_MIN, INT64_MAX)) << member;
+    EXPECT_FALSE(ctl::isBetween(json::array({7}), "A", 0, 9));
 }
 
 }  // namespace

@@ -15,6 +15,23 @@ TEST(CommandReport, SaysHowACommandEnded) {
     EXPECT_EQ(ctl::endText({{"exit", nullptr}}), "not known");
 }
 
+TEST(CommandReport, SaysThatNoCommandCanEndSo) {
+    for (const char* code : {"256", "-1", "4294967296", "18446744073709551615", "1.5", "true"}) {
+        const json command = {{"exit", json::parse(code)}};
+        EXPECT_EQ(ctl::endText(command),
+                  std::string("exit code ") + code + ", which makes no sense");
+        EXPECT_TRUE(ctl::endedBadly(command)) << code;
+    }
+    EXPECT_EQ(ctl::endText({{"exit", "0\x1b"}}), "exit code 0\\x1B, which makes no sense");
+    EXPECT_TRUE(ctl::endedBadly({{"exit", "0"}}));
+    EXPECT_EQ(ctl::endText({{"exit", 255}}), "exit code 255");
+    for (const char* number : {"0", "65", "-9", "4294967305"}) {
+        EXPECT_EQ(ctl::endText({{"signal", json::parse(number)}}),
+                  std::string("killed by signal ") + number + ", which makes no sense");
+    }
+    EXPECT_EQ(ctl::endText({{"signal", 64}}), "killed by signal 64");
+}
+
 TEST(CommandReport, KnowsBadEndsAndThoseThatNoExitCodeTells) {
     const json fine = {{"exit", 0}};
     const json failed = {{"exit", 3}};

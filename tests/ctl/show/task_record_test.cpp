@@ -40,6 +40,20 @@ TEST(TaskRecord, AtWorkIsWhatItIsAndItsProcesses) {
         "17: STOP, queued since then\n");
 }
 
+TEST(TaskRecord, GivesNoProcessNumberThatIsNone) {
+    json record = kRecord;
+    for (const char* number : {"0", "-1", "4194305", "18446744073709551615", "1.5", "\"-9\""}) {
+        record["details"]["commands"][1]["pid"] = json::parse(number);
+        EXPECT_EQ(ctl::workText(record, {}),
+                  "deploy-7: INSTALL ux 6.3, running since then\n"
+                  "  (no process number)  sh \\x1B (t3)\n")
+            << number;
+    }
+    record["details"]["commands"][1]["pid"] = nullptr;
+    EXPECT_EQ(ctl::workText(record, {}),
+              "deploy-7: INSTALL ux 6.3, running since then\n  -  sh \\x1B (t3)\n");
+}
+
 TEST(TaskRecord, HasItsTimesAndHowItEnded) {
     json record = kRecord;
     record["state"] = "failed";
