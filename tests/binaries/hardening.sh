@@ -44,4 +44,4 @@ objects() { # NAME LIST
 
 linked "$1"
 objects "$1" "$2"
-exit $status
+exit "$status"
