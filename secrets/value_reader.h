@@ -6,7 +6,6 @@
 
 #include <algorithm>
 #include <cstddef>
-#include <cstring>
 #include <iterator>
 #include <string_view>
 
@@ -23,7 +22,7 @@ inline constexpr std::string_view kNames[] = {"password", "passwd", "pwd",
 /// What is known of a text that comes in pieces, at the end of one of them. A name or a value that
 /// is cut there is still recognised in the next piece. All zeros before the first piece.
 struct Carried {
-    char tail[24];       ///< the last bytes before
+    char tail[24];       ///< the last bytes before, blanks at their end counted as one
     std::size_t length;  ///< how many there are
     bool inValue;        ///< the piece ended before or within a value
     bool begun;          ///< of which there was at least one byte
@@ -136,13 +135,29 @@ private:
         return true;
     }
 
+    /// However many blanks stand behind a name, it must not be lost: one stands for them all.
     void keepTail() {
-        constexpr std::size_t kRoom = sizeof state_.tail;
-        const std::size_t fromText = std::min(text_.size(), kRoom);
-        const std::size_t kept = std::min(before_.length, kRoom - fromText);
-        std::memcpy(state_.tail, before_.tail + before_.length - kept, kept);
-        std::memcpy(state_.tail + kept, text_.data() + text_.size() - fromText, fromText);
-        state_.length = kept + fromText;
+        const std::size_t blanks = trailingBlanks();
+        const std::size_t length = before_.length + text_.size() - blanks;
+        const std::size_t kept = std::min(length, sizeof state_.tail - 1);
+        for (std::size_t i = 0; i < kept; ++i)
+            state_.tail[i] = at(length - kept + i);
+        if (blanks > 0) state_.tail[kept] = ' ';
+        state_.length = kept + (blanks > 0 ? 1 : 0);
+    }
+
+    /// Of what is known of the text.
+    std::size_t trailingBlanks() const {
+        const std::size_t length = before_.length + text_.size();
+        std::size_t count = 0;
+        while (count < length && isBlank(at(length - count - 1)))
+            ++count;
+        return count;
+    }
+
+    /// A byte of what is known of the text.
+    char at(std::size_t i) const {
+        return i < before_.length ? before_.tail[i] : text_[i - before_.length];
     }
 
     Carried& state_;

@@ -22,6 +22,22 @@ TEST(Masked, IsTheSameWhenItIsMaskedAgain) {
     EXPECT_EQ(masked(once), once);
 }
 
+TEST(Masker, FindsANameBeforeManyBlanksWhereverTheTextIsCut) {
+    for (const std::string& blanks :
+         {std::string(40, ' '), std::string(23, '\t'), std::string(1, ' ')}) {
+        for (const std::string name : {"password", "\"api_secret\""}) {
+            const std::string text = "a " + name + blanks + "=hunter2 b";
+            for (std::size_t piece = 1; piece <= text.size(); ++piece) {
+                Masker masker;
+                std::string shown;
+                for (std::size_t at = 0; at < text.size(); at += piece)
+                    shown += masker.feed(text.substr(at, piece));
+                EXPECT_EQ(shown, "a " + name + blanks + "=*** b") << piece;
+            }
+        }
+    }
+}
+
 TEST(Masker, MasksAValueOnceWhereverTheTextIsCut) {
     const std::string text = "a password=hunter2 b\nkey: 'x y' c secret=z";
     const std::string whole = masked(text);
