@@ -17,7 +17,8 @@ include(GoogleTest)
 #   LABEL      the ctest label of all cases here, in place of the files' own
 #   COST       ctest begins with the most expensive cases; 1 if not given
 #   ALONE      files that replace functions of the C library, the platform or the plug-in, or
-#              operator new. Each of them is a program of its own, named <folder>_<file>.
+#              operator new, and those that need another locale than the rest. Each of them is a
+#              program of its own, named <folder>_<file>.
 function(zav_add_tests)
   cmake_parse_arguments(PARSE_ARGV 0 arg "" "LABEL;COST" "LIBRARIES;DEPENDS;ALONE")
   if(arg_UNPARSED_ARGUMENTS)

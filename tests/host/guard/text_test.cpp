@@ -1,76 +1,10 @@
-// The guard of text outside ASCII, checked with the plug-in's own texts: what it makes of the
-// values on their way into a child or a file.
-#include <algorithm>
-
-#include "base/zavstr.h"
-#include "base/zavtoken.h"
-#include "host/guard/guard_fixture.h"
-#include "support/scoped_env.h"
-#include "util/zavprocs.h"
+// The guard of text outside ASCII in a locale of UTF-8.
+#include "host/guard/text_fixture.h"
 
 namespace {
 
-using ZAV::String;
-
 /// One, two, three and four bytes in UTF-8.
 const char* const kLetters[] = {"a", "\u00e4", "\u20ac", "\U0001F600"};
-
-std::string repeated(const std::string& letter, int count) {
-    std::string text;
-    for (int i = 0; i < count; ++i)
-        text += letter;
-    return text;
-}
-
-/// What a child or a system call gets of the text.
-std::string narrowed(const String& text) {
-    return static_cast<const char*>(text.c_str());
-}
-
-/// The last argument of a command line.
-std::string lastArgument(const String& command) {
-    char** argv = nullptr;
-    const int count = ZAV::MakeArgv(&command, &argv);
-    std::string last = count > 0 ? argv[count - 1] : "";
-    for (int i = 0; i < count; ++i)
-        ::free(argv[i]);
-    ::free(argv);
-    return last;
-}
-
-class TextGuard : public GuardTest {
-protected:
-    explicit TextGuard(const char* codePage = "UTF-8", const char* locale = "C.UTF-8")
-        : GuardTest(codePage), locale_("LC_ALL", locale) {}
-
-    std::string mended(const std::string& column, const std::string& value) {
-        return admitted(given({{"COMMAND", "GETCONFIG"}, {column, value}})).value(column);
-    }
-    /// Checks what a translator gets on its standard input.
-    void expectWholeContext(const std::string& text) {
-        EXPECT_EQ(narrowed(mended("CONTEXT", text).c_str()), text);
-    }
-    void expectWholeMetafile(const std::string& name) {
-        const String value(mended("UACONFIG", name).c_str());
-        EXPECT_EQ(narrowed("/depot/" + value), "/depot/" + name);
-        EXPECT_EQ(lastArgument("/home/bin/um_console -h /home -c \"IMPORT /meta/" + value + "\""),
-                  "IMPORT /meta/" + name);
-        EXPECT_EQ(narrowed(value), name) << "in the row that answers";
-    }
-    void expectWholeScripts(const std::vector<std::string>& names) {
-        std::string list;
-        for (const std::string& name : names)
-            list += (list.empty() ? "" : ",") + name;
-        const String value(mended("UASCRIPT", list).c_str());
-        StringTokenizer tokens(value, ",");
-        for (const std::string& name : names)
-            EXPECT_EQ(narrowed("/depot/" + tokens.nextToken()), "/depot/" + name);
-        EXPECT_FALSE(tokens.hasMoreTokens());
-    }
-
-private:
-    ScopedEnv locale_;
-};
 
 TEST_F(TextGuard, EveryColumnThatTakesTextIsWhole) {
     for (const char* letter : kLetters) {
@@ -139,28 +73,6 @@ TEST_F(TextGuard, OtherColumnsTakeAsciiOnly) {
             "text 400: the value of column " + std::string(column) +
                 " is not in ASCII; only CONTEXT, UACONFIG and UASCRIPT take other characters");
     }
-}
-
-/// The plug-in takes the bytes of the plain locale for ISO 8859-1.
-class TextGuardOfOneByte : public TextGuard {
-protected:
-    TextGuardOfOneByte() : TextGuard("ISO-8859-1", "C") {}
-};
-
-TEST_F(TextGuardOfOneByte, AppendsNothing) {
-    for (int count = 0; count <= 300; ++count) {
-        const std::string text = repeated("\xE4", count);
-        expectWholeContext(text);
-        expectWholeMetafile(text);
-        if (count > 0) expectWholeScripts({text, text});
-        EXPECT_EQ(mended("CONTEXT", text), text);
-        EXPECT_EQ(mended("UACONFIG", text), text);
-        EXPECT_EQ(mended("UASCRIPT", text + "," + text), text + "," + text);
-    }
-}
-
-TEST_F(TextGuardOfOneByte, OtherColumnsTakeAsciiOnly) {
-    EXPECT_EQ(refuser(given({{"TRANSID", "gr\xFCn"}})), "text");
 }
 
 }  // namespace
