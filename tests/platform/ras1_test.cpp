@@ -399,6 +399,21 @@ TEST(Log, ALinkIsNotFollowed) {
     EXPECT_EQ(scratch.read("target"), "untouched");
 }
 
+TEST(Log, IsForItsOwnerAloneWhateverTheMask) {
+    const ScratchDir scratch;
+    const std::string log = scratch.path("log");
+    EXPECT_EQ(inChild([&] {
+                  ::umask(0);
+                  ras1::configure("ALL", log);
+                  RAS1_Printf(&block, RAS1_ERROR, 1, "%s", "written");
+                  ::_exit(0);
+              }),
+              0);
+    struct stat found {};
+    ASSERT_EQ(::stat(log.c_str(), &found), 0);
+    EXPECT_EQ(found.st_mode, S_IFREG | 0600U);
+}
+
 TEST(Log, APipeOrADeviceIsNoLogAndIsNotWaitedFor) {
     const ScratchDir scratch;
     ASSERT_EQ(::mkfifo(scratch.path("pipe").c_str(), 0600), 0);

@@ -42,7 +42,9 @@ int openLog(const std::string& path) {
     if (path.empty()) return -1;
     constexpr int kFlags =
         O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY;
-    const int opened = ::open(path.c_str(), kFlags, 0640);
+    // A password may get into it that nothing recognises as one.
+    constexpr mode_t kOwnersAlone = 0600;
+    const int opened = ::open(path.c_str(), kFlags, kOwnersAlone);
     if (opened != -1 && !canBeLog(opened)) {
         ::close(opened);
         return -1;
