@@ -87,6 +87,7 @@ std::string taskDocument(const Task& task, const Services& services) {
     for (const Command& command : task.commands)
         commands.push_back(commandObject(command, services.codePage));
     document["details"] = {{"commands", std::move(commands)}};
+    if (document.contains("reason")) document["details"]["reason"] = document["reason"];
     return document.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 

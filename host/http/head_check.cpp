@@ -17,21 +17,43 @@ bool isFolded(std::string_view head) {
     return false;
 }
 
-}  // namespace
+bool isNumber(beast::string_view text) {
+    return !text.empty() && text.find_first_not_of("0123456789") == beast::string_view::npos;
+}
 
-std::optional<Reply> refusalOfHead(std::string_view head, const beast::http::fields& fields) {
-    if (isFolded(head)) {
-        return errorReply(400, "a header field goes on in a second line; that form is obsolete");
+std::optional<Reply> refusalOfFraming(const beast::http::request_header<>& request) {
+    const auto lengths = request.count(field::content_length);
+    if (lengths > 1 || (lengths == 1 && !isNumber(request[field::content_length]))) {
+        return errorReply(400, "a request has one Content-Length, which is a number");
     }
-    const auto codings = fields.count(field::transfer_encoding);
+    const auto codings = request.count(field::transfer_encoding);
     if (codings == 0) return std::nullopt;
-    if (codings > 1 || !beast::iequals(fields[field::transfer_encoding], "chunked")) {
+    constexpr unsigned kFirstWithChunks = 11;
+    if (request.version() < kFirstWithChunks) {
+        return errorReply(400, "HTTP/1.0 knows no Transfer-Encoding");
+    }
+    if (codings > 1 || !beast::iequals(request[field::transfer_encoding], "chunked")) {
         return errorReply(501, "the host knows no Transfer-Encoding but chunked");
     }
-    if (fields.count(field::content_length) > 0) {
+    if (request.count(field::content_length) > 0) {
         return errorReply(400, "a request has a Content-Length or is chunked, not both");
     }
     return std::nullopt;
+}
+
+}  // namespace
+
+std::optional<Reply> refusalOfHead(std::string_view head,
+                                   const beast::http::request_header<>& request) {
+    if (isFolded(head)) {
+        return errorReply(400, "a header field goes on in a second line; that form is obsolete");
+    }
+    if (request.count(field::host) > 1) return errorReply(400, "a request has one Host");
+    return refusalOfFraming(request);
+}
+
+bool hidesALine(std::string_view chunkExtensions) {
+    return chunkExtensions.find_first_of("\r\n") != std::string_view::npos;
 }
 
 }  // namespace host

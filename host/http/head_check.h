@@ -3,7 +3,7 @@
 /// first.
 #pragma once
 
-#include <boost/beast/http/fields.hpp>
+#include <boost/beast/http/message.hpp>
 #include <optional>
 #include <string_view>
 
@@ -12,9 +12,14 @@
 namespace host {
 
 /// The answer to a head that is refused: 400 when a field goes on in the next line, an obsolete
-/// form, or when a message has two lengths; 501 for a transfer coding other than "chunked". Nothing
-/// for all others. `head` is the bytes from the request line to the empty line, `fields` what the
-/// parser made of them.
-std::optional<Reply> refusalOfHead(std::string_view head, const boost::beast::http::fields& fields);
+/// form, when a message has two lengths, two hosts or chunks in a version that knows none; 501 for
+/// a transfer coding other than "chunked". Nothing for all others. `head` is the bytes from the
+/// request line to the empty line, `request` what the parser made of them.
+std::optional<Reply> refusalOfHead(std::string_view head,
+                                   const boost::beast::http::request_header<>& request);
+
+/// Whether the extensions of a chunk, as they were sent, hold the end of a line in the eyes of some
+/// readers.
+bool hidesALine(std::string_view chunkExtensions);
 
 }  // namespace host

@@ -35,6 +35,11 @@ bool wantsContinue(const http::request<http::string_body>& request) {
     return request.version() >= 11 && beast::iequals(request[http::field::expect], "100-continue");
 }
 
+/// Looks at the extensions of each chunk, which the parser passes by as far as the end of the line.
+void checkChunk(std::uint64_t, beast::string_view extensions, beast::error_code& error) {
+    if (hidesALine(view(extensions))) error = http::error::bad_chunk_extension;
+}
+
 /// Composes no text: memory may be what is missing.
 Reply failure() {
     return {500, "{\"error\":\"the request failed for want of memory\"}\n"};
@@ -86,6 +91,7 @@ void HttpSession::readRequest() {
     parser_.emplace();
     parser_->header_limit(core_.limits.headBytes);
     parser_->body_limit(core_.limits.bodyBytes);
+    parser_->on_chunk_header(checkChunk);
     keepAlive_ = false;
     isHead_ = false;
     head_.clear();

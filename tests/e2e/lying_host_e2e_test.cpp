@@ -7,6 +7,7 @@
 #include <sys/resource.h>
 
 #include <algorithm>
+#include <cctype>
 
 #include "ctl/client/lying_host.h"
 #include "support/host/managed_host.h"
@@ -26,7 +27,11 @@ constexpr long kMostKiB = 4L << 20;
 constexpr long kMostKiB = 400L << 10;
 #endif
 
-ProgramResult ask(const LyingHost& host, const Words& verb, const std::string& timeout = "20") {
+/// Of seconds, for what does not wait for a time-out, however busy the machine is.
+const char* const kTimeEnough = "50";
+
+ProgramResult ask(const LyingHost& host, const Words& verb,
+                  const std::string& timeout = kTimeEnough) {
     Words line = {zavctlPath(), "--socket", host.path(), "--timeout", timeout};
     line.insert(line.end(), verb.begin(), verb.end());
     return runProgram(line);
@@ -74,6 +79,14 @@ LyingHost::Lie saying(const std::string& bytes) {
 
 LyingHost::Lie answering(const std::string& document) {
     return saying(ok(document));
+}
+
+/// The document is made when it is asked for, because it is large.
+LyingHost::Lie answeringAtLength(std::string (*document)()) {
+    return [document](const Victim& victim) {
+        victim.hear();
+        victim.send(ok(document()));
+    };
 }
 
 // ---- Answers that no verb can use ---------------------------------------------------------------
@@ -142,11 +155,12 @@ std::vector<Lie> answersThatAreNone() {
              victim.sendWithoutEnd("1000\r\n" + std::string(4096, ' ') + "\r\n");
          },
          "is larger than 64 MiB"},
-        {"nested lists", answering(std::string(200'000, '[')), "nested deeper than 100 levels"},
-        {"nested objects", answering(repeated("{\"a\":", 200'000)),
+        {"nested lists", answeringAtLength([] { return std::string(200'000, '['); }),
+         "nested deeper than 100 levels"},
+        {"nested objects", answeringAtLength([] { return repeated("{\"a\":", 200'000); }),
          "nested deeper than 100 levels"},
         {"more rows than anybody has",
-         answering("{\"rows\": [" + repeated("{},", 1'000'200) + "{}]}"),
+         answeringAtLength([] { return "{\"rows\": [" + repeated("{},", 1'000'200) + "{}]}"; }),
          "has more than 1,000,000 rows"},
         {"raw NUL bytes", answering(std::string("{\"rows\": [\0]}", 13)), "is no JSON"},
         {"text that is no UTF-8", answering("{\"rows\": [{\"PRODUCT\": \"\xff\xfe\"}]}"),
@@ -161,7 +175,27 @@ std::vector<Lie> answersThatAreNone() {
     };
 }
 
-TEST(LyingHost, WhoseAnswerIsNoneIsAFailureOfEveryVerb) {
+/// One case for each lie: together they take long.
+class LyingHostWhoseAnswerIsNone : public testing::TestWithParam<Lie> {};
+
+/// "NestedLists" of "nested lists".
+std::string caseName(const testing::TestParamInfo<Lie>& tested) {
+    std::string name;
+    bool begins = true;
+    for (const char* c = tested.param.name; *c != '\0'; ++c) {
+        const auto letter = static_cast<unsigned char>(*c);
+        if (std::isalnum(letter) != 0) {
+            name += static_cast<char>(begins ? std::toupper(letter) : letter);
+        }
+        begins = std::isalnum(letter) == 0;
+    }
+    return name;
+}
+
+INSTANTIATE_TEST_SUITE_P(Saying, LyingHostWhoseAnswerIsNone,
+                         testing::ValuesIn(answersThatAreNone()), caseName);
+
+TEST_P(LyingHostWhoseAnswerIsNone, IsAFailureOfEveryVerb) {
     const Words verbs[] = {{"agents"},
                            {"status"},
                            {"query", "KINAGT"},
@@ -176,17 +210,16 @@ TEST(LyingHost, WhoseAnswerIsNoneIsAFailureOfEveryVerb) {
                            {"task", "show", "T"},
                            {"task", "cancel", "T"},
                            {"events", "--count", "1"}};
-    for (const Lie& lie : answersThatAreNone()) {
-        const LyingHost host(lie.tell);
-        for (const Words& verb : verbs) {
-            SCOPED_TRACE(std::string(lie.name) + ", " + verb.front());
-            const ProgramResult result = ask(host, verb, "5");
-            expectHarmless(result);
-            EXPECT_THAT(result.status, AnyOf(1, 3, 4)) << result.err;
-            EXPECT_THAT(result.err, testing::StartsWith("zavctl: "));
-            if (verb.front() == "agents") {
-                EXPECT_THAT(result.err, HasSubstr(lie.said));
-            }
+    const Lie& lie = GetParam();
+    const LyingHost host(lie.tell);
+    for (const Words& verb : verbs) {
+        SCOPED_TRACE(verb.front());
+        const ProgramResult result = ask(host, verb, kTimeEnough);
+        expectHarmless(result);
+        EXPECT_THAT(result.status, AnyOf(1, 3, 4)) << result.err;
+        EXPECT_THAT(result.err, testing::StartsWith("zavctl: "));
+        if (verb.front() == "agents") {
+            EXPECT_THAT(result.err, HasSubstr(lie.said));
         }
     }
 }
@@ -319,6 +352,15 @@ TEST(LyingHost, IsShownWithItsEscapeSequencesAsText) {
     }
 }
 
+TEST(LyingHost, WhoseNumbersCannotBeIsNotRepeated) {
+    const LyingHost host(
+        answering(R"({"id": "7", "command": "START", "state": "failed", "details": {"commands": [)"
+                  R"({"command": "a", "pid": -1, "exit": 4294967296, "ended": "x"}]}})"));
+    const ProgramResult result = ask(host, {"task", "show", "7"});
+    expectHarmless(result);
+    EXPECT_THAT(result.out, HasSubstr("exit code 4294967296, which makes no sense"));
+}
+
 // ---- Streams ------------------------------------------------------------------------------------
 
 std::string stream(const std::string& lines) {
@@ -345,7 +387,8 @@ TEST(LyingHost, WhoseEventsAreNoneRunsIntoTheTimeOutOrIsNoHost) {
     };
     for (const auto& [lie, status] : lies) {
         const LyingHost host(lie);
-        const ProgramResult result = ask(host, {"events", "--count", "1"}, "3");
+        const ProgramResult result =
+            ask(host, {"events", "--count", "1"}, status == 4 ? "3" : kTimeEnough);
         expectHarmless(result);
         EXPECT_EQ(result.status, status) << result.err;
         EXPECT_NE(result.err, "");
@@ -415,7 +458,7 @@ TEST(LyingHost, ThatTakesFilesInWordsOnlyIsAFailure) {
         const LyingHost transfers(lie);
         const ProgramResult result =
             runProgram({zavctlPath(), "--socket", older.path(), "--rpc-socket", transfers.path(),
-                        "--timeout", "1", "push", file});
+                        "--timeout", status == 4 ? "1" : kTimeEnough, "push", file});
         expectHarmless(result);
         EXPECT_EQ(result.status, status) << result.out << result.err;
         EXPECT_NE(result.out + result.err, "");

@@ -89,6 +89,7 @@ TEST_F(TaskOutput, WithoutEndEndsTheTaskAndNotTheHostsMemory) {
     const json over = task(id, "?wait=100");
     EXPECT_EQ(over["state"], "failed");
     EXPECT_NE(over["reason"].get<std::string>().find("more than they may"), std::string::npos);
+    EXPECT_EQ(over["details"].value("reason", ""), over["reason"]);
     EXPECT_EQ(over["details"]["commands"][0]["signal"], SIGKILL);
     EXPECT_LT(mostMemory(host->pid()), 200 * 1024);
     const std::string next = install(home.files().script("next", "exit 0"));

@@ -43,7 +43,7 @@ public:
     /// Sends the bytes on a connection of their own and returns all that comes back until the host
     /// closes it or nothing more comes for a while.
     std::string exchange(const std::string& bytes,
-                         std::chrono::milliseconds quiet = std::chrono::seconds(5)) const;
+                         std::chrono::milliseconds quiet = std::chrono::seconds(30)) const;
     /// A connected socket; the caller closes it.
     int connect() const;
 

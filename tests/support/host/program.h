@@ -56,7 +56,7 @@ ProgramResult runProgram(const std::vector<std::string>& argv, const std::string
 
 /// Polls until the condition holds; false when it did not within the limit.
 template <typename Condition>
-bool eventually(Condition condition, std::chrono::milliseconds limit = std::chrono::seconds(20));
+bool eventually(Condition condition, std::chrono::milliseconds limit = std::chrono::seconds(60));
 
 // ---------------------------------------------------------------------------------------------
 
