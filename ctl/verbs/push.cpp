@@ -42,9 +42,12 @@ void append(std::vector<std::string>& all, const std::vector<std::string>& more)
     all.insert(all.end(), more.begin(), more.end());
 }
 
-/// What a guarded host cannot keep is removed again.
-std::vector<std::string> cleanUp(const HostAddress& host, const PushCheck& check,
-                                 const std::vector<PushedFile>& files) {
+/// What a guarded host cannot keep is removed again. One that has just let the whole time-out pass
+/// is not given as much again.
+std::vector<std::string> cleanUp(HostAddress host, const PushCheck& check,
+                                 const std::vector<PushedFile>& files, const Failure& failure) {
+    constexpr std::chrono::milliseconds kShort = std::chrono::seconds(5);
+    if (failure.status() == kNoOutcome) host.timeout = std::min(host.timeout, kShort);
     return check.guarded ? removePartialFiles(host, files) : namePartialFiles(files);
 }
 
@@ -87,7 +90,7 @@ void send(const Invocation& invocation, const PushCheck& check, Pusher::Sums sum
             throw;
         }
     } catch (const Failure& failure) {
-        throw withRemains(failure, cleanUp(invocation.host, check, report.files));
+        throw withRemains(failure, cleanUp(invocation.host, check, report.files, failure));
     }
     const std::chrono::duration<double> elapsed = std::chrono::steady_clock::now() - begin;
     report.seconds = elapsed.count();

@@ -24,10 +24,22 @@ struct Arrival {
     const ArrivalDirectory& directory;
 };
 
+/// Who names a directory mostly means a place in it.
+std::string wayOut(const Services& services, const Arrival& arrival, const std::string& reason) {
+    if (reason != arrival.directory.obstacleTo(arrival.file)) return "";
+    const auto there = arrival.directory.find(arrival.file);
+    if (!there || !S_ISDIR(there->st_mode)) return "";
+    return "zavctl push FILE " + services.codePage.toUtf8(arrival.name) +
+           "/ puts the file into it.";
+}
+
 std::optional<Objection> objectionTo(Services& services, const Arrival& arrival) {
     // The plug-in refuses this by itself, guarded or not.
     std::string reason = services.transferRules.whyImpossible(arrival.name, arrival.directory);
-    if (!reason.empty()) return Objection{"", std::move(reason), ""};
+    if (!reason.empty()) {
+        std::string hint = wayOut(services, arrival, reason);
+        return Objection{"", std::move(reason), std::move(hint)};
+    }
     return services.transfers.objectionTo(arrival.name,
                                           arrival.directory.realPath() + "/" + arrival.file);
 }

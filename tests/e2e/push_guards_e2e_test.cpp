@@ -492,6 +492,7 @@ TEST_F(Names, ThatATransferCannotTakeAreRefusedInWords) {
     const std::string file = files_.write("file", "x");
     EXPECT_EQ(push(file, "folder").out,
               "folder: a directory of that name is there\n"
+              "  zavctl push FILE folder/ puts the file into it.\n"
               "push folder: refused; nothing was sent\n");
     EXPECT_EQ(push(file, "plain/a").out,
               "plain/a: plain is no directory\npush plain/a: refused; nothing was sent\n");

@@ -37,6 +37,10 @@ bool isFormerInDoubt(const PushedFile& file) {
     return file.replaces && file.unanswered > 0 && !file.isPartial();
 }
 
+bool isSilent(const Failure& failure) {
+    return failure.status() == kNoHost || failure.status() == kNoOutcome;
+}
+
 std::string doubtAbout(const PushedFile& file) {
     return "the " + file.name + " that was there before may be gone";
 }
@@ -66,16 +70,23 @@ std::string verifyArrival(const HostAddress& host, std::vector<PushedFile>& file
 std::vector<std::string> removePartialFiles(const HostAddress& host,
                                             const std::vector<PushedFile>& files) {
     std::vector<std::string> said;
+    std::string whyGone;  // a host that is not there is asked once, not once for each file
     for (const PushedFile& file : files) {
         if (isFormerInDoubt(file)) said.push_back(doubtAbout(file));
         if (!file.isPartial()) continue;
-        try {
-            DepotClient(host).remove(pathInDepot(file.name), false);
-            said.push_back("what had arrived of " + file.name + " is removed" + lossOf(file));
-        } catch (const Failure& failure) {
-            said.push_back(mayBePartial(file) + ", and cannot be removed: " + failure.what() +
-                           lossOf(file));
+        std::string problem = whyGone;
+        if (problem.empty()) {
+            try {
+                DepotClient(host).remove(pathInDepot(file.name), false);
+            } catch (const Failure& failure) {
+                problem = failure.what();
+                if (isSilent(failure)) whyGone = problem;
+            }
         }
+        said.push_back(problem.empty()
+                           ? "what had arrived of " + file.name + " is removed"
+                           : mayBePartial(file) + ", and cannot be removed: " + problem);
+        said.back() += lossOf(file);
     }
     return said;
 }

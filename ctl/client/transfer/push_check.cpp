@@ -80,6 +80,11 @@ PushCheck checkPush(const HostAddress& host, std::vector<PushedFile>& files) {
     try {
         answer = DepotClient(host).check(namesOf(files), bytesOf(files));
     } catch (const Failure& failure) {
+        // A host that hangs would let the transfer wait as long again.
+        if (failure.status() == kNoOutcome) {
+            throw Failure(kNoOutcome,
+                          "the host did not answer within the time-out; nothing was sent");
+        }
         // The transfer has a socket of its own, and its own words when nobody listens there. What
         // the host would do to a file is known without asking, and it may do it all the same.
         check.whyUnknown = failure.what();

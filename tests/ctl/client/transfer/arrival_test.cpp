@@ -132,4 +132,16 @@ TEST(RemovePartialFiles, NamesWhatCannotBeRemoved) {
                                              "removed: "));
 }
 
+TEST(RemovePartialFiles, AsksAHostThatHangsUpOnce) {
+    const CannedHost host([](const CannedHost& self) { self.accept(); });
+    std::vector<PushedFile> files = {fileWithSum("a", ""), fileWithSum("b", "")};
+    for (PushedFile& file : files)
+        file.worst.status = 5;
+    const std::vector<std::string> said = ctl::removePartialFiles(addressOf(host), files);
+    ASSERT_EQ(said.size(), 2U);
+    const std::string begin = " may be in the depot in part, and cannot be removed: ";
+    EXPECT_THAT(said[0], testing::StartsWith("a" + begin));
+    EXPECT_EQ(said[1], "b" + said[0].substr(1));
+}
+
 }  // namespace
