@@ -222,7 +222,15 @@ int countOf(const char* option, const std::optional<std::string>& typed, int mos
     return number;
 }
 
-void chooseJournal(const Typed& typed, HostOptions& options) {
+/// What is not given elsewhere is as long as a command may run.
+std::chrono::seconds orphanWait(const Typed& typed, const Environment& environment,
+                                const HostOptions& options) {
+    const int usual = static_cast<int>(options.orphanWait.count());
+    const int timeout = options.taskTimeout.value_or(taskTimeoutIn(environment).value_or(usual));
+    return std::chrono::seconds(countOf("--orphan-wait", typed.orphanWait, 86'400, timeout));
+}
+
+void chooseJournal(const Typed& typed, const Environment& environment, HostOptions& options) {
     if (typed.noJournal && typed.state) {
         throw StartError("--no-journal and --state exclude each other");
     }
@@ -231,9 +239,7 @@ void chooseJournal(const Typed& typed, HostOptions& options) {
     options.maxQueued = countOf("--max-queued", typed.maxQueued, 1'000'000, options.maxQueued);
     options.keepDays = countOf("--keep-tasks", typed.keepTasks, 36'500, options.keepDays);
     options.keepRows = countOf("--keep-rows", typed.keepRows, 100'000'000, options.keepRows);
-    options.orphanWait = std::chrono::seconds(countOf(
-        "--orphan-wait", typed.orphanWait, 86'400,
-        std::max(1, options.taskTimeout.value_or(static_cast<int>(options.orphanWait.count())))));
+    options.orphanWait = orphanWait(typed, environment, options);
     const std::string onInterrupt = typed.onInterrupt.value_or("keep");
     if (onInterrupt != "keep" && onInterrupt != "rerun") {
         throw StartError("--on-interrupt takes keep or rerun, not \"" + onInterrupt + "\"");
@@ -278,7 +284,7 @@ std::optional<HostOptions> readOptions(int argc, const char* const* argv,
     options.logSize =
         countOf("--log-size", typed->logSize, 1'000'000'000, options.logSize, kSmallestLog);
     chooseSockets(*typed, environment, options);
-    chooseJournal(*typed, options);
+    chooseJournal(*typed, environment, options);
     return options;
 }
 

@@ -3,6 +3,7 @@
 #include <charconv>
 #include <climits>
 #include <cstdlib>
+#include <string_view>
 #include <system_error>
 
 #include "host/process/start_error.h"
@@ -13,17 +14,30 @@ namespace {
 /// The plug-in takes the largest int for a number out of range.
 constexpr int kLongest = INT_MAX - 1;
 
-}  // namespace
-
-int taskTimeoutOf(const std::string& name, const std::string& text) {
+std::optional<int> secondsIn(std::string_view text) {
     int seconds = 0;
     const char* const end = text.data() + text.size();
     const auto [rest, error] = std::from_chars(text.data(), end, seconds);
     if (error != std::errc() || rest != end || seconds < 1 || seconds > kLongest) {
+        return std::nullopt;
+    }
+    return seconds;
+}
+
+}  // namespace
+
+int taskTimeoutOf(const std::string& name, const std::string& text) {
+    const std::optional<int> seconds = secondsIn(text);
+    if (!seconds) {
         throw StartError(name + " takes a number of seconds from 1 to " + std::to_string(kLongest) +
                          ", not \"" + text + "\"");
     }
-    return seconds;
+    return *seconds;
+}
+
+std::optional<int> taskTimeoutIn(const Environment& environment) {
+    const char* const set = environment(kTimeoutVariable);
+    return set == nullptr ? std::nullopt : secondsIn(set);
 }
 
 void chooseTaskTimeout(std::optional<int> given, bool guarded, const Environment& environment) {

@@ -15,6 +15,9 @@ inline constexpr const char* kTimeoutVariable = "TIMEOUT";
 /// origin `name`, when it says none. The largest number is the largest that the plug-in takes.
 int taskTimeoutOf(const std::string& name, const std::string& text);
 
+/// The time-out that TIMEOUT says; nothing if it is not set or says none.
+std::optional<int> taskTimeoutIn(const Environment& environment);
+
 /// Makes the plug-in use the time-out of the command line, if `given` is one. Otherwise, in a
 /// guarded host, throws StartError when TIMEOUT is set to what is no time-out: the plug-in takes
 /// such a text for 0 and gives up every command at once. Changes the process's environment: call it

@@ -92,6 +92,16 @@ TEST_F(Options, TheJournalKeepsWhatItIsToldToKeep) {
     EXPECT_EQ(read({"--task-timeout", "60"})->orphanWait, std::chrono::seconds(60));
 }
 
+TEST_F(Options, CommandsOfAnEarlierRunHaveAsLongAsACommandMayRun) {
+    environment["TOVRINHOME"] = home;
+    environment["TIMEOUT"] = "45";
+    EXPECT_EQ(read({})->orphanWait, std::chrono::seconds(45));
+    EXPECT_EQ(read({"--task-timeout", "60"})->orphanWait, std::chrono::seconds(60));
+    EXPECT_EQ(read({"--orphan-wait", "10"})->orphanWait, std::chrono::seconds(10));
+    environment["TIMEOUT"] = "soon";
+    EXPECT_EQ(read({})->orphanWait, std::chrono::seconds(300)) << "it is refused elsewhere";
+}
+
 TEST_F(Options, OfTheJournalThatMakeNoSenseAreRefused) {
     environment["TOVRINHOME"] = home;
     EXPECT_THROW(read({"--max-queued", "0"}), host::StartError);
