@@ -81,7 +81,7 @@ struct Services {
     const Guards guards{{codePage, home, depotFiles.directory()}, tasks};  ///< asked if `guarded`
     ParameterKeeper startUpParameters{home, outcomes, tasks};              ///< asked if `guarded`
     int maxQueued = 1000;  ///< tasks that may wait in the journal
-    Leftovers leftovers{journal.identity(), journal.run()};
+    Leftovers leftovers{journal.identity(), journal.run(), journal.recovered().formerIdentity};
     Dispatcher dispatcher{
         journal, tasks, [this](const Task& task) { return handOver(*this, task); },
         [this](Task task) { return endOfRestartInstall(*this, std::move(task)); }};

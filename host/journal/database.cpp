@@ -31,6 +31,10 @@ void makePrivate(const std::string& file) {
 
 }  // namespace
 
+DatabaseError DatabaseError::ofDamage(const std::string& text) {
+    return {text, SQLITE_CORRUPT};
+}
+
 bool DatabaseError::damaged() const {
     return (code_ & 0xFF) == SQLITE_CORRUPT || (code_ & 0xFF) == SQLITE_NOTADB;
 }

@@ -20,6 +20,9 @@ namespace host {
 class DatabaseError : public std::runtime_error {
 public:
     DatabaseError(const std::string& text, int code) : std::runtime_error(text), code_(code) {}
+    /// Damage that something other than a failing statement has shown.
+    static DatabaseError ofDamage(const std::string& text);
+
     /// Whether the file is not a database, or one that is damaged.
     bool damaged() const;
 

@@ -33,9 +33,11 @@ Dispatcher::~Dispatcher() {
     if (thread_.joinable()) thread_.join();
 }
 
-void Dispatcher::start(const Leftovers& leftovers, std::chrono::seconds patience) {
-    thread_ = std::thread([this, &leftovers, patience] {
+void Dispatcher::start(const Leftovers& leftovers, std::chrono::seconds patience,
+                       std::function<void()> whenAlone) {
+    thread_ = std::thread([this, &leftovers, patience, whenAlone = std::move(whenAlone)] {
         awaitEndOf(leftovers, patience);
+        callAlone(whenAlone);
         completeInstall();
         journal_.handOverWithOutcomes(true);
         work();
@@ -58,6 +60,18 @@ void Dispatcher::endLeftovers(const Leftovers& leftovers, bool patienceIsOver) {
         killAt_ = now + CommandEnding::kPatience;
     }
     if (patienceIsOver || (killAt_ && now >= *killAt_)) leftovers.end(SIGKILL);
+}
+
+void Dispatcher::callAlone(const std::function<void()>& call) {
+    {
+        const std::lock_guard<std::mutex> lock(lock_);
+        if (stopping_ || !call) return;
+    }
+    try {
+        call();
+    } catch (const std::exception& error) {
+        std::fprintf(stderr, "zavhost: %s\n", error.what());
+    }
 }
 
 void Dispatcher::completeInstall() {

@@ -40,8 +40,10 @@ public:
     Dispatcher& operator=(const Dispatcher&) = delete;
 
     /// Begins as soon as nothing of an earlier run is alive, and an install that went on meanwhile
-    /// is over; after `patience` that is killed. The leftovers outlive this object.
-    void start(const Leftovers& leftovers, std::chrono::seconds patience);
+    /// is over; after `patience` that is killed. The leftovers outlive this object. `whenAlone` is
+    /// called once in between, on the dispatcher's thread; what it throws is printed.
+    void start(const Leftovers& leftovers, std::chrono::seconds patience,
+               std::function<void()> whenAlone = {});
     /// Whether it waits for such an install.
     bool awaitsInstall() const;
     /// Hands over nothing more. Does not wait.
@@ -52,6 +54,7 @@ public:
 private:
     void awaitEndOf(const Leftovers& leftovers, std::chrono::seconds patience);
     void endLeftovers(const Leftovers& leftovers, bool patienceIsOver);
+    void callAlone(const std::function<void()>& call);
     void completeInstall();
     bool tryComplete();
     void work();

@@ -12,13 +12,16 @@
 #include "host/journal/task_rows.h"
 #include "host/outcomes/packed_row.h"
 #include "host/process/start_error.h"
+#include "host/tables/plugin_facts.h"
 
 namespace host {
 namespace {
 
 constexpr std::chrono::seconds kRetry{1};
-/// So many events lie between two looks at what is too old.
+/// At most so many events lie between two looks at what is too old.
 constexpr std::size_t kPruneEvery = 1000;
+/// Rows may be more than are to be kept by this part of their number, or one.
+constexpr std::size_t kSparePart = 10;
 /// Of so many finished tasks the ends of the outputs are kept.
 constexpr int kKeptTails = 1000;
 
@@ -26,13 +29,7 @@ void warn(const std::string& text) {
     std::fprintf(stderr, "zavhost: %s\n", text.c_str());
 }
 
-void removeOld(Database& database, std::int64_t endedBefore, int rows) {
-    constexpr const char* kOld = "(SELECT number FROM tasks WHERE ended IS NOT NULL AND ended < ?)";
-    for (const char* table : {"conditions", "commands", "outcomes"}) {
-        database.change((std::string("DELETE FROM ") + table + " WHERE task IN " + kOld).c_str(),
-                        endedBefore);
-    }
-    database.change("DELETE FROM tasks WHERE ended IS NOT NULL AND ended < ?", endedBefore);
+void removeOldRows(Database& database, int rows) {
     for (const EventKind kind : {EventKind::Row, EventKind::TaskEnd}) {
         database.change(
             "DELETE FROM outcomes WHERE kind = ?1 AND id <= "
@@ -40,6 +37,15 @@ void removeOld(Database& database, std::int64_t endedBefore, int rows) {
             "(task IS NULL OR task NOT IN (SELECT number FROM tasks WHERE ended IS NULL))",
             static_cast<int>(kind), rows);
     }
+}
+
+void removeOldTasks(Database& database, std::int64_t endedBefore) {
+    constexpr const char* kOld = "(SELECT number FROM tasks WHERE ended IS NOT NULL AND ended < ?)";
+    for (const char* table : {"conditions", "commands", "outcomes"}) {
+        database.change((std::string("DELETE FROM ") + table + " WHERE task IN " + kOld).c_str(),
+                        endedBefore);
+    }
+    database.change("DELETE FROM tasks WHERE ended IS NOT NULL AND ended < ?", endedBefore);
     database.change(
         "UPDATE commands SET out = x'', err = x'' WHERE task IN (SELECT number FROM tasks "
         "WHERE ended IS NOT NULL ORDER BY ended DESC LIMIT -1 OFFSET ?) "
@@ -81,20 +87,30 @@ std::optional<Task> onceIn(Database& database, const std::string& identity,
     return found.step() ? readTask(database, identity, found.integer(0)) : std::nullopt;
 }
 
+/// What ran for a journal that is not there any more may still run.
+void noteIdentity(const StateDirectory& directory, Database& database, Recovered& recovered) {
+    const std::string identity = journalIdentity(database);
+    const std::string noted = directory.notedIdentity();
+    if (noted == identity) return;
+    if (recovered.formerIdentity.empty() && !noted.empty()) {
+        setFormerIdentity(database, noted);
+        recovered.formerIdentity = noted;
+    }
+    directory.noteIdentity(identity);
+}
+
 }  // namespace
 
 Journal::Journal(const Settings& settings) : settings_(settings) {
     try {
         if (!settings_.directory.empty()) takeDirectory();
-        openOrSetAside();
-        recovered_.clean = !directory_ || directory_->endedCleanly();
-        settleUnfinished(*database_, settings_.rerunInterrupted,
-                         settings_.boot.empty() ? bootName() : settings_.boot, recovered_);
-        if (directory_) {
-            // What a kill left of a secret in the log of changes goes now.
-            database_->number("PRAGMA wal_checkpoint(TRUNCATE)");
-            reader_ = std::make_unique<Database>(directory_->database());
-            directory_->takeReserve();
+        try {
+            open();
+            beginRun();
+        } catch (const DatabaseError& error) {
+            if (!directory_ || !error.damaged()) throw;
+            replaceDamaged(error.what());
+            beginRun();
         }
     } catch (const NewerSchema& newer) {
         throw StartError("cannot use the journal " + directory_->database() + ": " + newer.what());
@@ -102,13 +118,12 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
         throw StartError("cannot use the journal in " + settings_.directory + ": " + error.what());
     }
     if (recovered_.waiting > 0 || !recovered_.interrupted.empty()) warn(described(recovered_));
-    latest_.store(newestTime(*database_).time_since_epoch().count());
-    events_.emplace(newestEvent(*database_));
     writer_ = std::make_unique<Writer>(
         *database_, reader_ ? nullptr : &readLock_,
         Writer::Watch{[this] { asGiven_.clear(); },
-                      [this](Database& database) { tellOfEvents(database); }});
-    prune();
+                      [this](Database& database) { tellOfEvents(database); }, pruning(),
+                      settings_.pruneEvery});
+    writer_->submitLater(pruning());
 }
 
 Journal::~Journal() = default;
@@ -129,22 +144,41 @@ void Journal::open() {
     key_ = journalKey(*database_);
 }
 
-void Journal::openOrSetAside() {
-    try {
-        open();
-        if (!directory_ || directory_->endedCleanly()) return;
-        recovered_.fault = integrityFault(*database_);
-    } catch (const DatabaseError& error) {
-        if (!directory_ || !error.damaged()) throw;
-        recovered_.fault = error.what();
+/// Settles what the last run left. Throws DatabaseError, also when the journal is damaged; it looks
+/// for damage if that run did not end in good order.
+void Journal::beginRun() {
+    recovered_.clean = !directory_ || directory_->endedCleanly();
+    if (!recovered_.clean) {
+        const std::string fault = integrityFault(*database_);
+        if (!fault.empty()) throw DatabaseError::ofDamage(fault);
     }
-    if (recovered_.fault.empty()) return;
+    Recovered found = recovered_;
+    settleUnfinished(*database_, settings_.rerunInterrupted,
+                     settings_.boot.empty() ? bootName() : settings_.boot, found);
+    found.formerIdentity = formerIdentity(*database_);
+    if (directory_) {
+        // What a kill left of a secret in the log of changes goes now.
+        database_->number("PRAGMA wal_checkpoint(TRUNCATE)");
+        reader_ = std::make_unique<Database>(directory_->database());
+        directory_->takeReserve();
+        noteIdentity(*directory_, *database_, found);
+    }
+    latest_.store(newestTime(*database_).time_since_epoch().count());
+    events_.emplace(newestEvent(*database_));
+    recovered_ = found;
+}
+
+/// Begins a new journal with what can be read of the damaged one.
+void Journal::replaceDamaged(const std::string& fault) {
+    reader_.reset();
     database_.reset();
+    recovered_.fault = fault;
     recovered_.setAside = directory_->setAside();
     open();
-    recovered_.salvaged = salvage(recovered_.setAside, *database_);
-    warn("the journal is damaged (" + recovered_.fault + ") and was set aside as " +
-         recovered_.setAside + "; " + std::to_string(recovered_.salvaged) +
+    recovered_.salvaged = salvage(recovered_.setAside, directory_->notedIdentity(), *database_);
+    key_ = journalKey(*database_);
+    warn("the journal is damaged (" + fault + ") and was set aside as " + recovered_.setAside +
+         ", which may hold passwords of requests; " + std::to_string(recovered_.salvaged) +
          " unfinished tasks of it are entered as interrupted");
 }
 
@@ -255,10 +289,17 @@ void Journal::tellOfEvents(Database& database) {
         if (given != asGiven_.end()) event.row = std::move(given->second);
     }
     events_->append(events);
+    const auto keptRows = static_cast<std::size_t>(settings_.keepRows);
+    rowsSincePrune_ += events.size();
     sincePrune_ += events.size();
     if (sincePrune_ >= kPruneEvery) {
         sincePrune_ = 0;
-        prune();
+        rowsSincePrune_ = 0;
+        writer_->submitLater(pruning());
+    } else if (rowsSincePrune_ > keptRows / kSparePart) {
+        rowsSincePrune_ = 0;
+        writer_->submitLater(
+            [this](Database& changed) { removeOldRows(changed, settings_.keepRows); });
     }
 }
 
@@ -293,14 +334,19 @@ std::string Journal::trouble() {
 }
 
 void Journal::forget(std::int64_t number) {
-    writer_->submitLater([number](Database& database) { deleteTask(database, number); });
+    writer_->submitLater([number, &writer = *writer_](Database& database) {
+        deleteTask(database, number);
+        writer.wipeSoon();
+    });
 }
 
-void Journal::prune() {
-    const auto days = std::chrono::hours(24) * settings_.keepDays;
-    writer_->submitLater([days, rows = settings_.keepRows](Database& database) {
-        removeOld(database, microseconds(WallClock::now() - days), rows);
-    });
+/// Removes what is too old.
+Writer::Change Journal::pruning() {
+    return [this](Database& database) {
+        const auto days = std::chrono::hours(24) * settings_.keepDays;
+        removeOldTasks(database, microseconds(WallClock::now() - days));
+        removeOldRows(database, settings_.keepRows);
+    };
 }
 
 template <typename Reader>
@@ -385,12 +431,16 @@ std::int64_t Journal::notBegun() {
     });
 }
 
-bool Journal::waitsFor(const std::string& product) {
+bool Journal::mayChange(const std::string& product) {
     return read([&](Database& database) {
-        return database.number(
-                   "SELECT count(*) FROM tasks WHERE ended IS NULL AND way = 0 AND run IS NULL AND "
-                   "lower(CAST(product AS TEXT)) = lower(CAST(? AS TEXT))",
-                   product) > 0;
+        Statement found = database.ask(
+            "SELECT command FROM tasks WHERE ended IS NULL AND way = 0 AND "
+            "lower(CAST(product AS TEXT)) = lower(CAST(? AS TEXT))",
+            product);
+        while (found.step()) {
+            if (plugin::changesWhatIsInstalled(found.bytes(0))) return true;
+        }
+        return false;
     });
 }
 

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <atomic>
+#include <chrono>
 #include <cstddef>
 #include <functional>
 #include <map>
@@ -33,7 +34,9 @@ public:
         int keepDays = 30;              ///< tasks that have been over for longer are removed
         int keepRows = 10'000;          ///< of older outcomes the rows are removed
         bool mayYield = false;          ///< in memory, too, when another host uses the directory
-        std::string boot{};             ///< names the start of the machine; empty: the system says
+        /// How often, at least, what is too old is removed.
+        std::chrono::milliseconds pruneEvery = std::chrono::hours(1);
+        std::string boot{};  ///< names the start of the machine; empty: the system says
     };
 
     /// Opens the journal or makes a new one, sets a damaged one aside, and settles what the last
@@ -91,8 +94,9 @@ public:
     std::int64_t waiting();
     /// How many have not begun, those in the plug-in's queue among them.
     std::int64_t notBegun();
-    /// Whether one of them is for this product, in upper or lower case.
-    bool waitsFor(const std::string& product);
+    /// Whether a task that the host hands over in its turn is not over and may change whether this
+    /// product, in upper or lower case, is installed or which instances it has.
+    bool mayChange(const std::string& product);
     /// What becomes of the wish that a task be over.
     enum class Cancel {
         Ended,     ///< it waited in line and never runs
@@ -126,7 +130,8 @@ private:
     auto read(const Reader& reader);
     void takeDirectory();
     void open();
-    void openOrSetAside();
+    void beginRun();
+    void replaceDamaged(const std::string& fault);
     void commit(Writer::Change change);
     void noteTrouble(const std::string& trouble);
     void commitOutcome(const Writer::Change& change);
@@ -135,7 +140,7 @@ private:
     Writer::Change updateOf(std::vector<Task> tasks);
     std::int64_t handOverNext(Database& database);
     void tellOfEvents(Database& database);
-    void prune();
+    Writer::Change pruning();
 
     const Settings settings_;
     std::optional<StateDirectory> directory_;
@@ -153,6 +158,7 @@ private:
     // Of the writer's thread alone.
     std::map<std::int64_t, std::string> asGiven_;  ///< rows of the transaction, by their events
     std::size_t sincePrune_ = 0;                   ///< events
+    std::size_t rowsSincePrune_ = 0;               ///< the same since old rows were removed
 
     mutable embedded::Mutex troubleLock_;
     std::string trouble_ ZAV_GUARDED_BY(troubleLock_);

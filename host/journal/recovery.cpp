@@ -39,10 +39,8 @@ void end(Database& database, Task& task, TaskState state, const char* reason) {
     updateTask(database, task);
 }
 
-/// The start of the machine in which the run began.
-std::string bootOf(Database& database, std::int64_t run) {
-    Statement found = database.ask("SELECT boot FROM runs WHERE run = ?", run);
-    return found.step() ? found.bytes(0) : std::string();
+bool endedCleanly(Database& database, std::int64_t run) {
+    return database.number("SELECT clean FROM runs WHERE run = ?", run) != 0;
 }
 
 void settleOldest(Database& database, std::int64_t number, bool rerun, const std::string& boot,
@@ -51,10 +49,12 @@ void settleOldest(Database& database, std::int64_t number, bool rerun, const std
     if (!task || isOver(task->state)) return;
     if (task->begun) {
         recovered.begun = task->id;
-        recovered.bootedAnew = bootOf(database, task->run.value_or(0)) != boot;
+        recovered.bootedAnew = task->boot != boot;
         return;
     }
-    const int interruptions = task->interruptions + 1;
+    // What the grace at an orderly end cut off did not end the host.
+    const bool unclean = !endedCleanly(database, task->run.value_or(0));
+    const int interruptions = task->interruptions + (unclean ? 1 : 0);
     database.change("UPDATE tasks SET interruptions = ? WHERE number = ?", interruptions, number);
     recovered.interrupted = task->id;
     const bool tooOften = interruptions >= kMostInterruptions;
@@ -103,6 +103,27 @@ std::vector<Task> unfinishedIn(Database& damaged) {
     return tasks;
 }
 
+/// What can still be read of a damaged journal.
+struct Remains {
+    std::string identity;
+    std::string key;
+    std::vector<Task> tasks;
+};
+
+/// A fact of it; empty where that is damaged.
+std::string readable(Database& damaged, std::string (*fact)(Database& database)) {
+    try {
+        return fact(damaged);
+    } catch (const DatabaseError&) {
+        return {};
+    }
+}
+
+Remains remainsOf(Database& damaged) {
+    return {readable(damaged, journalIdentity), readable(damaged, journalKey),
+            unfinishedIn(damaged)};
+}
+
 }  // namespace
 
 std::string bootName() {
@@ -132,21 +153,26 @@ void settleUnfinished(Database& database, bool rerunInterrupted, const std::stri
     database.run("COMMIT");
 }
 
-std::int64_t salvage(const std::string& damagedFile, Database& database) {
-    std::vector<Task> tasks;
+std::int64_t salvage(const std::string& damagedFile, const std::string& notedIdentity,
+                     Database& database) {
+    Remains remains;
     try {
         Database damaged(damagedFile);
-        tasks = unfinishedIn(damaged);
+        remains = remainsOf(damaged);
     } catch (const DatabaseError&) {
-        return 0;
+        // Nothing can be read.
     }
+    if (remains.identity.empty()) remains.identity = notedIdentity;
     database.run("BEGIN IMMEDIATE");
-    for (Task& task : tasks) {
+    if (!remains.identity.empty()) setFormerIdentity(database, remains.identity);
+    if (!remains.key.empty()) setJournalKey(database, remains.key);
+    for (Task& task : remains.tasks) {
+        task.run.reset();  // a number of the other journal
         task.number = insertTask(database, task);
         end(database, task, TaskState::Interrupted, kUnreadable);
     }
     database.run("COMMIT");
-    return static_cast<std::int64_t>(tasks.size());
+    return static_cast<std::int64_t>(remains.tasks.size());
 }
 
 }  // namespace host

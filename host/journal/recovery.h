@@ -9,13 +9,14 @@
 namespace host {
 
 struct Recovered {
-    std::int64_t run = 0;       ///< the number of the new run
-    bool clean = true;          ///< the last run ended in good order
-    std::string setAside;       ///< the name that a damaged journal was given; empty: it was sound
-    std::string fault;          ///< what was wrong with it
-    std::int64_t waiting = 0;   ///< tasks that will run
-    std::string interrupted;    ///< identifier of the task that was cut off; empty: there is none
-    bool runsAgain = false;     ///< it will run again
+    std::int64_t run = 0;        ///< the number of the new run
+    bool clean = true;           ///< the last run ended in good order
+    std::string setAside;        ///< the name that a damaged journal was given; empty: it was sound
+    std::string fault;           ///< what was wrong with it
+    std::string formerIdentity;  ///< of a journal that was set aside once; empty: none, or unknown
+    std::int64_t waiting = 0;    ///< tasks that will run
+    std::string interrupted;     ///< identifier of the task that was cut off; empty: there is none
+    bool runsAgain = false;      ///< it will run again
     std::string begun;          ///< identifier of the install that may go on by itself; empty: none
     bool bootedAnew = false;    ///< the machine was started anew in its midst
     std::int64_t salvaged = 0;  ///< unfinished tasks that were read from a damaged journal
@@ -39,8 +40,10 @@ void takeBackUnfinished(Database& database);
 void settleUnfinished(Database& database, bool rerunInterrupted, const std::string& boot,
                       Recovered& recovered);
 
-/// Enters the unfinished tasks that can still be read from a damaged journal as interrupted.
-/// Returns how many; reads as far as the damage lets it.
-std::int64_t salvage(const std::string& damagedFile, Database& database);
+/// Takes over from a damaged journal, as far as the damage lets it: its identity as the former one,
+/// the key of its hashes, and its unfinished tasks, which are entered as interrupted. Returns how
+/// many those are. `notedIdentity` is taken where the journal does not tell its own.
+std::int64_t salvage(const std::string& damagedFile, const std::string& notedIdentity,
+                     Database& database);
 
 }  // namespace host

@@ -87,6 +87,10 @@ void enterFact(Database& database, const char* name, const std::string& value) {
     database.change("INSERT OR IGNORE INTO facts VALUES (CAST(? AS TEXT), ?)", name, value);
 }
 
+void replaceFact(Database& database, const char* name, const std::string& value) {
+    database.change("INSERT OR REPLACE INTO facts VALUES (CAST(? AS TEXT), ?)", name, value);
+}
+
 }  // namespace
 
 void prepareSchema(Database& database) {
@@ -116,6 +120,18 @@ std::string journalIdentity(Database& database) {
 
 std::string journalKey(Database& database) {
     return fact(database, "key");
+}
+
+void setJournalKey(Database& database, const std::string& key) {
+    replaceFact(database, "key", key);
+}
+
+std::string formerIdentity(Database& database) {
+    return fact(database, "former");
+}
+
+void setFormerIdentity(Database& database, const std::string& identity) {
+    replaceFact(database, "former", identity);
 }
 
 }  // namespace host

@@ -28,5 +28,10 @@ std::string integrityFault(Database& database);
 std::string journalIdentity(Database& database);
 /// The key of the hashes that are left of secrets.
 std::string journalKey(Database& database);
+void setJournalKey(Database& database, const std::string& key);
+/// The identity of the damaged journal in whose place this one came; empty if there was none, or it
+/// is not known.
+std::string formerIdentity(Database& database);
+void setFormerIdentity(Database& database, const std::string& identity);
 
 }  // namespace host

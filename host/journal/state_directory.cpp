@@ -17,6 +17,7 @@ namespace fs = std::filesystem;
 
 constexpr const char* kClean = "/clean";
 constexpr const char* kReserveFile = "/reserve";
+constexpr const char* kIdentity = "/identity";
 
 [[noreturn]] void fail(const std::string& what, int error) {
     throw StartError(what + ": " + std::generic_category().message(error));
@@ -91,8 +92,27 @@ std::string StateDirectory::setAside() const {
     // Changes that are not in the file yet. The index over them is made anew.
     ::rename((database() + "-wal").c_str(), (other + "-wal").c_str());
     ::unlink((database() + "-shm").c_str());
+    // What it holds of requests may be secret.
+    ::chmod(other.c_str(), 0600);
+    ::chmod((other + "-wal").c_str(), 0600);
     syncDirectory(path_);
     return other;
+}
+
+std::string StateDirectory::notedIdentity() const {
+    const FileDescriptor file(
+        ::open((path_ + kIdentity).c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
+    char text[64];
+    const ssize_t size = file ? ::read(file.get(), text, sizeof text) : 0;
+    return std::string(text, size > 0 ? static_cast<std::size_t>(size) : 0);
+}
+
+void StateDirectory::noteIdentity(const std::string& identity) const noexcept {
+    const FileDescriptor file(::open((path_ + kIdentity).c_str(),
+                                     O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (!file) return;
+    const ssize_t written = ::write(file.get(), identity.data(), identity.size());
+    if (written > 0) ::fsync(file.get());
 }
 
 bool StateDirectory::takeReserve() const {

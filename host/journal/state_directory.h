@@ -12,6 +12,7 @@ namespace host {
 /// Belongs to one host at a time, and to nobody but its user. It holds:
 ///
 /// | journal.db, journal.db-wal, journal.db-shm | the journal |
+/// | identity | the journal's identity, which is known by it when the journal cannot be read |
 /// | clean | there is one when the last host that used the directory ended in good order |
 /// | reserve | space that is given up when the disk is full, so that outcomes still find room |
 ///
@@ -34,9 +35,14 @@ public:
     /// This host ends in good order. Errors are ignored: the next start then looks more closely.
     void noteCleanEnd() const noexcept;
 
-    /// Gives the database another name, with what belongs to it; returns that name. Throws
-    /// StartError.
+    /// Gives the database another name, with what belongs to it, and mode 0600; returns that name.
+    /// Throws StartError.
     std::string setAside() const;
+
+    /// The identity of the journal that was noted last; empty if none is known.
+    std::string notedIdentity() const;
+    /// Notes it. Errors are ignored: it is needed only when the journal itself is damaged.
+    void noteIdentity(const std::string& identity) const noexcept;
 
     /// Takes the reserve unless it is there; false when there is no room for it.
     bool takeReserve() const;

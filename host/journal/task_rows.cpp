@@ -128,6 +128,12 @@ std::vector<std::string> readOutcomes(Database& database, std::int64_t number) {
     return rows;
 }
 
+/// The start of the machine in which the run began.
+std::string bootOf(Database& database, std::int64_t run) {
+    Statement found = database.ask("SELECT boot FROM runs WHERE run = ?", run);
+    return found.step() ? found.bytes(0) : std::string();
+}
+
 /// From a row of kColumns.
 Task taskOf(Database& database, const Statement& row, const std::string& identity) {
     Task task;
@@ -241,6 +247,7 @@ std::optional<Task> readTask(Database& database, const std::string& identity, st
     Task task = taskOf(database, found, identity);
     task.outcomes = readOutcomes(database, number);
     task.commands = readCommands(database, number);
+    if (task.run) task.boot = bootOf(database, *task.run);
     return task;
 }
 

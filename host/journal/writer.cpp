@@ -38,6 +38,7 @@ bool isDatabasesFault(const std::exception_ptr& failure) {
 
 Writer::Writer(Database& database, embedded::Mutex* shared, Watch watch)
     : database_(database), shared_(shared), watch_(std::move(watch)) {
+    if (watch_.regular) regularDue_ = Clock::now() + watch_.every;
     thread_ = std::thread([this] { work(); });
 }
 
@@ -108,23 +109,38 @@ std::uint64_t Writer::transactions() const {
     return transactions_;
 }
 
+/// With the lock held.
+void Writer::addRegular(Clock::time_point now) {
+    if (now < regularDue_) return;
+    regularDue_ = now + watch_.every;
+    if (later_.empty()) laterDue_ = now;
+    later_.push_back(watch_.regular);
+}
+
+/// With the lock held: when something is to be done though nobody comes.
+Writer::Clock::time_point Writer::nextDue() const {
+    Clock::time_point due = regularDue_;
+    if (!later_.empty()) due = std::min(due, laterDue_);
+    if (wiping_) due = std::min(due, wipeDue_);
+    return due;
+}
+
 /// Returns false at the end, when nothing is left to do.
 bool Writer::awaitWork(std::unique_lock<std::mutex>& lock) {
-    while (jobs_.empty()) {
+    for (;;) {
         const auto now = Clock::now();
+        if (!ending_) addRegular(now);
+        if (!jobs_.empty()) return true;
         const bool due = (!later_.empty() && now >= laterDue_) || (wiping_ && now >= wipeDue_);
         if (due) return true;
         if (ending_) return !later_.empty() || wiping_;
-        auto until = Clock::time_point::max();
-        if (!later_.empty()) until = laterDue_;
-        if (wiping_) until = std::min(until, wipeDue_);
+        const Clock::time_point until = nextDue();
         if (until == Clock::time_point::max()) {
             changed_.wait(lock);
         } else {
             changed_.wait_until(lock, until);
         }
     }
-    return true;
 }
 
 void Writer::work() {

@@ -32,6 +32,10 @@ public:
         std::function<void()> begins;
         /// It is durable, and nobody who waits for it has been told yet.
         std::function<void(Database& database)> committed;
+        /// May be empty. Carried out as submitLater() does, each time that this time is over, which
+        /// no change of the date moves.
+        Change regular{};
+        std::chrono::milliseconds every = std::chrono::hours(1);
     };
 
     /// The database outlives the writer, which alone uses it from now on; unless `shared` is given,
@@ -74,6 +78,8 @@ private:
 
     void work();
     bool awaitWork(std::unique_lock<std::mutex>& lock);
+    void addRegular(Clock::time_point now);
+    Clock::time_point nextDue() const;
     void writeAlone(Jobs& jobs, std::vector<Change>& later);
     void write(Jobs& jobs, std::vector<Change>& later);
     std::vector<Change> tryWrite(Jobs& jobs, const std::vector<Change>& later);
@@ -90,6 +96,7 @@ private:
     Jobs jobs_;
     std::vector<Change> later_;
     Clock::time_point laterDue_{};
+    Clock::time_point regularDue_ = Clock::time_point::max();
     bool wiping_ = false;
     Clock::time_point wipeDue_{};
     std::uint64_t transactions_ = 0;

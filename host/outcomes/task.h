@@ -75,6 +75,7 @@ struct Task {
     std::optional<WallClock::time_point> expires;  ///< it must have been handed over by then
     bool forced = false;                           ///< the guard on the inventory was passed by
     std::optional<std::int64_t> run;  ///< the run of the host that handed it to the plug-in
+    std::string boot;                 ///< names the start of the machine in which that run was
     /// An install that may restart the host has begun; its second outcome is its end.
     bool begun = false;
     bool cancel = false;                ///< somebody wants it to be over, while it is in hand

@@ -23,6 +23,10 @@ std::string environmentOf(pid_t pid) {
     return {std::istreambuf_iterator<char>(file), {}};
 }
 
+std::string markOf(const std::string& journal) {
+    return std::string(kVariable) + '=' + journal + '-';
+}
+
 /// "RUN-SESSION" from the mark in an environment; nothing if there is none of this journal.
 std::optional<std::string> runIn(const std::string& environment, const std::string& mark) {
     const std::string text = '\0' + environment;
@@ -38,10 +42,19 @@ pid_t sessionIn(const std::string& run) {
 
 }  // namespace
 
-Leftovers::Leftovers(const std::string& journal, long long run)
-    : mark_(std::string(kVariable) + '=' + journal + '-'),
+Leftovers::Leftovers(const std::string& journal, long long run, const std::string& formerJournal)
+    : mark_(markOf(journal)),
+      former_(formerJournal.empty() ? std::string() : markOf(formerJournal)),
       ownRun_(std::to_string(run) + '-' + std::to_string(::getsid(0))) {
     ::setenv(kVariable, (journal + '-' + ownRun_).c_str(), 1);
+}
+
+/// "RUN-SESSION" of an earlier run that left a process with this environment; nothing if none did.
+std::optional<std::string> Leftovers::runOf(const std::string& environment) const {
+    std::optional<std::string> run = runIn(environment, mark_);
+    if (run && *run == ownRun_) return std::nullopt;
+    if (!run && !former_.empty()) run = runIn(environment, former_);
+    return run;
 }
 
 std::vector<pid_t> Leftovers::alive() const {
@@ -49,8 +62,8 @@ std::vector<pid_t> Leftovers::alive() const {
     std::map<pid_t, pid_t> sessions;  // of those that are left over, the session of their host
     for (const ProcessEntry& process : processes) {
         if (!process.isAlive || process.pid == ::getpid()) continue;
-        const auto run = runIn(environmentOf(process.pid), mark_);
-        if (run && *run != ownRun_) sessions[process.pid] = sessionIn(*run);
+        const auto run = runOf(environmentOf(process.pid));
+        if (run) sessions[process.pid] = sessionIn(*run);
     }
     // Descendants that have another environment: a generation in each round.
     for (bool grows = !sessions.empty(); grows;) {

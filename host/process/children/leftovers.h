@@ -6,6 +6,7 @@
 #include <atomic>
 #include <chrono>
 #include <csignal>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -16,10 +17,10 @@ namespace host {
 /// commands go on, and what they do must not meet what the next run does.
 class Leftovers {
 public:
-    /// Looks for processes with a mark of this journal, but of another run; and sets the mark of
-    /// this run. Call it before any command of this run starts, while no thread looks at the
-    /// environment.
-    Leftovers(const std::string& journal, long long run);
+    /// Looks for processes with a mark of this journal, but of another run, or with one of the
+    /// former journal, if there was one; and sets the mark of this run. Call it before any command
+    /// of this run starts, while no thread looks at the environment.
+    Leftovers(const std::string& journal, long long run, const std::string& formerJournal = {});
 
     /// Whether none of them lives. Once that is so it stays so. Any thread.
     bool gone() const;
@@ -29,8 +30,10 @@ public:
 
 private:
     std::vector<pid_t> alive() const;
+    std::optional<std::string> runOf(const std::string& environment) const;
 
     const std::string mark_;    ///< "NAME=journal-"
+    const std::string former_;  ///< the same of the former journal; empty: there was none
     const std::string ownRun_;  ///< what follows it in the environment of this run
     mutable std::atomic<bool> gone_{false};
 };

@@ -231,6 +231,24 @@ TEST_F(Dispatching, OneThatExpiresWhileTheGuardsLookAtItIsNotHandedOver) {
     EXPECT_THAT(handedOver, ElementsAre("t2"));
 }
 
+TEST_F(Dispatching, WhatIsToBeDoneAloneIsDoneWhenNothingLivesAndNothingHasBegun) {
+    enter("t1");
+    const std::string mark = "nobodys-0-" + std::to_string(::getsid(0));
+    Program left({"/bin/sh", "-c", "echo begun; exec sleep 60"}, "", {{"ZAVHOST_RUN", mark}});
+    ASSERT_TRUE(left.awaitOutput("begun", std::chrono::seconds(20)));
+    Gate alone;
+    Dispatcher dispatcher(journal, *list, [this](const Task& task) { return accept(task); });
+    dispatcher.start(leftovers, std::chrono::seconds(0), [&] {
+        alone.pass();
+        throw std::runtime_error("and what it throws is printed");
+    });
+    ASSERT_TRUE(alone.awaitArrival());
+    EXPECT_EQ(left.wait().status, 128 + SIGKILL);
+    EXPECT_EQ(journal.waiting(), 1);
+    alone.open();
+    EXPECT_TRUE(eventually([this] { return journal.waiting() == 0; }));
+}
+
 /// With an install that had begun when the last run ended.
 class DispatchingAfterInstall : public Dispatching {
 protected:

@@ -78,6 +78,8 @@ TEST_F(Journals, KeepEverythingAboutATask) {
     EXPECT_EQ(kept->transid, "t1");
     EXPECT_EQ(kept->asker, "somebody");
     EXPECT_EQ(kept->state, TaskState::Failed);
+    EXPECT_EQ(kept->run, 1);
+    EXPECT_EQ(kept->boot, host::bootName());
     EXPECT_EQ(kept->value("PRODUCT"), "ux");
     EXPECT_EQ(kept->conditions.size(), 3U);
     EXPECT_EQ(kept->reply, task.reply);
@@ -129,6 +131,34 @@ TEST_F(Journals, ShowNobodyATaskThatMayYetBeNone) {
     EXPECT_THAT(transids(), IsEmpty());
     journal->forget(task.number);
     EXPECT_EQ(journal->find(task.id), std::nullopt);
+}
+
+TEST_F(Journals, KeepNoSecretOfWhatWasNoTask) {
+    open();
+    Task task = asked("t1", TaskWay::Query);
+    task.answered = false;
+    task.conditions = {{"COMMAND", OPER_EQ, "SETCONFIG"}, {"CONTEXT", OPER_EQ, "Tr0ub4dor"}};
+    journal->enter(task);
+    EXPECT_NE(allBytes().find("Tr0ub4dor"), std::string::npos);
+    journal->forget(task.number);
+    EXPECT_TRUE(eventually([this] { return allBytes().find("Tr0ub4dor") == std::string::npos; }));
+}
+
+TEST_F(Journals, KnowWhichProductsATaskMayChange) {
+    open();
+    Task start = asked("t1");
+    journal->enter(start);
+    EXPECT_FALSE(journal->mayChange("ux")) << "it only starts it";
+    Task install = asked("t2");
+    install.conditions = {{"COMMAND", OPER_EQ, "INSTALL"}, {"PRODUCT", OPER_EQ, "ux"}};
+    journal->enter(install);
+    EXPECT_TRUE(journal->mayChange("UX"));
+    EXPECT_FALSE(journal->mayChange("px"));
+    install.run = journal->run();
+    journal->save(install);
+    EXPECT_TRUE(journal->mayChange("ux")) << "it is on its way to the plug-in";
+    journal->save(ended(install));
+    EXPECT_FALSE(journal->mayChange("ux"));
 }
 
 TEST_F(Journals, LetTasksGoForwardOnly) {
@@ -269,6 +299,29 @@ TEST_F(Journals, ForgetWhatIsOlderThanTheyKeep) {
     journal->enter(waits);
     open();
     EXPECT_THAT(transids(), ElementsAre("waits", "new"));
+}
+
+TEST_F(Journals, ForgetWhatIsTooOldWhileTheyAreOpen) {
+    Journal::Settings often = settings();
+    often.pruneEvery = std::chrono::milliseconds(10);
+    open(often);
+    Task old = ended(entered("old"));
+    old.ended = host::WallClock::now() - std::chrono::hours(24 * 31);
+    journal->save(old);
+    EXPECT_TRUE(eventually([this] { return !journal->find("old").has_value(); }));
+}
+
+TEST_F(Journals, KeepHardlyMoreRowsThanTheyAreTold) {
+    Journal::Settings few = settings();
+    few.keepRows = 2;
+    open(few);
+    for (int i = 0; i < 5; ++i) {
+        Task task = entered("t" + std::to_string(i));
+        task.outcomes = {"row"};
+        journal->saveOutcome({ended(task)}, "row");
+    }
+    EXPECT_TRUE(eventually([this] { return journal->find("t2")->outcomes.empty(); }));
+    EXPECT_THAT(journal->find("t4")->outcomes, ElementsAre("row"));
 }
 
 TEST_F(Journals, KeepOnlySoManyRowsButTheirTasks) {

@@ -5,6 +5,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <fstream>
+
 #include "host/journal/commit_step.h"
 #include "host/journal/journal_fixture.h"
 #include "host/process/start_error.h"
@@ -96,6 +98,22 @@ TEST_F(Recovery, WhatEndsTheHostThreeTimesIsNotRunAgain) {
     }
     EXPECT_EQ(stateOf("t1"), TaskState::Interrupted);
     EXPECT_FALSE(journal->recovered().runsAgain);
+}
+
+TEST_F(Recovery, WhatOrderlyEndsCutOffDoesNotCountAsWhatEndsTheHost) {
+    host::Journal::Settings rerun = settings();
+    rerun.rerunInterrupted = true;
+    open(rerun);
+    Task task = entered("t1");
+    for (int i = 0; i < host::kMostInterruptions + 1; ++i) {
+        ASSERT_EQ(stateOf("t1"), TaskState::Queued) << i;
+        task.run = journal->run();
+        journal->save(task);
+        journal->endCleanly(false);
+        open(rerun);
+        EXPECT_TRUE(journal->recovered().runsAgain);
+    }
+    EXPECT_EQ(journal->find("t1")->interruptions, 0);
 }
 
 TEST_F(Recovery, AfterAQuietEndNothingIsInterrupted) {
@@ -220,6 +238,71 @@ TEST_F(Recovery, UnfinishedTasksOfADamagedJournalAreInterrupted) {
     EXPECT_EQ(stateOf("t2"), TaskState::Interrupted);
     EXPECT_EQ(journal->find("t1")->value("PRODUCT"), "ux");
     EXPECT_EQ(journal->nextInLine(), std::nullopt);
+}
+
+TEST_F(Recovery, WhatRepetitionsNeedSurvivesDamage) {
+    open();
+    const std::string identity = journal->identity();
+    Task task = asked("key");
+    task.once = journal->hashOf("content");
+    journal->enter(task);
+    journal.reset();
+    damageIndex(scratch.path("state/journal.db"));
+    open();
+    EXPECT_EQ(journal->recovered().formerIdentity, identity);
+    ASSERT_TRUE(journal->findOnce("key").has_value());
+    EXPECT_EQ(journal->findOnce("key")->once, journal->hashOf("content"));
+    open();
+    EXPECT_EQ(journal->recovered().formerIdentity, identity) << "what it left may still run";
+}
+
+TEST_F(Recovery, TheIdentityOfAJournalThatCannotBeReadIsKnown) {
+    open();
+    const std::string identity = journal->identity();
+    journal.reset();
+    scratch.write("state/journal.db", std::string(20'000, 'x'));
+    open();
+    EXPECT_EQ(journal->recovered().formerIdentity, identity);
+}
+
+TEST_F(Recovery, TheIdentityOfAJournalThatIsNotThereAnyMoreIsKnown) {
+    open();
+    const std::string identity = journal->identity();
+    EXPECT_EQ(journal->recovered().formerIdentity, "");
+    journal.reset();
+    ASSERT_EQ(::unlink(scratch.path("state/journal.db").c_str()), 0);
+    open();
+    EXPECT_EQ(journal->recovered().formerIdentity, identity);
+}
+
+/// Overwrites the first page of a table.
+void damageTable(const std::string& file, const char* name) {
+    std::int64_t page = 0;
+    std::int64_t size = 0;
+    {
+        host::Database database(file);
+        page = database.number("SELECT rootpage FROM sqlite_master WHERE name = CAST(? AS TEXT)",
+                               name);
+        size = database.number("PRAGMA page_size");
+    }
+    std::fstream bytes(file, std::ios::in | std::ios::out | std::ios::binary);
+    bytes.seekp((page - 1) * size);
+    bytes << std::string(static_cast<std::size_t>(size), 'x');
+    ASSERT_TRUE(bytes.good());
+}
+
+TEST_F(Recovery, DamageThatIsFoundAfterACleanEndDoesNotKeepTheHostFromStarting) {
+    open();
+    entered("t1");
+    journal->endCleanly(true);
+    journal.reset();
+    damageTable(scratch.path("state/journal.db"), "runs");
+    open();
+    EXPECT_TRUE(journal->recovered().clean);
+    EXPECT_NE(journal->recovered().setAside, "");
+    EXPECT_EQ(stateOf("t1"), TaskState::Interrupted);
+    entered("t2");
+    EXPECT_EQ(journal->nextInLine()->transid, "t2");
 }
 
 TEST_F(Recovery, AJournalOfANewerHostIsNotTouched) {

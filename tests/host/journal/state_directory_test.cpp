@@ -69,6 +69,8 @@ TEST_F(StateDirectories, GiveADamagedJournalANameOfItsOwn) {
     const StateDirectory state(scratch.path("state"));
     scratch.write("state/journal.db", "one");
     scratch.write("state/journal.db-wal", "log of one");
+    for (const char* end : {"", "-wal"})
+        ASSERT_EQ(::chmod(scratch.path(std::string("state/journal.db") + end).c_str(), 0644), 0);
     scratch.write("state/journal.db-shm", "index");
     const std::string first = state.setAside();
     scratch.write("state/journal.db", "two");
@@ -77,8 +79,19 @@ TEST_F(StateDirectories, GiveADamagedJournalANameOfItsOwn) {
     EXPECT_EQ(scratch.read("state/journal.db.damaged-1"), "one");
     EXPECT_EQ(scratch.read("state/journal.db.damaged-1-wal"), "log of one");
     EXPECT_EQ(scratch.read("state/journal.db.damaged-2"), "two");
+    EXPECT_EQ(modeOf(first), 0600U) << "it may hold secrets";
+    EXPECT_EQ(modeOf(first + "-wal"), 0600U);
     EXPECT_FALSE(scratch.exists("state/journal.db"));
     EXPECT_FALSE(scratch.exists("state/journal.db-shm"));
+}
+
+TEST_F(StateDirectories, RememberWhoseJournalTheyHold) {
+    const StateDirectory state(scratch.path("state"));
+    EXPECT_EQ(state.notedIdentity(), "");
+    state.noteIdentity("a longer identity");
+    state.noteIdentity("short");
+    EXPECT_EQ(state.notedIdentity(), "short");
+    EXPECT_EQ(modeOf(scratch.path("state/identity")), 0600U);
 }
 
 TEST_F(StateDirectories, KeepSomeSpaceInReserve) {

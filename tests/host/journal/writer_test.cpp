@@ -59,6 +59,20 @@ TEST_F(JournalWriter, TellsOfACommitBeforeWhoeverWaitsForIt) {
     EXPECT_EQ(told, "begins 1 rows begins 1 rows ") << "the others of a transaction count";
 }
 
+TEST_F(JournalWriter, DoesWhatIsRegularAgainAndAgainThoughNobodyComes) {
+    Gate second;
+    int times = 0;
+    Writer writer(database, nullptr,
+                  {{},
+                   {},
+                   [&](Database&) {
+                       if (++times == 2) second.pass();
+                   },
+                   std::chrono::milliseconds(1)});
+    ASSERT_TRUE(second.awaitArrival());
+    second.open();
+}
+
 TEST_F(JournalWriter, AWatchThatFailsTakesNothingBack) {
     Writer writer(database, nullptr, {{}, [](Database& written) { written.run("nonsense"); }});
     EXPECT_NO_THROW(writer.submit(inserting(1)).get());

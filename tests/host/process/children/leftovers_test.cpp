@@ -35,6 +35,16 @@ TEST(Leftovers, AreNotThoseOfThisRunOrOfAnotherJournal) {
     EXPECT_TRUE(Leftovers("j1", 2).gone());
 }
 
+TEST(Leftovers, AreThoseOfTheJournalThatWasSetAsideToo) {
+    Program left = command(markOf(2), "echo begun; exec sleep 60");
+    ASSERT_TRUE(left.awaitOutput("begun", std::chrono::seconds(20)));
+    const Leftovers leftovers("j2", 2, "j1");
+    EXPECT_FALSE(leftovers.gone());
+    leftovers.end();
+    EXPECT_EQ(left.wait().status, 128 + SIGKILL);
+    EXPECT_TRUE(leftovers.gone());
+}
+
 TEST(Leftovers, InASessionOfTheirOwnAreLeftAlone) {
     Program agent = command(markOf(1), "exec setsid sh -c 'echo begun; exec sleep 60'");
     ASSERT_TRUE(agent.awaitOutput("begun", std::chrono::seconds(20)));
