@@ -1,6 +1,7 @@
+// ctest-label: threaded
 // Requests about configurations and instances from end to end: in through the request table,
 // through the executor and the real handlers, out through the request table's answer or the deploy
-// status table. ctest-label: threaded
+// status table.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
