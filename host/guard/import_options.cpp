@@ -35,7 +35,7 @@ bool endsWith(const std::string& text, const std::string& end) {
 
 std::vector<std::string> portsIn(const std::string& context) {
     std::string text = inUpperCase(context);
-    text.erase(text.find_last_not_of(" \t\r\n") + 1);
+    text.erase(text.find_last_not_of(" \t\n\v\f\r") + 1);
     std::vector<std::string> ports;
     for (const std::string& option : split(text, ',', false)) {
         if (option.find("PORT=") == std::string::npos) continue;

@@ -142,6 +142,7 @@ TEST_F(ImportGuard, LooksAtNoOtherProduct) {
 TEST(ImportOptions, AreReadAsThePluginReadsThem) {
     using Ports = std::vector<std::string>;
     EXPECT_EQ(host::portsIn(" port=7700,restart=y \n"), (Ports{"7700"}));
+    EXPECT_EQ(host::portsIn("port=7700\f\v"), (Ports{"7700"}));
     EXPECT_EQ(host::portsIn("PORT=,RESTART=Y,"), Ports{});
     EXPECT_EQ(host::portsIn("PORT=1,XPORT=2=3"), (Ports{"1", "2=3"}));
     EXPECT_EQ(host::portsIn(""), Ports{});
