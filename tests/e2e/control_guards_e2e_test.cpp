@@ -187,6 +187,23 @@ TEST_F(ControlGuards, AFailureComesWithTheCommandsLastWords) {
     EXPECT_THAT(result.out, HasSubstr("    12\n  standard error:\n    no licence\n"));
 }
 
+TEST_F(ControlGuards, AnUnguardedHostsFailureHasTheSameRowsAndTheSameWords) {
+    home.agentScript("echo no licence >&2; exit 3");
+    json outcomes[2];
+    for (const Guards guards : {Guards::On, Guards::Off}) {
+        start(guards);
+        EXPECT_THAT(zavctl({"start", "ux"}).out, HasSubstr("    no licence\n"));
+        const ProgramResult result = zavctl({"--json", "start", "ux", "--transid", "T"});
+        EXPECT_EQ(result.status, 1);
+        json& outcome = outcomes[guards == Guards::On ? 0 : 1];
+        outcome = json::parse(result.out)["events"];
+        ASSERT_EQ(outcome.size(), 1U) << result.out;
+        EXPECT_EQ(outcome[0]["RETVAL"], 1024);
+        host.reset();
+    }
+    EXPECT_EQ(outcomes[0], outcomes[1]);
+}
+
 TEST_F(ControlGuards, PasswordsInCommandsAndTheirOutputAreNotShownToPeople) {
     start(Guards::On);
     const ProgramResult result =

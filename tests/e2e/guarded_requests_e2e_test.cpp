@@ -110,6 +110,9 @@ TEST(GuardedRequests, ActAsTheyRead) {
         EXPECT_EQ(send(unguarded, where).status, 200) << where;
         EXPECT_TRUE(home.awaitCalls(++calls)) << "it acts: " << where;
     }
+    const Reply unknown = send(unguarded, conditions({{"PRODCUT", "ux"}}));
+    EXPECT_EQ(unknown.status, 400);
+    EXPECT_FALSE(unknown.body.contains("hint")) << unknown.body;
 }
 
 // ---- Text outside ASCII -------------------------------------------------------------------------
