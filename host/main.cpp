@@ -16,6 +16,7 @@
 #include "embedded/oxa_host.h"
 #include "embedded/ras1_control.h"
 #include "host/api/api.h"
+#include "host/api/interruption.h"
 #include "host/api/routes.h"
 #include "host/api/services.h"
 #include "host/checks/check_list.h"
@@ -210,7 +211,8 @@ void run(const HostOptions& options) {
     server.endWhenReadable(endDescriptor, options.grace);
     server.whenReadable(reopenDescriptor, [=] { reopenLogs(reopenDescriptor); });
     if (options.guarded) attendToOrphans(server, childDescriptor);
-    services.dispatcher.start(services.leftovers, options.orphanWait);
+    services.dispatcher.start(services.leftovers, options.orphanWait,
+                              [&services] { describeInterrupted(services); });
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     server.run();

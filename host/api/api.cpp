@@ -1,6 +1,8 @@
 #include "host/api/api.h"
 
 #include <memory>
+#include <nlohmann/json.hpp>
+#include <string>
 #include <utility>
 
 #include "host/api/call.h"
@@ -29,9 +31,22 @@ unsigned statusOf(DepotError::Kind kind) {
     return 500;
 }
 
+/// The journal that the client means; empty if it does not say.
+std::string journalMeant(const Call& call) {
+    if (const std::string* const parameter = call.text("journal")) return *parameter;
+    if (call.route().body.empty()) return {};
+    const auto member = call.body().find("journal");
+    return member == call.body().end() ? std::string() : member->get<std::string>();
+}
+
 Answer answerTo(Services& services, Call& call) {
     try {
         call.readBody();
+        const std::string& own = services.journal.identity();
+        const std::string meant = journalMeant(call);
+        if (!meant.empty() && meant != own) {
+            return errorReply(412, "this host's journal is " + own + ", not " + meant);
+        }
         return call.route().endpoint(services, call);
     } catch (const BadRequest& bad) {
         return errorReply(400, bad.what());

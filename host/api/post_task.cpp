@@ -171,11 +171,6 @@ Endpoint postTask;
 Answer postTask(Services& services, const Call& call) {
     const oxa::Table* const table = services.tables.find(std::string(plugin::kRequestTable));
     if (table == nullptr) return errorReply(404, "the plug-in takes no requests");
-    const std::string journal = textIn(call.body(), "journal");
-    if (!journal.empty() && journal != services.journal.identity()) {
-        return errorReply(
-            412, "this host's journal is " + services.journal.identity() + ", not " + journal);
-    }
     Task task = taskOf(call, *table, services);
     if (call.body().contains("refused")) return enterRefused(call, std::move(task), services);
     checkCommand(task);

@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <system_error>
 
+#include "host/api/interruption.h"
 #include "host/commands/ear.h"
 #include "host/depot/install_result.h"
 #include "host/outcomes/shown_request.h"
@@ -84,10 +85,11 @@ Task endOfRestartInstall(Services& services, Task task) {
             break;
     }
     const bool bootedAnew = services.journal.recovered().bootedAnew;
-    return ended(std::move(task), TaskState::Interrupted,
-                 std::string(bootedAnew ? "the machine was started anew" : "the host ended") +
-                     " while this install was in hand; nothing of it runs any more, and it left no "
-                     "result");
+    const std::string reason =
+        std::string(bootedAnew ? "the machine was started anew" : "the host ended") +
+        " while this install was in hand; nothing of it runs any more, and it left no result" +
+        inventoryNow(services, task);
+    return ended(std::move(task), TaskState::Interrupted, reason);
 }
 
 }  // namespace host

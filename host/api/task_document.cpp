@@ -38,6 +38,11 @@ Json replyObject(const Task& task, const Services& services) {
     return reply;
 }
 
+/// What ends in this run is told from memory, which names the run alone.
+std::string bootOf(const Task& task, const Services& services) {
+    return task.boot.empty() && task.run == services.journal.run() ? bootName() : task.boot;
+}
+
 }  // namespace
 
 Json commandObject(const Command& command, const CodePage& codePage) {
@@ -78,6 +83,11 @@ Json taskSummary(const Task& task, const CodePage& codePage) {
 
 std::string taskDocument(const Task& task, const Services& services) {
     Json document = taskSummary(task, services.codePage);
+    if (task.run) document["run"] = *task.run;
+    const std::string boot = bootOf(task, services);
+    if (!boot.empty()) document["boot"] = boot;
+    if (task.forced) document["force"] = true;
+    if (task.interruptions > 0) document["interruptions"] = task.interruptions;
     document["reply"] = replyObject(task, services);
     Json events = Json::array();
     for (const std::string& row : task.outcomes)

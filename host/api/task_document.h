@@ -16,7 +16,8 @@ nlohmann::ordered_json commandObject(const Command& command, const CodePage& cod
 /// Identifier, TRANSID, what was asked for, state, times and asker.
 nlohmann::ordered_json taskSummary(const Task& task, const CodePage& codePage);
 
-/// The summary with "reply", "events" and "details", as text.
+/// The summary with the run of the host and the start of the machine in which it was handed over,
+/// "force", "interruptions", "reply", "events" and "details", as text.
 std::string taskDocument(const Task& task, const Services& services);
 
 }  // namespace host

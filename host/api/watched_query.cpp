@@ -26,10 +26,23 @@ bool readsConfiguration(const Query& query) {
            });
 }
 
-/// Whether it is a request for a command that the plug-in would queue.
-bool isQueued(const Query& query) {
-    return query.table->name == plugin::kRequestTable &&
-           !plugin::runsAtOnce(valueIn(query.where, plugin::kCommandColumn));
+bool hasValue(const Query& query, std::string_view column) {
+    return std::any_of(query.where.begin(), query.where.end(), [column](const auto& condition) {
+        return condition.column == column && !condition.value.empty();
+    });
+}
+
+/// Whether it is a request that the plug-in may queue: it refuses what lacks a value.
+bool mayBeQueued(const Query& query) {
+    if (query.table->name != plugin::kRequestTable) return false;
+    const std::string_view command = valueIn(query.where, plugin::kCommandColumn);
+    for (const plugin::QueuedCommand& known : plugin::kQueuedCommands) {
+        if (command != known.name) continue;
+        return std::all_of(known.required.begin(), known.required.end(), [&](const auto& column) {
+            return column.empty() || hasValue(query, column);
+        });
+    }
+    return false;
 }
 
 std::string askerOf(const Query& query, const Peer& peer) {
@@ -102,7 +115,7 @@ std::string userName(uid_t user) {
 }
 
 WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer) {
-    if (isQueued(query) && services.guarded) insistOnTurn(services, query);
+    if (mayBeQueued(query) && services.guarded) insistOnTurn(services, query);
     const bool wantsOutput = services.guarded && readsConfiguration(query);
     TaskWatch::Request watched(services.watch, *query.table);
     const Query handedOn = admitted(services, query, force);

@@ -116,6 +116,21 @@ constexpr bool changesWhatIsInstalled(std::string_view command) {
 inline constexpr std::array<std::string_view, 2> kCommandsAtOnce = {kGetConfiguration,
                                                                     kCompleteInstall};
 
+/// These are queued, unless one of these columns has no value; then they are refused.
+struct QueuedCommand {
+    std::string_view name;
+    std::array<std::string_view, 3> required;  ///< the rest is empty
+};
+
+inline constexpr std::array<QueuedCommand, 7> kQueuedCommands = {
+    {{kStart, {kProductColumn}},
+     {kStop, {kProductColumn}},
+     {kRestart, {kProductColumn}},
+     {kInstall, {kProductColumn, kVersionColumn, kContextColumn}},
+     {kUninstall, {kProductColumn}},
+     {kSetConfiguration, {kProductColumn}},
+     {kRemoveInstance, {kProductColumn, kTargetColumn}}}};
+
 constexpr bool runsAtOnce(std::string_view command) {
     for (const std::string_view atOnce : kCommandsAtOnce) {
         if (command == atOnce) return true;

@@ -94,12 +94,36 @@ TEST_F(JournalOnDisk, AKilledHostRunsWhatWaitedInItsOldOrderExactlyOnce) {
     killAndStart();
     EXPECT_EQ(get("/v1/health")["journal"], identity);
     EXPECT_EQ(stateOf(first), "interrupted");
+    EXPECT_EQ(get("/v1/tasks/" + first)["interruptions"], 1);
     EXPECT_EQ(stateOf(second), "queued") << "the command of the dead host still runs";
     openGate();
     EXPECT_EQ(stateOf(second, "?wait=60"), "done");
     EXPECT_EQ(stateOf(third, "?wait=60"), "done");
     EXPECT_THAT(allNotes(),
                 ElementsAre("begin ux", "end ux", "begin px", "end px", "begin lx", "end lx"));
+}
+
+TEST_F(JournalOnDisk, AnInterruptedTaskSaysWhatTheInventoryShowsNow) {
+    start();
+    const std::string id = accept("ux");
+    ASSERT_TRUE(awaitNote("begin ux"));
+    killAndStart();
+    const auto says = [&](const std::string& words) {
+        return get("/v1/tasks/" + id)["reason"].get<std::string>().find(words) != std::string::npos;
+    };
+    EXPECT_TRUE(says("it may have run in part"));
+    EXPECT_FALSE(says("inventory")) << "its command still runs";
+    home.products({"px"}, "exit 0");
+    openGate();
+    EXPECT_TRUE(eventually([&] { return says("the inventory does not show ux now"); }))
+        << get("/v1/tasks/" + id);
+    const std::string second = accept("px");
+    const json task = get("/v1/tasks/" + second + "?wait=60");
+    EXPECT_EQ(task["state"], "done");
+    EXPECT_EQ(task["run"], 2);
+    EXPECT_EQ(task["boot"].get<std::string>().size(), 36U) << task;
+    EXPECT_FALSE(task.contains("interruptions"));
+    EXPECT_EQ(get("/v1/tasks/" + second)["boot"], task["boot"]) << "it is kept";
 }
 
 TEST_F(JournalOnDisk, RequestsOnTheTableAreNotForgottenEither) {
@@ -120,6 +144,12 @@ TEST_F(JournalOnDisk, WhileACommandOfADeadHostRunsNothingElseIsQueued) {
     killAndStart();
     const json query = startOnTheTable("px");
     EXPECT_EQ(post("/v1/query", query, 503)["guard"], "leftovers");
+    // What the plug-in does not queue has its answer at once.
+    json refused = query;
+    for (json& condition : refused["where"]) {
+        if (condition["column"] == "COMMAND") condition["value"] = "NOSUCH";
+    }
+    EXPECT_NE(post("/v1/query", refused, 200)["rows"][0]["RETVAL"], 0);
     openGate();
     ASSERT_TRUE(awaitNote("end ux"));
     EXPECT_TRUE(eventually([&] {

@@ -73,6 +73,19 @@ TEST_F(Interface, HealthSaysWhatThisHostIs) {
         << body;
 }
 
+TEST_F(Interface, RefusesRequestsThatMeanAnotherJournal) {
+    const std::string own = services->journal.identity();
+    const std::string fault = "this host's journal is " + own + ", not other";
+    expectError(412, fault, ask("POST", "/v1/query", R"({"table": "PLAIN", "journal": "other"})"));
+    expectError(412, fault, ask("GET", "/v1/tasks?journal=other"));
+    expectError(412, fault, ask("GET", "/v1/tasks/t1?journal=other"));
+    expectError(412, fault, ask("GET", "/v1/tasks/t1/output?journal=other"));
+    expectError(412, fault, ask("POST", "/v1/tasks/t1/cancel?journal=other"));
+    EXPECT_EQ(ask("GET", "/v1/tasks?journal=" + own).status, 200U);
+    EXPECT_EQ(ask("POST", "/v1/query", R"({"table": "PLAIN", "journal": ")" + own + "\"}").status,
+              200U);
+}
+
 TEST_F(Interface, IsClosedToPeersWithoutAccess) {
     for (const host::Route& route : api->router().routes()) {
         EXPECT_EQ(ask(route.method, route.path, "{}", Access::None).status, 403U) << route.path;

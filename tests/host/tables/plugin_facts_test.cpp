@@ -4,6 +4,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdlib>
 #include <map>
 #include <mutex>
@@ -36,8 +37,10 @@ public:
         return nullptr;
     }
 
-    /// Asks for the command with all that any queued command requires. Returns the answer.
-    oxa::Rows request(const std::string& command, const std::string& transid) const {
+    /// Asks for the command with all that any queued command requires but this column. Returns the
+    /// answer.
+    oxa::Rows request(const std::string& command, const std::string& transid,
+                      std::string_view without = "") const {
         oxa::Rows rows;
         std::vector<oxa::Predicate> where = {{"COMMAND", OPER_EQ, command},
                                              {"PRODUCT", OPER_EQ, "ux"},
@@ -46,6 +49,9 @@ public:
                                              {"TARGETMSN", OPER_EQ, "inst:host:UX"}};
         // The other kind answers with a context of its own, which this would filter out.
         if (!plugin::runsAtOnce(command)) where.push_back({"CONTEXT", OPER_EQ, "exit 0"});
+        where.erase(std::remove_if(where.begin(), where.end(),
+                                   [without](const auto& each) { return each.column == without; }),
+                    where.end());
         EXPECT_EQ(oxa::query(std::string(plugin::kRequestTable), where, rows), OXA_OK);
         return rows;
     }
@@ -137,12 +143,29 @@ TEST(PluginFacts, TellQueuedCommandsFromThoseThatRunAtOnce) {
             continue;
         }
         EXPECT_EQ(retval, plugin::kAccepted) << command;
+        EXPECT_EQ(std::count_if(plugin::kQueuedCommands.begin(), plugin::kQueuedCommands.end(),
+                                [command](const auto& known) { return known.name == command; }),
+                  1)
+            << command;
         EXPECT_TRUE(eventually([&] { return started.outcomes(transid) == 1; })) << command;
     }
     EXPECT_EQ(plugin::kCommandsAtOnce.size(), static_cast<std::size_t>(atOnce));
     // Outcomes come in the order of the requests, so those of the first two would be there.
     for (const std::string_view command : plugin::kCommandsAtOnce)
         EXPECT_EQ(started.outcomes("is-" + std::string(command)), 0) << command;
+}
+
+TEST(PluginFacts, TellWhatAQueuedCommandIsRefusedWithout) {
+    Started& started = Started::once();
+    for (const plugin::QueuedCommand& command : plugin::kQueuedCommands) {
+        for (const std::string_view column : command.required) {
+            if (column.empty()) continue;
+            const std::string transid = "lacks-" + std::string(column);
+            EXPECT_NE(retvalOf(started.request(std::string(command.name), transid, column)),
+                      plugin::kAccepted)
+                << command.name << " without " << column;
+        }
+    }
 }
 
 TEST(PluginFacts, TellAcceptedRequestsFromRefusedOnes) {
