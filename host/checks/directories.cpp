@@ -92,7 +92,8 @@ std::string depotOf(CheckSubject& subject) {
 Finding checkDepot(CheckSubject& subject) {
     Finding finding = usable(depotOf(subject), "every command and every push would be refused");
     if (finding.verdict != Verdict::Ok) {
-        finding.remedy += std::string(", or name another one in ") + kDepotVariable;
+        finding.remedy += ", or name another one in ";
+        finding.remedy += kDepotVariable;
     }
     return finding;
 }

@@ -1,8 +1,8 @@
 #!/bin/sh
-# Checks that a library is hardened: hardening.sh LIBRARY OBJECTS, which is a file that lists the
-# objects it is made of.
+# Checks that a library or a program is hardened: hardening.sh FILE OBJECTS, which is a file that lists
+# the objects it is made of.
 #
-# The library tells what the linker did. What the compiler did is looked for in our own objects,
+# The file tells what the linker did. What the compiler did is looked for in our own objects,
 # because a linked file holds parts of the distribution's static libraries as well.
 set -eu
 scratch=$(mktemp -d)
