@@ -125,8 +125,11 @@ TEST_F(KilledDescendants, GetEachSignalButTheLastOnlyOnce) {
         ASSERT_TRUE(isThere("child"));
         ASSERT_TRUE(isThere("ready"));
         host::Descendants descendants({});
-        descendants.look(command, true);
-        EXPECT_EQ(descendants.living(), 2U);
+        // What the child has run to say that it is there may still be at its end.
+        EXPECT_TRUE(eventually([&] {
+            descendants.look(command, true);
+            return descendants.living() == 2;
+        }));
         EXPECT_EQ(descendants.send(SIGTERM), 2U);
         EXPECT_EQ(descendants.send(SIGTERM), 0U) << "they have got it";
         EXPECT_EQ(::waitpid(command, nullptr, 0), command);
