@@ -35,7 +35,7 @@ bool hasValue(const Query& query, std::string_view column) {
 /// Whether it is a request that the plug-in may queue: it refuses what lacks a value.
 bool mayBeQueued(const Query& query) {
     if (query.table->name != plugin::kRequestTable) return false;
-    const std::string_view command = valueIn(query.where, plugin::kCommandColumn);
+    const std::string command = valueIn(query.where, plugin::kCommandColumn);
     for (const plugin::QueuedCommand& known : plugin::kQueuedCommands) {
         if (command != known.name) continue;
         return std::all_of(known.required.begin(), known.required.end(), [&](const auto& column) {
