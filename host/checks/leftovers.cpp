@@ -16,7 +16,6 @@
 
 #include "host/checks/check.h"
 #include "host/checks/wording.h"
-#include "host/depot/depot_directory.h"
 #include "host/process/file_descriptor.h"
 
 namespace host {
@@ -131,11 +130,7 @@ Names unfinishedProductsIn(CheckSubject& subject) {
 
 /// The script of an installation that may restart the host removes rc.txt first and writes it last.
 Names scriptsIn(CheckSubject& subject) {
-    const std::string named = subject.variable(kDepotVariable);
-    const std::string depot =
-        depotDirectoryOf(subject.options.home, named.empty() ? nullptr : named.c_str(),
-                         subject.options.guarded)
-            .path;
+    const std::string depot = depotOf(subject);
     const std::string script = depot + "/runcmd.sh";
     if (!isThere(script) || isThere(depot + "/rc.txt")) return {};
     return {script};
