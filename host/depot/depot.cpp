@@ -1,6 +1,5 @@
 #include "host/depot/depot.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/statvfs.h>
@@ -8,7 +7,6 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
-#include <memory>
 #include <system_error>
 #include <utility>
 
@@ -16,6 +14,7 @@
 #include "host/depot/depot_error.h"
 #include "host/depot/real_path.h"
 #include "host/depot/remove_tree.h"
+#include "host/process/directory_stream.h"
 
 namespace host {
 namespace {
@@ -70,14 +69,9 @@ DepotEntry entryOf(std::string name, const struct stat& found) {
     return entry;
 }
 
-struct CloseDirectory {
-    void operator()(DIR* directory) const { ::closedir(directory); }
-};
-using Directory = std::unique_ptr<DIR, CloseDirectory>;
-
 /// The first `most` names in a directory; false if there are more.
 bool readNames(FileDescriptor opened, std::size_t most, std::vector<std::string>& names) {
-    const Directory directory(::fdopendir(opened.get()));
+    const DirectoryStream directory(::fdopendir(opened.get()));
     if (!directory) throw std::system_error(errno, std::generic_category(), "fdopendir");
     opened.release();
     while (const dirent* const entry = ::readdir(directory.get())) {

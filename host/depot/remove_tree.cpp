@@ -1,14 +1,13 @@
 #include "host/depot/remove_tree.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <memory>
 #include <utility>
 #include <vector>
 
+#include "host/process/directory_stream.h"
 #include "host/process/file_descriptor.h"
 
 namespace host {
@@ -17,15 +16,10 @@ namespace {
 /// Each takes a descriptor while the work goes on.
 constexpr std::size_t kDeepest = 200;
 
-struct CloseDirectory {
-    void operator()(DIR* directory) const { ::closedir(directory); }
-};
-using Directory = std::unique_ptr<DIR, CloseDirectory>;
-
-Directory openDirectory(int parent, const char* name) {
+DirectoryStream openDirectory(int parent, const char* name) {
     FileDescriptor opened(
         ::openat(parent, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK));
-    Directory directory(opened ? ::fdopendir(opened.get()) : nullptr);
+    DirectoryStream directory(opened ? ::fdopendir(opened.get()) : nullptr);
     if (directory) opened.release();
     return directory;
 }
@@ -46,7 +40,7 @@ public:
 private:
     struct Level {
         std::string name;
-        Directory directory;
+        DirectoryStream directory;
     };
 
     int above() const {
@@ -58,7 +52,7 @@ private:
             errno = ENAMETOOLONG;
             return false;
         }
-        Directory directory = openDirectory(
+        DirectoryStream directory = openDirectory(
             open_.empty() ? parent_ : ::dirfd(open_.back().directory.get()), name.c_str());
         if (!directory) return false;
         open_.push_back({name, std::move(directory)});

@@ -1,6 +1,5 @@
 #include "host/process/children/orphans.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <sys/prctl.h>
 #include <sys/wait.h>
@@ -9,10 +8,10 @@
 #include <array>
 #include <cerrno>
 #include <charconv>
-#include <memory>
 #include <string>
 #include <system_error>
 
+#include "host/process/directory_stream.h"
 #include "host/process/file_descriptor.h"
 #include "host/process/start_error.h"
 
@@ -33,14 +32,10 @@ std::vector<pid_t> numbersIn(const std::string& text) {
     return numbers;
 }
 
-struct CloseDirectory {
-    void operator()(DIR* directory) const { ::closedir(directory); }
-};
-
 /// Of this process.
 std::vector<pid_t> threads() {
     std::vector<pid_t> threads;
-    const std::unique_ptr<DIR, CloseDirectory> directory(::opendir("/proc/self/task"));
+    const DirectoryStream directory(::opendir("/proc/self/task"));
     while (const dirent* const entry = directory ? ::readdir(directory.get()) : nullptr) {
         const std::vector<pid_t> number = numbersIn(entry->d_name);
         threads.insert(threads.end(), number.begin(), number.end());

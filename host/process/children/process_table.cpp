@@ -1,15 +1,14 @@
 #include "host/process/children/process_table.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <array>
 #include <charconv>
-#include <memory>
 #include <string>
 
+#include "host/process/directory_stream.h"
 #include "host/process/file_descriptor.h"
 
 namespace host {
@@ -30,10 +29,6 @@ Number numberIn(std::string_view text) {
     return number;
 }
 
-struct CloseDirectory {
-    void operator()(DIR* directory) const { ::closedir(directory); }
-};
-
 std::optional<ProcessEntry> readEntry(const std::string& pid) {
     const std::string path = "/proc/" + pid + "/stat";
     const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
@@ -48,7 +43,7 @@ std::optional<ProcessEntry> readEntry(const std::string& pid) {
 
 std::vector<ProcessEntry> readProcesses() {
     std::vector<ProcessEntry> processes;
-    const std::unique_ptr<DIR, CloseDirectory> directory(::opendir("/proc"));
+    const DirectoryStream directory(::opendir("/proc"));
     if (directory == nullptr) return processes;
     while (const dirent* const entry = ::readdir(directory.get())) {
         if (entry->d_name[0] < '1' || entry->d_name[0] > '9') continue;
