@@ -102,8 +102,9 @@ collect_file() {
     hold_end
     (
         trap '' TERM INT # those who stop the agent tell its whole process group
-        head -c "$taken" "$chunk" | store_rows
-    ) && echo "$((offset + taken))" | replace_file "$offset_file"
+        head -c "$taken" "$chunk" | store_rows &&
+            echo "$((offset + taken))" | replace_file "$offset_file"
+    )
     release_end
     rm -f -- "$chunk"
 }
