@@ -26,6 +26,14 @@ if(CMAKE_CXX_FLAGS MATCHES "-fsanitize" AND CMAKE_CXX_COMPILER_ID STREQUAL "GNU"
   target_compile_options(zav_options INTERFACE -Wno-maybe-uninitialized)
 endif()
 
+# zav_unity_build(<target>): compiles several sources of a target at once. Most of what the programs'
+# sources cost is templates of the same few libraries, which is paid once for all of them. Sources
+# share what has no linkage then, so names there must differ; the target "verify" compiles each alone.
+function(zav_unity_build target)
+  set_target_properties(${target} PROPERTIES
+    UNITY_BUILD ${ZAV_UNITY_BUILD} UNITY_BUILD_BATCH_SIZE 8)
+endfunction()
+
 # For what is shipped. Sanitizers look for the same faults themselves, and counting of
 # lines wants code as it is written.
 add_library(zav_hardening INTERFACE)

@@ -1,19 +1,15 @@
 #include "ctl/client/no_host.h"
 
 #include <grp.h>
-#include <pwd.h>
 #include <sys/stat.h>
 
 #include <cerrno>
 #include <cstring>
 
+#include "ctl/client/user_name.h"
+
 namespace ctl {
 namespace {
-
-std::string userName(uid_t user) {
-    const passwd* const entry = ::getpwuid(user);
-    return entry != nullptr ? entry->pw_name : std::to_string(user);
-}
 
 std::string groupName(gid_t group) {
     const struct group* const entry = ::getgrgid(group);

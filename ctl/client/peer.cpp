@@ -9,17 +9,14 @@
 #include <cstring>
 #include <system_error>
 
+#include "ctl/client/user_name.h"
+
 namespace ctl {
 namespace {
 
 constexpr uid_t kNobodyNamed = static_cast<uid_t>(-1);
 
 uid_t namedUser = kNobodyNamed;
-
-std::string userName(uid_t user) {
-    const passwd* const entry = ::getpwuid(user);
-    return entry != nullptr ? entry->pw_name : std::to_string(user);
-}
 
 }  // namespace
 

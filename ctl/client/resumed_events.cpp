@@ -10,7 +10,7 @@ namespace {
 
 constexpr const char* kTable = "KAGDYST";
 /// Between two looks for the host.
-constexpr std::chrono::milliseconds kPause{200};
+constexpr std::chrono::milliseconds kReconnectPause{200};
 
 }  // namespace
 
@@ -41,7 +41,7 @@ bool ResumedEvents::reconnect(Deadline deadline) {
         } catch (const Failure& failure) {
             if (failure.status() != kNoHost && failure.status() != kNoOutcome) throw;
         }
-        std::this_thread::sleep_for(kPause);
+        std::this_thread::sleep_for(kReconnectPause);
     }
     return false;
 }

@@ -1,8 +1,8 @@
 #include "ctl/show/warnings.h"
 
 #include "ctl/client/row.h"
-#include "ctl/show/command_report.h"
 #include "ctl/show/page.h"
+#include "ctl/show/tasks/command_report.h"
 
 using nlohmann::json;
 

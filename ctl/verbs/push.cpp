@@ -8,7 +8,7 @@
 #include "ctl/client/transfer/interruption.h"
 #include "ctl/client/transfer/push_check.h"
 #include "ctl/client/transfer/pusher.h"
-#include "ctl/show/transfer_progress.h"
+#include "ctl/show/transfers/transfer_progress.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
 

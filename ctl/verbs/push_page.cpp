@@ -6,8 +6,8 @@
 #include <numeric>
 
 #include "ctl/show/printable.h"
-#include "ctl/show/transfer_progress.h"
-#include "ctl/show/transfer_status.h"
+#include "ctl/show/transfers/transfer_progress.h"
+#include "ctl/show/transfers/transfer_status.h"
 
 using nlohmann::json;
 

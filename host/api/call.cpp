@@ -52,33 +52,33 @@ json parse(const std::string& body) {
     }
 }
 
-bool hasType(const json& value, Json type) {
+bool hasType(const json& value, JsonType type) {
     switch (type) {
-        case Json::String:
+        case JsonType::String:
             return value.is_string();
-        case Json::Number:
+        case JsonType::Number:
             return value.is_number();
-        case Json::Boolean:
+        case JsonType::Boolean:
             return value.is_boolean();
-        case Json::Array:
+        case JsonType::Array:
             return value.is_array();
-        case Json::Object:
+        case JsonType::Object:
             return value.is_object();
     }
     return false;
 }
 
-const char* nameOf(Json type) {
+const char* nameOf(JsonType type) {
     switch (type) {
-        case Json::String:
+        case JsonType::String:
             return "a string";
-        case Json::Number:
+        case JsonType::Number:
             return "a number";
-        case Json::Boolean:
+        case JsonType::Boolean:
             return "true or false";
-        case Json::Array:
+        case JsonType::Array:
             return "an array";
-        case Json::Object:
+        case JsonType::Object:
             return "an object";
     }
     return "";

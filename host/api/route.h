@@ -41,11 +41,11 @@ struct Parameter {
 };
 
 /// The JSON type of a member of the body.
-enum class Json { String, Number, Boolean, Array, Object };
+enum class JsonType { String, Number, Boolean, Array, Object };
 
 struct Member {
     const char* name;
-    Json type;
+    JsonType type;
     Need need;
     const char* doc;
 };

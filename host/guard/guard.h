@@ -2,7 +2,7 @@
 #pragma once
 
 #include "host/guard/command_request.h"
-#include "host/guard/machine.h"
+#include "host/guard/machine/machine.h"
 
 namespace host {
 

@@ -7,7 +7,7 @@
 #include <set>
 
 #include "host/guard/guard.h"
-#include "host/guard/listing.h"
+#include "host/guard/machine/listing.h"
 #include "host/guard/refusal.h"
 #include "host/guard/wording.h"
 #include "host/tables/plugin_facts.h"

@@ -8,10 +8,10 @@
 #include <fstream>
 #include <iterator>
 
-#include "host/guard/depot_file.h"
 #include "host/guard/guard.h"
-#include "host/guard/import_options.h"
-#include "host/guard/listing.h"
+#include "host/guard/machine/depot_file.h"
+#include "host/guard/machine/import_options.h"
+#include "host/guard/machine/listing.h"
 #include "host/guard/refusal.h"
 #include "host/guard/wording.h"
 #include "host/home/parameter_copy.h"

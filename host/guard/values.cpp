@@ -28,7 +28,7 @@ struct Form {
 };
 
 constexpr Form kProduct = {plugin::kProductColumn, "a product code", "", "letters and digits"};
-constexpr Form kVersion = {plugin::kVersionColumn, "a version", "._-", "letters, digits and . _ -"};
+constexpr Form kVersionForm = {plugin::kVersionColumn, "a version", "._-", "letters, digits and . _ -"};
 constexpr Form kTarget = {plugin::kTargetColumn, "a managed system name", "._-:/",
                           "letters, digits and . _ - : /"};
 constexpr Form kInstance = {plugin::kTargetColumn, "the name of an instance", "._-",
@@ -70,7 +70,7 @@ void check(const CommandRequest& request, const Form& form, const CodePage& code
 void checkValues(CommandRequest& request, Machine& machine) {
     const CodePage& codePage = machine.site().codePage;
     check(request, kProduct, codePage);
-    check(request, kVersion, codePage);
+    check(request, kVersionForm, codePage);
     check(request, request.targetIsInstance() ? kInstance : kTarget, codePage);
 }
 

@@ -11,8 +11,12 @@ constexpr std::size_t kShownNames = 20;
 }  // namespace
 
 std::string quoted(const std::string& value, const CodePage& codePage) {
-    const bool isLong = value.size() > kLongestValue;
-    return '"' + codePage.toUtf8(isLong ? value.substr(0, kLongestValue) + "..." : value) + '"';
+    std::string shown = value;
+    if (shown.size() > kLongestValue) {
+        shown.resize(kLongestValue);
+        shown += "...";
+    }
+    return '"' + codePage.toUtf8(shown) + '"';
 }
 
 std::string enumerated(const std::vector<std::string>& names, const CodePage& codePage) {

@@ -10,7 +10,7 @@
 namespace host {
 namespace {
 
-constexpr std::chrono::milliseconds kRetry{1000};
+constexpr std::chrono::milliseconds kHandOverRetry{1000};
 /// Between two looks at what is left of an earlier run.
 constexpr std::chrono::milliseconds kLook{100};
 
@@ -76,7 +76,7 @@ void Dispatcher::callAlone(const std::function<void()>& call) {
 
 void Dispatcher::completeInstall() {
     while (install_ != 0 && !tryComplete()) {
-        if (!pause(kRetry)) return;
+        if (!pause(kHandOverRetry)) return;
     }
     const std::lock_guard<std::mutex> lock(lock_);
     completing_ = false;
@@ -132,7 +132,7 @@ void Dispatcher::work() {
             found = handOverNext();
         } catch (const std::exception& error) {
             std::fprintf(stderr, "zavhost: the next task waits: %s\n", error.what());
-            if (!pause(kRetry)) return;
+            if (!pause(kHandOverRetry)) return;
         }
         std::unique_lock<std::mutex> lock(lock_);
         while (!stopping_ && (inHand_ || (!found && !entered_)))

@@ -17,7 +17,7 @@
 namespace host {
 namespace {
 
-constexpr std::chrono::seconds kRetry{1};
+constexpr std::chrono::seconds kCommitRetry{1};
 /// At most so many events lie between two looks at what is too old.
 constexpr std::size_t kPruneEvery = 1000;
 /// Rows may be more than are to be kept by this part of their number, or one.
@@ -307,7 +307,7 @@ void Journal::commitOutcome(const Writer::Change& change) {
     while (!commitOutcomeOnce(change)) {
         if (directory_) directory_->freeReserve();
         if (commitOutcomeOnce(change)) break;
-        std::this_thread::sleep_for(kRetry);
+        std::this_thread::sleep_for(kCommitRetry);
     }
 }
 

@@ -19,24 +19,20 @@ constexpr const char* kClean = "/clean";
 constexpr const char* kReserveFile = "/reserve";
 constexpr const char* kIdentity = "/identity";
 
-[[noreturn]] void fail(const std::string& what, int error) {
-    throw StartError(what + ": " + std::generic_category().message(error));
-}
-
 void makeDirectories(const fs::path& path) {
     if (path.has_relative_path() && path.parent_path() != path) {
         std::error_code ignored;
         if (!fs::exists(path.parent_path(), ignored)) makeDirectories(path.parent_path());
     }
     if (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST) {
-        fail("cannot make the state directory " + path.string(), errno);
+        throw StartError("cannot make the state directory " + path.string(), errno);
     }
 }
 
 /// Whoever may write to it could put another journal in the place of this one.
 void insistOnPrivacy(const std::string& path) {
     struct stat found {};
-    if (::stat(path.c_str(), &found) != 0) fail("state directory " + path, errno);
+    if (::stat(path.c_str(), &found) != 0) throw StartError("state directory " + path, errno);
     if (!S_ISDIR(found.st_mode)) throw StartError("state directory " + path + " is a file");
     if ((found.st_uid != ::geteuid() && found.st_uid != 0) || (found.st_mode & 022U) != 0) {
         throw StartError("state directory " + path +
@@ -52,7 +48,7 @@ void syncDirectory(const std::string& path) {
 /// Removes the mark of a clean end; returns whether there was one.
 bool takeMark(const std::string& directory) {
     const bool found = ::unlink((directory + kClean).c_str()) == 0;
-    if (!found && errno != ENOENT) fail("cannot remove " + directory + kClean, errno);
+    if (!found && errno != ENOENT) throw StartError("cannot remove " + directory + kClean, errno);
     syncDirectory(directory);
     return found;
 }
@@ -87,7 +83,7 @@ void StateDirectory::noteCleanEnd() const noexcept {
 std::string StateDirectory::setAside() const {
     const std::string other = firstFreeName(database());
     if (::rename(database().c_str(), other.c_str()) != 0) {
-        fail("cannot set the damaged journal " + database() + " aside", errno);
+        throw StartError("cannot set the damaged journal " + database() + " aside", errno);
     }
     // Changes that are not in the file yet. The index over them is made anew.
     ::rename((database() + "-wal").c_str(), (other + "-wal").c_str());

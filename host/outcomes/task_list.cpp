@@ -16,10 +16,6 @@
 namespace host {
 namespace {
 
-const oxa::Column* find(const oxa::Table& table, std::string_view column) {
-    return table.find(std::string(column));
-}
-
 /// The column's value as a row of the table would have it.
 std::string asInRow(const oxa::Column& column, std::string_view value) {
     std::string text(value.substr(0, static_cast<std::size_t>(std::max(0, column.length))));
@@ -47,10 +43,9 @@ bool TaskList::Columns::complete() const {
 }
 
 TaskList::Columns TaskList::columnsOf(const oxa::Table& requests, const oxa::Table& outcomes) {
-    return {
-        host::find(requests, plugin::kTransidColumn), host::find(requests, plugin::kRetvalColumn),
-        host::find(requests, plugin::kContextColumn), host::find(outcomes, plugin::kTransidColumn),
-        host::find(outcomes, plugin::kRetvalColumn)};
+    return {columnOf(requests, plugin::kTransidColumn), columnOf(requests, plugin::kRetvalColumn),
+            columnOf(requests, plugin::kContextColumn), columnOf(outcomes, plugin::kTransidColumn),
+            columnOf(outcomes, plugin::kRetvalColumn)};
 }
 
 TaskList::TaskList(const TableSet& tables, OutcomeFeed& feed, TaskKeeper& keeper, bool guarded)

@@ -8,22 +8,14 @@
 #include "host/tables/row_fields.h"
 
 namespace host {
-namespace {
-
-const oxa::Column* find(const oxa::Table& table, std::string_view column) {
-    return table.find(std::string(column));
-}
-
-}  // namespace
-
 bool TaskWatch::Columns::complete() const {
     return transid != nullptr && command != nullptr && retval != nullptr &&
            outcomeTransid != nullptr;
 }
 
 TaskWatch::Columns TaskWatch::columnsOf(const oxa::Table& requests, const oxa::Table& outcomes) {
-    return {find(requests, plugin::kTransidColumn), find(requests, plugin::kCommandColumn),
-            find(requests, plugin::kRetvalColumn), find(outcomes, plugin::kTransidColumn)};
+    return {columnOf(requests, plugin::kTransidColumn), columnOf(requests, plugin::kCommandColumn),
+            columnOf(requests, plugin::kRetvalColumn), columnOf(outcomes, plugin::kTransidColumn)};
 }
 
 TaskWatch::TaskWatch(const TableSet& tables, OutcomeFeed& feed) : feed_(feed) {

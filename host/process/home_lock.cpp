@@ -20,23 +20,19 @@ namespace {
 constexpr const char* kFileName = "/.zavhost.lock";
 /// How long the owner may take to write its process id once it has the lock.
 constexpr std::chrono::seconds kWritingTime{2};
-constexpr std::chrono::milliseconds kPause{1};
-
-[[noreturn]] void fail(const std::string& what, int error) {
-    throw StartError(what + ": " + std::generic_category().message(error));
-}
+constexpr std::chrono::milliseconds kReadPause{1};
 
 FileDescriptor openFile(const std::string& name) {
     FileDescriptor file(
         ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
-    if (!file) fail("cannot make " + name, errno);
+    if (!file) throw StartError("cannot make " + name, errno);
     return file;
 }
 
 bool tryLock(const FileDescriptor& file, const std::string& name) {
     while (::flock(file.get(), LOCK_EX | LOCK_NB) != 0) {
         if (errno == EWOULDBLOCK) return false;
-        if (errno != EINTR) fail("cannot lock " + name, errno);
+        if (errno != EINTR) throw StartError("cannot lock " + name, errno);
     }
     return true;
 }
@@ -58,7 +54,7 @@ void writeOwner(const FileDescriptor& file, const std::string& name) {
     const std::string text = std::to_string(::getpid()) + "\n";
     if (::ftruncate(file.get(), 0) != 0 ||
         ::pwrite(file.get(), text.data(), text.size(), 0) != static_cast<ssize_t>(text.size())) {
-        fail("cannot write to " + name, errno);
+        throw StartError("cannot write to " + name, errno);
     }
 }
 
@@ -85,7 +81,7 @@ HomeLock::HomeLock(const std::string& directory, const std::string& what) {
         if (owner || std::chrono::steady_clock::now() >= deadline) {
             throw InUse(what + ' ' + directory + " is in use by " + wordsFor(owner));
         }
-        std::this_thread::sleep_for(kPause);
+        std::this_thread::sleep_for(kReadPause);
     }
     writeOwner(file, name);
     file_ = std::move(file);

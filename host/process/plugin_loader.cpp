@@ -21,7 +21,7 @@ constexpr const char* kLibraries[] = {"libzavmgmt.so", "libzavmgmt.so.1"};
 constexpr const char* kStartFunction = "Initialize_Mgmt_Functions";
 /// The libraries of this interface begin their own names so and end them with its version.
 constexpr const char* kOwnName = "libzavmgmt.so.";
-constexpr const char* kVersion = "1";
+constexpr const char* kPluginVersion = "1";
 
 /// Everything that a plug-in exports.
 constexpr const char* kExports[] = {kStartFunction,
@@ -75,9 +75,9 @@ Plugin::Plugin(const std::optional<std::string>& file)
     if (library_ == nullptr) throw StartError("plug-in cannot be loaded: " + loaderMessage());
     const std::string ownName = libraryName();
     const std::string prefix = kOwnName;
-    if (ownName.rfind(prefix, 0) == 0 && ownName != prefix + kVersion) {
+    if (ownName.rfind(prefix, 0) == 0 && ownName != prefix + kPluginVersion) {
         throw StartError("plug-in " + file_ + " is " + ownName + "; this host needs " + prefix +
-                         kVersion);
+                         kPluginVersion);
     }
     void* const symbol = ::dlsym(library_, kStartFunction);
     if (symbol == nullptr) {

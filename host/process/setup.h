@@ -8,8 +8,8 @@ namespace host {
 /// before any thread exists.
 void setUpProcess();
 
-/// Keeps what the process and its children make from being writable by others. Call it while there is
-/// one thread.
+/// Keeps what the process and its children make from being writable by others. Call it while there
+/// is one thread.
 void takeWritePermissionFromOthers();
 
 }  // namespace host

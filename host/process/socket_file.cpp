@@ -8,18 +8,12 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstring>
 #include <filesystem>
-#include <system_error>
 
 #include "host/process/start_error.h"
 
 namespace host {
 namespace {
-
-[[noreturn]] void fail(const std::string& what, int error) {
-    throw StartError(what + ": " + std::generic_category().message(error));
-}
 
 [[noreturn]] void failInUse(const std::string& path) {
     throw StartError("socket " + path + " is in use by a live host");
@@ -42,7 +36,7 @@ const sockaddr* generic(const sockaddr_un& address) {
 
 FileDescriptor newSocket(const std::string& path) {
     FileDescriptor made(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
-    if (!made) fail("socket " + path, errno);
+    if (!made) throw StartError("socket " + path, errno);
     return made;
 }
 
@@ -60,11 +54,11 @@ FileDescriptor takeLock(const std::string& path) {
     while (true) {
         FileDescriptor lock(
             ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
-        if (!lock) fail("cannot make " + name, errno);
+        if (!lock) throw StartError("cannot make " + name, errno);
         if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
             if (errno == EWOULDBLOCK) failInUse(path);
             if (errno == EINTR) continue;
-            fail("cannot lock " + name, errno);
+            throw StartError("cannot lock " + name, errno);
         }
         if (isStill(lock.get(), name)) return lock;
     }
@@ -108,7 +102,7 @@ void SocketFile::replaceStale() const {
     struct stat found {};
     if (::lstat(path_.c_str(), &found) != 0) {
         if (errno == ENOENT) return;
-        fail("socket " + path_, errno);
+        throw StartError("socket " + path_, errno);
     }
     if (!S_ISSOCK(found.st_mode)) throw StartError(path_ + " exists and is not a socket");
     const sockaddr_un address = addressOf(path_);
@@ -118,9 +112,9 @@ void SocketFile::replaceStale() const {
         failInUse(path_);
     }
     if (errno == ENOENT) return;
-    if (errno != ECONNREFUSED) fail("socket " + path_ + " is in use", errno);
+    if (errno != ECONNREFUSED) throw StartError("socket " + path_ + " is in use", errno);
     if (::unlink(path_.c_str()) != 0 && errno != ENOENT) {
-        fail("cannot remove the stale socket " + path_, errno);
+        throw StartError("cannot remove the stale socket " + path_, errno);
     }
 }
 
@@ -129,20 +123,21 @@ void SocketFile::bind() {
     socket_ = newSocket(path_);
     // bind() gives the file the mode of the socket. So the file is private from the start, without
     // changing the process's umask, which other threads would see.
-    if (::fchmod(socket_.get(), 0600) != 0) fail("socket " + path_, errno);
+    if (::fchmod(socket_.get(), 0600) != 0) throw StartError("socket " + path_, errno);
     if (::bind(socket_.get(), generic(address), sizeof address) != 0) {
-        fail("cannot bind the socket " + path_, errno);
+        throw StartError("cannot bind the socket " + path_, errno);
     }
     struct stat made {};
-    if (::lstat(path_.c_str(), &made) != 0) fail("socket " + path_, errno);
+    if (::lstat(path_.c_str(), &made) != 0) throw StartError("socket " + path_, errno);
     device_ = made.st_dev;
     inode_ = made.st_ino;
     // The umask may have removed bits that the owner needs.
-    if (::chmod(path_.c_str(), 0600) != 0) fail("socket " + path_, errno);
+    if (::chmod(path_.c_str(), 0600) != 0) throw StartError("socket " + path_, errno);
 }
 
 int SocketFile::listen() {
-    if (::listen(socket_.get(), SOMAXCONN) != 0) fail("cannot listen on " + path_, errno);
+    if (::listen(socket_.get(), SOMAXCONN) != 0)
+        throw StartError("cannot listen on " + path_, errno);
     return socket_.get();
 }
 

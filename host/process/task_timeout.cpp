@@ -12,13 +12,13 @@ namespace host {
 namespace {
 
 /// The plug-in takes the largest int for a number out of range.
-constexpr int kLongest = INT_MAX - 1;
+constexpr int kLongestTimeout = INT_MAX - 1;
 
 std::optional<int> secondsIn(std::string_view text) {
     int seconds = 0;
     const char* const end = text.data() + text.size();
     const auto [rest, error] = std::from_chars(text.data(), end, seconds);
-    if (error != std::errc() || rest != end || seconds < 1 || seconds > kLongest) {
+    if (error != std::errc() || rest != end || seconds < 1 || seconds > kLongestTimeout) {
         return std::nullopt;
     }
     return seconds;
@@ -29,8 +29,8 @@ std::optional<int> secondsIn(std::string_view text) {
 int taskTimeoutOf(const std::string& name, const std::string& text) {
     const std::optional<int> seconds = secondsIn(text);
     if (!seconds) {
-        throw StartError(name + " takes a number of seconds from 1 to " + std::to_string(kLongest) +
-                         ", not \"" + text + "\"");
+        throw StartError(name + " takes a number of seconds from 1 to " +
+                         std::to_string(kLongestTimeout) + ", not \"" + text + "\"");
     }
     return *seconds;
 }

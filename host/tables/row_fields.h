@@ -2,11 +2,17 @@
 #pragma once
 
 #include <cstdint>
+#include <string>
 #include <string_view>
 
 #include "embedded/oxa_host.h"
 
 namespace host {
+
+/// The table's column of that name, or null.
+inline const oxa::Column* columnOf(const oxa::Table& table, std::string_view name) {
+    return table.find(std::string(name));
+}
 
 /// The bytes of one row, which belong to somebody else.
 using RowView = std::string_view;

@@ -9,7 +9,7 @@ namespace host {
 namespace {
 
 /// Names are short; longer texts are not names, and comparing them would take long.
-constexpr std::size_t kLongest = 64;
+constexpr std::size_t kLongestGiven = 64;
 constexpr std::size_t kLettersPerSlip = 3;
 
 std::string inLowerCase(std::string text) {
@@ -42,7 +42,7 @@ std::size_t slipsBetween(const std::string& a, const std::string& b) {
 }  // namespace
 
 std::string nearestName(const std::string& given, const std::vector<std::string>& known) {
-    if (given.empty() || given.size() > kLongest) return "";
+    if (given.empty() || given.size() > kLongestGiven) return "";
     const std::string wanted = inLowerCase(given);
     std::string nearest;
     std::size_t fewest = std::max<std::size_t>(1, given.size() / kLettersPerSlip) + 1;

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "base/zavtoken.h"
-#include "host/guard/import_options.h"
+#include "host/guard/machine/import_options.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;

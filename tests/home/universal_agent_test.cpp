@@ -189,22 +189,24 @@ TEST_F(UniversalAgent, CollectsTheCompleteNewLinesOfFiles) {
 }
 
 TEST_F(UniversalAgent, NotesWhatItHasStoredBeforeItEnds) {
-    // The whole process group is told to end while rows are being stored, or while that is being noted.
+    // The whole process group is told to end while rows are being stored, or while that is being
+    // noted.
     for (const char* ending :
          {"store_rows() { sed 's/^/stored /'; kill -TERM 0; }; replace_file() { cat >\"$1\"; }\n",
-          "store_rows() { sed 's/^/stored /'; }; replace_file() { kill -TERM 0; cat >\"$1\"; }\n"}) {
+          "store_rows() { sed 's/^/stored /'; }; replace_file() { kill -TERM 0; cat >\"$1\"; "
+          "}\n"}) {
         scratch.makeDir("offsets");
         const std::string watched = scratch.write("watched", "one\ntwo\nhal");
-        const Outcome collected = run(
-            {"/usr/bin/setsid", "-w", "/bin/sh", "-c",
-             "set -u; . \"$1\"\n"
-             "end_agent() { echo ended; exit 0; }\n"
-             "config_value() { :; }\n" +
-                 std::string(ending) +
-                 "work=$2 notes=$2 import=f application=F data_source=$2/watched rows=$2/rows\n"
-                 "collect_file; echo went on",
-             "sh", ZAV_SOURCE_DIR "/home/bundles/um/files/bin/collect.sh",
-             std::filesystem::path(watched).parent_path().string()});
+        const Outcome collected =
+            run({"/usr/bin/setsid", "-w", "/bin/sh", "-c",
+                 "set -u; . \"$1\"\n"
+                 "end_agent() { echo ended; exit 0; }\n"
+                 "config_value() { :; }\n" +
+                     std::string(ending) +
+                     "work=$2 notes=$2 import=f application=F data_source=$2/watched rows=$2/rows\n"
+                     "collect_file; echo went on",
+                 "sh", ZAV_SOURCE_DIR "/home/bundles/um/files/bin/collect.sh",
+                 std::filesystem::path(watched).parent_path().string()});
         EXPECT_EQ(collected.out, "stored one\nstored two\nended\n") << ending << collected.err;
         EXPECT_EQ(scratch.read("offsets/f"), "8\n") << ending;
         std::filesystem::remove_all(scratch.path("offsets"));

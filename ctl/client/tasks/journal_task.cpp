@@ -21,7 +21,7 @@ using std::chrono::seconds;
 
 constexpr const char* kTasks = "/v1/tasks";
 /// Between two attempts to reach a host that is not there. An attempt costs next to nothing.
-constexpr milliseconds kPause{200};
+constexpr milliseconds kRetryPause{200};
 /// For one request. The host answers earlier when the task is over.
 constexpr seconds kLongestLook{600};
 /// How long the plug-in's reply to a task that nothing stands before may take.
@@ -117,15 +117,15 @@ std::optional<Answer> JournalTask::send(const TaskRequest& request, Sending& sen
         return answer;
     } catch (const BrokenConnection&) {
         if (!request.isUnique && !request.isOnce) throw answerLost(request);
-        if (left() <= kPause) throw;
+        if (left() <= kRetryPause) throw;
         sending.isLost = true;
     } catch (const Failure& failure) {
         // A host that was never there is not waited for.
         const bool wasThere = sending.isReached || sending.isLost;
-        if (!wasThere || failure.status() != kNoHost || left() <= kPause) throw;
+        if (!wasThere || failure.status() != kNoHost || left() <= kRetryPause) throw;
     }
     noteAway();
-    pause(kPause);
+    pause(kRetryPause);
     return std::nullopt;
 }
 
@@ -144,7 +144,7 @@ bool JournalTask::submit(const TaskRequest& request, bool isPatient) {
         }
         if (!isToldToWait) note("the host has no room for the request now; asking again");
         isToldToWait = true;
-        pause(std::max<milliseconds>(*answer->retryAfter, kPause));
+        pause(std::max<milliseconds>(*answer->retryAfter, kRetryPause));
     }
 }
 
@@ -166,12 +166,12 @@ JournalTask::Look JournalTask::look(seconds wait) {
         if (failure.status() == kNoOutcome) return Look::TooLate;
         if (failure.status() != kNoHost) throw;
         noteAway();
-        pause(kPause);
+        pause(kRetryPause);
         return Look::NotThere;
     }
     if (answer.status == 404) return Look::Forgotten;
     if (isServedLater(answer.status)) {
-        pause(kPause);
+        pause(kRetryPause);
         return Look::NotThere;
     }
     acceptedAs(answer);

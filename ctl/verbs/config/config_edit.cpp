@@ -11,12 +11,12 @@
 #include "ctl/client/interruption.h"
 #include "ctl/client/row.h"
 #include "ctl/client/whole_file.h"
-#include "ctl/show/task_page.h"
+#include "ctl/show/tasks/task_page.h"
 #include "ctl/verbs/arguments/common_arguments.h"
+#include "ctl/verbs/commands/queued.h"
 #include "ctl/verbs/config/config_get.h"
 #include "ctl/verbs/config/config_set.h"
 #include "ctl/verbs/invocation.h"
-#include "ctl/verbs/tasks/queued.h"
 #include "ctl/verbs/verb_table.h"
 
 using nlohmann::json;

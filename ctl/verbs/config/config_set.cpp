@@ -11,8 +11,8 @@
 #include "ctl/client/whole_file.h"
 #include "ctl/show/shell_quoted.h"
 #include "ctl/verbs/arguments/common_arguments.h"
+#include "ctl/verbs/commands/queued.h"
 #include "ctl/verbs/invocation.h"
-#include "ctl/verbs/tasks/queued.h"
 #include "ctl/verbs/verb_table.h"
 
 namespace ctl {

@@ -3,8 +3,8 @@
 #include "ctl/client/failure.h"
 #include "ctl/client/guarded.h"
 #include "ctl/verbs/arguments/common_arguments.h"
+#include "ctl/verbs/commands/queued.h"
 #include "ctl/verbs/invocation.h"
-#include "ctl/verbs/tasks/queued.h"
 #include "ctl/verbs/verb_table.h"
 
 namespace ctl {

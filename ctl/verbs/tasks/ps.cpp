@@ -7,7 +7,7 @@
 #include "ctl/client/http/percent_encoding.h"
 #include "ctl/client/row.h"
 #include "ctl/client/tasks/task_list.h"
-#include "ctl/show/task_record.h"
+#include "ctl/show/tasks/task_record.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"
 

@@ -8,7 +8,7 @@
 #include "ctl/client/http/percent_encoding.h"
 #include "ctl/client/interruption.h"
 #include "ctl/client/row.h"
-#include "ctl/show/output_page.h"
+#include "ctl/show/tasks/output_page.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/tasks/task_argument.h"
 #include "ctl/verbs/verb_table.h"

@@ -4,7 +4,7 @@
 
 #include "ctl/client/host_client.h"
 #include "ctl/client/http/percent_encoding.h"
-#include "ctl/show/task_record.h"
+#include "ctl/show/tasks/task_record.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/tasks/task_argument.h"
 #include "ctl/verbs/verb_table.h"

@@ -3,8 +3,8 @@
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/tasks/run_task.h"
-#include "ctl/show/task_page.h"
-#include "ctl/show/task_table.h"
+#include "ctl/show/tasks/task_page.h"
+#include "ctl/show/tasks/task_table.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/tasks/task_argument.h"
 #include "ctl/verbs/tasks/waiting.h"

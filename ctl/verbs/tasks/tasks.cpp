@@ -9,7 +9,7 @@
 
 #include "ctl/client/interruption.h"
 #include "ctl/client/tasks/task_list.h"
-#include "ctl/show/task_table.h"
+#include "ctl/show/tasks/task_table.h"
 #include "ctl/verbs/arguments/global_arguments.h"
 #include "ctl/verbs/invocation.h"
 #include "ctl/verbs/verb_table.h"

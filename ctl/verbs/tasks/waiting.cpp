@@ -4,7 +4,7 @@
 
 #include "ctl/client/failure.h"
 #include "ctl/show/shell_quoted.h"
-#include "ctl/show/task_page.h"
+#include "ctl/show/tasks/task_page.h"
 #include "ctl/verbs/arguments/global_arguments.h"
 
 namespace ctl {

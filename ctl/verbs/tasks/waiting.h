@@ -5,9 +5,9 @@
 
 #include "ctl/client/interruption.h"
 #include "ctl/client/tasks/task_result.h"
-#include "ctl/show/output_page.h"
 #include "ctl/show/page.h"
-#include "ctl/show/running_clock.h"
+#include "ctl/show/tasks/output_page.h"
+#include "ctl/show/tasks/running_clock.h"
 #include "ctl/verbs/invocation.h"
 
 namespace ctl {

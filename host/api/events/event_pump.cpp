@@ -12,7 +12,7 @@
 namespace host {
 namespace {
 
-constexpr std::chrono::seconds kRetry{1};
+constexpr std::chrono::seconds kReadRetry{1};
 
 using Streams = std::vector<std::shared_ptr<PumpedStream>>;
 
@@ -55,7 +55,7 @@ struct EventPump::State {
     bool await(Streams& found, bool limited) {
         found.clear();
         std::unique_lock<std::mutex> held(lock);
-        const auto until = std::chrono::steady_clock::now() + kRetry;
+        const auto until = std::chrono::steady_clock::now() + kReadRetry;
         while (!work && !ending) {
             if (!limited) {
                 changed.wait(held);

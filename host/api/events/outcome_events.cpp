@@ -9,7 +9,7 @@
 #include "embedded/mutex.h"
 #include "host/api/events/event_pump.h"
 #include "host/api/services.h"
-#include "host/api/task_document.h"
+#include "host/api/tasks/task_document.h"
 #include "host/tables/bad_request.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"

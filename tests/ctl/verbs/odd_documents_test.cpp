@@ -9,8 +9,9 @@
 #include <vector>
 
 #include "ctl/client/failure.h"
-#include "ctl/show/task_record.h"
+#include "ctl/show/tasks/task_record.h"
 #include "ctl/verbs/agents.h"
+#include "ctl/verbs/commands/complete_install.h"
 #include "ctl/verbs/config/config_get.h"
 #include "ctl/verbs/depot/depot_ls.h"
 #include "ctl/verbs/depot/depot_sum.h"
@@ -18,7 +19,6 @@
 #include "ctl/verbs/events.h"
 #include "ctl/verbs/query.h"
 #include "ctl/verbs/status.h"
-#include "ctl/verbs/tasks/complete_install.h"
 #include "ctl/verbs/tasks/task_cancel.h"
 #include "ctl/verbs/tasks/task_wait.h"
 #include "ctl/verbs/tasks/tasks.h"

@@ -12,7 +12,7 @@ namespace {
 
 using host::Access;
 using host::Call;
-using host::Json;
+using host::JsonType;
 using host::Match;
 using host::Need;
 using host::Others;
@@ -43,11 +43,11 @@ std::vector<Route> someRoutes() {
          nothing,
          {},
          Others::None,
-         {{"name", Json::String, Need::Required, ""},
-          {"count", Json::Number, Need::Optional, ""},
-          {"once", Json::Boolean, Need::Optional, ""},
-          {"where", Json::Array, Need::Optional, ""},
-          {"more", Json::Object, Need::Optional, ""}}},
+         {{"name", JsonType::String, Need::Required, ""},
+          {"count", JsonType::Number, Need::Optional, ""},
+          {"once", JsonType::Boolean, Need::Optional, ""},
+          {"where", JsonType::Array, Need::Optional, ""},
+          {"more", JsonType::Object, Need::Optional, ""}}},
         {"GET", "/v1/tasks/{id}", "", Access::Read, Runs::AtOnce, nothing, kId},
         {"DELETE", "/v1/tasks/{id}", "", Access::Act, Runs::AtOnce, nothing, kId},
         {"POST", "/v1/tasks/{id}/cancel", "", Access::Act, Runs::AtOnce, nothing, kId},

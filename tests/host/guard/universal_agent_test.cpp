@@ -4,7 +4,7 @@
 #include <filesystem>
 
 #include "host/guard/guard_fixture.h"
-#include "host/guard/import_options.h"
+#include "host/guard/machine/import_options.h"
 
 namespace fs = std::filesystem;
 

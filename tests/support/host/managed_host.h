@@ -18,7 +18,8 @@ public:
     enum class Guards { Off, On };
 
     /// Starts the host on `home` and returns when it is ready; throws when it does not get there.
-    /// With guards, programs that they insist on and the home lacks are added first; they only fail.
+    /// With guards, programs that they insist on and the home lacks are added first; they only
+    /// fail.
     explicit ManagedHost(const std::string& home, const Environment& environment = {},
                          const std::vector<std::string>& moreArguments = {},
                          Guards guards = Guards::Off);

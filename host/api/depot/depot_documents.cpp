@@ -1,0 +1,69 @@
+#include "host/api/depot/depot_documents.h"
+
+#include <cctype>
+#include <ctime>
+#include <nlohmann/json.hpp>
+
+#include "host/tables/code_page.h"
+
+namespace host {
+namespace {
+
+using nlohmann::ordered_json;
+
+std::string percentEncoded(const std::string& bytes) {
+    static const char* const kDigits = "0123456789ABCDEF";
+    std::string text;
+    for (const char c : bytes) {
+        const auto byte = static_cast<unsigned char>(c);
+        if (std::isalnum(byte) != 0 && byte < 128) {
+            text += c;
+        } else {
+            text += {'%', kDigits[byte >> 4], kDigits[byte & 15U]};
+        }
+    }
+    return text;
+}
+
+const char* nameOf(DepotEntry::Type type) {
+    switch (type) {
+        case DepotEntry::Type::File:
+            return "file";
+        case DepotEntry::Type::Directory:
+            return "directory";
+        case DepotEntry::Type::Link:
+            return "link";
+        case DepotEntry::Type::Other:
+            break;
+    }
+    return "other";
+}
+
+/// The time as RFC 3339, in UTC.
+std::string timeText(const std::timespec& time) {
+    std::tm parts{};
+    ::gmtime_r(&time.tv_sec, &parts);
+    char text[40];
+    std::strftime(text, sizeof text, "%Y-%m-%dT%H:%M:%SZ", &parts);
+    return text;
+}
+
+}  // namespace
+
+void putName(ordered_json& document, const char* member, const std::string& name) {
+    static const CodePage utf8("UTF-8");
+    const std::string text = utf8.toUtf8(name);
+    document[member] = text;
+    if (text != name) document["escaped"] = percentEncoded(name);
+}
+
+ordered_json documentOf(const DepotEntry& entry) {
+    ordered_json document;
+    putName(document, "name", entry.name);
+    document["type"] = nameOf(entry.type);
+    document["bytes"] = entry.bytes;
+    document["modified"] = timeText(entry.modified);
+    return document;
+}
+
+}  // namespace host

@@ -1,0 +1,83 @@
+// GET /v1/depot/sum
+//
+// Large files take long, so that threads of their own compute sums, a few requests at a time:
+// however many there are, the workers are free for other requests.
+
+#include <memory>
+#include <nlohmann/json.hpp>
+
+#include "host/api/call.h"
+#include "host/api/depot/depot_documents.h"
+#include "host/api/route.h"
+#include "host/api/services.h"
+#include "host/depot/depot_error.h"
+#include "host/http/responder.h"
+
+namespace host {
+namespace {
+
+constexpr std::chrono::hours kLongest{1};
+
+Reply tryAgain(const char* reason) {
+    Reply reply = errorReply(503, reason);
+    reply.fields.emplace_back("Retry-After", "5");
+    return reply;
+}
+
+nlohmann::ordered_json rowOf(const Depot& depot, const std::string& path) {
+    nlohmann::ordered_json file;
+    putName(file, "path", path);
+    try {
+        const Checksum sum = depot.sum(path);
+        file["bytes"] = sum.bytes;
+        file["sha256"] = sum.sha256;
+    } catch (const DepotError& error) {
+        file["error"] = error.what();
+    }
+    return file;
+}
+
+/// One request in the course of its computation.
+struct Sums {
+    Services& services;
+    const std::vector<std::string> paths;
+    const Responder responder;
+    nlohmann::ordered_json files = nlohmann::ordered_json::array();
+};
+
+Reply replyWith(nlohmann::ordered_json files) {
+    const nlohmann::ordered_json document = {{"files", std::move(files)}};
+    return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+}
+
+/// Computes the next sum. Between two of them other requests have their turn, if there is room to
+/// wait for another one.
+void advance(const std::shared_ptr<Sums>& sums) {
+    try {
+        do {
+            const std::string& path = sums->paths[sums->files.size()];
+            sums->files.push_back(rowOf(sums->services.depotFiles, path));
+            if (sums->files.size() == sums->paths.size()) {
+                return sums->responder(replyWith(std::move(sums->files)));
+            }
+        } while (!sums->services.checksums.submit([sums] { advance(sums); }));
+    } catch (const std::exception& error) {
+        sums->responder(errorReply(500, error.what()));
+    }
+}
+
+}  // namespace
+
+Endpoint getDepotSum;
+
+Answer getDepotSum(Services& services, const Call& call) {
+    const auto begin = [&services, paths = call.texts("path")](const Responder& responder) {
+        const auto sums = std::make_shared<Sums>(Sums{services, paths, responder});
+        const bool taken = services.checksums.submit([sums] { advance(sums); });
+        if (!taken) responder(tryAgain("too many requests for checksums are waiting"));
+    };
+    const auto atLimit = []() -> Answer { return tryAgain("the checksums are not ready"); };
+    return Later{begin, kLongest, atLimit};
+}
+
+}  // namespace host

@@ -1,0 +1,54 @@
+// POST /v1/query
+
+#include "host/tables/query.h"
+
+#include <nlohmann/json.hpp>
+
+#include "host/api/call.h"
+#include "host/api/services.h"
+#include "host/api/tables/query_document.h"
+#include "host/api/tables/watched_query.h"
+#include "host/tables/conditions.h"
+#include "host/tables/plugin_facts.h"
+
+namespace host {
+namespace {
+
+std::vector<oxa::Predicate> conditionsOf(const nlohmann::json& body, const oxa::Table& table,
+                                         const Services& services) {
+    std::vector<oxa::Predicate> conditions;
+    const auto where = body.find("where");
+    if (where == body.end()) return conditions;
+    const ConditionReader reader(table, services.codePage);
+    try {
+        for (const nlohmann::json& condition : *where)
+            conditions.push_back(reader.fromJson(condition));
+    } catch (const UnknownColumn& unknown) {
+        if (!services.guarded || table.name != plugin::kRequestTable) throw;
+        Guards::refuseUnknownColumn(table, unknown.name());
+    }
+    return conditions;
+}
+
+bool isForced(const nlohmann::json& body) {
+    const auto force = body.find("force");
+    return force != body.end() && force->get<bool>();
+}
+
+}  // namespace
+
+Endpoint postQuery;
+
+Answer postQuery(Services& services, const Call& call) {
+    const auto& name = call.body().at("table").get_ref<const std::string&>();
+    const oxa::Table* const table = services.tables.find(name);
+    if (table == nullptr) return errorReply(404, "there is no table \"" + name + "\"");
+    if (table->name == plugin::kRequestTable && call.peer().access < Access::Act) {
+        return errorReply(403, "you may only read from this host; a query on " + name + " acts");
+    }
+    const Query query{table, conditionsOf(call.body(), *table, services)};
+    const WatchedAnswer answer = runWatched(services, query, isForced(call.body()), call.peer());
+    return jsonReply(200, queryDocument(services, query, answer));
+}
+
+}  // namespace host

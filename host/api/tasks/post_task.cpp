@@ -1,0 +1,187 @@
+// POST /v1/tasks
+
+#include <algorithm>
+#include <chrono>
+#include <nlohmann/json.hpp>
+#include <random>
+
+#include "host/api/call.h"
+#include "host/api/services.h"
+#include "host/api/tables/watched_query.h"
+#include "host/api/tasks/task_document.h"
+#include "host/api/time_text.h"
+#include "host/guard/refusal.h"
+#include "host/outcomes/shown_request.h"
+#include "host/process/user_name.h"
+#include "host/tables/bad_request.h"
+#include "host/tables/conditions.h"
+#include "host/tables/plugin_facts.h"
+
+namespace host {
+namespace {
+
+constexpr std::size_t kLongestTransid = 84;
+constexpr const char* kRetryAfter = "5";  // seconds
+
+std::string upperCase(std::string name) {
+    for (char& letter : name) {
+        if (letter >= 'a' && letter <= 'z') letter = static_cast<char>(letter - 'a' + 'A');
+    }
+    return name;
+}
+
+std::string textIn(const nlohmann::json& body, const char* member) {
+    const auto found = body.find(member);
+    return found == body.end() ? std::string() : found->get<std::string>();
+}
+
+bool flagIn(const nlohmann::json& body, const char* member) {
+    const auto found = body.find(member);
+    return found != body.end() && found->get<bool>();
+}
+
+std::string madeUpTransid() {
+    std::random_device source;
+    char text[32];
+    std::snprintf(text, sizeof text, "task-%08x%08x", static_cast<unsigned>(source()),
+                  static_cast<unsigned>(source()));
+    return text;
+}
+
+/// Every member that is a column of the request table.
+std::vector<oxa::Predicate> conditionsOf(const nlohmann::json& body, const oxa::Table& table,
+                                         const Services& services) {
+    const ConditionReader reader(table, services.codePage);
+    std::vector<oxa::Predicate> conditions;
+    for (const auto& member : body.items()) {
+        const std::string column = upperCase(member.key());
+        if (table.find(column) == nullptr) continue;
+        conditions.push_back(reader.equality(column, member.value().get<std::string>()));
+    }
+    return conditions;
+}
+
+void checkTransid(const std::string& transid) {
+    if (transid.size() > kLongestTransid) {
+        throw BadRequest("\"transid\" is longer than 84 bytes");
+    }
+    if (!transid.empty() && transid.back() == ' ') {
+        throw BadRequest("\"transid\" ends with a blank");
+    }
+}
+
+/// What the request asks for. Throws BadRequest.
+Task taskOf(const Call& call, const oxa::Table& table, Services& services) {
+    const nlohmann::json& body = call.body();
+    Task task;
+    task.way = TaskWay::Journal;
+    task.asker = userName(call.peer().user);
+    task.conditions = conditionsOf(body, table, services);
+    task.transid = valueIn(task.conditions, plugin::kTransidColumn);
+    checkTransid(task.transid);
+    const bool once = flagIn(body, "once");
+    if (task.transid.empty()) {
+        if (once) throw BadRequest("\"once\" needs a \"transid\"");
+        task.transid = madeUpTransid();
+        task.conditions.push_back({std::string(plugin::kTransidColumn), OPER_EQ, task.transid});
+    }
+    task.request = shownRequest(task.conditions);
+    task.forced = flagIn(body, "force");
+    task.accepted = WallClock::now();
+    if (body.contains("expires")) task.expires = timeOf(textIn(body, "expires"));
+    if (once) {
+        nlohmann::json content = body;
+        content.erase("journal");
+        task.once = services.journal.hashOf(content.dump());
+    }
+    return task;
+}
+
+void checkCommand(const Task& task) {
+    const std::string_view command = task.value(plugin::kCommandColumn);
+    if (command.empty()) throw BadRequest("the body lacks \"command\"");
+    if (plugin::runsAtOnce(command)) {
+        throw BadRequest(
+            std::string(command) +
+            " is carried out with its answer and never waits; ask with POST /v1/query");
+    }
+}
+
+/// A repetition gets the answer that the first one got.
+Reply replyAgain(const Task& first, const Task& task, const Services& services) {
+    if (first.once != task.once) {
+        return errorReply(409, "another request has this transid already: task " + first.id);
+    }
+    if (first.way == TaskWay::AtOnce && !first.guard.empty()) {
+        return guardReply(409, first.reason, first.guard, first.hint);
+    }
+    return taskReply(202, first, services);
+}
+
+Reply enter(Task task, Services& services) {
+    if (!task.once) {
+        services.journal.enter(task);
+    } else if (const std::optional<Task> first = services.journal.enterOnce(task)) {
+        return replyAgain(*first, task, services);
+    }
+    services.dispatcher.wake();
+    return taskReply(202, task, services);
+}
+
+Task refused(Task task, const std::string& reason) {
+    task.way = TaskWay::AtOnce;
+    task.state = TaskState::Refused;
+    task.reason = reason;
+    task.ended = task.accepted;
+    return task;
+}
+
+/// Asks the guards. A refusal is remembered if the request is to be carried out once.
+void askGuards(const Task& task, Services& services) {
+    if (!services.guarded) return;
+    CommandRequest request(task.conditions, task.forced);
+    try {
+        services.guards.admit(request, services.journal.mayChange(request.product()));
+    } catch (const Refusal& refusal) {
+        if (task.once && refusal.httpStatus() == 409) {
+            Task remembered = refused(task, refusal.what());
+            remembered.guard = refusal.guard();
+            remembered.hint = refusal.hint();
+            services.journal.enterOnce(remembered);
+        }
+        throw;
+    }
+}
+
+Reply enterRefused(const Call& call, Task task, Services& services) {
+    if (!task.once) throw BadRequest("\"refused\" needs \"once\"");
+    return enter(
+        refused(std::move(task),
+                services.codePage.fromUtf8(textIn(call.body(), "refused")).value_or("refused")),
+        services);
+}
+
+}  // namespace
+
+Endpoint postTask;
+
+Answer postTask(Services& services, const Call& call) {
+    const oxa::Table* const table = services.tables.find(std::string(plugin::kRequestTable));
+    if (table == nullptr) return errorReply(404, "the plug-in takes no requests");
+    Task task = taskOf(call, *table, services);
+    if (call.body().contains("refused")) return enterRefused(call, std::move(task), services);
+    checkCommand(task);
+    if (task.once) {
+        const std::optional<Task> first = services.journal.findOnce(task.transid);
+        if (first) return replyAgain(*first, task, services);
+    }
+    if (services.journal.waiting() >= services.maxQueued) {
+        Reply reply = errorReply(429, "as many tasks wait as may");
+        reply.fields.emplace_back("Retry-After", kRetryAfter);
+        return reply;
+    }
+    askGuards(task, services);
+    return enter(std::move(task), services);
+}
+
+}  // namespace host

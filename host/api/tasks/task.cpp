@@ -1,0 +1,51 @@
+// GET /v1/tasks/{id}
+
+#include <algorithm>
+#include <atomic>
+#include <memory>
+
+#include "host/api/call.h"
+#include "host/api/services.h"
+#include "host/api/tasks/task_document.h"
+#include "host/http/responder.h"
+
+namespace host {
+namespace {
+
+constexpr long long kLongestTaskWait = 24 * 60 * 60;  // seconds
+
+Reply replyAbout(const std::string& name, const Services& services) {
+    const std::optional<Task> task = services.tasks.find(name);
+    if (!task) return errorReply(404, "there is no task \"" + services.codePage.toUtf8(name) + '"');
+    return taskReply(200, *task, services);
+}
+
+/// Answers when the task is over or the time is.
+Later waitFor(const std::string& id, std::chrono::seconds time, Services& services) {
+    const auto waiter = std::make_shared<std::atomic<std::uint64_t>>(0);
+    const auto begin = [id, waiter, &services](const Responder& responder) {
+        *waiter = services.tasks.awaitEnd(id, [responder, &services](const Task& task) {
+            responder(taskReply(200, task, services));
+        });
+    };
+    const auto atLimit = [id, waiter, &services]() -> Answer {
+        services.tasks.cancel(*waiter);
+        return replyAbout(id, services);
+    };
+    return {begin, time, atLimit};
+}
+
+}  // namespace
+
+Endpoint getTask;
+
+Answer getTask(Services& services, const Call& call) {
+    const std::string& given = call.required("id");
+    const std::string name = services.codePage.fromUtf8(given).value_or(given);
+    const std::optional<Task> task = services.tasks.find(name);
+    const long long seconds = std::min(call.number("wait", 0), kLongestTaskWait);
+    if (!task || isOver(task->state) || seconds == 0) return replyAbout(name, services);
+    return waitFor(task->id, std::chrono::seconds(seconds), services);
+}
+
+}  // namespace host

@@ -1,0 +1,27 @@
+/// Tasks and commands as JSON.
+#pragma once
+
+#include <nlohmann/json_fwd.hpp>
+#include <string>
+
+#include "host/api/services.h"
+#include "host/http/reply.h"
+#include "host/outcomes/task.h"
+
+namespace host {
+
+/// {"command", "pid", "started", "ended", "exit" | "signal" | "error", "timed_out"?, "stdout",
+/// "stderr"}. Members that are not known are left out.
+nlohmann::ordered_json commandObject(const Command& command, const CodePage& codePage);
+
+/// Identifier, TRANSID, what was asked for, state, times and asker.
+nlohmann::ordered_json taskSummary(const Task& task, const CodePage& codePage);
+
+/// The summary with the run of the host and the start of the machine in which it was handed over,
+/// "force", "interruptions", "reply", "events" and "details", as text.
+std::string taskDocument(const Task& task, const Services& services);
+
+/// Answers with that document.
+Reply taskReply(unsigned status, const Task& task, const Services& services);
+
+}  // namespace host

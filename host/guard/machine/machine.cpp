@@ -1,0 +1,26 @@
+#include "host/guard/machine/machine.h"
+
+#include <sys/utsname.h>
+
+#include "host/tables/plugin_facts.h"
+
+namespace host {
+
+const Inventory& Machine::inventory() {
+    if (!inventory_) inventory_ = readInventory(site_.home);
+    return *inventory_;
+}
+
+Resolution Machine::resolve(const std::string& product, const std::string& target) {
+    if (product == plugin::kUniversalAgent) return {universalAgentInstance(target), ""};
+    return instanceByTranslator(translatorPath(site_.home, inventory()), product, target);
+}
+
+std::string Machine::shortName() {
+    utsname names{};
+    if (::uname(&names) != 0) return "";
+    const std::string name = names.nodename;
+    return name.substr(0, name.find('.'));
+}
+
+}  // namespace host
