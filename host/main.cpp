@@ -229,6 +229,7 @@ int start(int argc, char** argv) {
     setUpProcess();
     try {
         const auto options = readOptions(argc, argv, environmentVariable);
+        if (options && options->listing) return std::fputs(options->listing->c_str(), stdout) < 0;
         if (options && options->check) return check(*options);
         if (options) run(*options);
         return 0;

@@ -9,7 +9,7 @@ set -eu
 cd "$(dirname "$0")/.."
 
 packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev libexpat1-dev
-libsqlite3-dev libssl-dev libboost-dev nlohmann-json3-dev libcli11-dev mksh curl pkgconf procps
+libsqlite3-dev libssl-dev libboost-dev nlohmann-json3-dev libcli11-dev libtomlplusplus-dev mksh curl pkgconf procps
 shellcheck clang libclang-rt-dev'
 # Programs that only judge the product from outside; their tests are skipped without them.
 judges='python3-impacket tshark'

@@ -18,6 +18,7 @@
 #include "host/checks/wording.h"
 #include "host/home/run_as_list.h"
 #include "host/home/temporary_directory.h"
+#include "host/process/trusted_file.h"
 
 namespace host {
 namespace {
@@ -27,11 +28,6 @@ namespace fs = std::filesystem;
 /// For what the system knows of one user, in bytes.
 constexpr std::size_t kRoom = std::size_t{16} << 10;
 constexpr std::size_t kMostRoom = std::size_t{1} << 20;
-
-bool isTrusted(const struct stat& found) {
-    return (found.st_uid == ::geteuid() || found.st_uid == 0) &&
-           (found.st_mode & (S_IWGRP | S_IWOTH)) == 0;
-}
 
 /// Whether others than the host's user and root own the file or may write to it.
 bool isLoose(const std::string& path) {

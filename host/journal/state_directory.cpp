@@ -9,6 +9,7 @@
 #include <system_error>
 
 #include "host/process/start_error.h"
+#include "host/process/trusted_file.h"
 
 namespace host {
 namespace {
@@ -34,7 +35,7 @@ void insistOnPrivacy(const std::string& path) {
     struct stat found {};
     if (::stat(path.c_str(), &found) != 0) throw StartError("state directory " + path, errno);
     if (!S_ISDIR(found.st_mode)) throw StartError("state directory " + path + " is a file");
-    if ((found.st_uid != ::geteuid() && found.st_uid != 0) || (found.st_mode & 022U) != 0) {
+    if (!isTrusted(found)) {
         throw StartError("state directory " + path +
                          " may be written to by others; make it the host's own, with mode 0700");
     }

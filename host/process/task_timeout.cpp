@@ -40,6 +40,13 @@ std::optional<int> taskTimeoutIn(const Environment& environment) {
     return set == nullptr ? std::nullopt : secondsIn(set);
 }
 
+int timeoutThatHolds(std::optional<int> given, bool guarded, const Environment& environment) {
+    if (given) return *given;
+    const char* const set = environment(kTimeoutVariable);
+    if (set == nullptr || (guarded && *set == '\0')) return kUsualTimeout;
+    return guarded ? taskTimeoutOf(kTimeoutVariable, set) : secondsIn(set).value_or(0);
+}
+
 void chooseTaskTimeout(std::optional<int> given, bool guarded, const Environment& environment) {
     if (given) {
         ::setenv(kTimeoutVariable, std::to_string(*given).c_str(), 1);

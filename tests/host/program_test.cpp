@@ -75,6 +75,24 @@ protected:
     const std::string socket = scratch.path("s");
 };
 
+TEST_F(HostProgram, PrintsItsConfigurationAndStartsNothing) {
+    const std::string file = scratch.write("zavhost.conf", "\ngrace = 7\n");
+    const ProgramResult result = runProgram(command({"--config", file, "--print-config"}));
+    EXPECT_EQ(result.status, 0);
+    EXPECT_EQ(result.err, "");
+    EXPECT_NE(result.out.find("\nsocket = \"" + socket + "\"  # command line\n"), std::string::npos)
+        << result.out;
+    EXPECT_NE(result.out.find("\ngrace = 7  # " + file + ":2\n"), std::string::npos) << result.out;
+    expectNoFilesLeft();
+}
+
+TEST_F(HostProgram, DoesNotStartWithAConfigurationFileThatItDoesNotUnderstand) {
+    const std::string file = scratch.write("zavhost.conf", "\ngarce = 7\n");
+    EXPECT_EQ(complaint(command({"--config", file})),
+              "zavhost: " + file + ":2: there is no option \"garce\"; did you mean grace?\n");
+    expectNoFilesLeft();
+}
+
 TEST_F(HostProgram, SaysThatItIsReadyAndNothingElse) {
     const auto program = start();
     EXPECT_EQ(program->out(), "ready: " + socket + "\n");

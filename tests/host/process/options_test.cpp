@@ -206,6 +206,88 @@ TEST_F(Options, NumbersAreExplainedInWords) {
               "--task-timeout takes a number of seconds from 1 to 2147483646, not \"5m\"");
 }
 
+TEST_F(Options, TheConfigurationFileGivesWhatTheCommandLineLeavesOut) {
+    environment["TOVRINHOME"] = scratch.makeDir("other");
+    environment["TIMEOUT"] = "45";
+    const std::string file = scratch.write("zavhost.conf", "home = \"" + home +
+                                                               "\"\ngrace = 7\nkeep-rows = 8\n"
+                                                               "task-timeout = 60\n"
+                                                               "unguarded = true\n");
+    const auto options = read({"--config", file.c_str(), "--grace", "9"});
+    EXPECT_EQ(options->home, home) << "it overrides the environment";
+    EXPECT_EQ(options->taskTimeout, 60);
+    EXPECT_EQ(options->grace, std::chrono::seconds(9)) << "the command line overrides it";
+    EXPECT_EQ(options->keepRows, 8);
+    EXPECT_FALSE(options->guarded);
+    EXPECT_TRUE(read({"--config", file.c_str(), "--unguarded=false"})->guarded);
+}
+
+TEST_F(Options, ComplaintsAboutTheConfigurationFileNameItsLine) {
+    const std::string file = scratch.path("zavhost.conf");
+    const auto complaint = [&](const std::string& lines) {
+        scratch.write("zavhost.conf", lines);
+        return errorOf({"--home", home.c_str(), "--config", file.c_str()});
+    };
+    EXPECT_EQ(complaint("\nrpc-port = 70000\n"),
+              file + ":2: rpc-port takes a number from 1 to 65535, not \"70000\"");
+    EXPECT_EQ(complaint("task-timeout = 0\n"),
+              file + ":1: task-timeout takes a number of seconds from 1 to 2147483646, not \"0\"");
+    EXPECT_EQ(complaint("on-interrupt = \"maybe\"\n"),
+              file + ":1: on-interrupt takes keep or rerun, not \"maybe\"");
+    EXPECT_EQ(complaint("state = \"\"\n"), file + ":1: the name of the state directory is empty");
+    EXPECT_EQ(complaint("socket = \"\"\n"), file + ":1: the name of a socket is empty");
+    EXPECT_EQ(complaint("no-journal = true\nstate = \"/s\"\n"),
+              file + ":1: no-journal and " + file + ":2: state exclude each other");
+    scratch.write("zavhost.conf", "home = \"/lost\"\n");
+    EXPECT_EQ(errorOf({"--config", file.c_str()}),
+              file + ":1: home /lost: No such file or directory");
+}
+
+TEST_F(Options, TheListingSaysWhatHoldsAndWhereItComesFrom) {
+    environment["STATE_DIRECTORY"] = "/var/lib/zavhost";
+    environment["TIMEOUT"] = "45";
+    const std::string file =
+        scratch.write("zavhost.conf", "home = \"" + home + "\"\nsocket = \"/a\\\\b\"\n");
+    const std::string listing =
+        read({"--config", file.c_str(), "--print-config", "--grace", "9"})->listing.value_or("");
+    EXPECT_EQ(listing, "home = \"" + home + "\"  # " + file +
+                           ":1\n"
+                           "socket = \"/a\\\\b\"  # " +
+                           file +
+                           ":2\n"
+                           "rpc-socket = \"/a\\\\b.rpc\"  # default\n"
+                           "# rpc-port has no value  # default\n"
+                           "# origin-node has no value  # default\n"
+                           "# plugin has no value  # default\n"
+                           "state = \"/var/lib/zavhost\"  # environment, STATE_DIRECTORY\n"
+                           "no-journal = false  # default\n"
+                           "max-queued = 1000  # default\n"
+                           "keep-tasks = 30  # default\n"
+                           "keep-rows = 10000  # default\n"
+                           "orphan-wait = 45  # default\n"
+                           "on-interrupt = \"keep\"  # default\n"
+                           "task-timeout = 45  # environment, TIMEOUT\n"
+                           "grace = 9  # command line\n"
+                           "max-output = 16777216  # default\n"
+                           "log-size = 10485760  # default\n"
+                           "trace-secrets = false  # default\n"
+                           "unguarded = false  # default\n");
+}
+
+TEST_F(Options, TheListingIsAConfigurationFileThatSaysTheSame) {
+    environment["TOVRINHOME"] = home;
+    const std::string listing =
+        read({"--print-config", "--rpc-port", "135", "--origin-node", "a\"\\\x01n"})
+            ->listing.value_or("");
+    const std::string file = scratch.write("zavhost.conf", listing);
+    environment.clear();
+    const auto options = read({"--config", file.c_str()});
+    EXPECT_EQ(options->home, home);
+    EXPECT_EQ(options->rpcPort, 135);
+    EXPECT_EQ(options->originNode, "a\"\\\x01n");
+    EXPECT_FALSE(options->listing);
+}
+
 TEST_F(Options, HelpAndVersionRunNothing) {
     EXPECT_FALSE(read({"--help"}));
     EXPECT_FALSE(read({"--version"}));
