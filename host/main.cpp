@@ -2,7 +2,10 @@
 
 #include <unistd.h>
 
+#include <algorithm>
+#include <chrono>
 #include <csignal>
+#include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
@@ -20,6 +23,7 @@
 #include "host/api/services.h"
 #include "host/api/tasks/interruption.h"
 #include "host/checks/check_list.h"
+#include "host/commands/plugin_threads.h"
 #include "host/commands/recorder.h"
 #include "host/depot/depot_directory.h"
 #include "host/home/parameter_copy.h"
@@ -34,6 +38,11 @@
 #include "host/process/socket_file.h"
 #include "host/process/start_error.h"
 #include "host/process/task_timeout.h"
+#include "host/service/notifier.h"
+#include "host/service/service_environment.h"
+#include "host/service/status_reporter.h"
+#include "host/service/task_status.h"
+#include "host/service/watchdog.h"
 
 namespace host {
 namespace {
@@ -175,7 +184,49 @@ Journal::Settings journalOf(const HostOptions& options) {
             options.keepDays, options.keepRows, !options.guarded && !options.ownState};
 }
 
-void run(const HostOptions& options) {
+SocketFile openSocket(const std::string& path, std::optional<PassedSocket> passed) {
+    if (passed) return SocketFile(path, std::move(passed->descriptor));
+    return SocketFile(path);
+}
+
+/// Half of the time after which the service manager takes the host for dead.
+std::chrono::milliseconds feedingTime(std::chrono::microseconds watchdog) {
+    using std::chrono::milliseconds;
+    return std::clamp(std::chrono::duration_cast<milliseconds>(watchdog / 2), milliseconds(1),
+                      milliseconds(std::chrono::hours(1)));
+}
+
+/// On the thread that serves clients: so its own life is what the service manager hears of.
+void feedWatchdog(HttpServer& server, const Notifier& notifier, const Journal& journal,
+                  const ServiceEnvironment& service) {
+    if (!service.watchdog || !notifier.isWanted()) return;
+    server.every(feedingTime(*service.watchdog), [&notifier, &journal] {
+        const Pulse pulse{PluginThreads::ofProcess().deadline(), journal.commitBegan()};
+        if (isAlive(pulse, std::chrono::steady_clock::now())) notifier.tell("WATCHDOG=1\n");
+    });
+}
+
+/// While nothing has been written down, nothing has changed.
+StatusReporter::Status statusOf(Journal& journal) {
+    return [&journal, known = std::optional<std::uint64_t>(), text = std::string()]() mutable {
+        const std::uint64_t transactions = journal.transactions();
+        if (known == transactions) return text;
+        TaskFilter running;
+        running.state = TaskState::Running;
+        const std::int64_t queued = journal.notBegun();
+        text = taskStatus(queued, journal.newest(running));
+        known = transactions;
+        return text;
+    };
+}
+
+void run(const HostOptions& options, ServiceEnvironment service) {
+    const Notifier notifier(service.notifySocket);
+    std::optional<PassedSocket> passed = takeSocket(service.sockets, "http", options.socket);
+    std::optional<PassedSocket> passedTransfers =
+        takeSocket(service.sockets, "rpc", options.rpcSocket);
+    refuseSuperfluous(service.sockets);
+    const bool keepsListener = passed.has_value();
     ras1::showSecrets(options.traceSecrets || !options.guarded);
     constexpr int kOlderLogs = 3;
     ras1::limitLog(static_cast<std::uint64_t>(options.logSize), kOlderLogs);
@@ -188,8 +239,8 @@ void run(const HostOptions& options) {
     }
     chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
-    SocketFile socket(options.socket);
-    SocketFile transferSocket(options.rpcSocket);
+    SocketFile socket = openSocket(options.socket, std::move(passed));
+    SocketFile transferSocket = openSocket(options.rpcSocket, std::move(passedTransfers));
     const int endDescriptor = catchSignals({SIGTERM, SIGINT});
     const int reopenDescriptor = catchSignals({SIGHUP});
     const int childDescriptor = options.guarded ? catchSignals({SIGCHLD}) : -1;
@@ -208,13 +259,22 @@ void run(const HostOptions& options) {
     ncs::Server transfers({}, &services.transfers);
     serveTransfers(transfers, transferSocket, options);
     HttpServer server(socket.listen(), api, services.counts);
-    server.endWhenReadable(endDescriptor, options.grace);
-    server.whenReadable(reopenDescriptor, [=] { reopenLogs(reopenDescriptor); });
+    if (keepsListener) server.leaveListenerOpen();
+    server.endWhenReadable(endDescriptor, options.grace,
+                           [&notifier] { notifier.tell("STOPPING=1\n"); });
+    server.whenReadable(reopenDescriptor, [&notifier, reopenDescriptor] {
+        notifier.tell(reloadingNotice());
+        reopenLogs(reopenDescriptor);
+        notifier.tell("READY=1\n");
+    });
+    feedWatchdog(server, notifier, services.journal, service);
     if (options.guarded) attendToOrphans(server, childDescriptor);
     services.dispatcher.start(services.leftovers, options.orphanWait,
                               [&services] { describeInterrupted(services); });
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
+    notifier.tellSurely("READY=1\n");
+    const StatusReporter reporter(notifier, statusOf(services.journal));
     server.run();
     services.journal.endCleanly(api.quiet());
     sayWhatWaits(services.journal);
@@ -228,10 +288,12 @@ void run(const HostOptions& options) {
 int start(int argc, char** argv) {
     setUpProcess();
     try {
+        ServiceEnvironment service = readServiceEnvironment(environmentVariable);
+        forgetServiceEnvironment();
         const auto options = readOptions(argc, argv, environmentVariable);
         if (options && options->listing) return std::fputs(options->listing->c_str(), stdout) < 0;
         if (options && options->check) return check(*options);
-        if (options) run(*options);
+        if (options) run(*options, std::move(service));
         return 0;
     } catch (const std::exception& error) {
         std::fprintf(stderr, "zavhost: %s\n", error.what());

@@ -16,6 +16,15 @@ Recorder* PluginThreads::add() {
     return added;
 }
 
+std::optional<std::chrono::steady_clock::time_point> PluginThreads::deadline() const {
+    std::optional<std::chrono::steady_clock::time_point> earliest;
+    for (const std::shared_ptr<Recorder>& recorder : all()) {
+        const auto deadline = recorder->deadline();
+        if (deadline && (!earliest || *deadline < *earliest)) earliest = deadline;
+    }
+    return earliest;
+}
+
 void PluginThreads::hearOutput(const std::shared_ptr<const Recorder::OutputSink>& sink) {
     const embedded::MutexLock lock(lock_);
     sink_ = sink;

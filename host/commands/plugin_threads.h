@@ -1,7 +1,9 @@
 /// What the plug-in's own threads run.
 #pragma once
 
+#include <chrono>
 #include <memory>
+#include <optional>
 #include <vector>
 
 #include "embedded/mutex.h"
@@ -18,6 +20,10 @@ public:
     /// A recorder for another thread.
     Recorder* add();
     std::vector<std::shared_ptr<Recorder>> all() const;
+
+    /// When the time of a command in hand is over, of several the earliest; nothing if there is
+    /// none.
+    std::optional<std::chrono::steady_clock::time_point> deadline() const;
 
     /// From now on `sink` gets what their commands write, in place of an earlier one, for as long
     /// as it lives.

@@ -152,6 +152,8 @@ void Recorder::hearRunner(std::string_view text) {
 void Recorder::hearProcess(const ras1::HeardLine& line, std::string_view text) {
     if (const auto seconds = after(text, trace::kTimeout)) {
         timeout_ = std::chrono::seconds(std::max(0, numberIn(*seconds)));
+        const embedded::MutexLock lock(lock_);
+        deadline_ = began_ + timeout_;
     } else if (const auto pid = after(text, trace::kWaiting)) {
         waitForEnd(numberIn(*pid), line.function == trace::kGivesUp);
     } else if (const auto givenUp = after(text, trace::kGivenUp)) {
@@ -179,6 +181,7 @@ void Recorder::begin(std::string_view line) {
     thread_ = static_cast<pid_t>(::syscall(SYS_gettid));
     Command& command = commands_.emplace_back();
     open_ = true;
+    deadline_.reset();
     static std::atomic<std::uint64_t> commandsHeard{0};
     command.number = ++commandsHeard;
     hidesOutput_ =
@@ -319,6 +322,11 @@ bool Recorder::letCommandsRun() {
 void Recorder::withCommandInHand(const std::function<void(pid_t)>& look) const {
     const embedded::MutexLock lock(lock_);
     look(commandInHand());
+}
+
+std::optional<std::chrono::steady_clock::time_point> Recorder::deadline() const {
+    const embedded::MutexLock lock(lock_);
+    return open_ ? deadline_ : std::nullopt;
 }
 
 /// Where a child has a memory of its own, it cannot say which it is.

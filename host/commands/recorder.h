@@ -70,6 +70,8 @@ public:
     /// Calls `look` with the process of the command in hand, which nobody reaps meanwhile; with 0
     /// if there is none. It must not trace. Any thread.
     void withCommandInHand(const std::function<void(pid_t command)>& look) const;
+    /// When the time of the command in hand is over; nothing if there is none. Any thread.
+    std::optional<std::chrono::steady_clock::time_point> deadline() const;
     /// The adopted orphans when the first command since the last take() started; nothing if there
     /// was none. Any thread.
     std::optional<std::vector<pid_t>> orphansBeforeFirst() const;
@@ -118,7 +120,9 @@ private:
     Ending ending_;
     mutable embedded::Mutex lock_;  // never held in a child, nor while waiting
     std::deque<Command> commands_ ZAV_GUARDED_BY(lock_);
-    bool open_ ZAV_GUARDED_BY(lock_) = false;         ///< the last command has not ended
+    bool open_ ZAV_GUARDED_BY(lock_) = false;  ///< the last command has not ended
+    /// Of the last command; nothing before its time-out is known.
+    std::optional<std::chrono::steady_clock::time_point> deadline_ ZAV_GUARDED_BY(lock_);
     bool hidesOutput_ ZAV_GUARDED_BY(lock_) = false;  ///< its output is a configuration
     secrets::Masker out_ ZAV_GUARDED_BY(lock_);       ///< of its texts, as far as they have come
     secrets::Masker err_ ZAV_GUARDED_BY(lock_);

@@ -65,7 +65,8 @@ struct HttpServer::Implementation {
         : core(handler, counts, limits),
           listener(core.io, duplicate(listenerDescriptor)),
           signal(core.io),
-          timer(core.io) {}
+          timer(core.io),
+          regular(core.io) {}
 
     void awaitConnection();
     void acceptAll();
@@ -76,6 +77,7 @@ struct HttpServer::Implementation {
     void beginEnd(std::chrono::milliseconds grace);
     void pollEnd();
     void pollFlush(Clock::time_point deadline);
+    void awaitRegular();
     template <typename Next>
     void after(std::chrono::milliseconds time, Next next);
 
@@ -85,6 +87,10 @@ struct HttpServer::Implementation {
     std::vector<std::unique_ptr<Watched>> watched;
     Timer timer;
     Clock::time_point deadline;
+    bool leavesListenerOpen = false;
+    Timer regular;
+    std::chrono::milliseconds regularTime{0};
+    std::function<void()> regularAct;
 };
 
 void HttpServer::Implementation::awaitConnection() {
@@ -141,6 +147,15 @@ std::shared_ptr<HttpSession> HttpServer::Implementation::sessionOn(FileDescripto
     return std::make_shared<HttpSession>(core, std::move(stream), peer);
 }
 
+void HttpServer::Implementation::awaitRegular() {
+    regular.expires_after(regularTime);
+    regular.async_wait([this](Error error) {
+        if (error) return;
+        regularAct();
+        awaitRegular();
+    });
+}
+
 template <typename Next>
 void HttpServer::Implementation::after(std::chrono::milliseconds time, Next next) {
     timer.expires_after(time);
@@ -154,7 +169,7 @@ void HttpServer::Implementation::beginEnd(std::chrono::milliseconds grace) {
     core.ending = true;
     deadline = Clock::now() + grace;
     // A client that connects now is refused at once instead of waiting in vain.
-    ::shutdown(listener.native_handle(), SHUT_RDWR);
+    if (!leavesListenerOpen) ::shutdown(listener.native_handle(), SHUT_RDWR);
     Error ignored;
     listener.close(ignored);
     std::vector<std::shared_ptr<Connection>> open;
@@ -209,12 +224,25 @@ void HttpServer::end(std::chrono::milliseconds grace) {
     net::post(implementation.core.io, [&implementation, grace] { implementation.beginEnd(grace); });
 }
 
-void HttpServer::endWhenReadable(int descriptor, std::chrono::milliseconds grace) {
+void HttpServer::leaveListenerOpen() {
+    implementation_->leavesListenerOpen = true;
+}
+
+void HttpServer::every(std::chrono::milliseconds time, std::function<void()> act) {
+    implementation_->regularTime = time;
+    implementation_->regularAct = std::move(act);
+    implementation_->awaitRegular();
+}
+
+void HttpServer::endWhenReadable(int descriptor, std::chrono::milliseconds grace,
+                                 std::function<void()> begins) {
     Implementation& implementation = *implementation_;
     implementation.signal.assign(duplicate(descriptor));
     implementation.signal.async_wait(net::posix::descriptor_base::wait_read,
-                                     [&implementation, grace](Error error) {
-                                         if (!error) implementation.beginEnd(grace);
+                                     [&implementation, grace, begins](Error error) {
+                                         if (error) return;
+                                         if (begins) begins();
+                                         implementation.beginEnd(grace);
                                      });
 }
 

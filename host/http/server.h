@@ -31,8 +31,16 @@ public:
     /// handler is quiet, at most for `grace`, sends what answers and events are left, and then
     /// run() returns. Any thread.
     void end(std::chrono::milliseconds grace);
-    /// Calls end() when `descriptor`, which stays the caller's, becomes readable. Before run().
-    void endWhenReadable(int descriptor, std::chrono::milliseconds grace);
+    /// Calls `begins`, which must not block and must not throw, and then end() when `descriptor`,
+    /// which stays the caller's, becomes readable. Before run().
+    void endWhenReadable(int descriptor, std::chrono::milliseconds grace,
+                         std::function<void()> begins = {});
+    /// The listener stays open for whoever takes over: when the server ends, clients that connect
+    /// wait instead of being refused. Before run().
+    void leaveListenerOpen();
+    /// Calls `act` on the thread of run() each time that this time has passed, until run() returns.
+    /// `act` must not block and must not throw. Before run(), at most once.
+    void every(std::chrono::milliseconds time, std::function<void()> act);
     /// Calls `act` on the thread of run() whenever `descriptor`, which stays the caller's, is
     /// readable. `act` makes it unreadable, must not block and must not throw. Before run().
     void whenReadable(int descriptor, std::function<void()> act);

@@ -122,6 +122,10 @@ public:
     std::string trouble();
     /// Whether there is room for what an outcome may need.
     bool hasRoom() const { return !directory_ || directory_->takeReserve(); }
+    /// Since when a commit that is being written has been; nothing if none is. Never waits.
+    std::optional<std::chrono::steady_clock::time_point> commitBegan() const {
+        return writer_->busySince();
+    }
     /// Transactions so far.
     std::uint64_t transactions() const { return writer_->transactions(); }
 

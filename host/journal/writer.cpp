@@ -104,6 +104,12 @@ void Writer::settle() noexcept {
         changed_.wait(lock);
 }
 
+std::optional<std::chrono::steady_clock::time_point> Writer::busySince() const {
+    const Clock::rep since = busySince_.load();
+    if (since == 0) return std::nullopt;
+    return Clock::time_point(Clock::duration(since));
+}
+
 std::uint64_t Writer::transactions() const {
     const std::lock_guard<std::mutex> lock(lock_);
     return transactions_;
@@ -150,8 +156,10 @@ void Writer::work() {
         std::vector<Change> later = std::exchange(later_, {});
         const bool wipes = wiping_ && (ending_ || Clock::now() >= wipeDue_);
         lock.unlock();
+        busySince_.store(Clock::now().time_since_epoch().count());
         if (!jobs.empty() || !later.empty()) writeAlone(jobs, later);
         const bool wiped = wipes && wipe();
+        busySince_.store(0);
         lock.lock();
         if (wipes) {
             ++wipes_;

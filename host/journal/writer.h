@@ -1,6 +1,7 @@
 /// The one thread that changes the journal.
 #pragma once
 
+#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <cstdint>
@@ -8,6 +9,7 @@
 #include <functional>
 #include <future>
 #include <mutex>
+#include <optional>
 #include <thread>
 #include <utility>
 #include <vector>
@@ -64,6 +66,10 @@ public:
     /// reads for long can keep the log from being cut; it is tried once.
     void settle() noexcept;
 
+    /// Since when the writer has been at the transaction, or the cutting of the log, that it is at;
+    /// nothing if it has nothing to do. Never waits.
+    std::optional<std::chrono::steady_clock::time_point> busySince() const;
+
     /// Transactions that were written so far.
     std::uint64_t transactions() const;
 
@@ -90,6 +96,8 @@ private:
     Database& database_;
     embedded::Mutex* const shared_;  ///< may be null
     const Watch watch_;
+
+    std::atomic<Clock::rep> busySince_{0};  ///< 0: it has nothing to do
 
     mutable std::mutex lock_;  // around everything below
     std::condition_variable changed_;

@@ -9,6 +9,7 @@
 
 #include <cerrno>
 #include <filesystem>
+#include <utility>
 
 #include "host/process/start_error.h"
 
@@ -80,11 +81,20 @@ std::string folderFaultOf(const std::string& socketPath) {
     return "others may write to its directory " + folder + " and could replace it";
 }
 
-SocketFile::SocketFile(const std::string& path) : path_(path) {
+void SocketFile::takePath() {
     const std::string fault = folderFaultOf(path_);
     if (!fault.empty()) throw StartError("socket " + path_ + ": " + fault);
     addressOf(path_);  // throws before a lock file is made for an impossible name
     lock_ = takeLock(path_);
+}
+
+SocketFile::SocketFile(const std::string& path, FileDescriptor passed) : path_(path) {
+    takePath();
+    socket_ = std::move(passed);
+}
+
+SocketFile::SocketFile(const std::string& path) : path_(path) {
+    takePath();
     try {
         replaceStale();
         bind();

@@ -25,6 +25,9 @@ public:
     /// anything else fails. Nobody can
     /// connect before listen().
     explicit SocketFile(const std::string& path);
+    /// Takes a listening socket that somebody else has bound at this path, such as a service
+    /// manager, and leaves its file where it is. Throws StartError as above.
+    SocketFile(const std::string& path, FileDescriptor passed);
     ~SocketFile();
     SocketFile(const SocketFile&) = delete;
     SocketFile& operator=(const SocketFile&) = delete;
@@ -32,11 +35,13 @@ public:
     /// Accepts connections from now on. Returns the descriptor: non-blocking, close-on-exec, owned
     /// by this object. Throws StartError.
     int listen();
-    /// Gives up the path, and removes the socket unless another file has taken its place.
+    /// Gives up the path, and removes the socket unless another file has taken its place or
+    /// somebody else has bound it.
     void remove();
     const std::string& path() const { return path_; }
 
 private:
+    void takePath();
     void replaceStale() const;
     void bind();
 

@@ -11,6 +11,7 @@
 #include <cerrno>
 #include <thread>
 
+#include "host/commands/plugin_threads.h"
 #include "support/host/program.h"
 #include "support/left_running.h"
 #include "support/scoped_env.h"
@@ -253,6 +254,7 @@ TEST_F(Ear, EachThreadIsHeardByItself) {
 TEST_F(Ear, OtherThreadsSeeTheCommandThatAPluginThreadRuns) {
     scratch.script("script", "echo here; until [ -e " + scratch.path("go") +
                                  " ]; do sleep 0.02; done; exit 4");
+    const ScopedEnv timeout("TIMEOUT", "3600");
     Heard heard;
     std::thread pluginThread([&] {
         run(scratch.path("script"));
@@ -263,8 +265,14 @@ TEST_F(Ear, OtherThreadsSeeTheCommandThatAPluginThreadRuns) {
         seen = host::commandsOfPluginThreads();
         return seen.size() == 1 && seen[0].out.text() == "here\n";
     }));
+    const auto deadline = host::PluginThreads::ofProcess().deadline();
+    const auto now = std::chrono::steady_clock::now();
     scratch.write("go", "");
     pluginThread.join();
+    ASSERT_TRUE(deadline);
+    EXPECT_LE(*deadline, now + std::chrono::seconds(3600));
+    EXPECT_GT(*deadline, now);
+    EXPECT_FALSE(host::PluginThreads::ofProcess().deadline()) << "it is over";
     ASSERT_EQ(seen.size(), 1U);
     if (kVforkSharesMemory) {
         EXPECT_GT(seen[0].pid, 0);

@@ -42,6 +42,68 @@ TEST_F(End, IsAtOnceWhenNothingIsUnderWay) {
     EXPECT_FALSE(connect().connected());
 }
 
+TEST_F(End, LeavesAListenerOpenThatSomebodyElseGoesOnWith) {
+    socket.emplace(scratch.path("s"));
+    services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+    api.emplace(*services, host::routes());
+    const int listener = socket->listen();
+    server = std::make_unique<host::HttpServer>(listener, *api, services->counts);
+    server->leaveListenerOpen();
+    server->end(seconds(60));
+    server->run();
+    RawClient waiting = connect();
+    ASSERT_TRUE(waiting.connected());
+    server = std::make_unique<host::HttpServer>(listener, *api, services->counts);
+    serving = std::thread([this] { server->run(); });
+    EXPECT_EQ(waiting.get("/v1/health").status, 200);
+}
+
+TEST_F(End, SaysThatItBegins) {
+    socket.emplace(scratch.path("s"));
+    services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+    api.emplace(*services, host::routes());
+    server = std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts);
+    int ends[2];
+    ASSERT_EQ(::pipe(ends), 0);
+    const host::FileDescriptor reader(ends[0]);
+    host::FileDescriptor writer(ends[1]);
+    int begun = 0;
+    server->endWhenReadable(reader.get(), seconds(60), [&begun] { ++begun; });
+    writer.reset();
+    server->run();
+    EXPECT_EQ(begun, 1);
+}
+
+TEST_F(End, WhatIsRegularGoesOnWhileItWaits) {
+    OpeningGate gate;
+    std::atomic<bool> running{false};
+    table.sampler = [&](rtoxa&) {
+        running = true;
+        gate.wait();
+        return static_cast<int>(OXA_OK);
+    };
+    socket.emplace(scratch.path("s"));
+    services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+    api.emplace(*services, host::routes());
+    server = std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts);
+    std::atomic<int> times{0};
+    server->every(milliseconds(1), [&times] { ++times; });
+    serving = std::thread([this] {
+        server->run();
+        ended = true;
+    });
+    RawClient client = connect();
+    client.sendPost("/v1/query", plainQuery());
+    ASSERT_TRUE(eventually([&] { return running.load(); }));
+    server->end(seconds(60));
+    ASSERT_TRUE(eventually([&] { return !connect().connected(); }));
+    const int before = times;
+    EXPECT_TRUE(eventually([&] { return times > before + 2; }));
+    EXPECT_FALSE(ended);
+    gate.open();
+    EXPECT_TRUE(hasEnded());
+}
+
 TEST_F(End, WaitsForASampleAndSendsItsAnswer) {
     OpeningGate gate;
     std::atomic<bool> running{false};

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "support/gate.h"
+#include "support/host/program.h"
 #include "support/scratch_dir.h"
 
 namespace {
@@ -45,6 +46,22 @@ TEST_F(JournalWriter, ThoseThatWaitShareOneTransaction) {
         other.get();
     EXPECT_EQ(writer.transactions(), 2U);
     EXPECT_EQ(rows(), 50);
+}
+
+TEST_F(JournalWriter, SaysSinceWhenItHasBeenAtATransaction) {
+    Gate gate;
+    Writer writer(database);
+    EXPECT_FALSE(writer.busySince());
+    const auto before = std::chrono::steady_clock::now();
+    auto done = writer.submit([&gate](Database&) { gate.pass(); });
+    ASSERT_TRUE(gate.awaitArrival());
+    const auto since = writer.busySince();
+    ASSERT_TRUE(since);
+    EXPECT_GE(*since, before);
+    EXPECT_LE(*since, std::chrono::steady_clock::now());
+    gate.open();
+    done.get();
+    EXPECT_TRUE(eventually([&writer] { return !writer.busySince(); }));
 }
 
 TEST_F(JournalWriter, TellsOfACommitBeforeWhoeverWaitsForIt) {

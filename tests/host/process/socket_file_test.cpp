@@ -8,6 +8,7 @@
 
 #include <filesystem>
 #include <optional>
+#include <utility>
 
 #include "host/process/start_error.h"
 #include "host/raw_client.h"
@@ -176,6 +177,22 @@ TEST_F(Socket, MayBeInTheWorkingDirectory) {
 TEST_F(Socket, InADirectoryThatIsNotThereIsAnError) {
     const std::string lost = scratch.path("no/host.sock");
     EXPECT_EQ(errorOf(lost), "cannot make " + lost + ".lock: No such file or directory");
+}
+
+TEST_F(Socket, OneThatSomebodyElseBoundStaysWhenItIsGivenUp) {
+    SocketFile theirs(path);
+    host::FileDescriptor passed(::fcntl(theirs.listen(), F_DUPFD_CLOEXEC, 0));
+    ASSERT_EQ(::unlink((path + ".lock").c_str()), 0) << "the one who passes it holds no lock";
+    {
+        SocketFile socket(path, std::move(passed));
+        EXPECT_EQ(socket.path(), path);
+        EXPECT_NE(errorOf(path).find("is in use by a live host"), std::string::npos);
+        EXPECT_GE(socket.listen(), 0);
+        socket.remove();
+    }
+    EXPECT_TRUE(S_ISSOCK(modeOf(path)));
+    EXPECT_FALSE(scratch.exists("host.sock.lock"));
+    EXPECT_TRUE(RawClient(path).connected()) << "it still listens";
 }
 
 }  // namespace

@@ -1,0 +1,50 @@
+/// Keeps the service manager's line about the host up to date.
+#pragma once
+
+#include <chrono>
+#include <condition_variable>
+#include <functional>
+#include <mutex>
+#include <string>
+#include <thread>
+
+#include "host/service/notifier.h"
+
+namespace host {
+
+/// Looks at regular times, on a thread of its own, and sends the status when it has changed. So a
+/// journal that hangs stops this thread only, and a thousand tasks in a second make one message.
+class StatusReporter {
+public:
+    /// The status in one line. Called on the reporter's thread; may throw, which leaves the line as
+    /// it is.
+    using Status = std::function<std::string()>;
+
+    /// The notifier outlives this object. Without somebody to notify, there is no thread.
+    StatusReporter(const Notifier& notifier, Status status,
+                   std::chrono::milliseconds every = std::chrono::seconds(1));
+    /// Calls stop().
+    ~StatusReporter();
+    StatusReporter(const StatusReporter&) = delete;
+    StatusReporter& operator=(const StatusReporter&) = delete;
+
+    /// Sends nothing more. Waits for a look in progress.
+    void stop();
+
+private:
+    void work();
+    void report();
+
+    const Notifier& notifier_;
+    const Status status_;
+    const std::chrono::milliseconds every_;
+    std::string last_;  ///< of the thread alone
+
+    std::mutex lock_;  // around the flag
+    std::condition_variable changed_;
+    bool stopping_ = false;
+
+    std::thread thread_;  ///< last, so that it finds everything else
+};
+
+}  // namespace host

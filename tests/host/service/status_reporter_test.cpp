@@ -1,0 +1,67 @@
+// ctest-label: threaded
+#include "host/service/status_reporter.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <stdexcept>
+
+#include "support/gate.h"
+#include "support/host/notify_socket.h"
+#include "support/scratch_dir.h"
+
+namespace {
+
+using host::Notifier;
+using host::StatusReporter;
+using std::chrono::milliseconds;
+
+class ServiceStatus : public testing::Test {
+protected:
+    ScratchDir scratch;
+    const NotifySocket manager{scratch.path("notify")};
+    const Notifier notifier{scratch.path("notify")};
+};
+
+TEST_F(ServiceStatus, IsSentWhenItHasChangedAndOnlyThen) {
+    std::atomic<int> looks{0};
+    StatusReporter reporter(
+        notifier, [&looks] { return ++looks < 5 ? std::string("idle") : std::string("1 queued"); },
+        milliseconds(1));
+    EXPECT_EQ(manager.next(), "STATUS=idle\n");
+    EXPECT_EQ(manager.next(), "STATUS=1 queued\n");
+    reporter.stop();
+    EXPECT_EQ(manager.next(milliseconds(0)), "");
+}
+
+TEST_F(ServiceStatus, IsSentOnceInALook) {
+    std::atomic<int> looks{0};
+    StatusReporter reporter(
+        notifier, [&looks] { return std::to_string(++looks); }, std::chrono::hours(1));
+    EXPECT_EQ(manager.next(), "STATUS=1\n");
+    reporter.stop();
+    EXPECT_EQ(looks, 1) << "however often it changes";
+}
+
+TEST_F(ServiceStatus, StaysAsItIsWhenItCannotBeFound) {
+    std::atomic<int> looks{0};
+    const StatusReporter reporter(
+        notifier,
+        [&looks] {
+            if (++looks < 3) throw std::runtime_error("the journal hangs");
+            return std::string("idle");
+        },
+        milliseconds(1));
+    EXPECT_EQ(manager.next(), "STATUS=idle\n");
+}
+
+TEST_F(ServiceStatus, IsNotLookedForWhenNobodyWantsIt) {
+    const Notifier nobody("");
+    std::atomic<int> looks{0};
+    StatusReporter reporter(
+        nobody, [&looks] { return std::to_string(++looks); }, milliseconds(1));
+    reporter.stop();
+    EXPECT_EQ(looks, 0);
+}
+
+}  // namespace

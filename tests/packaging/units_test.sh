@@ -1,0 +1,58 @@
+#!/bin/sh
+# The unit files: the service manager understands them, they say what they must, and the host
+# understands the configuration that goes with them.
+#
+#   units_test.sh UNITS ZAVHOST      exits with 77 where there is no systemd-analyze
+set -eu
+units=$1 zavhost=$2
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
+
+fail() {
+    echo "FAIL: $*" >&2
+    exit 1
+}
+
+# The value of a setting in a file, the last one of several.
+setting() {
+    sed -n "s/^$2 *= *//p" "$1" | tail -n 1
+}
+
+expect() {
+    found=$(setting "$1" "$2")
+    [ "$found" = "$3" ] || fail "$1: $2 is \"$found\", not \"$3\""
+}
+
+expect "$units/zavhost.service" Type notify
+expect "$units/zavhost.service" KillMode process
+expect "$units/zavhost.service" Restart on-failure
+[ -n "$(setting "$units/zavhost.service" WatchdogSec)" ] || fail "no watchdog"
+
+# The grace lets a command run to its time-out and 30 s longer, and the manager waits longer still.
+time_out=$(setting "$units/zavhost.conf" task-timeout)
+grace=$(setting "$units/zavhost.conf" grace)
+stop=$(setting "$units/zavhost.service" TimeoutStopSec)
+[ "$grace" -eq $((time_out + 30)) ] || fail "the grace is $grace, the time-out $time_out"
+[ "$stop" -gt "$grace" ] || fail "TimeoutStopSec is $stop, the grace $grace"
+
+# The sockets of the unit are those that the host looks for.
+sed -n 's/^ListenStream=//p' "$units/zavhost.socket" | sort >"$scratch/listens"
+sed -n 's/^\(rpc-\)\{0,1\}socket = "\(.*\)"/\2/p' "$units/zavhost.conf" | sort >"$scratch/expects"
+cmp "$scratch/listens" "$scratch/expects" || fail "the sockets differ"
+
+# The host takes the configuration, but for the home, which need not be there.
+mkdir "$scratch/home"
+sed "s|^home = .*|home = \"$scratch/home\"|" "$units/zavhost.conf" >"$scratch/zavhost.conf"
+chmod 0644 "$scratch/zavhost.conf"
+"$zavhost" --config "$scratch/zavhost.conf" --print-config >"$scratch/listing"
+grep -q "^grace = $grace  # $scratch/zavhost.conf:" "$scratch/listing" || fail "the grace is not taken"
+
+command -v systemd-analyze >/dev/null || exit 77
+# It looks for the program, too: the one that is built stands in for the one that is installed.
+sed "s|^ExecStart=[^ ]*|ExecStart=$zavhost|" "$units/zavhost.service" >"$scratch/zavhost.service"
+cp "$units/zavhost.socket" "$scratch/zavhost.socket"
+said=$(systemd-analyze verify --man=no "$scratch/zavhost.service" "$scratch/zavhost.socket" 2>&1) ||
+    fail "systemd-analyze: $said"
+case $said in
+*"$scratch"* | *zavhost*) fail "systemd-analyze: $said" ;;
+esac
