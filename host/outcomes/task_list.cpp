@@ -206,10 +206,22 @@ void TaskList::endAnswered(Entry entry, const Heard& heard) {
         task.state = judge(entry);
         task.reason = reasonOf(entry);
         keeper_.enterSoon(task);
+    } else if (task.state == TaskState::Refused) {
+        keepRefusal(task);
     } else {
         keeper_.saveSoon(task);
     }
     tellWaiters(task);
+}
+
+/// It is durable before anybody hears of it. Else the host, when it is killed just then, would take
+/// the task for one that it has to hand over again.
+void TaskList::keepRefusal(const Task& task) {
+    try {
+        keeper_.save(task);
+    } catch (const NotKept&) {
+        keeper_.saveSoon(task);
+    }
 }
 
 /// Whether the outcome ends its task.

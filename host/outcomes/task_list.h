@@ -153,6 +153,7 @@ private:
     std::optional<int> readAnswer(Entry& entry, const oxa::Rows& rows, const Heard& heard);
     bool answer(std::uint64_t number, const oxa::Rows& rows, const Heard& heard);
     void endAnswered(Entry entry, const Heard& heard);
+    void keepRefusal(const Task& task);
     void take(const std::string& row, Heard heard);
     std::vector<Task> takeInto(std::uint64_t number, const std::string& row, Heard heard)
         ZAV_REQUIRES(lock_);

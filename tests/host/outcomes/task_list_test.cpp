@@ -548,7 +548,7 @@ TEST_F(Tasks, ASuccessWhoseCommandDiedOfASignalIsAFailure) {
 }
 
 /// A journal on a full disk.
-class FullKeeper final : public host::TaskKeeper {
+class FullKeeper : public host::TaskKeeper {
 public:
     const std::string& identity() const override { return name_; }
     std::int64_t run() const override { return 1; }
@@ -590,6 +590,35 @@ TEST_F(Tasks, OneThatExpiresBeforeItsHandOverIsRecordedIsNotHandedOver) {
     task.way = host::TaskWay::Journal;
     EXPECT_THROW(TaskList::Request(guarded, task), host::TooLate);
     EXPECT_FALSE(guarded.mayRestartHost());
+}
+
+/// Notes which states are kept before it goes on, and which later.
+class NotingKeeper final : public FullKeeper {
+public:
+    void enter(Task& task) override { task.number = 1; }
+    void save(const Task& task) override {
+        if (full) FullKeeper::save(task);
+        saved.push_back(task.state);
+    }
+    void saveSoon(Task task) override { savedSoon.push_back(task.state); }
+
+    bool full = false;
+    std::vector<TaskState> saved;
+    std::vector<TaskState> savedSoon;
+};
+
+TEST_F(Tasks, ARefusalIsKeptBeforeItIsTold) {
+    NotingKeeper keeper;
+    TaskList tasks(*tables, *feed, keeper, true);
+    const auto refuse = [&](const char* transid) {
+        TaskList::Request request(tasks, query(transid, "NOSUCH"), "somebody");
+        EXPECT_TRUE(request.answered(rows(taskRow(transid, "NOSUCH", 1003)), answering(1003)));
+    };
+    refuse("t1");
+    EXPECT_EQ(keeper.saved, std::vector<TaskState>{TaskState::Refused});
+    keeper.full = true;
+    refuse("t2");
+    EXPECT_EQ(keeper.savedSoon, std::vector<TaskState>{TaskState::Refused}) << "when there is room";
 }
 
 class TasksWithoutGuards : public Tasks {
