@@ -18,6 +18,11 @@ namespace host {
 namespace {
 
 constexpr std::chrono::seconds kCommitRetry{1};
+
+/// That a task has begun needs no transaction of its own if its outcome is near, which takes a
+/// second at least: the plug-in waits that long before it publishes one.
+constexpr std::chrono::seconds kBeginningWithin{5};
+constexpr std::chrono::seconds kEndWithin{1};
 /// At most so many events lie between two looks at what is too old.
 constexpr std::size_t kPruneEvery = 1000;
 /// Rows may be more than are to be kept by this part of their number, or one.
@@ -256,7 +261,8 @@ void Journal::handOver(const Task& task) {
 }
 
 void Journal::saveSoon(Task task) {
-    writer_->submitLater(updateOf({std::move(task)}));
+    const std::chrono::seconds within = isOver(task.state) ? kEndWithin : kBeginningWithin;
+    writer_->submitLater(updateOf({std::move(task)}), within);
 }
 
 void Journal::saveOutcome(const std::vector<Task>& tasks, const std::string& row) {

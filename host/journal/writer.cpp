@@ -10,7 +10,7 @@
 namespace host {
 namespace {
 
-constexpr std::chrono::seconds kLater{1};
+constexpr std::chrono::seconds kNextTry{1};
 /// A reader in the way may delay the log's cutting, which then is tried again.
 constexpr std::chrono::milliseconds kWipeDelay{500};
 
@@ -62,10 +62,11 @@ std::future<void> Writer::submit(Change change) {
     return done;
 }
 
-void Writer::submitLater(Change change) {
+void Writer::submitLater(Change change, std::chrono::milliseconds within) {
+    const Clock::time_point due = Clock::now() + within;
     {
         const std::lock_guard<std::mutex> lock(lock_);
-        if (later_.empty()) laterDue_ = Clock::now() + kLater;
+        laterDue_ = later_.empty() ? due : std::min(laterDue_, due);
         later_.push_back(std::move(change));
     }
     changed_.notify_all();
@@ -172,7 +173,7 @@ void Writer::work() {
         }
         if (ending_) later.clear();
         if (!later.empty()) {
-            laterDue_ = Clock::now() + kLater;
+            laterDue_ = Clock::now() + kNextTry;
             later_.insert(later_.begin(), std::make_move_iterator(later.begin()),
                           std::make_move_iterator(later.end()));
         }

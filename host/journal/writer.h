@@ -53,9 +53,9 @@ public:
     /// The future is ready once the change is durable; it throws what the change threw, or
     /// DatabaseError when the transaction could not be written.
     std::future<void> submit(Change change);
-    /// Carried out with the next change that somebody waits for, or after a second. When it fails
-    /// it is tried again, a second later.
-    void submitLater(Change change);
+    /// Carried out with the next change that somebody waits for, or when this time is over. When it
+    /// fails it is tried again, a second later.
+    void submitLater(Change change, std::chrono::milliseconds within = std::chrono::seconds(1));
     /// Carries out what submitLater() got. Returns when it is durable or could not be written.
     void flush() noexcept;
 

@@ -64,6 +64,19 @@ TEST_F(JournalWriter, SaysSinceWhenItHasBeenAtATransaction) {
     EXPECT_TRUE(eventually([&writer] { return !writer.busySince(); }));
 }
 
+TEST_F(JournalWriter, WhatMayWaitLongGoesWithWhatMayNot) {
+    Gate written;
+    Writer writer(database);
+    writer.submitLater(inserting(1), std::chrono::hours(1));
+    writer.submitLater([&written](Database&) { written.pass(); }, std::chrono::milliseconds(1));
+    ASSERT_TRUE(written.awaitArrival());
+    written.open();
+    writer.submitLater(inserting(2), std::chrono::hours(1));
+    writer.submit([](Database&) {}).get();
+    EXPECT_EQ(writer.transactions(), 2U);
+    EXPECT_EQ(rows(), 2);
+}
+
 TEST_F(JournalWriter, TellsOfACommitBeforeWhoeverWaitsForIt) {
     std::string told;
     Writer writer(database, nullptr,
