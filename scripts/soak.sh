@@ -1,7 +1,9 @@
 #!/bin/sh
 # Soaks a host: hundreds of clients ask, command, subscribe, push, send garbage and vanish, while its
-# children are killed and hang and it is stopped and continued. At the end every accepted command
-# must have its outcomes, in order, and the host must hold no more than after the warm-up.
+# children are killed and hang and it is stopped and continued. In the last quarter of the time the
+# host itself is killed at random moments, with SIGKILL, and started again. At the end every command
+# that was accepted must be over in exactly one state, with its outcomes, in order, none may have run
+# twice, and before the kills the host must hold no more than after the warm-up.
 #
 #   scripts/soak.sh [--preset NAME] [OPTION ...] [MINUTES]     native, 10 minutes by default
 #

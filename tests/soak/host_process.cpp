@@ -8,6 +8,7 @@
 
 #include <cerrno>
 #include <chrono>
+#include <filesystem>
 #include <stdexcept>
 #include <thread>
 #include <vector>
@@ -49,22 +50,33 @@ int logFile(const std::string& path) {
 }  // namespace
 
 HostProcess::HostProcess(const std::string& program, const std::string& plugin,
-                         const SoakHome& home) {
+                         const SoakHome& home)
+    : program_(program), plugin_(plugin), home_(home) {
+    start();
+}
+
+void HostProcess::start() {
+    std::filesystem::remove(home_.log("host.out"));  // an earlier one was ready, too
+    ended_ = false;
     pid_ = ::fork();
     if (pid_ == -1) throw std::runtime_error("cannot start a process");
-    if (pid_ == 0) become(program, plugin, home);
+    if (pid_ == 0) become(program_, plugin_, home_);
     for (int i = 0; i < kReadyPauses && running(); ++i) {
-        if (contentOf(home.log("host.out")).find("ready: ") != std::string::npos) return;
+        if (contentOf(home_.log("host.out")).find("ready: ") != std::string::npos) return;
         std::this_thread::sleep_for(kPause);
     }
-    throw std::runtime_error("the host is not ready: " + contentOf(home.log("host.err")));
+    throw std::runtime_error("the host is not ready: " + contentOf(home_.log("host.err")));
 }
 
 HostProcess::~HostProcess() {
-    if (running()) {
-        ::kill(pid_, SIGKILL);
-        ::waitpid(pid_, nullptr, 0);
-    }
+    kill();
+}
+
+void HostProcess::kill() {
+    if (!running()) return;
+    ::kill(pid_, SIGKILL);
+    ::waitpid(pid_, nullptr, 0);
+    ended_ = true;
 }
 
 bool HostProcess::running() {
@@ -93,9 +105,7 @@ int HostProcess::end(double seconds) {
     const auto limit = std::chrono::steady_clock::now() + std::chrono::duration<double>(seconds);
     while (running()) {
         if (std::chrono::steady_clock::now() >= limit) {
-            ::kill(pid_, SIGKILL);
-            ::waitpid(pid_, nullptr, 0);
-            ended_ = true;
+            kill();
             return -1;
         }
         std::this_thread::sleep_for(kPause);

@@ -23,10 +23,17 @@ public:
     bool running();
     void stop() const;
     void resume() const;
+    /// Ends it at once, without a word to it.
+    void kill();
+    /// Starts it again on the same home, as the constructor does.
+    void start();
     /// Tells it to end and waits; its exit status, 128 + signal, or -1 when it had to be killed.
     int end(double seconds);
 
 private:
+    const std::string program_;
+    const std::string plugin_;
+    const SoakHome& home_;
     pid_t pid_ = -1;
     bool ended_ = false;
     int status_ = -1;

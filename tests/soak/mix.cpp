@@ -48,6 +48,22 @@ void Mix::pass() {
             world_, room && !world_.chance.oneIn(4) ? commands_.queued() : commands_.health()));
     }
     if (now >= nextRush_) joinRush();
+    repeatWhatWasLost();
+}
+
+/// Whoever has lost the answer asks again.
+void Mix::repeatWhatWasLost() {
+    if (world_.repeats.empty()) return;
+    const auto lost = world_.repeats.front();
+    world_.repeats.erase(world_.repeats.begin());
+    crowd_.add(std::make_unique<Requester>(
+        world_, "repeating",
+        [this, lost] {
+            std::vector<Exchange> exchanges;
+            exchanges.push_back(commands_.task(lost.first, lost.second));
+            return exchanges;
+        },
+        1));
 }
 
 /// More than the host has places for: some are told so, and some only see the door.

@@ -21,6 +21,7 @@ private:
     template <typename Make>
     void keepUp(const char* kind, std::size_t share, Make make);
     void joinRush();
+    void repeatWhatWasLost();
     std::unique_ptr<Client> requester();
     std::unique_ptr<Client> subscriber();
     std::unique_ptr<Client> waiting();

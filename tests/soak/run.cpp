@@ -5,12 +5,16 @@
 #include <cinttypes>
 #include <cstdio>
 #include <filesystem>
-#include <stdexcept>
+#include <nlohmann/json.hpp>
+#include <sstream>
 
+#include "soak/answers.h"
 #include "soak/load/requester.h"
-#include "soak/load/subscriber.h"
 
 namespace soak {
+
+using nlohmann::json;
+
 namespace {
 
 constexpr double kProgressSeconds = 10;
@@ -18,6 +22,9 @@ constexpr double kDrainSeconds = 240;
 /// At the latest, one more task has been carried out.
 constexpr double kFenceSeconds = 60;
 constexpr double kHostEndSeconds = 30;
+/// The part of the time in which the host is killed again and again.
+constexpr double kStormyPart = 0.25;
+constexpr double kMeanLifeSeconds = 3;
 /// Children that nobody waits for any more end by themselves within that.
 constexpr double kSettleSeconds = 20;
 /// How far the memory after the warm-up may be exceeded: what the allocator keeps in pieces.
@@ -31,6 +38,16 @@ constexpr bool kMeasuresMemory = true;
 #endif
 
 std::atomic<bool> interruption{false};
+
+/// Without what each start behind a kill says about the tasks that it found.
+std::string unexpectedErrors(const std::string& errors) {
+    std::string unexpected;
+    std::istringstream lines(errors);
+    for (std::string line; std::getline(lines, line);) {
+        if (line.find(" tasks wait") == std::string::npos) unexpected += line + '\n';
+    }
+    return unexpected;
+}
 
 bool holdsMore(const Gauges& before, const Gauges& after) {
     return after.residentKiB > before.residentKiB + kMemoryMarginKiB;
@@ -57,21 +74,24 @@ Run::Run(const Options& options, const SoakHome& home)
 
 Run::Result Run::toTheEnd() {
     const double whole = options_.minutes * 60;
+    const double stormy = whole * kStormyPart;
     const double warmUp = std::min(60.0, whole / 4);
     Gauges before;
     Gauges after;
-    if (openControl()) {
+    if (openControl({})) {
         traffic(warmUp);
         drain();
         before = settledGauges();
         std::printf("%6.0f s  warm: %ld descriptors, %ld threads, %ld KiB resident\n",
                     world_.clock.wall(), before.descriptors, before.threads, before.residentKiB);
-        traffic(whole - warmUp);
+        traffic(whole - warmUp - stormy);
         drain();
         after = settledGauges();
     }
-    if (!interrupted()) judgeTraffic();
     if (!interrupted()) judgeHost(before, after);
+    if (goesOn()) kills(stormy);
+    if (goesOn()) judgeJournal();
+    if (!interrupted()) judgeTraffic();
     weather_.killLeftChildren();
     if (interrupted()) return Result::Interrupted;
     endHost();
@@ -86,11 +106,12 @@ bool Run::goesOn() {
     return !interrupted() && host_.running();
 }
 
-bool Run::openControl() {
-    auto control = std::make_unique<ControlSubscriber>(world_);
-    const ControlSubscriber& opened = *control;
+/// Behind this event, or from now on.
+bool Run::openControl(const std::string& after) {
+    auto control = std::make_unique<ControlSubscriber>(world_, after);
+    control_ = control.get();
     crowd_.add(std::move(control));
-    if (turnUntil(30, [&opened] { return opened.live(); })) return true;
+    if (turnUntil(30, [this] { return control_->live(); })) return true;
     world_.tally.fault("the control subscription cannot be opened");
     return false;
 }
@@ -115,6 +136,35 @@ void Run::traffic(double seconds) {
     weather_.clear();
 }
 
+/// The same traffic on a host that is killed at random moments and started again.
+void Run::kills(double seconds) {
+    world_.draining = false;
+    const double end = world_.clock.wall() + seconds;
+    while (world_.clock.wall() < end) {
+        const double life = world_.chance.seconds(0.2, 2 * kMeanLifeSeconds);
+        traffic(std::min(life, end - world_.clock.wall()));
+        if (!goesOn()) return;
+        const std::string seen = killHost();
+        if (!openControl(seen)) return;
+    }
+    drain();
+}
+
+/// Returns the last event that was seen of it.
+std::string Run::killHost() {
+    weather_.clear();
+    host_.kill();
+    crowd_.loseHost();
+    const std::string seen = control_->position();
+    crowd_.clear();
+    world_.ledger.newLife();
+    world_.tally.count("kills of the host");
+    world_.clock.stop();
+    host_.start();
+    world_.clock.resume();
+    return seen;
+}
+
 void Run::drain() {
     world_.draining = true;
     const bool left = turnUntil(kDrainSeconds, [this] { return crowd_.size() <= 1; });
@@ -128,28 +178,30 @@ void Run::drain() {
     }
     // What clients that have vanished left behind is accepted before the second fence at the
     // latest.
-    if (!awaitFence() || !awaitFence()) {
+    if (!awaitFence(Way::Turn) || !awaitFence(Way::Table) || !awaitFence(Way::Turn)) {
         if (goesOn()) world_.tally.fault("the queue does not come to its end");
     }
 }
 
-/// Tasks are carried out one after the other, so when this one is, those before it are.
-bool Run::awaitFence() {
+/// Tasks of one way are carried out one after the other, so when this one is, those before it are.
+bool Run::awaitFence(Way way) {
     turnUntil(1, [] { return false; });
     const Ledger::Number number = mix_.commands().announceStart();
     crowd_.add(std::make_unique<Requester>(
         world_, "fence",
-        [this, number] {
+        [this, number, way] {
             std::vector<Exchange> exchanges;
-            exchanges.push_back(mix_.commands().announced(number));
+            exchanges.push_back(way == Way::Turn ? mix_.commands().announcedInTurn(number)
+                                                 : mix_.commands().announced(number));
             return exchanges;
         },
         1));
-    while (goesOn() && !world_.ledger.done(number)) {
-        const std::size_t rows = world_.ledger.rows().size();
-        if (!turnUntil(kFenceSeconds, [&] { return world_.ledger.rows().size() > rows; })) break;
+    const auto isOver = [&] { return world_.ledger.entry(number).ends > 0; };
+    while (goesOn() && !isOver()) {
+        const std::uint64_t events = world_.tally.of("events");
+        if (!turnUntil(kFenceSeconds, [&] { return world_.tally.of("events") > events; })) break;
     }
-    return world_.ledger.done(number);
+    return isOver();
 }
 
 Gauges Run::settledGauges() {
@@ -179,6 +231,41 @@ void Run::judgeTraffic() {
         judgeSubscription(record, world_.ledger, world_.tally);
 }
 
+/// What the journal itself says at the end, and what the tasks wrote down.
+void Run::judgeJournal() {
+    std::multimap<std::string, std::string> states;
+    for (std::string position = "?limit=1000"; !position.empty();) {
+        if (!addListed(position, states)) {
+            return world_.tally.fault("the journal does not list its tasks");
+        }
+    }
+    world_.tally.count("tasks listed", states.size());
+    world_.ledger.judgeListed(states, world_.tally);
+    world_.ledger.judgeRuns(contentOf(home_.notes()), world_.tally);
+}
+
+/// Adds a page of the list of tasks; then `position` is the next one's, or empty.
+bool Run::addListed(std::string& position, std::multimap<std::string, std::string>& states) {
+    json page;
+    bool answered = false;
+    const auto ask = [&] {
+        return std::vector<Exchange>{
+            {getRequest("/v1/tasks" + position), nullptr, [&](const Answer* answer) {
+                 page = documentOf(world_, answer, "/v1/tasks");
+                 answered = true;
+             }}};
+    };
+    crowd_.add(std::make_unique<Requester>(world_, "listing", ask, 1));
+    // It is gone before what it refers to is.
+    turnUntil(kDrainSeconds, [&] { return answered && crowd_.size() <= 1; });
+    if (page.is_null()) return false;
+    for (const json& task : page.at("tasks"))
+        states.emplace(task.at("transid"), task.at("state"));
+    const json next = page.at("next");
+    position = next.is_null() ? "" : "?limit=1000&after=" + next.dump();
+    return true;
+}
+
 void Run::judgeHost(const Gauges& before, const Gauges& after) {
     Tally& tally = world_.tally;
     if (!host_.running()) return tally.foremostFault("the host has ended by itself");
@@ -197,7 +284,7 @@ void Run::endHost() {
     const int status = host_.end(kHostEndSeconds);
     Tally& tally = world_.tally;
     if (status != 0) tally.foremostFault("the host ended with status " + std::to_string(status));
-    const std::string errors = contentOf(home_.log("host.err"));
+    const std::string errors = unexpectedErrors(contentOf(home_.log("host.err")));
     if (!errors.empty())
         tally.foremostFault("the host wrote to its standard error: " + errors.substr(0, 4000));
     for (const std::string& socket : {home_.socket(), home_.transferSocket()}) {

@@ -2,11 +2,14 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
+#include <map>
 #include <string>
 
 #include "soak/gauges.h"
 #include "soak/host_process.h"
 #include "soak/load/client.h"
+#include "soak/load/subscriber.h"
 #include "soak/mix.h"
 #include "soak/weather.h"
 
@@ -33,14 +36,18 @@ public:
     static bool interrupted();
 
 private:
-    bool openControl();
+    bool openControl(const std::string& after);
     void traffic(double seconds);
+    void kills(double seconds);
+    std::string killHost();
     void drain();
-    bool awaitFence();
+    bool awaitFence(Way way);
     bool turnUntil(double seconds, const std::function<bool()>& done);
     Gauges settledGauges();
     void judgeHost(const Gauges& before, const Gauges& after);
     void judgeTraffic();
+    void judgeJournal();
+    bool addListed(std::string& position, std::multimap<std::string, std::string>& states);
     void endHost();
     void progress();
     void printTraffic() const;
@@ -56,6 +63,7 @@ private:
     Mix mix_;
     Weather weather_;
     double nextProgress_ = 0;
+    ControlSubscriber* control_ = nullptr;  ///< one of the crowd
 };
 
 }  // namespace soak

@@ -81,7 +81,8 @@ void SoakHome::writePrograms() const {
                                       "Product (%s)\\n' \"$2\" ;;\nesac\n");
     write(home() + "/bin/dynarch.shl", "os=Linux\ncArch=li6263\n");
     const std::string last = "for word; do product=$word; done\n";
-    script(home() + "/bin/TovrinAgent", last + kMoodOfProduct + kMoods);
+    script(home() + "/bin/TovrinAgent", last + "case $product in k[0-9]*) echo $product >>'" +
+                                            notes() + "' ;; esac\n" + kMoodOfProduct + kMoods);
     script(home() + "/bin/uninstall.sh", "product=$2\n" + std::string(kMoodOfProduct) + kMoods);
     script(home() + "/bin/installer", "mood=$1\n" + std::string(kMoods) + "echo installed\n");
 }

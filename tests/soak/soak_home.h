@@ -30,6 +30,9 @@ public:
     std::string transferSocket() const { return socket() + ".rpc"; }
     std::string log(const std::string& name) const { return root_ + "/log/" + name; }
 
+    /// A line per run of a start that writes itself down.
+    std::string notes() const { return log("notes"); }
+
     /// Where all pushed files go, relative to the depot.
     static constexpr const char* kPushDirectory = "push";
     void removePushedFiles() const;

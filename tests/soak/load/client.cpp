@@ -37,6 +37,20 @@ void Crowd::add(std::unique_ptr<Client> client) {
     clients_.push_back(std::move(client));
 }
 
+void Crowd::loseHost() {
+    world_.hostIsDead = true;
+    for (const auto& client : clients_) {
+        if (client->descriptor() >= 0 && client->step(true, false)) client->hostDied();
+    }
+    world_.hostIsDead = false;
+}
+
+void Crowd::clear() {
+    clients_.clear();
+    kinds_.clear();
+    world_.joining.clear();
+}
+
 std::size_t Crowd::count(const std::string& kind) const {
     const auto found = kinds_.find(kind);
     return found == kinds_.end() ? 0 : found->second;

@@ -4,6 +4,7 @@
 #include <map>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "soak/chance.h"
@@ -32,6 +33,10 @@ struct World {
     std::vector<SubscriptionRecord> subscriptions;
     /// Clients that join at the next turn.
     std::vector<std::unique_ptr<Client>> joining;
+    /// Requests to /v1/tasks whose answers were lost, to be made again as they were.
+    std::vector<std::pair<Ledger::Number, std::string>> repeats;
+    /// Set while the host is dead and connections may end in any way.
+    bool hostIsDead = false;
     /// Set while clients are to come to an end by themselves as soon as they can.
     bool draining = false;
 };
@@ -54,6 +59,8 @@ public:
 
     /// Connects, or does the next step; false when the client has come to its end.
     bool step(bool readable, bool writable);
+    /// The host is dead; whatever it had sent has been read.
+    virtual void hostDied() {}
 
 protected:
     /// Called once, when the connection stands.
@@ -81,6 +88,10 @@ public:
     void add(std::unique_ptr<Client> client);
     /// Waits a moment for something to happen and steps whom it concerns.
     void turn();
+    /// The host is dead: all read what it has left for them and come to their end.
+    void loseHost();
+    /// All go, at whatever they are.
+    void clear();
     std::size_t count(const std::string& kind) const;
     std::size_t size() const { return clients_.size(); }
     const std::map<std::string, std::size_t>& kinds() const { return kinds_; }

@@ -1,5 +1,6 @@
 #include "soak/load/commands.h"
 
+#include <cctype>
 #include <nlohmann/json.hpp>
 #include <utility>
 
@@ -16,6 +17,12 @@ Hope hopeFor(const std::string& product) {
     return product == "ux" || product == "db" ? Hope::Success : Hope::Any;
 }
 
+std::string lowerCase(std::string text) {
+    for (char& c : text)
+        c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+    return text;
+}
+
 }  // namespace
 
 struct Commands::Shape {
@@ -23,6 +30,11 @@ struct Commands::Shape {
     std::string product;
     Conditions more;
     Hope hope = Hope::Any;
+    bool notesItsRun = false;  ///< its product is its name, which the agent's script writes down
+
+    std::string productFor(Ledger::Number number) const {
+        return notesItsRun ? Ledger::name(number) : product;
+    }
 };
 
 std::vector<Exchange> Commands::next() {
@@ -76,7 +88,7 @@ Commands::Shape Commands::startStop() {
     const Hope hope = hopeFor(code);
     switch (world_.chance.below(4)) {
         case 0:
-            return {"START", code, {}, hope};
+            return {"START", "", {}, Hope::Success, true};
         case 1:
             return {"START", code, {{"OPTIONAL", "INSTANCE"}, {"TARGETMSN", "one"}}, hope};
         case 2:
@@ -139,12 +151,30 @@ Exchange Commands::make(const Shape& shape, std::size_t burst) {
     }
     const Ledger::Number number =
         world_.ledger.announce(shape.command, sentTarget, restarts ? 2 : 1, shape.hope, burst);
+    if (shape.notesItsRun) world_.ledger.notesItsRun(number);
+    world_.tally.count(restarts ? "INSTALL with restart" : shape.command);
+    // Those of a connection's burst have an order among each other.
+    if (burst == 0 && world_.chance.oneIn(3)) return inTurn(shape, number);
     Conditions where = {{"COMMAND", shape.command},
                         {"TRANSID", world_.ledger.transid(number)},
-                        {"PRODUCT", shape.product}};
+                        {"PRODUCT", shape.productFor(number)}};
     where.insert(where.end(), shape.more.begin(), shape.more.end());
-    world_.tally.count(restarts ? "INSTALL with restart" : shape.command);
     return entered(number, queryBody("KAGREQT", where));
+}
+
+Exchange Commands::inTurn(const Shape& shape, Ledger::Number number) const {
+    json body = {{"command", shape.command},
+                 {"product", shape.productFor(number)},
+                 {"transid", world_.ledger.transid(number)},
+                 {"once", true}};
+    for (const auto& [column, value] : shape.more)
+        body[lowerCase(column)] = value;
+    return task(number, body.dump());
+}
+
+Exchange Commands::announcedInTurn(Ledger::Number number) const {
+    world_.tally.count("START");
+    return inTurn({"START", "ux", {}, Hope::Success, false}, number);
 }
 
 Ledger::Number Commands::announceStart() {
@@ -173,6 +203,35 @@ Exchange Commands::entered(Ledger::Number number, std::string body) const {
                                       " is another one's: " + row.dump());
                 }
                 world.ledger.answered(number, row.at("RETVAL") == 0, now);
+            }};
+}
+
+Exchange Commands::task(Ledger::Number number, const std::string& body) const {
+    World& world = world_;
+    world.ledger.takesItsTurn(number);
+    return {postRequest("/v1/tasks", body),
+            [&world, number] {
+                // A repetition changes nothing about when it was asked for.
+                if (world.ledger.entry(number).sent > 0) return world.tally.count("repetitions");
+                world.ledger.sending(number, world.clock.wall());
+            },
+            [&world, number, body](const Answer* answer) {
+                // That the host is too busy for a repetition says nothing about the request.
+                const bool repeated = world.ledger.entry(number).answer == Ledger::Answer::Unknown;
+                if (answer == nullptr || (repeated && answer->status == 503)) {
+                    world.repeats.emplace_back(number, body);
+                    return world.ledger.lost(number);
+                }
+                const double now = world.clock.wall();
+                if (answer->status == 503) return world.ledger.answered(number, false, now);
+                const json document = json::parse(answer->body, nullptr, false);
+                if (answer->status != 202 || !document.is_object() ||
+                    document.value("transid", "") != world.ledger.transid(number)) {
+                    world.tally.fault(world.ledger.transid(number) + " was answered with status " +
+                                      std::to_string(answer->status) + ": " + answer->body);
+                    return world.ledger.lost(number);
+                }
+                world.ledger.answered(number, true, now);
             }};
 }
 

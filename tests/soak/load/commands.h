@@ -19,6 +19,10 @@ public:
     Exchange queued(std::size_t burst = 0);
     /// A command that is queued, for a request that has been announced.
     Exchange announced(Ledger::Number number) const;
+    /// The same, to be carried out when its turn comes. It may be made any number of times.
+    Exchange announcedInTurn(Ledger::Number number) const;
+    /// A request to /v1/tasks, or its repetition.
+    Exchange task(Ledger::Number number, const std::string& body) const;
     /// A start that always is to succeed; announces it.
     Ledger::Number announceStart();
     /// "GET /v1/health".
@@ -37,6 +41,7 @@ private:
     Exchange refused();
     Exchange make(const Shape& shape, std::size_t burst);
     Exchange entered(Ledger::Number number, std::string body) const;
+    Exchange inTurn(const Shape& shape, Ledger::Number number) const;
     Shape startStop();
     Shape configuration();
     Shape install();

@@ -29,6 +29,15 @@ OutcomeRow outcomeOf(const json& document) {
     return row;
 }
 
+/// Takes the first line, if it begins so, out of `text`; what follows.
+std::string takeLine(std::string& text, const std::string& name) {
+    if (text.rfind(name, 0) != 0) return {};
+    const std::size_t end = std::min(text.size(), text.find('\n'));
+    const std::string value = text.substr(name.size(), end - name.size());
+    text.erase(0, end + 1);
+    return value;
+}
+
 }  // namespace
 
 std::string getRequest(const std::string& target) {
@@ -81,15 +90,19 @@ std::optional<EventMessage> takeEvent(std::string& in) {
         text = in.substr(0, end);
         in.erase(0, end + 2);
     } while (text.rfind(':', 0) == 0);
-    const std::string id = "id: ";
     const std::string gap = "event: gap\ndata: ";
     const std::string data = "data: ";
-    if (text.rfind(id, 0) == 0) text.erase(0, std::min(text.size(), text.find('\n')) + 1);
+    const std::string task = "event: task\ndata: ";
     EventMessage message;
+    message.id = takeLine(text, "id: ");
     try {
         if (text.rfind(gap, 0) == 0) {
             message.gap = true;
             message.lost = json::parse(text.substr(gap.size())).at("missing").get<std::size_t>();
+        } else if (text.rfind(task, 0) == 0) {
+            const json document = json::parse(text.substr(task.size()));
+            message.end = TaskEnd{document.at("transid").get<std::string>(),
+                                  document.at("state").get<std::string>()};
         } else if (text.rfind(data, 0) == 0) {
             message.row = outcomeOf(json::parse(text.substr(data.size())));
         } else {

@@ -27,10 +27,13 @@ std::string queryBody(const std::string& table,
 /// the status -1.
 std::optional<Answer> takeAnswer(std::string& in);
 
-/// One message of an event stream: a row, or how many events are not kept any more.
+/// One message of an event stream: a row, the end of a task, or how many events are not kept any
+/// more.
 struct EventMessage {
+    std::string id;  ///< empty: it has none
     bool gap = false;
     std::size_t lost = 0;
+    std::optional<TaskEnd> end;
     OutcomeRow row;
 };
 

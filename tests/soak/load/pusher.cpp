@@ -81,7 +81,9 @@ bool Pusher::proceed(bool readable, bool writable) {
         const bool open = connection_.fill();
         if (!takePackets()) return false;
         if (!open) {
-            if (stage_ == Stage::Binding) {
+            if (world_.hostIsDead) {
+                world_.tally.count("pushes cut off");
+            } else if (stage_ == Stage::Binding) {
                 world_.tally.count("pushes turned away");
             } else {
                 world_.tally.fault("the host ended a transfer of " + name_);

@@ -84,7 +84,7 @@ bool Requester::takeAnswers() {
 
 bool Requester::cutOff(bool byHost) {
     if (byHost && !pending_.empty()) {
-        if (answeredBefore_) {
+        if (answeredBefore_ && !world_.hostIsDead) {
             world_.tally.fault("the host cut a connection off before answering: " +
                                pending_.front().request);
         } else {

@@ -27,6 +27,7 @@ class Requester final : public Client {
 public:
     /// Asks `rounds` times, and fewer when the traffic comes to its end.
     Requester(World& world, std::string kind, NextExchanges next, std::size_t rounds);
+    void hostDied() override { cutOff(true); }
 
 protected:
     bool begin() override;

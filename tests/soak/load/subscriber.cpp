@@ -1,5 +1,6 @@
 #include "soak/load/subscriber.h"
 
+#include <cstdlib>
 #include <stdexcept>
 
 namespace soak {
@@ -24,7 +25,8 @@ Ledger::Row ledgerRow(World& world, const OutcomeRow& row) {
 }  // namespace
 
 bool ControlSubscriber::begin() {
-    connection_.send(getRequest("/v1/events?table=KAGDYST"));
+    const std::string after = position_.empty() ? "" : "&after=" + position_;
+    connection_.send(getRequest("/v1/events?table=KAGDYST&tasks=1" + after));
     wakeIn(1e9);
     return connection_.flush();
 }
@@ -38,15 +40,41 @@ bool ControlSubscriber::proceed(bool readable, bool) {
         live_ = head.has_value();
     }
     while (const auto message = live_ ? takeEvent(connection_.in()) : std::nullopt) {
-        if (message->gap) {
-            world_.tally.fault("the control subscription lost " + std::to_string(message->lost) +
-                               " rows although it always reads");
-        } else {
-            world_.ledger.outcome(message->row, world_.tally);
-        }
+        take(*message);
     }
-    if (!open) world_.tally.fault("the host ended the control subscription");
+    if (!open && !world_.hostIsDead) {
+        world_.tally.fault("the host ended the control subscription");
+    }
     return open;
+}
+
+void ControlSubscriber::take(const EventMessage& message) {
+    world_.tally.count("events");
+    if (message.gap) {
+        world_.tally.fault("the control subscription lost " + std::to_string(message.lost) +
+                           " rows although it always reads");
+        return;
+    }
+    follow(message.id);
+    if (message.end) {
+        world_.ledger.ended(*message.end, world_.tally);
+    } else {
+        world_.ledger.outcome(message.row, world_.tally);
+    }
+}
+
+/// It gets all events, so their numbers have no gaps, not even when the host has died.
+void ControlSubscriber::follow(const std::string& id) {
+    const std::size_t dash = id.find('-');
+    const std::string journal = id.substr(0, dash);
+    const auto number = [](const std::string& text, std::size_t at) {
+        return std::strtoull(text.c_str() + at + 1, nullptr, 10);
+    };
+    const bool follows = dash != std::string::npos &&
+                         (position_.empty() || (position_.rfind(journal + '-', 0) == 0 &&
+                                                number(id, dash) == number(position_, dash) + 1));
+    if (!follows) world_.tally.fault("event " + id + " came behind " + position_);
+    position_ = id;
 }
 
 Subscriber::Subscriber(World& world, std::string kind, EventFilter filter, Manner manner,
@@ -84,6 +112,7 @@ bool Subscriber::proceed(bool readable, bool) {
     }
     takeRows();
     if (!open) {
+        if (world_.hostIsDead) return breakOff();
         world_.tally.fault("the host ended a subscription");
         return false;
     }
@@ -141,8 +170,8 @@ void Subscriber::takeRows() {
 
 /// A command that was not accepted has no outcome to wait for.
 void Subscriber::lookForAnswer() {
-    const Ledger::State state = world_.ledger.entry(record_.filter.number).state;
-    served_ = served_ || state == Ledger::State::Refused || state == Ledger::State::Unknown;
+    const Ledger::Answer answer = world_.ledger.entry(record_.filter.number).answer;
+    served_ = served_ || answer == Ledger::Answer::Refused || answer == Ledger::Answer::Unknown;
 }
 
 void Subscriber::decideToGo() {
@@ -154,6 +183,16 @@ void Subscriber::decideToGo() {
     record_.cutoff = manner_.goesAtOnce ? 0 : world_.ledger.rows().size();
     leavesAt_ = now() + (manner_.goesAtOnce ? 0 : kLag);
     wakeIn(leavesAt_ - now());
+}
+
+void Subscriber::hostDied() {
+    if (live_) breakOff();
+}
+
+/// What has come must be right; nobody knows how much more would have come.
+bool Subscriber::breakOff() {
+    record_.cutoff = 0;
+    return leave();
 }
 
 bool Subscriber::leave() {

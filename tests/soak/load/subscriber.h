@@ -2,6 +2,8 @@
 #pragma once
 
 #include <functional>
+#include <string>
+#include <utility>
 
 #include "soak/load/client.h"
 #include "soak/load/commands.h"
@@ -12,15 +14,23 @@ namespace soak {
 /// The subscription that sees everything and stays to the end: its rows are the ledger's.
 class ControlSubscriber final : public Client {
 public:
-    explicit ControlSubscriber(World& world) : Client(world, "control", world.home.socket()) {}
+    /// Continues behind this event; without one it begins with the next.
+    explicit ControlSubscriber(World& world, std::string after = {})
+        : Client(world, "control", world.home.socket()), position_(std::move(after)) {}
 
     bool live() const { return live_; }
+    /// The last event that has come.
+    const std::string& position() const { return position_; }
 
 protected:
     bool begin() override;
     bool proceed(bool readable, bool writable) override;
 
 private:
+    void take(const EventMessage& message);
+    void follow(const std::string& id);
+
+    std::string position_;
     bool live_ = false;
 };
 
@@ -39,6 +49,7 @@ public:
                std::function<void()> live = {});
 
     bool wantsToRead() const override;
+    void hostDied() override;
 
 protected:
     bool begin() override;
@@ -50,6 +61,7 @@ private:
     void lookForAnswer();
     void decideToGo();
     bool leave();
+    bool breakOff();
 
     const Manner manner_;
     const std::function<void()> announceLive_;
