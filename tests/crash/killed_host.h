@@ -24,7 +24,8 @@ protected:
 
     static constexpr int kTasksPerRound = 5;
 
-    explicit KilledHost(const Environment& environment = {}) {
+    explicit KilledHost(const Environment& environment = {},
+                        const std::vector<std::string>& moreArguments = {}) {
         home.products({}, "exit 0");
         // A directory can be made only once, so two tasks at a time are seen.
         const std::string notes = home.files().path("notes");
@@ -34,8 +35,9 @@ protected:
                          "echo end $product >>'" + notes + "'\n" + "rmdir '" + busy + "'");
         Environment whole = environment;
         whole.emplace_back("QVSDEPLOY_AGENTDEPOT", home.depot());
-        host.emplace(home.path(), whole, std::vector<std::string>{"--max-queued", "1000000"},
-                     ManagedHost::Guards::On);
+        std::vector<std::string> arguments = {"--max-queued", "1000000"};
+        arguments.insert(arguments.end(), moreArguments.begin(), moreArguments.end());
+        host.emplace(home.path(), whole, arguments, ManagedHost::Guards::On);
     }
 
     /// Status 0 when the host died before it answered.
@@ -50,7 +52,8 @@ protected:
             post("/v1/tasks",
                  {{"command", "START"}, {"product", name}, {"transid", name}, {"force", true}});
         if (reply.status == 0) return std::nullopt;
-        EXPECT_EQ(reply.status, 202U) << reply.body;
+        // Its disk may be full.
+        EXPECT_TRUE(reply.status == 202 || (mayBeFull && reply.status == 503)) << reply.body;
         return reply.status == 202;
     }
     std::optional<bool> askOnTheTable(const std::string& name) const {
@@ -66,20 +69,25 @@ protected:
         EXPECT_TRUE(reply.status == 200 || reply.status == 503) << reply.body;
         return reply.status == 200;
     }
+    /// The names of tasks by what the host said.
+    struct Asked {
+        std::vector<std::string> accepted;
+        std::vector<std::string> refused;
+    };
     /// Asks for tasks until there are enough or the host is dead. Names are letter and number.
-    void load(char letter, int first, std::vector<std::string>& names) const {
+    void load(char letter, int first, Asked& asked) const {
         for (int i = 0; i < kTasksPerRound; ++i) {
             const std::string name = letter + std::to_string(first + i);
             const auto answer = letter == 'j' ? askInTurn(name) : askOnTheTable(name);
             if (!answer) return;
-            if (*answer) names.push_back(name);
+            (*answer ? asked.accepted : asked.refused).push_back(name);
         }
     }
     /// Loads the host in both ways and does this to it after a time.
     template <typename Disturb>
     void loadAndDisturb(int round, std::chrono::microseconds delay, Disturb disturb) {
-        std::vector<std::string> inTurn;
-        std::vector<std::string> onTheTable;
+        Asked inTurn;
+        Asked onTheTable;
         const int first = round * kTasksPerRound;
         std::thread one([&] { load('j', first, inTurn); });
         std::thread other([&] { load('q', first, onTheTable); });
@@ -87,8 +95,10 @@ protected:
         disturb();
         one.join();
         other.join();
-        accepted.insert(accepted.end(), inTurn.begin(), inTurn.end());
-        accepted.insert(accepted.end(), onTheTable.begin(), onTheTable.end());
+        for (const Asked* const asked : {&inTurn, &onTheTable}) {
+            accepted.insert(accepted.end(), asked->accepted.begin(), asked->accepted.end());
+            refused.insert(refused.end(), asked->refused.begin(), asked->refused.end());
+        }
     }
     void loadAndKill(int round, std::chrono::microseconds delay) {
         loadAndDisturb(round, delay, [this] { host->program().signal(SIGKILL); });
@@ -150,6 +160,9 @@ protected:
         for (const std::string& name : accepted) {
             if (tasks.count(name) == 0) found.push_back(name + " was accepted and is missing");
         }
+        for (const std::string& name : refused) {
+            if (tasks.count(name) != 0) found.push_back(name + " was refused and is there");
+        }
         std::map<std::string, int> begun;
         std::map<std::string, int> ended;
         int last = -1;
@@ -177,5 +190,7 @@ protected:
 
     ScriptHome home;
     std::optional<ManagedHost> host;
+    bool mayBeFull = false;
     std::vector<std::string> accepted;
+    std::vector<std::string> refused;
 };

@@ -3,11 +3,8 @@
 
 #include <gtest/gtest.h>
 #include <signal.h>
-#include <sys/mount.h>
 #include <unistd.h>
 
-#include <cerrno>
-#include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -17,6 +14,7 @@
 #include "support/host/script_home.h"
 #include "support/host/starter_home.h"
 #include "support/host/task_batch.h"
+#include "support/small_filesystem.h"
 
 namespace fs = std::filesystem;
 
@@ -272,35 +270,10 @@ TEST(Deploy, AHostKilledInTheMiddleOfAnInstallTellsTheTruthAboutItAfterwards) {
     EXPECT_FALSE(isNamedByAProcess(home.files().path()));
 }
 
-/// A small filesystem of its own, for as long as it exists.
-class SmallFilesystem {
-public:
-    explicit SmallFilesystem(const std::string& path)
-        : path_(path),
-          mounted_(::mount("tmpfs", path.c_str(), "tmpfs", 0, "size=64k") == 0),
-          error_(mounted_ ? 0 : errno) {}
-    ~SmallFilesystem() {
-        if (mounted_) ::umount2(path_.c_str(), MNT_DETACH);
-    }
-    SmallFilesystem(const SmallFilesystem&) = delete;
-    SmallFilesystem& operator=(const SmallFilesystem&) = delete;
-
-    bool mounted() const { return mounted_; }
-    std::string reason() const { return std::strerror(error_); }
-    bool makeReadOnly() const {
-        return ::mount("tmpfs", path_.c_str(), "tmpfs", MS_REMOUNT | MS_RDONLY, nullptr) == 0;
-    }
-
-private:
-    std::string path_;
-    bool mounted_;
-    int error_;
-};
-
 TEST(Deploy, ADepotThatIsFullOrReadOnlyIsAFailureAndNotTheEnd) {
     ScriptHome home;
     home.products({"ux"}, "exit 0");
-    const SmallFilesystem depot(home.files().path("depot"));
+    const SmallFilesystem depot(home.files().path("depot"), 64);
     if (!depot.mounted()) {
         GTEST_SKIP() << "no filesystem can be mounted here: " << depot.reason();
     }
