@@ -51,7 +51,15 @@ is_agent() {
 # and keeper_start; succeeds when that agent runs.
 find_agent() {
     instance_key "$1" "$2"
-    read_pid_file "$state/run/$key.pid" && agent_lives && is_agent "$1" "$2"
+    read_pid_file "$state/run/$key.pid" && agent_lives || return
+    tenths_while 10 has_no_environment
+    is_agent "$1" "$2"
+}
+
+# has_no_environment: how the process agent_pid looks while another program takes the place of its own.
+has_no_environment() {
+    agent_environment=$({ tr '\0' '\n' <"/proc/$agent_pid/environ"; } 2>/dev/null) &&
+        [ -z "$agent_environment" ]
 }
 
 # read_pid_file FILE: sets what find_agent sets; fails when it names no process since this boot.

@@ -421,6 +421,11 @@ std::int64_t TaskList::atWork() const {
     return number;
 }
 
+bool TaskList::isAtWork(std::int64_t number) const {
+    const embedded::MutexLock lock(lock_);
+    return number != 0 && atWork() == number;
+}
+
 void TaskList::tellFollowers(const OutputPiece& piece) {
     std::vector<std::shared_ptr<const Follower>> calls;
     {
@@ -463,8 +468,13 @@ bool TaskList::mayRestartHost() const {
 
 std::optional<Task> TaskList::find(std::string_view name) const {
     std::optional<Task> found = keeper_.find(name);
-    if (found && found->state == TaskState::Running) {
-        append(found->commands, commandsOfPluginThreads());
+    while (found && !isOver(found->state) && isAtWork(found->number)) {
+        std::vector<Command> commands = commandsOfPluginThreads();
+        if (isAtWork(found->number)) {
+            append(found->commands, std::move(commands));
+            break;
+        }
+        found = keeper_.find(name);  // it has ended, and these may be another's
     }
     return found;
 }

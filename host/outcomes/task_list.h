@@ -174,6 +174,7 @@ private:
     void tellWaiters(const Task& task);
     void tellFollowers(const OutputPiece& piece);
     std::int64_t atWork() const ZAV_REQUIRES(lock_);
+    bool isAtWork(std::int64_t number) const;
 
     const bool guarded_;
     TaskKeeper& keeper_;

@@ -279,7 +279,8 @@ TEST_F(ControlJournal, OutputIsShownWhileTheCommandsRunIfItIsWanted) {
     const Words install = talkingInstall("T");
     line.insert(line.end(), install.begin(), install.end());
     Program waiting(line);
-    ASSERT_TRUE(waiting.awaitOutput("install ux (T): accepted\none\n", std::chrono::seconds(20)));
+    ASSERT_TRUE(waiting.awaitOutput("install ux (T): accepted\none\n", std::chrono::seconds(20)))
+        << waiting.out() << waiting.err();
     openGate();
     const ProgramResult result = waiting.wait();
     EXPECT_EQ(result.status, 0) << result.err;

@@ -263,6 +263,21 @@ TEST_F(AgentControl, ProcessThatIsNotTheAgentIsLeftAloneWhateverThePidFileSays) 
     EXPECT_TRUE(lives(stranger.pid()));
 }
 
+TEST_F(AgentControl, AgentThatIsBeingReplacedByItsOwnNextProgramRuns) {
+    // Until the next program has its environment, there is none to see.
+    const auto until = [&](const std::string& file) {
+        return "until [ -e " + inHome(file) + " ]; do sleep 0.02; done; ";
+    };
+    addAgent("tt", until("tmp/started") + "exec env -i /bin/sh -c 'echo >" + inHome("tmp/bare") +
+                       "; " + until("tmp/go") +
+                       "sleep 0.2; exec env AGENT_PRODUCT=tt AGENT_INSTANCE= sleep 600'\n");
+    ASSERT_EQ(agent({"start", "tt"}).status, 0);
+    write("tmp/started", "");
+    ASSERT_TRUE(eventually([&] { return exists("tmp/bare"); }));
+    write("tmp/go", "");
+    EXPECT_EQ(agent({"stop", "tt"}).status, 0);
+}
+
 TEST_F(AgentControl, PidFileOfAnotherInstanceDoesNotLeadToItsAgent) {
     addAgent("tt", kPatient);
     ASSERT_EQ(agent({"start", "-o", "a", "tt"}).status, 0);

@@ -33,19 +33,16 @@ OutputQueue::OutputQueue(const CodePage& codePage) : codePage_(codePage) {}
 void OutputQueue::begin(const Task& task) {
     {
         const embedded::MutexLock lock(lock_);
-        std::map<std::pair<std::uint64_t, bool>, std::uint64_t> seen;
-        for (const Command& command : task.commands) {
-            add(false, command.out.text());
-            add(true, command.err.text());
-            seen[{command.number, false}] = command.out.total();
-            seen[{command.number, true}] = command.err.total();
+        const Task& shown = over_ && !isOver(task.state) ? *over_ : task;
+        for (const Command& command : shown.commands) {
+            addKept(command);
+            if (command.number == 0) ++unnumbered_;
         }
-        if (isOver(task.state)) held_.clear();
-        for (const Held& held : std::exchange(held_, {})) {
-            if (held.end > seen[{held.command, held.isError}]) add(held.isError, held.text);
-        }
+        if (isOver(shown.state)) held_.clear();
+        for (const Held& held : std::exchange(held_, {}))
+            pass({held.command, held.isError, held.text, held.end});
         begun_ = true;
-        if (ended_) addEnd();
+        if (over_) addEnd();
     }
     wake();
 }
@@ -53,9 +50,9 @@ void OutputQueue::begin(const Task& task) {
 void OutputQueue::push(const OutputPiece& piece) {
     {
         const embedded::MutexLock lock(lock_);
-        if (ended_) return;
+        if (over_) return;
         if (begun_) {
-            add(piece.isError, piece.text);
+            pass(piece);
         } else {
             held_.push_back({piece.command, piece.isError, std::string(piece.text), piece.end});
         }
@@ -63,15 +60,37 @@ void OutputQueue::push(const OutputPiece& piece) {
     wake();
 }
 
-void OutputQueue::end(TaskState state) {
+void OutputQueue::end(const Task& over) {
     {
         const embedded::MutexLock lock(lock_);
-        if (ended_) return;
-        ended_ = true;
-        state_ = state;
-        if (begun_) addEnd();
+        if (over_) return;
+        over_ = over;
+        if (begun_) {
+            // A reader who came while the last of it was on its way to the task has not got that.
+            for (std::size_t i = unnumbered_; i < over.commands.size(); ++i)
+                addKept(over.commands[i]);
+            addEnd();
+        }
     }
     wake();
+}
+
+void OutputQueue::addKept(const Command& command) {
+    pass({command.number, false, command.out.text(), command.out.total()});
+    pass({command.number, true, command.err.text(), command.err.total()});
+}
+
+/// Leaves out what has been passed on. Where a command's number is not known, nothing else of it
+/// comes.
+void OutputQueue::pass(const OutputPiece& piece) {
+    std::string_view text = piece.text;
+    if (piece.command != 0) {
+        std::uint64_t& seen = seen_[{piece.command, piece.isError}];
+        if (piece.end <= seen) return;
+        const std::uint64_t fresh = piece.end - std::exchange(seen, piece.end);
+        if (fresh < text.size()) text.remove_prefix(text.size() - static_cast<std::size_t>(fresh));
+    }
+    add(piece.isError, text);
 }
 
 /// Leaves a character that is cut for the next piece.
@@ -126,16 +145,16 @@ std::string OutputQueue::take() {
     if (const std::size_t lost = std::exchange(lost_, 0)) {
         appendEvent(text, {"{\"lost\":" + std::to_string(lost) + "}", "overflow", {}});
     }
-    if (begun_ && ended_ && !endTaken_) {
+    if (begun_ && over_ && !endTaken_) {
         endTaken_ = true;
-        appendEvent(text, {dump({{"state", nameOf(state_)}}), "end", {}});
+        appendEvent(text, {dump({{"state", nameOf(over_->state)}}), "end", {}});
     }
     return text;
 }
 
 bool OutputQueue::empty() const {
     const embedded::MutexLock lock(lock_);
-    return ready_.empty() && lost_ == 0 && (!begun_ || !ended_ || endTaken_);
+    return ready_.empty() && lost_ == 0 && (!begun_ || !over_ || endTaken_);
 }
 
 bool OutputQueue::over() const {

@@ -6,6 +6,7 @@
 #include <functional>
 #include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -34,8 +35,8 @@ public:
     void begin(const Task& task);
     /// A piece that was heard.
     void push(const OutputPiece& piece);
-    /// Nothing more comes.
-    void end(TaskState state);
+    /// Nothing more comes but what this task, which is over, has and the reader has not.
+    void end(const Task& over);
 
     /// From now on calls `wake`, without a lock, when an empty queue gets something; and once here
     /// if there is something.
@@ -53,6 +54,8 @@ private:
         std::string text;
         std::uint64_t end;
     };
+    void addKept(const Command& command) ZAV_REQUIRES(lock_);
+    void pass(const OutputPiece& piece) ZAV_REQUIRES(lock_);
     void add(bool isError, std::string_view text) ZAV_REQUIRES(lock_);
     void addEvent(bool isError, std::string_view text) ZAV_REQUIRES(lock_);
     void addEnd() ZAV_REQUIRES(lock_);
@@ -63,13 +66,16 @@ private:
     mutable embedded::Mutex lock_;
     bool begun_ ZAV_GUARDED_BY(lock_) = false;
     std::vector<Held> held_ ZAV_GUARDED_BY(lock_);  ///< that came before begin()
-    std::string ready_ ZAV_GUARDED_BY(lock_);       ///< events
-    std::size_t lost_ ZAV_GUARDED_BY(lock_) = 0;    ///< bytes that did not fit
+    /// By command and output, how many of its bytes have been passed on.
+    std::map<std::pair<std::uint64_t, bool>, std::uint64_t> seen_ ZAV_GUARDED_BY(lock_);
+    /// The task's first commands, of which begin() had all: the journal keeps no numbers.
+    std::size_t unnumbered_ ZAV_GUARDED_BY(lock_) = 0;
+    std::string ready_ ZAV_GUARDED_BY(lock_);     ///< events
+    std::size_t lost_ ZAV_GUARDED_BY(lock_) = 0;  ///< bytes that did not fit
     /// Of each output the first bytes of a character whose end has not come.
     std::array<std::string, 2> cut_ ZAV_GUARDED_BY(lock_);
-    bool ended_ ZAV_GUARDED_BY(lock_) = false;
     bool endTaken_ ZAV_GUARDED_BY(lock_) = false;
-    TaskState state_ ZAV_GUARDED_BY(lock_) = TaskState::Queued;
+    std::optional<Task> over_ ZAV_GUARDED_BY(lock_);
     std::shared_ptr<const std::function<void()>> wake_ ZAV_GUARDED_BY(lock_);
 };
 

@@ -24,14 +24,14 @@ public:
     /// What is kept.
     void show(const Task& task) {
         queue_->begin(task);
-        queue_->end(task.state);
+        queue_->end(task);
     }
     /// What is kept, and what comes until the task is over.
     void follow(const Task& task) {
         follower_ = services_.tasks.follow(
             task.number, [queue = queue_](const OutputPiece& piece) { queue->push(piece); });
         waiter_ = services_.tasks.awaitEnd(
-            task.id, [queue = queue_](const Task& over) { queue->end(over.state); });
+            task.id, [queue = queue_](const Task& over) { queue->end(over); });
         queue_->begin(services_.tasks.find(task.id).value_or(task));
     }
 

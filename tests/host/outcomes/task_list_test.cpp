@@ -536,6 +536,32 @@ TEST_F(Tasks, WhoFollowsOneHearsWhatItsCommandsWrite) {
     EXPECT_EQ(heard, "out:out\n@4 err:bad\n@4 ");
 }
 
+TEST_F(Tasks, OneThatRunsBeforeItsReplyIsSeenHasItsCommandsSoFar) {
+    const ScratchDir scratch;
+    const std::string script = scratch.script(
+        "script", "echo early; until [ -e '" + scratch.path("go") + "' ]; do sleep 0.02; done");
+    Task entered;
+    entered.transid = "t1";
+    entered.way = host::TaskWay::Journal;
+    entered.conditions = {{"TRANSID", OPER_EQ, "t1"}, {"COMMAND", OPER_EQ, "START"}};
+    journal.enter(entered);
+    TaskList::Request request(*list, entered);
+    std::thread executor([&] {
+        work(script);
+        publish("t1");
+    });
+    std::optional<Task> task;
+    EXPECT_TRUE(eventually([&] {
+        task = list->find("t1");
+        return task && !task->commands.empty() && task->commands.back().out.text() == "early\n";
+    }));
+    EXPECT_EQ(task->state, TaskState::Queued);
+    scratch.write("go", "");
+    executor.join();
+    request.answered(rows(taskRow("t1", "START", 0)), answering(0));
+    EXPECT_EQ(list->find("t1")->commands.size(), 1U);
+}
+
 TEST_F(Tasks, ASuccessWhoseCommandDiedOfASignalIsAFailure) {
     const ScratchDir scratch;
     ask("t1");

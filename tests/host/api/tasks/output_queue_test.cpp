@@ -30,6 +30,13 @@ protected:
         queue.push({1, isError, text, end});
     }
 
+    /// The end of a task whose commands were all heard.
+    void end(TaskState state) {
+        Task over;
+        over.state = state;
+        queue.end(over);
+    }
+
     const host::CodePage codePage{"UTF-8"};
     OutputQueue queue{codePage};
 };
@@ -42,7 +49,7 @@ TEST_F(Output, IsWhatIsKeptThenWhatComesThenTheEnd) {
     EXPECT_TRUE(queue.empty());
     EXPECT_FALSE(queue.over());
     push("three\n", 14);
-    queue.end(TaskState::Done);
+    end(TaskState::Done);
     push("late\n", 19);
     EXPECT_FALSE(queue.over()) << "not everything was taken";
     EXPECT_EQ(queue.take(), event("stdout", "three\\n") + ending("done"));
@@ -60,9 +67,43 @@ TEST_F(Output, HasNoPieceTwice) {
               event("stdout", "one") + event("stdout", "two") + event("stderr", "bad"));
 }
 
+TEST_F(Output, ThatWasKeptBeforeItIsHeardComesOnce) {
+    queue.begin(taskWith("one\n"));
+    push("one\n", 4);
+    push("two\n", 8);
+    EXPECT_EQ(queue.take(), event("stdout", "one\\n") + event("stdout", "two\\n"));
+}
+
+TEST_F(Output, ThatWasNeverHeardComesWithTheEnd) {
+    queue.begin(taskWith("one\n"));
+    Task over = taskWith("one\ntwo\n", "bad\n");
+    over.state = TaskState::Done;
+    queue.end(over);
+    EXPECT_EQ(queue.take(), event("stdout", "one\\n") + event("stdout", "two\\n") +
+                                event("stderr", "bad\\n") + ending("done"));
+}
+
+TEST_F(Output, OfAnEarlierRunComesOnce) {
+    Task task = taskWith("one\n");
+    task.commands[0].number = 0;
+    queue.begin(task);
+    task.state = TaskState::Done;
+    queue.end(task);
+    EXPECT_EQ(queue.take(), event("stdout", "one\\n") + ending("done"));
+}
+
+TEST_F(Output, OfATaskThatEndsMeanwhileIsAllOfIt) {
+    Task over = taskWith("one\ntwo\n");
+    over.state = TaskState::Done;
+    push("two\n", 8);
+    queue.end(over);
+    queue.begin(taskWith("one\n"));
+    EXPECT_EQ(queue.take(), event("stdout", "one\\ntwo\\n") + ending("done"));
+}
+
 TEST_F(Output, OfATaskThatIsOverIsWhatIsKept) {
     push("one", 3);
-    queue.end(TaskState::Failed);
+    end(TaskState::Failed);
     Task task = taskWith("one");
     task.state = TaskState::Failed;
     task.commands[0].number = 0;
@@ -81,7 +122,7 @@ TEST_F(Output, KeepsCharactersOfSeveralBytesWhole) {
                                                          "b"));
     push("\xE2\x82", 6);
     EXPECT_EQ(queue.take(), "");
-    queue.end(TaskState::Done);
+    end(TaskState::Done);
     EXPECT_EQ(queue.take(), event("stdout", "\xEF\xBF\xBD") + ending("done"));
 }
 
@@ -104,7 +145,7 @@ TEST_F(Output, WakesItsReader) {
     const int before = woken;
     push("one", 3);
     EXPECT_EQ(woken, before + 1);
-    queue.end(TaskState::Done);
+    end(TaskState::Done);
     EXPECT_EQ(woken, before + 2);
 }
 
