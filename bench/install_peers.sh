@@ -9,7 +9,7 @@ set -eu
 cd "$(dirname "$0")/.."
 
 tools='gnuplot-nox python3'
-peers='libicu-dev curl rsync openssh-client openssh-server nagios-nrpe-server nagios-nrpe-plugin zabbix-agent'
+peers='libicu-dev curl rsync openssh-client openssh-server nagios-nrpe-server nagios-nrpe-plugin zabbix-agent at task-spooler'
 
 as_root() { if [ "$(id -u)" -eq 0 ]; then "$@"; else sudo "$@"; fi; }
 
@@ -65,6 +65,7 @@ for package in $missing; do
     fi
     case $package in
     openssh-server) service=ssh ;;
+    at) service=atd ;;
     nagios-nrpe-server | zabbix-agent) service=$package ;;
     *) continue ;;
     esac

@@ -89,6 +89,8 @@ step processes
 bench/process_bench.sh --build "$build" --out "$out"
 step requests
 bench/request_bench.sh --build "$build" --out "$out"
+step tasks
+bench/journal_bench.sh --build "$build" --out "$out"
 step transfers
 bench/transfer_bench.sh --build "$build" --out "$out" ||
     echo "a transfer failed, see above; its rows are left out or not met" >&2

@@ -19,6 +19,12 @@ GROWTH_REASONS = {
 }
 
 
+JOURNAL_REASONS = {
+    "submitters": "those that arrive while a transaction is being written share the next one, and the host "
+                  "has 32 threads for requests. On a busy machine fewer of them come in time. ",
+}
+
+
 @dataclass
 class Row:
     what: str
@@ -180,6 +186,21 @@ class Table:
                       [curve.worst_doubling(self._figures)], MOST_PER_DOUBLING,
                       reason=GROWTH_REASONS.get(curve.title, ""))
 
+    def _journal(self):
+        for count, title, limit in (
+                ("accept", "POST of a task to its 202", 1.2),
+                ("outcome", "POST of a task to its outcome", 3.5),
+                ("queue", "a task in a long queue, in all", 2.3),
+                ("submitters", "200 tasks posted at once, each to its 202", 0.1),
+                ("getconfig", "GETCONFIG", 0)):
+            yield Row(f"{title}: syncs of the disk", "without a journal, subtracted",
+                      [self._figures.get(f"journal/{count}")], limit,
+                      reason=JOURNAL_REASONS.get(count, ""))
+        for peer, title in (("tsp", "task-spooler, `tsp -nf true`"), ("at", "`at now`"),
+                            ("systemd_run", "`systemd-run --wait true`")):
+            yield Row("`zavctl start`, from its start to the task's outcome", title,
+                      [self._ratio("journal/time/zavctl", f"journal/time/{peer}")])
+
     def _rest(self):
         seconds = self._figures.get("rest/seconds", 0)
         yield Row(f"host at rest: wake-ups in {seconds:.0f} s", "none",
@@ -190,7 +211,8 @@ class Table:
 
     def rows(self):
         for part in (self._commands, self._requests, self._processes, self._conversions,
-                     self._texts, self._files, self._transfers, self._growth, self._rest):
+                     self._texts, self._files, self._transfers, self._journal, self._growth,
+                     self._rest):
             yield from part()
 
 
