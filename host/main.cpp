@@ -31,6 +31,7 @@
 #include "host/http/server.h"
 #include "host/process/children/orphans.h"
 #include "host/process/home_lock.h"
+#include "host/process/log.h"
 #include "host/process/options.h"
 #include "host/process/plugin_loader.h"
 #include "host/process/setup.h"
@@ -39,8 +40,10 @@
 #include "host/process/start_error.h"
 #include "host/process/task_timeout.h"
 #include "host/service/notifier.h"
+#include "host/service/regularly.h"
 #include "host/service/service_environment.h"
 #include "host/service/status_reporter.h"
+#include "host/service/task_log.h"
 #include "host/service/task_status.h"
 #include "host/service/watchdog.h"
 
@@ -55,9 +58,8 @@ std::vector<oxa::Table> startPlugin(const HostOptions& options) {
     std::vector<oxa::Table> tables = oxa::tables();
     if (tables.empty()) throw StartError("plug-in " + plugin.file() + " offers no tables");
     if (status != 0) {
-        std::fprintf(stderr,
-                     "zavhost: plug-in %s started with status %d; file transfers may fail\n",
-                     plugin.file().c_str(), status);
+        say(Priority::Warning, "plug-in " + plugin.file() + " started with status " +
+                                   std::to_string(status) + "; file transfers may fail");
     }
     return tables;
 }
@@ -92,16 +94,17 @@ int check(const HostOptions& options) {
 void refuseUnfitHome(const HostOptions& options) {
     CheckSubject subject(options, environmentVariable);
     std::string errors;
-    std::string warnings;
+    std::vector<std::string> warnings;
     for (const CheckResult& result : runChecks(subject)) {
         const std::string words = result.check + ": " + wordsOf(result.finding);
         if (result.finding.verdict == Verdict::Error) errors += "; " + words;
         if (result.finding.verdict == Verdict::Warning) {
-            warnings += "zavhost: warning: " + words + "\n";
+            warnings.push_back("warning: " + words);
         }
     }
     if (!errors.empty()) throw StartError("not started (see --check)" + errors);
-    std::fputs(warnings.c_str(), stderr);
+    for (const std::string& warning : warnings)
+        say(Priority::Warning, warning);
 }
 
 /// The port can be reached from where the sockets' files cannot, and what comes through it must not
@@ -122,11 +125,9 @@ void restoreParameters(const std::string& home) {
     } catch (const std::system_error& error) {
         throw StartError(error.what());
     }
-    std::fprintf(
-        stderr,
-        "zavhost: restored %s, which was cut off while a task changed it; look whether the "
-        "change is to be made again\n",
-        copy.file().c_str());
+    say(Priority::Warning, "restored " + copy.file() +
+                               ", which was cut off while a task changed it; look whether the "
+                               "change is to be made again");
 }
 
 /// What a guarded host does before anything of the home is used. Returns the home's lock.
@@ -144,18 +145,15 @@ HomeLock guardStart(const HostOptions& options) {
 void warnOfOwner(const std::string& home) {
     const std::string owner = HomeLock::ownerOf(home);
     if (owner.empty()) return;
-    std::fprintf(stderr,
-                 "zavhost: warning: home %s is in use by %s; both will run commands there at the "
-                 "same time\n",
-                 home.c_str(), owner.c_str());
+    say(Priority::Warning, "warning: home " + home + " is in use by " + owner +
+                               "; both will run commands there at the same time");
 }
 
 /// The trace is the host's only log; what it prints itself goes to its standard outputs.
 void reopenLogs(int signals) {
     forgetSignals(signals);
     if (ras1::reopenLog()) return;
-    std::fprintf(stderr,
-                 "zavhost: the trace log cannot be opened anew; the old one is still used\n");
+    say(Priority::Warning, "the trace log cannot be opened anew; the old one is still used");
 }
 
 /// Ends what a command leaves behind when its time is over, and reaps it. run() is called on the
@@ -173,8 +171,7 @@ void attendToOrphans(HttpServer& server, int childSignals) {
 void sayWhatWaits(Journal& journal) {
     const std::int64_t waiting = journal.notBegun();
     if (waiting > 0) {
-        std::fprintf(stderr, "zavhost: %lld tasks wait for the next start\n",
-                     static_cast<long long>(waiting));
+        say(Priority::Notice, std::to_string(waiting) + " tasks wait for the next start");
     }
 }
 
@@ -218,6 +215,15 @@ StatusReporter::Status statusOf(Journal& journal) {
         known = transactions;
         return text;
     };
+}
+
+/// What cannot be read now is told at the next look.
+void tellOfTasks(TaskLog& log) {
+    try {
+        log.look();
+    } catch (const std::exception&) {
+        // Requests say so to those whom it concerns.
+    }
 }
 
 void run(const HostOptions& options, ServiceEnvironment service) {
@@ -274,8 +280,15 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     notifier.tellSurely("READY=1\n");
+    TaskLog taskLog(services.journal, say);
+    std::optional<Regularly> logging;
+    if (logsToJournal()) logging.emplace(std::chrono::seconds(1), [&] { tellOfTasks(taskLog); });
     const StatusReporter reporter(notifier, statusOf(services.journal));
     server.run();
+    if (logging) {
+        logging->stop();
+        tellOfTasks(taskLog);
+    }
     services.journal.endCleanly(api.quiet());
     sayWhatWaits(services.journal);
     transfers.stop();
@@ -296,7 +309,7 @@ int start(int argc, char** argv) {
         if (options) run(*options, std::move(service));
         return 0;
     } catch (const std::exception& error) {
-        std::fprintf(stderr, "zavhost: %s\n", error.what());
+        say(Priority::Error, error.what());
         return 1;
     }
 }

@@ -3,12 +3,12 @@
 #include <sys/stat.h>
 
 #include <cerrno>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <system_error>
 
+#include "host/process/log.h"
 #include "host/process/start_error.h"
 
 namespace host {
@@ -53,8 +53,7 @@ void provideDepotDirectory(const DepotDirectory& depot) {
     if (!depot.isOwnChoice) return;
     makeDirectory(depot.path);
     ::setenv(kDepotVariable, depot.path.c_str(), 1);
-    std::fprintf(stderr, "zavhost: %s is not set; the depot is %s\n", kDepotVariable,
-                 depot.path.c_str());
+    say(Priority::Notice, std::string(kDepotVariable) + " is not set; the depot is " + depot.path);
 }
 
 void requireDepotDirectory(const DepotDirectory& depot) {

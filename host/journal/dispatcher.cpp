@@ -2,10 +2,10 @@
 
 #include <algorithm>
 #include <csignal>
-#include <cstdio>
 #include <utility>
 
 #include "host/commands/command_ending.h"
+#include "host/process/log.h"
 
 namespace host {
 namespace {
@@ -70,7 +70,7 @@ void Dispatcher::callAlone(const std::function<void()>& call) {
     try {
         call();
     } catch (const std::exception& error) {
-        std::fprintf(stderr, "zavhost: %s\n", error.what());
+        say(Priority::Error, error.what());
     }
 }
 
@@ -93,7 +93,7 @@ bool Dispatcher::tryComplete() {
         if (task && !isOver(task->state)) tasks_.end(complete_(*task));
         return true;
     } catch (const std::exception& error) {
-        std::fprintf(stderr, "zavhost: the end of an install waits: %s\n", error.what());
+        say(Priority::Warning, std::string("the end of an install waits: ") + error.what());
         return false;
     }
 }
@@ -131,7 +131,7 @@ void Dispatcher::work() {
         try {
             found = handOverNext();
         } catch (const std::exception& error) {
-            std::fprintf(stderr, "zavhost: the next task waits: %s\n", error.what());
+            say(Priority::Warning, std::string("the next task waits: ") + error.what());
             if (!pause(kHandOverRetry)) return;
         }
         std::unique_lock<std::mutex> lock(lock_);

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <chrono>
-#include <cstdio>
 #include <memory>
 #include <thread>
 #include <utility>
@@ -11,6 +10,7 @@
 #include "host/journal/schema.h"
 #include "host/journal/task_rows.h"
 #include "host/outcomes/packed_row.h"
+#include "host/process/log.h"
 #include "host/process/start_error.h"
 #include "host/tables/plugin_facts.h"
 
@@ -31,7 +31,7 @@ constexpr std::size_t kSparePart = 10;
 constexpr int kKeptTails = 1000;
 
 void warn(const std::string& text) {
-    std::fprintf(stderr, "zavhost: %s\n", text.c_str());
+    say(Priority::Warning, text);
 }
 
 void removeOldRows(Database& database, int rows) {

@@ -2,10 +2,10 @@
 
 #include <algorithm>
 #include <chrono>
-#include <cstdio>
 #include <utility>
 
 #include "host/journal/commit_step.h"
+#include "host/process/log.h"
 
 namespace host {
 namespace {
@@ -29,7 +29,7 @@ bool isDatabasesFault(const std::exception_ptr& failure) {
     } catch (const DatabaseError&) {
         return true;
     } catch (const std::exception& error) {
-        std::fprintf(stderr, "zavhost: the journal refused a change: %s\n", error.what());
+        say(Priority::Error, std::string("the journal refused a change: ") + error.what());
     }
     return false;
 }
@@ -248,7 +248,7 @@ void Writer::tellOfCommit() noexcept {
     try {
         if (watch_.committed) watch_.committed(database_);
     } catch (const std::exception& error) {
-        std::fprintf(stderr, "zavhost: events of the journal come late: %s\n", error.what());
+        say(Priority::Warning, std::string("events of the journal come late: ") + error.what());
     }
 }
 

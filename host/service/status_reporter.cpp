@@ -7,31 +7,12 @@ namespace host {
 
 StatusReporter::StatusReporter(const Notifier& notifier, Status status,
                                std::chrono::milliseconds every)
-    : notifier_(notifier), status_(std::move(status)), every_(every) {
-    if (notifier_.isWanted()) thread_ = std::thread([this] { work(); });
-}
-
-StatusReporter::~StatusReporter() {
-    stop();
+    : notifier_(notifier), status_(std::move(status)) {
+    if (notifier_.isWanted()) looks_.emplace(every, [this] { report(); });
 }
 
 void StatusReporter::stop() {
-    {
-        const std::lock_guard<std::mutex> lock(lock_);
-        stopping_ = true;
-    }
-    changed_.notify_all();
-    if (thread_.joinable()) thread_.join();
-}
-
-void StatusReporter::work() {
-    std::unique_lock<std::mutex> lock(lock_);
-    while (!stopping_) {
-        lock.unlock();
-        report();
-        lock.lock();
-        changed_.wait_for(lock, every_, [this] { return stopping_; });
-    }
+    if (looks_) looks_->stop();
 }
 
 void StatusReporter::report() {

@@ -2,13 +2,12 @@
 #pragma once
 
 #include <chrono>
-#include <condition_variable>
 #include <functional>
-#include <mutex>
+#include <optional>
 #include <string>
-#include <thread>
 
 #include "host/service/notifier.h"
+#include "host/service/regularly.h"
 
 namespace host {
 
@@ -23,8 +22,6 @@ public:
     /// The notifier outlives this object. Without somebody to notify, there is no thread.
     StatusReporter(const Notifier& notifier, Status status,
                    std::chrono::milliseconds every = std::chrono::seconds(1));
-    /// Calls stop().
-    ~StatusReporter();
     StatusReporter(const StatusReporter&) = delete;
     StatusReporter& operator=(const StatusReporter&) = delete;
 
@@ -32,19 +29,12 @@ public:
     void stop();
 
 private:
-    void work();
     void report();
 
     const Notifier& notifier_;
     const Status status_;
-    const std::chrono::milliseconds every_;
-    std::string last_;  ///< of the thread alone
-
-    std::mutex lock_;  // around the flag
-    std::condition_variable changed_;
-    bool stopping_ = false;
-
-    std::thread thread_;  ///< last, so that it finds everything else
+    std::string last_;                ///< of the thread alone
+    std::optional<Regularly> looks_;  ///< last, so that it finds everything else
 };
 
 }  // namespace host

@@ -19,13 +19,13 @@ std::string printable(std::string_view text) {
     return result;
 }
 
+}  // namespace
+
 std::string wordsForTask(const Task& task) {
     const std::string command = printable(task.value(plugin::kCommandColumn));
     const std::string product = printable(task.value(plugin::kProductColumn));
     return product.empty() ? command : command + " " + product;
 }
-
-}  // namespace
 
 std::string taskStatus(std::int64_t queued, const std::vector<Task>& running) {
     if (queued <= 0 && running.empty()) return "idle";

@@ -105,6 +105,52 @@ TEST_F(ServiceProgram, RefusesANotifySocketThatItCannotUse) {
               "abstract name\n");
 }
 
+class ProgramWithAJournal : public ServiceProgram {
+protected:
+    /// Starts a program whose standard error, a file, is what the system's journal reads.
+    std::unique_ptr<Program> startInto(const std::string& log,
+                                       const std::vector<std::string>& more = {}) const {
+        std::vector<std::string> argv = {
+            "/bin/bash", "-c",
+            "log=$1; shift; exec 2>\"$log\"; export JOURNAL_STREAM=$(stat -c %d:%i \"$log\"); exec "
+            "\"$@\"",
+            "bash", log};
+        const std::vector<std::string> host = command();
+        argv.insert(argv.end(), host.begin(), host.end());
+        argv.insert(argv.end(), more.begin(), more.end());
+        return std::make_unique<Program>(argv);
+    }
+    std::string logged() const { return scratch.read("log"); }
+};
+
+TEST_F(ProgramWithAJournal, SaysWithHighPriorityWhyItDoesNotStart) {
+    EXPECT_EQ(startInto(scratch.path("log"), {"--grace", "soon"})->wait().status, 1);
+    EXPECT_EQ(logged().rfind("<3>", 0), 0U) << logged();
+    EXPECT_EQ(logged().find("zavhost: "), std::string::npos) << logged();
+}
+
+TEST_F(ProgramWithAJournal, SaysWhenATaskBeginsAndWhenItEndsAndNothingElse) {
+    const auto program = startInto(scratch.path("log"));
+    ASSERT_TRUE(program->awaitOutput("ready: ", std::chrono::seconds(30)));
+    work("a", "600000");
+    ASSERT_TRUE(eventually([this] { return logged().find("begins") != std::string::npos; }));
+    const std::string line = logged();
+    EXPECT_EQ(line.rfind("<6>task ", 0), 0U) << line;
+    EXPECT_NE(line.find(" begins: WORK 600000, asked for by "), std::string::npos) << line;
+    EXPECT_EQ(line.find('\n'), line.size() - 1) << line;
+}
+
+TEST_F(ProgramWithAJournal, TellsOfTheLastTaskBeforeItEnds) {
+    const auto program = startInto(scratch.path("log"));
+    ASSERT_TRUE(program->awaitOutput("ready: ", std::chrono::seconds(30)));
+    work("a", "1");
+    ASSERT_TRUE(eventually([this] { return scratch.exists("home/ended-a"); }));
+    program->signal(SIGTERM);
+    EXPECT_EQ(program->wait().status, 0);
+    EXPECT_NE(logged().find(" begins: WORK 1, asked for by "), std::string::npos) << logged();
+    EXPECT_NE(logged().find(" is done after 0 s: WORK 1\n"), std::string::npos) << logged();
+}
+
 /// A listening socket that a child inherits.
 class ListeningSocket {
 public:

@@ -2,12 +2,12 @@
 
 #include <chrono>
 #include <condition_variable>
-#include <cstdio>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include "embedded/mutex.h"
+#include "host/process/log.h"
 
 namespace host {
 namespace {
@@ -109,7 +109,7 @@ void EventPump::work(State& state) {
             step = advance(streams);
         } while (step.more && step.fault.empty());
         if (!step.fault.empty() && last.fault.empty()) {
-            std::fprintf(stderr, "zavhost: events come late: %s\n", step.fault.c_str());
+            say(Priority::Warning, "events come late: " + step.fault);
         }
         last = std::move(step);
     }
