@@ -28,6 +28,7 @@
 #include "host/depot/depot_directory.h"
 #include "host/home/parameter_copy.h"
 #include "host/home/temporary_directory.h"
+#include "host/http/peer.h"
 #include "host/http/server.h"
 #include "host/process/children/orphans.h"
 #include "host/process/home_lock.h"
@@ -66,7 +67,9 @@ std::vector<oxa::Table> startPlugin(const HostOptions& options) {
 
 /// Serves file transfers on a socket of their own, and on a loopback port if one was asked for.
 void serveTransfers(ncs::Server& transfers, SocketFile& socket, const HostOptions& options) {
-    transfers.listen(socket.listen());
+    transfers.listen(socket.listen(), [groups = options.groups](int accepted) {
+        return peerOf(accepted, groups).access == Access::Act;
+    });
     if (!options.rpcPort) return;
     try {
         transfers.listenOnLoopback(*options.rpcPort);
@@ -181,9 +184,10 @@ Journal::Settings journalOf(const HostOptions& options) {
             options.keepDays, options.keepRows, !options.guarded && !options.ownState};
 }
 
-SocketFile openSocket(const std::string& path, std::optional<PassedSocket> passed) {
-    if (passed) return SocketFile(path, std::move(passed->descriptor));
-    return SocketFile(path);
+SocketFile openSocket(const std::string& path, Connects connects,
+                      std::optional<PassedSocket> passed) {
+    if (passed) return SocketFile(path, connects, std::move(passed->descriptor));
+    return SocketFile(path, connects);
 }
 
 /// Half of the time after which the service manager takes the host for dead.
@@ -245,8 +249,9 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     }
     chooseTaskTimeout(options.taskTimeout, options.guarded, environmentVariable);
     ::setenv("TOVRINHOME", options.home.c_str(), 1);
-    SocketFile socket = openSocket(options.socket, std::move(passed));
-    SocketFile transferSocket = openSocket(options.rpcSocket, std::move(passedTransfers));
+    const Connects connects = options.groups.any() ? Connects::Everybody : Connects::Owner;
+    SocketFile socket = openSocket(options.socket, connects, std::move(passed));
+    SocketFile transferSocket = openSocket(options.rpcSocket, connects, std::move(passedTransfers));
     const int endDescriptor = catchSignals({SIGTERM, SIGINT});
     const int reopenDescriptor = catchSignals({SIGHUP});
     const int childDescriptor = options.guarded ? catchSignals({SIGCHLD}) : -1;
@@ -263,8 +268,11 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     services.checkSubject = [options] { return CheckSubject(options, environmentVariable); };
     Api api(services, routes());
     ncs::Server transfers({}, &services.transfers);
+    services.transferServer = [&transfers] { return transfers.counts(); };
     serveTransfers(transfers, transferSocket, options);
-    HttpServer server(socket.listen(), api, services.counts);
+    ServerLimits limits;
+    limits.groups = options.groups;
+    HttpServer server(socket.listen(), api, services.counts, limits);
     if (keepsListener) server.leaveListenerOpen();
     server.endWhenReadable(endDescriptor, options.grace,
                            [&notifier] { notifier.tell("STOPPING=1\n"); });

@@ -27,6 +27,7 @@ extern const Verb kAgentsVerb;
 extern const Verb kEventsVerb;
 extern const Verb kStatusVerb;
 extern const Verb kDoctorVerb;
+extern const Verb kWhoamiVerb;
 extern const Verb kPsVerb;
 extern const Verb kTasksVerb;
 extern const Verb kTaskShowVerb;
@@ -58,6 +59,7 @@ constexpr const Verb* kVerbs[] = {
     &kEventsVerb,           //
     &kStatusVerb,           //
     &kDoctorVerb,           //
+    &kWhoamiVerb,           //
     &kPsVerb,               //
     &kTasksVerb,            //
     &kTaskShowVerb,         //

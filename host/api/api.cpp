@@ -51,10 +51,12 @@ Answer answerTo(Services& services, Call& call) {
     } catch (const BadRequest& bad) {
         return errorReply(400, bad.what());
     } catch (const Refusal& refused) {
+        services.refusals.at(refused.guard()).add();
         return guardReply(refused.httpStatus(), refused.what(), refused.guard(), refused.hint());
     } catch (const DepotError& error) {
         return errorReply(statusOf(error.kind()), error.what());
     } catch (const NotKept& failure) {
+        if (!failure.guard().empty()) services.refusals.at(failure.guard()).add();
         Reply reply = failure.guard().empty()
                           ? errorReply(503, failure.what())
                           : guardReply(503, failure.what(), failure.guard(), "");

@@ -3,7 +3,8 @@
 namespace host {
 
 /// The endpoints. Each has a file of its own in this folder and a row below.
-Endpoint getTables, postQuery, getEvents, getDoctor, getHealth, getReady, getTaskOutput;
+Endpoint getTables, postQuery, getEvents, getDoctor, getHealth, getReady, getMetrics, getTaskOutput;
+Endpoint getWhoami;
 Endpoint postTask, getTasks, getTask, cancelTask;
 Endpoint getDepot, deleteDepot, getDepotSum, getDepotCheck;
 
@@ -63,8 +64,9 @@ std::vector<Route> routes() {
           {"wait", Type::Number, Need::Optional, "seconds to wait for the task's end"},
           {"journal", Type::Text, Need::Optional, "the journal that must be this host's"}}},
 
+        // What commands write may hold anything.
         {"GET", "/v1/tasks/{id}/output", "Streams what a task's commands write.",
-         Access::Read, Runs::OnWorker, getTaskOutput,
+         Access::Act, Runs::OnWorker, getTaskOutput,
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
           {"follow", Type::Flag, Need::Optional, "1: goes on until the task is over"},
           {"journal", Type::Text, Need::Optional, "the journal that must be this host's"}}},
@@ -82,6 +84,12 @@ std::vector<Route> routes() {
 
         {"GET", "/v1/ready", "Whether the host takes and carries out commands, and why not.",
          Access::Read, Runs::OnWorker, getReady},
+
+        {"GET", "/v1/whoami", "Who the client is to the host, and what he may do.",
+         Access::Read, Runs::OnWorker, getWhoami},
+
+        {"GET", "/v1/metrics", "What the host counts, for a monitoring system.",
+         Access::Read, Runs::OnWorker, getMetrics},
 
         {"GET", "/v1/depot", "What the depot holds.",
          Access::Read, Runs::OnWorker, getDepot,

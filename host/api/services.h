@@ -20,6 +20,8 @@
 #include "host/http/worker_pool.h"
 #include "host/journal/dispatcher.h"
 #include "host/journal/journal.h"
+#include "host/metrics/by_label.h"
+#include "host/metrics/counter.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task_list.h"
 #include "host/outcomes/task_watch.h"
@@ -59,6 +61,7 @@ struct Services {
                      {places.state.empty() ? home + "/zavhost" : std::move(places.state)}),
           journal(journalSettings) {
         hearCommands();
+        countInterrupted();
     }
 
     const TableSet tables;
@@ -70,7 +73,10 @@ struct Services {
     std::function<CheckSubject()> checkSubject;
     const Depot depotFiles;
     const TransferRules transferRules{depotFiles, home, codePage, guarded};
-    TransferGate transfers{transferRules};
+    ByLabel<Counter> refusals{refusingGuards()};  ///< by the names of the guards
+    TransferGate transfers{transferRules, &refusals};
+    /// What the server of file transfers counts; main() sets it before it serves.
+    std::function<ncs::Counts()> transferServer;
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
     ServerCounts counts;
     Journal journal;
@@ -86,6 +92,14 @@ struct Services {
         journal, tasks, [this](const Task& task) { return handOver(*this, task); },
         [this](Task task) { return endOfRestartInstall(*this, std::move(task)); }};
     WorkerPool checksums{kChecksumsAtOnce, kWaitingChecksums};  ///< requests for checksums of files
+
+private:
+    /// The end that came with the last end of the host.
+    void countInterrupted() {
+        const Recovered& found = journal.recovered();
+        if (found.interrupted.empty() || found.runsAgain) return;
+        if (const auto task = journal.find(found.interrupted)) tasks.hasEnded(*task);
+    }
 };
 
 }  // namespace host

@@ -30,12 +30,12 @@ namespace fs = std::filesystem;
 
 /// What would keep the host from making a socket, or lets others replace the one that it has made;
 /// "" if nothing does.
-std::string socketFault(const std::string& path) {
+std::string socketFault(const std::string& path, bool shared) {
     if (path.size() >= sizeof(sockaddr_un::sun_path)) {
         return path + " is longer than " + std::to_string(sizeof(sockaddr_un::sun_path) - 1) +
                " bytes";
     }
-    const std::string fault = folderFaultOf(path);
+    const std::string fault = shared ? sharedFolderFaultOf(path) : folderFaultOf(path);
     if (!fault.empty()) return path + ": " + fault;
     struct stat found {};
     if (::lstat(path.c_str(), &found) == 0) {
@@ -101,7 +101,7 @@ CheckFunction checkSockets, checkTimeout, checkLocale, checkJava, checkClock, ch
 Finding checkSockets(CheckSubject& subject) {
     const HostOptions& options = subject.options;
     for (const std::string& path : {options.socket, options.rpcSocket}) {
-        const std::string fault = socketFault(path);
+        const std::string fault = socketFault(path, options.groups.any());
         if (fault.empty()) continue;
         return {
             Verdict::Warning, "the socket cannot be used: " + fault,

@@ -1,5 +1,6 @@
 #include "host/depot/transfer_call.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
 #include <string_view>
@@ -8,7 +9,6 @@ namespace host {
 namespace {
 
 constexpr std::size_t kChunkCapacity = 4096;
-constexpr std::size_t kChunkSize = 4 + kChunkCapacity;
 
 /// Numbers in the caller's byte order, each aligned to its own size. Once something is missing,
 /// everything is 0.
@@ -74,9 +74,13 @@ std::optional<TransferCall> readTransferCall(const ncs::Call& call) {
     const std::uint32_t count = reader.number(2);
     if (lastIndex >= count) return std::nullopt;
     reader.align(4);
-    reader.skip(lastIndex * kChunkSize);
-    found.endsFile = reader.number(4) < kChunkCapacity;
-    if (!reader.ok() || !reader.has(kChunkCapacity)) return std::nullopt;
+    for (std::uint32_t i = 0; i <= lastIndex && reader.ok(); ++i) {
+        const std::uint32_t length = reader.number(4);
+        reader.skip(kChunkCapacity);
+        found.bytes += std::min<std::uint64_t>(length, kChunkCapacity);
+        found.endsFile = length < kChunkCapacity;
+    }
+    if (!reader.ok()) return std::nullopt;
     return found;
 }
 

@@ -1,6 +1,7 @@
 /// A call of the file transfer operation, as far as the host looks into it before the plug-in does.
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 
@@ -13,12 +14,13 @@ struct TransferCall {
     bool startsFile = true;  ///< false: the batch is appended
     /// Whether the last chunk has room left, as only the last one of a file has.
     bool endsFile = false;
+    std::uint64_t bytes = 0;  ///< of the file in all chunks, as their lengths say
 };
 
 /// Whether a call is one of the file transfer.
 bool isTransfer(const ncs::Call& call);
 
-/// Reads what stands before the chunks, and the last chunk's length. Nothing when the parameters
+/// Reads what stands before the chunks, and the chunks' lengths. Nothing when the parameters
 /// are malformed: the plug-in's stub refuses those.
 std::optional<TransferCall> readTransferCall(const ncs::Call& call);
 

@@ -1,6 +1,7 @@
 #include "host/depot/transfer_gate.h"
 
 #include <algorithm>
+#include <new>
 #include <utility>
 
 #include "host/depot/real_path.h"
@@ -31,6 +32,7 @@ std::optional<std::string> TransferGate::before(const ncs::Call& call) {
     if (!isTransfer(call)) return std::nullopt;
     const std::optional<TransferCall> transfer = readTransferCall(call);
     if (!transfer) return std::nullopt;
+    if (transfer->startsFile) counts_.begun.add();
     // Where a name leads is looked up in the file system, which ten thousand small files would
     // feel.
     const std::string destination =
@@ -40,6 +42,7 @@ std::optional<std::string> TransferGate::before(const ncs::Call& call) {
     if (!objection && rules_.guarded()) objection = begin(call.association, *transfer);
     if (!objection) return std::nullopt;
     traceRefusal(__func__, __LINE__, transfer->name, *objection);
+    countRefusal(*objection);
     return transferReply(kTransferRefused);
 }
 
@@ -87,7 +90,29 @@ bool TransferGate::isOneOf(const std::string& name, const std::vector<std::strin
     });
 }
 
+void TransferGate::countRefusal(const Objection& objection) {
+    counts_.failed.add();
+    if (refusals_ != nullptr) refusals_->at(objection.guard).add();
+}
+
+/// After the plug-in has seen the call.
+void TransferGate::count(const ncs::Call& call, int status) {
+    const std::optional<TransferCall> transfer =
+        isTransfer(call) ? readTransferCall(call) : std::nullopt;
+    if (!transfer) return;
+    if (status == 0) {
+        counts_.bytes.add(transfer->bytes);
+    } else {
+        counts_.failed.add();
+    }
+}
+
 void TransferGate::after(const ncs::Call& call, const std::string& reply) noexcept {
+    try {
+        count(call, statusOfReply(reply));
+    } catch (const std::bad_alloc&) {
+        // One transfer is missing in the figures.
+    }
     const embedded::MutexLock lock(lock_);
     const auto found = underWay_.find(call.association);
     if (found == underWay_.end()) return;

@@ -11,8 +11,17 @@
 #include "embedded/ncs_host.h"
 #include "host/depot/transfer_call.h"
 #include "host/depot/transfer_rules.h"
+#include "host/metrics/by_label.h"
+#include "host/metrics/counter.h"
 
 namespace host {
+
+/// What came of the transfers so far. Any thread.
+struct TransferCounts {
+    Counter begun;   ///< files that clients began to send, those that were refused among them
+    Counter failed;  ///< batches that were refused, or that the plug-in did not take
+    Counter bytes;   ///< of files, that the plug-in took
+};
 
 /// Refuses transfers with status 6 before the plug-in sees them: those that the rules forbid and,
 /// when guarded, those of a file that another client is just sending. The protocol does not say
@@ -20,8 +29,9 @@ namespace host {
 /// fails, with the first batch of the client's next file, or with its association. Any thread.
 class TransferGate final : public ncs::CallWatch {
 public:
-    /// The rules outlive this object.
-    explicit TransferGate(const TransferRules& rules) : rules_(rules) {}
+    /// Both outlive this object. `refusals` counts by the name of the guard; may be null.
+    explicit TransferGate(const TransferRules& rules, ByLabel<Counter>* refusals = nullptr)
+        : rules_(rules), refusals_(refusals) {}
 
     std::optional<std::string> before(const ncs::Call& call) override;
     void after(const ncs::Call& call, const std::string& reply) noexcept override;
@@ -34,6 +44,8 @@ public:
     /// directory.
     bool isReceiving(const std::string& destination) const;
 
+    const TransferCounts& counts() const { return counts_; }
+
 private:
     struct Transfer {
         std::string name;
@@ -42,6 +54,8 @@ private:
     };
     using Transfers = std::map<std::uint64_t, Transfer>;
 
+    void count(const ncs::Call& call, int status);
+    void countRefusal(const Objection& objection);
     std::optional<Objection> begin(std::uint64_t association, const TransferCall& call);
     /// Notes the transfer, and returns its number.
     std::uint64_t enter(std::uint64_t association, const TransferCall& call) ZAV_REQUIRES(lock_);
@@ -50,6 +64,8 @@ private:
     bool isOneOf(const std::string& name, const std::vector<std::string>& others) const;
 
     const TransferRules& rules_;
+    ByLabel<Counter>* const refusals_;
+    TransferCounts counts_;
     mutable embedded::Mutex lock_;
     /// What each association is sending.
     Transfers underWay_ ZAV_GUARDED_BY(lock_);

@@ -31,6 +31,17 @@ const std::vector<Guard>& guards() {
     return table;
 }
 
+std::vector<std::string> refusingGuards() {
+    // The others are not asked about conditions: about columns, the journal, what still runs, and
+    // files of the depot.
+    std::vector<std::string> names = {"columns",     "journal",        "leftovers",
+                                      "old-result",  "restart-turn",   "depot-conversion",
+                                      "depot-names", "depot-transfers"};
+    for (const Guard& guard : guards())
+        names.emplace_back(guard.name);
+    return names;
+}
+
 void Guards::admit(CommandRequest& request, bool mayChange) const {
     Machine machine(site_);
     const bool skipsMachine = mayChange || tasks_.mayChange(request.product());

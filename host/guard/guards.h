@@ -30,6 +30,9 @@ private:
     const TaskList& tasks_;
 };
 
+/// The names of all guards that can refuse what a client asks for, wherever in the host they stand.
+std::vector<std::string> refusingGuards();
+
 /// The table of guards, in the order in which they are asked.
 const std::vector<Guard>& guards();
 

@@ -7,6 +7,8 @@
 #include <sstream>
 #include <string_view>
 
+#include "embedded/mutex.h"
+
 namespace host {
 namespace {
 
@@ -18,6 +20,27 @@ constexpr std::size_t kFields = 5;
 /// The shared component cannot be used on these platforms, although it may be listed for them.
 constexpr std::array<std::string_view, 6> kUnusable = {"aix433", "hp102",  "sol273",
                                                        "sol276", "sol278", "sol288"};
+
+/// What readInventory() has read last.
+class InventoryNote {
+public:
+    void set(const LastInventory& inventory) {
+        const embedded::MutexLock lock(lock_);
+        last_ = inventory;
+    }
+    std::optional<LastInventory> get() const {
+        const embedded::MutexLock lock(lock_);
+        return last_;
+    }
+    static InventoryNote& ofProcess() {
+        static InventoryNote note;
+        return note;
+    }
+
+private:
+    mutable embedded::Mutex lock_;
+    std::optional<LastInventory> last_ ZAV_GUARDED_BY(lock_);
+};
 
 /// The pieces between commas and quotes; empty ones count as none.
 std::vector<std::string> fieldsOf(const std::string& line) {
@@ -67,8 +90,14 @@ bool Inventory::has(const std::string& code) const {
 Inventory readInventory(const std::string& home) {
     Inventory inventory;
     inventory.result = runCommand({home + "/bin/cinfo", "-d"}, kLimits);
-    if (inventory.result.succeeded()) inventory.products = productsIn(inventory.result.out);
+    if (!inventory.result.succeeded()) return inventory;
+    inventory.products = productsIn(inventory.result.out);
+    InventoryNote::ofProcess().set({inventory.products.size(), std::chrono::steady_clock::now()});
     return inventory;
+}
+
+std::optional<LastInventory> lastInventory() {
+    return InventoryNote::ofProcess().get();
 }
 
 std::vector<InstalledProduct> productsIn(const std::string& list) {

@@ -1,6 +1,9 @@
 /// The products of a home, as its own inventory program lists them.
 #pragma once
 
+#include <chrono>
+#include <cstddef>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -26,6 +29,15 @@ struct Inventory {
 
 /// Runs `home`/bin/cinfo. Any thread; takes as long as that program, at most ten seconds.
 Inventory readInventory(const std::string& home);
+
+/// What this process knew when it last read an inventory successfully.
+struct LastInventory {
+    std::size_t products = 0;  ///< entries
+    std::chrono::steady_clock::time_point read{};
+};
+
+/// Nothing before the first time. Any thread.
+std::optional<LastInventory> lastInventory();
 
 /// The products in the list that the inventory program prints. Lines that are no entry are ignored,
 /// as the plug-in does.

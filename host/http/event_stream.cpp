@@ -10,8 +10,13 @@ namespace host {
 namespace net = boost::asio;
 namespace http = boost::beast::http;
 
-EventStream::EventStream(ServerCore& core, Stream stream, std::unique_ptr<EventSource> source)
-    : core_(core), stream_(std::move(stream)), source_(std::move(source)), heartbeat_(core.io) {}
+EventStream::EventStream(ServerCore& core, Stream stream, std::unique_ptr<EventSource> source,
+                         bool clientOnlyReads)
+    : core_(core),
+      stream_(std::move(stream)),
+      source_(std::move(source)),
+      onlyReads_(clientOnlyReads),
+      heartbeat_(core.io) {}
 
 EventStream::~EventStream() {
     if (!closed_) --core_.counts.streams;

@@ -15,7 +15,8 @@ namespace host {
 /// ends when the client closes its connection or the host ends; there is no other time-out.
 class EventStream final : public Connection, public std::enable_shared_from_this<EventStream> {
 public:
-    EventStream(ServerCore& core, Stream stream, std::unique_ptr<EventSource> source);
+    EventStream(ServerCore& core, Stream stream, std::unique_ptr<EventSource> source,
+                bool clientOnlyReads);
     ~EventStream() override;
 
     /// Enters the server's books and sends the head, then the events.
@@ -23,6 +24,7 @@ public:
 
     bool quiet() const override;
     void prepareForEnd() override {}
+    bool onlyReads() const override { return onlyReads_; }
 
 private:
     using Error = boost::beast::error_code;
@@ -39,6 +41,7 @@ private:
     ServerCore& core_;
     Stream stream_;
     std::unique_ptr<EventSource> source_;
+    const bool onlyReads_;
     Timer heartbeat_;
     Head head_;
     std::optional<boost::beast::http::response_serializer<boost::beast::http::empty_body>>

@@ -119,12 +119,17 @@ void HttpServer::Implementation::acceptAll() {
 }
 
 void HttpServer::Implementation::admit(FileDescriptor connection) {
-    const Peer peer = peerOf(connection.get());
+    core.counts.accepted.add();
+    const Peer peer = peerOf(connection.get(), core.limits.groups);
     if (peer.access == Access::None) {
-        return refuse(std::move(connection), peer, 403, "this host serves its own user only");
+        return refuse(std::move(connection), peer, 403, servedUsers(core.limits.groups));
     }
     if (core.connections.size() - core.refusals >= core.limits.connections) {
         return refuse(std::move(connection), peer, 503, "too many connections are open");
+    }
+    if (peer.access < Access::Act && core.readers() >= core.limits.readers) {
+        return refuse(std::move(connection), peer, 503,
+                      "too many connections are open for reading only");
     }
     if (const auto session = sessionOn(std::move(connection), peer)) session->serve();
 }
@@ -132,6 +137,7 @@ void HttpServer::Implementation::admit(FileDescriptor connection) {
 /// Every client learns why. As many as the limit says may also send their request first.
 void HttpServer::Implementation::refuse(FileDescriptor connection, const Peer& peer,
                                         unsigned status, std::string_view text) {
+    core.counts.refused.add();
     if (core.refusals >= core.limits.refusals) return turnAway(connection.get(), status, text);
     if (const auto session = sessionOn(std::move(connection), peer)) session->refuse(status, text);
 }

@@ -2,6 +2,7 @@
 /// a member says otherwise.
 #pragma once
 
+#include <algorithm>
 #include <boost/asio/basic_waitable_timer.hpp>
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/local/stream_protocol.hpp>
@@ -35,6 +36,8 @@ public:
     virtual bool quiet() const = 0;
     /// The server ends soon: a connection that does nothing closes, one that waits stops waiting.
     virtual void prepareForEnd() = 0;
+    /// Of a client that may only read.
+    virtual bool onlyReads() const = 0;
 };
 
 struct ServerCore {
@@ -53,8 +56,19 @@ struct ServerCore {
     void add(std::shared_ptr<Connection> connection) {
         Connection* const key = connection.get();
         connections.emplace(key, std::move(connection));
+        counts.connections.set(connections.size());
     }
-    void remove(Connection* connection) { connections.erase(connection); }
+    void remove(Connection* connection) {
+        connections.erase(connection);
+        counts.connections.set(connections.size());
+    }
+
+    /// Connections of clients that may only read.
+    std::size_t readers() const {
+        return static_cast<std::size_t>(
+            std::count_if(connections.begin(), connections.end(),
+                          [](const auto& entry) { return entry.second->onlyReads(); }));
+    }
 
     boost::asio::io_context io{1};  // any thread may post
     const ServerLimits limits;

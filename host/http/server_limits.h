@@ -4,10 +4,14 @@
 #include <chrono>
 #include <cstddef>
 
+#include "host/process/groups.h"
+
 namespace host {
 
 struct ServerLimits {
-    std::size_t connections = 256;      ///< served at a time; further ones get 503
+    std::size_t connections = 256;  ///< served at a time; further ones get 503
+    /// Of those the ones of clients that may only read, so that such clients shut nobody out.
+    std::size_t readers = 128;
     std::size_t refusals = 64;          ///< told so with time to read; further ones in passing
     std::size_t workers = 32;           ///< jobs at a time
     std::size_t waitingRequests = 128;  ///< waiting for a worker; further ones get 503
@@ -18,6 +22,7 @@ struct ServerLimits {
     std::chrono::milliseconds answerTime{30'000};   ///< for the client to take an answer
     std::chrono::milliseconds lingerTime{2'000};    ///< for the client to read the last answer
     std::chrono::milliseconds heartbeat{15'000};    ///< between signs of life on an idle stream
+    AccessGroups groups{};                          ///< served beside the host's user and root
 };
 
 }  // namespace host

@@ -217,7 +217,8 @@ void HttpSession::answer(std::unique_ptr<EventSource> source) {
     const auto self = shared_from_this();  // what the books hold may be all that holds it
     state_ = State::Closed;
     core_.remove(this);
-    std::make_shared<EventStream>(core_, std::move(stream_), std::move(source))->start();
+    std::make_shared<EventStream>(core_, std::move(stream_), std::move(source), onlyReads())
+        ->start();
 }
 
 void HttpSession::answer(Later later) {

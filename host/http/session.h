@@ -28,6 +28,7 @@ public:
     void take(unsigned exchange, Answer answer) override;
     bool quiet() const override;
     void prepareForEnd() override;
+    bool onlyReads() const override { return peer_.access == Access::Read && !refusal_; }
 
 private:
     enum class State { Idle, Reading, Working, Writing, Lingering, Closed };

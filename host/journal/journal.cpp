@@ -437,6 +437,22 @@ std::int64_t Journal::notBegun() {
     });
 }
 
+Journal::Unfinished Journal::unfinished() {
+    return read([](Database& database) {
+        Statement found = database.ask(
+            "SELECT coalesce(sum(state = 0), 0), coalesce(sum(state = 1), 0), "
+            "min(CASE WHEN state = 0 THEN accepted END) FROM tasks WHERE ended IS NULL");
+        Unfinished tasks;
+        if (!found.step()) return tasks;
+        tasks.queued = found.integer(0);
+        tasks.running = found.integer(1);
+        if (const auto oldest = found.maybeInteger(2)) {
+            tasks.oldestQueued = WallClock::time_point(std::chrono::microseconds(*oldest));
+        }
+        return tasks;
+    });
+}
+
 bool Journal::mayChange(const std::string& product) {
     return read([&](Database& database) {
         Statement found = database.ask(

@@ -94,6 +94,16 @@ public:
     std::int64_t waiting();
     /// How many have not begun, those in the plug-in's queue among them.
     std::int64_t notBegun();
+    /// The tasks that are not over.
+    struct Unfinished {
+        std::int64_t queued = 0;  ///< have not begun
+        std::int64_t running = 0;
+        /// When the oldest one that has not begun was accepted.
+        std::optional<WallClock::time_point> oldestQueued;
+    };
+    /// As far as it is durable: what has changed may show a second later. Waits for no disk that
+    /// hangs. Throws DatabaseError.
+    Unfinished unfinished();
     /// Whether a task that the host hands over in its turn is not over and may change whether this
     /// product, in upper or lower case, is installed or which instances it has.
     bool mayChange(const std::string& product);
@@ -128,6 +138,9 @@ public:
     }
     /// Transactions so far.
     std::uint64_t transactions() const { return writer_->transactions(); }
+    /// See Writer.
+    const Histogram& commitTimes() const { return writer_->commitTimes(); }
+    const Counter& failedCommits() const { return writer_->failures(); }
 
 private:
     template <typename Reader>

@@ -14,6 +14,24 @@ constexpr std::chrono::seconds kNextTry{1};
 /// A reader in the way may delay the log's cutting, which then is tried again.
 constexpr std::chrono::milliseconds kWipeDelay{500};
 
+/// From a solid-state disk to one that hangs.
+std::vector<Histogram::Duration> commitBounds() {
+    using std::chrono::milliseconds;
+    return {std::chrono::microseconds(500),
+            milliseconds(1),
+            milliseconds(2),
+            milliseconds(5),
+            milliseconds(10),
+            milliseconds(25),
+            milliseconds(50),
+            milliseconds(100),
+            milliseconds(250),
+            milliseconds(500),
+            milliseconds(1'000),
+            milliseconds(5'000),
+            milliseconds(30'000)};
+}
+
 void rollBack(Database& database) noexcept {
     try {
         if (database.inTransaction()) database.run("ROLLBACK");
@@ -37,7 +55,7 @@ bool isDatabasesFault(const std::exception_ptr& failure) {
 }  // namespace
 
 Writer::Writer(Database& database, embedded::Mutex* shared, Watch watch)
-    : database_(database), shared_(shared), watch_(std::move(watch)) {
+    : database_(database), shared_(shared), watch_(std::move(watch)), commitTimes_(commitBounds()) {
     if (watch_.regular) regularDue_ = Clock::now() + watch_.every;
     thread_ = std::thread([this] { work(); });
 }
@@ -197,6 +215,7 @@ void Writer::write(Jobs& jobs, std::vector<Change>& later) {
         later = tryWrite(jobs, later);
     } catch (...) {
         failure = std::current_exception();
+        failures_.add();
         rollBack(database_);
     }
     for (Job& job : jobs) {
@@ -211,6 +230,7 @@ void Writer::write(Jobs& jobs, std::vector<Change>& later) {
 /// Throws when nothing of it was written. Returns what of `later` has to be tried again.
 std::vector<Writer::Change> Writer::tryWrite(Jobs& jobs, const std::vector<Change>& later) {
     if (watch_.begins) watch_.begins();
+    const Clock::time_point begun = Clock::now();
     database_.run("BEGIN IMMEDIATE");
     std::vector<Change> again;
     for (const Change& change : later) {
@@ -220,6 +240,7 @@ std::vector<Writer::Change> Writer::tryWrite(Jobs& jobs, const std::vector<Chang
         job.failure = attempt(job.change);
     reached(CommitStep::BeforeCommit);
     database_.run("COMMIT");
+    commitTimes_.observe(Clock::now() - begun);
     reached(CommitStep::AfterCommit);
     tellOfCommit();
     const std::lock_guard<std::mutex> lock(lock_);

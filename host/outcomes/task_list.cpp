@@ -211,7 +211,7 @@ void TaskList::endAnswered(Entry entry, const Heard& heard) {
     } else {
         keeper_.saveSoon(task);
     }
-    tellWaiters(task);
+    tellOfEnd(task);
 }
 
 /// It is durable before anybody hears of it. Else the host, when it is killed just then, would take
@@ -300,7 +300,7 @@ void TaskList::noteKept(std::uint64_t number, bool answeredMeanwhile) {
         // The answer may have come while the outcome was being written.
         if (answeredMeanwhile) keeper_.saveSoon(over);
     }
-    tellWaiters(over);
+    tellOfEnd(over);
 }
 
 /// The task that an outcome with this TRANSID ends: the first one accepted, or else one whose
@@ -377,10 +377,12 @@ std::string TaskList::reasonOf(const Entry& entry) {
 
 void TaskList::end(const Task& task) {
     keeper_.save(task);
-    tellWaiters(task);
+    tellOfEnd(task);
 }
 
-void TaskList::tellWaiters(const Task& task) {
+/// Once for each task that is over.
+void TaskList::tellOfEnd(const Task& task) {
+    counts_.add(task);
     std::vector<WhenOver> calls;
     {
         const embedded::MutexLock lock(lock_);

@@ -18,6 +18,7 @@
 #include "host/commands/recorder.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task.h"
+#include "host/outcomes/task_counts.h"
 #include "host/outcomes/task_keeper.h"
 #include "host/tables/query.h"
 #include "host/tables/table_set.h"
@@ -89,7 +90,10 @@ public:
     /// A task that has been entered ends without having been handed over. Throws NotKept.
     void end(const Task& task);
     /// The same, for one whose end has been kept already.
-    void hasEnded(const Task& task) { tellWaiters(task); }
+    void hasEnded(const Task& task) { tellOfEnd(task); }
+
+    /// The tasks that have ended in this run of the host.
+    const TaskCounts& counts() const { return counts_; }
 
     /// Ends what this task's commands have started, and each further one at its start: now, or when
     /// the task begins. That somebody wants it has been kept. The task is cancelled if a signal
@@ -171,7 +175,7 @@ private:
     std::optional<Task> startNext(std::uint64_t except) ZAV_REQUIRES(lock_);
     TaskState judge(const Entry& entry) const;
     static std::string reasonOf(const Entry& entry);
-    void tellWaiters(const Task& task);
+    void tellOfEnd(const Task& task);
     void tellFollowers(const OutputPiece& piece);
     std::int64_t atWork() const ZAV_REQUIRES(lock_);
     bool isAtWork(std::int64_t number) const;
@@ -182,6 +186,7 @@ private:
     const oxa::Table* outcomeTable_ = nullptr;
     Columns columns_;
 
+    TaskCounts counts_;
     std::mutex turns_;  ///< held while one request is handed over
 
     mutable embedded::Mutex lock_;

@@ -6,6 +6,8 @@
 #include <optional>
 #include <string>
 
+#include "host/process/groups.h"
+
 namespace host {
 
 struct HostOptions {
@@ -28,6 +30,7 @@ struct HostOptions {
     std::optional<std::uint16_t> rpcPort;   ///< absent: no TCP
     std::optional<std::string> originNode;  ///< absent: the platform's own choice
     std::optional<std::string> plugin;      ///< absent: searched for
+    AccessGroups groups;                    ///< served beside root and the host's own user
     std::optional<int> taskTimeout;         ///< in seconds; absent: the variable TIMEOUT decides
     bool guarded = true;                    ///< false: the plug-in's own behaviour is seen in full
     bool traceSecrets = false;              ///< the trace log shows secrets as they are

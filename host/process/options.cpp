@@ -144,6 +144,17 @@ void chooseBounds(const Settings& settings, HostOptions& options) {
     options.logSize = countOf(settings, "log-size", kMostBytes, options.logSize, kSmallestLog);
 }
 
+AccessGroups chosenGroups(const Settings& settings) {
+    AccessGroups groups;
+    if (const auto act = settings.text("group")) {
+        groups.act = groupNamed(settings.label("group"), *act);
+    }
+    if (const auto read = settings.text("read-only-group")) {
+        groups.read = groupNamed(settings.label("read-only-group"), *read);
+    }
+    return groups;
+}
+
 HostOptions chosenBy(const Settings& settings, const Environment& environment) {
     HostOptions options;
     options.guarded = !settings.flag("unguarded");
@@ -151,6 +162,7 @@ HostOptions chosenBy(const Settings& settings, const Environment& environment) {
     options.check = settings.flag("check");
     options.originNode = settings.text("origin-node");
     options.plugin = settings.text("plugin");
+    options.groups = chosenGroups(settings);
     options.home = usableHome(settings, environment);
     options.state = stateDirectory(settings, options.home, environment);
     chooseBounds(settings, options);

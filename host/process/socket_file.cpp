@@ -65,9 +65,8 @@ FileDescriptor takeLock(const std::string& path) {
     }
 }
 
-}  // namespace
-
-std::string folderFaultOf(const std::string& socketPath) {
+/// `sticky`: the sticky bit makes up for others' permission to write.
+std::string faultOfFolder(const std::string& socketPath, bool sticky) {
     const std::string parent = std::filesystem::path(socketPath).parent_path().string();
     const std::string folder = parent.empty() ? "." : parent;
     struct stat found {};
@@ -77,23 +76,39 @@ std::string folderFaultOf(const std::string& socketPath) {
                std::to_string(found.st_uid) + ", who could replace it";
     }
     const bool others = (found.st_mode & (S_IWGRP | S_IWOTH)) != 0;
-    if (!others || (found.st_mode & S_ISVTX) != 0) return "";
+    if (!others || (sticky && (found.st_mode & S_ISVTX) != 0)) return "";
     return "others may write to its directory " + folder + " and could replace it";
 }
 
+}  // namespace
+
+std::string folderFaultOf(const std::string& socketPath) {
+    return faultOfFolder(socketPath, true);
+}
+
+std::string sharedFolderFaultOf(const std::string& socketPath) {
+    const std::string fault = faultOfFolder(socketPath, false);
+    if (fault.empty() || !folderFaultOf(socketPath).empty()) return fault;
+    return "everybody is to connect to it, and others may write to its directory " +
+           std::filesystem::path(socketPath).parent_path().string();
+}
+
 void SocketFile::takePath() {
-    const std::string fault = folderFaultOf(path_);
+    const std::string fault =
+        connects_ == Connects::Everybody ? sharedFolderFaultOf(path_) : folderFaultOf(path_);
     if (!fault.empty()) throw StartError("socket " + path_ + ": " + fault);
     addressOf(path_);  // throws before a lock file is made for an impossible name
     lock_ = takeLock(path_);
 }
 
-SocketFile::SocketFile(const std::string& path, FileDescriptor passed) : path_(path) {
+SocketFile::SocketFile(const std::string& path, Connects connects, FileDescriptor passed)
+    : path_(path), connects_(connects) {
     takePath();
     socket_ = std::move(passed);
 }
 
-SocketFile::SocketFile(const std::string& path) : path_(path) {
+SocketFile::SocketFile(const std::string& path, Connects connects)
+    : path_(path), connects_(connects) {
     takePath();
     try {
         replaceStale();
@@ -130,10 +145,11 @@ void SocketFile::replaceStale() const {
 
 void SocketFile::bind() {
     const sockaddr_un address = addressOf(path_);
+    const mode_t mode = connects_ == Connects::Everybody ? 0666 : 0600;
     socket_ = newSocket(path_);
-    // bind() gives the file the mode of the socket. So the file is private from the start, without
-    // changing the process's umask, which other threads would see.
-    if (::fchmod(socket_.get(), 0600) != 0) throw StartError("socket " + path_, errno);
+    // bind() gives the file the mode of the socket. So the file is never more open than it should
+    // be, without changing the process's umask, which other threads would see.
+    if (::fchmod(socket_.get(), mode) != 0) throw StartError("socket " + path_, errno);
     if (::bind(socket_.get(), generic(address), sizeof address) != 0) {
         throw StartError("cannot bind the socket " + path_, errno);
     }
@@ -141,8 +157,8 @@ void SocketFile::bind() {
     if (::lstat(path_.c_str(), &made) != 0) throw StartError("socket " + path_, errno);
     device_ = made.st_dev;
     inode_ = made.st_ino;
-    // The umask may have removed bits that the owner needs.
-    if (::chmod(path_.c_str(), 0600) != 0) throw StartError("socket " + path_, errno);
+    // The umask may have removed bits that are needed.
+    if (::chmod(path_.c_str(), mode) != 0) throw StartError("socket " + path_, errno);
 }
 
 int SocketFile::listen() {

@@ -12,6 +12,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <condition_variable>
 #include <csignal>
@@ -609,6 +610,27 @@ TEST_F(AServer, PeersOfAnotherUserAreRefused) {
     EXPECT_EQ(server->counts().refused, 1U);
     Client own = connect();
     EXPECT_TRUE(own.bind());
+}
+
+TEST_F(AServer, LetsAListenerJudgeItsPeers) {
+    std::atomic<bool> welcome{false};
+    std::atomic<int> asked{0};
+    server = std::make_unique<ncs::Server>();
+    server->listen(listener, [&](int accepted) {
+        ucred peer{};
+        socklen_t length = sizeof peer;
+        if (::getsockopt(accepted, SOL_SOCKET, SO_PEERCRED, &peer, &length) == 0 &&
+            peer.pid == ::getpid()) {
+            ++asked;
+        }
+        return welcome.load();
+    });
+    EXPECT_FALSE(connect().bind()) << "although it is the same user";
+    EXPECT_TRUE(becomes([](const ncs::Counts& counts) { return counts.refused == 1; }));
+    welcome = true;
+    Client served = connect();
+    EXPECT_TRUE(served.bind());
+    EXPECT_EQ(asked, 2);
 }
 
 TEST_F(AServer, ItsThreadsLeaveSignalsToTheOthers) {

@@ -84,6 +84,9 @@ Answer getEvents(Services& services, const Call& call) {
     const std::string& name = call.required("table");
     const oxa::Table* const table = services.tables.find(name);
     if (table == nullptr) return errorReply(404, "there is no table \"" + name + "\"");
+    if (name == plugin::kRequestTable && call.peer().access < Access::Act) {
+        return errorReply(403, "you may only read from this host; " + name + " takes requests");
+    }
     const ConditionReader reader(*table, services.codePage);
     std::vector<oxa::Predicate> where;
     for (const auto& [column, text] : call.columns())
@@ -91,7 +94,8 @@ Answer getEvents(Services& services, const Call& call) {
     checkOutcomeParameters(call, name);
     auto source = name == plugin::kOutcomeTable
                       ? outcomeEvents(services, *table,
-                                      {std::move(where), call.flag("tasks"), wantedPosition(call)})
+                                      {std::move(where), call.flag("tasks"),
+                                       outputsFor(call.peer()), wantedPosition(call)})
                       : rowEvents(services, *table, where);
     if (!source) return errorReply(500, "the table takes no subscription");
     return Answer(std::move(source));

@@ -69,6 +69,7 @@ public:
         : services_(services),
           table_(table),
           tasks_(wish.tasks),
+          outputs_(wish.outputs),
           tasksWithoutRow_(std::all_of(wish.where.begin(), wish.where.end(), isOfTasks)),
           lost_(position.journal != services.journal.identity() ||
                 position.number > services.journal.lastEvent().number),
@@ -142,7 +143,8 @@ private:
         } else if (tasks_) {
             const std::optional<Task> task = services_.journal.byNumber(event.task);
             if (!task || !wants(*task)) return;
-            appendEvent(text, {taskDocument(*task, services_), "task", idOf(event.number)});
+            appendEvent(text,
+                        {taskDocument(*task, services_, outputs_), "task", idOf(event.number)});
         }
     }
     bool wants(const Task& task) {
@@ -166,6 +168,7 @@ private:
     Services& services_;
     const oxa::Table& table_;
     const bool tasks_;
+    const Outputs outputs_;
     const bool tasksWithoutRow_;
     // Of the pump's thread alone.
     std::unique_ptr<oxa::Filter> filter_;  ///< null: takes every row

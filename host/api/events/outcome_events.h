@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "embedded/oxa_host.h"
+#include "host/api/tasks/task_document.h"
 #include "host/http/event_source.h"
 
 namespace host {
@@ -16,6 +17,7 @@ struct Services;
 struct OutcomeWish {
     std::vector<oxa::Predicate> where;  ///< conditions on the outcome table, all of which must hold
     bool tasks = false;                 ///< the ends of tasks, too
+    Outputs outputs = Outputs::Hidden;  ///< whether the ends of tasks have them
     std::string after;                  ///< the event after which to continue; empty: from now on
 };
 

@@ -14,8 +14,8 @@
 namespace host {
 namespace {
 
-std::vector<oxa::Predicate> conditionsOf(const nlohmann::json& body, const oxa::Table& table,
-                                         const Services& services) {
+std::vector<oxa::Predicate> queryConditions(const nlohmann::json& body, const oxa::Table& table,
+                                            const Services& services) {
     std::vector<oxa::Predicate> conditions;
     const auto where = body.find("where");
     if (where == body.end()) return conditions;
@@ -43,12 +43,16 @@ Answer postQuery(Services& services, const Call& call) {
     const auto& name = call.body().at("table").get_ref<const std::string&>();
     const oxa::Table* const table = services.tables.find(name);
     if (table == nullptr) return errorReply(404, "there is no table \"" + name + "\"");
-    if (table->name == plugin::kRequestTable && call.peer().access < Access::Act) {
-        return errorReply(403, "you may only read from this host; a query on " + name + " acts");
+    if (call.peer().access < Access::Act && table->name != plugin::kInventoryTable) {
+        return errorReply(403,
+                          table->name == plugin::kRequestTable
+                              ? "you may only read from this host; a query on " + name + " acts"
+                              : "you may only read from this host, and query " +
+                                    std::string(plugin::kInventoryTable) + " only");
     }
-    const Query query{table, conditionsOf(call.body(), *table, services)};
+    const Query query{table, queryConditions(call.body(), *table, services)};
     const WatchedAnswer answer = runWatched(services, query, isForced(call.body()), call.peer());
-    return jsonReply(200, queryDocument(services, query, answer));
+    return jsonReply(200, queryDocument(services, query, answer, outputsFor(call.peer())));
 }
 
 }  // namespace host

@@ -43,7 +43,8 @@ std::string failureOf(const Command& command, const CodePage& codePage) {
 }
 
 /// Why the inventory may be empty although something is installed.
-std::optional<Json> inventoryWarning(const Heard& heard, const CodePage& codePage) {
+std::optional<Json> inventoryWarning(const Heard& heard, const CodePage& codePage,
+                                     Outputs outputs) {
     if (heard.commands.empty()) return std::nullopt;
     const Command& program = heard.commands.back();
     if (!program.failed() && !heard.noInventory) return std::nullopt;
@@ -52,7 +53,7 @@ std::optional<Json> inventoryWarning(const Heard& heard, const CodePage& codePag
     Json warning = {
         {"text",
          "what is installed is not known, because the inventory program failed: " + reason}};
-    warning.update(commandObject(program, codePage));
+    warning.update(commandObject(program, codePage, outputs));
     return warning;
 }
 
@@ -67,8 +68,8 @@ void add(std::string& document, const char* member, const Json& value) {
 
 }  // namespace
 
-std::string queryDocument(const Services& services, const Query& query,
-                          const WatchedAnswer& answer) {
+std::string queryDocument(const Services& services, const Query& query, const WatchedAnswer& answer,
+                          Outputs outputs) {
     const CodePage& codePage = services.codePage;
     std::string document = rowsDocument(*query.table, answer.rows, codePage);
     if (!services.guarded) return document;
@@ -76,7 +77,7 @@ std::string queryDocument(const Services& services, const Query& query,
         add(document, "full", fullConfiguration(answer.heard, codePage));
     }
     if (query.table->name == plugin::kInventoryTable) {
-        const auto warning = inventoryWarning(answer.heard, codePage);
+        const auto warning = inventoryWarning(answer.heard, codePage, outputs);
         if (warning) add(document, "warnings", *warning);
     }
     return document;

@@ -5,6 +5,7 @@
 
 #include "host/api/services.h"
 #include "host/api/tables/watched_query.h"
+#include "host/api/tasks/task_document.h"
 #include "host/tables/query.h"
 
 namespace host {
@@ -17,7 +18,7 @@ namespace host {
 ///                                                     if even this is only a part of it
 ///   "warnings": [{"text", ...}]                       why there may be less than there should be;
 ///                                                     after the text the members of the command
-std::string queryDocument(const Services& services, const Query& query,
-                          const WatchedAnswer& answer);
+std::string queryDocument(const Services& services, const Query& query, const WatchedAnswer& answer,
+                          Outputs outputs);
 
 }  // namespace host

@@ -127,6 +127,7 @@ std::optional<Task> handOver(Services& services, const Task& task) {
     try {
         return tryHandOver(services, task);
     } catch (const Refusal& refused) {
+        services.refusals.at(refused.guard()).add();
         Task ended = endOf(task, TaskState::Refused, refused.what());
         ended.guard = refused.guard();
         ended.hint = refused.hint();

@@ -31,7 +31,7 @@ Reply inPlugin(const Task& task) {
 
 /// The end of a task that was to be cancelled.
 Reply endReply(const Task& task, const Services& services) {
-    if (task.state == TaskState::Cancelled) return taskReply(200, task, services);
+    if (task.state == TaskState::Cancelled) return taskReply(200, task, services, Outputs::Shown);
     return errorReply(409, "too late: no signal reached a command of task " + task.id +
                                ", which ended as " + std::string(nameOf(task.state)));
 }
@@ -47,7 +47,8 @@ Later endInHand(const Task& task, Services& services) {
         services.tasks.cancel(*waiter);
         const std::optional<Task> now = services.tasks.find(task.id);
         if (!now) return noSuchTask(task.id);
-        return isOver(now->state) ? endReply(*now, services) : taskReply(202, *now, services);
+        return isOver(now->state) ? endReply(*now, services)
+                                  : taskReply(202, *now, services, Outputs::Shown);
     };
     return {begin, kLongestCancelWait, atLimit};
 }
@@ -71,7 +72,7 @@ Answer cancelTask(Services& services, const Call& call) {
     if (result == Journal::Cancel::InPlugin) return inPlugin(*task);
     if (result == Journal::Cancel::Over) return overAlready(*task);
     services.tasks.hasEnded(*task);
-    return taskReply(200, *task, services);
+    return taskReply(200, *task, services, Outputs::Shown);
 }
 
 }  // namespace host

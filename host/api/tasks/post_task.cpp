@@ -115,7 +115,7 @@ Reply replyAgain(const Task& first, const Task& task, const Services& services) 
     if (first.way == TaskWay::AtOnce && !first.guard.empty()) {
         return guardReply(409, first.reason, first.guard, first.hint);
     }
-    return taskReply(202, first, services);
+    return taskReply(202, first, services, Outputs::Shown);
 }
 
 Reply enter(Task task, Services& services) {
@@ -124,8 +124,9 @@ Reply enter(Task task, Services& services) {
     } else if (const std::optional<Task> first = services.journal.enterOnce(task)) {
         return replyAgain(*first, task, services);
     }
+    if (isOver(task.state)) services.tasks.hasEnded(task);
     services.dispatcher.wake();
-    return taskReply(202, task, services);
+    return taskReply(202, task, services, Outputs::Shown);
 }
 
 Task refused(Task task, const std::string& reason) {
@@ -147,7 +148,7 @@ void askGuards(const Task& task, Services& services) {
             Task remembered = refused(task, refusal.what());
             remembered.guard = refusal.guard();
             remembered.hint = refusal.hint();
-            services.journal.enterOnce(remembered);
+            if (!services.journal.enterOnce(remembered)) services.tasks.hasEnded(remembered);
         }
         throw;
     }

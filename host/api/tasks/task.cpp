@@ -14,23 +14,24 @@ namespace {
 
 constexpr long long kLongestTaskWait = 24 * 60 * 60;  // seconds
 
-Reply replyAbout(const std::string& name, const Services& services) {
+Reply replyAbout(const std::string& name, const Services& services, Outputs outputs) {
     const std::optional<Task> task = services.tasks.find(name);
     if (!task) return errorReply(404, "there is no task \"" + services.codePage.toUtf8(name) + '"');
-    return taskReply(200, *task, services);
+    return taskReply(200, *task, services, outputs);
 }
 
 /// Answers when the task is over or the time is.
-Later waitFor(const std::string& id, std::chrono::seconds time, Services& services) {
+Later waitFor(const std::string& id, std::chrono::seconds time, Services& services,
+              Outputs outputs) {
     const auto waiter = std::make_shared<std::atomic<std::uint64_t>>(0);
-    const auto begin = [id, waiter, &services](const Responder& responder) {
-        *waiter = services.tasks.awaitEnd(id, [responder, &services](const Task& task) {
-            responder(taskReply(200, task, services));
+    const auto begin = [id, waiter, &services, outputs](const Responder& responder) {
+        *waiter = services.tasks.awaitEnd(id, [responder, &services, outputs](const Task& task) {
+            responder(taskReply(200, task, services, outputs));
         });
     };
-    const auto atLimit = [id, waiter, &services]() -> Answer {
+    const auto atLimit = [id, waiter, &services, outputs]() -> Answer {
         services.tasks.cancel(*waiter);
-        return replyAbout(id, services);
+        return replyAbout(id, services, outputs);
     };
     return {begin, time, atLimit};
 }
@@ -44,8 +45,9 @@ Answer getTask(Services& services, const Call& call) {
     const std::string name = services.codePage.fromUtf8(given).value_or(given);
     const std::optional<Task> task = services.tasks.find(name);
     const long long seconds = std::min(call.number("wait", 0), kLongestTaskWait);
-    if (!task || isOver(task->state) || seconds == 0) return replyAbout(name, services);
-    return waitFor(task->id, std::chrono::seconds(seconds), services);
+    const Outputs outputs = outputsFor(call.peer());
+    if (!task || isOver(task->state) || seconds == 0) return replyAbout(name, services, outputs);
+    return waitFor(task->id, std::chrono::seconds(seconds), services, outputs);
 }
 
 }  // namespace host

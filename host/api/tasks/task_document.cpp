@@ -45,7 +45,11 @@ std::string bootOf(const Task& task, const Services& services) {
 
 }  // namespace
 
-Json commandObject(const Command& command, const CodePage& codePage) {
+Outputs outputsFor(const Peer& peer) {
+    return peer.access == Access::Act ? Outputs::Shown : Outputs::Hidden;
+}
+
+Json commandObject(const Command& command, const CodePage& codePage, Outputs outputs) {
     Json object = {{"command", codePage.toUtf8(command.line)}};
     if (command.pid > 0) object["pid"] = command.pid;
     object["started"] = timeText(command.started);
@@ -54,6 +58,7 @@ Json commandObject(const Command& command, const CodePage& codePage) {
     if (command.signal) object["signal"] = *command.signal;
     if (!command.error.empty()) object["error"] = codePage.toUtf8(command.error);
     if (command.timedOut) object["timed_out"] = true;
+    if (outputs == Outputs::Hidden) return object;
     object["stdout"] = codePage.toUtf8(command.out.text());
     object["stderr"] = codePage.toUtf8(command.err.text());
     return object;
@@ -81,7 +86,7 @@ Json taskSummary(const Task& task, const CodePage& codePage) {
     return object;
 }
 
-std::string taskDocument(const Task& task, const Services& services) {
+std::string taskDocument(const Task& task, const Services& services, Outputs outputs) {
     Json document = taskSummary(task, services.codePage);
     if (task.run) document["run"] = *task.run;
     const std::string boot = bootOf(task, services);
@@ -95,14 +100,14 @@ std::string taskDocument(const Task& task, const Services& services) {
     document["events"] = std::move(events);
     Json commands = Json::array();
     for (const Command& command : task.commands)
-        commands.push_back(commandObject(command, services.codePage));
+        commands.push_back(commandObject(command, services.codePage, outputs));
     document["details"] = {{"commands", std::move(commands)}};
     if (document.contains("reason")) document["details"]["reason"] = document["reason"];
     return document.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 
-Reply taskReply(unsigned status, const Task& task, const Services& services) {
-    return jsonReply(status, taskDocument(task, services));
+Reply taskReply(unsigned status, const Task& task, const Services& services, Outputs outputs) {
+    return jsonReply(status, taskDocument(task, services, outputs));
 }
 
 }  // namespace host

@@ -5,23 +5,31 @@
 #include <string>
 
 #include "host/api/services.h"
+#include "host/http/peer.h"
 #include "host/http/reply.h"
 #include "host/outcomes/task.h"
 
 namespace host {
 
+/// Whether what commands wrote may be told.
+enum class Outputs { Hidden, Shown };
+
+/// Shown to those who may act only: it may hold anything.
+Outputs outputsFor(const Peer& peer);
+
 /// {"command", "pid", "started", "ended", "exit" | "signal" | "error", "timed_out"?, "stdout",
-/// "stderr"}. Members that are not known are left out.
-nlohmann::ordered_json commandObject(const Command& command, const CodePage& codePage);
+/// "stderr"}. Members that are not known are left out, and so are outputs that are hidden.
+nlohmann::ordered_json commandObject(const Command& command, const CodePage& codePage,
+                                     Outputs outputs);
 
 /// Identifier, TRANSID, what was asked for, state, times and asker.
 nlohmann::ordered_json taskSummary(const Task& task, const CodePage& codePage);
 
 /// The summary with the run of the host and the start of the machine in which it was handed over,
 /// "force", "interruptions", "reply", "events" and "details", as text.
-std::string taskDocument(const Task& task, const Services& services);
+std::string taskDocument(const Task& task, const Services& services, Outputs outputs);
 
 /// Answers with that document.
-Reply taskReply(unsigned status, const Task& task, const Services& services);
+Reply taskReply(unsigned status, const Task& task, const Services& services, Outputs outputs);
 
 }  // namespace host

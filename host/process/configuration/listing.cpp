@@ -47,6 +47,10 @@ ListedValue listedText(const std::optional<std::string>& value) {
     return value ? listedText(*value) : ListedValue{};
 }
 
+ListedValue listedGroup(const std::optional<Group>& group) {
+    return group ? listedText(group->name) : ListedValue{};
+}
+
 ListedValue listedNumber(std::int64_t value, std::vector<const char*> variables = {}) {
     return {std::to_string(value), std::move(variables)};
 }
@@ -67,6 +71,8 @@ std::map<std::string, ListedValue> listedValues(const HostOptions& options,
         {"socket", listedText(options.socket, {"ZAV_SOCKET", "XDG_RUNTIME_DIR"})},
         {"rpc-socket", listedText(options.rpcSocket)},
         {"rpc-port", options.rpcPort ? listedNumber(*options.rpcPort) : ListedValue{}},
+        {"group", listedGroup(options.groups.act)},
+        {"read-only-group", listedGroup(options.groups.read)},
         {"origin-node", listedText(options.originNode)},
         {"plugin", listedText(options.plugin)},
         {"state", listedText(options.state, {"STATE_DIRECTORY"})},

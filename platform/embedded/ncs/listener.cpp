@@ -37,11 +37,12 @@ int checked(int result, const char* what) {
     return result;
 }
 
-Listener::Listener(int listeningSocket, std::string portText)
+Listener::Listener(int listeningSocket, std::string portText, Admission admission)
     : Source(Kind::Listener),
       socket(listeningSocket),
       port(std::move(portText)),
-      isUnix(domainOf(listeningSocket) == AF_UNIX) {
+      isUnix(domainOf(listeningSocket) == AF_UNIX),
+      judge(std::move(admission)) {
     const int flags = checked(::fcntl(socket, F_GETFL), "listening socket");
     checked(::fcntl(socket, F_SETFL, flags | O_NONBLOCK), "listening socket");
 }
@@ -52,6 +53,7 @@ bool Listener::admits(int accepted) const {
         const int on = 1;
         ::setsockopt(accepted, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
     }
+    if (isUnix && judge) return judge(accepted);
     const std::optional<uid_t> user =
         isUnix ? userOfUnixPeer(accepted) : ownerOfLoopbackPeer(accepted);
     return user && (*user == ::geteuid() || *user == 0);

@@ -59,7 +59,7 @@ public:
     Implementation(const Implementation&) = delete;
     Implementation& operator=(const Implementation&) = delete;
 
-    void listen(int socket, const std::string& port);
+    void listen(int socket, const std::string& port, Admission admission);
     std::uint16_t listenOnLoopback(std::uint16_t port);
     void stop();
     Counts counts() const;
@@ -148,8 +148,8 @@ void Server::Implementation::work() {
     }
 }
 
-void Server::Implementation::listen(int socket, const std::string& port) {
-    auto listener = std::make_unique<Listener>(socket, port);
+void Server::Implementation::listen(int socket, const std::string& port, Admission admission) {
+    auto listener = std::make_unique<Listener>(socket, port, std::move(admission));
     const embedded::MutexLock lock(lock_);
     listeners_.push_back(std::move(listener));
     checked(watch(EPOLL_CTL_ADD, socket, *listeners_.back(), EPOLLIN | EPOLLONESHOT), "epoll_ctl");
@@ -157,7 +157,7 @@ void Server::Implementation::listen(int socket, const std::string& port) {
 
 std::uint16_t Server::Implementation::listenOnLoopback(std::uint16_t port) {
     Descriptor made = loopbackSocket(port);
-    listen(made.get(), std::to_string(port));
+    listen(made.get(), std::to_string(port), {});
     const embedded::MutexLock lock(lock_);
     ownSockets_.push_back(std::move(made));
     return port;
@@ -325,8 +325,8 @@ Server::Server(const Limits& limits, CallWatch* watch)
 
 Server::~Server() = default;
 
-void Server::listen(int socket) {
-    implementation_->listen(socket, "");
+void Server::listen(int socket, Admission admission) {
+    implementation_->listen(socket, "", std::move(admission));
 }
 
 std::uint16_t Server::listenOnLoopback(std::uint16_t port) {

@@ -1,14 +1,16 @@
 /// The RPC runtime as the host process sees it: where it listens and what limits it keeps.
 ///
-/// It speaks connection-oriented DCE/RPC 5.0 without authentication. It serves peers that
-/// run as the process's own user or as root; TCP listens on 127.0.0.1 only, and the kernel says who
-/// owns the other end. A call whose parameters are larger than the limit (4 MiB) gets the fault
-/// nca_s_fault_remote_no_memory; other calls are not affected.
+/// It speaks connection-oriented DCE/RPC 5.0 without authentication. Unless a listener judges its
+/// peers itself, it serves those that run as the process's own user or as root; TCP listens on
+/// 127.0.0.1 only, and the kernel says who owns the other end. A call whose parameters are larger
+/// than the limit (4 MiB) gets the fault nca_s_fault_remote_no_memory; other calls are not
+/// affected.
 #pragma once
 
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -56,11 +58,15 @@ struct Limits {
 struct Counts {
     unsigned connections = 0;  ///< open now; everything else counts from the start
     std::uint64_t accepted = 0;
-    std::uint64_t refused = 0;  ///< from other users, or above the limit
+    std::uint64_t refused = 0;  ///< from users who are not served, or above the limit
     std::uint64_t timedOut = 0;
     std::uint64_t calls = 0;  ///< that reached a stub
     std::uint64_t faults = 0;
 };
+
+/// Whether the peer of an accepted Unix socket is served. Called on the server's threads, several
+/// at a time, before anything is read; must not block.
+using Admission = std::function<bool(int accepted)>;
 
 /// Serves the interfaces that are registered with rpc__register_mgr, on threads of its own, which
 /// block all signals. All operations are thread-safe. Without connections no thread wakes up.
@@ -76,8 +82,9 @@ public:
 
     /// Accepts connections from a listening stream socket. The socket is made non-blocking; it
     /// still belongs to the caller, who closes it after stop(). The caller also sets the mode of a
-    /// Unix socket's file. Throws std::system_error.
-    void listen(int socket);
+    /// Unix socket's file. `admission` judges the peers; it is for Unix sockets only. Throws
+    /// std::system_error.
+    void listen(int socket, Admission admission = {});
     /// Listens on a TCP port of 127.0.0.1 and returns it; 0 stands for any free port. Throws
     /// std::system_error.
     std::uint16_t listenOnLoopback(std::uint16_t port);

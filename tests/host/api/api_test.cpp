@@ -86,6 +86,15 @@ TEST_F(Interface, RefusesRequestsThatMeanAnotherJournal) {
               200U);
 }
 
+TEST_F(Interface, LetsReadersGetEverythingButOutput) {
+    for (const host::Route& route : api->router().routes()) {
+        const bool reads = std::string(route.method) == "GET" &&
+                           std::string(route.path) != "/v1/tasks/{id}/output";
+        const bool asks = std::string(route.path) == "/v1/query";  // judged by its table
+        EXPECT_EQ(route.access, reads || asks ? Access::Read : Access::Act) << route.path;
+    }
+}
+
 TEST_F(Interface, IsClosedToPeersWithoutAccess) {
     for (const host::Route& route : api->router().routes()) {
         EXPECT_EQ(ask(route.method, route.path, "{}", Access::None).status, 403U) << route.path;

@@ -39,6 +39,17 @@ TEST(TransferCall, EndsAFileWhenTheLastChunkHasRoomLeft) {
     EXPECT_FALSE(host::readTransferCall(given.call())->endsFile) << "the third is not written";
 }
 
+TEST(TransferCall, HasTheBytesOfAllChunksThatAreWritten) {
+    Parameters given;
+    given.chunks = {4096, 4096, 5};
+    EXPECT_EQ(host::readTransferCall(given.call())->bytes, 8197U);
+    given.lastIndex = 1;
+    EXPECT_EQ(host::readTransferCall(given.call())->bytes, 8192U) << "the third is not written";
+    given.chunks = {0xFFFFFFFF};
+    given.lastIndex = 0;
+    EXPECT_EQ(host::readTransferCall(given.call())->bytes, 4096U) << "no chunk holds more";
+}
+
 TEST(TransferCall, HasANameUpToItsFirstZero) {
     Parameters given;
     given.name = std::string("safe\0unsafe", 11);

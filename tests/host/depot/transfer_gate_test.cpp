@@ -51,6 +51,25 @@ protected:
     std::optional<host::TransferGate> gate_;
 };
 
+TEST_F(AGate, CountsFilesBytesAndFailures) {
+    host::ByLabel<host::Counter> refusals({"depot-transfers"});
+    gate_.emplace(*rules_, &refusals);
+    EXPECT_EQ(send(1, "a", true, false), 0);
+    EXPECT_EQ(send(1, "a", false, true), 0);
+    EXPECT_EQ(gate_->counts().begun.value(), 1U);
+    EXPECT_EQ(gate_->counts().bytes.value(), 4097U);
+    EXPECT_EQ(gate_->counts().failed.value(), 0U);
+    EXPECT_EQ(send(1, "b", true, false, 4), 4);
+    EXPECT_EQ(gate_->counts().begun.value(), 2U);
+    EXPECT_EQ(gate_->counts().bytes.value(), 4097U);
+    EXPECT_EQ(gate_->counts().failed.value(), 1U);
+    EXPECT_EQ(send(1, "c", true, false), 0);
+    EXPECT_EQ(send(2, "c", true, true), 6);
+    EXPECT_EQ(gate_->counts().begun.value(), 4U);
+    EXPECT_EQ(gate_->counts().failed.value(), 2U);
+    EXPECT_EQ(refusals.at("depot-transfers").value(), 1U);
+}
+
 TEST_F(AGate, LetsOneClientAtATimeSendAFile) {
     EXPECT_EQ(send(1, "a", true, false), 0);
     EXPECT_EQ(send(2, "a", true, false), 6);

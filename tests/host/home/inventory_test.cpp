@@ -35,6 +35,22 @@ TEST(Inventory, IsWhatTheHomesProgramLists) {
     EXPECT_FALSE(inventory.has("um"));
 }
 
+TEST(Inventory, IsRememberedUntilTheNextOneThatCanBeRead) {
+    EXPECT_FALSE(host::lastInventory());
+    ScratchDir home;
+    home.script("bin/cinfo",
+                "printf '%s' '" + kHeader +
+                    "\"ux\",\"L\",\"l\",\"6\",\"1\"\n\"um\",\"L\",\"l\",\"6\",\"1\"\n'\n");
+    readInventory(home.path());
+    const auto first = host::lastInventory();
+    ASSERT_TRUE(first);
+    EXPECT_EQ(first->products, 2U);
+    home.script("bin/cinfo", "exit 5");
+    readInventory(home.path());
+    EXPECT_EQ(host::lastInventory()->read, first->read);
+    EXPECT_EQ(host::lastInventory()->products, 2U);
+}
+
 TEST(Inventory, IsEmptyWithTheReasonWhenTheProgramFails) {
     ScratchDir home;
     EXPECT_EQ(endInWords(readInventory(home.path()).result),

@@ -427,6 +427,33 @@ TEST_F(Connections, OfOtherUsersAreRefused) {
     EXPECT_EQ(status, 0);
 }
 
+TEST_F(Connections, OfReadersShutNobodyElseOut) {
+    if (::geteuid() != 0) GTEST_SKIP() << "only root can become another user";
+    host::ServerLimits limits;
+    limits.groups.read = host::Group{"nogroup", 65534};
+    limits.readers = 2;
+    start(limits);
+    ASSERT_EQ(::chmod(scratch.path().c_str(), 0755), 0);
+    ASSERT_EQ(::chmod(scratch.path("s").c_str(), 0666), 0);
+    const pid_t child = ::fork();
+    if (child == 0) {
+        if (::setgid(65534) != 0 || ::setuid(65534) != 0) ::_exit(1);
+        RawClient first = connect();
+        if (first.get("/v1/health").status != 200) ::_exit(2);
+        RawClient second = subscribe();
+        const auto third = connect().get("/v1/health");
+        if (third.status != 503) ::_exit(3);
+        if (third.body.find("for reading only") == std::string::npos) ::_exit(4);
+        first.close();
+        const bool served = eventually([&] { return connect().get("/v1/health").status == 200; });
+        ::_exit(served ? 0 : 5);
+    }
+    int status = -1;
+    ASSERT_EQ(::waitpid(child, &status, 0), child);
+    EXPECT_EQ(status, 0);
+    EXPECT_EQ(connect().get("/v1/health").status, 200);
+}
+
 TEST_F(Samples, ThatTakeLongHoldUpNobodyElse) {
     OpeningGate gate;
     std::atomic<int> running{0};

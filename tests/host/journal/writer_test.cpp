@@ -128,6 +128,19 @@ TEST_F(JournalWriter, OneThatFailsLeavesTheOthersAlone) {
     EXPECT_EQ(rows(), 2) << "the failed one left nothing";
 }
 
+TEST_F(JournalWriter, MeasuresTransactionsAndCountsThoseThatFail) {
+    Writer writer(database);
+    writer.submit(inserting(1)).get();
+    writer.submit(inserting(2)).get();
+    EXPECT_EQ(writer.commitTimes().snapshot().count, 2U);
+    EXPECT_GT(writer.commitTimes().snapshot().sum, std::chrono::nanoseconds(0));
+    EXPECT_EQ(writer.failures().value(), 0U);
+    const auto endingAll = [](Database& written) { written.run("ROLLBACK"); };
+    EXPECT_THROW(writer.submit(endingAll).get(), host::DatabaseError);
+    EXPECT_EQ(writer.commitTimes().snapshot().count, 2U);
+    EXPECT_EQ(writer.failures().value(), 1U);
+}
+
 TEST_F(JournalWriter, WhatCanWaitGoesWithTheNextThatCannot) {
     Writer writer(database);
     writer.submitLater(inserting(1));

@@ -257,6 +257,8 @@ TEST_F(Options, TheListingSaysWhatHoldsAndWhereItComesFrom) {
                            ":2\n"
                            "rpc-socket = \"/a\\\\b.rpc\"  # default\n"
                            "# rpc-port has no value  # default\n"
+                           "# group has no value  # default\n"
+                           "# read-only-group has no value  # default\n"
                            "# origin-node has no value  # default\n"
                            "# plugin has no value  # default\n"
                            "state = \"/var/lib/zavhost\"  # environment, STATE_DIRECTORY\n"

@@ -49,6 +49,27 @@ TEST_F(Socket, IsPrivateWhateverTheMask) {
     }
 }
 
+TEST_F(Socket, ForEverybodyIsSoWhateverTheMask) {
+    for (const mode_t mask : {0000U, 0022U, 0777U}) {
+        const mode_t before = ::umask(mask);
+        const SocketFile socket(path, host::Connects::Everybody);
+        ::umask(before);
+        EXPECT_EQ(modeOf(path), S_IFSOCK | 0666U) << mask;
+    }
+}
+
+TEST_F(Socket, ForEverybodyNeedsADirectoryThatOnlyItsOwnerMayWrite) {
+    for (const mode_t mode : {01777U, 0775U, 0757U}) {
+        ASSERT_EQ(::chmod(scratch.path().c_str(), mode), 0);
+        EXPECT_THROW(SocketFile(path, host::Connects::Everybody), host::StartError) << mode;
+        EXPECT_EQ(modeOf(path), 0U) << "nothing was made";
+    }
+    ASSERT_EQ(::chmod(scratch.path().c_str(), 01777), 0);
+    EXPECT_NO_THROW(SocketFile(path, host::Connects::Owner)) << "the sticky bit is enough there";
+    ASSERT_EQ(::chmod(scratch.path().c_str(), 0755), 0);
+    EXPECT_NO_THROW(SocketFile(path, host::Connects::Everybody));
+}
+
 TEST_F(Socket, IsConnectedToOnlyWhenItListens) {
     SocketFile socket(path);
     EXPECT_FALSE(RawClient(path).connected());

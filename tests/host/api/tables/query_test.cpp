@@ -108,25 +108,40 @@ TEST_F(QueryEndpoint, SaysThatATableIsNoLongerOffered) {
     expectError(404, "table PASSING is no longer offered", post(R"({"table":"PASSING"})"));
 }
 
-TEST_F(QueryEndpoint, LetsReadersQueryAllTablesButTheOneThatActs) {
+TEST_F(QueryEndpoint, LetsReadersQueryTheInventoryAndNothingElse) {
     MadeUpTable requests("KAGREQT", plainColumns());
-    int samples = 0;
+    MadeUpTable inventory("KINAGT", plainColumns());
+    int requestSamples = 0;
+    int inventorySamples = 0;
     requests.sampler = [&](rtoxa&) {
-        ++samples;
+        ++requestSamples;
+        return static_cast<int>(OXA_OK);
+    };
+    inventory.sampler = [&](rtoxa&) {
+        ++inventorySamples;
         return static_cast<int>(OXA_OK);
     };
     requests.RegisterWithManager();
+    inventory.RegisterWithManager();
     api.reset();
     services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
     api.emplace(*services, host::routes());
     const auto query = [&](const char* name, host::Access access) {
-        return ask("POST", "/v1/query", R"({"table":")" + std::string(name) + "\"}", access).status;
+        return ask("POST", "/v1/query", R"({"table":")" + std::string(name) + "\"}", access);
     };
-    EXPECT_EQ(query("PLAIN", host::Access::Read), 200U);
-    EXPECT_EQ(query("KAGREQT", host::Access::Read), 403U);
-    EXPECT_EQ(samples, 0);
-    EXPECT_EQ(query("KAGREQT", host::Access::Act), 200U);
-    EXPECT_EQ(samples, 1);
+    expectError(403, "you may only read from this host, and query KINAGT only",
+                query("PLAIN", host::Access::Read));
+    expectError(403, "you may only read from this host; a query on KAGREQT acts",
+                query("KAGREQT", host::Access::Read));
+    EXPECT_EQ(requestSamples, 0);
+    EXPECT_EQ(query("KINAGT", host::Access::Read).status, 200U);
+    EXPECT_EQ(inventorySamples, 1);
+    EXPECT_EQ(query("KAGREQT", host::Access::Act).status, 200U);
+    EXPECT_EQ(query("PLAIN", host::Access::Act).status, 200U);
+    EXPECT_EQ(requestSamples, 1);
+    expectError(403, "you may only read from this host; KAGREQT takes requests",
+                ask("GET", "/v1/events?table=KAGREQT", "", host::Access::Read));
+    EXPECT_EQ(requestSamples, 1);
 }
 
 /// A request table whose requests are counted.

@@ -1,0 +1,183 @@
+#include "host/api/metrics/metric_table.h"
+
+#include <algorithm>
+#include <chrono>
+#include <string>
+
+#include "host/home/inventory.h"
+#include "host/process/version.h"
+
+namespace host {
+namespace {
+
+template <typename Time>
+double secondsOf(Time time) {
+    return std::max(0.0, std::chrono::duration<double>(time).count());
+}
+
+double figure(const Counter& counter) {
+    return static_cast<double>(counter.value());
+}
+
+void add(Exposition& out, const std::optional<double>& value) {
+    if (value) out.sample(*value);
+}
+
+void tellTasks(const Scrape& scrape, Exposition& out) {
+    scrape.services.tasks.counts().eachEnd(
+        [&out](std::string_view command, std::string_view outcome, std::uint64_t count) {
+            out.sample({{"command", command}, {"outcome", outcome}}, static_cast<double>(count));
+        });
+}
+
+void tellDurations(const Scrape& scrape, Exposition& out) {
+    scrape.services.tasks.counts().durations().each(
+        [&out](std::string_view command, const Histogram& durations) {
+            out.sample({{"command", command}}, durations.snapshot());
+        });
+}
+
+void tellQueueAge(const Scrape& scrape, Exposition& out) {
+    if (!scrape.unfinished) return;
+    const auto oldest = scrape.unfinished->oldestQueued;
+    out.sample(oldest ? secondsOf(scrape.now - *oldest) : 0);
+}
+
+void tellRefusals(const Scrape& scrape, Exposition& out) {
+    scrape.services.refusals.each([&out](std::string_view guard, const Counter& counter) {
+        out.sample({{"guard", guard}}, figure(counter));
+    });
+}
+
+/// The connections of both sockets. `rpc` is a figure of the one for file transfers.
+template <typename Rpc>
+void tellSockets(const Scrape& scrape, Exposition& out, double http, Rpc ncs::Counts::*rpc) {
+    out.sample({{"socket", "http"}}, http);
+    if (!scrape.services.transferServer) return;
+    out.sample({{"socket", "rpc"}}, static_cast<double>(scrape.services.transferServer().*rpc));
+}
+
+void tellInventoryAge(const Scrape&, Exposition& out) {
+    const auto last = lastInventory();
+    if (last) out.sample(secondsOf(std::chrono::steady_clock::now() - last->read));
+}
+
+void tellInventorySize(const Scrape&, Exposition& out) {
+    const auto last = lastInventory();
+    if (last) out.sample(static_cast<double>(last->products));
+}
+
+void tellBuild(const Scrape&, Exposition& out) {
+    const std::string width = std::to_string(sizeof(void*) * 8);
+    out.sample({{"version", kVersion}, {"width", width}}, 1);
+}
+
+}  // namespace
+
+const std::vector<Metric>& metricTable() {
+    constexpr auto kCounter = MetricType::Counter;
+    constexpr auto kGauge = MetricType::Gauge;
+    constexpr auto kHistogram = MetricType::Histogram;
+    using S = const Scrape&;
+    using Out = Exposition&;
+    // clang-format off
+    static const std::vector<Metric> table = {
+        {"zavhost_tasks_total", kCounter, "command, outcome",
+         "Tasks that ended, by command and the state in which they ended.", tellTasks},
+        {"zavhost_task_duration_seconds", kHistogram, "command",
+         "How long tasks ran, from their start to their end.", tellDurations},
+        {"zavhost_queue_length", kGauge, "",
+         "Tasks that were accepted and have not begun.",
+         [](S scrape, Out out) {
+             if (scrape.unfinished) out.sample(static_cast<double>(scrape.unfinished->queued));
+         }},
+        {"zavhost_queue_head_age_seconds", kGauge, "",
+         "How long the oldest task that has not begun has been waiting; 0 if none waits.",
+         tellQueueAge},
+        {"zavhost_tasks_running", kGauge, "",
+         "Tasks that have begun and not ended.",
+         [](S scrape, Out out) {
+             if (scrape.unfinished) out.sample(static_cast<double>(scrape.unfinished->running));
+         }},
+        {"zavhost_guard_refusals_total", kCounter, "guard",
+         "Requests and transfers that a guard refused.", tellRefusals},
+        {"zavhost_transfers_total", kCounter, "",
+         "Files that clients began to send, those that were refused among them.",
+         [](S scrape, Out out) { out.sample(figure(scrape.services.transfers.counts().begun)); }},
+        {"zavhost_transfer_failures_total", kCounter, "",
+         "Batches of files that were refused or could not be stored.",
+         [](S scrape, Out out) { out.sample(figure(scrape.services.transfers.counts().failed)); }},
+        {"zavhost_transfer_received_bytes_total", kCounter, "",
+         "Bytes of files that were received and stored.",
+         [](S scrape, Out out) { out.sample(figure(scrape.services.transfers.counts().bytes)); }},
+        {"zavhost_journal_commit_duration_seconds", kHistogram, "",
+         "How long transactions of the journal took until they were durable.",
+         [](S scrape, Out out) { out.sample(scrape.services.journal.commitTimes().snapshot()); }},
+        {"zavhost_journal_commit_failures_total", kCounter, "",
+         "Transactions of the journal that could not be written, each new try counted.",
+         [](S scrape, Out out) { out.sample(figure(scrape.services.journal.failedCommits())); }},
+        {"zavhost_connections", kGauge, "socket",
+         "Connections that are open.",
+         [](S scrape, Out out) {
+             const auto open = static_cast<double>(scrape.services.counts.connections.value());
+             tellSockets(scrape, out, open, &ncs::Counts::connections);
+         }},
+        {"zavhost_connections_accepted_total", kCounter, "socket",
+         "Connections that clients opened.",
+         [](S scrape, Out out) {
+             const double accepted = figure(scrape.services.counts.accepted);
+             tellSockets(scrape, out, accepted, &ncs::Counts::accepted);
+         }},
+        {"zavhost_connections_refused_total", kCounter, "socket",
+         "Connections that were refused, because of the client's user or because too many were open.",
+         [](S scrape, Out out) {
+             const double refused = figure(scrape.services.counts.refused);
+             tellSockets(scrape, out, refused, &ncs::Counts::refused);
+         }},
+        {"zavhost_subscriptions", kGauge, "",
+         "Event streams that are open.",
+         [](S scrape, Out out) {
+             out.sample(static_cast<double>(scrape.services.counts.streams.load()));
+         }},
+        {"zavhost_child_processes", kGauge, "",
+         "Child processes that live, adopted ones among them.",
+         [](S scrape, Out out) { add(out, scrape.process.children); }},
+        {"zavhost_inventory_age_seconds", kGauge, "",
+         "How long ago the host last read the home's inventory; absent until it has.",
+         tellInventoryAge},
+        {"zavhost_inventory_products", kGauge, "",
+         "Entries that the inventory had then, one for each platform of a product.",
+         tellInventorySize},
+        {"zavhost_guarded", kGauge, "",
+         "Whether the guards are on: 1 or 0.",
+         [](S scrape, Out out) { out.sample(scrape.services.guarded ? 1 : 0); }},
+        {"zavhost_build_info", kGauge, "version, width",
+         "1; the labels tell the version and the width of the process in bits.", tellBuild},
+        // The names that programs of all kinds use for these.
+        {"process_cpu_seconds_total", kCounter, "",
+         "Processor time that the host itself has spent.",
+         [](S scrape, Out out) { add(out, scrape.process.cpuSeconds); }},
+        {"process_start_time_seconds", kGauge, "",
+         "When the process started, in seconds since the epoch.",
+         [](S scrape, Out out) { add(out, scrape.process.startSeconds); }},
+        {"process_virtual_memory_bytes", kGauge, "",
+         "Size of the address space.",
+         [](S scrape, Out out) { add(out, scrape.process.virtualBytes); }},
+        {"process_resident_memory_bytes", kGauge, "",
+         "Memory that is in use.",
+         [](S scrape, Out out) { add(out, scrape.process.residentBytes); }},
+        {"process_open_fds", kGauge, "",
+         "File descriptors that are open.",
+         [](S scrape, Out out) { add(out, scrape.process.openDescriptors); }},
+        {"process_max_fds", kGauge, "",
+         "File descriptors that may be open.",
+         [](S scrape, Out out) { add(out, scrape.process.mostDescriptors); }},
+        {"process_threads", kGauge, "",
+         "Threads of the process.",
+         [](S scrape, Out out) { add(out, scrape.process.threads); }},
+    };
+    // clang-format on
+    return table;
+}
+
+}  // namespace host

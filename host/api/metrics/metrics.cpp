@@ -1,0 +1,35 @@
+// GET /v1/metrics
+
+#include <string>
+
+#include "host/api/call.h"
+#include "host/api/metrics/metric_table.h"
+
+namespace host {
+namespace {
+
+/// The other metrics are needed most when the journal is in trouble.
+std::optional<Journal::Unfinished> readUnfinished(Journal& journal) {
+    try {
+        return journal.unfinished();
+    } catch (const DatabaseError&) {
+        return std::nullopt;
+    }
+}
+
+}  // namespace
+
+Endpoint getMetrics;
+
+Answer getMetrics(Services& services, const Call&) {
+    const Scrape scrape{services, readUnfinished(services.journal), services.journal.latestTime(),
+                        readProcessFigures()};
+    Exposition out;
+    for (const Metric& metric : metricTable()) {
+        out.metric(metric.name, metric.type, metric.help);
+        metric.collect(scrape, out);
+    }
+    return Reply{200, out.text(), std::string(Exposition::kContentType)};
+}
+
+}  // namespace host

@@ -1,0 +1,42 @@
+/// How many tasks ended, and how, for whoever watches the host.
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "host/metrics/by_label.h"
+#include "host/metrics/counter.h"
+#include "host/metrics/histogram.h"
+#include "host/outcomes/task.h"
+
+namespace host {
+
+/// Any thread.
+class TaskCounts {
+public:
+    TaskCounts();
+
+    /// The task has ended.
+    void add(const Task& task);
+
+    /// Calls `visit` with a command, the state in which tasks ended, and their number; with all
+    /// commands of the plug-in, "other" among them, and all states that are an end.
+    template <typename Visit>
+    void eachEnd(const Visit& visit) const {
+        ends_.each([&](std::string_view command, const ByLabel<Counter>& states) {
+            states.each([&](std::string_view state, const Counter& counter) {
+                if (state != kOtherLabel) visit(command, state, counter.value());
+            });
+        });
+    }
+    /// How long tasks ran that did run, by command.
+    const ByLabel<Histogram>& durations() const { return durations_; }
+
+private:
+    ByLabel<ByLabel<Counter>> ends_;
+    ByLabel<Histogram> durations_;
+};
+
+}  // namespace host
