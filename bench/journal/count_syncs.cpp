@@ -1,6 +1,6 @@
-// A library that is loaded before the C library and counts how often a program has the disk write down
-// what it holds. The variable ZAV_SYNC_COUNT names the file that takes the number, 8 bytes of this
-// machine's order.
+// A library that is loaded before the C library and counts how often a program has the disk write
+// down what it holds. The variable ZAV_SYNC_COUNT names the file that takes the number, 8 bytes of
+// this machine's order.
 
 #include <dlfcn.h>
 #include <fcntl.h>
