@@ -205,7 +205,7 @@ TEST_F(Socket, OneThatSomebodyElseBoundStaysWhenItIsGivenUp) {
     host::FileDescriptor passed(::fcntl(theirs.listen(), F_DUPFD_CLOEXEC, 0));
     ASSERT_EQ(::unlink((path + ".lock").c_str()), 0) << "the one who passes it holds no lock";
     {
-        SocketFile socket(path, std::move(passed));
+        SocketFile socket(path, host::Connects::Owner, std::move(passed));
         EXPECT_EQ(socket.path(), path);
         EXPECT_NE(errorOf(path).find("is in use by a live host"), std::string::npos);
         EXPECT_GE(socket.listen(), 0);
