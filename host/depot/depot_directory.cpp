@@ -53,7 +53,10 @@ void provideDepotDirectory(const DepotDirectory& depot) {
     if (!depot.isOwnChoice) return;
     makeDirectory(depot.path);
     ::setenv(kDepotVariable, depot.path.c_str(), 1);
-    say(Priority::Notice, std::string(kDepotVariable) + " is not set; the depot is " + depot.path);
+    // Composed from its end: the compiler sees an overflow where a short text is added to.
+    std::string text = depot.path;
+    text.insert(0, " is not set; the depot is ").insert(0, kDepotVariable);
+    say(Priority::Notice, text);
 }
 
 void requireDepotDirectory(const DepotDirectory& depot) {
