@@ -13,7 +13,7 @@ namespace host {
 namespace {
 
 /// What is wrong with a program; "" if it can be executed.
-std::string faultOf(const std::string& path) {
+std::string programFault(const std::string& path) {
     struct stat found {};
     if (::stat(path.c_str(), &found) != 0) {
         return errno == ENOENT ? path + " is missing"
@@ -35,7 +35,7 @@ constexpr const char* kStarterHome = "the starter home or a backup";
 
 Finding look(const std::string& path, Verdict ifFaulty, const std::string& purpose,
              const char* source = kStarterHome) {
-    const std::string fault = faultOf(path);
+    const std::string fault = programFault(path);
     if (fault.empty()) return {Verdict::Ok, path, ""};
     return {ifFaulty, fault + "; " + purpose, remedyFor(path, source)};
 }

@@ -1,7 +1,6 @@
 #include "host/commands/child_end.h"
 
 #include <poll.h>
-#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -9,6 +8,7 @@
 #include <cerrno>
 #include <ctime>
 
+#include "host/process/children/pidfd.h"
 #include "host/process/file_descriptor.h"
 
 namespace host {
@@ -16,12 +16,7 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-// Older C libraries do not have these names.
-#ifdef SYS_pidfd_open
-constexpr long kPidfdOpen = SYS_pidfd_open;
-#else
-constexpr long kPidfdOpen = 434;  // the same number on every architecture
-#endif
+// Older C libraries do not have this name.
 constexpr auto kPidfd = static_cast<idtype_t>(3);
 
 /// Milliseconds, rounded up, for poll.
@@ -60,7 +55,7 @@ std::optional<ChildEnd> awaitByLooking(pid_t child, Clock::time_point until) {
 std::optional<ChildEnd> awaitChildEnd(pid_t child, Clock::time_point until) {
     const Look found = look(P_PID, static_cast<id_t>(child));
     if (found.over || Clock::now() >= until) return found.end;
-    const FileDescriptor handle(static_cast<int>(::syscall(kPidfdOpen, child, 0)));
+    const FileDescriptor handle = openPidfd(child);
     if (handle.get() == -1) return awaitByLooking(child, until);
     pollfd ended{handle.get(), POLLIN, 0};
     while (::poll(&ended, 1, timeLeft(until)) <= 0 && Clock::now() < until) {

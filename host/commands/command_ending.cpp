@@ -14,7 +14,7 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 /// Between two looks at the processes.
-constexpr std::chrono::milliseconds kLook{20};
+constexpr std::chrono::milliseconds kEndingLook{20};
 /// What does not even end by SIGKILL hangs in the kernel, or starts others faster than they can be
 /// killed.
 constexpr std::chrono::seconds kKillPatience{5};
@@ -79,7 +79,7 @@ void CommandEnding::work() {
         const bool lives = look(now < until_ ? SIGTERM : SIGKILL, descendants);
         lock.lock();
         if (finishing_ && (!lives || now > until_ + kKillPatience)) return;
-        changed_.wait_for(lock, kLook);
+        changed_.wait_for(lock, kEndingLook);
     }
 }
 

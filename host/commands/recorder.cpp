@@ -26,10 +26,10 @@ constexpr std::size_t kLongestLine = 16 * 1024;
 
 /// What an ended command left in its pipes may still be read.
 constexpr std::uint64_t kLeftInPipes = 256 * 1024;
-constexpr std::uint64_t kUsualLimit = std::uint64_t{16} << 20;
+constexpr std::uint64_t kUsualOutput = std::uint64_t{16} << 20;
 
 std::atomic<bool> endsDescendants{false};
-std::atomic<std::uint64_t> mostOutput{kUsualLimit};
+std::atomic<std::uint64_t> mostOutput{kUsualOutput};
 
 bool begins(std::string_view text, std::string_view with) {
     return text.substr(0, with.size()) == with;
@@ -45,7 +45,7 @@ std::optional<std::string_view> after(std::string_view text, std::string_view be
     return text.substr(beginning.size());
 }
 
-int numberIn(std::string_view text) {
+int numberInLine(std::string_view text) {
     int number = 0;
     std::from_chars(text.data(), text.data() + text.size(), number);
     return number;
@@ -93,7 +93,7 @@ void Recorder::hear(const ras1::HeardLine& line) noexcept {
             hearProcess(line, text);
         } else if (const auto answer = after(text, trace::kAnswer)) {
             const embedded::MutexLock lock(lock_);
-            others_.answer = numberIn(*answer);
+            others_.answer = numberInLine(*answer);
         } else if (begins(text, trace::kNoInventory)) {
             const embedded::MutexLock lock(lock_);
             others_.noInventory = true;
@@ -108,7 +108,7 @@ bool Recorder::hearInChild(const ras1::HeardLine& line, std::string_view text) {
     if (std::string_view(line.unit) != trace::kProcessUnit) return false;
     if (const auto pid = after(text, trace::kInChild)) {
         notes_.started.store(nanoseconds());
-        notes_.pid.store(numberIn(*pid));
+        notes_.pid.store(numberInLine(*pid));
         // Looked at after the process can be seen: who ends commands sees it, or it sees that.
         if (ending_.wanted.load() || ending_.tooMuch.load()) {
             ending_.reached.store(true);
@@ -151,13 +151,13 @@ void Recorder::hearRunner(std::string_view text) {
 
 void Recorder::hearProcess(const ras1::HeardLine& line, std::string_view text) {
     if (const auto seconds = after(text, trace::kTimeout)) {
-        timeout_ = std::chrono::seconds(std::max(0, numberIn(*seconds)));
+        timeout_ = std::chrono::seconds(std::max(0, numberInLine(*seconds)));
         const embedded::MutexLock lock(lock_);
         deadline_ = began_ + timeout_;
     } else if (const auto pid = after(text, trace::kWaiting)) {
-        waitForEnd(numberIn(*pid), line.function == trace::kGivesUp);
+        waitForEnd(numberInLine(*pid), line.function == trace::kGivesUp);
     } else if (const auto givenUp = after(text, trace::kGivenUp)) {
-        if (endsDescendants.load()) killDescendants(numberIn(*givenUp), orphansBefore_);
+        if (endsDescendants.load()) killDescendants(numberInLine(*givenUp), orphansBefore_);
     } else if (const auto program = after(text, trace::kNoProgram)) {
         const std::string path(*program);
         const int error = ::access(path.c_str(), X_OK) == 0 ? 0 : errno;
@@ -283,7 +283,7 @@ void Recorder::close(std::string_view status) {
         command.exit.reset();
         command.signal.reset();
     } else if (!command.exit && !command.signal && !status.empty()) {
-        command.exit = numberIn(status);
+        command.exit = numberInLine(status);
     } else if (!command.exit && !command.signal) {
         command.error = "could not be started";
     }

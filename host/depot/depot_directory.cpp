@@ -15,7 +15,7 @@ namespace host {
 namespace {
 
 /// 0, or why there is no such directory.
-int faultOf(const std::string& path) {
+int directoryFault(const std::string& path) {
     struct stat found {};
     if (::stat(path.c_str(), &found) != 0) return errno;
     return S_ISDIR(found.st_mode) ? 0 : ENOTDIR;
@@ -24,7 +24,7 @@ int faultOf(const std::string& path) {
 void makeDirectory(const std::string& path) {
     if (::mkdir(path.c_str(), 0700) == 0) return;
     const int reason = errno;
-    if (reason == EEXIST && faultOf(path) == 0) return;
+    if (reason == EEXIST && directoryFault(path) == 0) return;
     throw StartError("cannot make the depot directory " + path + ": " +
                      std::strerror(reason == EEXIST ? ENOTDIR : reason));
 }
@@ -60,7 +60,7 @@ void provideDepotDirectory(const DepotDirectory& depot) {
 }
 
 void requireDepotDirectory(const DepotDirectory& depot) {
-    const int fault = faultOf(depot.path);
+    const int fault = directoryFault(depot.path);
     if (fault == 0) return;
     throw StartError("the depot " + depot.path + " is not there and could not be made (" +
                      std::strerror(fault) +

@@ -5,15 +5,15 @@
 namespace host {
 namespace {
 
-constexpr std::size_t kLongestValue = 120;  // bytes
+constexpr std::size_t kLongestQuoted = 120;  // bytes
 constexpr std::size_t kShownNames = 20;
 
 }  // namespace
 
 std::string quoted(const std::string& value, const CodePage& codePage) {
     std::string shown = value;
-    if (shown.size() > kLongestValue) {
-        shown.resize(kLongestValue);
+    if (shown.size() > kLongestQuoted) {
+        shown.resize(kLongestQuoted);
         shown += "...";
     }
     return '"' + codePage.toUtf8(shown) + '"';

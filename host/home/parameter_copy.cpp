@@ -105,7 +105,7 @@ std::vector<std::string_view> linesOf(std::string_view text) {
     return lines;
 }
 
-bool contains(std::string_view text, std::string_view part) {
+bool holds(std::string_view text, std::string_view part) {
     return text.find(part) != std::string_view::npos;
 }
 
@@ -114,7 +114,7 @@ bool isRewritten(std::string_view line, std::string_view old) {
     const std::size_t at = line.find(kMarker);
     if (at == std::string_view::npos || line.back() != '|') return false;
     const std::string_view marked = line.substr(0, at + kMarker.size());
-    return line.size() > marked.size() && contains(old, marked);
+    return line.size() > marked.size() && holds(old, marked);
 }
 
 }  // namespace
@@ -133,8 +133,7 @@ bool isCutOff(std::string_view now, std::string_view before) {
         const std::string_view line = takeLine(now, ended);
         const bool isWhole = line == old[at] || isRewritten(line, old[at]);
         if (!isWhole) {
-            const bool isPart =
-                old[at].substr(0, line.size()) == line || contains(old[at], kMarker);
+            const bool isPart = old[at].substr(0, line.size()) == line || holds(old[at], kMarker);
             return !ended && isPart;
         }
         ++at;

@@ -22,7 +22,7 @@ constexpr std::size_t kLargest = std::size_t{16} << 20;
 /// A user's name that is longer is nobody's.
 constexpr std::size_t kLongestName = 1'024;
 
-std::string trimmed(const std::string& text) {
+std::string trimmedField(const std::string& text) {
     constexpr std::string_view kBlanks = " \t\r\n";
     const std::size_t begin = text.find_first_not_of(kBlanks);
     if (begin == std::string::npos) return "";
@@ -31,9 +31,9 @@ std::string trimmed(const std::string& text) {
 
 /// Follows the elements of a list: a root with agents, an agent with its product code and its
 /// instances, an instance with its name and its user.
-class Reader {
+class ListReader {
 public:
-    explicit Reader(RunAsList& list) : list_(list) {}
+    explicit ListReader(RunAsList& list) : list_(list) {}
 
     void open(std::string_view name) {
         ++depth_;
@@ -74,7 +74,7 @@ private:
         user_.clear();
     }
     void closePartOfInstance() {
-        const std::string user = isInUser_ ? trimmed(user_) : "";
+        const std::string user = isInUser_ ? trimmedField(user_) : "";
         if (!user.empty()) list_.users.insert(user);
         isInUser_ = false;
     }
@@ -104,15 +104,15 @@ private:
 };
 
 void onStart(void* reader, const char* name, const char**) {
-    static_cast<Reader*>(reader)->open(name);
+    static_cast<ListReader*>(reader)->open(name);
 }
 
 void onEnd(void* reader, const char*) {
-    static_cast<Reader*>(reader)->close();
+    static_cast<ListReader*>(reader)->close();
 }
 
 void onText(void* reader, const char* text, int length) {
-    static_cast<Reader*>(reader)->add({text, static_cast<std::size_t>(length)});
+    static_cast<ListReader*>(reader)->add({text, static_cast<std::size_t>(length)});
 }
 
 using Parser = std::unique_ptr<XML1_PARSER, decltype(&XML1_ParserFree)>;
@@ -152,7 +152,7 @@ std::string read(RunAsList& list) {
     if (::fstat(file.get(), &found) != 0 || !S_ISREG(found.st_mode)) return "it is not a file";
     const Parser parser(XML1_ParserCreate(nullptr), &XML1_ParserFree);
     if (parser == nullptr) return "it cannot be parsed for want of memory";
-    Reader reader(list);
+    ListReader reader(list);
     XML1_SetUserData(parser.get(), &reader);
     XML1_SetElementHandler(parser.get(), onStart, onEnd);
     XML1_SetCharacterDataHandler(parser.get(), onText);

@@ -12,7 +12,7 @@ namespace {
 
 constexpr std::chrono::milliseconds kHandOverRetry{1000};
 /// Between two looks at what is left of an earlier run.
-constexpr std::chrono::milliseconds kLook{100};
+constexpr std::chrono::milliseconds kDispatchLook{100};
 
 }  // namespace
 
@@ -48,7 +48,7 @@ void Dispatcher::awaitEndOf(const Leftovers& leftovers, std::chrono::seconds pat
     const auto until = std::chrono::steady_clock::now() + patience;
     while (!leftovers.gone()) {
         endLeftovers(leftovers, std::chrono::steady_clock::now() >= until);
-        if (!pause(kLook)) return;
+        if (!pause(kDispatchLook)) return;
     }
 }
 

@@ -12,7 +12,7 @@
 namespace host {
 namespace {
 
-constexpr long long kUsualLimit = 100;
+constexpr long long kUsualListed = 100;
 constexpr long long kMostTasks = 1000;
 
 TaskState stateNamed(const std::string& name) {
@@ -40,7 +40,7 @@ TaskFilter filterOf(const Call& call, const CodePage& codePage) {
     if (const std::string* const since = call.text("since")) filter.since = timeOf(*since);
     if (call.text("after") != nullptr) filter.before = call.number("after", 0);
     filter.limit =
-        static_cast<std::size_t>(std::min(call.number("limit", kUsualLimit), kMostTasks));
+        static_cast<std::size_t>(std::min(call.number("limit", kUsualListed), kMostTasks));
     return filter;
 }
 

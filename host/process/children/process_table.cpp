@@ -23,7 +23,7 @@ std::string_view takeField(std::string_view& text) {
 }
 
 template <typename Number>
-Number numberIn(std::string_view text) {
+Number statNumber(std::string_view text) {
     Number number = 0;
     std::from_chars(text.data(), text.data() + text.size(), number);
     return number;
@@ -61,19 +61,19 @@ std::optional<ProcessEntry> processIn(std::string_view stat) {
     const std::size_t nameEnd = stat.rfind(')');
     if (nameEnd == std::string_view::npos) return std::nullopt;
     ProcessEntry process;
-    process.pid = numberIn<pid_t>(stat);
+    process.pid = statNumber<pid_t>(stat);
     std::string_view rest = stat.substr(nameEnd + 1);
     const std::string_view state = takeField(rest);
     process.isAlive = state != "Z" && state != "X" && state != "x";
-    process.parent = numberIn<pid_t>(takeField(rest));
+    process.parent = statNumber<pid_t>(takeField(rest));
     takeField(rest);  // the process group
-    process.session = numberIn<pid_t>(takeField(rest));
+    process.session = statNumber<pid_t>(takeField(rest));
     constexpr int kFieldsBeforeStart = 15;
     for (int i = 0; i < kFieldsBeforeStart; ++i)
         takeField(rest);
     const std::string_view start = takeField(rest);
     if (start.empty() || process.pid <= 0) return std::nullopt;
-    process.start = numberIn<unsigned long long>(start);
+    process.start = statNumber<unsigned long long>(start);
     return process;
 }
 

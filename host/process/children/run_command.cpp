@@ -3,7 +3,6 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <spawn.h>
-#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -13,6 +12,7 @@
 #include <cstring>
 #include <system_error>
 
+#include "host/process/children/pidfd.h"
 #include "host/process/file_descriptor.h"
 
 namespace host {
@@ -20,12 +20,6 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 using End = CommandResult::End;
-
-#ifdef SYS_pidfd_open
-constexpr long kPidfdOpen = SYS_pidfd_open;
-#else
-constexpr long kPidfdOpen = 434;  // the same number on every architecture
-#endif
 
 /// How often the child is looked at where the kernel has no descriptors of processes.
 constexpr int kPollStep = 20;
@@ -101,8 +95,7 @@ int spawn(const std::vector<std::string>& argv, const Pipe& out, const Pipe& err
 /// A program that has been started. It is killed, unless it has ended, and reaped.
 class Child {
 public:
-    explicit Child(pid_t pid)
-        : pid_(pid), handle_(static_cast<int>(::syscall(kPidfdOpen, pid, 0))) {}
+    explicit Child(pid_t pid) : pid_(pid), handle_(openPidfd(pid)) {}
     ~Child() {
         if (!reaped_) kill();
     }
