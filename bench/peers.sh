@@ -55,11 +55,11 @@ await() {
 answers() { (exec 3<>"/dev/tcp/127.0.0.1/$1"); }
 
 # start_unguarded_host BUILD: starts a second host without guards beside that of start_host, on the same
-# home; sets `unguarded_socket`.
+# home; sets `unguarded_socket`. It has a journal of its own, which it would keep in memory otherwise.
 start_unguarded_host() {
     unguarded_socket=$scratch/unguarded.sock
     QVSDEPLOY_AGENTDEPOT=$scratch/depot start "$1/bin/zavhost" --home "$scratch/home" \
-        --socket "$unguarded_socket" --unguarded
+        --socket "$unguarded_socket" --state "$scratch/unguarded.state" --unguarded
     await grep -q "ready: $unguarded_socket" "$scratch/log"
 }
 
