@@ -373,10 +373,7 @@ TEST_F(Connections, FarBeyondTheLimitCostNothing) {
 TEST_F(Connections, LeaveNoDescriptorBehind) {
     start();
     EXPECT_EQ(connect().get("/v1/health").status, 200);
-    const auto settled = [&](std::size_t wanted) {
-        return eventually([&] { return openDescriptors() == wanted; });
-    };
-    std::size_t before = 0;
+    std::size_t before = 0;  // perhaps with that connection, which is closed a moment later
     ASSERT_TRUE(eventually([&] {
         const std::size_t now = openDescriptors();
         return std::exchange(before, now) == now;
@@ -387,7 +384,7 @@ TEST_F(Connections, LeaveNoDescriptorBehind) {
         if (i % 3 == 1) client.send("GET /v1/ta");
         if (i % 3 == 2) client.sendPost("/v1/query", plainQuery());
     }
-    EXPECT_TRUE(settled(before));
+    EXPECT_TRUE(eventually([&] { return openDescriptors() <= before; }));
 }
 
 TEST_F(Connections, AreNotInheritedByChildren) {
