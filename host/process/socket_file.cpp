@@ -8,13 +8,19 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <filesystem>
+#include <thread>
 #include <utility>
 
 #include "host/process/start_error.h"
 
 namespace host {
 namespace {
+
+/// A child of a host that was killed has that host's descriptors until it executes its program.
+constexpr std::chrono::seconds kChildHolds{2};
+constexpr std::chrono::milliseconds kChildPause{5};
 
 [[noreturn]] void failInUse(const std::string& path) {
     throw StartError("socket " + path + " is in use by a live host");
@@ -50,18 +56,27 @@ bool isStill(int descriptor, const std::string& name) {
            opened.st_dev == named.st_dev && opened.st_ino == named.st_ino;
 }
 
-FileDescriptor takeLock(const std::string& path) {
-    const std::string name = path + ".lock";
+/// The locked file; none if somebody else has locked it.
+FileDescriptor lockedFile(const std::string& name) {
     while (true) {
         FileDescriptor lock(
             ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
         if (!lock) throw StartError("cannot make " + name, errno);
         if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
-            if (errno == EWOULDBLOCK) failInUse(path);
+            if (errno == EWOULDBLOCK) return {};
             if (errno == EINTR) continue;
             throw StartError("cannot lock " + name, errno);
         }
         if (isStill(lock.get(), name)) return lock;
+    }
+}
+
+FileDescriptor takeLock(const std::string& path) {
+    const auto until = std::chrono::steady_clock::now() + kChildHolds;
+    while (true) {
+        if (FileDescriptor lock = lockedFile(path + ".lock")) return lock;
+        if (std::chrono::steady_clock::now() >= until) failInUse(path);
+        std::this_thread::sleep_for(kChildPause);
     }
 }
 

@@ -2,12 +2,15 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <filesystem>
 #include <optional>
+#include <thread>
 #include <utility>
 
 #include "host/process/start_error.h"
@@ -124,6 +127,17 @@ TEST_F(Socket, OfAHostThatWasKilledIsReplaced) {
     SocketFile socket(path);
     socket.listen();
     EXPECT_TRUE(RawClient(path).connected());
+}
+
+TEST_F(Socket, IsAwaitedWhileAChildOfAKilledHostStillHasItsLock) {
+    host::FileDescriptor lock(::open((path + ".lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+    ASSERT_EQ(::flock(lock.get(), LOCK_EX), 0);
+    std::thread child([&lock] {
+        std::this_thread::sleep_for(std::chrono::milliseconds(100));
+        lock = {};
+    });
+    EXPECT_EQ(errorOf(path), "");
+    child.join();
 }
 
 TEST_F(Socket, NeverReplacesAnotherKindOfFile) {
