@@ -22,11 +22,17 @@ inline bool logsToJournal() {
            stream == std::to_string(found.st_dev) + ":" + std::to_string(found.st_ino);
 }
 
-/// One line: for the journal with its priority in front, else with the program's name.
+/// One line: for the journal with its priority in front, else with the program's name. Clients'
+/// words may be in the text, so blanks stand for its control characters, which a terminal would
+/// obey.
 inline std::string logLine(Priority priority, std::string text, bool toJournal) {
+    constexpr char kDelete = 0x7F;
     std::replace_if(
         text.begin(), text.end(),
-        [](char character) { return character == '\n' || character == '\r'; }, ' ');
+        [](char character) {
+            return static_cast<unsigned char>(character) < ' ' || character == kDelete;
+        },
+        ' ');
     const std::string beginning = toJournal ? "<" + std::to_string(static_cast<int>(priority)) + ">"
                                             : std::string("zavhost: ");
     return beginning + text + "\n";

@@ -20,6 +20,12 @@ TEST(Log, AnEventIsOneLine) {
     EXPECT_EQ(logLine(Priority::Error, "a\nb\r\nc", true), "<3>a b  c\n");
 }
 
+TEST(Log, NothingInALineSteersATerminal) {
+    EXPECT_EQ(logLine(Priority::Info, "a\033[2Jb\007c\177d\te", false), "zavhost: a [2Jb c d e\n");
+    EXPECT_EQ(logLine(Priority::Info, "gr\xC3\xBC\xC3\x9F", false),
+              "zavhost: gr\xC3\xBC\xC3\x9F\n");
+}
+
 TEST(Log, OnlyTheStreamThatIsNamedIsTheJournals) {
     struct stat found {};
     ASSERT_EQ(::fstat(STDERR_FILENO, &found), 0);
