@@ -10,8 +10,8 @@
 #include <string>
 #include <vector>
 
+#include "ctl/client/address/peer.h"
 #include "ctl/client/failure.h"
-#include "ctl/client/peer.h"
 #include "ctl/command_line.h"
 #include "ctl/show/page.h"
 #include "ctl/show/terminal.h"

@@ -31,15 +31,15 @@
 #include "host/http/peer.h"
 #include "host/http/server.h"
 #include "host/process/children/orphans.h"
+#include "host/process/configuration/options.h"
+#include "host/process/configuration/task_timeout.h"
 #include "host/process/home_lock.h"
 #include "host/process/log.h"
-#include "host/process/options.h"
 #include "host/process/plugin_loader.h"
 #include "host/process/setup.h"
-#include "host/process/signal_descriptor.h"
 #include "host/process/socket_file.h"
 #include "host/process/start_error.h"
-#include "host/process/task_timeout.h"
+#include "host/process/system/signal_descriptor.h"
 #include "host/service/notifier.h"
 #include "host/service/regularly.h"
 #include "host/service/service_environment.h"
@@ -164,7 +164,9 @@ void reopenLogs(int signals) {
 void attendToOrphans(HttpServer& server, int childSignals) {
     adoptOrphans();
     endWhatGivenUpCommandsStarted();
-    server.whenReadable(childSignals, [childSignals] {
+    // Each child of the plug-in sends a signal, too, and needs nothing of this thread.
+    constexpr std::chrono::milliseconds kPatience{100};
+    server.whenReadable(childSignals, kPatience, [childSignals] {
         forgetSignals(childSignals);
         reapOrphans();
     });
@@ -276,11 +278,12 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     if (keepsListener) server.leaveListenerOpen();
     server.endWhenReadable(endDescriptor, options.grace,
                            [&notifier] { notifier.tell("STOPPING=1\n"); });
-    server.whenReadable(reopenDescriptor, [&notifier, reopenDescriptor] {
-        notifier.tell(reloadingNotice());
-        reopenLogs(reopenDescriptor);
-        notifier.tell("READY=1\n");
-    });
+    server.whenReadable(reopenDescriptor, std::chrono::milliseconds(0),
+                        [&notifier, reopenDescriptor] {
+                            notifier.tell(reloadingNotice());
+                            reopenLogs(reopenDescriptor);
+                            notifier.tell("READY=1\n");
+                        });
     feedWatchdog(server, notifier, services.journal, service);
     if (options.guarded) attendToOrphans(server, childDescriptor);
     services.dispatcher.start(services.leftovers, options.orphanWait,

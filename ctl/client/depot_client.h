@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-#include "ctl/client/host_address.h"
+#include "ctl/client/address/host_address.h"
 
 namespace ctl {
 

@@ -1,8 +1,8 @@
 /// Whether the host guards its users.
 #pragma once
 
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/deadline.h"
-#include "ctl/client/host_address.h"
 
 namespace ctl {
 

@@ -1,8 +1,8 @@
 /// What a verb receives when it runs.
 #pragma once
 
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/deadline.h"
-#include "ctl/client/host_address.h"
 #include "ctl/show/page.h"
 #include "ctl/verbs/arguments/values.h"
 

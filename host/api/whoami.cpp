@@ -4,7 +4,7 @@
 
 #include "host/api/call.h"
 #include "host/api/services.h"
-#include "host/process/user_name.h"
+#include "host/process/system/user_name.h"
 
 namespace host {
 

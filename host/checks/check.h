@@ -8,8 +8,8 @@
 #include <vector>
 
 #include "host/home/inventory.h"
-#include "host/process/environment.h"
-#include "host/process/options.h"
+#include "host/process/configuration/environment.h"
+#include "host/process/configuration/options.h"
 
 namespace host {
 

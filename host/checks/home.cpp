@@ -18,7 +18,7 @@
 #include "host/checks/wording.h"
 #include "host/home/run_as_list.h"
 #include "host/home/temporary_directory.h"
-#include "host/process/trusted_file.h"
+#include "host/process/system/trusted_file.h"
 
 namespace host {
 namespace {

@@ -16,7 +16,7 @@
 
 #include "host/checks/check.h"
 #include "host/checks/wording.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 namespace {

@@ -19,9 +19,9 @@
 #include "host/checks/check.h"
 #include "host/depot/depot_directory.h"
 #include "host/process/children/run_command.h"
+#include "host/process/configuration/task_timeout.h"
 #include "host/process/socket_file.h"
 #include "host/process/start_error.h"
-#include "host/process/task_timeout.h"
 
 namespace host {
 namespace {

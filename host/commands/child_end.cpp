@@ -9,7 +9,7 @@
 #include <ctime>
 
 #include "host/process/children/pidfd.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 namespace {

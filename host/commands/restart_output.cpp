@@ -9,7 +9,7 @@
 #include <string_view>
 
 #include "host/commands/trace_texts.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 #include "secrets/masked.h"
 
 namespace host {

@@ -6,7 +6,7 @@
 #include <optional>
 #include <string>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 

@@ -14,7 +14,7 @@
 #include "host/depot/depot_error.h"
 #include "host/depot/real_path.h"
 #include "host/depot/remove_tree.h"
-#include "host/process/directory_stream.h"
+#include "host/process/system/directory_stream.h"
 
 namespace host {
 namespace {

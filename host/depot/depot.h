@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "host/depot/checksum.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 

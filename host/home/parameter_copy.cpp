@@ -9,7 +9,7 @@
 #include <system_error>
 #include <vector>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 namespace {

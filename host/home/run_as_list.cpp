@@ -11,7 +11,7 @@
 #include <string_view>
 #include <system_error>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 #include "platform/xml1.h"
 
 namespace host {

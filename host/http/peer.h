@@ -5,7 +5,7 @@
 
 #include <string>
 
-#include "host/process/groups.h"
+#include "host/process/system/groups.h"
 
 namespace host {
 

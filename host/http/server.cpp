@@ -15,8 +15,8 @@
 #include "host/http/server_core.h"
 #include "host/http/session.h"
 #include "host/http/turned_away.h"
-#include "host/process/file_descriptor.h"
 #include "host/process/start_error.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -44,18 +44,28 @@ using Descriptor = net::posix::basic_stream_descriptor<net::io_context::executor
 
 /// Something beside clients that the I/O thread attends to.
 struct Watched {
-    Watched(net::io_context& io, int descriptor, std::function<void()> action)
-        : readable(io, descriptor), act(std::move(action)) {}
+    Watched(net::io_context& io, int descriptor, std::chrono::milliseconds wait,
+            std::function<void()> action)
+        : readable(io, descriptor), timer(io), delay(wait), act(std::move(action)) {}
 
     void await() {
         readable.async_wait(net::posix::descriptor_base::wait_read, [this](Error error) {
             if (error) return;
-            act();
-            await();
+            if (delay.count() == 0) return attend();
+            timer.expires_after(delay);
+            timer.async_wait([this](Error cancelled) {
+                if (!cancelled) attend();
+            });
         });
+    }
+    void attend() {
+        act();
+        await();
     }
 
     Descriptor readable;
+    Timer timer;
+    const std::chrono::milliseconds delay;
     const std::function<void()> act;
 };
 
@@ -252,10 +262,11 @@ void HttpServer::endWhenReadable(int descriptor, std::chrono::milliseconds grace
                                      });
 }
 
-void HttpServer::whenReadable(int descriptor, std::function<void()> act) {
+void HttpServer::whenReadable(int descriptor, std::chrono::milliseconds delay,
+                              std::function<void()> act) {
     auto& watched = implementation_->watched;
-    watched.push_back(
-        std::make_unique<Watched>(implementation_->core.io, duplicate(descriptor), std::move(act)));
+    watched.push_back(std::make_unique<Watched>(implementation_->core.io, duplicate(descriptor),
+                                                delay, std::move(act)));
     watched.back()->await();
 }
 

@@ -42,8 +42,9 @@ public:
     /// `act` must not block and must not throw. Before run(), at most once.
     void every(std::chrono::milliseconds time, std::function<void()> act);
     /// Calls `act` on the thread of run() whenever `descriptor`, which stays the caller's, is
-    /// readable. `act` makes it unreadable, must not block and must not throw. Before run().
-    void whenReadable(int descriptor, std::function<void()> act);
+    /// readable, and `delay` has passed since it became so: what happens meanwhile costs no call of
+    /// its own. `act` makes it unreadable, must not block and must not throw. Before run().
+    void whenReadable(int descriptor, std::chrono::milliseconds delay, std::function<void()> act);
 
 private:
     struct Implementation;

@@ -4,7 +4,7 @@
 #include <chrono>
 #include <cstddef>
 
-#include "host/process/groups.h"
+#include "host/process/system/groups.h"
 
 namespace host {
 

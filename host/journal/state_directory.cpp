@@ -9,7 +9,7 @@
 #include <system_error>
 
 #include "host/process/start_error.h"
-#include "host/process/trusted_file.h"
+#include "host/process/system/trusted_file.h"
 
 namespace host {
 namespace {

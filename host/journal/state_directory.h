@@ -4,8 +4,8 @@
 #include <optional>
 #include <string>
 
-#include "host/process/file_descriptor.h"
 #include "host/process/home_lock.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 

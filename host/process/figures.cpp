@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "host/process/children/process_table.h"
-#include "host/process/directory_stream.h"
+#include "host/process/system/directory_stream.h"
 
 namespace host {
 namespace {

@@ -3,8 +3,8 @@
 
 #include <string>
 
-#include "host/process/file_descriptor.h"
 #include "host/process/start_error.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 

@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 

@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
-#include "host/process/environment.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/configuration/environment.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 

@@ -11,7 +11,7 @@
 #include <vector>
 
 #include "host/checks/check_list.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 #include "host/raw_client.h"
 #include "support/host/program.h"
 #include "support/host/starter_home.h"

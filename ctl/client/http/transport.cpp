@@ -1,8 +1,8 @@
 #include "ctl/client/http/transport.h"
 
+#include "ctl/client/address/no_host.h"
+#include "ctl/client/address/peer.h"
 #include "ctl/client/http/bounded_json.h"
-#include "ctl/client/no_host.h"
-#include "ctl/client/peer.h"
 
 using nlohmann::json;
 

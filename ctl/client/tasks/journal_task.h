@@ -6,8 +6,8 @@
 #include <optional>
 #include <string>
 
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/deadline.h"
-#include "ctl/client/host_address.h"
 #include "ctl/client/host_client.h"
 #include "ctl/client/tasks/task_request.h"
 #include "ctl/client/tasks/task_result.h"

@@ -6,8 +6,8 @@
 #include <nlohmann/json.hpp>
 #include <string>
 
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/deadline.h"
-#include "ctl/client/host_address.h"
 #include "ctl/client/host_client.h"
 #include "ctl/client/http/event_stream.h"
 #include "ctl/client/tasks/task_request.h"

@@ -1,7 +1,7 @@
 /// Runs a command that the host queues.
 #pragma once
 
-#include "ctl/client/host_address.h"
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/tasks/task_request.h"
 #include "ctl/client/tasks/task_result.h"
 

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "ctl/client/host_address.h"
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/transfer/pushed_file.h"
 
 namespace ctl {

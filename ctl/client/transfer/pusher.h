@@ -5,7 +5,7 @@
 #include <deque>
 #include <functional>
 
-#include "ctl/client/host_address.h"
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/transfer/pushed_file.h"
 #include "ctl/client/transfer/transfer_client.h"
 

@@ -11,9 +11,9 @@
 #include <cerrno>
 #include <cstring>
 
+#include "ctl/client/address/no_host.h"
+#include "ctl/client/address/peer.h"
 #include "ctl/client/failure.h"
-#include "ctl/client/no_host.h"
-#include "ctl/client/peer.h"
 #include "ctl/client/transfer/interruption.h"
 
 namespace ctl {

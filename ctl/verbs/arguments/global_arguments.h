@@ -1,7 +1,7 @@
 /// The options that every verb takes.
 #pragma once
 
-#include "ctl/client/host_address.h"
+#include "ctl/client/address/host_address.h"
 #include "ctl/show/page.h"
 #include "ctl/verbs/arguments/argument.h"
 #include "ctl/verbs/arguments/values.h"

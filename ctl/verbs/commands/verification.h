@@ -4,8 +4,8 @@
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/deadline.h"
-#include "ctl/client/host_address.h"
 #include "ctl/client/tasks/task_request.h"
 #include "ctl/client/tasks/task_result.h"
 

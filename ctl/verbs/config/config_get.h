@@ -5,7 +5,7 @@
 #include <nlohmann/json.hpp>
 #include <string>
 
-#include "ctl/client/host_address.h"
+#include "ctl/client/address/host_address.h"
 #include "ctl/client/host_client.h"
 #include "ctl/show/page.h"
 

@@ -8,7 +8,7 @@
 #include "host/commands/ear.h"
 #include "host/guard/refusal.h"
 #include "host/outcomes/shown_request.h"
-#include "host/process/user_name.h"
+#include "host/process/system/user_name.h"
 #include "host/tables/plugin_facts.h"
 
 namespace host {

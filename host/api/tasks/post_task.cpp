@@ -12,7 +12,7 @@
 #include "host/api/time_text.h"
 #include "host/guard/refusal.h"
 #include "host/outcomes/shown_request.h"
-#include "host/process/user_name.h"
+#include "host/process/system/user_name.h"
 #include "host/tables/bad_request.h"
 #include "host/tables/conditions.h"
 #include "host/tables/plugin_facts.h"

@@ -9,7 +9,7 @@
 #include <cerrno>
 #include <filesystem>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace fs = std::filesystem;
 

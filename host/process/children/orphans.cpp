@@ -11,9 +11,9 @@
 #include <string>
 #include <system_error>
 
-#include "host/process/directory_stream.h"
-#include "host/process/file_descriptor.h"
 #include "host/process/start_error.h"
+#include "host/process/system/directory_stream.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 namespace {

@@ -8,8 +8,8 @@
 #include <charconv>
 #include <string>
 
-#include "host/process/directory_stream.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/directory_stream.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 namespace {

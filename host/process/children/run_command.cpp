@@ -13,7 +13,7 @@
 #include <system_error>
 
 #include "host/process/children/pidfd.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace host {
 namespace {

@@ -20,9 +20,9 @@
 #include <toml++/toml.h>
 
 #include "host/process/configuration/option_table.h"
-#include "host/process/file_descriptor.h"
 #include "host/process/start_error.h"
-#include "host/process/trusted_file.h"
+#include "host/process/system/file_descriptor.h"
+#include "host/process/system/trusted_file.h"
 #include "host/text/nearest_name.h"
 
 namespace host {

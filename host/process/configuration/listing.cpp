@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "host/process/configuration/option_table.h"
-#include "host/process/task_timeout.h"
+#include "host/process/configuration/task_timeout.h"
 
 namespace host {
 namespace {

@@ -3,9 +3,9 @@
 
 #include <string>
 
+#include "host/process/configuration/environment.h"
+#include "host/process/configuration/host_options.h"
 #include "host/process/configuration/settings.h"
-#include "host/process/environment.h"
-#include "host/process/host_options.h"
 
 namespace host {
 

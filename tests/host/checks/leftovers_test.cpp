@@ -6,7 +6,7 @@
 #include <filesystem>
 
 #include "host/checks/check_fixture.h"
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 
 namespace {
 

@@ -5,7 +5,7 @@
 
 #include <system_error>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 #include "support/scratch_dir.h"
 
 namespace {

@@ -6,7 +6,7 @@
 
 #include <cerrno>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 #include "support/scratch_dir.h"
 
 namespace {

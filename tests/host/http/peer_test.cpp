@@ -12,8 +12,8 @@
 
 #include <vector>
 
-#include "host/process/file_descriptor.h"
 #include "host/process/socket_file.h"
+#include "host/process/system/file_descriptor.h"
 #include "host/raw_client.h"
 #include "support/scratch_dir.h"
 

@@ -8,7 +8,7 @@
 
 #include <chrono>
 
-#include "host/process/file_descriptor.h"
+#include "host/process/system/file_descriptor.h"
 #include "support/host/program.h"
 
 namespace {

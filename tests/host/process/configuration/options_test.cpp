@@ -1,4 +1,4 @@
-#include "host/process/options.h"
+#include "host/process/configuration/options.h"
 
 #include <gtest/gtest.h>
 

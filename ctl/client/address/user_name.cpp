@@ -1,4 +1,4 @@
-#include "ctl/client/user_name.h"
+#include "ctl/client/address/user_name.h"
 
 #include <pwd.h>
 

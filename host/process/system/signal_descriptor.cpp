@@ -1,4 +1,4 @@
-#include "host/process/signal_descriptor.h"
+#include "host/process/system/signal_descriptor.h"
 
 #include <sys/eventfd.h>
 #include <unistd.h>

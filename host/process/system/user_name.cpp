@@ -1,4 +1,4 @@
-#include "host/process/user_name.h"
+#include "host/process/system/user_name.h"
 
 #include <pwd.h>
 

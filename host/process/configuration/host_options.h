@@ -6,7 +6,7 @@
 #include <optional>
 #include <string>
 
-#include "host/process/groups.h"
+#include "host/process/system/groups.h"
 
 namespace host {
 

@@ -3,8 +3,8 @@
 
 #include <optional>
 
-#include "host/process/environment.h"
-#include "host/process/host_options.h"
+#include "host/process/configuration/environment.h"
+#include "host/process/configuration/host_options.h"
 
 namespace host {
 

@@ -1,4 +1,4 @@
-#include "ctl/client/no_host.h"
+#include "ctl/client/address/no_host.h"
 
 #include <grp.h>
 #include <sys/stat.h>
@@ -6,7 +6,7 @@
 #include <cerrno>
 #include <cstring>
 
-#include "ctl/client/user_name.h"
+#include "ctl/client/address/user_name.h"
 
 namespace ctl {
 namespace {

@@ -1,4 +1,4 @@
-#include "ctl/client/no_host.h"
+#include "ctl/client/address/no_host.h"
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>

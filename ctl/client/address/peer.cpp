@@ -1,4 +1,4 @@
-#include "ctl/client/peer.h"
+#include "ctl/client/address/peer.h"
 
 #include <pwd.h>
 #include <sys/socket.h>
@@ -9,7 +9,7 @@
 #include <cstring>
 #include <system_error>
 
-#include "ctl/client/user_name.h"
+#include "ctl/client/address/user_name.h"
 
 namespace ctl {
 namespace {

@@ -1,4 +1,4 @@
-#include "host/process/options.h"
+#include "host/process/configuration/options.h"
 
 #include <algorithm>
 #include <charconv>
@@ -9,8 +9,8 @@
 #include "host/process/configuration/configuration_file.h"
 #include "host/process/configuration/listing.h"
 #include "host/process/configuration/settings.h"
+#include "host/process/configuration/task_timeout.h"
 #include "host/process/start_error.h"
-#include "host/process/task_timeout.h"
 
 namespace host {
 namespace {

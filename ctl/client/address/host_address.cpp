@@ -1,4 +1,4 @@
-#include "ctl/client/host_address.h"
+#include "ctl/client/address/host_address.h"
 
 #include <cstdlib>
 

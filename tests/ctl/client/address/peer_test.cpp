@@ -1,4 +1,4 @@
-#include "ctl/client/peer.h"
+#include "ctl/client/address/peer.h"
 
 #include <gtest/gtest.h>
 #include <sys/socket.h>

@@ -1,4 +1,4 @@
-#include "host/process/task_timeout.h"
+#include "host/process/configuration/task_timeout.h"
 
 #include <charconv>
 #include <climits>

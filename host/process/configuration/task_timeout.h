@@ -4,7 +4,7 @@
 #include <optional>
 #include <string>
 
-#include "host/process/environment.h"
+#include "host/process/configuration/environment.h"
 
 namespace host {
 

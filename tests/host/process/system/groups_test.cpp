@@ -1,4 +1,4 @@
-#include "host/process/groups.h"
+#include "host/process/system/groups.h"
 
 #include <grp.h>
 #include <gtest/gtest.h>
