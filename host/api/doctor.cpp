@@ -2,6 +2,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include "host/api/description/schema.h"
 #include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/checks/check_list.h"
@@ -9,6 +10,7 @@
 namespace host {
 
 Endpoint getDoctor;
+Schema doctorSchema;
 
 Answer getDoctor(Services& services, const Call&) {
     const CodePage& codePage = services.codePage;
@@ -21,6 +23,20 @@ Answer getDoctor(Services& services, const Call&) {
                             {"remedy", codePage.toUtf8(result.finding.remedy)}});
     }
     return jsonReply(200, document.dump());
+}
+
+nlohmann::ordered_json doctorSchema(Components&) {
+    const nlohmann::ordered_json check = shape::object(
+        "Check", "What one check of the home and the machine found.",
+        {{"check", shape::text("the check's name")},
+         {"result",
+          shape::oneOf("error: a guarded host refuses to start",
+                       {nameOf(Verdict::Ok), nameOf(Verdict::Warning), nameOf(Verdict::Error)})},
+         {"text", shape::text("what was found")},
+         {"remedy", shape::text("what to do; empty if there is nothing to do")}});
+    nlohmann::ordered_json checks = shape::listOf("The checks in their order.", check);
+    checks["title"] = "Checks";
+    return checks;
 }
 
 }  // namespace host

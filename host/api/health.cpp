@@ -2,6 +2,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include "host/api/description/schema.h"
 #include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/process/version.h"
@@ -9,6 +10,7 @@
 namespace host {
 
 Endpoint getHealth;
+Schema healthSchema;
 
 Answer getHealth(Services& services, const Call&) {
     using std::chrono::duration_cast;
@@ -23,6 +25,19 @@ Answer getHealth(Services& services, const Call&) {
         {"guarded", services.guarded},
         {"journal", services.journal.identity()}};
     return jsonReply(200, document.dump());
+}
+
+nlohmann::ordered_json healthSchema(Components&) {
+    return shape::object(
+        "Health", "What a host says about itself.",
+        {{"version", shape::text("the product's version")},
+         {"width", shape::oneNumberOf("the width of the process in bits", {32, 64})},
+         {"home", shape::text("the home directory")},
+         {"origin_node", shape::text("the name of the node that the host stands for")},
+         {"uptime_seconds", shape::wholeNumber("how long the host has been running")},
+         {"subscriptions", shape::wholeNumber("how many streams of events are open")},
+         {"guarded", shape::yesOrNo("whether guards look at requests")},
+         {"journal", shape::text("the identity of the journal")}});
 }
 
 }  // namespace host

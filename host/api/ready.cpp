@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 
 #include "host/api/call.h"
+#include "host/api/description/schema.h"
 #include "host/api/services.h"
 #include "host/tables/plugin_facts.h"
 
@@ -53,6 +54,7 @@ void lookAtWaits(const Services& services, Reasons& reasons) {
 }  // namespace
 
 Endpoint getReady;
+Schema readySchema;
 
 Answer getReady(Services& services, const Call&) {
     Reasons reasons(services.codePage);
@@ -62,6 +64,17 @@ Answer getReady(Services& services, const Call&) {
     const bool ready = reasons.list().empty();
     const Document document = {{"ready", ready}, {"reasons", reasons.list()}};
     return jsonReply(ready ? 200 : 503, document.dump());
+}
+
+nlohmann::ordered_json readySchema(Components&) {
+    const nlohmann::ordered_json reason = shape::object(
+        "Reason", "Why a host does not carry out commands.",
+        {{"part",
+          shape::oneOf("what is not ready", {"plugin", "journal", "disk", "leftovers", "install"})},
+         {"text", shape::text("a sentence")}});
+    return shape::object("Ready", "Whether the host takes and carries out commands.",
+                         {{"ready", shape::yesOrNo("whether it does")},
+                          {"reasons", shape::listOf("why not; empty if it does", reason)}});
 }
 
 }  // namespace host

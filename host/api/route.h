@@ -1,8 +1,9 @@
 /// A route: everything that the host knows about one request of its interface, as one row of data.
 /// Dispatching, checks of parameters and bodies, 405 with Allow, HEAD and OPTIONS all follow from
-/// it, and so does the documentation's check.
+/// it, and so do the interface's description for machines and the documentation's check.
 #pragma once
 
+#include <nlohmann/json_fwd.hpp>
 #include <vector>
 
 #include "host/http/handler.h"
@@ -10,12 +11,17 @@
 namespace host {
 
 class Call;
+class Components;
 struct Services;
 
 /// Answers one request that fits its route. What it throws as BadRequest is answered with 400, as
 /// Refusal with 409 or 400, as DepotError with 400, 403, 404 or 500, as QueryFailed with 404 or
 /// 500.
 using Endpoint = Answer(Services& services, const Call& call);
+
+/// The shape of a document, for the interface's description; see api/description/schema.h. What it
+/// refers to it adds to the components.
+using Schema = nlohmann::ordered_json(Components& components);
 
 /// Where an endpoint runs.
 enum class Runs {
@@ -38,6 +44,7 @@ struct Parameter {
     Type type;
     Need need;  ///< path parameters are always present
     const char* doc;
+    Schema* schema = nullptr;  ///< for the description, if it can say more than the type
 };
 
 /// The JSON type of a member of the body.
@@ -48,6 +55,21 @@ struct Member {
     JsonType type;
     Need need;
     const char* doc;
+    Schema* schema = nullptr;  ///< for the description, if it can say more than the type
+};
+
+/// One kind of event of a stream.
+struct StreamEvent {
+    const char* name;  ///< "message" stands for events without a name
+    Schema* data;
+};
+
+/// What a request is answered with, if it is not answered with an error.
+struct RouteAnswer {
+    unsigned status;
+    const char* doc;   ///< begins with a small letter, no full stop
+    Schema* document;  ///< null: the answer is a stream of events, or else plain text
+    std::vector<StreamEvent> events{};
 };
 
 /// Whether a query may have parameters beyond those that the route names.
@@ -65,9 +87,11 @@ struct Route {
     Access access;    ///< what a client must at least be allowed to do
     Runs runs;
     Endpoint* endpoint;
+    std::vector<RouteAnswer> answers{};
     std::vector<Parameter> parameters{};
     Others others = Others::None;
-    std::vector<Member> body{};  ///< of a JSON object; empty: a body is not looked at
+    std::vector<Member> body{};      ///< of a JSON object; empty: a body is not looked at
+    std::vector<unsigned> errors{};  ///< statuses besides those that any request may get
 };
 
 }  // namespace host

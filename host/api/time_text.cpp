@@ -5,9 +5,13 @@
 #include <ctime>
 #include <optional>
 
+#include "host/api/description/schema.h"
 #include "host/tables/bad_request.h"
 
 namespace host {
+
+Schema timeSchema;
+
 namespace {
 
 constexpr std::size_t kWhole = 19;  // up to the seconds
@@ -77,6 +81,13 @@ WallClock::time_point timeOf(const std::string& text) {
         throw bad;
     }
     return WallClock::from_time_t(seconds) + *fraction;
+}
+
+nlohmann::ordered_json timeSchema(Components&) {
+    return {{"title", "Time"},
+            {"type", "string"},
+            {"format", "date-time"},
+            {"description", "A time in UTC, as RFC 3339 writes it, with Z at its end."}};
 }
 
 }  // namespace host

@@ -6,6 +6,7 @@
 
 #include "host/api/call.h"
 #include "host/api/depot/depot_documents.h"
+#include "host/api/description/schema.h"
 #include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/guard/refusal.h"
@@ -13,6 +14,7 @@
 namespace host {
 
 Endpoint getDepot, deleteDepot;
+Schema depotListingSchema, depotRemovalSchema, depotEntrySchema;
 
 Answer getDepot(Services& services, const Call& call) {
     const std::string* const given = call.text("path");
@@ -41,6 +43,23 @@ Answer deleteDepot(Services& services, const Call& call) {
     nlohmann::ordered_json document;
     putName(document, "removed", path);
     return jsonReply(200, document.dump());
+}
+
+nlohmann::ordered_json depotListingSchema(Components& components) {
+    return shape::object(
+        "DepotListing", "A directory of the depot, or one file.",
+        {{"path", shape::text("what was asked for")},
+         {"escaped", escapedShape(), Need::Optional},
+         {"type", shape::about("what it is", depotTypeShape())},
+         {"entries", shape::listOf("in the order of their names; of a file its own",
+                                   components.ref(depotEntrySchema))},
+         {"complete", shape::yesOrNo("false: there are more than 10,000 entries")}});
+}
+
+nlohmann::ordered_json depotRemovalSchema(Components&) {
+    return shape::object(
+        "DepotRemoval", "What has been removed.",
+        {{"removed", shape::text("the path")}, {"escaped", escapedShape(), Need::Optional}});
 }
 
 }  // namespace host

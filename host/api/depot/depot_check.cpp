@@ -6,12 +6,14 @@
 
 #include "host/api/call.h"
 #include "host/api/depot/depot_documents.h"
+#include "host/api/description/schema.h"
 #include "host/api/route.h"
 #include "host/api/services.h"
 
 namespace host {
 
 Endpoint getDepotCheck;
+Schema depotCheckSchema;
 
 namespace {
 
@@ -110,6 +112,34 @@ Answer getDepotCheck(Services& services, const Call& call) {
     if (!fits) putObjection(document, tooLittleSpace(needed, free + verdict.freed));
     document["files"] = std::move(verdict.files);
     return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+}
+
+namespace {
+
+std::vector<shape::Property> withObjection(std::vector<shape::Property> properties) {
+    properties.push_back({"error", shape::text("why it would not be taken"), Need::Optional});
+    properties.push_back({"guard", shape::text("the guard that says so"), Need::Optional});
+    properties.push_back({"hint", shape::text("the way out"), Need::Optional});
+    return properties;
+}
+
+}  // namespace
+
+nlohmann::ordered_json depotCheckSchema(Components&) {
+    const nlohmann::ordered_json file = shape::object(
+        "DepotCheckedFile", "Whether the host would take one file.",
+        withObjection({{"path", shape::text("its name to be")},
+                       {"escaped", escapedShape(), Need::Optional},
+                       {"taken", shape::yesOrNo("whether the host would take it")},
+                       {"converted", shape::yesOrNo("whether its line ends are converted")},
+                       {"replaces", shape::yesOrNo("whether there is a file of that name")}}));
+    return shape::object(
+        "DepotCheck", "Whether the host would take files.",
+        withObjection({{"guarded", shape::yesOrNo("whether guards look at transfers")},
+                       {"taken", shape::yesOrNo("whether it would take all of them")},
+                       {"free_bytes", shape::wholeNumber("the free space")},
+                       {"replaced_bytes", shape::wholeNumber("what they would replace")},
+                       {"files", shape::listOf("in the order of the request", file)}}));
 }
 
 }  // namespace host

@@ -4,9 +4,13 @@
 #include <ctime>
 #include <nlohmann/json.hpp>
 
+#include "host/api/description/schema.h"
 #include "host/tables/code_page.h"
 
 namespace host {
+
+Schema depotEntrySchema, timeSchema;
+
 namespace {
 
 using nlohmann::ordered_json;
@@ -64,6 +68,26 @@ ordered_json documentOf(const DepotEntry& entry) {
     document["bytes"] = entry.bytes;
     document["modified"] = timeText(entry.modified);
     return document;
+}
+
+nlohmann::ordered_json escapedShape() {
+    return shape::text("the bytes of the name, percent-encoded, if it is not UTF-8");
+}
+
+nlohmann::ordered_json depotTypeShape() {
+    using Kind = DepotEntry::Type;
+    return shape::oneOf("what it is", {nameOf(Kind::File), nameOf(Kind::Directory),
+                                       nameOf(Kind::Link), nameOf(Kind::Other)});
+}
+
+nlohmann::ordered_json depotEntrySchema(Components& components) {
+    return shape::object(
+        "DepotEntry", "An entry of a directory.",
+        {{"name", shape::text("its name")},
+         {"escaped", escapedShape(), Need::Optional},
+         {"type", depotTypeShape()},
+         {"bytes", shape::wholeNumber("its size; 0 for all but files")},
+         {"modified", shape::about("when it was changed", components.ref(timeSchema))}});
 }
 
 }  // namespace host

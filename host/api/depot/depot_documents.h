@@ -14,4 +14,8 @@ void putName(nlohmann::ordered_json& document, const char* member, const std::st
 
 nlohmann::ordered_json documentOf(const DepotEntry& entry);
 
+/// What "escaped" and the type of an entry look like, for the interface's description.
+nlohmann::ordered_json escapedShape();
+nlohmann::ordered_json depotTypeShape();
+
 }  // namespace host

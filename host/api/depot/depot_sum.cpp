@@ -8,6 +8,7 @@
 
 #include "host/api/call.h"
 #include "host/api/depot/depot_documents.h"
+#include "host/api/description/schema.h"
 #include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/depot/depot_error.h"
@@ -69,6 +70,7 @@ void advance(const std::shared_ptr<Sums>& sums) {
 }  // namespace
 
 Endpoint getDepotSum;
+Schema depotSumsSchema;
 
 Answer getDepotSum(Services& services, const Call& call) {
     const auto begin = [&services, paths = call.texts("path")](const Responder& responder) {
@@ -78,6 +80,18 @@ Answer getDepotSum(Services& services, const Call& call) {
     };
     const auto atLimit = []() -> Answer { return tryAgain("the checksums are not ready"); };
     return Later{begin, kLongest, atLimit};
+}
+
+nlohmann::ordered_json depotSumsSchema(Components&) {
+    const nlohmann::ordered_json sum =
+        shape::object("DepotSum", "The checksum of a file, or why it has none.",
+                      {{"path", shape::text("the file")},
+                       {"escaped", escapedShape(), Need::Optional},
+                       {"bytes", shape::wholeNumber("its size"), Need::Optional},
+                       {"sha256", shape::text("the checksum, 64 digits"), Need::Optional},
+                       {"error", shape::text("why there is none"), Need::Optional}});
+    return shape::object("DepotSums", "Checksums of files.",
+                         {{"files", shape::listOf("in the order of the request", sum)}});
 }
 
 }  // namespace host

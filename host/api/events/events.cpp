@@ -6,6 +6,7 @@
 // lost, and the stream goes on.
 
 #include "host/api/call.h"
+#include "host/api/description/schema.h"
 #include "host/api/events/outcome_events.h"
 #include "host/api/services.h"
 #include "host/tables/bad_request.h"
@@ -79,6 +80,7 @@ std::string wantedPosition(const Call& call) {
 }  // namespace
 
 Endpoint getEvents;
+Schema overflowSchema;
 
 Answer getEvents(Services& services, const Call& call) {
     const std::string& name = call.required("table");
@@ -99,6 +101,12 @@ Answer getEvents(Services& services, const Call& call) {
                       : rowEvents(services, *table, where);
     if (!source) return errorReply(500, "the table takes no subscription");
     return Answer(std::move(source));
+}
+
+nlohmann::ordered_json overflowSchema(Components&) {
+    return shape::object(
+        "Overflow", "The reader was too slow.",
+        {{"lost", shape::wholeNumber("how much is missing here: rows, or bytes of output", 1)}});
 }
 
 }  // namespace host

@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "embedded/mutex.h"
+#include "host/api/description/schema.h"
 #include "host/api/events/event_pump.h"
 #include "host/api/services.h"
 #include "host/api/tasks/task_document.h"
@@ -15,6 +16,9 @@
 #include "host/tables/table_documents.h"
 
 namespace host {
+
+Schema gapSchema;
+
 namespace {
 
 /// Bytes of text that wait for a reader; a single event may be larger.
@@ -216,6 +220,12 @@ std::unique_ptr<EventSource> outcomeEvents(Services& services, const oxa::Table&
     if (!stream->filter(wish.where)) return nullptr;
     services.events.add(stream);
     return std::make_unique<OutcomeEvents>(stream, textOf(position));
+}
+
+nlohmann::ordered_json gapSchema(Components&) {
+    return shape::object(
+        "Gap", "Events that the host does not keep any more.",
+        {{"missing", shape::orNull(shape::wholeNumber("how many; null if that is not known", 1))}});
 }
 
 }  // namespace host

@@ -5,6 +5,7 @@
 #include <nlohmann/json.hpp>
 
 #include "host/api/call.h"
+#include "host/api/description/schema.h"
 #include "host/api/services.h"
 #include "host/api/tables/query_document.h"
 #include "host/api/tables/watched_query.h"
@@ -38,6 +39,7 @@ bool isForced(const nlohmann::json& body) {
 }  // namespace
 
 Endpoint postQuery;
+Schema conditionsSchema;
 
 Answer postQuery(Services& services, const Call& call) {
     const auto& name = call.body().at("table").get_ref<const std::string&>();
@@ -53,6 +55,22 @@ Answer postQuery(Services& services, const Call& call) {
     const Query query{table, queryConditions(call.body(), *table, services)};
     const WatchedAnswer answer = runWatched(services, query, isForced(call.body()), call.peer());
     return jsonReply(200, queryDocument(services, query, answer, outputsFor(call.peer())));
+}
+
+nlohmann::ordered_json conditionsSchema(Components&) {
+    const nlohmann::ordered_json value = {
+        {"type", {"string", "integer"}},
+        {"description", "of an integer column a number, or its digits as a string"}};
+    nlohmann::ordered_json condition = shape::object(
+        "Condition", "What a row must satisfy.",
+        {{"column", shape::text("the name of a column")},
+         {"op", shape::oneOf("like has a pattern, in which * stands for any characters",
+                             {"=", "!=", "<", "<=", ">", ">=", "like"})},
+         {"value", value}});
+    condition["additionalProperties"] = false;
+    nlohmann::ordered_json conditions = shape::listOf("Conditions, all of which hold.", condition);
+    conditions["title"] = "Conditions";
+    return conditions;
 }
 
 }  // namespace host

@@ -3,11 +3,15 @@
 #include <nlohmann/json.hpp>
 #include <optional>
 
+#include "host/api/description/schema.h"
 #include "host/api/tasks/task_document.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
 
 namespace host {
+
+Schema queryAnswerSchema, rowSchema;
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -81,6 +85,27 @@ std::string queryDocument(const Services& services, const Query& query, const Wa
         if (warning) add(document, "warnings", *warning);
     }
     return document;
+}
+
+nlohmann::ordered_json queryAnswerSchema(Components& components) {
+    const nlohmann::ordered_json full = shape::object(
+        "FullText", "A text that a column may have cut.",
+        {{"row", shape::wholeNumber("the row, from 0")},
+         {"column", shape::text("the column")},
+         {"text", shape::text("the text")},
+         {"complete", shape::yesOrNo("false: even this is a part, or holds bytes that are no "
+                                     "characters")}});
+    std::vector<shape::Property> members = commandProperties(components);
+    members.insert(members.begin(), {"text", shape::text("why there may be less than there should "
+                                                         "be")});
+    const nlohmann::ordered_json warning = shape::object(
+        "CommandWarning", "A warning, and the command that gave rise to it.", members);
+    return shape::object(
+        "QueryAnswer", "What a table answered.",
+        {{"rows", shape::listOf("the rows", components.ref(rowSchema))},
+         {"full", shape::listOf("texts that columns may have cut", full), Need::Optional},
+         {"warnings", shape::listOf("why there may be less than there should be", warning),
+          Need::Optional}});
 }
 
 }  // namespace host

@@ -5,9 +5,13 @@
 #include <algorithm>
 #include <nlohmann/json.hpp>
 
+#include "host/api/description/schema.h"
 #include "host/http/event_source.h"
 
 namespace host {
+
+Schema outputPieceSchema, outputEndSchema, taskStateSchema;
+
 namespace {
 
 /// How many bytes at the end are the beginning of a character in UTF-8 that goes on.
@@ -160,6 +164,18 @@ bool OutputQueue::empty() const {
 bool OutputQueue::over() const {
     const embedded::MutexLock lock(lock_);
     return endTaken_;
+}
+
+nlohmann::ordered_json outputPieceSchema(Components&) {
+    return shape::object("OutputPiece", "A piece of what a command writes.",
+                         {{"stream", shape::oneOf("where it came", {"stdout", "stderr"})},
+                          {"text", shape::text("the piece")}});
+}
+
+nlohmann::ordered_json outputEndSchema(Components& components) {
+    return shape::object("OutputEnd", "Nothing more comes.",
+                         {{"state", shape::about("the task's state, if it is over",
+                                                 components.ref(taskStateSchema))}});
 }
 
 }  // namespace host

@@ -7,6 +7,9 @@
 #include "host/tables/table_documents.h"
 
 namespace host {
+
+Schema taskStateSchema, taskSummarySchema, taskSchema, timeSchema, rowSchema;
+
 namespace {
 
 using Json = nlohmann::ordered_json;
@@ -108,6 +111,95 @@ std::string taskDocument(const Task& task, const Services& services, Outputs out
 
 Reply taskReply(unsigned status, const Task& task, const Services& services, Outputs outputs) {
     return jsonReply(status, taskDocument(task, services, outputs));
+}
+
+nlohmann::ordered_json taskStateSchema(Components&) {
+    std::vector<std::string> names;
+    for (const auto& [state, name] : kTaskStates)
+        names.emplace_back(name);
+    nlohmann::ordered_json state = shape::oneOf("The state of a task.", names);
+    state["title"] = "TaskState";
+    return state;
+}
+
+std::vector<shape::Property> commandProperties(Components& components) {
+    const Json time = components.ref(timeSchema);
+    return {{"command", shape::text("the command line")},
+            {"pid", shape::wholeNumber("the process, if there was one"), Need::Optional},
+            {"started", shape::about("when it began", time)},
+            {"ended", shape::orNull(shape::about("when it ended; null while it runs", time))},
+            {"exit", shape::wholeNumber("the exit status, if it had one"), Need::Optional},
+            {"signal", shape::wholeNumber("the signal that ended it, if one did"), Need::Optional},
+            {"error", shape::text("why it could not be executed"), Need::Optional},
+            {"timed_out", shape::yesOrNo("true: its time was over"), Need::Optional},
+            {"stdout", shape::text("the end of its output; not for readers"), Need::Optional},
+            {"stderr", shape::text("the end of its errors; not for readers"), Need::Optional}};
+}
+
+namespace {
+
+/// The columns of the request table that requests are made of; others are there if somebody set
+/// them.
+std::vector<shape::Property> summaryProperties(Components& components) {
+    const Json time = components.ref(timeSchema);
+    return {
+        {"id", shape::text("no two tasks have the same")},
+        {"transid", shape::text("the requester's name for it")},
+        {"command", shape::text("the command")},
+        {"product", shape::text("the product; may be empty")},
+        {"version", shape::text("the product's version"), Need::Optional},
+        {"targetmsn", shape::text("the managed system"), Need::Optional},
+        {"optional", shape::text("the command's option"), Need::Optional},
+        {"context", shape::text("its text"), Need::Optional},
+        {"uaconfig", shape::text("the universal agent's metafile"), Need::Optional},
+        {"uascript", shape::text("its scripts"), Need::Optional},
+        {"state", components.ref(taskStateSchema)},
+        {"accepted", shape::about("when it was accepted", time)},
+        {"started", shape::orNull(shape::about("when it began", time))},
+        {"ended", shape::orNull(shape::about("when it was over", time))},
+        {"asker", shape::text("the user who asked for it")},
+        {"cancelling", shape::yesOrNo("true: somebody has cancelled it, and it is not over yet"),
+         Need::Optional},
+        {"expires", shape::about("when it must have begun", time), Need::Optional},
+        {"reason", shape::text("why it ended as it did, where no row says so"), Need::Optional},
+        {"guard", shape::text("the guard that refused it"), Need::Optional},
+        {"hint", shape::text("that guard's way out"), Need::Optional}};
+}
+
+}  // namespace
+
+nlohmann::ordered_json taskSummarySchema(Components& components) {
+    Json summary =
+        shape::object("TaskSummary", "What a list says of a task.", summaryProperties(components));
+    summary["additionalProperties"] = shape::text("another column of the request table");
+    return summary;
+}
+
+nlohmann::ordered_json taskSchema(Components& components) {
+    const Json command =
+        shape::object("Command", "What one command of a task did.", commandProperties(components));
+    const Json reason = shape::text("as beside the state");
+    const Json details =
+        shape::object("Details", "What the task's commands did.",
+                      {{"commands", shape::listOf("the commands, in their order", command)},
+                       {"reason", reason, Need::Optional}});
+    const Json row = components.ref(rowSchema);
+    std::vector<shape::Property> members = summaryProperties(components);
+    for (const shape::Property& member : std::initializer_list<shape::Property>{
+             {"run", shape::wholeNumber("the host's run that handed it over"), Need::Optional},
+             {"boot", shape::text("the name of the machine's start in which that was"),
+              Need::Optional},
+             {"force", shape::yesOrNo("true: sent although the product is not there"),
+              Need::Optional},
+             {"interruptions", shape::wholeNumber("unclean ends of the host that cut it off"),
+              Need::Optional},
+             {"reply", shape::orNull(shape::about("the row that answered the request", row))},
+             {"events", shape::listOf("its outcomes, rows of KAGDYST", shape::orNull(row))},
+             {"details", details}})
+        members.push_back(member);
+    Json task = shape::object("Task", "Everything about a task.", members);
+    task["additionalProperties"] = shape::text("another column of the request table");
+    return task;
 }
 
 }  // namespace host

@@ -3,7 +3,9 @@
 
 #include <nlohmann/json_fwd.hpp>
 #include <string>
+#include <vector>
 
+#include "host/api/description/schema.h"
 #include "host/api/services.h"
 #include "host/http/peer.h"
 #include "host/http/reply.h"
@@ -21,6 +23,9 @@ Outputs outputsFor(const Peer& peer);
 /// "stderr"}. Members that are not known are left out, and so are outputs that are hidden.
 nlohmann::ordered_json commandObject(const Command& command, const CodePage& codePage,
                                      Outputs outputs);
+
+/// The members of that object, for the interface's description.
+std::vector<shape::Property> commandProperties(Components& components);
 
 /// Identifier, TRANSID, what was asked for, state, times and asker.
 nlohmann::ordered_json taskSummary(const Task& task, const CodePage& codePage);

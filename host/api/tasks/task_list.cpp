@@ -4,6 +4,7 @@
 #include <nlohmann/json.hpp>
 
 #include "host/api/call.h"
+#include "host/api/description/schema.h"
 #include "host/api/services.h"
 #include "host/api/tasks/task_document.h"
 #include "host/api/time_text.h"
@@ -47,6 +48,7 @@ TaskFilter filterOf(const Call& call, const CodePage& codePage) {
 }  // namespace
 
 Endpoint getTasks;
+Schema taskListSchema, taskSummarySchema;
 
 Answer getTasks(Services& services, const Call& call) {
     TaskFilter filter = filterOf(call, services.codePage);
@@ -62,6 +64,16 @@ Answer getTasks(Services& services, const Call& call) {
         tasks.push_back(taskSummary(task, services.codePage));
     const nlohmann::ordered_json document = {{"tasks", std::move(tasks)}, {"next", next}};
     return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+}
+
+nlohmann::ordered_json taskListSchema(Components& components) {
+    const nlohmann::ordered_json tasks =
+        shape::listOf("the tasks, newest first", components.ref(taskSummarySchema));
+    return shape::object(
+        "TaskList", "Some of the tasks.",
+        {{"tasks", tasks},
+         {"next", shape::orNull(shape::wholeNumber("the cursor for what follows; null if nothing "
+                                                   "does"))}});
 }
 
 }  // namespace host

@@ -34,7 +34,7 @@ std::vector<Route> someRoutes() {
                                                {"follow", Type::Flag, Need::Optional, ""}};
     const std::vector<host::Parameter> page = {{"number", Type::Number, Need::Required, ""}};
     return {
-        {"GET", "/v1/tasks", "", Access::Read, Runs::AtOnce, nothing, list},
+        {"GET", "/v1/tasks", "", Access::Read, Runs::AtOnce, nothing, {}, list},
         {"POST",
          "/v1/tasks",
          "",
@@ -42,16 +42,17 @@ std::vector<Route> someRoutes() {
          Runs::AtOnce,
          nothing,
          {},
+         {},
          Others::None,
          {{"name", JsonType::String, Need::Required, ""},
           {"count", JsonType::Number, Need::Optional, ""},
           {"once", JsonType::Boolean, Need::Optional, ""},
           {"where", JsonType::Array, Need::Optional, ""},
           {"more", JsonType::Object, Need::Optional, ""}}},
-        {"GET", "/v1/tasks/{id}", "", Access::Read, Runs::AtOnce, nothing, kId},
-        {"DELETE", "/v1/tasks/{id}", "", Access::Act, Runs::AtOnce, nothing, kId},
-        {"POST", "/v1/tasks/{id}/cancel", "", Access::Act, Runs::AtOnce, nothing, kId},
-        {"GET", "/v1/pages/{number}", "", Access::Read, Runs::AtOnce, nothing, page},
+        {"GET", "/v1/tasks/{id}", "", Access::Read, Runs::AtOnce, nothing, {}, kId},
+        {"DELETE", "/v1/tasks/{id}", "", Access::Act, Runs::AtOnce, nothing, {}, kId},
+        {"POST", "/v1/tasks/{id}/cancel", "", Access::Act, Runs::AtOnce, nothing, {}, kId},
+        {"GET", "/v1/pages/{number}", "", Access::Read, Runs::AtOnce, nothing, {}, page},
     };
 }
 
@@ -146,8 +147,8 @@ TEST_F(Routes, AreClosedToThoseWhoMayNotUseThem) {
 }
 
 TEST(RouteTable, FindsLiteralSegmentsFirstWhateverTheOrderOfItsRows) {
-    const Route one{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, kId};
-    const Route removal{"DELETE", "/a/{id}", "", Access::Act, Runs::AtOnce, nothing, kId};
+    const Route one{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, {}, kId};
+    const Route removal{"DELETE", "/a/{id}", "", Access::Act, Runs::AtOnce, nothing, {}, kId};
     const Route all{"GET", "/a/all", "", Access::Read, Runs::AtOnce, nothing};
     for (const Router& router : {Router({one, removal, all}), Router({all, removal, one})}) {
         const auto find = [&router](const char* method, const char* target) {
@@ -161,8 +162,8 @@ TEST(RouteTable, FindsLiteralSegmentsFirstWhateverTheOrderOfItsRows) {
 
 TEST(RouteTable, ThatContradictsItselfIsRefused) {
     const host::Parameter other{"other", host::Type::Text, host::Need::Required, ""};
-    const Route alike{"GET", "/a/{other}", "", Access::Read, Runs::AtOnce, nothing, {other}};
-    const Route good{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, kId};
+    const Route alike{"GET", "/a/{other}", "", Access::Read, Runs::AtOnce, nothing, {}, {other}};
+    const Route good{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, {}, kId};
     const Route lacking{"GET", "/b/{id}", "", Access::Read, Runs::AtOnce, nothing};
     EXPECT_THROW(Router({lacking}), std::logic_error);
     EXPECT_THROW(Router({good, good}), std::logic_error);
