@@ -17,6 +17,23 @@ enum ExitStatus : int {
     kInterrupted = 130,
 };
 
+/// What a status means, for help and manual.
+struct ExitMeaning {
+    ExitStatus status;
+    const char* when;
+};
+
+constexpr ExitMeaning kExitMeanings[] = {
+    {kSuccess, "done"},
+    {kHostReportedFailure,
+     "failed, cancelled, interrupted or expired, not known to be done, refused by a guard or for "
+     "now, or errors found by doctor"},
+    {kWrongUsage, "wrong usage"},
+    {kNoHost, "no host reached"},
+    {kNoOutcome, "no outcome within --timeout"},
+    {kInterrupted, "ended by Ctrl-C"},
+};
+
 /// Ends the command with an exit status. The text becomes one line on standard error.
 class Failure : public std::runtime_error {
 public:

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "ctl/verbs/arguments/global_arguments.h"
+#include "ctl/verbs/help/argument_text.h"
 #include "ctl/verbs/verb_table.h"
 
 namespace ctl {
@@ -17,11 +18,6 @@ using Entries = std::vector<Entry>;
 
 constexpr std::size_t kColumns = 80;
 constexpr std::size_t kWidestName = 24;
-
-constexpr const char* kExitStatuses =
-    "\nExit status: 0 done; 1 failed, cancelled, interrupted or expired, not known to\n"
-    "be done, refused by a guard or for now, or errors found by doctor; 2 wrong\n"
-    "usage; 3 no host reached; 4 no outcome within --timeout; 130 ended by Ctrl-C.\n";
 
 /// The text in lines of at most `width` letters, broken at blanks. Its own line ends count as
 /// blanks.
@@ -42,6 +38,20 @@ std::vector<std::string> wrapped(std::string_view text, std::size_t width) {
         }
     }
     return lines;
+}
+
+/// A paragraph about the statuses.
+std::string exitStatuses() {
+    std::string text = "Exit status:";
+    const char* separator = " ";
+    for (const ExitMeaning& meaning : kExitMeanings) {
+        text += separator + std::to_string(meaning.status) + ' ' + meaning.when;
+        separator = "; ";
+    }
+    std::string paragraph = "\n";
+    for (const std::string& line : wrapped(text + '.', kColumns))
+        paragraph += line + '\n';
+    return paragraph;
 }
 
 /// The entries below a title, in two columns; nothing if there are none.
@@ -67,32 +77,9 @@ std::string section(const std::string& title, const Entries& entries) {
     return text;
 }
 
-std::string valueNameOf(const Argument& argument) {
-    if (argument.valueName != nullptr) return argument.valueName;
-    switch (argument.type) {
-        case Argument::Type::Number:
-            return "N";
-        case Argument::Type::Seconds:
-            return "SECONDS";
-        case Argument::Type::Text:
-        case Argument::Type::Texts:
-            break;
-    }
-    return "TEXT";
-}
-
 std::string nameOf(const Argument& argument) {
     if (argument.kind != Argument::Kind::Option) return argument.name;
     return std::string(argument.name) + " " + valueNameOf(argument);
-}
-
-std::string helpOf(const Argument& argument) {
-    std::string help = argument.help;
-    if (argument.fallback != nullptr)
-        help += std::string("; ") + argument.fallback + " if not given";
-    if (argument.excludes != nullptr) help += std::string("; not with ") + argument.excludes;
-    if (argument.needs != nullptr) help += std::string("; only with ") + argument.needs;
-    return help;
 }
 
 Entries entriesOf(const ArgumentList& arguments, bool positionals) {
@@ -151,7 +138,7 @@ Entries commands() {
 std::string programHelp() {
     return "Manages the monitoring agents of one host.\n\nUsage: zavctl [OPTIONS] COMMAND ...\n" +
            section("Commands", commands()) + globalOptions("Options of every command") +
-           "\nzavctl help COMMAND explains a command, with examples.\n" + kExitStatuses;
+           "\nzavctl help COMMAND explains a command, with examples.\n" + exitStatuses();
 }
 
 std::string groupHelp(const VerbGroup& group) {
@@ -172,7 +159,7 @@ std::string verbHelp(const Verb& verb) {
            positionalsOf(verb) + "\n" + section("Arguments", entriesOf(verb.arguments, true)) +
            section("Options", entriesOf(verb.arguments, false)) +
            globalOptions("Options of every command") + "\nExamples:\n  " + verb.examples[0] +
-           "\n  " + verb.examples[1] + "\n" + kExitStatuses;
+           "\n  " + verb.examples[1] + "\n" + exitStatuses();
 }
 
 }  // namespace ctl

@@ -1,0 +1,74 @@
+#!/bin/sh
+# Checks the manual pages: that mandoc finds no fault with them, that there is one for every verb, and
+# that they name every option.
+#
+#   tests/docs/manual.sh PAGES ZAVCTL ZAVHOST
+#
+# PAGES is the folder of the pages as the build lays them out, one folder for each program.
+set -eu
+pages=$1 zavctl=$2 zavhost=$3
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
+status=0
+complain() {
+    echo "$1"
+    status=1
+}
+
+# Laid out as they are installed.
+mkdir -p "$scratch/man1" "$scratch/man5" "$scratch/man7" "$scratch/man8"
+cp "$pages"/zavctl/* "$scratch/man1"
+for section in 5 7 8; do cp "$pages"/zavhost/*.$section "$scratch/man$section"; done
+# mandoc looks for other pages in the system only, so references are checked here.
+mandoc -T lint -W all "$scratch"/man*/* | grep -v 'STYLE: referenced manual not found' &&
+    complain "mandoc finds faults"
+sed -n 's/^\.\(It \)\{0,1\}Xr \([^ ]*\) \([0-9]\).*/\3 \2/p' "$scratch"/man*/* |
+    sort -u >"$scratch/references"
+[ "$(wc -l <"$scratch/references")" -gt 10 ] || complain "pages hardly refer to each other"
+while read -r section page; do
+    [ -f "$scratch/man$section/$page.$section" ] || complain "there is no $page($section)"
+done <"$scratch/references"
+
+# As the help lists them; groups stand there with one line, so they are asked as well.
+verbs_in() {
+    sed -n '/^Commands:/,/^$/s/^  \([a-z][a-z-]*\( [a-z][a-z-]*\)\{0,1\}\)  .*/\1/p'
+}
+"$zavctl" help | verbs_in >"$scratch/words"
+[ "$(wc -l <"$scratch/words")" -gt 10 ] || complain "zavctl help lists hardly any command"
+while read -r word; do
+    "$zavctl" help "$word" >"$scratch/help"
+    if grep -q '^Commands:' "$scratch/help"; then
+        verbs_in <"$scratch/help"
+    else
+        echo "$word"
+    fi
+done <"$scratch/words" | tr ' ' - | sed 's/.*/zavctl-&.1/' | LC_ALL=C sort >"$scratch/expected"
+(cd "$scratch/man1" && LC_ALL=C ls zavctl-*) >"$scratch/found"
+diff "$scratch/expected" "$scratch/found" || complain "the pages (>) are not those of the verbs (<)"
+
+# Every option of the programs is on their pages.
+options_in() {
+    grep -oE '(^|[ ,])--[a-z][a-z-]*' | tr -d ' ,' | LC_ALL=C sort -u
+}
+page_text() {
+    mandoc -T ascii "$1" | sed "s/.$(printf '\b')//g"
+}
+check_options() {
+    LC_ALL=C sort -u >"$scratch/options"
+    [ -s "$scratch/options" ] || complain "$1 has no options"
+    page_text "$scratch/$1" | options_in >"$scratch/shown"
+    LC_ALL=C comm -23 "$scratch/options" "$scratch/shown" | sed "s|.*|$1 lacks &|" >"$scratch/lacking"
+    [ ! -s "$scratch/lacking" ] || complain "$(cat "$scratch/lacking")"
+}
+"$zavhost" --help | grep -oE '^ +(-h,)?--[a-z-]+' | tr -d ' ' | sed 's/^-h,//' | check_options man8/zavhost.8
+"$zavctl" help install | grep -oE '^  (-h, )?--[a-z-]+' | sed 's/^ *\(-h, \)*//' |
+    grep -vxE -e '--help|--version' | check_options man1/zavctl-install.1
+# The keys of the file are those that a host lists.
+"$zavhost" --print-config --home "$scratch" --plugin /none 2>/dev/null |
+    sed -n 's/^\(# \)\{0,1\}\([a-z-]*\) .*/\2/p' | LC_ALL=C sort >"$scratch/keys"
+[ "$(wc -l <"$scratch/keys")" -gt 10 ] || complain "zavhost --print-config lists hardly any key"
+page_text "$scratch/man5/zavhost.conf.5" >"$scratch/conf"
+while read -r key; do
+    grep -qE "^ +$key = " "$scratch/conf" || complain "zavhost.conf.5 lacks $key"
+done <"$scratch/keys"
+exit $status
