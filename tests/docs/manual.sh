@@ -2,11 +2,12 @@
 # Checks the manual pages: that mandoc finds no fault with them, that there is one for every verb, and
 # that they name every option.
 #
-#   tests/docs/manual.sh PAGES ZAVCTL ZAVHOST
+#   tests/docs/manual.sh TEMPLATES PAGES ZAVCTL ZAVHOST
 #
-# PAGES is the folder of the pages as the build lays them out, one folder for each program.
+# TEMPLATES is the folder of the hand-written text. PAGES is that of the pages as the build lays them out,
+# one folder for each program.
 set -eu
-pages=$1 zavctl=$2 zavhost=$3
+templates=$1 pages=$2 zavctl=$3 zavhost=$4
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 status=0
@@ -45,6 +46,11 @@ while read -r word; do
 done <"$scratch/words" | tr ' ' - | sed 's/.*/zavctl-&.1/' | LC_ALL=C sort >"$scratch/expected"
 (cd "$scratch/man1" && LC_ALL=C ls zavctl-*) >"$scratch/found"
 diff "$scratch/expected" "$scratch/found" || complain "the pages (>) are not those of the verbs (<)"
+# A text whose verb has another name now would be nowhere.
+for text in "$templates"/verbs/*.mdoc; do
+    page=$(basename "$text" .mdoc)
+    [ -f "$scratch/man1/$page.1" ] || complain "no page holds $text"
+done
 
 # Every option of the programs is on their pages.
 options_in() {

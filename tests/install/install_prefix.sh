@@ -23,7 +23,8 @@ for file in bin/zavhost bin/zavctl bin/zavplatform-conformance "$lib/libzavmgmt.
     "$lib/cmake/zavmgmt/zavmgmtConfig.cmake" \
     include/zavmgmt/platform/oxa.h include/zavmgmt/embedded/oxa_host.h \
     include/zavmgmt/conformance/driver.h include/zavmgmt/mgmt/zavmgmt.h \
-    share/zavmgmt/home/bin/prepare-home; do
+    share/man/man1/zavctl.1 share/man/man1/zavctl-install.1 share/man/man5/zavhost.conf.5 \
+    share/man/man7/zavmgmt.7 share/man/man8/zavhost.8 share/zavmgmt/home/bin/prepare-home; do
     [ -f "$stage/$file" ] || fail "there is no $file"
 done
 

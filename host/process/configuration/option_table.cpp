@@ -11,7 +11,7 @@ const std::vector<OptionRow>& optionTable() {
     static const std::vector<OptionRow> rows = {
         {"home", kText, "DIR", "The home directory; else TOVRINHOME names it"},
         {"config", kText, "FILE",
-         "A file with more of these options, as docs/configuration.md shows; the command line "
+         "A file with more of these options, see zavhost.conf(5); the command line "
          "overrides it",
          OptionPlace::CommandLineOnly},
         {"socket", kText, "PATH",
