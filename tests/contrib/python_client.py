@@ -94,33 +94,47 @@ class Streams(unittest.TestCase):
         self.assertEqual(caught.exception.status, 404)
 
 
+@unittest.skipIf(os.geteuid() != 0, "only root can be another user")
 class Trust(unittest.TestCase):
-    @unittest.skipIf(os.geteuid() != 0, "only root can be another user")
-    def test_goes_to_root_and_the_caller_only(self):
-        with tempfile.TemporaryDirectory() as directory:
-            os.chmod(directory, 0o777)
-            path = os.path.join(directory, "strange.sock")
-            reading, writing = os.pipe()
-            child = os.fork()
-            if child == 0:
-                self.listen_as_somebody_else(path, writing)
-            os.close(writing)
-            self.assertEqual(os.read(reading, 1), b"!")
-            os.close(reading)
-            with self.assertRaises(UntrustedHost):
-                Host(path).get_health()
-            self.assertEqual(os.waitpid(child, 0)[1], 0)
+    """In a host that somebody else runs, who hears what it is asked and answers nothing."""
 
-    @staticmethod
-    def listen_as_somebody_else(path, ready):
-        """Ends with status 0 if the client has sent nothing."""
-        os.setuid(65534)
+    SOMEBODY = 65534
+
+    def setUp(self):
+        self.directory = tempfile.TemporaryDirectory()
+        self.addCleanup(self.directory.cleanup)
+        os.chmod(self.directory.name, 0o777)
+        self.path = os.path.join(self.directory.name, "strange.sock")
+        reading, writing = os.pipe()
+        self.child = os.fork()
+        if self.child == 0:
+            self.listen(writing)
+        os.close(writing)
+        self.assertEqual(os.read(reading, 1), b"!")
+        os.close(reading)
+
+    def listen(self, ready):
+        """Ends with status 0 if the client has sent nothing, else with 1."""
+        os.setuid(self.SOMEBODY)
         listener = socket.socket(socket.AF_UNIX)
-        listener.bind(path)
+        listener.bind(self.path)
         listener.listen()
         os.write(ready, b"!")
         received = listener.accept()[0].recv(1)
         os._exit(1 if received else 0)
+
+    def ending(self):
+        return os.waitstatus_to_exitcode(os.waitpid(self.child, 0)[1])
+
+    def test_goes_to_root_and_the_caller_only(self):
+        with self.assertRaises(UntrustedHost):
+            Host(self.path).get_health()
+        self.assertEqual(self.ending(), 0)
+
+    def test_goes_to_a_user_who_is_named(self):
+        with self.assertRaises(ConnectionError):
+            Host(self.path, host_user=self.SOMEBODY).get_health()
+        self.assertEqual(self.ending(), 1)
 
 
 if __name__ == "__main__":
