@@ -13,6 +13,7 @@
 #include "ctl/client/address/peer.h"
 #include "ctl/client/failure.h"
 #include "ctl/command_line.h"
+#include "ctl/completion/completion.h"
 #include "ctl/show/page.h"
 #include "ctl/show/terminal.h"
 #include "ctl/verbs/arguments/global_arguments.h"
@@ -41,6 +42,10 @@ ctl::ExitStatus run(const ctl::CommandLine& line, ctl::Format format) {
 }
 
 ctl::ExitStatus run(const std::vector<std::string>& words) {
+    if (!words.empty() && words.front() == ctl::kCompletionWord) {
+        return ctl::print(
+            {ctl::completionOf({words.begin() + 1, words.end()}), {}, ctl::kSuccess, true});
+    }
     const ctl::CommandLine line = ctl::parseCommandLine(words);
     const ctl::Format format = line.verb == nullptr ? ctl::Format::Text : ctl::formatOf(line.given);
     // What stands on a page that needs no verb fits already.

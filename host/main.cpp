@@ -41,7 +41,7 @@
 #include "host/process/start_error.h"
 #include "host/process/system/signal_descriptor.h"
 #include "host/service/notifier.h"
-#include "host/service/regularly.h"
+#include "host/service/on_change.h"
 #include "host/service/service_environment.h"
 #include "host/service/status_reporter.h"
 #include "host/service/task_log.h"
@@ -291,15 +291,14 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     std::printf("ready: %s\n", options.socket.c_str());
     std::fflush(stdout);
     notifier.tellSurely("READY=1\n");
+    beginLog(options.logFormat);
     TaskLog taskLog(services.journal, say);
-    std::optional<Regularly> logging;
-    if (logsToJournal()) logging.emplace(std::chrono::seconds(1), [&] { tellOfTasks(taskLog); });
+    OnChange logging(std::chrono::seconds(1), [&] { tellOfTasks(taskLog); });
+    services.journal.whenCommitted([&logging] { logging.changed(); });
     const StatusReporter reporter(notifier, statusOf(services.journal));
     server.run();
-    if (logging) {
-        logging->stop();
-        tellOfTasks(taskLog);
-    }
+    logging.stop();
+    tellOfTasks(taskLog);
     services.journal.endCleanly(api.quiet());
     sayWhatWaits(services.journal);
     transfers.stop();
@@ -317,6 +316,7 @@ int start(int argc, char** argv) {
         const auto options = readOptions(argc, argv, environmentVariable);
         if (options && options->listing) return std::fputs(options->listing->c_str(), stdout) < 0;
         if (options && options->check) return check(*options);
+        if (options && options->logFormat == LogFormat::Json) beginLog(LogFormat::Json);
         if (options) run(*options, std::move(service));
         return 0;
     } catch (const std::exception& error) {

@@ -12,7 +12,7 @@ packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev 
 libsqlite3-dev libssl-dev libboost-dev nlohmann-json3-dev libcli11-dev libtomlplusplus-dev mksh curl pkgconf procps
 shellcheck clang libclang-rt-dev python3 python3-jsonschema mandoc'
 # Programs that only judge the product from outside; their tests are skipped without them.
-judges='python3-impacket tshark'
+judges='python3-impacket tshark zsh fish tmux'
 
 # shellcheck disable=SC2086
 case $#/${1-} in

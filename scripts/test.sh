@@ -10,7 +10,7 @@ cd "$(dirname "$0")/.."
 
 scripts/bootstrap.sh
 echo "== shellcheck"
-shellcheck scripts/*.sh cmake/*.sh .ci/run bench/*.sh tests/*/*.sh
+shellcheck scripts/*.sh cmake/*.sh .ci/run bench/*.sh tests/*/*.sh ctl/completion/shell/zavctl.bash
 
 # beside NAME COMMAND...: runs a command while tests run, which mostly wait; `settle` waits for its end.
 beside() {

@@ -28,6 +28,7 @@ extern const Verb kEventsVerb;
 extern const Verb kStatusVerb;
 extern const Verb kDoctorVerb;
 extern const Verb kWhoamiVerb;
+extern const Verb kTopVerb;
 extern const Verb kPsVerb;
 extern const Verb kTasksVerb;
 extern const Verb kTaskShowVerb;
@@ -60,6 +61,7 @@ constexpr const Verb* kVerbs[] = {
     &kStatusVerb,           //
     &kDoctorVerb,           //
     &kWhoamiVerb,           //
+    &kTopVerb,              //
     &kPsVerb,               //
     &kTasksVerb,            //
     &kTaskShowVerb,         //

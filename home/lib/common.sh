@@ -77,6 +77,18 @@ instance_key() {
     key=$1${2:+_$2}
 }
 
+# split_key FILE: sets product and instance to what the name of an instance's file stands for; fails when
+# it is none.
+# shellcheck disable=SC2034
+split_key() {
+    instance=${1%.*}
+    product=${instance%%_*}
+    instance=${instance#"$product"}
+    [ "$instance" != _ ] || return 1
+    instance=${instance#_}
+    valid_product "$product" && valid_instance "$instance"
+}
+
 # config_file PRODUCT INSTANCE: sets config to the instance's configuration file. The universal agent's
 # files are named differently because the management library reads them too.
 # shellcheck disable=SC2034

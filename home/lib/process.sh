@@ -157,6 +157,8 @@ start_instance() {
         return "$EXIT_ABSENT"
     }
     refuse_running "$1" "$2" && prepare_start "$1" "$2" || return
+    was_noted=no
+    [ ! -f "$state/run/$key.pid" ] || was_noted=yes
     launch_agent "$1" "$2"
     if ! process_start_time "$agent_pid"; then
         report_death
@@ -173,10 +175,16 @@ start_instance() {
     stay=$(config_number START_SECONDS 1 0 300 "$config" "$product_dir/agent.cfg")
     if tenths_while $((stay * 10)) agent_lives; then
         report_death
-        rm -f -- "$state/run/$key.pid"
+        forget_pid_file
         return "$EXIT_DIED"
     fi
     say "$key started, process $agent_pid"
+}
+
+# forget_pid_file: after a start that failed. Where there was a file before, the instance should run all
+# the same, and the file, which names a process that is gone, says so.
+forget_pid_file() {
+    [ "$was_noted" = yes ] || rm -f -- "$state/run/$key.pid"
 }
 
 # refuse_running PRODUCT INSTANCE: fails when the instance runs, no matter who started it.
@@ -224,7 +232,6 @@ keeper_lives() {
     process_start_time "${keeper_pid:-0}" && [ "$start_time" = "$keeper_start" ]
 }
 
-# The pid file goes before the agent's process id can be reused.
 report_death() {
     kill -KILL "-$agent_pid" 2>/dev/null
     wait "$agent_pid"
@@ -288,15 +295,27 @@ stop_all() {
 
 stop_own_instances() {
     for each_pid_file in "$state/run/$1.pid" "$state/run/$1"_*.pid; do
-        each_instance=${each_pid_file##*/"$1"}
-        each_instance=${each_instance%.pid}
-        each_instance=${each_instance#_}
+        split_key "${each_pid_file##*/}" || continue
+        each_instance=$instance
         find_agent "$1" "$each_instance" && [ "$agent_arch" = "$2" ] || continue
         stop_own_instance "$1" "$each_instance"
         case $? in
         0 | "$EXIT_NOT_RUNNING") ;;
         *) return "$EXIT_NOT_STOPPED" ;;
         esac
+    done
+}
+
+# own_states: prints a line for each instance that the caller has started and not stopped: product,
+# instance, the caller's id, "running" or "missing", and the process id.
+own_states() {
+    for each_pid_file in "$state/run"/*.pid; do
+        [ -f "$each_pid_file" ] && split_key "${each_pid_file##*/}" || continue
+        if find_agent "$product" "$instance"; then
+            printf '%s\t%s\t%s\trunning\t%s\n' "$product" "$instance" "$user_id" "$agent_pid"
+        else
+            printf '%s\t%s\t%s\tmissing\t\n' "$product" "$instance" "$user_id"
+        fi
     done
 }
 

@@ -69,13 +69,52 @@ may_run() {
 # of its own. That user could stop it or keep its descriptors, so it has a time limit and none of the
 # caller's descriptors.
 as_user() {
+    run_as_user "$@" >/dev/null
+}
+
+# list_as_user ID: prints what own-instances list says, in a file of limited size meanwhile: a pipe could
+# be kept open, and filled.
+list_as_user() {
+    listed=$(mktemp) || return
+    (ulimit -f 128 && run_as_user "$1" list '' '') >"$listed"
+    cat -- "$listed"
+    rm -f -- "$listed"
+}
+
+# run_as_user ID VERB PRODUCT ARGUMENT: the same with the caller's standard output.
+run_as_user() {
     as_user_id=$1 as_user_limit=280
     shift
-    [ "$1" != find ] || as_user_limit=10
+    case $1 in find | list) as_user_limit=10 ;; esac
     timeout --foreground -k 5 "$as_user_limit" setsid -w setpriv --reuid="$as_user_id" \
         --regid="$(stat -c %g -- "$home/users")" --clear-groups --inh-caps=-all --no-new-privs \
         env -i PATH=/usr/sbin:/usr/bin:/sbin:/bin sh "$home/lib/own-instances" "$home" "$@" \
+        </dev/null 2>/dev/null 3>&- 4>&- 5>&- 6>&- 7>&- 8>&- 9>&-
+}
+
+# start_as_user ID PRODUCT INSTANCE: starts the instance as the management library does for that user, in
+# a login of the user's own.
+start_as_user() {
+    start_name=$(id -un -- "$1" 2>/dev/null) || {
+        say "user $1, who ran $2${3:+_$3}, is gone"
+        return 1
+    }
+    case $home in
+    *\'*)
+        say "$home cannot be named to a shell, so $2${3:+_$3} is not started as user $start_name"
+        return 1
+        ;;
+    esac
+    timeout --foreground -k 5 280 setsid -w su - "$start_name" \
+        -c "'$home/bin/TovrinAgent' -h '$home' -o '$3' start $2" \
         </dev/null >/dev/null 2>&1 3>&- 4>&- 5>&- 6>&- 7>&- 8>&- 9>&-
+    start_status=$?
+    case $start_status in
+    0) say "$2${3:+_$3} started as user $start_name" ;;
+    "$EXIT_RUNNING") ;;
+    *) say "$2${3:+_$3} could not be started as user $start_name, status $start_status" ;;
+    esac
+    return "$start_status"
 }
 
 # for_other_users VERB PRODUCT ARGUMENT: does this for each of the other users. Succeeds when all did

@@ -4,14 +4,14 @@ namespace host {
 
 /// The endpoints. Each has a file of its own in this folder and a row below.
 Endpoint getTables, postQuery, getEvents, getDoctor, getHealth, getReady, getMetrics, getTaskOutput;
-Endpoint getWhoami, getOpenapi;
+Endpoint getWhoami, getInstances, getOpenapi;
 Endpoint postTask, getTasks, getTask, cancelTask;
 Endpoint getDepot, deleteDepot, getDepotSum, getDepotCheck;
 
 /// The documents, each described beside the code that makes it.
 Schema tablesSchema, conditionsSchema, queryAnswerSchema, rowSchema, gapSchema, overflowSchema;
 Schema timeSchema, taskStateSchema, taskSchema, taskListSchema, outputPieceSchema, outputEndSchema;
-Schema doctorSchema, healthSchema, readySchema, whoamiSchema, descriptionSchema;
+Schema doctorSchema, instancesSchema, healthSchema, readySchema, whoamiSchema, descriptionSchema;
 Schema depotListingSchema, depotRemovalSchema, depotSumsSchema, depotCheckSchema;
 
 // clang-format off
@@ -105,6 +105,10 @@ std::vector<Route> routes() {
         {"GET", "/v1/doctor", "Checks the home and the machine.",
          Access::Read, Runs::OnWorker, getDoctor,
          {{200, "what was found", doctorSchema}}},
+
+        {"GET", "/v1/instances", "Which instances of agents run, and which should.",
+         Access::Read, Runs::OnWorker, getInstances,
+         {{200, "the instances", instancesSchema}}, {}, Others::None, {}, {404}},
 
         {"GET", "/v1/health", "What the host says about itself.",
          Access::Read, Runs::AtOnce, getHealth,

@@ -1,7 +1,6 @@
 #include "host/api/time_text.h"
 
 #include <chrono>
-#include <cstdio>
 #include <ctime>
 #include <optional>
 
@@ -43,19 +42,6 @@ std::optional<std::chrono::microseconds> fractionOf(const std::string& text) {
 }
 
 }  // namespace
-
-std::string timeText(WallClock::time_point time) {
-    using std::chrono::milliseconds;
-    const auto count = std::chrono::floor<milliseconds>(time.time_since_epoch()).count();
-    const std::time_t seconds = static_cast<std::time_t>(count / 1000);
-    std::tm parts{};
-    ::gmtime_r(&seconds, &parts);
-    char date[32];
-    std::strftime(date, sizeof date, "%Y-%m-%dT%H:%M:%S", &parts);
-    char text[48];
-    std::snprintf(text, sizeof text, "%s.%03dZ", date, static_cast<int>(count % 1000));
-    return text;
-}
 
 WallClock::time_point timeOf(const std::string& text) {
     const BadRequest bad("\"" + text + "\" is no time in UTC like 2025-01-31T12:00:00Z");

@@ -1,4 +1,4 @@
-/// Times as RFC 3339 writes them, in UTC.
+/// Reading times as RFC 3339 writes them, in UTC.
 #pragma once
 
 #include <string>
@@ -6,9 +6,6 @@
 #include "host/commands/command.h"
 
 namespace host {
-
-/// With milliseconds: "2025-01-31T12:00:00.000Z".
-std::string timeText(WallClock::time_point time);
 
 /// The time that the text says, with or without a fraction of a second. Throws BadRequest.
 WallClock::time_point timeOf(const std::string& text);

@@ -3,11 +3,9 @@
 
 #include <strings.h>
 
-#include <algorithm>
-#include <cctype>
-
 #include "host/guard/guard.h"
 #include "host/guard/machine/listing.h"
+#include "host/guard/machine/system_name.h"
 #include "host/guard/refusal.h"
 #include "host/guard/wording.h"
 #include "host/tables/plugin_facts.h"
@@ -39,29 +37,20 @@ bool equalIgnoringCase(const std::string& a, const std::string& b) {
     return !a.empty() && ::strcasecmp(a.c_str(), b.c_str()) == 0;
 }
 
-/// What stands at the end of a product's managed system names.
-std::string codeOf(std::string product) {
-    if (product == plugin::kUniversalAgent) return "UA";
-    std::transform(product.begin(), product.end(), product.begin(),
-                   [](unsigned char c) { return static_cast<char>(std::toupper(c)); });
-    return product;
-}
-
 /// Whether it is the default instance's own name: "HOST:CODE" of this machine or of the origin
 /// node. A name with another code, or with an instance before the host, means something else.
 bool namesDefaultInstance(const std::string& product, const std::string& target) {
     const std::size_t colon = target.find(':');
     if (colon == std::string::npos || colon != target.rfind(':')) return false;
     const std::string host = target.substr(0, colon);
-    return equalIgnoringCase(target.substr(colon + 1), codeOf(product)) &&
-           (equalIgnoringCase(host, Machine::shortName()) ||
+    return equalIgnoringCase(target.substr(colon + 1), systemCodeOf(product)) &&
+           (equalIgnoringCase(host, shortHostName()) ||
             equalIgnoringCase(host, hostIn(oxa::originNode())));
 }
 
 /// The default instance and those that have a configuration file.
 std::vector<std::string> knownNames(const Site& site, const std::string& product) {
-    const std::string suffix = ":" + codeOf(product);
-    std::vector<std::string> names = {Machine::shortName() + suffix};
+    std::vector<std::string> names = {systemName(product, "")};
     const std::string prefix = product + "_";
     for (const std::string& file : filesIn(site.home + "/config")) {
         const std::size_t dot = file.rfind('.');
@@ -69,8 +58,7 @@ std::vector<std::string> knownNames(const Site& site, const std::string& product
         const std::string extension = file.substr(dot);
         if (extension != ".cfg" && extension != ".config") continue;
         if (dot <= prefix.size()) continue;
-        const std::string instance = file.substr(prefix.size(), dot - prefix.size());
-        names.push_back(instance + ":" + Machine::shortName() + suffix);
+        names.push_back(systemName(product, file.substr(prefix.size(), dot - prefix.size())));
     }
     return names;
 }

@@ -126,7 +126,7 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
     writer_ = std::make_unique<Writer>(
         *database_, reader_ ? nullptr : &readLock_,
         Writer::Watch{[this] { asGiven_.clear(); },
-                      [this](Database& database) { tellOfEvents(database); }, pruning(),
+                      [this](Database& database) { tellOfCommit(database); }, pruning(),
                       settings_.pruneEvery});
     writer_->submitLater(pruning());
 }
@@ -285,7 +285,22 @@ void Journal::keepRow(const std::string& kept, const std::string& row) {
     });
 }
 
+void Journal::whenCommitted(std::function<void()> call) {
+    const embedded::MutexLock lock(committedLock_);
+    whenCommitted_ = std::move(call);
+}
+
 /// On the writer's thread, after each transaction.
+void Journal::tellOfCommit(Database& database) {
+    tellOfEvents(database);
+    std::function<void()> call;
+    {
+        const embedded::MutexLock lock(committedLock_);
+        call = whenCommitted_;
+    }
+    if (call) call();
+}
+
 void Journal::tellOfEvents(Database& database) {
     constexpr std::int64_t kAll = -1;
     std::vector<JournalEvent> events = eventsIn(database, events_->last(), kAll);

@@ -73,6 +73,9 @@ public:
     /// of them. Rows are as the plug-in gave them while memory has them, else masked. Throws
     /// DatabaseError.
     std::vector<JournalEvent> eventsAfter(std::int64_t position, std::size_t most);
+    /// From now on calls this on the journal's own thread after each transaction. It must return at
+    /// once.
+    void whenCommitted(std::function<void()> call);
     /// See EventLog::whenNew().
     void whenEvents(std::function<void()> call) { events_->whenNew(std::move(call)); }
 
@@ -156,6 +159,7 @@ private:
     void insistOnReserve();
     Writer::Change updateOf(std::vector<Task> tasks);
     std::int64_t handOverNext(Database& database);
+    void tellOfCommit(Database& database);
     void tellOfEvents(Database& database);
     Writer::Change pruning();
 
@@ -177,6 +181,8 @@ private:
     std::size_t sincePrune_ = 0;                   ///< events
     std::size_t rowsSincePrune_ = 0;               ///< the same since old rows were removed
 
+    embedded::Mutex committedLock_;
+    std::function<void()> whenCommitted_ ZAV_GUARDED_BY(committedLock_);
     mutable embedded::Mutex troubleLock_;
     std::string trouble_ ZAV_GUARDED_BY(troubleLock_);
     std::atomic<bool> troubled_{false};  ///< whether there is any

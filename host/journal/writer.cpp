@@ -168,9 +168,19 @@ bool Writer::awaitWork(std::unique_lock<std::mutex>& lock) {
     }
 }
 
+/// With the lock held, which is let go meanwhile.
+void Writer::gather(std::unique_lock<std::mutex>& lock) {
+    if (isCrowded_ && !jobs_.empty()) {
+        const Clock::time_point end = Clock::now() + watch_.gather;
+        changed_.wait_until(lock, end, [&] { return ending_ || Clock::now() >= end; });
+    }
+    isCrowded_ = jobs_.size() > 1;
+}
+
 void Writer::work() {
     std::unique_lock<std::mutex> lock(lock_);
     while (awaitWork(lock)) {
+        gather(lock);
         Jobs jobs = std::exchange(jobs_, {});
         std::vector<Change> later = std::exchange(later_, {});
         const bool wipes = wiping_ && (ending_ || Clock::now() >= wipeDue_);

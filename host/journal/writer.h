@@ -40,6 +40,9 @@ public:
         /// no change of the date moves.
         Change regular{};
         std::chrono::milliseconds every = std::chrono::hours(1);
+        /// How long a transaction waits for more of those who come at the same time, where the disk
+        /// would be faster than they are. Who comes alone does not wait.
+        std::chrono::milliseconds gather{2};
     };
 
     /// The database outlives the writer, which alone uses it from now on; unless `shared` is given,
@@ -92,6 +95,7 @@ private:
     bool awaitWork(std::unique_lock<std::mutex>& lock);
     void addRegular(Clock::time_point now);
     Clock::time_point nextDue() const;
+    void gather(std::unique_lock<std::mutex>& lock);
     void writeAlone(Jobs& jobs, std::vector<Change>& later);
     void write(Jobs& jobs, std::vector<Change>& later);
     std::vector<Change> tryWrite(Jobs& jobs, const std::vector<Change>& later);
@@ -113,6 +117,7 @@ private:
     std::vector<Change> later_;
     Clock::time_point laterDue_{};
     Clock::time_point regularDue_ = Clock::time_point::max();
+    bool isCrowded_ = false;  ///< several have waited for the last transaction
     bool wiping_ = false;
     Clock::time_point wipeDue_{};
     std::uint64_t transactions_ = 0;

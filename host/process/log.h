@@ -1,48 +1,50 @@
-/// What the host says to its operator.
+/// What the host says to its operator, on standard error or in the system's journal.
 #pragma once
 
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <algorithm>
-#include <cerrno>
-#include <cstdlib>
+#include <chrono>
 #include <string>
+#include <string_view>
 
 namespace host {
 
 /// How much a line matters, as the system's journal counts it.
 enum class Priority { Error = 3, Warning = 4, Notice = 5, Info = 6 };
 
+enum class LogFormat {
+    Text,  ///< a line with time and level; in the system's journal their fields
+    Json,  ///< a line that is a JSON object, also where there is a journal
+};
+
+/// One line of the log. Clients' words may be in its texts, so blanks stand for control characters
+/// wherever a terminal might obey them.
+struct LogEntry {
+    Priority priority;
+    std::string text;
+    std::string task;  ///< the identifier of the task that it is about; "" if none
+    std::chrono::system_clock::time_point time;
+};
+
+/// "zavhost: no home": for whoever starts a program and reads what it answers.
+std::string spokenLine(const LogEntry& entry);
+/// "2025-01-31T12:00:00.000Z error zavhost: no home".
+std::string textLine(const LogEntry& entry);
+/// {"time": "...", "level": "error", "task": "...", "text": "no home"}; without a task if there is
+/// none.
+std::string jsonLine(const LogEntry& entry);
+/// "<3>no home": for a standard error that the system's journal reads.
+std::string prefixedLine(const LogEntry& entry);
+
 /// Whether standard error goes to the system's journal. Any thread.
-inline bool logsToJournal() {
-    const char* const stream = std::getenv("JOURNAL_STREAM");
-    struct stat found {};
-    return stream != nullptr && ::fstat(STDERR_FILENO, &found) == 0 &&
-           stream == std::to_string(found.st_dev) + ":" + std::to_string(found.st_ino);
-}
+bool logsToJournal();
 
-/// One line: for the journal with its priority in front, else with the program's name. Clients'
-/// words may be in the text, so blanks stand for its control characters, which a terminal would
-/// obey.
-inline std::string logLine(Priority priority, std::string text, bool toJournal) {
-    constexpr char kDelete = 0x7F;
-    std::replace_if(
-        text.begin(), text.end(),
-        [](char character) {
-            return static_cast<unsigned char>(character) < ' ' || character == kDelete;
-        },
-        ' ');
-    const std::string beginning = toJournal ? "<" + std::to_string(static_cast<int>(priority)) + ">"
-                                            : std::string("zavhost: ");
-    return beginning + text + "\n";
-}
+/// Sends an entry with its fields to the system's journal, which listens at this path. False when
+/// it does not take it.
+bool sendToJournal(const LogEntry& entry, std::string_view path);
 
-/// Says it on standard error, in one piece. Any thread.
-inline void say(Priority priority, const std::string& text) {
-    const std::string line = logLine(priority, text, logsToJournal());
-    while (::write(STDERR_FILENO, line.data(), line.size()) < 0 && errno == EINTR) {
-    }
-}
+/// From now on what is said are events of a log in this format; before it is spoken. Any thread.
+void beginLog(LogFormat format);
+
+/// Says it, in one piece. `task` is the identifier of the task that it is about. Any thread.
+void say(Priority priority, const std::string& text, const std::string& task = "");
 
 }  // namespace host

@@ -72,15 +72,18 @@ void TaskLog::tellEnds() {
 
 void TaskLog::tellBegin(const Task& task) {
     if (!begun_.insert(task.number).second) return;
-    say_(Priority::Info, "task " + task.id + " begins: " + wordsForTask(task) +
-                             (task.asker.empty() ? "" : ", asked for by " + task.asker));
+    say_(Priority::Info,
+         "task " + task.id + " begins: " + wordsForTask(task) +
+             (task.asker.empty() ? "" : ", asked for by " + task.asker),
+         task.id);
 }
 
 void TaskLog::tellEnd(const Task& task) {
     begun_.erase(task.number);
     say_(task.state == TaskState::Done ? Priority::Info : Priority::Warning,
          "task " + task.id + " " + endWords(task.state) + timeTaken(task) + ": " +
-             wordsForTask(task) + (task.reason.empty() ? "" : "; " + task.reason));
+             wordsForTask(task) + (task.reason.empty() ? "" : "; " + task.reason),
+         task.id);
 }
 
 }  // namespace host

@@ -16,7 +16,8 @@ namespace host {
 /// One thread at a time.
 class TaskLog {
 public:
-    using Say = std::function<void(Priority priority, const std::string& line)>;
+    using Say =
+        std::function<void(Priority priority, const std::string& line, const std::string& task)>;
 
     /// The journal outlives this object. What ended before is not told.
     TaskLog(Journal& journal, Say say);

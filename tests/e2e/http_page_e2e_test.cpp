@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 #include <signal.h>
 
+#include <filesystem>
 #include <fstream>
 #include <memory>
 #include <sstream>
@@ -91,6 +92,10 @@ protected:
 TEST_F(HttpPage, EveryCommandAnswersAsThePageSays) {
     home.products({"ux"}, "exit 0");
     home.files().write("depot/ux/7.1/notes", "abc");
+    const std::string lister = home.path() + "/bin/instances";
+    std::ofstream(lister)
+        << "#!/bin/sh\nprintf 'um\\t\\t\\tstopped\\t\\nux\\t\\t\\tstopped\\t\\n'\n";
+    std::filesystem::permissions(lister, std::filesystem::perms::owner_all);
     std::vector<std::pair<Example, std::unique_ptr<Program>>> streams;
     const std::vector<Example> examples = examplesOf(ZAV_SOURCE_DIR "/docs/http.md");
     EXPECT_GE(examples.size(), 7U);

@@ -27,6 +27,11 @@ expect "$units/zavhost.service" Type notify
 expect "$units/zavhost.service" KillMode process
 expect "$units/zavhost.service" Restart on-failure
 [ -n "$(setting "$units/zavhost.service" WatchdogSec)" ] || fail "no watchdog"
+expect "$units/zavmgmt-agents.service" Type oneshot
+expect "$units/zavmgmt-agents.service" RemainAfterExit yes
+expect "$units/zavmgmt-agents.service" KillMode process
+home=$(sed -n 's/^home = "\(.*\)"/\1/p' "$units/zavhost.conf")
+expect "$units/zavmgmt-agents.service" ExecStart "$home/bin/instances start"
 
 # The grace lets a command run to its time-out and 30 s longer, and the manager waits longer still.
 time_out=$(setting "$units/zavhost.conf" task-timeout)
@@ -51,7 +56,10 @@ command -v systemd-analyze >/dev/null || exit 77
 # It looks for the program, too: the one that is built stands in for the one that is installed.
 sed "s|^ExecStart=[^ ]*|ExecStart=$zavhost|" "$units/zavhost.service" >"$scratch/zavhost.service"
 cp "$units/zavhost.socket" "$scratch/zavhost.socket"
-said=$(systemd-analyze verify --man=no "$scratch/zavhost.service" "$scratch/zavhost.socket" 2>&1) ||
+sed "s|^ExecStart=[^ ]*|ExecStart=/bin/true|" "$units/zavmgmt-agents.service" \
+    >"$scratch/zavmgmt-agents.service"
+said=$(systemd-analyze verify --man=no "$scratch/zavhost.service" "$scratch/zavhost.socket" \
+    "$scratch/zavmgmt-agents.service" 2>&1) ||
     fail "systemd-analyze: $said"
 case $said in
 *"$scratch"* | *zavhost*) fail "systemd-analyze: $said" ;;

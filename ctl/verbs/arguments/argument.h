@@ -9,13 +9,16 @@ namespace ctl {
 /// What a shell may offer in place of a value.
 enum class Completion {
     Nothing,
-    Product,
+    Product,  ///< that is installed
     Instance,
     Transaction,
+    State,  ///< of a task
     Table,
     DepotFile,
+    DepotProduct,  ///< a folder of the depot
+    DepotVersion,  ///< a folder of a product's folder in the depot
     LocalFile,
-    Verb
+    Verb,
 };
 
 /// One argument. Declarations read like

@@ -12,8 +12,10 @@
 namespace ctl {
 namespace {
 
-constexpr Argument kVersion =
-    positional("VERSION", "Version, as in the depot").required().completedBy(Completion::DepotFile);
+constexpr Argument kDeployed = kProduct.completedBy(Completion::DepotProduct);
+constexpr Argument kVersion = positional("VERSION", "Version, as in the depot")
+                                  .required()
+                                  .completedBy(Completion::DepotVersion);
 constexpr Argument kCommand =
     positionals("COMMAND",
                 "The install command, after --; |DEPLOYDIR|, |DEPOTDIR| and |TOVRINHOME|\n"
@@ -28,7 +30,7 @@ constexpr Argument kRestart =
 constexpr Argument kComplete =
     flag("--complete", "With --restart: wait for the host to come back and fetch the final outcome")
         .with("--restart");
-constexpr Argument kArguments[] = {kProduct,  kVersion,  kCommand, kOptional, kRestart,
+constexpr Argument kArguments[] = {kDeployed, kVersion,  kCommand, kOptional, kRestart,
                                    kComplete, kNoVerify, kNoWait,  kTransid,  kOnce};
 
 TaskRequest requestOf(const Values& given) {

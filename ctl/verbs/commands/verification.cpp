@@ -1,11 +1,14 @@
 #include "ctl/verbs/commands/verification.h"
 
+#include <strings.h>
+
 #include <algorithm>
 #include <nlohmann/json.hpp>
 
 #include "ctl/client/failure.h"
 #include "ctl/client/guarded.h"
 #include "ctl/client/host_client.h"
+#include "ctl/client/instances.h"
 #include "ctl/client/row.h"
 
 using nlohmann::json;
@@ -28,6 +31,16 @@ std::string listedForm(const std::string& version) {
 
 bool isNumeric(const std::string& version) {
     return version.find_first_not_of("0123456789.") == std::string::npos;
+}
+
+/// Whether a start or stop was for this instance. Its target is a managed system name, or with
+/// OPTIONAL "INSTANCE" the instance's own name; without one it is the default instance.
+bool isMeant(const TaskRequest& request, const json& instance) {
+    const std::string& target = request.targetmsn;
+    if (textOf(instance, "product") != request.product) return false;
+    if (target.empty()) return textOf(instance, "instance").empty();
+    if (request.optional == "INSTANCE") return textOf(instance, "instance") == target;
+    return ::strcasecmp(textOf(instance, "target").c_str(), target.c_str()) == 0;
 }
 
 bool endedWell(const TaskResult& result) {
@@ -60,6 +73,13 @@ std::string doubtAboutUninstall(const TaskRequest& request, std::size_t before, 
     return "the host reported success, but " + request.product + " is still in the inventory";
 }
 
+std::string doubtAboutState(const TaskRequest& request, const json& instance) {
+    const bool runs = textOf(instance, "state") == "running";
+    if (runs != (request.command == "STOP")) return {};
+    return "the host reported success, but " + textOf(instance, "target") +
+           (runs ? " still runs" : " does not run");
+}
+
 Verification::Verification(const HostAddress& host, const TaskRequest& request, bool isWanted)
     : host_(host),
       request_(request),
@@ -89,11 +109,28 @@ void Verification::check(TaskResult& result) const {
         } else if (request_.command == "UNINSTALL") {
             result.doubt = doubtAboutUninstall(request_, before_, inventory());
         } else {
-            result.note =
-                "not verified: the home has no way to ask whether " + request_.product + " runs";
+            checkState(result);
         }
     } catch (const Failure& failure) {
         result.note = std::string("not verified: ") + failure.what();
+    }
+}
+
+void Verification::checkState(TaskResult& result) const {
+    const json instances = listInstances(HostClient(host_.socket), deadline_);
+    if (instances.is_null()) {
+        result.note =
+            "not verified: the home has no way to ask whether " + request_.product + " runs";
+        return;
+    }
+    const auto found =
+        std::find_if(instances.begin(), instances.end(),
+                     [this](const json& instance) { return isMeant(request_, instance); });
+    if (found != instances.end()) {
+        result.doubt = doubtAboutState(request_, *found);
+    } else if (request_.command != "STOP") {  // a stopped instance may be gone
+        result.note = "not verified: the home lists no instance of " + request_.product +
+                      (request_.targetmsn.empty() ? "" : " called " + request_.targetmsn);
     }
 }
 

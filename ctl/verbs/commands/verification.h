@@ -24,6 +24,10 @@ std::string doubtAboutInstall(const TaskRequest& request, const nlohmann::json& 
 std::string doubtAboutUninstall(const TaskRequest& request, std::size_t before,
                                 const nlohmann::json& rows);
 
+/// The same for a start, a restart or a stop, by the state of the instance that it was for: one of
+/// listInstances().
+std::string doubtAboutState(const TaskRequest& request, const nlohmann::json& instance);
+
 /// Made before a command is sent. Looks only at hosts that guard their users.
 class Verification {
 public:
@@ -36,6 +40,7 @@ public:
 
 private:
     nlohmann::json inventory() const;
+    void checkState(TaskResult& result) const;
 
     HostAddress host_;
     TaskRequest request_;

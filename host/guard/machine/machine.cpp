@@ -1,7 +1,5 @@
 #include "host/guard/machine/machine.h"
 
-#include <sys/utsname.h>
-
 #include "host/tables/plugin_facts.h"
 
 namespace host {
@@ -14,13 +12,6 @@ const Inventory& Machine::inventory() {
 Resolution Machine::resolve(const std::string& product, const std::string& target) {
     if (product == plugin::kUniversalAgent) return {universalAgentInstance(target), ""};
     return instanceByTranslator(translatorPath(site_.home, inventory()), product, target);
-}
-
-std::string Machine::shortName() {
-    utsname names{};
-    if (::uname(&names) != 0) return "";
-    const std::string name = names.nodename;
-    return name.substr(0, name.find('.'));
 }
 
 }  // namespace host

@@ -32,9 +32,6 @@ public:
     /// the home's translator.
     Resolution resolve(const std::string& product, const std::string& target);
 
-    /// The host's name up to its first dot.
-    static std::string shortName();
-
 private:
     const Site& site_;
     std::optional<Inventory> inventory_;

@@ -32,6 +32,24 @@ std::vector<pid_t> numbersIn(const std::string& text) {
     return numbers;
 }
 
+/// The list of the children of a thread of this process; no descriptor when there is none.
+FileDescriptor openChildren(pid_t thread) {
+    const std::string path = "/proc/self/task/" + std::to_string(thread) + "/children";
+    return FileDescriptor(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+}
+
+/// All that a file holds.
+std::string textOf(const FileDescriptor& file) {
+    std::string text;
+    std::array<char, 4096> piece{};
+    ssize_t length = 0;
+    while (file && (length = ::pread(file.get(), piece.data(), piece.size(),
+                                     static_cast<off_t>(text.size()))) > 0) {
+        text.append(piece.data(), static_cast<std::size_t>(length));
+    }
+    return text;
+}
+
 /// Of this process.
 std::vector<pid_t> threads() {
     std::vector<pid_t> threads;
@@ -68,7 +86,12 @@ bool adoptsOrphans() {
 }
 
 std::vector<pid_t> orphans() {
-    return adoptsOrphans() ? childrenOf(::getpid()) : std::vector<pid_t>();
+    // Asked for before each command, and opening it costs the most. The kernel makes the list anew
+    // for whoever reads from its beginning.
+    static const FileDescriptor list = openChildren(::getpid());
+    static const pid_t opener = ::getpid();
+    if (!adoptsOrphans()) return {};
+    return opener == ::getpid() ? numbersIn(textOf(list)) : childrenOf(::getpid());
 }
 
 std::vector<pid_t> commands() {
@@ -82,15 +105,7 @@ std::vector<pid_t> commands() {
 }
 
 std::vector<pid_t> childrenOf(pid_t thread) {
-    const std::string path = "/proc/self/task/" + std::to_string(thread) + "/children";
-    const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
-    std::string text;
-    std::array<char, 4096> piece{};
-    ssize_t length = 0;
-    while (file && (length = ::read(file.get(), piece.data(), piece.size())) > 0) {
-        text.append(piece.data(), static_cast<std::size_t>(length));
-    }
-    return numbersIn(text);
+    return numbersIn(textOf(openChildren(thread)));
 }
 
 }  // namespace host

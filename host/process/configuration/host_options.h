@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 
+#include "host/process/log.h"
 #include "host/process/system/groups.h"
 
 namespace host {
@@ -24,7 +25,8 @@ struct HostOptions {
     std::chrono::seconds orphanWait{300};
     /// How long the host waits for the task in hand when it is told to end.
     std::chrono::seconds grace{10};
-    int maxOutput = 16 << 20;               ///< bytes that the commands of one task may write
+    int maxOutput = 16 << 20;  ///< bytes that the commands of one task may write
+    LogFormat logFormat = LogFormat::Text;
     int logSize = 10 << 20;                 ///< bytes, after which a new trace log is begun
     bool rerunInterrupted = false;          ///< the task that an unclean end cut off runs again
     std::optional<std::uint16_t> rpcPort;   ///< absent: no TCP

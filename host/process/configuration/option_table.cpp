@@ -50,6 +50,10 @@ const std::vector<OptionRow>& optionTable() {
         {"max-output", kNumber, "BYTES",
          "How much the commands of one task may write before they are ended, 1 to 1000000000; "
          "16777216 if not given"},
+        {"log-format", kText, "text|json",
+         "What the host says once it serves: text is a line with time and level, or an entry with "
+         "fields where the system's journal reads; json is a line that is an object; text if not "
+         "given"},
         {"log-size", kNumber, "BYTES",
          "How long the trace log gets before a new one is begun, 4096 to 1000000000; 10485760 if "
          "not given"},

@@ -92,13 +92,14 @@ std::chrono::seconds orphanWait(const Settings& settings, const Environment& env
                      options.taskTimeout.value_or(taskTimeoutIn(environment).value_or(usual)));
 }
 
-bool rerunInterrupted(const Settings& settings) {
-    const std::string chosen = settings.text("on-interrupt").value_or("keep");
-    if (chosen != "keep" && chosen != "rerun") {
-        throw StartError(settings.label("on-interrupt") + " takes keep or rerun, not \"" + chosen +
-                         "\"");
+/// Whether the second of two words was chosen; the first one is the usual.
+bool isSecond(const Settings& settings, const char* option, const char* first, const char* second) {
+    const std::string chosen = settings.text(option).value_or(first);
+    if (chosen != first && chosen != second) {
+        throw StartError(settings.label(option) + " takes " + first + " or " + second + ", not \"" +
+                         chosen + "\"");
     }
-    return chosen == "rerun";
+    return chosen == second;
 }
 
 void chooseJournal(const Settings& settings, const Environment& environment, HostOptions& options) {
@@ -112,7 +113,7 @@ void chooseJournal(const Settings& settings, const Environment& environment, Hos
     options.keepDays = countOf(settings, "keep-tasks", 36'500, options.keepDays);
     options.keepRows = countOf(settings, "keep-rows", 100'000'000, options.keepRows);
     options.orphanWait = orphanWait(settings, environment, options);
-    options.rerunInterrupted = rerunInterrupted(settings);
+    options.rerunInterrupted = isSecond(settings, "on-interrupt", "keep", "rerun");
 }
 
 void chooseSockets(const Settings& settings, const Environment& environment, HostOptions& options) {
@@ -141,6 +142,7 @@ void chooseBounds(const Settings& settings, HostOptions& options) {
     }
     options.grace = secondsOf(settings, "grace", static_cast<int>(options.grace.count()));
     options.maxOutput = countOf(settings, "max-output", kMostBytes, options.maxOutput);
+    if (isSecond(settings, "log-format", "text", "json")) options.logFormat = LogFormat::Json;
     options.logSize = countOf(settings, "log-size", kMostBytes, options.logSize, kSmallestLog);
 }
 

@@ -132,7 +132,7 @@ TEST(OddDocuments, OfAQueryAreShownOrRefused) {
     const json answer = {{"rows", {kRow, kRow}}, {"warnings", {warning}}};
     EXPECT_GT(tryAllVariants(answer,
                              [](const json& document, Format format) {
-                                 return ctl::showAgents(answerOf(document), format);
+                                 return ctl::showAgents({answerOf(document)}, format);
                              }),
               200U);
     for (const char* table : {"KINAGT", "KAGREQT"}) {

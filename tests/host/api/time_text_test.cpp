@@ -3,24 +3,25 @@
 #include <gtest/gtest.h>
 
 #include "host/tables/bad_request.h"
+#include "host/text/utc_time.h"
 
 namespace {
 
 using host::BadRequest;
 using host::timeOf;
-using host::timeText;
+using host::utcTime;
 
 TEST(TimeText, IsReadAsItIsWritten) {
     for (const char* text :
          {"1970-01-01T00:00:00.000Z", "2025-01-31T12:34:56.789Z", "2024-02-29T23:59:59.001Z"}) {
-        EXPECT_EQ(timeText(timeOf(text)), text);
+        EXPECT_EQ(utcTime(timeOf(text)), text);
     }
 }
 
 TEST(TimeText, MayHaveAFractionOfASecondOrNone) {
-    EXPECT_EQ(timeText(timeOf("2025-01-31T12:34:56Z")), "2025-01-31T12:34:56.000Z");
-    EXPECT_EQ(timeText(timeOf("2025-01-31T12:34:56.5Z")), "2025-01-31T12:34:56.500Z");
-    EXPECT_EQ(timeText(timeOf("2025-01-31T12:34:56.123456789Z")), "2025-01-31T12:34:56.123Z");
+    EXPECT_EQ(utcTime(timeOf("2025-01-31T12:34:56Z")), "2025-01-31T12:34:56.000Z");
+    EXPECT_EQ(utcTime(timeOf("2025-01-31T12:34:56.5Z")), "2025-01-31T12:34:56.500Z");
+    EXPECT_EQ(utcTime(timeOf("2025-01-31T12:34:56.123456789Z")), "2025-01-31T12:34:56.123Z");
 }
 
 TEST(TimeText, ThatIsNoTimeInUtcIsRefused) {

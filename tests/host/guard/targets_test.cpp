@@ -1,5 +1,6 @@
 // The guard of targets that nobody knows.
 #include "host/guard/guard_fixture.h"
+#include "host/guard/machine/system_name.h"
 
 namespace {
 
@@ -12,7 +13,7 @@ protected:
         return refuser(command(name, product, {{"TARGETMSN", target}}));
     }
     std::string calls() { return files.exists("calls") ? files.read("calls") : ""; }
-    const std::string here = host::Machine::shortName();
+    const std::string here = host::shortHostName();
 };
 
 const char* const kResolving[] = {"START", "STOP", "RESTART", "REMOVEINSTANCE"};

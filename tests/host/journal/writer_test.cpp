@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
+
 #include "support/gate.h"
 #include "support/host/program.h"
 #include "support/scratch_dir.h"
@@ -46,6 +48,33 @@ TEST_F(JournalWriter, ThoseThatWaitShareOneTransaction) {
         other.get();
     EXPECT_EQ(writer.transactions(), 2U);
     EXPECT_EQ(rows(), 50);
+}
+
+TEST_F(JournalWriter, WaitsForMoreAfterSeveralHaveComeAtATime) {
+    Gate gate;
+    std::atomic<int> transactions{0};
+    Writer::Watch watch;
+    watch.committed = [&transactions](Database&) { ++transactions; };
+    watch.gather = std::chrono::hours(1);  // the end cuts it short
+    std::vector<std::future<void>> last;
+    {
+        Writer writer(database, nullptr, watch);
+        auto first = writer.submit([&gate](Database&) { gate.pass(); });
+        ASSERT_TRUE(gate.awaitArrival());
+        auto second = writer.submit(inserting(1));
+        auto third = writer.submit(inserting(2));
+        gate.open();
+        first.get();
+        second.get();
+        third.get();
+        EXPECT_EQ(transactions, 2) << "who came alone did not wait";
+        for (int i = 10; i < 20; ++i)
+            last.push_back(writer.submit(inserting(i)));
+    }
+    for (std::future<void>& each : last)
+        each.get();
+    EXPECT_EQ(transactions, 3);
+    EXPECT_EQ(rows(), 12);
 }
 
 TEST_F(JournalWriter, SaysSinceWhenItHasBeenAtATransaction) {

@@ -1,29 +1,84 @@
 #include "host/process/log.h"
 
 #include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <unistd.h>
 
+#include <array>
+#include <nlohmann/json.hpp>
+
+#include "host/process/system/file_descriptor.h"
 #include "support/scoped_env.h"
+#include "support/scratch_dir.h"
 
 namespace {
 
-using host::logLine;
+using host::LogEntry;
 using host::Priority;
+using nlohmann::json;
 
-TEST(Log, TheJournalGetsThePriorityAndOthersTheProgramsName) {
-    EXPECT_EQ(logLine(Priority::Error, "no home", true), "<3>no home\n");
-    EXPECT_EQ(logLine(Priority::Warning, "late", true), "<4>late\n");
-    EXPECT_EQ(logLine(Priority::Info, "fine", true), "<6>fine\n");
-    EXPECT_EQ(logLine(Priority::Error, "no home", false), "zavhost: no home\n");
+LogEntry entry(Priority priority, const std::string& text, const std::string& task = "") {
+    return {priority, text, task, std::chrono::system_clock::from_time_t(0)};
+}
+
+TEST(Log, ASpokenLineHasTheProgramsName) {
+    EXPECT_EQ(host::spokenLine(entry(Priority::Error, "no home")), "zavhost: no home\n");
+}
+
+TEST(Log, ALineOfTextHasTimeAndLevel) {
+    EXPECT_EQ(host::textLine(entry(Priority::Warning, "late")),
+              "1970-01-01T00:00:00.000Z warning zavhost: late\n");
+    EXPECT_EQ(host::textLine(entry(Priority::Info, "fine")),
+              "1970-01-01T00:00:00.000Z info zavhost: fine\n");
+}
+
+TEST(Log, ALineOfJsonHasTheTaskToo) {
+    EXPECT_EQ(host::jsonLine(entry(Priority::Notice, "say \"a\"\nb", "j-1")),
+              "{\"time\":\"1970-01-01T00:00:00.000Z\",\"level\":\"notice\",\"task\":\"j-1\","
+              "\"text\":\"say \\\"a\\\"\\nb\"}\n");
+    EXPECT_EQ(json::parse(host::jsonLine(entry(Priority::Error, "\xFF"))).count("task"), 0U);
+}
+
+TEST(Log, TheJournalsStreamGetsThePriority) {
+    EXPECT_EQ(host::prefixedLine(entry(Priority::Error, "no home")), "<3>no home\n");
+    EXPECT_EQ(host::prefixedLine(entry(Priority::Warning, "late")), "<4>late\n");
+    EXPECT_EQ(host::prefixedLine(entry(Priority::Info, "fine")), "<6>fine\n");
 }
 
 TEST(Log, AnEventIsOneLine) {
-    EXPECT_EQ(logLine(Priority::Error, "a\nb\r\nc", true), "<3>a b  c\n");
+    EXPECT_EQ(host::prefixedLine(entry(Priority::Error, "a\nb\r\nc")), "<3>a b  c\n");
 }
 
 TEST(Log, NothingInALineSteersATerminal) {
-    EXPECT_EQ(logLine(Priority::Info, "a\033[2Jb\007c\177d\te", false), "zavhost: a [2Jb c d e\n");
-    EXPECT_EQ(logLine(Priority::Info, "gr\xC3\xBC\xC3\x9F", false),
+    EXPECT_EQ(host::spokenLine(entry(Priority::Info, "a\033[2Jb\007c\177d\te")),
+              "zavhost: a [2Jb c d e\n");
+    EXPECT_EQ(host::spokenLine(entry(Priority::Info, "gr\xC3\xBC\xC3\x9F")),
               "zavhost: gr\xC3\xBC\xC3\x9F\n");
+}
+
+TEST(Log, TheJournalGetsFields) {
+    const ScratchDir scratch;
+    const std::string path = scratch.path("journal");
+    const host::FileDescriptor journal(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    path.copy(address.sun_path, sizeof address.sun_path - 1);
+    ASSERT_EQ(::bind(journal.get(), reinterpret_cast<const sockaddr*>(&address), sizeof address),
+              0);
+    const auto received = [&journal] {
+        std::array<char, 1000> text{};
+        const ssize_t length = ::recv(journal.get(), text.data(), text.size(), MSG_DONTWAIT);
+        return std::string(text.data(), static_cast<std::size_t>(std::max<ssize_t>(length, 0)));
+    };
+    ASSERT_TRUE(host::sendToJournal(entry(Priority::Warning, "a\nMESSAGE=b", "j-1"), path));
+    EXPECT_EQ(received(),
+              "PRIORITY=4\nSYSLOG_IDENTIFIER=zavhost\nMESSAGE=a MESSAGE=b\nZAVHOST_TASK=j-1\n");
+    ASSERT_TRUE(host::sendToJournal(entry(Priority::Info, "fine"), path));
+    EXPECT_EQ(received(), "PRIORITY=6\nSYSLOG_IDENTIFIER=zavhost\nMESSAGE=fine\n");
+    EXPECT_FALSE(host::sendToJournal(entry(Priority::Info, "x"), scratch.path("nobody")));
+    EXPECT_FALSE(host::sendToJournal(entry(Priority::Info, "x"), std::string(200, 'x')));
 }
 
 TEST(Log, OnlyTheStreamThatIsNamedIsTheJournals) {

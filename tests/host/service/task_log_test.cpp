@@ -24,7 +24,8 @@ protected:
         return lines;
     }
     TaskLog::Say into() {
-        return [this](Priority priority, const std::string& line) {
+        return [this](Priority priority, const std::string& line, const std::string& task) {
+            EXPECT_EQ(line.rfind("task " + task + " ", 0), 0U) << line;
             lines.push_back(std::to_string(static_cast<int>(priority)) + " " + line);
         };
     }

@@ -55,23 +55,27 @@ TEST(Verification, DoubtsAnUninstallAfterWhichNoPlatformIsGone) {
 }
 
 /// The result of a command that reports this RETVAL, looked at on a host that gives these answers,
-/// one to each connection.
-TaskResult checked(const std::string& command, int returnCode,
-                   const std::vector<std::string>& answers) {
+/// one to each connection; a null one is 404.
+TaskResult checked(const TaskRequest& request, int returnCode,
+                   const std::vector<const char*>& answers) {
     CannedHost host([&answers](const CannedHost& self) {
-        for (const std::string& answer : answers) {
+        for (const char* const answer : answers) {
             const Peer peer = self.accept();
             peer.request();
-            peer.answer(200, answer);
+            peer.answer(answer == nullptr ? 404 : 200, answer == nullptr ? "{}" : answer);
         }
     });
     TaskResult result;
     result.end = TaskResult::End::Outcome;
     result.events = {{{"RETVAL", returnCode}}};
     const ctl::HostAddress address = {host.path(), "", std::chrono::seconds(20)};
-    ctl::Verification(address, requestFor(command), true).check(result);
+    ctl::Verification(address, request, true).check(result);
     host.join();
     return result;
+}
+TaskResult checked(const std::string& command, int returnCode,
+                   const std::vector<const char*>& answers) {
+    return checked(requestFor(command), returnCode, answers);
 }
 
 constexpr const char* kGuarded = R"({"guarded": true})";
@@ -98,8 +102,48 @@ TEST(Verification, ThatIsNotPossibleIsANote) {
         checked("INSTALL", 0, {kGuarded, R"({"rows": [], "warnings": [{"exit": 3}]})"});
     EXPECT_EQ(unknown.doubt, "");
     EXPECT_EQ(unknown.note, "not verified: the inventory could not be taken");
-    EXPECT_EQ(checked("START", 0, {kGuarded}).note,
+}
+
+/// The answer of a host that has one instance of "ux", in this state.
+constexpr const char* kRuns = R"({"instances": [
+    {"product": "ux", "instance": "", "target": "h:UX", "state": "running"}]})";
+constexpr const char* kIsMissing = R"({"instances": [
+    {"product": "um", "instance": "", "target": "h:UA", "state": "running"},
+    {"product": "ux", "instance": "", "target": "h:UX", "state": "missing"},
+    {"product": "ux", "instance": "db1", "target": "db1:h:UX", "state": "running"}]})";
+constexpr const char* kHasNone = R"({"instances": []})";
+
+TEST(Verification, LooksWhetherAStartedAgentRunsAndAStoppedOneDoesNot) {
+    for (const char* command : {"START", "RESTART"}) {
+        EXPECT_EQ(checked(command, 0, {kGuarded, kRuns}).doubt, "") << command;
+        EXPECT_EQ(checked(command, 0, {kGuarded, kIsMissing}).doubt,
+                  "the host reported success, but h:UX does not run")
+            << command;
+    }
+    EXPECT_EQ(checked("STOP", 0, {kGuarded, kIsMissing}).doubt, "");
+    EXPECT_EQ(checked("STOP", 0, {kGuarded, kRuns}).doubt,
+              "the host reported success, but h:UX still runs");
+}
+
+TEST(Verification, KnowsAnInstanceByItsManagedSystemNameOrItsOwn) {
+    TaskRequest request = requestFor("STOP");
+    const char* const expected = "the host reported success, but db1:h:UX still runs";
+    for (const char* target : {"db1:h:UX", "DB1:H:ux"}) {
+        request.targetmsn = target;
+        EXPECT_EQ(checked(request, 0, {kGuarded, kIsMissing}).doubt, expected) << target;
+    }
+    request.targetmsn = "db1";
+    EXPECT_EQ(checked(request, 0, {kGuarded, kIsMissing}).doubt, "");
+    request.optional = "INSTANCE";
+    EXPECT_EQ(checked(request, 0, {kGuarded, kIsMissing}).doubt, expected);
+}
+
+TEST(Verification, OfAnAgentThatNobodyCanAskAboutIsANote) {
+    EXPECT_EQ(checked("START", 0, {kGuarded, nullptr}).note,
               "not verified: the home has no way to ask whether ux runs");
+    EXPECT_EQ(checked("START", 0, {kGuarded, kHasNone}).note,
+              "not verified: the home lists no instance of ux");
+    EXPECT_EQ(checked("STOP", 0, {kGuarded, kHasNone}).note, "");
 }
 
 }  // namespace

@@ -84,6 +84,8 @@ TEST_F(Options, TheJournalKeepsWhatItIsToldToKeep) {
     EXPECT_EQ(usual->grace, std::chrono::seconds(10));
     EXPECT_EQ(usual->logSize, 10 << 20);
     EXPECT_EQ(read({"--log-size", "4096"})->logSize, 4096);
+    EXPECT_EQ(read({})->logFormat, host::LogFormat::Text);
+    EXPECT_EQ(read({"--log-format", "json"})->logFormat, host::LogFormat::Json);
     EXPECT_EQ(usual->maxOutput, 16 * 1024 * 1024);
     const auto bounded = read({"--grace", "3", "--max-output", "1000"});
     EXPECT_EQ(bounded->grace, std::chrono::seconds(3));
@@ -111,6 +113,7 @@ TEST_F(Options, OfTheJournalThatMakeNoSenseAreRefused) {
     EXPECT_THROW(read({"--grace", "0"}), host::StartError);
     EXPECT_THROW(read({"--max-output", "16M"}), host::StartError);
     EXPECT_THROW(read({"--log-size", "4095"}), host::StartError);
+    EXPECT_THROW(read({"--log-format", "xml"}), host::StartError);
     EXPECT_THROW(read({"--on-interrupt", "maybe"}), host::StartError);
     EXPECT_THROW(read({"--no-journal", "--state", "/s"}), host::StartError);
 }
@@ -271,6 +274,7 @@ TEST_F(Options, TheListingSaysWhatHoldsAndWhereItComesFrom) {
                            "task-timeout = 45  # environment, TIMEOUT\n"
                            "grace = 9  # command line\n"
                            "max-output = 16777216  # default\n"
+                           "log-format = \"text\"  # default\n"
                            "log-size = 10485760  # default\n"
                            "trace-secrets = false  # default\n"
                            "unguarded = false  # default\n");
