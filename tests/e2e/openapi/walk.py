@@ -75,6 +75,15 @@ def ask_for_what_there_is(walk):
     assert "# TYPE zavhost_tasks_total counter" in walk.ask("getMetrics", 200)
 
 
+def list_instances(walk, home):
+    program = f"{home}/bin/instances"
+    walk.ask("getInstances", 404)
+    with open(program, "w", encoding="ascii") as script:
+        script.write("#!/bin/sh\nprintf 'ux\\t\\troot\\trunning\\t17\\num\\t\\t\\tstopped\\t\\n'\n")
+    os.chmod(program, 0o755)
+    assert len(walk.ask("getInstances", 200)["instances"]) == 2
+
+
 def look_into_the_depot(walk):
     odd = b"ux/od\xffd"
     walk.ask("getDepot", 200)
@@ -309,6 +318,7 @@ def main():
     walk = Walk(path)
     check_description(walk)
     ask_for_what_there_is(walk)
+    list_instances(walk, home)
     look_into_the_depot(walk)
     query(walk, home)
     run_tasks(walk)
