@@ -286,6 +286,28 @@ class Check(TypedDict):
     remedy: str
 
 
+class Instance(TypedDict):
+    """An instance of an agent that could run."""
+    #: the product's code
+    product: str
+    #: its name; empty: the default instance
+    instance: str
+    #: the managed system name by which commands know it
+    target: str
+    #: missing: it was started, not stopped on request, and does not run
+    state: Literal["running", "missing", "stopped"]
+    #: who runs it, or would; null: it is stopped
+    user: str | None
+    #: its process; null unless it runs
+    pid: int | None
+
+
+class Instances(TypedDict):
+    """What the home says of its agents."""
+    #: by product and instance
+    instances: list[Instance]
+
+
 class Health(TypedDict):
     """What a host says about itself."""
     #: the product's version
@@ -653,6 +675,11 @@ class Operations:
         """Checks the home and the machine."""
         parameters: dict[str, Any] = {}
         return self._transport.ask("GET", "/v1/doctor", parameters)
+
+    def get_instances(self) -> Instances:
+        """Which instances of agents run, and which should."""
+        parameters: dict[str, Any] = {}
+        return self._transport.ask("GET", "/v1/instances", parameters)
 
     def get_health(self) -> Health:
         """What the host says about itself."""
