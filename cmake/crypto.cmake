@@ -3,7 +3,7 @@
 # Linked statically: of the whole library only the digest comes along, and a short verb of zavctl does
 # not pay for loading the rest.
 add_library(zav_crypto INTERFACE)
-if(CMAKE_SIZEOF_VOID_P EQUAL 4)
+if(ZAV_LINK_UNPACKED_I386)
   zav_link_i386(zav_crypto libcrypto.a)
 else()
   set(OPENSSL_USE_STATIC_LIBS TRUE)

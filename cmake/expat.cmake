@@ -1,6 +1,6 @@
 # Target zav_expat: the XML parser for this build's width.
 add_library(zav_expat INTERFACE)
-if(CMAKE_SIZEOF_VOID_P EQUAL 4)
+if(ZAV_LINK_UNPACKED_I386)
   zav_link_i386(zav_expat libexpat.a)
 else()
   # The first version that bounds what entities expand to.

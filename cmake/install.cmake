@@ -1,6 +1,8 @@
 # What `cmake --install` lays out beside the programs: headers, the CMake package and zavmgmt.pc.
 # Headers live in a folder of their own, because names such as base/ and platform/ are anybody's;
 # the package and the .pc file put that folder on the include path.
+#
+# Each install() names its COMPONENT, which is the name of the Debian package that the files belong to.
 set(ZAV_INSTALL_HEADERS ${CMAKE_INSTALL_INCLUDEDIR}/zavmgmt)
 set(ZAV_PACKAGE_DIR ${CMAKE_INSTALL_LIBDIR}/cmake/zavmgmt)
 
@@ -31,9 +33,10 @@ function(zav_install_package)
   write_basic_package_version_file(${CMAKE_BINARY_DIR}/package/zavmgmtConfigVersion.cmake
     COMPATIBILITY SameMajorVersion)
   install(FILES ${CMAKE_BINARY_DIR}/package/zavmgmtConfig.cmake
-    ${CMAKE_BINARY_DIR}/package/zavmgmtConfigVersion.cmake DESTINATION ${ZAV_PACKAGE_DIR})
+    ${CMAKE_BINARY_DIR}/package/zavmgmtConfigVersion.cmake DESTINATION ${ZAV_PACKAGE_DIR}
+    COMPONENT zavmgmt-dev)
   install(EXPORT zavmgmt NAMESPACE zavmgmt:: FILE zavmgmtTargets.cmake
-    DESTINATION ${ZAV_PACKAGE_DIR})
+    DESTINATION ${ZAV_PACKAGE_DIR} COMPONENT zavmgmt-dev)
 
   # The way from the .pc file to the prefix keeps the installation relocatable.
   cmake_path(SET pc_dir NORMALIZE ${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig)
@@ -41,5 +44,5 @@ function(zav_install_package)
     OUTPUT_VARIABLE ZAV_PREFIX_FROM_PC)
   configure_file(cmake/zavmgmt.pc.in ${CMAKE_BINARY_DIR}/package/zavmgmt.pc @ONLY)
   install(FILES ${CMAKE_BINARY_DIR}/package/zavmgmt.pc
-    DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
+    DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig COMPONENT zavmgmt-dev)
 endfunction()

@@ -1,6 +1,6 @@
 # Target zav_sqlite: the database library for this build's width.
 add_library(zav_sqlite INTERFACE)
-if(CMAKE_SIZEOF_VOID_P EQUAL 4)
+if(ZAV_LINK_UNPACKED_I386)
   zav_link_i386(zav_sqlite libsqlite3.a)
   find_package(Threads REQUIRED)
   target_link_libraries(zav_sqlite INTERFACE Threads::Threads ${CMAKE_DL_LIBS} m)

@@ -10,6 +10,9 @@
 # spaces of their own, so they are gone when this script ends, however it ends.
 set -eu
 cd "$(dirname "$0")/.."
+program=fresh
+# shellcheck source=scripts/root.sh
+. scripts/root.sh
 
 fail() {
     echo "fresh: $*" >&2
@@ -25,21 +28,16 @@ case $#/${1-} in
     exit 2
     ;;
 esac
-[ "$(id -u)" -eq 0 ] || fail "this needs root, to mount and to change the root directory"
+need_root
 commit=$(git rev-parse --verify --short HEAD) || fail "this is no checkout"
 
 scripts/bootstrap.sh
-if ! command -v mmdebstrap >/dev/null; then
-    echo "fresh: installing mmdebstrap"
-    apt-get update -qq
-    DEBIAN_FRONTEND=noninteractive apt-get install -y -qq --no-install-recommends mmdebstrap >/dev/null
-fi
+need_packages mmdebstrap
 
 root=$(mktemp -d -p "${TMPDIR:-/var/tmp}" fresh.XXXXXX)
 cleanup() {
     status=$?
     trap - EXIT
-    rm -f "$root.apt.conf"
     if [ -n "$keep" ]; then
         echo "fresh: the root file system is in $root"
     else
@@ -52,22 +50,8 @@ trap 'exit 130' HUP INT TERM
 
 # ---- The root file system ------------------------------------------------------------------------
 
-# Where and how this machine fetches packages: its sources, and its options for fetching, such as
-# proxies.
-set --
-for sources in /etc/apt/sources.list /etc/apt/sources.list.d/*.list /etc/apt/sources.list.d/*.sources; do
-    [ ! -s "$sources" ] || set -- "$@" "$sources"
-done
-[ $# -gt 0 ] || fail "apt has no sources on this machine"
-apt-config dump | grep -E '^Acquire::(https?|Retries|Check-Valid-Until|Check-Date|ForceIPv)' \
-    >"$root.apt.conf" || true
-
 echo "== a root file system with nothing but what bootstrap lists"
-# shellcheck source=/dev/null disable=SC2154
-suite=$(. /etc/os-release && echo "$VERSION_CODENAME")
-unshare --mount --pid --fork --kill-child --mount-proc \
-    mmdebstrap --quiet --variant=minbase --aptopt="$root.apt.conf" \
-    --include="$(scripts/bootstrap.sh --list | paste -sd, -)" "$suite" "$root" "$@"
+make_root "$root" "$(dpkg --print-architecture)" --include="$(scripts/bootstrap.sh --list | paste -sd, -)"
 
 # ---- The checkout --------------------------------------------------------------------------------
 
@@ -79,24 +63,8 @@ cp -R build/third_party "$root/src/build/"
 
 # ---- The work ------------------------------------------------------------------------------------
 
-# inside COMMAND...: runs it in the checkout, in the root file system. The environment is empty but
-# for what a login would set.
-inside() {
-    # shellcheck disable=SC2016
-    unshare --mount --pid --fork --kill-child -- sh -euc '
-        root=$1
-        shift
-        mount -t proc proc "$root/proc"
-        mount --rbind /dev "$root/dev"
-        mount -t tmpfs tmpfs "$root/run"
-        cd "$root/src"
-        exec chroot "$root" /usr/bin/env -i HOME=/root LANG=C.UTF-8 \
-            PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin \
-            /bin/sh -euc '\''cd /src; exec "$@"'\'' sh "$@"' sh "$root" "$@"
-}
-
 echo "== what bootstrap still finds missing there"
-inside scripts/bootstrap.sh >"$root/bootstrap.log" 2>&1 || {
+inside "$root" /src scripts/bootstrap.sh >"$root/bootstrap.log" 2>&1 || {
     cat "$root/bootstrap.log"
     fail "bootstrap failed"
 }
@@ -106,6 +74,6 @@ if [ -s "$root/bootstrap.log" ]; then
 fi
 echo "nothing"
 echo "== the demo"
-inside scripts/demo.sh
+inside "$root" /src scripts/demo.sh
 echo "== the tests"
-inside scripts/test.sh native
+inside "$root" /src scripts/test.sh native

@@ -45,9 +45,10 @@ sed -n 's/^ListenStream=//p' "$units/zavhost.socket" | sort >"$scratch/listens"
 sed -n 's/^\(rpc-\)\{0,1\}socket = "\(.*\)"/\2/p' "$units/zavhost.conf" | sort >"$scratch/expects"
 cmp "$scratch/listens" "$scratch/expects" || fail "the sockets differ"
 
-# The host takes the configuration, but for the home, which need not be there.
+# The host takes the configuration, but for the home and the group, which need not be there.
 mkdir "$scratch/home"
-sed "s|^home = .*|home = \"$scratch/home\"|" "$units/zavhost.conf" >"$scratch/zavhost.conf"
+sed -e "s|^home = .*|home = \"$scratch/home\"|" -e "s|^group = .*|group = \"$(id -gn)\"|" \
+    "$units/zavhost.conf" >"$scratch/zavhost.conf"
 chmod 0644 "$scratch/zavhost.conf"
 "$zavhost" --config "$scratch/zavhost.conf" --print-config >"$scratch/listing"
 grep -q "^grace = $grace  # $scratch/zavhost.conf:" "$scratch/listing" || fail "the grace is not taken"
@@ -63,4 +64,14 @@ said=$(systemd-analyze verify --man=no "$scratch/zavhost.service" "$scratch/zavh
     fail "systemd-analyze: $said"
 case $said in
 *"$scratch"* | *zavhost*) fail "systemd-analyze: $said" ;;
+esac
+
+# How much of the system is open to the service is what the page says, by the count of this version.
+case $(systemd-analyze --version) in
+"systemd 252"*)
+    exposure=$(systemd-analyze security --offline=true --no-pager "$scratch/zavhost.service" 2>/dev/null |
+        sed -n 's/.*exposure level for [^ ]* \([0-9.]*\) .*/\1/p')
+    grep -qF "the exposure is $exposure of 10" "$units/../../docs/service.md" ||
+        fail "docs/service.md does not say that the exposure is $exposure"
+    ;;
 esac

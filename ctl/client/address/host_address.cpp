@@ -1,6 +1,8 @@
 #include "ctl/client/address/host_address.h"
 
 #include <cstdlib>
+#include <filesystem>
+#include <system_error>
 
 namespace ctl {
 namespace {
@@ -10,14 +12,21 @@ std::string environment(const char* name) {
     return value != nullptr ? value : "";
 }
 
+/// Where the service has its socket.
+constexpr const char* kServiceSocket = "/run/zavhost/zavhost.sock";
+
+bool isThere(const std::string& path) {
+    std::error_code ignored;
+    return std::filesystem::exists(path, ignored);
+}
+
 }  // namespace
 
 std::string defaultSocket() {
     if (const std::string named = environment("ZAV_SOCKET"); !named.empty()) return named;
-    if (const std::string dir = environment("XDG_RUNTIME_DIR"); !dir.empty()) {
-        return dir + "/zavhost.sock";
-    }
-    return "/run/zavhost.sock";
+    const std::string dir = environment("XDG_RUNTIME_DIR");
+    std::string own = (dir.empty() ? "/run" : dir) + "/zavhost.sock";
+    return !isThere(own) && isThere(kServiceSocket) ? kServiceSocket : own;
 }
 
 }  // namespace ctl

@@ -13,7 +13,7 @@ struct HostAddress {
 };
 
 /// The socket of a host that nobody named: $ZAV_SOCKET, else zavhost.sock in $XDG_RUNTIME_DIR, else
-/// in /run. zavhost looks in the same places.
+/// in /run, where zavhost makes it if it is not told; and the service's if there is no such file.
 std::string defaultSocket();
 
 }  // namespace ctl

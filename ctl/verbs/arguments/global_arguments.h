@@ -11,7 +11,8 @@ namespace ctl {
 constexpr Argument kSocket =
     textOption("--socket",
                "The host's socket; without it $ZAV_SOCKET, else zavhost.sock in\n"
-               "$XDG_RUNTIME_DIR, else /run/zavhost.sock")
+               "$XDG_RUNTIME_DIR, else /run/zavhost.sock; if that is not there, the\n"
+               "service's, /run/zavhost/zavhost.sock")
         .called("PATH")
         .completedBy(Completion::LocalFile);
 constexpr Argument kRpcSocket =
