@@ -1,7 +1,7 @@
 #!/bin/sh
 # Installs the packages in a minimal root file system, uses, upgrades, removes and purges them there:
 # tests/packaging/packages_life.sh says what is looked at. No systemd can run there; a small program stands
-# in for it.
+# in for it. Afterwards a container with them lives there: tests/packaging/container_life.sh.
 #
 #   scripts/test-packages.sh [--packages DIR]
 #
@@ -91,3 +91,13 @@ cp tests/packaging/packages_life.sh "$rooms/"
 
 echo "== the life of the packages"
 inside "$root" /packages ./packages_life.sh /packages
+
+# ---- The container -------------------------------------------------------------------------------
+
+# As packaging/container/Containerfile does it.
+echo "== the life of a container"
+rm -f "$root/usr/bin/systemctl"
+inside "$root" /packages/new sh -c 'dpkg -i libzav*1_*_amd64.deb zavhost_*_amd64.deb zavctl_*_amd64.deb >/dev/null
+    rm -rf /var/lib/zavmgmt/*'
+install -D -m 0755 packaging/container/container-entry "$root/usr/lib/zavhost/container-entry"
+tests/packaging/container_life.sh "$root"
