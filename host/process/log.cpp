@@ -1,5 +1,6 @@
 #include "host/process/log.h"
 
+#include <poll.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -8,6 +9,7 @@
 #include <algorithm>
 #include <atomic>
 #include <cerrno>
+#include <climits>
 #include <cstdlib>
 #include <nlohmann/json.hpp>
 
@@ -57,7 +59,24 @@ bool isJournalStream(struct stat found) {
            stream == std::to_string(found.st_dev) + ":" + std::to_string(found.st_ino);
 }
 
-void writeLine(const std::string& line) {
+/// Whether standard error takes a line now. A pipe that nobody reads would hold up the host, and
+/// its end: somebody who has been waited for in vain is not waited for again until he reads.
+bool takesLine() {
+    constexpr int kPatienceMs = 1'000;
+    static std::atomic<bool> isStuck{false};
+    pollfd output{STDERR_FILENO, POLLOUT, 0};
+    int ready = 0;
+    do {
+        ready = ::poll(&output, 1, isStuck.load() ? 0 : kPatienceMs);
+    } while (ready < 0 && errno == EINTR);
+    isStuck.store(ready == 0);
+    return ready != 0;
+}
+
+void writeLine(std::string line) {
+    // A pipe that is ready takes so much at once.
+    if (line.size() > PIPE_BUF) line.replace(PIPE_BUF - 4, std::string::npos, "...\n");
+    if (!takesLine()) return;
     while (::write(STDERR_FILENO, line.data(), line.size()) < 0 && errno == EINTR) {
     }
 }

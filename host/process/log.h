@@ -44,7 +44,8 @@ bool sendToJournal(const LogEntry& entry, std::string_view path);
 /// From now on what is said are events of a log in this format; before it is spoken. Any thread.
 void beginLog(LogFormat format);
 
-/// Says it, in one piece. `task` is the identifier of the task that it is about. Any thread.
+/// Says it, in one piece, of at most 4 KiB on standard error; what nobody takes for a second is
+/// lost. `task` is the identifier of the task that it is about. Any thread.
 void say(Priority priority, const std::string& text, const std::string& task = "");
 
 }  // namespace host

@@ -1,5 +1,6 @@
 #include "host/process/log.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -7,6 +8,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <climits>
 #include <nlohmann/json.hpp>
 
 #include "host/process/system/file_descriptor.h"
@@ -79,6 +81,35 @@ TEST(Log, TheJournalGetsFields) {
     EXPECT_EQ(received(), "PRIORITY=6\nSYSLOG_IDENTIFIER=zavhost\nMESSAGE=fine\n");
     EXPECT_FALSE(host::sendToJournal(entry(Priority::Info, "x"), scratch.path("nobody")));
     EXPECT_FALSE(host::sendToJournal(entry(Priority::Info, "x"), std::string(200, 'x')));
+}
+
+/// Standard error is something else as long as this object lives.
+class StandardError {
+public:
+    explicit StandardError(int other) : kept_(::dup(STDERR_FILENO)) {
+        ::dup2(other, STDERR_FILENO);
+    }
+    ~StandardError() { ::dup2(kept_.get(), STDERR_FILENO); }
+    StandardError(const StandardError&) = delete;
+    StandardError& operator=(const StandardError&) = delete;
+
+private:
+    const host::FileDescriptor kept_;
+};
+
+TEST(Log, NobodyWhoDoesNotReadHoldsTheHostUp) {
+    int ends[2] = {};
+    ASSERT_EQ(::pipe2(ends, O_CLOEXEC), 0);
+    const host::FileDescriptor reading(ends[0]);
+    const host::FileDescriptor writing(ends[1]);
+    {
+        const StandardError pipe(writing.get());
+        for (int i = 0; i < 1'000; ++i)
+            host::say(Priority::Info, std::string(10'000, 'x'));
+    }
+    std::array<char, PIPE_BUF> line{};
+    ASSERT_EQ(::read(reading.get(), line.data(), line.size()), PIPE_BUF);
+    EXPECT_EQ(std::string(line.data(), line.size()).substr(PIPE_BUF - 5), "x...\n");
 }
 
 TEST(Log, OnlyTheStreamThatIsNamedIsTheJournals) {
