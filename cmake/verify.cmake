@@ -96,13 +96,26 @@ foreach(program host ctl)
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 endforeach()
 
+set(fleet_libraries "")
+if(TARGET zavfleet_bus)
+  set(fleet_libraries zavfleet_bus zav_nats zav_sodium)
+  file(GLOB_RECURSE sources fleet/*.cpp)
+  file(GLOB_RECURSE headers fleet/*.h)
+  zav_verify(fleet LIBRARIES ${fleet_libraries}
+    SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
+endif()
+
 if(ZAV_BUILD_TESTS)
   file(GLOB_RECURSE sources tests/*.cpp)
   file(GLOB_RECURSE headers tests/*.h)
   # These are built without precompiled headers, by builds of their own.
   list(FILTER sources EXCLUDE REGEX "/tests/(fuzz|install/consumer)/")
   list(FILTER headers EXCLUDE REGEX "/tests/(fuzz|install/consumer)/")
-  zav_verify(tests LIBRARIES zav_test_support zavhost_core zavctl_core zavconformance_objects
+  if(NOT fleet_libraries)
+    list(FILTER sources EXCLUDE REGEX "/tests/fleet/")
+    list(FILTER headers EXCLUDE REGEX "/tests/fleet/")
+  endif()
+  zav_verify(tests LIBRARIES ${fleet_libraries} zav_test_support zavhost_core zavctl_core zavconformance_objects
     DEFINITIONS ZAV_EXAMPLE_DIR="" # of one test only
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR}/tests HEADERS ${headers})
 endif()

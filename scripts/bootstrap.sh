@@ -9,8 +9,8 @@ set -eu
 cd "$(dirname "$0")/.."
 
 packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev libexpat1-dev
-libsqlite3-dev libssl-dev libboost-dev nlohmann-json3-dev libcli11-dev libtomlplusplus-dev mksh curl pkgconf procps
-shellcheck clang libclang-rt-dev python3 python3-jsonschema mandoc'
+libsqlite3-dev libssl-dev libnats-dev libsodium-dev libboost-dev nlohmann-json3-dev libcli11-dev libtomlplusplus-dev mksh curl pkgconf procps
+shellcheck nats-server clang libclang-rt-dev python3 python3-jsonschema mandoc'
 # Programs that only judge the product from outside; their tests are skipped without them.
 judges='python3-impacket tshark zsh fish tmux'
 
@@ -63,8 +63,28 @@ if [ -n "$missing$missing_judges" ]; then
     echo bootstrap: installing $missing $missing_judges
     refresh_lists
 fi
+# The tests start servers of their own. The package would run one as a service that listens to everybody.
+has_service_manager() { [ -d /run/systemd/system ]; }
+hold_service_back() {
+    case " $missing " in *[[:space:]]nats-server[[:space:]]*) ;; *) return 0 ;; esac
+    held=yes
+    ! has_service_manager || as_root systemctl mask --runtime --quiet nats-server.service
+}
+leave_service_off() {
+    [ "${held-}" = yes ] && has_service_manager || return 0
+    as_root systemctl --quiet disable nats-server.service
+    as_root systemctl unmask --runtime --quiet nats-server.service
+}
+if [ -n "$missing" ]; then
+    hold_service_back
+    # shellcheck disable=SC2086
+    install $missing || {
+        leave_service_off
+        exit 1
+    }
+    leave_service_off
+fi
 # shellcheck disable=SC2086
-[ -z "$missing" ] || install $missing
 # shellcheck disable=SC2086
 [ -z "$missing_judges" ] || install $missing_judges ||
     echo "bootstrap: could not install" $missing_judges "- their tests will be skipped" >&2
