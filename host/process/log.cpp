@@ -21,6 +21,9 @@ namespace {
 
 constexpr std::string_view kJournal = "/run/systemd/journal/socket";
 
+/// At the end of what was too long.
+constexpr std::string_view kCut = "...";
+
 enum class LogState { Spoken, Text, Json };
 std::atomic<LogState> state{LogState::Spoken};
 
@@ -75,7 +78,9 @@ bool takesLine() {
 
 void writeLine(std::string line) {
     // A pipe that is ready takes so much at once.
-    if (line.size() > PIPE_BUF) line.replace(PIPE_BUF - 4, std::string::npos, "...\n");
+    if (line.size() > PIPE_BUF) {
+        line.replace(PIPE_BUF - 4, std::string::npos, std::string(kCut) + "\n");
+    }
     if (!takesLine()) return;
     while (::write(STDERR_FILENO, line.data(), line.size()) < 0 && errno == EINTR) {
     }
@@ -99,11 +104,18 @@ std::string textLine(const LogEntry& entry) {
 }
 
 std::string jsonLine(const LogEntry& entry) {
-    nlohmann::ordered_json line = {{"time", utcTime(entry.time)},
-                                   {"level", levelOf(entry.priority)}};
-    if (!entry.task.empty()) line["task"] = entry.task;
-    line["text"] = entry.text;
-    return line.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace) + "\n";
+    nlohmann::ordered_json document = {{"time", utcTime(entry.time)},
+                                       {"level", levelOf(entry.priority)}};
+    if (!entry.task.empty()) document["task"] = entry.task;
+    std::string text = entry.text;
+    for (;;) {
+        document["text"] = text;
+        std::string line =
+            document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace) + "\n";
+        // Half a document is no JSON, so its text is cut instead. A short one is not the reason.
+        if (line.size() <= PIPE_BUF || text.size() <= 2 * kCut.size()) return line;
+        text = text.substr(0, text.size() / 2).append(kCut);
+    }
 }
 
 std::string prefixedLine(const LogEntry& entry) {

@@ -29,7 +29,7 @@ std::string spokenLine(const LogEntry& entry);
 /// "2025-01-31T12:00:00.000Z error zavhost: no home".
 std::string textLine(const LogEntry& entry);
 /// {"time": "...", "level": "error", "task": "...", "text": "no home"}; without a task if there is
-/// none.
+/// none. A text that is too long for a line of 4 KiB is cut.
 std::string jsonLine(const LogEntry& entry);
 /// "<3>no home": for a standard error that the system's journal reads.
 std::string prefixedLine(const LogEntry& entry);

@@ -41,6 +41,12 @@ TEST(Log, ALineOfJsonHasTheTaskToo) {
               "{\"time\":\"1970-01-01T00:00:00.000Z\",\"level\":\"notice\",\"task\":\"j-1\","
               "\"text\":\"say \\\"a\\\"\\nb\"}\n");
     EXPECT_EQ(json::parse(host::jsonLine(entry(Priority::Error, "\xFF"))).count("task"), 0U);
+    for (const char letter : {'x', '\x01'}) {
+        const std::string line = host::jsonLine(entry(Priority::Error, std::string(9'000, letter)));
+        EXPECT_LE(line.size(), std::size_t{PIPE_BUF});
+        const std::string text = json::parse(line)["text"];
+        EXPECT_EQ(text.substr(text.size() - 4), letter + std::string("..."));
+    }
 }
 
 TEST(Log, TheJournalsStreamGetsThePriority) {
