@@ -29,7 +29,7 @@ struct InstanceList {
     std::vector<AgentInstance> instances;
 };
 
-/// Runs `home`/bin/instances. Any thread; takes as long as that program, at most thirty seconds.
+/// Runs `home`/bin/instances. Any thread; takes as long as that program, at most twelve seconds.
 InstanceList readInstances(const std::string& home);
 
 /// What the program printed; lines that make no sense are left out.
