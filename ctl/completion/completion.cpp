@@ -2,7 +2,7 @@
 
 #include <chrono>
 
-#include "ctl/client/address/peer.h"
+#include "ctl/client/address/host_address.h"
 #include "ctl/completion/offers.h"
 #include "ctl/completion/wanted.h"
 
@@ -28,7 +28,6 @@ std::string completionOf(const std::vector<std::string>& words) {
     if (wanted.source == Completion::LocalFile) return "files\n";
     if (wanted.host.socket.empty()) wanted.host.socket = defaultSocket();
     wanted.host.timeout = kPatience;
-    if (!wanted.hostUser.empty()) trustHostUser(wanted.hostUser);
     return "words\n" + linesOf("", wanted.words) +
            linesOf(wanted.lead, offersFor(wanted, deadlineIn(kPatience)));
 }

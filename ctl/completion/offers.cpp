@@ -6,6 +6,7 @@
 #include <string>
 #include <utility>
 
+#include "ctl/client/address/peer.h"
 #include "ctl/client/depot_client.h"
 #include "ctl/client/failure.h"
 #include "ctl/client/host_client.h"
@@ -87,9 +88,7 @@ Candidates listOf(const char* const* first, const char* const* last) {
 }
 
 Candidates states() {
-    constexpr const char* kStates[] = {"queued",  "running",   "done",    "failed",
-                                       "refused", "cancelled", "expired", "interrupted"};
-    return listOf(std::begin(kStates), std::end(kStates));
+    return listOf(std::begin(kTaskStates), std::end(kTaskStates));
 }
 
 Candidates tables() {
@@ -133,6 +132,7 @@ bool isPlain(const std::string& word) {
 Candidates offersFor(const Wanted& wanted, Deadline deadline) {
     Candidates found;
     try {
+        if (!wanted.hostUser.empty()) trustHostUser(wanted.hostUser);
         found = ask(wanted, deadline);
     } catch (const std::exception&) {
         return {};

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "ctl/client/host_client.h"
+#include "ctl/client/http/bounded_json.h"
 #include "ctl/client/instances.h"
 #include "ctl/client/row.h"
 #include "ctl/client/tasks/task_list.h"
@@ -122,7 +123,11 @@ public:
         const Deadline deadline = invocation_.deadline();
         TopFacts facts;
         facts.health = client.get("/v1/health", deadline);
-        facts.ready = json::parse(client.ask("/v1/ready", deadline).body, nullptr, false);
+        if (!facts.health.is_object()) {
+            throw Failure(kNoHost, "the host's answer does not say how it is");
+        }
+        // With the reasons, where it is not.
+        facts.ready = objectIn(client.ask("/v1/ready", deadline).body);
         facts.work = askWork(invocation_);
         facts.recent = listIn(listTasks(client, {{}, {}, kRecent}, deadline), "tasks");
         if (looks_++ % kLooksPerInstances == 0) instances_ = askInstances(client, deadline);

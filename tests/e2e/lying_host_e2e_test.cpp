@@ -206,6 +206,7 @@ TEST_P(LyingHostWhoseAnswerIsNone, IsAFailureOfEveryVerb) {
                            {"depot", "rm", "file"},
                            {"doctor"},
                            {"ps"},
+                           {"top"},
                            {"tasks"},
                            {"task", "show", "T"},
                            {"task", "cancel", "T"},
@@ -238,6 +239,7 @@ TEST(LyingHost, ThatSendsOneByteAndNoMoreRunsIntoTheTimeOut) {
                                   {"depot", "sum", "a", "b"},
                                   {"doctor"},
                                   {"ps"},
+                                  {"top"},
                                   {"events", "--count", "1"}}) {
             SCOPED_TRACE(before + verb.front());
             const ProgramResult result = ask(host, verb, "0.5");
@@ -288,6 +290,7 @@ const Document kDocuments[] = {
      1,
      "it is not known what became of it"},
     {"a number for the health", {"status"}, "7", 3, "does not say how it is"},
+    {"a list for the health at a glance", {"top"}, "[]", 3, "does not say how it is"},
     {"text for the depot",
      {"depot", "ls", "-l"},
      R"("x")",
@@ -321,6 +324,46 @@ TEST(LyingHost, WhoseDocumentSaysSomethingElseIsAFailureThatSaysWhy) {
         EXPECT_EQ(result.status, lie.status);
         EXPECT_THAT(result.err, HasSubstr(lie.said));
     }
+}
+
+/// Says all that `top` asks for but whether it is ready: that is a lie of its own.
+LyingHost::Lie lyingAboutReadiness(const LyingHost::Lie& lie) {
+    return [lie](const Victim& victim) {
+        const std::string request = victim.hear();
+        const auto asks = [&request](const char* path) {
+            return request.rfind(std::string("GET ") + path, 0) == 0;
+        };
+        if (asks("/v1/ready")) return lie(victim);
+        victim.send(ok(asks("/v1/tasks")       ? R"({"tasks": [], "next": null})"
+                       : asks("/v1/instances") ? R"({"instances": []})"
+                                               : R"({"version": "1.0"})"));
+    };
+}
+
+TEST(LyingHost, WhoseReadinessIsNoObjectIsShownWithoutIt) {
+    const std::string bodies[] = {"",     "{\"ready\": tr", "7",  "[]",
+                                  "null", "true",           "\"", std::string(1000, '[')};
+    for (const std::string& body : bodies) {
+        SCOPED_TRACE(body);
+        const LyingHost host(
+            lyingAboutReadiness([&body](const Victim& victim) { victim.send(ok(body)); }));
+        const ProgramResult result = ask(host, {"--json", "top"});
+        expectHarmless(result);
+        EXPECT_EQ(result.status, 0) << result.err;
+        EXPECT_THAT(result.out, HasSubstr("\"ready\": null"));
+        EXPECT_THAT(result.out, HasSubstr("\"version\": \"1.0\""));
+    }
+}
+
+TEST(LyingHost, WhoseReadinessHasNoEndIsAFailureThatSaysWhy) {
+    const LyingHost host(lyingAboutReadiness([](const Victim& victim) {
+        victim.send("HTTP/1.1 503 Service Unavailable\r\nConnection: close\r\n\r\n");
+        victim.sendWithoutEnd(std::string(65536, ' '));
+    }));
+    const ProgramResult result = ask(host, {"top"});
+    expectHarmless(result);
+    EXPECT_EQ(result.status, 3);
+    EXPECT_THAT(result.err, HasSubstr("is larger than 64 MiB"));
 }
 
 TEST(LyingHost, IsShownWithItsEscapeSequencesAsText) {

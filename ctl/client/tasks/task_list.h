@@ -10,6 +10,10 @@
 
 namespace ctl {
 
+/// What a task may be.
+constexpr const char* kTaskStates[] = {"queued",  "running",   "done",    "failed",
+                                       "refused", "cancelled", "expired", "interrupted"};
+
 /// Which tasks are wanted. Empty texts mean any.
 struct TaskFilter {
     std::string state;

@@ -21,10 +21,11 @@ class Victim {
 public:
     explicit Victim(int descriptor) : socket_(descriptor) {}
 
-    /// Waits for something of the request; lies need no more.
-    void hear() const {
+    /// Waits for something of the request, which is its first line at least; lies need no more.
+    std::string hear() const {
         char piece[65536];
-        (void)::recv(socket_.get(), piece, sizeof piece, 0);
+        const ssize_t length = ::recv(socket_.get(), piece, sizeof piece, 0);
+        return {piece, length > 0 ? static_cast<std::size_t>(length) : 0};
     }
     /// False when the client has gone.
     bool send(const std::string& bytes) const {

@@ -22,6 +22,7 @@
 #include "ctl/verbs/tasks/task_cancel.h"
 #include "ctl/verbs/tasks/task_wait.h"
 #include "ctl/verbs/tasks/tasks.h"
+#include "ctl/verbs/top.h"
 #include "ctl/verbs/version.h"
 
 namespace {
@@ -189,6 +190,23 @@ TEST(OddDocuments, AboutTheHostAreShownOrRefused) {
     });
     tryAllVariants({{{"check", "home"}, {"result", "error"}, {"text", "x"}, {"remedy", "y"}}},
                    ctl::showChecks);
+}
+
+TEST(OddDocuments, AboutTheHostAtAGlanceAreShown) {
+    const json glance = {
+        {"health", {{"version", "1"}, {"home", "/h"}, {"uptime_seconds", 7}, {"guarded", false}}},
+        {"ready", {{"ready", false}, {"reasons", {{{"part", "disk"}, {"text", "x"}}}}}},
+        {"work", {kTask}},
+        {"instances", {{{"target", "h:UX"}, {"state", "running"}, {"user", "root"}, {"pid", 7}}}},
+        {"recent", {kTask}}};
+    tryAllVariants(glance, [](const json& document, Format) {
+        const auto member = [&document](const char* name) {
+            return document.is_object() && document.contains(name) ? document[name] : json();
+        };
+        return ctl::showTop({member("health"), member("ready"), member("work"), member("instances"),
+                             member("recent")},
+                            {}, 0);
+    });
 }
 
 TEST(OddDocuments, OfTasksAreShown) {

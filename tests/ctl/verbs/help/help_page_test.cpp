@@ -3,8 +3,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <set>
 #include <sstream>
 
+#include "ctl/client/tasks/task_list.h"
 #include "ctl/verbs/verb_table.h"
 
 namespace {
@@ -55,6 +57,18 @@ TEST(Help, SaysWhichArgumentsMayBeLeftOutAndWhichDoNotGoTogether) {
     EXPECT_THAT(ctl::verbHelp(ctl::kHelpVerb), HasSubstr(" [OPTIONS] [VERB...]\n"));
     EXPECT_THAT(ctl::verbHelp(ctl::kStartVerb), HasSubstr("; not with --target\n"));
     EXPECT_THAT(ctl::verbHelp(ctl::kInstallVerb), HasSubstr("only with --restart"));
+}
+
+TEST(Help, NamesEveryStateThatATaskMayBeIn) {
+    const std::string text = ctl::verbHelp(ctl::kTasksVerb);
+    const std::size_t begin = text.find("Only those in this state: ");
+    ASSERT_NE(begin, std::string::npos);
+    std::istringstream ofTheOption(text.substr(begin, text.find("\n  --", begin) - begin));
+    std::set<std::string> words;
+    for (std::string word; ofTheOption >> word;)
+        words.insert(word.substr(0, word.find(',')));
+    for (const char* const state : ctl::kTaskStates)
+        EXPECT_EQ(words.count(state), 1U) << state;
 }
 
 TEST(Help, OfAGroupListsItsVerbsWithAnExampleOfEach) {
