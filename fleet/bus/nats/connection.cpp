@@ -434,6 +434,15 @@ BusStatus Connection::publish(const std::string& subject, std::string_view bytes
     return impl_->publish(subject, "", bytes, headers);
 }
 
+BusStatus Connection::publishAsking(const std::string& subject, const std::string& reply,
+                                    std::string_view bytes) {
+    return impl_->publish(subject, reply, bytes, {});
+}
+
+std::string Connection::newInbox() const {
+    return impl_->identity().options().inboxPrefix + "." + randomToken();
+}
+
 Connection::Reply Connection::request(const std::string& subject, std::string_view bytes,
                                       Milliseconds deadline, const BusHeaders& headers) {
     Reply reply;

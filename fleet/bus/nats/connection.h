@@ -41,10 +41,17 @@ public:
     std::uint64_t unsendableSignatures() const;
 
     /// Hands the bytes to the client library, which sends them soon. While there is no server it
-    /// keeps as much as the options allow, then says NoAnswer. Permissions show in
-    /// ConnectionEvents::error only; flush() makes sure that the server has got everything.
+    /// keeps messages until they are as long as the options allow, then says NoAnswer. Permissions
+    /// show in ConnectionEvents::error only; flush() makes sure that the server has got everything.
     BusStatus publish(const std::string& subject, std::string_view bytes,
                       const BusHeaders& headers = {});
+
+    /// The same, with a subject to which others may answer.
+    BusStatus publishAsking(const std::string& subject, const std::string& reply,
+                            std::string_view bytes);
+
+    /// A new subject below the prefix of this connection's inboxes, for answers to publishAsking().
+    std::string newInbox() const;
 
     struct Reply;
     /// Publishes with a subject for the answer and waits for that. Nothing is sent while there is

@@ -12,10 +12,14 @@
 #include <vector>
 
 #include "fleet/bus/accounts/nkey.h"
+#include "fleet/bus/nats/connecting.h"
 #include "support/fleet/nats_server.h"
 #include "support/host/program.h"
 
 using namespace std::chrono_literals;
+using connecting::connected;
+using connecting::kPatience;
+using connecting::optionsFor;
 using fleet::BusMessage;
 using fleet::BusStatus;
 using fleet::Connection;
@@ -24,23 +28,6 @@ using Failure = fleet::Connection::Result::Failure;
 using Kind = fleet::BusStatus::Kind;
 
 namespace {
-
-/// Long enough for any answer of a server on this machine; a test that needs it all has failed.
-constexpr auto kPatience = 60s;
-
-ConnectionOptions optionsFor(const NatsServer& server) {
-    ConnectionOptions options;
-    options.urls = {server.url()};
-    options.reconnectWait = 1ms;
-    options.reconnectJitter = 0ms;
-    return options;
-}
-
-std::unique_ptr<Connection> connected(const ConnectionOptions& options) {
-    Connection::Result result = Connection::connect(options);
-    if (!result.connection) throw std::runtime_error(result.text);
-    return std::move(result.connection);
-}
 
 /// What was received, for the thread of the test.
 class Received {

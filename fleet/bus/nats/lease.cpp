@@ -1,0 +1,53 @@
+#include "fleet/bus/nats/lease.h"
+
+namespace fleet {
+
+Lease::State Lease::claim() {
+    const LastResult last =
+        lastOn(connection_, settings_.stream, settings_.subject, settings_.deadline);
+    if (last.kind == LastResult::Kind::Missing) return storeOver(0);
+    State state;
+    state.text = last.text;
+    if (last.kind != LastResult::Kind::Found) return state;
+    if (last.sequence != seen_) {
+        seen_ = last.sequence;
+        seenSince_ = now_();
+    }
+    state.kind = State::Kind::Others;
+    state.holder = last.bytes;
+    state.age = std::chrono::duration_cast<Connection::Milliseconds>(now_() - seenSince_);
+    state.text = last.bytes + " has it";
+    return state.age > settings_.term ? storeOver(last.sequence) : state;
+}
+
+Lease::State Lease::renew() {
+    if (ours_ != 0) return storeOver(ours_);
+    State state;
+    state.text = "it is not ours";
+    return state;
+}
+
+Lease::State Lease::storeOver(std::uint64_t sequence) {
+    const StoreResult stored =
+        storeAfter(connection_, settings_.subject, settings_.holder, sequence, settings_.deadline);
+    State state;
+    state.text = stored.text;
+    ours_ = 0;
+    if (stored.kind == StoreResult::Kind::Stored) {
+        ours_ = stored.sequence;
+        state.kind = State::Kind::Ours;
+    } else if (stored.kind == StoreResult::Kind::Occupied) {
+        state.kind = State::Kind::Others;
+    }
+    return state;
+}
+
+void Lease::release() {
+    // If it fails, the lease grows old like any other.
+    if (ours_ != 0) {
+        static_cast<void>(erase(connection_, settings_.stream, ours_, settings_.deadline));
+    }
+    ours_ = 0;
+}
+
+}  // namespace fleet
