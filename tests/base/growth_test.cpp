@@ -1,6 +1,6 @@
 // The cost of large inputs grows in proportion to them.
 // ctest-label: timing
-#include "support/growth.h"
+#include "support/process/growth.h"
 
 #include <gtest/gtest.h>
 

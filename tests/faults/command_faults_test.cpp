@@ -6,7 +6,7 @@
 #include <cstdlib>
 
 #include "faults/scenario.h"
-#include "support/left_running.h"
+#include "support/process/left_running.h"
 #include "support/scoped_env.h"
 #include "util/zavutil.h"
 

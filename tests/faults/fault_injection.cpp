@@ -24,7 +24,7 @@
 
 // The sanitizers own the allocator.
 #if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)
-#include "support/own_new.h"
+#include "support/process/own_new.h"
 #endif
 
 using faults::Call;

@@ -12,7 +12,7 @@
 
 #include "base/zavstr.h"
 #include "faults/fault_injection.h"
-#include "support/child_role.h"
+#include "support/process/child_role.h"
 #include "support/trace_capture.h"
 
 namespace faults {

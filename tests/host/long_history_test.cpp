@@ -7,9 +7,9 @@
 
 #include "host/journal/journal.h"
 #include "host/raw_client.h"
-#include "support/growth.h"
 #include "support/host/managed_host.h"
 #include "support/host/script_home.h"
+#include "support/process/growth.h"
 
 namespace {
 

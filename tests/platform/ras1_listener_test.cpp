@@ -16,8 +16,8 @@
 #include <vector>
 
 #include "support/host/program.h"
+#include "support/process/vfork.h"
 #include "support/trace_capture.h"
-#include "support/vfork.h"
 
 namespace {
 

@@ -4,7 +4,7 @@
 
 #include <string>
 
-#include "support/growth.h"
+#include "support/process/growth.h"
 #include "support/trace_capture.h"
 #include "tables/inventory.h"
 

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "embedded/oxa_host.h"
-#include "support/own_new.h"
+#include "support/process/own_new.h"
 #include "support/request_lender.h"
 #include "tables/zav01agt.h"
 #include "tables/zav02agt.h"

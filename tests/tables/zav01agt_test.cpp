@@ -15,9 +15,9 @@
 
 #include "support/fake_sleep.h"
 #include "support/host/program.h"
+#include "support/process/thread_state.h"
 #include "support/row_text.h"
 #include "support/scoped_env.h"
-#include "support/thread_state.h"
 #include "support/trace_capture.h"
 #include "tables/table_checks.h"
 #include "tasks/home.h"

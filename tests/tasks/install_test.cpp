@@ -5,7 +5,7 @@
 
 #include "support/clock.h"
 #include "support/fake_sleep.h"
-#include "support/left_running.h"
+#include "support/process/left_running.h"
 #include "support/trace_capture.h"
 #include "tasks/task_home.h"
 

@@ -6,10 +6,10 @@
 #include <cstdlib>
 #include <set>
 
-#include "support/child_role.h"
 #include "support/clock.h"
 #include "support/host/program.h"
-#include "support/left_running.h"
+#include "support/process/child_role.h"
+#include "support/process/left_running.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"

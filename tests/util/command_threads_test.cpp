@@ -9,8 +9,8 @@
 #include <cerrno>
 #include <thread>
 
-#include "support/child_role.h"
-#include "support/left_running.h"
+#include "support/process/child_role.h"
+#include "support/process/left_running.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 #include "util/zavutil.h"

@@ -9,7 +9,7 @@
 #include <string>
 
 #include "support/clock.h"
-#include "support/growth.h"
+#include "support/process/growth.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"

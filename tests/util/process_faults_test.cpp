@@ -24,8 +24,8 @@
 #include <set>
 
 #include "platform/fsi1.h"
-#include "support/child_role.h"
-#include "support/own_new.h"
+#include "support/process/child_role.h"
+#include "support/process/own_new.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 #include "util/zavprocs.h"

@@ -14,10 +14,10 @@
 #include <set>
 #include <sstream>
 
-#include "support/child_role.h"
 #include "support/clock.h"
 #include "support/host/program.h"
-#include "support/left_running.h"
+#include "support/process/child_role.h"
+#include "support/process/left_running.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
 #include "util/zavprocs.h"

@@ -15,15 +15,15 @@
 #include "ctl/verbs/config/config_get.h"
 #include "ctl/verbs/depot/depot_ls.h"
 #include "ctl/verbs/depot/depot_sum.h"
-#include "ctl/verbs/doctor.h"
 #include "ctl/verbs/events.h"
+#include "ctl/verbs/host/doctor.h"
+#include "ctl/verbs/host/status.h"
+#include "ctl/verbs/host/top.h"
+#include "ctl/verbs/host/version.h"
 #include "ctl/verbs/query.h"
-#include "ctl/verbs/status.h"
 #include "ctl/verbs/tasks/task_cancel.h"
 #include "ctl/verbs/tasks/task_wait.h"
 #include "ctl/verbs/tasks/tasks.h"
-#include "ctl/verbs/top.h"
-#include "ctl/verbs/version.h"
 
 namespace {
 

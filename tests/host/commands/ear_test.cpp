@@ -13,11 +13,11 @@
 
 #include "host/commands/plugin_threads.h"
 #include "support/host/program.h"
-#include "support/left_running.h"
+#include "support/process/left_running.h"
+#include "support/process/vfork.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 #include "support/trace_capture.h"
-#include "support/vfork.h"
 #include "util/zavutil.h"
 
 namespace {

@@ -16,8 +16,8 @@
 #include "host/process/plugin_loader.h"
 #include "support/fake_sleep.h"
 #include "support/host/script_home.h"
+#include "support/process/vfork.h"
 #include "support/scoped_env.h"
-#include "support/vfork.h"
 
 namespace {
 

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "host/server_fixture.h"
-#include "support/thread_state.h"
+#include "support/process/thread_state.h"
 
 namespace {
 

@@ -6,8 +6,8 @@
 #include <cerrno>
 #include <csignal>
 
-#include "support/child_role.h"
 #include "support/host/program.h"
+#include "support/process/child_role.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
 
