@@ -209,26 +209,21 @@ void feedWatchdog(HttpServer& server, const Notifier& notifier, const Journal& j
     });
 }
 
-/// While nothing has been written down, nothing has changed.
-StatusReporter::Status statusOf(Journal& journal) {
-    return [&journal, known = std::optional<std::uint64_t>(), text = std::string()]() mutable {
-        const std::uint64_t transactions = journal.transactions();
-        if (known == transactions) return text;
-        TaskFilter running;
-        running.state = TaskState::Running;
-        const std::int64_t queued = journal.notBegun();
-        text = taskStatus(queued, journal.newest(running));
-        known = transactions;
-        return text;
-    };
+std::string statusOf(Journal& journal) {
+    TaskFilter running;
+    running.state = TaskState::Running;
+    const std::int64_t queued = journal.notBegun();
+    return taskStatus(queued, journal.newest(running));
 }
 
-/// What cannot be read now is told at the next look.
-void tellOfTasks(TaskLog& log) {
+/// False when the journal cannot be read now: what is new is told at the next look.
+bool tellOfTasks(TaskLog& log) {
     try {
         log.look();
+        return true;
     } catch (const std::exception&) {
         // Requests say so to those whom it concerns.
+        return false;
     }
 }
 
@@ -293,9 +288,15 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     notifier.tellSurely("READY=1\n");
     beginLog(options.logFormat);
     TaskLog taskLog(services.journal, say);
-    OnChange logging(std::chrono::seconds(1), [&] { tellOfTasks(taskLog); });
-    services.journal.whenCommitted([&logging] { logging.changed(); });
-    const StatusReporter reporter(notifier, statusOf(services.journal));
+    OnChange logging(std::chrono::seconds(1), [&] { return tellOfTasks(taskLog); });
+    StatusReporter reporter(notifier, [&] { return statusOf(services.journal); });
+    const auto look = [&logging, &reporter] {
+        logging.changed();
+        reporter.changed();
+    };
+    services.journal.whenCommitted(look);
+    // Something may have been committed since their first looks.
+    look();
     server.run();
     logging.stop();
     tellOfTasks(taskLog);

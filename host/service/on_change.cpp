@@ -4,7 +4,7 @@
 
 namespace host {
 
-OnChange::OnChange(std::chrono::milliseconds pause, std::function<void()> act)
+OnChange::OnChange(std::chrono::milliseconds pause, std::function<bool()> act)
     : pause_(pause), act_(std::move(act)), thread_([this] { work(); }) {}
 
 OnChange::~OnChange() {
@@ -39,9 +39,10 @@ void OnChange::work() {
         if (stopping_) return;
         changed_ = false;
         lock.unlock();
-        act_();
+        const bool succeeded = act_();
         next = std::chrono::steady_clock::now() + pause_;
         lock.lock();
+        if (!succeeded) changed_ = true;
     }
 }
 

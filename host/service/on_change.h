@@ -13,8 +13,9 @@ namespace host {
 /// after the last time: many changes make one call. While nothing changes the thread sleeps.
 class OnChange {
 public:
-    /// `act` must not throw.
-    OnChange(std::chrono::milliseconds pause, std::function<void()> act);
+    /// `act` returns whether it has succeeded: if not, it is called again after the pause. It must
+    /// not throw.
+    OnChange(std::chrono::milliseconds pause, std::function<bool()> act);
     /// Calls stop().
     ~OnChange();
     OnChange(const OnChange&) = delete;
@@ -29,7 +30,7 @@ private:
     void work();
 
     const std::chrono::milliseconds pause_;
-    const std::function<void()> act_;
+    const std::function<bool()> act_;
 
     std::mutex lock_;  // around the flags
     std::condition_variable woken_;

@@ -15,7 +15,7 @@ using std::chrono::milliseconds;
 
 TEST(ActOnChange, IsDoneAtOnceAndAfterEachChange) {
     std::atomic<int> times{0};
-    OnChange onChange(milliseconds(0), [&times] { ++times; });
+    OnChange onChange(milliseconds(0), [&times] { return ++times > 0; });
     for (const int expected : {1, 2, 3}) {
         EXPECT_TRUE(eventually([&] { return times == expected; })) << expected;
         onChange.changed();
@@ -27,6 +27,7 @@ TEST(ActOnChange, IsDoneOnceForChangesMeanwhile) {
     std::atomic<int> times{0};
     OnChange onChange(milliseconds(0), [&] {
         if (++times == 1) gate.pass();
+        return true;
     });
     ASSERT_TRUE(gate.awaitArrival());
     for (int i = 0; i < 10; ++i)
@@ -37,12 +38,21 @@ TEST(ActOnChange, IsDoneOnceForChangesMeanwhile) {
     EXPECT_EQ(times, 2);
 }
 
+TEST(ActOnChange, IsTriedAgainUntilItSucceeds) {
+    std::atomic<int> times{0};
+    OnChange onChange(milliseconds(0), [&times] { return ++times == 5; });
+    EXPECT_TRUE(eventually([&] { return times == 5; }));
+    onChange.stop();
+    EXPECT_EQ(times, 5);
+}
+
 TEST(ActOnChange, IsNotDoneOnceItHasBeenStopped) {
     Gate gate;
     std::atomic<int> times{0};
     OnChange onChange(std::chrono::hours(1), [&] {
         ++times;
         gate.pass();
+        return true;
     });
     ASSERT_TRUE(gate.awaitArrival());
     onChange.changed();
