@@ -34,19 +34,8 @@ commit=$(git rev-parse --verify --short HEAD) || fail "this is no checkout"
 scripts/bootstrap.sh
 need_packages mmdebstrap
 
-root=$(mktemp -d -p "${TMPDIR:-/var/tmp}" fresh.XXXXXX)
-cleanup() {
-    status=$?
-    trap - EXIT
-    if [ -n "$keep" ]; then
-        echo "fresh: the root file system is in $root"
-    else
-        rm -rf --one-file-system "$root"
-    fi
-    exit "$status"
-}
-trap cleanup EXIT
-trap 'exit 130' HUP INT TERM
+make_scratch "$keep"
+root=$scratch
 
 # ---- The root file system ------------------------------------------------------------------------
 

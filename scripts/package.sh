@@ -43,16 +43,8 @@ commit=$(git rev-parse --verify HEAD) || fail "this is no checkout"
 [ -z "$(git status --porcelain)" ] || echo "package: what is not committed is left out" >&2
 
 umask 022
-scratch=$(mktemp -d -p "${TMPDIR:-/var/tmp}" package.XXXXXX)
+make_scratch ''
 chmod 755 "$scratch"
-cleanup() {
-    status=$?
-    trap - EXIT
-    rm -rf --one-file-system "$scratch"
-    exit "$status"
-}
-trap cleanup EXIT
-trap 'exit 130' HUP INT TERM
 
 # ---- The source ----------------------------------------------------------------------------------
 

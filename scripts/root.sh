@@ -72,3 +72,23 @@ inside() {
             PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin \
             /bin/sh -euc '\''cd "$1"; shift; exec "$@"'\'' sh "$@"' sh "$@"
 }
+
+# make_scratch KEEP: makes a folder below $TMPDIR or /var/tmp, whose path `scratch` then holds. It is removed
+# when the program ends, unless KEEP is any text.
+make_scratch() {
+    scratch_stays=$1
+    scratch=$(mktemp -d -p "${TMPDIR:-/var/tmp}" "$program.XXXXXX")
+    trap drop_scratch EXIT
+    trap 'exit 130' HUP INT TERM
+}
+
+drop_scratch() {
+    drop_status=$?
+    trap - EXIT
+    if [ -n "$scratch_stays" ]; then
+        echo "$program: $scratch is left behind"
+    else
+        rm -rf --one-file-system "$scratch"
+    fi
+    exit "$drop_status"
+}

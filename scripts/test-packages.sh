@@ -30,15 +30,8 @@ if [ -z "$packages" ]; then
 fi
 need_packages mmdebstrap
 
-root=$(mktemp -d -p "${TMPDIR:-/var/tmp}" packages.XXXXXX)
-cleanup() {
-    status=$?
-    trap - EXIT
-    rm -rf --one-file-system "$root"
-    exit "$status"
-}
-trap cleanup EXIT
-trap 'exit 130' HUP INT TERM
+make_scratch ''
+root=$scratch
 
 # ---- The root file system ------------------------------------------------------------------------
 

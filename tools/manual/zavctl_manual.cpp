@@ -4,8 +4,6 @@
 
 #include <algorithm>
 #include <cctype>
-#include <cstdio>
-#include <exception>
 #include <set>
 #include <string>
 
@@ -14,6 +12,7 @@
 #include "ctl/verbs/help/argument_text.h"
 #include "ctl/verbs/verb_table.h"
 #include "tools/manual/mdoc.h"
+#include "tools/manual/pages.h"
 
 namespace manual {
 namespace {
@@ -121,7 +120,10 @@ void writeVerb(const ctl::Verb& verb, const std::string& templates, const std::s
                   {"RELATIVES", relativesOf(verb)}}));
 }
 
-int run(const std::string& templates, const std::string& directory, const std::string& date) {
+}  // namespace
+
+void writePages(const std::string& templates, const std::string& directory,
+                const std::string& date) {
     write(directory + "/zavctl.1",
           filled(templates + "/zavctl.1.in", {{"DATE", date},
                                               {"OPTIONS", listOf(ctl::kGlobalArguments, false)},
@@ -129,19 +131,6 @@ int run(const std::string& templates, const std::string& directory, const std::s
                                               {"EXIT_STATUSES", exitStatuses()}}));
     for (const ctl::Verb* const verb : ctl::kVerbs)
         writeVerb(*verb, templates, directory, date);
-    return 0;
 }
 
-}  // namespace
 }  // namespace manual
-
-int main(int argc, char** argv) {
-    try {
-        if (argc == 4) return manual::run(argv[1], argv[2], argv[3]);
-        std::fputs("usage: zavctl_manual TEMPLATES DIRECTORY DATE\n", stderr);
-        return 2;
-    } catch (const std::exception& error) {
-        std::fprintf(stderr, "zavctl_manual: %s\n", error.what());
-        return 1;
-    }
-}

@@ -1,11 +1,10 @@
 // Writes the manual pages of the host: zavhost_manual TEMPLATES DIRECTORY DATE
 
-#include <cstdio>
-#include <exception>
 #include <string>
 
 #include "host/process/configuration/option_table.h"
 #include "tools/manual/mdoc.h"
+#include "tools/manual/pages.h"
 
 namespace manual {
 namespace {
@@ -54,26 +53,16 @@ std::string onCommandLineOnly() {
     return lines;
 }
 
-int run(const std::string& templates, const std::string& directory, const std::string& date) {
+}  // namespace
+
+void writePages(const std::string& templates, const std::string& directory,
+                const std::string& date) {
     write(directory + "/zavhost.8",
           filled(templates + "/zavhost.8.in", {{"DATE", date}, {"OPTIONS", onCommandLine()}}));
     write(directory + "/zavhost.conf.5",
           filled(templates + "/zavhost.conf.5.in",
                  {{"DATE", date}, {"KEYS", inFile()}, {"NO_KEYS", onCommandLineOnly()}}));
     write(directory + "/zavmgmt.7", filled(templates + "/zavmgmt.7.in", {{"DATE", date}}));
-    return 0;
 }
 
-}  // namespace
 }  // namespace manual
-
-int main(int argc, char** argv) {
-    try {
-        if (argc == 4) return manual::run(argv[1], argv[2], argv[3]);
-        std::fputs("usage: zavhost_manual TEMPLATES DIRECTORY DATE\n", stderr);
-        return 2;
-    } catch (const std::exception& error) {
-        std::fprintf(stderr, "zavhost_manual: %s\n", error.what());
-        return 1;
-    }
-}
