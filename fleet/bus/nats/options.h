@@ -41,7 +41,7 @@ using Credentials = std::variant<Anonymous, UserPassword, UserKey, UserToken>;
 
 struct TlsOptions {
     std::string caFile;      ///< certificates of who may sign the server's, PEM
-    std::string serverName;  ///< what the server's certificate must be for
+    std::string serverName;  ///< the DNS name that the server's certificate must have
 };
 
 /// Tells what happens to a connection. All of them run on one thread of the client library, which
