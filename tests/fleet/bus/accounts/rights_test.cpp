@@ -3,6 +3,7 @@
 #include <atomic>
 #include <memory>
 #include <mutex>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -170,10 +171,10 @@ TEST_F(RightsOfHosts, LetAHostGetItsOwnTasks) {
 TEST_F(RightsOfHosts, GiveAHostWhatIsPublishedToItAndToNobodyElse) {
     const auto host = connected(fleet_.hostOptions(h_));
     std::mutex mutex;
-    std::vector<std::string> heard;
+    std::multiset<std::string> heard;  // two subscriptions have no order between them
     const auto hear = [&](const BusMessage& message) {
         const std::lock_guard lock(mutex);
-        heard.push_back(message.subject);
+        heard.insert(message.subject);
     };
     const auto tasks = host->subscribe(own("rp.task.", ".*"), hear, kPatience);
     const auto questions = host->subscribe(own("rp.ask."), hear, kPatience);
@@ -188,7 +189,7 @@ TEST_F(RightsOfHosts, GiveAHostWhatIsPublishedToItAndToNobodyElse) {
         return heard.size() >= 2;
     }));
     const std::lock_guard lock(mutex);
-    EXPECT_EQ(heard, (std::vector<std::string>{own("rp.task.", ".1"), own("rp.ask.")}));
+    EXPECT_EQ(heard, (std::multiset<std::string>{own("rp.task.", ".1"), own("rp.ask.")}));
 }
 
 TEST_F(RightsOfHosts, EndAtItsOwnSubjects) {
