@@ -141,6 +141,13 @@ std::vector<std::string> Call::texts(const char* name) const {
     return values;
 }
 
+/// The field of a client that reconnects by itself is newer than the parameter, which it repeats.
+std::string Call::after() const {
+    if (!request_.lastEventId.empty()) return request_.lastEventId;
+    const std::string* const given = text("after");
+    return given == nullptr ? std::string() : *given;
+}
+
 long long Call::number(const char* name, long long otherwise) const {
     const std::string* const value = text(name);
     return value == nullptr ? otherwise : std::atoll(value->c_str());

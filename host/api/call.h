@@ -21,9 +21,9 @@ public:
 
     const Route& route() const { return *match_.route; }
     const Peer& peer() const { return request_.peer; }
-    /// The event after which a client that reads a stream wants to continue; empty if it names
-    /// none.
-    const std::string& lastEventId() const { return request_.lastEventId; }
+    /// The event after which a client that reads a stream wants to continue, from its field
+    /// Last-Event-ID or else the parameter "after"; empty if it names none.
+    std::string after() const;
 
     /// The value of a parameter of the path or of the query; null when it was not given.
     const std::string* text(const char* name) const;

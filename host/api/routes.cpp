@@ -91,6 +91,7 @@ std::vector<Route> routes() {
             {"end", outputEndSchema}}}},
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
           {"follow", Type::Flag, Need::Optional, "1: goes on until the task is over"},
+          {"after", Type::Text, Need::Optional, "the event after which to continue"},
           {"journal", Type::Text, Need::Optional, "the journal that must be this host's"}},
          Others::None, {}, {404}},
 

@@ -638,12 +638,14 @@ class Operations:
         id: str,
         *,
         follow: Literal[0, 1] | None = None,
+        after: str | None = None,
         journal: str | None = None,
     ) -> Iterator[Event]:
         """Streams what a task's commands write.
 
         id: the task's identifier, or a TRANSID
         follow: 1: goes on until the task is over
+        after: the event after which to continue
         journal: the journal that must be this host's
         The data of an event "message" is OutputPiece.
         The data of an event "overflow" is Overflow.
@@ -652,6 +654,7 @@ class Operations:
         """
         parameters: dict[str, Any] = {}
         parameters["follow"] = follow
+        parameters["after"] = after
         parameters["journal"] = journal
         return self._transport.stream("GET", f"/v1/tasks/{segment(id)}/output", parameters)
 

@@ -245,26 +245,43 @@ void JournalTask::awaitReply() {
 
 // ---- Output -------------------------------------------------------------------------------------
 
+/// Where the rest of the output is, or all of it if none has come.
+std::string JournalTask::outputTarget() const {
+    const std::string target = path() + "/output?follow=1";
+    return outputPosition_.empty() ? target : target + "&after=" + percentEncoded(outputPosition_);
+}
+
+void JournalTask::passOn(const ServerEvent& event) {
+    const json piece = objectIn(event.data);
+    if (event.type == "overflow") note(lostText(piece));
+    const std::string text = textOf(piece, "text");
+    if (!text.empty()) watch_.onOutput(textOf(piece, "stream"), text);
+}
+
 bool JournalTask::streamOutput() {
-    bool hasPassedOn = false;
+    // A host that names no positions would begin anew.
+    bool isToBeContinued = true;
     try {
-        EventStream stream(socket_, path() + "/output?follow=1", deadline_);
+        EventStream stream(socket_, outputTarget(), deadline_);
         ServerEvent event;
         for (;;) {
             const auto result = stream.next(deadline_, event, watch_.tick);
-            if (result != EventStream::Result::Event) return hasPassedOn;
+            if (result == EventStream::Result::TimedOut) return true;
+            if (result == EventStream::Result::Ended) break;
             if (event.type == "end") return true;
-            const json piece = objectIn(event.data);
-            if (event.type == "overflow") note(lostText(piece));
-            const std::string text = textOf(piece, "text");
-            if (text.empty()) continue;
-            watch_.onOutput(textOf(piece, "stream"), text);
-            hasPassedOn = true;
+            passOn(event);
+            outputPosition_ = stream.position();
+            isToBeContinued = !outputPosition_.empty();
         }
     } catch (const Failure& failure) {
         // How the task ends is known without its output.
-        return hasPassedOn || failure.status() != kNoHost;
+        if (failure.status() != kNoHost) return true;
     }
+    if (!isToBeContinued) return true;
+    noteAway();
+    // A host that ends each stream at once is not asked all the time.
+    pause(kRetryPause);
+    return false;
 }
 
 }  // namespace ctl

@@ -9,6 +9,7 @@
 #include "ctl/client/address/host_address.h"
 #include "ctl/client/deadline.h"
 #include "ctl/client/host_client.h"
+#include "ctl/client/http/event_parser.h"
 #include "ctl/client/tasks/task_request.h"
 #include "ctl/client/tasks/task_result.h"
 
@@ -46,7 +47,7 @@ public:
     void awaitReply();
 
     /// Passes on what the commands write until the task is over. Returns false when the host went
-    /// away before there was anything: it may be asked again when it is back.
+    /// away before that: when it is back it may be asked for the rest.
     bool streamOutput();
 
     bool isOver() const;
@@ -73,6 +74,8 @@ private:
     void note(const std::string& text);
     void noteAway();
     std::string path() const;
+    std::string outputTarget() const;
+    void passOn(const ServerEvent& event);
 
     std::chrono::steady_clock::time_point begin_ = std::chrono::steady_clock::now();
     HostClient client_;
@@ -80,6 +83,7 @@ private:
     Deadline deadline_;
     const TaskWatch& watch_;
     nlohmann::json record_ = nlohmann::json::object();
+    std::string outputPosition_;  ///< behind what has been passed on; empty: the host names none
     bool isAway_ = false;
 };
 

@@ -70,13 +70,6 @@ void checkOutcomeParameters(const Call& call, const std::string& table) {
     }
 }
 
-/// The field of a client that reconnects by itself is newer than the parameter, which it repeats.
-std::string wantedPosition(const Call& call) {
-    if (!call.lastEventId().empty()) return call.lastEventId();
-    const std::string* const after = call.text("after");
-    return after == nullptr ? std::string() : *after;
-}
-
 }  // namespace
 
 Endpoint getEvents;
@@ -97,7 +90,7 @@ Answer getEvents(Services& services, const Call& call) {
     auto source = name == plugin::kOutcomeTable
                       ? outcomeEvents(services, *table,
                                       {std::move(where), call.flag("tasks"),
-                                       outputsFor(call.peer()), wantedPosition(call)})
+                                       outputsFor(call.peer()), call.after()})
                       : rowEvents(services, *table, where);
     if (!source) return errorReply(500, "the table takes no subscription");
     return Answer(std::move(source));

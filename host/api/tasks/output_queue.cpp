@@ -32,12 +32,15 @@ std::string dump(const nlohmann::ordered_json& document) {
 
 }  // namespace
 
-OutputQueue::OutputQueue(const CodePage& codePage) : codePage_(codePage) {}
+OutputQueue::OutputQueue(const CodePage& codePage, std::int64_t run,
+                         std::optional<OutputPosition> after)
+    : codePage_(codePage), run_(run), after_(after) {}
 
 void OutputQueue::begin(const Task& task) {
     {
         const embedded::MutexLock lock(lock_);
         const Task& shown = over_ && !isOver(task.state) ? *over_ : task;
+        findPlace(shown);
         for (const Command& command : shown.commands) {
             addKept(command);
             if (command.number == 0) ++unnumbered_;
@@ -79,21 +82,41 @@ void OutputQueue::end(const Task& over) {
     wake();
 }
 
+/// A task that is not over runs, or will, in this run of the host. The journal does not keep how
+/// much a command has written whose output was cut: then the reader gets what is kept.
+void OutputQueue::findPlace(const Task& task) {
+    position_.run = isOver(task.state) ? task.run.value_or(0) : run_;
+    const auto isCut = [](const Command& command) {
+        return command.number == 0 &&
+               std::max(command.out.text().size(), command.err.text().size()) >= Tail::kBytes;
+    };
+    if (!after_ || after_->run != position_.run) return;
+    if (std::any_of(task.commands.begin(), task.commands.end(), isCut)) return;
+    had_ = after_->bytes;
+}
+
 void OutputQueue::addKept(const Command& command) {
     pass({command.number, false, command.out.text(), command.out.total()});
     pass({command.number, true, command.err.text(), command.err.total()});
 }
 
-/// Leaves out what has been passed on. Where a command's number is not known, nothing else of it
-/// comes.
+/// Leaves out what has been passed on, and what the reader has had. Where a command's number is not
+/// known, nothing else of it comes.
 void OutputQueue::pass(const OutputPiece& piece) {
-    std::string_view text = piece.text;
+    std::uint64_t fresh = piece.end;
     if (piece.command != 0) {
         std::uint64_t& seen = seen_[{piece.command, piece.isError}];
         if (piece.end <= seen) return;
-        const std::uint64_t fresh = piece.end - std::exchange(seen, piece.end);
-        if (fresh < text.size()) text.remove_prefix(text.size() - static_cast<std::size_t>(fresh));
+        fresh -= std::exchange(seen, piece.end);
     }
+    const std::size_t output = piece.isError ? 1 : 0;
+    std::uint64_t& passed = position_.bytes.at(output);
+    passed += fresh;
+    const std::uint64_t had = had_.at(output);
+    if (passed <= had) return;
+    fresh = std::min(fresh, passed - had);
+    std::string_view text = piece.text;
+    if (fresh < text.size()) text.remove_prefix(text.size() - static_cast<std::size_t>(fresh));
     add(piece.isError, text);
 }
 
@@ -117,7 +140,10 @@ void OutputQueue::addEvent(bool isError, std::string_view text) {
     }
     const nlohmann::ordered_json piece = {{"stream", isError ? "stderr" : "stdout"},
                                           {"text", codePage_.toUtf8(text)}};
-    appendEvent(ready_, {dump(piece), {}, {}});
+    OutputPosition behind = position_;
+    for (std::size_t i = 0; i < cut_.size(); ++i)
+        behind.bytes.at(i) = std::max(behind.bytes.at(i) - cut_.at(i).size(), had_.at(i));
+    appendEvent(ready_, {dump(piece), {}, textOf(behind)});
 }
 
 void OutputQueue::addEnd() {

@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "embedded/mutex.h"
+#include "host/api/tasks/output_position.h"
 #include "host/outcomes/task.h"
 #include "host/tables/code_page.h"
 
@@ -27,8 +28,11 @@ public:
     /// As text in the wire's form, before one reader has taken it.
     static constexpr std::size_t kMostBytes = std::size_t{1} << 20;
 
-    /// `codePage` is the one that commands write, and outlives this object.
-    explicit OutputQueue(const CodePage& codePage);
+    /// `codePage` is the one that commands write, and outlives this object. `run` is that of the
+    /// host. A reader who stands at `after` gets what is behind it, or all if that is a position in
+    /// another run.
+    OutputQueue(const CodePage& codePage, std::int64_t run,
+                std::optional<OutputPosition> after = std::nullopt);
 
     /// What has come so far. Pieces that were pushed before are left out as far as they are in it.
     /// A task that is over has all of it.
@@ -54,6 +58,7 @@ private:
         std::string text;
         std::uint64_t end;
     };
+    void findPlace(const Task& task) ZAV_REQUIRES(lock_);
     void addKept(const Command& command) ZAV_REQUIRES(lock_);
     void pass(const OutputPiece& piece) ZAV_REQUIRES(lock_);
     void add(bool isError, std::string_view text) ZAV_REQUIRES(lock_);
@@ -62,12 +67,18 @@ private:
     void wake();
 
     const CodePage& codePage_;
+    const std::int64_t run_;
+    const std::optional<OutputPosition> after_;
 
     mutable embedded::Mutex lock_;
     bool begun_ ZAV_GUARDED_BY(lock_) = false;
     std::vector<Held> held_ ZAV_GUARDED_BY(lock_);  ///< that came before begin()
     /// By command and output, how many of its bytes have been passed on.
     std::map<std::pair<std::uint64_t, bool>, std::uint64_t> seen_ ZAV_GUARDED_BY(lock_);
+    /// Behind all that has been passed on or left out, whatever the reader was given of it.
+    OutputPosition position_ ZAV_GUARDED_BY(lock_);
+    /// What the reader has had before, of each output.
+    std::array<std::uint64_t, 2> had_ ZAV_GUARDED_BY(lock_){};
     /// The task's first commands, of which begin() had all: the journal keeps no numbers.
     std::size_t unnumbered_ ZAV_GUARDED_BY(lock_) = 0;
     std::string ready_ ZAV_GUARDED_BY(lock_);     ///< events

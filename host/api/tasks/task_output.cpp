@@ -1,12 +1,14 @@
 // GET /v1/tasks/{id}/output
 //
-// Each piece is one event, "data: {"stream": "stdout", "text": "..."}". At its end comes one event
-// "event: end" with the task's state, and the stream ends. For a reader that is too slow, "event:
-// overflow" with "data: {"lost": N}" stands in the place of N bytes.
+// Each piece is one event, "data: {"stream": "stdout", "text": "..."}" with a position as its
+// "id:". At its end comes one event "event: end" with the task's state, and the stream ends. For a
+// reader that is too slow, "event: overflow" with "data: {"lost": N}" stands in the place of N
+// bytes.
 
 #include "host/api/call.h"
 #include "host/api/services.h"
 #include "host/api/tasks/output_queue.h"
+#include "host/tables/bad_request.h"
 
 namespace host {
 namespace {
@@ -14,8 +16,9 @@ namespace {
 class TaskOutput final : public EventSource {
 public:
     /// `services` outlive the source.
-    explicit TaskOutput(Services& services)
-        : services_(services), queue_(std::make_shared<OutputQueue>(services.codePage)) {}
+    TaskOutput(Services& services, std::optional<OutputPosition> after)
+        : services_(services),
+          queue_(std::make_shared<OutputQueue>(services.codePage, services.journal.run(), after)) {}
     ~TaskOutput() override {
         services_.tasks.unfollow(follower_);
         services_.tasks.cancel(waiter_);
@@ -47,6 +50,14 @@ private:
     std::uint64_t waiter_ = 0;
 };
 
+std::optional<OutputPosition> wantedPosition(const Call& call) {
+    const std::string text = call.after();
+    if (text.empty()) return std::nullopt;
+    const std::optional<OutputPosition> position = outputPositionIn(text);
+    if (!position) throw BadRequest("\"" + text + "\" is no position in a task's output");
+    return position;
+}
+
 }  // namespace
 
 Endpoint getTaskOutput;
@@ -54,9 +65,10 @@ Endpoint getTaskOutput;
 Answer getTaskOutput(Services& services, const Call& call) {
     const std::string& given = call.required("id");
     const std::string name = services.codePage.fromUtf8(given).value_or(given);
+    const std::optional<OutputPosition> after = wantedPosition(call);
     const std::optional<Task> task = services.tasks.find(name);
     if (!task) return errorReply(404, "there is no task \"" + given + '"');
-    auto source = std::make_unique<TaskOutput>(services);
+    auto source = std::make_unique<TaskOutput>(services, after);
     if (call.flag("follow")) {
         source->follow(*task);
     } else {

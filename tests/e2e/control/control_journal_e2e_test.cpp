@@ -291,6 +291,26 @@ TEST_F(ControlJournal, OutputIsShownWhileTheCommandsRunIfItIsWanted) {
     EXPECT_THAT(quiet.out, testing::Not(HasSubstr("three")));
 }
 
+TEST_F(ControlJournal, OutputGoesOnWhenTheHostHasRunTheTaskAgain) {
+    start({"--on-interrupt", "rerun"});
+    Words line = {zavctlPath(), "--socket", host->socket(), "-v"};
+    const Words install = talkingInstall("T");
+    line.insert(line.end(), install.begin(), install.end());
+    Program waiting(line);
+    ASSERT_TRUE(waiting.awaitOutput("install ux (T): accepted\none\n", std::chrono::seconds(20)))
+        << waiting.out() << waiting.err();
+    host->program().signal(SIGKILL);
+    EXPECT_EQ(host->program().wait().status, 128 + SIGKILL);
+    openGate();
+    host->start();
+    const ProgramResult result = waiting.wait();
+    EXPECT_EQ(result.status, 0) << result.err;
+    EXPECT_THAT(result.out,
+                ContainsRegex("^install ux \\(T\\): accepted\none\n(.*\n)*one\npassword=...\n"
+                              "three\ninstall ux \\(T\\): done after"));
+    EXPECT_THAT(result.err, HasSubstr("note: the host went away; waiting for it to come back\n"));
+}
+
 TEST_F(ControlJournal, OutputCanBeAskedForAndFollowed) {
     start();
     const auto waiting = host->startZavctl(talkingInstall("T"));

@@ -52,6 +52,11 @@ protected:
     std::optional<ManagedHost> host;
 };
 
+/// The event but for its first line, if that is an identifier.
+std::string withoutIdentifier(const std::string& event) {
+    return event.rfind("id: ", 0) == 0 ? event.substr(event.find('\n') + 1) : event;
+}
+
 TEST_F(TaskOutput, IsFollowedToItsEnd) {
     start();
     const std::string id =
@@ -60,11 +65,53 @@ TEST_F(TaskOutput, IsFollowedToItsEnd) {
     RawClient client(host->socket());
     client.send("GET /v1/tasks/" + id + "/output?follow=1 HTTP/1.1\r\nHost: x\r\n\r\n");
     EXPECT_NE(client.readUntil("\r\n\r\n").find("text/event-stream"), std::string::npos);
-    EXPECT_EQ(client.readUntil("\n\n"), "data: {\"stream\":\"stdout\",\"text\":\"one\\n\"}\n\n");
+    EXPECT_EQ(withoutIdentifier(client.readUntil("\n\n")),
+              "data: {\"stream\":\"stdout\",\"text\":\"one\\n\"}\n\n");
     home.files().write("go", "");
-    EXPECT_EQ(client.readUntil("\n\n"), "data: {\"stream\":\"stderr\",\"text\":\"two\\n\"}\n\n");
+    EXPECT_EQ(withoutIdentifier(client.readUntil("\n\n")),
+              "data: {\"stream\":\"stderr\",\"text\":\"two\\n\"}\n\n");
     EXPECT_EQ(client.readUntil("\n\n"), "event: end\ndata: {\"state\":\"done\"}\n\n");
     EXPECT_TRUE(client.isClosed()) << "the stream is over";
+}
+
+TEST_F(TaskOutput, GoesOnBehindThePieceThatIsNamed) {
+    start();
+    const std::string id =
+        install(home.files().script("script", "echo one; until [ -e '" + path("go") +
+                                                  "' ]; do sleep 0.02; done; echo two; exit 3"));
+    const std::string get = "GET /v1/tasks/" + id + "/output?follow=1";
+    std::string identifier;
+    {
+        RawClient client(host->socket());
+        client.send(get + " HTTP/1.1\r\nHost: x\r\n\r\n");
+        client.readUntil("\r\n\r\n");
+        const std::string event = client.readUntil("\n\n");
+        ASSERT_EQ(event.rfind("id: ", 0), 0U) << event;
+        identifier = event.substr(4, event.find('\n') - 4);
+    }
+    RawClient byParameter(host->socket());
+    byParameter.send(get + "&after=" + identifier + " HTTP/1.1\r\nHost: x\r\n\r\n");
+    RawClient byField(host->socket());
+    byField.send(get + " HTTP/1.1\r\nHost: x\r\nLast-Event-ID: " + identifier + "\r\n\r\n");
+    for (RawClient* const client : {&byParameter, &byField})
+        EXPECT_NE(client->readUntil("\r\n\r\n").find("200 OK"), std::string::npos);
+    home.files().write("go", "");
+    for (RawClient* const client : {&byParameter, &byField}) {
+        EXPECT_EQ(withoutIdentifier(client->readUntil("\n\n")),
+                  "data: {\"stream\":\"stdout\",\"text\":\"two\\n\"}\n\n");
+        EXPECT_EQ(client->readUntil("\n\n"), "event: end\ndata: {\"state\":\"failed\"}\n\n");
+    }
+    // What is kept of it knows the position, too, after the next start of the host.
+    host->program().signal(SIGTERM);
+    EXPECT_EQ(host->program().wait().status, 0);
+    host->start();
+    RawClient later(host->socket());
+    later.send(get + "&after=" + identifier + " HTTP/1.1\r\nHost: x\r\n\r\n");
+    later.readUntil("\r\n\r\n");
+    EXPECT_EQ(withoutIdentifier(later.readUntil("\n\n")),
+              "data: {\"stream\":\"stdout\",\"text\":\"two\\n\"}\n\n");
+    RawClient wrong(host->socket());
+    EXPECT_EQ(wrong.get("/v1/tasks/" + id + "/output?after=x").status, 400);
 }
 
 TEST_F(TaskOutput, OfATaskThatIsOverIsWhatWasKept) {
@@ -75,7 +122,7 @@ TEST_F(TaskOutput, OfATaskThatIsOverIsWhatWasKept) {
         RawClient client(host->socket());
         client.send("GET /v1/tasks/" + id + "/output" + follow + " HTTP/1.1\r\nHost: x\r\n\r\n");
         client.readUntil("\r\n\r\n");
-        EXPECT_EQ(client.readUntil("\n\n"),
+        EXPECT_EQ(withoutIdentifier(client.readUntil("\n\n")),
                   "data: {\"stream\":\"stdout\",\"text\":\"one\\n\"}\n\n");
         EXPECT_EQ(client.readUntil("\n\n"), "event: end\ndata: {\"state\":\"failed\"}\n\n");
     }

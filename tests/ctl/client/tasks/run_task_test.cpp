@@ -407,6 +407,41 @@ TEST(RunTask, AsksAReturnedHostForTheOutputAgain) {
     host.targets();
 }
 
+TEST(RunTask, AsksForTheRestOfTheOutputBehindWhatItHasPassedOn) {
+    const Turn beginning = [](const Peer& peer) {
+        peer.beginStream();
+        peer.send("id: 3-4-0\ndata: {\"stream\": \"stdout\", \"text\": \"one\\n\"}\n\n");
+    };
+    const Turn rest = [](const Peer& peer) {
+        peer.beginStream();
+        peer.send(
+            "id: 3-8-0\ndata: {\"stream\": \"stdout\", \"text\": \"two\\n\"}\n\n"
+            "event: end\ndata: {}\n\n");
+    };
+    TurnHost host({answers(202, kQueued), answers(200, task("running", kReply)), beginning,
+                   answers(200, task("running", kReply)), rest, answers(200, kDone)});
+    std::string seen;
+    TaskWatch watch;
+    watch.onOutput = [&seen](const std::string&, const std::string& text) { seen += text; };
+    EXPECT_EQ(ctl::runTask(host.address(), request(), Await::End, watch).end, End::Outcome);
+    EXPECT_EQ(seen, "one\ntwo\n");
+    EXPECT_EQ(host.targets().at(4), "GET /v1/tasks/j-1/output?follow=1&after=3-4-0");
+}
+
+TEST(RunTask, AsksNoHostForTheRestThatWouldRepeatTheOutput) {
+    const Turn beginning = [](const Peer& peer) {
+        peer.beginStream();
+        peer.send("data: {\"stream\": \"stdout\", \"text\": \"one\\n\"}\n\n");
+    };
+    TurnHost host({answers(202, kQueued), answers(200, task("running", kReply)), beginning,
+                   answers(200, kDone)});
+    std::string seen;
+    TaskWatch watch;
+    watch.onOutput = [&seen](const std::string&, const std::string& text) { seen += text; };
+    EXPECT_EQ(ctl::runTask(host.address(), request(), Await::End, watch).end, End::Outcome);
+    EXPECT_EQ(seen, "one\n");
+}
+
 // ---- Following ----------------------------------------------------------------------------------
 
 TEST(FollowTask, WaitsForATaskByAnyName) {

@@ -2,8 +2,11 @@
 
 #include <gtest/gtest.h>
 
+#include <sstream>
+
 namespace {
 
+using host::OutputPosition;
 using host::OutputQueue;
 using host::Task;
 using host::TaskState;
@@ -37,14 +40,32 @@ protected:
         queue.end(over);
     }
 
+    /// What there is now, without the identifiers.
+    std::string taken() { return withoutIdentifiers(queue.take()); }
+    static std::string withoutIdentifiers(const std::string& events) {
+        std::string rest;
+        std::istringstream lines(events);
+        for (std::string line; std::getline(lines, line);) {
+            if (line.rfind("id: ", 0) != 0) rest += line + '\n';
+        }
+        return rest;
+    }
+    /// What a reader gets of a task that he has followed up to a position.
+    std::string rest(const OutputPosition& after, const Task& task) const {
+        OutputQueue resumed(codePage, kRun, after);
+        resumed.begin(task);
+        return withoutIdentifiers(resumed.take());
+    }
+
+    static constexpr std::int64_t kRun = 7;
     const host::CodePage codePage{"UTF-8"};
-    OutputQueue queue{codePage};
+    OutputQueue queue{codePage, kRun};
 };
 
 TEST_F(Output, IsWhatIsKeptThenWhatComesThenTheEnd) {
     queue.begin(taskWith("one\n", "bad\n"));
     push("two\n", 8);
-    EXPECT_EQ(queue.take(),
+    EXPECT_EQ(taken(),
               event("stdout", "one\\n") + event("stderr", "bad\\n") + event("stdout", "two\\n"));
     EXPECT_TRUE(queue.empty());
     EXPECT_FALSE(queue.over());
@@ -52,7 +73,7 @@ TEST_F(Output, IsWhatIsKeptThenWhatComesThenTheEnd) {
     end(TaskState::Done);
     push("late\n", 19);
     EXPECT_FALSE(queue.over()) << "not everything was taken";
-    EXPECT_EQ(queue.take(), event("stdout", "three\\n") + ending("done"));
+    EXPECT_EQ(taken(), event("stdout", "three\\n") + ending("done"));
     EXPECT_TRUE(queue.over());
     EXPECT_TRUE(queue.empty());
 }
@@ -63,15 +84,14 @@ TEST_F(Output, HasNoPieceTwice) {
     push("bad", 3, true);
     EXPECT_TRUE(queue.empty()) << "what is kept comes first";
     queue.begin(taskWith("one"));
-    EXPECT_EQ(queue.take(),
-              event("stdout", "one") + event("stdout", "two") + event("stderr", "bad"));
+    EXPECT_EQ(taken(), event("stdout", "one") + event("stdout", "two") + event("stderr", "bad"));
 }
 
 TEST_F(Output, ThatWasKeptBeforeItIsHeardComesOnce) {
     queue.begin(taskWith("one\n"));
     push("one\n", 4);
     push("two\n", 8);
-    EXPECT_EQ(queue.take(), event("stdout", "one\\n") + event("stdout", "two\\n"));
+    EXPECT_EQ(taken(), event("stdout", "one\\n") + event("stdout", "two\\n"));
 }
 
 TEST_F(Output, ThatWasNeverHeardComesWithTheEnd) {
@@ -79,8 +99,8 @@ TEST_F(Output, ThatWasNeverHeardComesWithTheEnd) {
     Task over = taskWith("one\ntwo\n", "bad\n");
     over.state = TaskState::Done;
     queue.end(over);
-    EXPECT_EQ(queue.take(), event("stdout", "one\\n") + event("stdout", "two\\n") +
-                                event("stderr", "bad\\n") + ending("done"));
+    EXPECT_EQ(taken(), event("stdout", "one\\n") + event("stdout", "two\\n") +
+                           event("stderr", "bad\\n") + ending("done"));
 }
 
 TEST_F(Output, OfAnEarlierRunComesOnce) {
@@ -89,7 +109,7 @@ TEST_F(Output, OfAnEarlierRunComesOnce) {
     queue.begin(task);
     task.state = TaskState::Done;
     queue.end(task);
-    EXPECT_EQ(queue.take(), event("stdout", "one\\n") + ending("done"));
+    EXPECT_EQ(taken(), event("stdout", "one\\n") + ending("done"));
 }
 
 TEST_F(Output, OfATaskThatEndsMeanwhileIsAllOfIt) {
@@ -98,7 +118,7 @@ TEST_F(Output, OfATaskThatEndsMeanwhileIsAllOfIt) {
     push("two\n", 8);
     queue.end(over);
     queue.begin(taskWith("one\n"));
-    EXPECT_EQ(queue.take(), event("stdout", "one\\ntwo\\n") + ending("done"));
+    EXPECT_EQ(taken(), event("stdout", "one\\ntwo\\n") + ending("done"));
 }
 
 TEST_F(Output, OfATaskThatIsOverIsWhatIsKept) {
@@ -108,7 +128,7 @@ TEST_F(Output, OfATaskThatIsOverIsWhatIsKept) {
     task.state = TaskState::Failed;
     task.commands[0].number = 0;
     queue.begin(task);
-    EXPECT_EQ(queue.take(), event("stdout", "one") + ending("failed"));
+    EXPECT_EQ(taken(), event("stdout", "one") + ending("failed"));
 }
 
 TEST_F(Output, KeepsCharactersOfSeveralBytesWhole) {
@@ -117,13 +137,13 @@ TEST_F(Output, KeepsCharactersOfSeveralBytesWhole) {
         "\xA4"
         "b",
         4);
-    EXPECT_EQ(queue.take(), event("stdout", "a") + event("stdout",
-                                                         "\xC3\xA4"
-                                                         "b"));
+    EXPECT_EQ(taken(), event("stdout", "a") + event("stdout",
+                                                    "\xC3\xA4"
+                                                    "b"));
     push("\xE2\x82", 6);
-    EXPECT_EQ(queue.take(), "");
+    EXPECT_EQ(taken(), "");
     end(TaskState::Done);
-    EXPECT_EQ(queue.take(), event("stdout", "\xEF\xBF\xBD") + ending("done"));
+    EXPECT_EQ(taken(), event("stdout", "\xEF\xBF\xBD") + ending("done"));
 }
 
 TEST_F(Output, ThatDoesNotFitIsCounted) {
@@ -132,10 +152,51 @@ TEST_F(Output, ThatDoesNotFitIsCounted) {
     push(half, half.size());
     push(half, 2 * half.size());
     push("yz", 2 * half.size() + 2);
-    EXPECT_EQ(queue.take(), event("stdout", half) + "event: overflow\ndata: {\"lost\":" +
-                                std::to_string(half.size() + 2) + "}\n\n");
+    EXPECT_EQ(taken(), event("stdout", half) + "event: overflow\ndata: {\"lost\":" +
+                           std::to_string(half.size() + 2) + "}\n\n");
     push("on", 2 * half.size() + 4);
-    EXPECT_EQ(queue.take(), event("stdout", "on"));
+    EXPECT_EQ(taken(), event("stdout", "on"));
+}
+
+TEST_F(Output, HasPositions) {
+    queue.begin(taskWith("one\n", "bad\n"));
+    push("two\xC3", 8);
+    EXPECT_EQ(queue.take(), "id: 7-4-0\n" + event("stdout", "one\\n") + "id: 7-4-4\n" +
+                                event("stderr", "bad\\n") + "id: 7-7-4\n" + event("stdout", "two"))
+        << "a character that is cut comes with its rest";
+}
+
+TEST_F(Output, GoesOnBehindAPosition) {
+    OutputQueue resumed(codePage, kRun, OutputPosition{kRun, {6, 4}});
+    resumed.begin(taskWith("one\ntwo\n", "bad\n"));
+    resumed.push({1, true, "worse\n", 10});
+    resumed.push({2, false, "three\n", 6});
+    EXPECT_EQ(resumed.take(), "id: 7-8-4\n" + event("stdout", "o\\n") + "id: 7-8-10\n" +
+                                  event("stderr", "worse\\n") + "id: 7-14-10\n" +
+                                  event("stdout", "three\\n"));
+}
+
+TEST_F(Output, GoesOnBehindAPositionThatIsKeptNoMore) {
+    Task task = taskWith(std::string(host::Tail::kBytes, 'x'));
+    task.commands[0].out.append("end");
+    const std::string kept = std::string(host::Tail::kBytes - 3, 'x') + "end";
+    EXPECT_EQ(rest({kRun, {1, 0}}, task), event("stdout", kept));
+    EXPECT_EQ(rest({kRun, {host::Tail::kBytes + 2, 0}}, task), event("stdout", "d"));
+}
+
+TEST_F(Output, ComesWholeForAPositionInAnotherRun) {
+    EXPECT_EQ(rest({kRun - 1, {4, 0}}, taskWith("one\n")), event("stdout", "one\\n"));
+}
+
+TEST_F(Output, OfAnEarlierRunGoesOnIfItIsKnownWhere) {
+    Task over = taskWith("one\ntwo\n");
+    over.state = TaskState::Done;
+    over.run = kRun - 1;
+    over.commands[0].number = 0;
+    EXPECT_EQ(rest({kRun - 1, {4, 0}}, over), event("stdout", "two\\n"));
+    const std::string kept(host::Tail::kBytes, 'x');
+    over.commands[0].out.append(kept);
+    EXPECT_EQ(rest({kRun - 1, {4, 0}}, over), event("stdout", kept));
 }
 
 TEST_F(Output, WakesItsReader) {
