@@ -8,9 +8,9 @@ namespace host {
 
 /// The checks. Each is defined in a file of its subject in this folder and has a row below.
 CheckFunction checkHome, checkAgentScript, checkInventory, checkTranslator, checkUninstaller,
-    checkConsole, checkOwners, checkDepot, checkTemporary, checkState, checkFilesystem, checkSpace,
-    checkSockets, checkRunAs, checkLeftovers, checkTimeout, checkLocale, checkJava, checkClock,
-    checkDescriptors, checkProcesses, checkPlugin;
+    checkConsole, checkShell, checkOwners, checkDepot, checkTemporary, checkState, checkFilesystem,
+    checkSpace, checkSockets, checkRunAs, checkLeftovers, checkTimeout, checkLocale, checkJava,
+    checkClock, checkDescriptors, checkProcesses, checkPlugin;
 
 const std::vector<Check>& checks() {
     static const std::vector<Check> rows = {
@@ -20,6 +20,7 @@ const std::vector<Check>& checks() {
         {"translator", checkTranslator},
         {"uninstaller", checkUninstaller},
         {"console", checkConsole},
+        {"shell", checkShell},
         {"owners", checkOwners},
         {"depot", checkDepot},
         {"tmp", checkTemporary},

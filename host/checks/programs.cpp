@@ -1,4 +1,4 @@
-// The programs that a home must offer.
+// The programs that a home, and the machine, must offer.
 
 #include <sys/stat.h>
 #include <unistd.h>
@@ -8,6 +8,7 @@
 #include <system_error>
 
 #include "host/checks/check.h"
+#include "host/tables/plugin_facts.h"
 
 namespace host {
 namespace {
@@ -42,7 +43,8 @@ Finding look(const std::string& path, Verdict ifFaulty, const std::string& purpo
 
 }  // namespace
 
-CheckFunction checkAgentScript, checkInventory, checkTranslator, checkUninstaller, checkConsole;
+CheckFunction checkAgentScript, checkInventory, checkTranslator, checkUninstaller, checkConsole,
+    checkShell;
 
 Finding checkAgentScript(CheckSubject& subject) {
     return look(subject.inHome("bin/TovrinAgent"), Verdict::Error, "no agent can start or stop");
@@ -84,6 +86,15 @@ Finding checkConsole(CheckSubject& subject) {
     }
     return look(subject.inHome("bin/um_console"), Verdict::Error,
                 "the universal agent cannot be configured");
+}
+
+/// A request that looks at the machine's architecture is the only one that runs it.
+Finding checkShell(CheckSubject&) {
+    const std::string path(plugin::kProbeShell);
+    const std::string fault = programFault(path);
+    if (fault.empty()) return {Verdict::Ok, path, ""};
+    return {Verdict::Warning, fault + "; the inventory cannot tell the system and its architecture",
+            "install a Korn shell that is found there, such as the package mksh"};
 }
 
 }  // namespace host

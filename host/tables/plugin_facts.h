@@ -18,6 +18,9 @@ inline constexpr std::string_view kOutcomeTable = "KAGDYST";
 /// that fails.
 inline constexpr std::string_view kInventoryTable = "KINAGT";
 
+/// Runs what tells the architecture in the inventory's rows.
+inline constexpr std::string_view kProbeShell = "/bin/ksh";
+
 /// In both tables: what the requester calls the command. An outcome carries the one of its request.
 inline constexpr std::string_view kTransidColumn = "TRANSID";
 /// In the request table: the command.

@@ -1,3 +1,5 @@
+#include <sched.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
 
 #include <filesystem>
@@ -55,6 +57,20 @@ TEST_F(ProgramChecks, TheConsoleMustBeThereOnceTheUniversalAgentIsInstalled) {
 TEST_F(ProgramChecks, AnInventoryThatFailsIsAWarning) {
     scratch.script("home/bin/cinfo", "exit 3");
     expectFinding("inventory", Verdict::Warning, "bin/cinfo -d ended with exit code 3");
+}
+
+TEST_F(ProgramChecks, AShellThatCannotBeExecutedIsAWarning) {
+    expectFinding("shell", Verdict::Ok, "/bin/ksh");
+    if (::unshare(CLONE_NEWNS) != 0) GTEST_SKIP() << "no file can be mounted here";
+    ASSERT_EQ(::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr), 0);
+    const std::string file = scratch.write("file", "");
+    ASSERT_EQ(::mount(file.c_str(), "/bin/ksh", nullptr, MS_BIND, nullptr), 0);
+    expectFinding("shell", Verdict::Warning, "/bin/ksh is not executable");
+    EXPECT_EQ(::umount2("/bin/ksh", MNT_DETACH), 0);
+    ASSERT_EQ(::mount("/dev/null", "/bin/ksh", nullptr, MS_BIND, nullptr), 0);
+    expectFinding("shell", Verdict::Warning, "/bin/ksh is not a file");
+    EXPECT_EQ(::umount2("/bin/ksh", MNT_DETACH), 0);
+    expectFinding("shell", Verdict::Ok, "/bin/ksh");
 }
 
 }  // namespace

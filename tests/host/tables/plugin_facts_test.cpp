@@ -16,6 +16,8 @@
 #include "support/fake_sleep.h"
 #include "support/host/program.h"
 #include "support/host/script_home.h"
+#include "support/units.h"
+#include "tables/inventory.h"
 
 namespace {
 
@@ -106,6 +108,11 @@ TEST(PluginFacts, NameTablesAndColumnsThatThereAre) {
     EXPECT_NE(Started::once().find(plugin::kInventoryTable), nullptr);
     expectColumn(plugin::kOutcomeTable, plugin::kTransidColumn, OXA_TYPE_CHARACTER);
     expectColumn(plugin::kOutcomeTable, plugin::kRetvalColumn, OXA_TYPE_INTEGER);
+}
+
+TEST(PluginFacts, NameTheShellThatTellsTheArchitecture) {
+    const std::string line = narrow(architectureProbeCommand("/h"));
+    EXPECT_EQ(line.substr(0, line.find(' ')), plugin::kProbeShell);
 }
 
 TEST(PluginFacts, NameEveryColumnOfTheRequestTableOnce) {
