@@ -127,6 +127,10 @@ for number in 1 2 3; do
 done
 until_holds /tmp/ran w1
 host=$(cat /run/zavhost.pid)
+# As if the home were older than this program, and its owner had changed another one.
+rm "$home/bin/instances"
+echo "# changed" >>"$home/bin/cinfo"
+cp "$home/bin/cinfo" /tmp/cinfo
 put_in new &
 upgrade=$!
 until_holds /run/systemctl.log "restart zavhost.service"
@@ -140,6 +144,9 @@ done
 expect "what ran" "$(paste -sd ' ' /tmp/ran)" "w1 w2 w3"
 expect "the agent's process" "$(agent_process)" "$process"
 agent_lives "$process" || fail "the upgrade ended the agent"
+cmp "$home/bin/cinfo" /tmp/cinfo || fail "the upgrade changed a program of the home"
+"$home/bin/instances" list >/tmp/instances || fail "the upgrade did not complete the home"
+holds /tmp/instances "$(printf 'root\trunning\t%s' "$process")"
 zavctl --json tasks >/tmp/tasks.upgraded
 
 # ---- Not downgraded ------------------------------------------------------------------------------
