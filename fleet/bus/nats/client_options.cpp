@@ -103,6 +103,9 @@ natsStatus Identity::setRest(natsOptions* options) const {
         [&] { return natsOptions_SetPingInterval(options, options_.pingInterval.count()); },
         [&] { return natsOptions_SetMaxPingsOut(options, kPingsUnanswered); },
         [&] { return natsOptions_SetWriteDeadline(options, kWriteDeadlineMs); },
+        // Without it a thread of each connection's own collects what is sent, and each question
+        // waits for it.
+        [&] { return natsOptions_SetSendAsap(options, true); },
         [&] { return natsOptions_UseGlobalMessageDelivery(options, options_.sharesThreads); });
 }
 

@@ -11,6 +11,7 @@
 
 #include "fleet/bus/nats/client.h"
 #include "fleet/bus/nats/client_options.h"
+#include "fleet/bus/nats/delivery.h"
 #include "fleet/bus/nats/subject.h"
 #include "fleet/bus/nats/waiting.h"
 
@@ -82,48 +83,6 @@ std::string lastErrorOf(natsConnection* connection) {
 
 // ---- Subscription
 // ---------------------------------------------------------------------------------
-
-/// Between a subscription and the library's thread. Whoever of the two is the last one frees it.
-class Delivery {
-public:
-    explicit Delivery(Connection::Receiver receiver) : receiver_(std::move(receiver)) {}
-
-    void deliver(natsMsg* message) {
-        {
-            const std::lock_guard lock(mutex_);
-            if (stopped_) return;
-            running_ = true;
-        }
-        receiver_(messageOf(message));
-        {
-            const std::lock_guard lock(mutex_);
-            running_ = false;
-        }
-        changed_.notify_all();
-    }
-
-    void stop() {
-        std::unique_lock lock(mutex_);
-        stopped_ = true;
-        changed_.wait(lock, [this] { return !running_; });
-    }
-
-    static void onMessage(natsConnection*, natsSubscription*, natsMsg* message, void* delivery) {
-        const NatsMessage owned(message);
-        (*static_cast<std::shared_ptr<Delivery>*>(delivery))->deliver(message);
-    }
-    static void onComplete(void* delivery) {
-        const std::unique_ptr<std::shared_ptr<Delivery>> last(
-            static_cast<std::shared_ptr<Delivery>*>(delivery));
-    }
-
-private:
-    const Connection::Receiver receiver_;
-    std::mutex mutex_;
-    std::condition_variable changed_;
-    bool running_ = false;
-    bool stopped_ = false;
-};
 
 class Subscription::Impl {
 public:

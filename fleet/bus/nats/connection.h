@@ -40,9 +40,10 @@ public:
     std::uint64_t failedReconnects() const;
     std::uint64_t unsendableSignatures() const;
 
-    /// Hands the bytes to the client library, which sends them soon. While there is no server it
-    /// keeps messages until they are as long as the options allow, then says NoAnswer. Permissions
-    /// show in ConnectionEvents::error only; flush() makes sure that the server has got everything.
+    /// Sends the bytes. It is not known whether the server has got them: flush() makes sure of
+    /// that, and a missing permission shows in ConnectionEvents::error only. While there is no
+    /// server the client library keeps messages until they are as long as the options allow, then
+    /// this says NoAnswer. A server that reads nothing more holds it up for 10 seconds at most.
     BusStatus publish(const std::string& subject, std::string_view bytes,
                       const BusHeaders& headers = {});
 

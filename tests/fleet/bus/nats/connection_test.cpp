@@ -260,6 +260,29 @@ TEST(BusConnection, DeliversNothingOnceASubscriptionIsGone) {
     EXPECT_TRUE(connection->flush(kPatience).done());
 }
 
+TEST(BusConnection, DeliversByThreadsThatConnectionsShare) {
+    const NatsServer server;
+    ConnectionOptions options = optionsFor(server);
+    options.sharesThreads = true;
+    std::vector<std::unique_ptr<Connection>> connections;
+    for (int i = 0; i < 20; ++i)
+        connections.push_back(connected(options));
+    const auto echo = answering(*connections.front(), "echo");
+    ASSERT_TRUE(echo);
+    for (int round = 0; round < 5; ++round) {
+        for (auto& connection : connections) {
+            auto alive = std::make_unique<std::atomic<int>>(0);
+            auto subscribed = connection->subscribe(
+                "a", [&](const BusMessage&) { ++*alive; }, kPatience);
+            for (int i = 0; i < 20; ++i)
+                ASSERT_TRUE(connection->publish("a", "x").done());
+            EXPECT_EQ(connection->request("echo", "y", kPatience).message.data, "re: y");
+            subscribed.subscription.reset();
+            alive.reset();  // a callback that still ran would touch what is gone
+        }
+    }
+}
+
 TEST(BusConnection, SendsWhatWasPublishedBeforeItCloses) {
     const NatsServer server;
     const auto hears = connected(optionsFor(server));
