@@ -1,0 +1,88 @@
+/// Decides what the centre does: numbers, publishing, replies and outcomes.
+///
+/// It keeps nothing that counts: all of that is in the store. So the model of the protocol kills it
+/// at every point and runs this very code.
+#pragma once
+
+#include <functional>
+#include <optional>
+#include <set>
+#include <string>
+#include <utility>
+
+#include "fleet/bus/messages/hello.h"
+#include "fleet/server/core/centre_bus.h"
+#include "fleet/server/core/centre_store.h"
+
+namespace fleet {
+
+/// What an operator of the centre must look at.
+struct Alarm {
+    std::string host;
+    std::string text;
+};
+
+/// One thread at a time.
+class Centre {
+public:
+    /// Orders named in one reply as open; the others are named in later ones.
+    static constexpr std::size_t kMostOpen = 256;
+    /// Numbers skipped by a restore, so that none that was given and forgotten is given again.
+    static constexpr Number kRestoreGap = 1'000'000;
+    /// How long after a restore the hosts are asked what they have.
+    static constexpr Moment kListTime{10 * 60 * 1000};
+
+    using TellAlarm = std::function<void(const Alarm&)>;
+
+    /// Borrows the store and the bus.
+    Centre(CentreStore& store, CentreBus& bus, TellAlarm alarm);
+
+    /// Gives an order its number; it is durable when this returns. `seal` puts a signed number and
+    /// the order together. Nothing if there is no such host.
+    std::optional<Number> submit(const std::string& host, const std::string& order,
+                                 const std::function<std::string(Number)>& seal);
+
+    /// Publishes up to `most` orders and removes up to `most` that are over from the bus. Returns
+    /// whether there is more to do at once.
+    bool work(std::size_t most);
+
+    /// The reply to a hello that its host has signed; nothing for a host that nobody has enrolled.
+    std::optional<Reply> greet(const std::string& host, const Hello& hello, Moment now);
+
+    /// Takes an outcome that its host has signed. When this returns, the bus may forget it.
+    void hear(const Outcome& outcome);
+
+    /// Tells of an order that was found on the bus, by the hourly sweep or after the database was
+    /// put back from a backup. One that is over will be removed: a lost answer, or a bus that lost
+    /// its newest messages, has left it there. One that this database does not know is adopted.
+    void foundOnBus(const OrderRecord& order);
+    /// The end of a restore: numbers that may have been given are skipped, and from now on hosts
+    /// are asked what they have.
+    void restored(Moment now);
+
+    /// Whether nothing is published, because the database is older than what several hosts know.
+    /// One host alone might lie, and so stops only what is published for itself.
+    bool isBehind() const { return ahead_.size() > 1; }
+
+private:
+    using Place = std::pair<std::string, Number>;
+
+    bool publish(std::size_t most);
+    bool publishOne(const OrderRecord& order);
+    bool publishAgain(std::size_t most);
+    bool removeOver(std::size_t most);
+    void noteSession(HostRecord& record, const Hello& hello);
+    void noteTaken(HostRecord& record, const Hello& hello, bool isListing);
+    void stopPublishing(HostRecord& record, const std::string& why);
+    void adoptListed(const std::string& host, const Hello& hello);
+    Number overOf(const HostRecord& record) const;
+
+    CentreStore& store_;
+    CentreBus& bus_;
+    const TellAlarm alarm_;
+    std::set<Place> again_;        ///< published before, and perhaps lost by the bus since
+    std::set<Place> over_;         ///< still to be removed from the bus
+    std::set<std::string> ahead_;  ///< hosts that have taken what this database never gave
+};
+
+}  // namespace fleet
