@@ -98,12 +98,13 @@ Actions Link::replied(const Reply& reply, Moment now) {
     revoked_.clear();
     revoked_.insert(reply.revoked.begin(), reply.revoked.end());
     ahead_.expect(reply.last);
-    if (reply.over > kept_.taken) take(reply.over, out);
     if (needsAdoption(reply)) {
+        // Until that is done the link must look to the centre like one that has forgotten.
         isGreeted_ = adopt(reply, out);
         if (!isGreeted_) soonHello();
     } else {
         isGreeted_ = true;
+        if (reply.over > kept_.taken) take(reply.over, out);
     }
     if (!journalNow_.empty() && kept_.journal == journalNow_) {
         for (const std::string& order : reply.open)

@@ -170,6 +170,15 @@ TEST(Replying, ALinkThatHasForgottenPassesAllOver) {
     EXPECT_EQ(driver.link().kept().taken, Number{9});
 }
 
+TEST(Replying, ALinkThatHasForgottenMovesOnOnlyWhenItMayAdopt) {
+    LinkDriver driver(kept(3));
+    driver.note(driver.link().connected(kNow));
+    Reply reply = replyTo(driver, 5, 9);
+    reply.forget = true;
+    driver.note(driver.link().replied(reply, kNow));
+    EXPECT_EQ(driver.link().kept().taken, Number{3});
+}
+
 TEST(Replying, NothingIsAdoptedWhileTheHostRecordsAnOrder) {
     LinkDriver driver(kept(0));
     driver.greet(1);
