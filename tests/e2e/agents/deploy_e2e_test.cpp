@@ -7,8 +7,8 @@
 
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <nlohmann/json.hpp>
+#include <sstream>
 
 #include "support/host/managed_host.h"
 #include "support/host/script_home.h"
@@ -40,8 +40,10 @@ Environment depotOf(const ScriptHome& home, const Environment& more = {}) {
 bool isNamedByAProcess(const std::string& text) {
     for (const auto& entry : fs::directory_iterator("/proc")) {
         std::ifstream in(entry.path() / "cmdline", std::ios::binary);
-        const std::string line{std::istreambuf_iterator<char>(in), {}};
-        if (line.find(text) != std::string::npos) return true;
+        // A process may end while its file is read, which is an error of the stream only.
+        std::ostringstream line;
+        line << in.rdbuf();
+        if (line.str().find(text) != std::string::npos) return true;
     }
     return false;
 }
