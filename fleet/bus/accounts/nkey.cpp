@@ -118,7 +118,8 @@ std::optional<KeyPair> KeyPair::ofSeed(std::string_view text) {
     std::copy_n(raw(*bytes) + 2, seed.size(), seed.begin());
     KeyPair pair(*kind, seed);
     sodium_memzero(seed.data(), seed.size());
-    sodium_memzero(bytes->data(), bytes->size());
+    std::string& secret = *bytes;
+    sodium_memzero(secret.data(), secret.size());
     return pair;
 }
 
