@@ -97,6 +97,28 @@ bool isSignedBy(std::string_view publicKey, std::string_view bytes, std::string_
            0;
 }
 
+std::optional<std::string> bytesOfPublicKey(std::string_view publicKey) {
+    const auto key = decoded(publicKey, 1 + kLengthOfHalf);
+    if (!key || !kindOf(byteAt(*key, 0))) return std::nullopt;
+    return key->substr(1);
+}
+
+std::optional<std::string> KeyPair::unseal(std::string_view sealed) const {
+    if (sealed.size() < crypto_box_SEALBYTES) return std::nullopt;
+    std::array<unsigned char, crypto_box_PUBLICKEYBYTES> publicHalf{};
+    std::array<unsigned char, crypto_box_SECRETKEYBYTES> secretHalf{};
+    std::string text(sealed.size() - crypto_box_SEALBYTES, '\0');
+    const bool isKey =
+        crypto_sign_ed25519_pk_to_curve25519(publicHalf.data(), secret_.data() + 32) == 0 &&
+        crypto_sign_ed25519_sk_to_curve25519(secretHalf.data(), secret_.data()) == 0;
+    const bool isOpen =
+        isKey && crypto_box_seal_open(reinterpret_cast<unsigned char*>(text.data()), raw(sealed),
+                                      sealed.size(), publicHalf.data(), secretHalf.data()) == 0;
+    sodium_memzero(secretHalf.data(), secretHalf.size());
+    if (!isOpen) return std::nullopt;
+    return text;
+}
+
 KeyPair KeyPair::make(KeyKind kind) {
     useSodium();
     Seed seed;

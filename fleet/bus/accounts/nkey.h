@@ -24,6 +24,9 @@ bool isPublicKey(std::string_view text, KeyKind kind);
 /// bytes.
 bool isSignedBy(std::string_view publicKey, std::string_view bytes, std::string_view signature);
 
+/// The 32 bytes of a public key of any kind; nothing if it is none.
+std::optional<std::string> bytesOfPublicKey(std::string_view publicKey);
+
 /// A key pair. Its secret is wiped when the object ends. Const operations may run in any thread.
 class KeyPair {
 public:
@@ -43,6 +46,8 @@ public:
     std::string seed() const;
     /// A signature of 64 bytes.
     std::string sign(std::string_view bytes) const;
+    /// What was sealed for the public key, see sealFor(); nothing if it was not.
+    std::optional<std::string> unseal(std::string_view sealed) const;
 
 private:
     using Seed = std::array<unsigned char, 32>;

@@ -1,0 +1,35 @@
+#include "fleet/bus/trust/sealed.h"
+
+#include <sodium.h>
+
+#include <array>
+#include <optional>
+#include <stdexcept>
+
+#include "fleet/bus/accounts/nkey.h"
+
+namespace fleet {
+namespace {
+
+const unsigned char* rawBytes(std::string_view bytes) {
+    return reinterpret_cast<const unsigned char*>(bytes.data());
+}
+
+}  // namespace
+
+std::string sealFor(std::string_view publicKey, std::string_view text) {
+    // The same key signs and unseals: a host has one to be known by, besides that of its
+    // connection.
+    const std::optional<std::string> key = bytesOfPublicKey(publicKey);
+    std::array<unsigned char, crypto_box_PUBLICKEYBYTES> half{};
+    if (!key || sodium_init() < 0 ||
+        crypto_sign_ed25519_pk_to_curve25519(half.data(), rawBytes(*key)) != 0) {
+        throw std::invalid_argument("nothing can be sealed for this key");
+    }
+    std::string sealed(text.size() + crypto_box_SEALBYTES, '\0');
+    crypto_box_seal(reinterpret_cast<unsigned char*>(sealed.data()), rawBytes(text), text.size(),
+                    half.data());
+    return sealed;
+}
+
+}  // namespace fleet
