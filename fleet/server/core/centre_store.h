@@ -26,7 +26,7 @@ public:
     virtual std::optional<Number> give(const std::string& host, const std::string& order,
                                        const std::function<std::string(Number)>& seal) = 0;
     /// Keeps an order that was given before this database began to forget. One that is known
-    /// without its number and bytes gets them.
+    /// without its number and bytes gets them. Nothing happens if there is no such host.
     virtual void adopt(const OrderRecord& order) = 0;
 
     virtual std::optional<OrderRecord> order(const std::string& host,

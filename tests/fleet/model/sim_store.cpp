@@ -29,9 +29,10 @@ std::optional<fleet::Number> SimStore::give(const std::string& host, const std::
     if (known != tables.orders.end()) return known->second.number;
     fleet::OrderRecord given;
     given.host = host;
-    given.number = ++record->second.last;
+    given.number = record->second.last + 1;
     given.order = order;
     given.bytes = seal(given.number);
+    record->second.last = given.number;
     tables.orders[{host, order}] = given;
     mayDie();
     return given.number;
@@ -39,6 +40,7 @@ std::optional<fleet::Number> SimStore::give(const std::string& host, const std::
 
 void SimStore::adopt(const fleet::OrderRecord& order) {
     mayDie();
+    if (tables.hosts.count(order.host) == 0) return;
     const auto [known, isNew] = tables.orders.try_emplace({order.host, order.order}, order);
     if (!isNew && known->second.number == 0) {
         known->second.number = order.number;

@@ -1,4 +1,4 @@
-#include "host/journal/database.h"
+#include "sqlite/database.h"
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -12,16 +12,16 @@
 
 namespace {
 
-using host::Database;
-using host::DatabaseError;
+using sqlite::Database;
+using sqlite::DatabaseError;
 
-TEST(JournalDatabase, KeepsBytesAsTheyAre) {
+TEST(SqliteDatabase, KeepsBytesAsTheyAre) {
     Database database(":memory:");
     database.run("CREATE TABLE t (a, b, c, d)");
     const std::string bytes("\0\xFF'x", 4);
     database.change("INSERT INTO t VALUES (?, ?, ?, ?)", bytes, "", std::int64_t{1} << 40,
                     std::optional<int>());
-    host::Statement row = database.ask("SELECT a, b, c, d FROM t");
+    sqlite::Statement row = database.ask("SELECT a, b, c, d FROM t");
     ASSERT_TRUE(row.step());
     EXPECT_EQ(row.bytes(0), bytes);
     EXPECT_EQ(row.bytes(1), "");
@@ -31,14 +31,14 @@ TEST(JournalDatabase, KeepsBytesAsTheyAre) {
     EXPECT_FALSE(row.step());
 }
 
-TEST(JournalDatabase, SaysWhatIsWrong) {
+TEST(SqliteDatabase, SaysWhatIsWrong) {
     Database database(":memory:");
     EXPECT_THROW(database.run("CREATE"), DatabaseError);
     EXPECT_THROW(database.ask("SELECT x FROM nothing"), DatabaseError);
     EXPECT_THROW(Database("/nowhere/at/all"), DatabaseError);
 }
 
-TEST(JournalDatabase, KnowsAFileThatIsNoDatabase) {
+TEST(SqliteDatabase, KnowsAFileThatIsNoDatabase) {
     const ScratchDir scratch;
     const std::string file = scratch.write("journal.db", std::string(8192, 'x'));
     try {
@@ -50,7 +50,7 @@ TEST(JournalDatabase, KnowsAFileThatIsNoDatabase) {
     }
 }
 
-TEST(JournalDatabase, IsNobodyElses) {
+TEST(SqliteDatabase, IsNobodyElses) {
     const ScratchDir scratch;
     const mode_t before = ::umask(0);
     Database database(scratch.path("journal.db"));
@@ -95,7 +95,7 @@ private:
     int word_ = -1;
 };
 
-TEST(JournalDatabase, KeepsWhatIsInItsLogWhenAnotherProcessReadsAndEnds) {
+TEST(SqliteDatabase, KeepsWhatIsInItsLogWhenAnotherProcessReadsAndEnds) {
     const ScratchDir scratch;
     const std::string file = scratch.path("journal.db");
     Other other([&] {
@@ -117,7 +117,7 @@ TEST(JournalDatabase, KeepsWhatIsInItsLogWhenAnotherProcessReadsAndEnds) {
     EXPECT_EQ(left.number("SELECT count(*) FROM t"), 2);
 }
 
-TEST(JournalDatabase, FollowsNoLink) {
+TEST(SqliteDatabase, FollowsNoLink) {
     const ScratchDir scratch;
     scratch.write("elsewhere", "");
     ASSERT_EQ(::symlink(scratch.path("elsewhere").c_str(), scratch.path("journal.db").c_str()), 0);

@@ -1,14 +1,13 @@
-#include "host/journal/database.h"
+#include "sqlite/database.h"
 
 #include <fcntl.h>
 #include <sqlite3.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <system_error>
 
-#include "host/process/system/file_descriptor.h"
-
-namespace host {
+namespace sqlite {
 namespace {
 
 constexpr int kBusyMilliseconds = 5000;
@@ -22,9 +21,10 @@ constexpr int kBusyMilliseconds = 5000;
 /// one's. A file that is there is not touched: when a process closes any descriptor of a file, the
 /// system drops all locks that the process has on it, those of other connections among them.
 void makePrivate(const std::string& file) {
-    const FileDescriptor made(
-        ::open(file.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
-    if (!made && errno != EEXIST) {
+    const int made = ::open(file.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600);
+    if (made >= 0) {
+        ::close(made);
+    } else if (errno != EEXIST) {
         throw DatabaseError(file + ": " + std::generic_category().message(errno), SQLITE_CANTOPEN);
     }
 }
@@ -127,4 +127,4 @@ int Database::changed() const {
     return sqlite3_changes(connection_.get());
 }
 
-}  // namespace host
+}  // namespace sqlite
