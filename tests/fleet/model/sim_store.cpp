@@ -117,4 +117,16 @@ void SimStore::skipNumbers(fleet::Number count, fleet::Number atLeast, fleet::Mo
     tables.listUntil = listUntil;
 }
 
+std::vector<fleet::OrderRecord> SimStore::orders() const {
+    std::vector<fleet::OrderRecord> orders;
+    for (const auto& [place, order] : tables.orders)
+        orders.push_back(order);
+    return orders;
+}
+
+bool SimStore::isAllOver() const {
+    return std::all_of(tables.orders.begin(), tables.orders.end(),
+                       [](const auto& order) { return order.second.outcome.has_value(); });
+}
+
 }  // namespace model

@@ -7,8 +7,8 @@
 #include <utility>
 #include <vector>
 
-#include "fleet/server/core/centre_store.h"
 #include "tests/fleet/model/dice.h"
+#include "tests/fleet/model/model_store.h"
 
 namespace model {
 
@@ -19,7 +19,7 @@ struct Tables {
     fleet::Moment listUntil{};
 };
 
-class SimStore : public fleet::CentreStore {
+class SimStore : public ModelStore {
 public:
     explicit SimStore(Dice& dice) : dice_(dice) {}
 
@@ -41,6 +41,11 @@ public:
     void skipNumbers(fleet::Number count, fleet::Number atLeast, fleet::Moment listUntil) override;
     fleet::Moment listUntil() const override { return tables.listUntil; }
 
+    std::vector<fleet::OrderRecord> orders() const override;
+    bool isAllOver() const override;
+    void keepBackup() override { backup_ = tables; }
+    void putBack() override { tables = backup_; }
+
     Tables tables;
 
 private:
@@ -48,6 +53,7 @@ private:
     fleet::OrderRecord* at(const std::string& host, fleet::Number number);
 
     Dice& dice_;
+    Tables backup_;
 };
 
 }  // namespace model

@@ -3,13 +3,20 @@
 #include <algorithm>
 #include <set>
 
+#include "tests/fleet/model/sim_store.h"
+
 namespace model {
 
 using fleet::Moment;
 using fleet::Number;
 
-World::World(std::uint64_t seed, Disasters disasters)
-    : dice_(seed), disasters_(disasters), bus_(dice_), centreBus_(bus_, dice_), store_(dice_) {
+World::World(std::uint64_t seed, Disasters disasters, const MakeStore& makeStore)
+    : dice_(seed),
+      disasters_(disasters),
+      bus_(dice_),
+      centreBus_(bus_, dice_),
+      store_(makeStore(dice_)) {
+    dice_.faults = false;
     const std::size_t hosts = 1 + dice_.below(3);
     seats_.resize(hosts);
     for (std::size_t i = 0; i < hosts; ++i) {
@@ -25,7 +32,7 @@ World::World(std::uint64_t seed, Disasters disasters)
         };
         fleet::HostRecord record;
         record.host = key;
-        store_.tables.hosts[key] = record;
+        store_->keepHost(record);
     }
     centreBus_.republish = [this](const std::string& host, Number number) {
         for (Seat& seat : seats_) {
@@ -34,12 +41,17 @@ World::World(std::uint64_t seed, Disasters disasters)
         }
     };
     startCentre();
-    backup_ = store_.tables;
+    store_->keepBackup();
+    dice_.faults = true;
+}
+
+std::unique_ptr<ModelStore> World::inMemory(Dice& dice) {
+    return std::make_unique<SimStore>(dice);
 }
 
 void World::startCentre() {
     centre_ = std::make_unique<fleet::Centre>(
-        store_, centreBus_,
+        *store_, centreBus_,
         [this](const fleet::Alarm& alarm) { alarms_.push_back(alarm.host + ": " + alarm.text); });
 }
 
@@ -100,7 +112,7 @@ void World::submit() {
         if (number) orders_[order.order] = order;
     });
     // An operator who was not answered may have been heard.
-    if (store_.order(order.host, order.order)) orders_[order.order] = order;
+    if (store_->order(order.host, order.order)) orders_[order.order] = order;
 }
 
 void World::disturb() {
@@ -132,10 +144,10 @@ void World::disturbBus() {
 }
 
 void World::restoreCentre() {
-    if (dice_.chance(2)) backup_ = store_.tables;
+    if (dice_.chance(2)) store_->keepBackup();
     if (dice_.below(400) != 0) return;
     centre_.reset();
-    store_.tables = backup_;
+    store_->putBack();
     hasRestored_ = true;
     const bool faults = std::exchange(dice_.faults, false);
     startCentre();
@@ -228,10 +240,8 @@ void World::makePeace() {
 
 bool World::isQuiet() const {
     if (!centre_ || bus_.nextOutcome() || !bus_.tasks().empty()) return false;
-    const auto& orders = store_.tables.orders;
-    if (hasRestored_ && now_ < store_.listUntil() + Moment(90'000)) return false;
-    return std::all_of(orders.begin(), orders.end(),
-                       [](const auto& order) { return order.second.outcome.has_value(); });
+    if (hasRestored_ && now_ < store_->listUntil() + Moment(90'000)) return false;
+    return store_->isAllOver();
 }
 
 std::string World::fault() const {
@@ -259,7 +269,7 @@ std::string World::faultOfHost(const Seat& seat) const {
     Number highest = 0;
     for (const std::string& order : seat.host->ran()) {
         if (!ran.insert(order).second) return order + " ran twice";
-        const auto record = store_.order(seat.host->key(), order);
+        const auto record = store_->order(seat.host->key(), order);
         if (!record) {
             // A host that has lost its journal cannot tell a centre that has lost its record.
             if (hasRestored_ && seat.host->journals().back().tasks.count(order) == 0) continue;
@@ -268,8 +278,8 @@ std::string World::faultOfHost(const Seat& seat) const {
         if (record->number != 0 && record->number <= highest) return order + " ran out of turn";
         highest = std::max(highest, record->number);
     }
-    for (const auto& [place, order] : store_.tables.orders) {
-        if (place.first != seat.host->key()) continue;
+    for (const fleet::OrderRecord& order : store_->orders()) {
+        if (order.host != seat.host->key()) continue;
         const std::string found = faultOfOrder(seat, order);
         if (!found.empty()) return found;
     }
@@ -293,7 +303,7 @@ std::string World::faultOfOrder(const Seat& seat, const fleet::OrderRecord& orde
         return name + " was not refused but is " + state;
     }
     if (state == "done" && !asked.cancels.empty()) {
-        const auto target = store_.order(seat.host->key(), asked.cancels);
+        const auto target = store_->order(seat.host->key(), asked.cancels);
         const bool isCancelled = target && target->outcome && target->outcome->state == "cancelled";
         // With the journal of a cancelled order its end may be gone.
         if (target && !isCancelled && !seat.host->hasLostJournal()) {

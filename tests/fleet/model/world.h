@@ -12,10 +12,10 @@
 
 #include "fleet/server/core/centre.h"
 #include "tests/fleet/model/dice.h"
+#include "tests/fleet/model/model_store.h"
 #include "tests/fleet/model/sim_bus.h"
 #include "tests/fleet/model/sim_host.h"
 #include "tests/fleet/model/sim_link.h"
-#include "tests/fleet/model/sim_store.h"
 
 namespace model {
 
@@ -29,7 +29,8 @@ struct Disasters {
 
 class World {
 public:
-    World(std::uint64_t seed, Disasters disasters);
+    /// The centre's database is the model's own, in memory, or the one that is made.
+    World(std::uint64_t seed, Disasters disasters, const MakeStore& makeStore = inMemory);
 
     /// Faults for a while, then peace until nothing is left to do.
     void run(std::size_t steps);
@@ -65,13 +66,14 @@ private:
     std::string faultOfOrder(const Seat& seat, const fleet::OrderRecord& order) const;
     const Task* taskOf(const Seat& seat, const fleet::Outcome& outcome) const;
 
+    static std::unique_ptr<ModelStore> inMemory(Dice& dice);
+
     Dice dice_;
     const Disasters disasters_;
     fleet::Moment now_{1'000'000'000};
     SimBus bus_;
     SimCentreBus centreBus_;
-    SimStore store_;
-    Tables backup_;
+    std::unique_ptr<ModelStore> store_;
     bool hasRestored_ = false;
     std::unique_ptr<fleet::Centre> centre_;
     std::vector<Seat> seats_;
