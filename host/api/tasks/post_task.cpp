@@ -129,9 +129,10 @@ Reply enter(Task task, Services& services) {
     return taskReply(202, task, services, Outputs::Shown);
 }
 
-Task refused(Task task, const std::string& reason) {
+/// The task as one that is over before it could begin.
+Task neverBegun(Task task, TaskState state, const std::string& reason) {
     task.way = TaskWay::AtOnce;
-    task.state = TaskState::Refused;
+    task.state = state;
     task.reason = reason;
     task.ended = task.accepted;
     return task;
@@ -145,7 +146,7 @@ void askGuards(const Task& task, Services& services) {
         services.guards.admit(request, services.journal.mayChange(request.product()));
     } catch (const Refusal& refusal) {
         if (task.once && refusal.httpStatus() == 409) {
-            Task remembered = refused(task, refusal.what());
+            Task remembered = neverBegun(task, TaskState::Refused, refusal.what());
             remembered.guard = refusal.guard();
             remembered.hint = refusal.hint();
             if (!services.journal.enterOnce(remembered)) services.tasks.hasEnded(remembered);
@@ -154,12 +155,37 @@ void askGuards(const Task& task, Services& services) {
     }
 }
 
-Reply enterRefused(const Call& call, Task task, Services& services) {
-    if (!task.once) throw BadRequest("\"refused\" needs \"once\"");
-    return enter(
-        refused(std::move(task),
-                services.codePage.fromUtf8(textIn(call.body(), "refused")).value_or("refused")),
-        services);
+struct RecordedEnd {
+    const char* member;  ///< of the body: why, or what was done
+    TaskState state;
+};
+
+/// How somebody else may say that a request ended which the plug-in never gets.
+constexpr RecordedEnd kRecordedEnds[] = {{"refused", TaskState::Refused},
+                                         {"cancelled", TaskState::Cancelled},
+                                         {"expired", TaskState::Expired},
+                                         {"done", TaskState::Done}};
+
+/// The end that the body tells; null if it is a request like others.
+const RecordedEnd* recordedEndIn(const Call& call) {
+    const RecordedEnd* told = nullptr;
+    for (const RecordedEnd& end : kRecordedEnds) {
+        if (!call.body().contains(end.member)) continue;
+        if (told != nullptr) {
+            throw BadRequest("a task ends once: as \"" + std::string(told->member) + "\" or as \"" +
+                             end.member + '"');
+        }
+        told = &end;
+    }
+    return told;
+}
+
+Reply enterEnded(const Call& call, Task task, const RecordedEnd& end, Services& services) {
+    if (!task.once) throw BadRequest('"' + std::string(end.member) + "\" needs \"once\"");
+    const std::string reason = textIn(call.body(), end.member);
+    return enter(neverBegun(std::move(task), end.state,
+                            services.codePage.fromUtf8(reason).value_or(end.member)),
+                 services);
 }
 
 }  // namespace
@@ -170,7 +196,9 @@ Answer postTask(Services& services, const Call& call) {
     const oxa::Table* const table = services.tables.find(std::string(plugin::kRequestTable));
     if (table == nullptr) return errorReply(404, "the plug-in takes no requests");
     Task task = taskOf(call, *table, services);
-    if (call.body().contains("refused")) return enterRefused(call, std::move(task), services);
+    if (const RecordedEnd* const end = recordedEndIn(call)) {
+        return enterEnded(call, std::move(task), *end, services);
+    }
     checkCommand(task);
     if (task.once) {
         const std::optional<Task> first = services.journal.findOnce(task.transid);

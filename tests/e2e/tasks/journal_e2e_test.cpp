@@ -224,6 +224,25 @@ TEST_F(JournalOnDisk, ARefusalIsRememberedForItsRepetition) {
     EXPECT_EQ(get("/v1/tasks/never")["reason"], "not on Sundays");
 }
 
+TEST_F(JournalOnDisk, WhatEndedElsewhereIsRecordedAsItEnded) {
+    start();
+    for (const char* const state : {"refused", "cancelled", "expired", "done"}) {
+        const json told = {{"transid", state}, {"once", true}, {state, "told from outside"}};
+        const json task = post("/v1/tasks", told, 202);
+        EXPECT_EQ(task["state"], state);
+        EXPECT_EQ(task["reason"], "told from outside");
+        EXPECT_EQ(task["ended"], task["accepted"]);
+        EXPECT_EQ(post("/v1/tasks", told, 202)["id"], task["id"]);
+    }
+    post("/v1/tasks", {{"transid", "x"}, {"done", "without once"}}, 400);
+    post("/v1/tasks", {{"transid", "x"}, {"once", true}, {"done", "y"}, {"expired", "z"}}, 400);
+    post("/v1/tasks", {{"transid", "x"}, {"once", true}, {"done", 1}}, 400);
+    EXPECT_EQ(get("/v1/tasks")["tasks"].size(), 4U);
+    killAndStart();
+    EXPECT_EQ(stateOf("done"), "done");
+    EXPECT_TRUE(allNotes().empty());
+}
+
 TEST_F(JournalOnDisk, WhatWaitsCanBeCancelled) {
     start();
     const std::string first = accept("ux");
