@@ -547,10 +547,13 @@ class Operations:
         expires: str | None = None,
         journal: str | None = None,
         refused: str | None = None,
+        cancelled: str | None = None,
+        expired: str | None = None,
+        done: str | None = None,
     ) -> Task:
         """Accepts a command for its turn.
 
-        command: the command; needed unless refused
+        command: the command; needed unless only recorded
         product: the product's code
         version: the product's version
         targetmsn: the managed system
@@ -564,6 +567,9 @@ class Operations:
         expires: it must have begun by then
         journal: the journal that must be this host's
         refused: why this never runs; recorded only
+        cancelled: the same for one that was cancelled
+        expired: the same for one that came too late
+        done: what was done without the plug-in
         For those who may act.
         """
         parameters: dict[str, Any] = {}
@@ -582,6 +588,9 @@ class Operations:
         body["expires"] = expires
         body["journal"] = journal
         body["refused"] = refused
+        body["cancelled"] = cancelled
+        body["expired"] = expired
+        body["done"] = done
         return self._transport.ask("POST", "/v1/tasks", parameters, body)
 
     def get_tasks(
