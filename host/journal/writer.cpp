@@ -94,7 +94,7 @@ void Writer::flush() noexcept {
     try {
         {
             const std::lock_guard<std::mutex> lock(lock_);
-            if (later_.empty()) return;
+            if (later_.empty() && !writesLater_) return;
         }
         submit([](Database&) {}).get();
     } catch (const std::exception&) {
@@ -183,6 +183,7 @@ void Writer::work() {
         gather(lock);
         Jobs jobs = std::exchange(jobs_, {});
         std::vector<Change> later = std::exchange(later_, {});
+        writesLater_ = !later.empty();
         const bool wipes = wiping_ && (ending_ || Clock::now() >= wipeDue_);
         lock.unlock();
         busySince_.store(Clock::now().time_since_epoch().count());
@@ -190,6 +191,7 @@ void Writer::work() {
         const bool wiped = wipes && wipe();
         busySince_.store(0);
         lock.lock();
+        writesLater_ = false;  // after a failure they wait again
         if (wipes) {
             ++wipes_;
             changed_.notify_all();
@@ -255,6 +257,7 @@ std::vector<Writer::Change> Writer::tryWrite(Jobs& jobs, const std::vector<Chang
     tellOfCommit();
     const std::lock_guard<std::mutex> lock(lock_);
     ++transactions_;
+    writesLater_ = false;
     return again;
 }
 

@@ -115,6 +115,7 @@ private:
     std::condition_variable changed_;
     Jobs jobs_;
     std::vector<Change> later_;
+    bool writesLater_ = false;  ///< some of them are being written
     Clock::time_point laterDue_{};
     Clock::time_point regularDue_ = Clock::time_point::max();
     bool isCrowded_ = false;  ///< several have waited for the last transaction

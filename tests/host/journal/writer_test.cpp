@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <future>
 
 #include "support/gate.h"
 #include "support/host/program.h"
@@ -185,6 +186,23 @@ TEST_F(JournalWriter, WhatCanWaitIsWrittenWhenSomebodyAsks) {
     EXPECT_EQ(rows(), 1);
     writer.flush();
     EXPECT_EQ(writer.transactions(), 1U);
+}
+
+TEST_F(JournalWriter, AFlushWaitsForWhatIsBeingWritten) {
+    Gate gate;
+    Writer writer(database);
+    writer.submitLater(
+        [&gate, this](Database& written) {
+            gate.pass();
+            inserting(1)(written);
+        },
+        std::chrono::milliseconds(0));
+    ASSERT_TRUE(gate.awaitArrival());
+    auto flushed = std::async(std::launch::async, [&writer] { writer.flush(); });
+    EXPECT_EQ(flushed.wait_for(std::chrono::milliseconds(50)), std::future_status::timeout);
+    gate.open();
+    flushed.get();
+    EXPECT_EQ(rows(), 1);
 }
 
 TEST_F(JournalWriter, WhatCanWaitIsWrittenByTheEnd) {
