@@ -13,6 +13,10 @@ constexpr Moment kHelloPause = seconds(2);
 constexpr Moment kFirstPatience = seconds(2);
 constexpr Moment kMostPatience = seconds(30);
 
+Moment longer(Moment patience) {
+    return patience.count() == 0 ? kFirstPatience : std::min(patience * 2, kMostPatience);
+}
+
 Outcome unknownOutcome(const std::string& host, const std::string& order,
                        const std::string& journal) {
     Outcome outcome;
@@ -89,6 +93,7 @@ Actions Link::replied(const Reply& reply, Moment now) {
     see(now);
     if (!asked_ || reply.nonce != asked_->nonce) return {};
     if (reply.over > reply.last || reply.last > kHighestNumber) return {};
+    helloPatience_ = {};
     Actions out;
     if (!reply.stop.empty()) {
         out.push_back(StopLink{reply.stop});
@@ -112,6 +117,15 @@ Actions Link::replied(const Reply& reply, Moment now) {
     }
     asked_.reset();
     return andOn(std::move(out));
+}
+
+Actions Link::unheard(const std::string& nonce, Moment now) {
+    see(now);
+    if (!asked_ || asked_->nonce != nonce) return {};
+    asked_.reset();
+    helloPatience_ = longer(helloPatience_);
+    nextHello_ = std::min(nextHello_, kept_.latest + helloPatience_);
+    return goOn();
 }
 
 /// Whether what this link remembers does not go with the journal that the host has now.
@@ -360,7 +374,7 @@ Actions Link::recorded(Number number, const HandOverAnswer& answer, Moment now) 
 
 void Link::postpone(const std::string& why) {
     blocked_ = why;
-    patience_ = patience_.count() == 0 ? kFirstPatience : std::min(patience_ * 2, kMostPatience);
+    patience_ = longer(patience_);
     tryAgain_ = kept_.latest + patience_;
 }
 

@@ -53,6 +53,9 @@ public:
     Actions unanswered(Number number, Moment now);
     /// A reply that the centre has signed.
     Actions replied(const Reply& reply, Moment now);
+    /// Nobody has replied to the hello with this nonce, and nobody will: it was lost, or the centre
+    /// is away. The next one comes sooner than usual, and ever later as long as that goes on.
+    Actions unheard(const std::string& nonce, Moment now);
 
     // What happens on the host.
     /// A host answers, and these of the fleet's orders are not over in its journal.
@@ -106,6 +109,7 @@ private:
     std::optional<Hello> asked_;  ///< the hello whose reply is awaited
     Moment nextHello_{};
     Moment lastHello_{};
+    Moment helloPatience_{};  ///< how long after an unheard hello the next one comes
     Moment nextScan_{};
     bool listWanted_ = false;
     std::set<std::string> revoked_;

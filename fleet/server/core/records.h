@@ -3,6 +3,7 @@
 
 #include <optional>
 #include <string>
+#include <tuple>
 
 #include "fleet/bus/messages/outcome.h"
 
@@ -10,6 +11,8 @@ namespace fleet {
 
 struct HostRecord {
     std::string host;            ///< its bus key
+    std::string signing;         ///< the public key with which its link signs
+    std::string name;            ///< for people
     Number last = 0;             ///< the highest number given
     Number told = 0;             ///< the highest `taken` that its link has told
     std::string machine;         ///< the machine's identity at enrolment; "" before the first hello
@@ -18,8 +21,16 @@ struct HostRecord {
     std::string earlierSession;  ///< of the start before it
     std::string stopped;         ///< why its link must not go on; "" if it may
     std::string unpublished;     ///< why nothing is published for it; "" if nothing is wrong
-    Moment heard{};              ///< when the latest hello came
 };
+
+inline bool operator==(const HostRecord& a, const HostRecord& b) {
+    const auto all = [](const HostRecord& record) {
+        return std::tie(record.host, record.signing, record.name, record.last, record.told,
+                        record.machine, record.journal, record.session, record.earlierSession,
+                        record.stopped, record.unpublished);
+    };
+    return all(a) == all(b);
+}
 
 /// An order, with its number.
 struct OrderRecord {

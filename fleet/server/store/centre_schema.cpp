@@ -22,7 +22,7 @@ CREATE TABLE hosts (
     id INTEGER PRIMARY KEY, host BLOB NOT NULL UNIQUE, last INTEGER NOT NULL,
     told INTEGER NOT NULL, machine BLOB NOT NULL, journal BLOB NOT NULL, session BLOB NOT NULL,
     earlier_session BLOB NOT NULL, stopped BLOB NOT NULL, unpublished BLOB NOT NULL,
-    heard INTEGER NOT NULL);
+    signing BLOB NOT NULL, name BLOB NOT NULL);
 CREATE TABLE orders (
     id INTEGER PRIMARY KEY, host INTEGER NOT NULL, number INTEGER NOT NULL, name BLOB NOT NULL,
     bytes BLOB NOT NULL, published INTEGER NOT NULL, held INTEGER NOT NULL, state BLOB,

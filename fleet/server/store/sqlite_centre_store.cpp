@@ -35,8 +35,8 @@ std::vector<OrderRecord> allOf(Statement rows) {
 
 std::optional<HostRecord> SqliteCentreStore::host(const std::string& host) const {
     Statement found = database_.ask(
-        "SELECT last, told, machine, journal, session, earlier_session, stopped, unpublished, heard"
-        " FROM hosts WHERE host = ?",
+        "SELECT last, told, machine, journal, session, earlier_session, stopped, unpublished,"
+        " signing, name FROM hosts WHERE host = ?",
         host);
     if (!found.step()) return std::nullopt;
     HostRecord record;
@@ -49,7 +49,8 @@ std::optional<HostRecord> SqliteCentreStore::host(const std::string& host) const
     record.earlierSession = found.bytes(5);
     record.stopped = found.bytes(6);
     record.unpublished = found.bytes(7);
-    record.heard = Moment(found.integer(8));
+    record.signing = found.bytes(8);
+    record.name = found.bytes(9);
     return record;
 }
 
@@ -58,14 +59,14 @@ void SqliteCentreStore::keepHost(const HostRecord& record) {
     const std::optional<HostRow> before = row(record.host);
     database_.change(
         "INSERT INTO hosts (host, last, told, machine, journal, session, earlier_session, stopped,"
-        " unpublished, heard) VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"
+        " unpublished, signing, name) VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"
         " ON CONFLICT (host) DO UPDATE SET last = excluded.last, told = excluded.told,"
         " machine = excluded.machine, journal = excluded.journal, session = excluded.session,"
         " earlier_session = excluded.earlier_session, stopped = excluded.stopped,"
-        " unpublished = excluded.unpublished, heard = excluded.heard",
+        " unpublished = excluded.unpublished, signing = excluded.signing, name = excluded.name",
         record.host, bounded(record.last), bounded(record.told), record.machine, record.journal,
-        record.session, record.earlierSession, record.stopped, record.unpublished,
-        std::int64_t{record.heard.count()});
+        record.session, record.earlierSession, record.stopped, record.unpublished, record.signing,
+        record.name);
     if (before) holdOrders(*before, !record.unpublished.empty());
     transaction.commit();
 }

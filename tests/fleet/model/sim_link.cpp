@@ -209,7 +209,10 @@ void SimLink::apply(const fleet::SayHello& action) {
             hello.have->push_back({order, 0});
         }
     }
-    if (isConnected_ && !dice_.fault(10)) onHello(hello);
+    if (isConnected_ && !dice_.fault(10)) return onHello(hello);
+    const std::string nonce = hello.nonce;
+    underWay_.push_back(
+        [nonce](fleet::Link& link, Moment now) { return link.unheard(nonce, now); });
 }
 
 void SimLink::apply(const fleet::StopLink& action) {

@@ -64,6 +64,33 @@ TEST(Hello, AGapIsToldAtMostEveryTwoSeconds) {
     EXPECT_LE(driver.count<SayHello>(), 10U);
 }
 
+/// How long it takes to the next hello after one that nobody has heard.
+Moment pauseAfterUnheard(LinkDriver& driver) {
+    driver.note(driver.link().unheard(driver.nonce(), driver.now));
+    driver.forget();
+    const Moment begin = driver.now;
+    driver.waitFor<SayHello>();
+    return driver.now - begin;
+}
+
+TEST(Hello, OneThatNobodyHearsIsSaidAgainEverLater) {
+    LinkDriver driver = connectedLink(kept(0));
+    for (const int seconds : {2, 4, 8, 16, 30, 30}) {
+        EXPECT_EQ(pauseAfterUnheard(driver), Moment(1'000 * seconds));
+    }
+    driver.note(driver.link().replied(replyTo(driver, 0, 0), driver.now));
+    driver.waitFor<SayHello>();
+    EXPECT_EQ(pauseAfterUnheard(driver), Moment(2'000)) << "a reply ends the impatience";
+}
+
+TEST(Hello, AnOlderOneThatNobodyHasHeardChangesNothing) {
+    LinkDriver driver = connectedLink(kept(0));
+    driver.note(driver.link().unheard("another nonce", driver.now));
+    driver.forget();
+    driver.wait(Moment(29'000));
+    EXPECT_EQ(driver.count<SayHello>(), 0U);
+}
+
 TEST(Hello, NothingIsSaidWithoutABus) {
     LinkDriver driver = connectedLink(kept(0));
     driver.link().disconnected();

@@ -37,6 +37,14 @@ TEST(OutcomeRule, AnotherOneIsAConflict) {
     EXPECT_EQ(judgeOutcome(ended("done"), other), OutcomeVerdict::Conflict);
 }
 
+TEST(OutcomeRule, MoreOrLessOfTheSameTaskIsNoConflict) {
+    Outcome first = ended("interrupted");
+    first.task = "{\"id\":\"2\",\"stdout\":\"...\"}";
+    Outcome later = first;
+    later.task = "{\"id\":\"2\",\"reason\":\"the inventory shows it\"}";
+    EXPECT_EQ(judgeOutcome(first, later), OutcomeVerdict::Ignore);
+}
+
 TEST(OutcomeRule, UnknownGivesWayToARealOneWhicheverComesFirst) {
     EXPECT_EQ(judgeOutcome(ended(fleet::kUnknown), ended("failed")), OutcomeVerdict::Keep);
     EXPECT_EQ(judgeOutcome(ended("failed"), ended(fleet::kUnknown)), OutcomeVerdict::Ignore);

@@ -87,7 +87,8 @@ TYPED_TEST(CentreStoreContract, KeepsAllOfAHost) {
     record.earlierSession = "earlier";
     record.stopped = "stopped";
     record.unpublished = "unpublished";
-    record.heard = fleet::Moment(1'234'567'890'123);
+    record.signing = "UKEY";
+    record.name = "web-1";
     this->store().keepHost(record);
     const fleet::HostRecord kept = this->store().host("c").value();
     EXPECT_EQ(kept.host, "c");
@@ -99,7 +100,8 @@ TYPED_TEST(CentreStoreContract, KeepsAllOfAHost) {
     EXPECT_EQ(kept.earlierSession, "earlier");
     EXPECT_EQ(kept.stopped, "stopped");
     EXPECT_EQ(kept.unpublished, "unpublished");
-    EXPECT_EQ(kept.heard, fleet::Moment(1'234'567'890'123));
+    EXPECT_EQ(kept.signing, "UKEY");
+    EXPECT_EQ(kept.name, "web-1");
     record.machine.clear();
     this->store().keepHost(record);
     EXPECT_EQ(this->store().host("c")->machine, "");

@@ -1,0 +1,108 @@
+// zavlink: connects the host on this machine to its fleet.
+
+#include <pthread.h>
+
+#include <csignal>
+#include <cstdio>
+#include <exception>
+#include <optional>
+#include <string>
+#include <thread>
+
+#include "fleet/files/files.h"
+#include "fleet/link/program/link_program.h"
+#include "fleet/link/program/machine.h"
+#include "fleet/log/log.h"
+
+namespace fleet {
+namespace {
+
+constexpr const char* kConfiguration = "/etc/zavlink.toml";
+constexpr const char* kUsage =
+    "usage: zavlink [--config FILE]\n"
+    "\n"
+    "Takes the orders of the fleet that FILE names (/etc/zavlink.toml if none is given)\n"
+    "to the host on this machine, and brings back how they ended.\n";
+
+/// The exit status that tells the service manager not to start it again: EX_CONFIG.
+constexpr int kMustNotRun = 78;
+constexpr int kWrongUsage = 2;
+
+struct Wish {
+    std::string configuration = kConfiguration;
+    const char* print = nullptr;  ///< only this is wanted
+};
+
+/// Nothing if the arguments make no sense.
+std::optional<Wish> wishOf(int argc, char** argv) {
+    Wish wish;
+    for (int i = 1; i < argc; ++i) {
+        const std::string argument = argv[i];
+        if (argument == "--help") {
+            wish.print = kUsage;
+        } else if (argument == "--version") {
+            wish.print = "zavlink " ZAV_VERSION "\n";
+        } else if (argument == "--config" && i + 1 < argc) {
+            wish.configuration = argv[++i];
+        } else {
+            return std::nullopt;
+        }
+    }
+    return wish;
+}
+
+/// Blocked in all threads, so that one thread waits for them.
+sigset_t blockSignals() {
+    ::signal(SIGPIPE, SIG_IGN);
+    sigset_t signals;
+    ::sigemptyset(&signals);
+    ::sigaddset(&signals, SIGTERM);
+    ::sigaddset(&signals, SIGINT);
+    ::pthread_sigmask(SIG_BLOCK, &signals, nullptr);
+    return signals;
+}
+
+int run(const std::string& file) {
+    const sigset_t signals = blockSignals();
+    const LinkConfiguration configuration =
+        parseLinkConfiguration(readFile(file, Secrecy::Public), file);
+    const std::string host = LinkFile(configuration.state).bus().publicKey();
+    LinkProgram program(configuration, machineIdentity(host));
+    std::thread waiter([&program, &signals] {
+        int signal = 0;
+        ::sigwait(&signals, &signal);
+        program.end();
+    });
+    std::printf("ready: %s\n", host.c_str());
+    std::fflush(stdout);
+    LinkProgram::End end = LinkProgram::End::Asked;
+    try {
+        end = program.run();
+    } catch (...) {
+        ::pthread_kill(waiter.native_handle(), SIGTERM);
+        waiter.join();
+        throw;
+    }
+    if (end == LinkProgram::End::Stopped) ::pthread_kill(waiter.native_handle(), SIGTERM);
+    waiter.join();
+    return end == LinkProgram::End::Stopped ? kMustNotRun : 0;
+}
+
+}  // namespace
+}  // namespace fleet
+
+int main(int argc, char** argv) {
+    fleet::nameProgram("zavlink");
+    const auto wish = fleet::wishOf(argc, argv);
+    if (!wish) {
+        std::fputs(fleet::kUsage, stderr);
+        return fleet::kWrongUsage;
+    }
+    if (wish->print != nullptr) return std::fputs(wish->print, stdout) < 0 ? 1 : 0;
+    try {
+        return fleet::run(wish->configuration);
+    } catch (const std::exception& error) {
+        fleet::say(fleet::Priority::Error, error.what());
+        return 1;
+    }
+}

@@ -1,0 +1,164 @@
+#include "fleet/link/program/bus_side.h"
+
+#include <charconv>
+#include <nlohmann/json.hpp>
+#include <optional>
+#include <utility>
+
+#include "fleet/bus/messages/document.h"
+#include "fleet/bus/messages/hello_bytes.h"
+#include "fleet/bus/nats/store.h"
+#include "fleet/bus/nats/streams.h"
+#include "fleet/log/log.h"
+
+using nlohmann::json;
+
+namespace fleet {
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+/// For each request. A server that is there answers in milliseconds, a centre with many hosts in a
+/// second or two.
+constexpr seconds kAnswerTime{5};
+constexpr seconds kConnectPause{2};
+/// The bus takes 256 KiB a message, its headers included.
+constexpr std::size_t kMostOutcome = 255 * 1024;
+
+/// The number at the end of "rp.task.HOST.NUMBER".
+std::optional<Number> numberOf(const std::string& subject) {
+    const std::size_t dot = subject.rfind('.');
+    if (dot == std::string::npos) return std::nullopt;
+    const char* const end = subject.data() + subject.size();
+    Number number = 0;
+    const auto read = std::from_chars(subject.data() + dot + 1, end, number);
+    if (read.ec != std::errc() || read.ptr != end) return std::nullopt;
+    return number;
+}
+
+}  // namespace
+
+std::string publishedOutcome(const Outcome& outcome, const KeyPair& signing) {
+    std::string bytes = signOutcome(outcome, signing);
+    if (bytes.size() <= kMostOutcome) return bytes;
+    Outcome shorter = outcome;
+    try {
+        json task = readDocument(outcome.task);
+        for (json& command : task.at("details").at("commands")) {
+            command.erase("stdout");
+            command.erase("stderr");
+        }
+        shorter.task = textOf(task);
+        bytes = signOutcome(shorter, signing);
+        if (bytes.size() <= kMostOutcome) return bytes;
+        shorter.task = textOf({{"id", task.at("id")}});
+    } catch (const std::exception&) {
+        shorter.task.clear();
+    }
+    return signOutcome(shorter, signing);
+}
+
+BusSide::BusSide(ConnectionOptions options, Trust trust, const KeyPair& bus, const KeyPair& signing,
+                 Events events)
+    : options_(std::move(options)),
+      trust_(std::move(trust)),
+      bus_(bus),
+      signing_(signing),
+      events_(std::move(events)) {
+    options_.events.disconnected = events_.disconnected;
+    options_.events.reconnected = events_.connected;
+    options_.events.closed = [this](const std::string& why) {
+        if (!isEnding_) events_.refused(why);
+    };
+    options_.events.error = [](const std::string& what) {
+        say(Priority::Warning, "the bus: " + what);
+    };
+    worker_.add([this] { connect(); });
+}
+
+BusSide::~BusSide() {
+    isEnding_ = true;
+    worker_.await();  // a job may be waiting for an answer of the connection
+    published_.reset();
+    if (connection_) connection_->close(kAnswerTime);
+}
+
+/// On the worker, where everything else waits for it.
+void BusSide::connect() {
+    std::string last;
+    while (!isEnding_) {
+        Connection::Result result = Connection::connect(options_);
+        if (result.connection) {
+            connection_ = std::move(result.connection);
+            if (subscribe()) return events_.connected();
+            connection_.reset();
+            result.text = "the bus does not let this host hear of its orders";
+        }
+        if (std::exchange(last, result.text) != result.text) {
+            say(Priority::Warning, "no connection to the bus: " + result.text);
+        }
+        if (!worker_.pause(kConnectPause)) return;
+    }
+}
+
+bool BusSide::subscribe() {
+    Connection::Subscribed made = connection_->subscribe(
+        "rp.task." + trust_.host + ".*",
+        [this](const BusMessage& message) {
+            if (const std::optional<Number> number = numberOf(message.subject)) {
+                events_.seen(*number);
+            }
+        },
+        kAnswerTime);
+    published_ = std::move(made.subscription);
+    return published_ != nullptr;
+}
+
+void BusSide::read(Number number) {
+    worker_.add([this, number] { readNow(number); });
+}
+
+void BusSide::readNow(Number number) {
+    const std::string subject = "task." + trust_.host + '.' + std::to_string(number);
+    const LastResult found = lastOn(*connection_, kTasksStream, subject, kAnswerTime);
+    if (found.kind == LastResult::Kind::Missing) return events_.missing(number);
+    if (found.kind != LastResult::Kind::Found) return events_.unanswered(number);
+    std::optional<Directive> directive = judge(found.bytes, number, trust_, bus_);
+    if (directive) return events_.read(number, std::move(*directive));
+    ++unsignedNumbers_;
+    say(Priority::Warning,
+        "order " + std::to_string(number) + " on the bus is not one that the centre has numbered");
+    events_.missing(number);
+}
+
+void BusSide::sayHello(Hello hello) {
+    worker_.add([this, hello = std::move(hello)] { sayHelloNow(hello); });
+}
+
+void BusSide::sayHelloNow(const Hello& hello) {
+    const Connection::Reply answer = connection_->request(
+        "hello." + trust_.host, signHello(trust_.host, hello, signing_), kAnswerTime);
+    if (!answer.status.done()) return events_.unheard(hello.nonce);
+    try {
+        events_.replied(readReply(answer.message.data, trust_.host, trust_.centre));
+    } catch (const MessageError& error) {
+        say(Priority::Warning, std::string("a reply that is not the centre's: ") + error.what());
+        events_.unheard(hello.nonce);
+    }
+}
+
+void BusSide::report(const Outcome& outcome) {
+    worker_.add([this, outcome] { reportNow(outcome); });
+}
+
+void BusSide::reportNow(const Outcome& outcome) {
+    // What is lost is asked for by the next reply.
+    const StoreResult result =
+        store(*connection_, "out." + trust_.host, publishedOutcome(outcome, signing_), kAnswerTime);
+    if (result.kind == StoreResult::Kind::Refused || result.kind == StoreResult::Kind::Forbidden) {
+        say(Priority::Warning, "the bus does not take an outcome: " + result.text);
+    }
+}
+
+}  // namespace fleet

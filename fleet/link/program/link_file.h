@@ -1,0 +1,46 @@
+/// The one file that a link keeps.
+#pragma once
+
+#include <string>
+
+#include "fleet/bus/accounts/nkey.h"
+#include "fleet/link/core/kept.h"
+
+namespace fleet {
+
+/// "link.json" in the link's directory, readable for its user only: who this host is, and what must
+/// not be forgotten. Whoever has a copy of it can speak for the host.
+///
+/// The bus's key is never the one that signs: a bad server of the bus can have its key sign
+/// anything.
+class LinkFile {
+public:
+    /// Reads it. Throws FileError.
+    explicit LinkFile(const std::string& directory);
+
+    /// Makes the file of a host that has just been enrolled: its keys and its token of the bus.
+    /// Throws FileError, also when there is one.
+    static void create(const std::string& directory, const KeyPair& bus, const KeyPair& signing,
+                       const std::string& token);
+
+    const KeyPair& bus() const { return bus_; }
+    const KeyPair& signing() const { return signing_; }
+    const std::string& token() const { return token_; }
+    const Kept& kept() const { return kept_; }
+
+    /// Durable when it returns. Throws FileError; then the older state is on disk.
+    void keep(const Kept& kept);
+
+private:
+    struct Content;
+    LinkFile(std::string path, Content content);
+    static Content read(const std::string& path);
+
+    const std::string path_;
+    const KeyPair bus_;
+    const KeyPair signing_;
+    const std::string token_;
+    Kept kept_;
+};
+
+}  // namespace fleet

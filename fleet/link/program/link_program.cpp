@@ -1,0 +1,247 @@
+#include "fleet/link/program/link_program.h"
+
+#include <chrono>
+#include <random>
+#include <utility>
+#include <variant>
+
+#include "fleet/bus/accounts/fleet_accounts.h"
+#include "fleet/bus/messages/order.h"
+#include "fleet/log/log.h"
+
+namespace fleet {
+namespace {
+
+using std::chrono::seconds;
+
+Moment now() {
+    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+}
+
+/// 20 to 40 seconds.
+Moment drawnPause() {
+    static std::mt19937 dice{std::random_device{}()};
+    return Moment(std::uniform_int_distribution<Moment::rep>(20'000, 40'000)(dice));
+}
+
+}  // namespace
+
+LinkProgram::LinkProgram(const LinkConfiguration& configuration, const std::string& machine)
+    : file_(configuration.state), link_(settings(machine), file_.kept()) {
+    bus_ = std::make_unique<BusSide>(busOptions(configuration), trust(configuration), file_.bus(),
+                                     file_.signing(), busEvents());
+    host_ = std::make_unique<HostSide>(configuration.hostSocket, hostEvents());
+}
+
+LinkProgram::~LinkProgram() {
+    // Each of them may still put letters into the mailbox, and nothing else.
+    host_.reset();
+    bus_.reset();
+}
+
+ConnectionOptions LinkProgram::busOptions(const LinkConfiguration& configuration) const {
+    ConnectionOptions options;
+    options.urls = configuration.bus;
+    if (!configuration.ca.empty()) {
+        options.tls = TlsOptions{configuration.ca, configuration.serverName};
+    }
+    options.credentials =
+        UserToken{[token = file_.token()] { return token; },
+                  [key = file_.bus()](std::string_view nonce) { return key.sign(nonce); }};
+    options.name = configuration.name;
+    options.inboxPrefix = inboxPrefixOf(file_.bus().publicKey());
+    return options;
+}
+
+Trust LinkProgram::trust(const LinkConfiguration& configuration) const {
+    Trust trusted;
+    trusted.fleet = configuration.fleet;
+    trusted.host = file_.bus().publicKey();
+    trusted.name = configuration.name;
+    trusted.labels = configuration.labels;
+    trusted.root = configuration.root;
+    trusted.centre = configuration.centre;
+    return trusted;
+}
+
+LinkSettings LinkProgram::settings(const std::string& machine) const {
+    LinkSettings made;
+    made.host = file_.bus().publicKey();
+    made.session = makeOrderId();
+    made.machine = machine;
+    made.nonce = makeOrderId;
+    made.pause = drawnPause;
+    return made;
+}
+
+template <typename Tell>
+void LinkProgram::tell(Tell tell) {
+    mailbox_.put([this, tell = std::move(tell)] { carryOut(tell(link_, now())); });
+}
+
+HostSide::Events LinkProgram::hostEvents() {
+    HostSide::Events events;
+    events.isThere = [this](const std::string& journal, std::set<std::string> unfinished) {
+        mailbox_.put([this, journal, unfinished = std::move(unfinished)] {
+            if (std::exchange(journal_, journal) != journal) {
+                say(Priority::Info, "the host answers; its journal is " + journal);
+            }
+            carryOut(link_.hostIs(journal, unfinished, now()));
+        });
+    };
+    events.isAway = [this] {
+        mailbox_.put([this] {
+            if (!std::exchange(journal_, "").empty()) say(Priority::Warning, "the host is away");
+            carryOut(link_.hostIsAway(now()));
+        });
+    };
+    events.ended = [this](Outcome outcome) {
+        tell([outcome = std::move(outcome)](Link& link, Moment at) {
+            return link.ended(outcome, at);
+        });
+    };
+    return events;
+}
+
+BusSide::Events LinkProgram::busEvents() {
+    BusSide::Events events;
+    events.connected = [this] {
+        mailbox_.put([this] {
+            say(Priority::Info, "connected to the bus");
+            carryOut(link_.connected(now()));
+        });
+    };
+    events.disconnected = [this] {
+        mailbox_.put([this] {
+            say(Priority::Warning, "the bus is away");
+            link_.disconnected();
+        });
+    };
+    events.seen = [this](Number number) {
+        tell([number](Link& link, Moment at) { return link.seen(number, at); });
+    };
+    events.read = [this](Number number, Directive directive) {
+        tell([number, directive = std::move(directive)](Link& link, Moment at) {
+            return link.read(number, directive, at);
+        });
+    };
+    events.missing = [this](Number number) {
+        tell([number](Link& link, Moment at) { return link.missing(number, at); });
+    };
+    events.unanswered = [this](Number number) {
+        tell([number](Link& link, Moment at) { return link.unanswered(number, at); });
+    };
+    events.replied = [this](Reply reply) {
+        tell([reply = std::move(reply)](Link& link, Moment at) { return link.replied(reply, at); });
+    };
+    events.unheard = [this](const std::string& nonce) {
+        tell([nonce](Link& link, Moment at) { return link.unheard(nonce, at); });
+    };
+    events.refused = [this](const std::string& why) {
+        mailbox_.put([this, why] { apply(StopLink{"the bus refuses this host: " + why}); });
+    };
+    return events;
+}
+
+LinkProgram::End LinkProgram::run() {
+    auto nextTick = Mailbox::Clock::now();
+    while (!end_) {
+        if (const std::optional<Mailbox::Letter> letter = mailbox_.take(nextTick)) (*letter)();
+        if (Mailbox::Clock::now() < nextTick) continue;
+        nextTick = Mailbox::Clock::now() + seconds(1);
+        carryOut(link_.tick(now()));
+        sayWhatBlocks();
+    }
+    return *end_;
+}
+
+void LinkProgram::end() {
+    mailbox_.put([this] {
+        if (!end_) end_ = End::Asked;
+    });
+}
+
+void LinkProgram::sayWhatBlocks() {
+    if (std::exchange(blocked_, link_.blocked()) == link_.blocked()) return;
+    if (blocked_.empty()) return say(Priority::Info, "orders are handed over again");
+    say(Priority::Notice, "the next order waits: " + blocked_);
+}
+
+void LinkProgram::carryOut(const Actions& actions) {
+    for (const Action& action : actions) {
+        if (end_) return;
+        std::visit([this](const auto& one) { apply(one); }, action);
+    }
+}
+
+void LinkProgram::apply(const ReadOrder& action) {
+    bus_->read(action.number);
+}
+
+void LinkProgram::apply(const PrepareFiles& action) {
+    tell([number = action.directive.number](Link& link, Moment at) {
+        return link.prepared(number, Unacceptable{"this link does not bring files"}, at);
+    });
+}
+
+void LinkProgram::apply(const HandOver& action) {
+    say(Priority::Info, "order " + std::to_string(action.directive.number) + " (" +
+                            action.directive.order + ") goes to the host");
+    host_->handOver(action, [this, number = action.directive.number](HandOverAnswer answer) {
+        mailbox_.put([this, number, answer] { noteRecorded(number, answer, now()); });
+    });
+}
+
+void LinkProgram::apply(const EnterEnd& action) {
+    say(Priority::Notice, "order " + std::to_string(action.directive.number) + " (" +
+                              action.directive.order + ") is recorded as " + action.state + ": " +
+                              action.reason);
+    host_->enter(action, [this, number = action.directive.number](HandOverAnswer answer) {
+        mailbox_.put([this, number, answer] { noteRecorded(number, answer, now()); });
+    });
+}
+
+void LinkProgram::noteRecorded(Number number, const HandOverAnswer& answer, Moment at) {
+    if (std::holds_alternative<OtherJournal>(answer)) host_->lookAgain();
+    carryOut(link_.recorded(number, answer, at));
+}
+
+void LinkProgram::apply(const CancelTask& action) {
+    host_->cancel(action.order, journal_, [this, by = action.by](CancelAnswer answer) {
+        tell([by, answer](Link& link, Moment at) { return link.cancelled(by, answer, at); });
+    });
+}
+
+void LinkProgram::apply(const LookUp& action) {
+    host_->lookUp(action.order, journal_, [this, order = action.order](LookUpAnswer answer) {
+        tell([order, answer](Link& link, Moment at) { return link.found(order, answer, at); });
+    });
+}
+
+void LinkProgram::apply(const Report& action) {
+    bus_->report(action.outcome);
+}
+
+void LinkProgram::apply(const Keep& action) {
+    file_.keep(action.kept);
+}
+
+void LinkProgram::apply(const SayHello& action) {
+    if (!action.listWanted || journal_.empty()) return bus_->sayHello(action.hello);
+    host_->listOrders(journal_, [this, hello = action.hello](
+                                    const std::optional<std::vector<std::string>>& orders) mutable {
+        if (orders) {
+            hello.have.emplace();
+            for (const std::string& order : *orders)
+                hello.have->push_back({order, 0});
+        }
+        bus_->sayHello(std::move(hello));
+    });
+}
+
+void LinkProgram::apply(const StopLink& action) {
+    say(Priority::Error, "this link must not go on: " + action.reason);
+    end_ = End::Stopped;
+}
+
+}  // namespace fleet

@@ -1,0 +1,75 @@
+/// zavlink: carries out what a link decides.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "fleet/link/core/link.h"
+#include "fleet/link/program/bus_side.h"
+#include "fleet/link/program/host_side.h"
+#include "fleet/link/program/link_configuration.h"
+#include "fleet/link/program/link_file.h"
+#include "fleet/link/program/mailbox.h"
+
+namespace fleet {
+
+/// The link's decisions, fed by the bus and the host, each of which is talked to on threads of its
+/// own. The decisions themselves, and the file, belong to the thread of run().
+class LinkProgram {
+public:
+    /// Why run() returned.
+    enum class End {
+        Asked,    ///< end() was called
+        Stopped,  ///< this link must not run: starting it again would not help
+    };
+
+    /// Throws FileError when the link's file cannot be used. `machine` is the machine's identity.
+    LinkProgram(const LinkConfiguration& configuration, const std::string& machine);
+    ~LinkProgram();
+    LinkProgram(const LinkProgram&) = delete;
+    LinkProgram& operator=(const LinkProgram&) = delete;
+
+    /// Works until it is asked to end, or must not go on. Throws FileError when what must not be
+    /// forgotten cannot be written: nothing is done then that relies on it.
+    End run();
+    /// Any thread, at any time.
+    void end();
+
+private:
+    ConnectionOptions busOptions(const LinkConfiguration& configuration) const;
+    Trust trust(const LinkConfiguration& configuration) const;
+    LinkSettings settings(const std::string& machine) const;
+    HostSide::Events hostEvents();
+    BusSide::Events busEvents();
+
+    /// Has the link told something on the thread of run(), and carries out what it wants then.
+    template <typename Tell>
+    void tell(Tell tell);
+    void carryOut(const Actions& actions);
+    void apply(const ReadOrder& action);
+    void apply(const PrepareFiles& action);
+    void apply(const HandOver& action);
+    void apply(const EnterEnd& action);
+    void apply(const CancelTask& action);
+    void apply(const LookUp& action);
+    void apply(const Report& action);
+    void apply(const Keep& action);
+    void apply(const SayHello& action);
+    void apply(const StopLink& action);
+    void noteRecorded(Number number, const HandOverAnswer& answer, Moment now);
+    void sayWhatBlocks();
+
+    Mailbox mailbox_;
+    LinkFile file_;
+    Link link_;
+    std::string journal_;  ///< the host's, as it was last told; "" while no host answers
+    std::string blocked_;  ///< what was last said of it
+    std::optional<End> end_;
+    // They end first: their threads use everything above.
+    std::unique_ptr<BusSide> bus_;
+    std::unique_ptr<HostSide> host_;
+};
+
+}  // namespace fleet
