@@ -106,4 +106,24 @@ EnsureResult ensureStream(Connection& connection, const StreamSettings& settings
     return result;
 }
 
+SubjectsResult subjectsOf(Connection& connection, const std::string& stream,
+                          const std::string& filter, Connection::Milliseconds deadline) {
+    SubjectsResult result;
+    for (;;) {
+        const Json request = {{"subjects_filter", filter}, {"offset", result.subjects.size()}};
+        const ApiAnswer answer =
+            askStore(connection, "STREAM.INFO." + stream, request.dump(), deadline);
+        result.status = answer.status;
+        if (!answer.status.done()) return result;
+        const Json info = Json::parse(answer.json);
+        const Json subjects = info.value(Json::json_pointer("/state/subjects"), Json::object());
+        for (const auto& subject : subjects.items())
+            result.subjects.push_back(subject.key());
+        // Some go while they are listed; the next listing shows what came instead.
+        if (subjects.empty() || result.subjects.size() >= info.value("total", std::size_t{0})) {
+            return result;
+        }
+    }
+}
+
 }  // namespace fleet

@@ -9,7 +9,7 @@
 #include "fleet/bus/nats/connection.h"
 #include "fleet/link/core/actions.h"
 #include "fleet/link/judge.h"
-#include "fleet/link/program/worker.h"
+#include "fleet/loop/worker.h"
 
 namespace fleet {
 

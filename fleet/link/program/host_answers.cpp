@@ -36,12 +36,17 @@ json requestOf(const Directive& directive) {
     return directive.request.empty() ? json::object() : readDocument(directive.request);
 }
 
-json taskOf(const Directive& directive, const std::string& journal) {
-    json body = requestOf(directive);
+std::string taskOf(json body, const Directive& directive, const std::string& journal) {
     body["transid"] = directive.order;
     body["once"] = true;
     body["journal"] = journal;
-    return body;
+    return textOf(body);
+}
+
+std::string endOf(json body, const EnterEnd& action) {
+    constexpr std::size_t kLongestReason = 4096;
+    body[action.state] = action.reason.substr(0, kLongestReason);
+    return taskOf(std::move(body), action.directive, action.journal);
 }
 
 bool isOverState(const std::string& state) {
@@ -66,15 +71,22 @@ std::string wordsOf(const HostAnswer& answer) {
 }  // namespace
 
 std::string bodyOf(const HandOver& action) {
-    json body = taskOf(action.directive, action.journal);
+    json body = requestOf(action.directive);
     body["expires"] = utcTime(action.directive.expires);
-    return textOf(body);
+    return taskOf(std::move(body), action.directive, action.journal);
 }
 
 std::string bodyOf(const EnterEnd& action) {
-    json body = taskOf(action.directive, action.journal);
-    body[action.state] = action.reason;
-    return textOf(body);
+    const json request = requestOf(action.directive);
+    json known = json::object();
+    for (const char* const member : {"command", "product"}) {
+        if (request.contains(member)) known[member] = request[member];
+    }
+    return endOf(std::move(known), action);
+}
+
+std::string bareBodyOf(const EnterEnd& action) {
+    return endOf(json::object(), action);
 }
 
 std::optional<HandOverAnswer> recordedBy(const HostAnswer& answer) {

@@ -18,8 +18,10 @@ struct HostAnswer {
 /// The body of the POST /v1/tasks that hands an order over. The same order gives the same bytes
 /// each time, so that the host knows a repetition.
 std::string bodyOf(const HandOver& action);
-/// The one that records an order that never runs.
+/// The one that records an order that never runs. Of what it asked for it tells command and product
+/// only, or nothing: what a host refuses to read it refuses to record, too.
 std::string bodyOf(const EnterEnd& action);
+std::string bareBodyOf(const EnterEnd& action);
 
 /// What became of such a request; nothing if another task of this name may have been meant: then
 /// recordOf() tells, from the answer to GET /v1/tasks/{order}.

@@ -88,7 +88,12 @@ void HostSide::handOver(const HandOver& action, std::function<void(HandOverAnswe
 void HostSide::enter(const EnterEnd& action, std::function<void(HandOverAnswer)> answer) {
     worker_.add([this, action, answer = std::move(answer)] {
         try {
-            answer(post(action.directive.order, action.journal, bodyOf(action)));
+            const std::string& order = action.directive.order;
+            HandOverAnswer told = post(order, action.journal, bodyOf(action));
+            if (std::holds_alternative<Unacceptable>(told)) {
+                told = post(order, action.journal, bareBodyOf(action));
+            }
+            answer(std::move(told));
         } catch (const Ending&) {
         }
     });
@@ -209,6 +214,7 @@ void HostSide::followOnce(std::string& journal, std::string& position) {
     std::string target = "/v1/events?table=KAGDYST&tasks=1";
     if (!position.empty()) target += "&after=" + ctl::percentEncoded(position);
     ctl::EventStream stream(socket_, target, ctl::deadlineIn(kAnswerTime));
+    position = stream.position();
     // Only now: what ends after this look comes as an event.
     View there = view();
     if (there.journal != journal) return;

@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "fleet/link/program/host_answers.h"
-#include "fleet/link/program/worker.h"
+#include "fleet/loop/worker.h"
 
 namespace fleet {
 

@@ -62,7 +62,11 @@ std::string keyOf(const toml::node& value, const Place& place, KeyKind kind) {
 
 bool staysHere(const std::string& address) {
     for (const char* const host : {"nats://127.0.0.1:", "nats://localhost:", "nats://[::1]:"}) {
-        if (address.rfind(host, 0) == 0) return true;
+        const std::string_view start(host);
+        if (address.rfind(start, 0) != 0) continue;
+        // Nothing but a port: what stands before an "@" would be a password.
+        const std::string port = address.substr(start.size());
+        return !port.empty() && port.find_first_not_of("0123456789") == std::string::npos;
     }
     return false;
 }

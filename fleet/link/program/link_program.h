@@ -11,7 +11,7 @@
 #include "fleet/link/program/host_side.h"
 #include "fleet/link/program/link_configuration.h"
 #include "fleet/link/program/link_file.h"
-#include "fleet/link/program/mailbox.h"
+#include "fleet/loop/mailbox.h"
 
 namespace fleet {
 

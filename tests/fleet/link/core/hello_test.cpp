@@ -79,6 +79,7 @@ TEST(Hello, OneThatNobodyHearsIsSaidAgainEverLater) {
         EXPECT_EQ(pauseAfterUnheard(driver), Moment(1'000 * seconds));
     }
     driver.note(driver.link().replied(replyTo(driver, 0, 0), driver.now));
+    driver.forget();
     driver.waitFor<SayHello>();
     EXPECT_EQ(pauseAfterUnheard(driver), Moment(2'000)) << "a reply ends the impatience";
 }

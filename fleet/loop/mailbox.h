@@ -20,9 +20,20 @@ public:
     void put(Letter letter) {
         {
             const std::lock_guard lock(mutex_);
+            if (isClosed_) return;
             letters_.push_back(std::move(letter));
         }
         changed_.notify_one();
+    }
+
+    /// Drops what is in it, and all that is put in from now on.
+    void close() {
+        std::deque<Letter> dropped;
+        {
+            const std::lock_guard lock(mutex_);
+            isClosed_ = true;
+            dropped.swap(letters_);
+        }
     }
 
     /// The next one; nothing if none has come by then.
@@ -40,6 +51,7 @@ private:
     std::mutex mutex_;
     std::condition_variable changed_;
     std::deque<Letter> letters_;
+    bool isClosed_ = false;
 };
 
 }  // namespace fleet

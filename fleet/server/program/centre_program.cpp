@@ -1,0 +1,358 @@
+#include "fleet/server/program/centre_program.h"
+
+#include <algorithm>
+#include <exception>
+#include <utility>
+
+#include "fleet/bus/messages/document.h"
+#include "fleet/bus/messages/hello_bytes.h"
+#include "fleet/bus/messages/numbered_order.h"
+#include "fleet/bus/messages/order.h"
+#include "fleet/log/log.h"
+#include "sqlite/transaction.h"
+
+namespace fleet {
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+using Steady = std::chrono::steady_clock;
+
+constexpr seconds kAnswerTime{5};
+constexpr seconds kPause{1};
+/// Letters that share one transaction, and orders that are published between two looks at them.
+constexpr std::size_t kMostAtOnce = 256;
+/// Hellos that wait; those beyond are said again.
+constexpr int kMostHellos = 20'000;
+constexpr char kHelloSubject[] = "hello.";
+constexpr char kTaskSubjects[] = "task.>";
+constexpr char kLeaseSubject[] = "$KV.CENTRE.lease";
+
+Moment now() {
+    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+}
+
+/// Host and number in "task.HOST.NUMBER"; nothing if it is no such subject.
+std::optional<std::pair<std::string, Number>> placeOf(const std::string& subject) {
+    const std::size_t first = subject.find('.');
+    const std::size_t last = subject.rfind('.');
+    if (first == std::string::npos || first == last) return std::nullopt;
+    const std::string host = subject.substr(first + 1, last - first - 1);
+    const std::string digits = subject.substr(last + 1);
+    constexpr std::size_t kMostDigits = 16;
+    if (digits.empty() || digits.size() > kMostDigits ||
+        digits.find_first_not_of("0123456789") != std::string::npos) {
+        return std::nullopt;
+    }
+    return std::pair{host, std::stoull(digits)};
+}
+
+}  // namespace
+
+CentreProgram::CentreProgram(CentreSettings settings)
+    : settings_(std::move(settings)),
+      database_(settings_.directory),
+      store_(database_.connection()) {}
+
+CentreProgram::~CentreProgram() = default;
+
+void CentreProgram::end() {
+    isEnding_ = true;
+    mailbox_.put([this] {
+        if (!end_) end_ = End::Asked;
+    });
+}
+
+CentreProgram::End CentreProgram::run() {
+    try {
+        connect();
+        if (!isEnding_ && claim() && beginWork()) loop();
+    } catch (...) {
+        finish();
+        throw;
+    }
+    finish();
+    return end_.value_or(End::Asked);
+}
+
+void CentreProgram::finish() {
+    isWorking_ = false;
+    // Who waits for an answer to a letter is told that none comes.
+    mailbox_.close();
+    afterCommit_.clear();
+    // Each of them uses what stands before it.
+    if (sweeper_) sweeper_->await();
+    if (renewer_) renewer_->await();
+    hellos_.reset();
+    outcomes_.reset();
+    if (lease_ && end_ != End::LeaseLost) lease_->release();
+    if (connection_) connection_->close(kAnswerTime);
+}
+
+void CentreProgram::connect() {
+    std::string last;
+    ConnectionOptions options = settings_.bus;
+    options.events.error = [](const std::string& what) {
+        say(Priority::Warning, "the bus: " + what);
+    };
+    options.events.closed = [this](const std::string& why) {
+        if (!isEnding_) say(Priority::Error, "the bus refuses this centre: " + why);
+        end();
+    };
+    while (!isEnding_) {
+        Connection::Result result = Connection::connect(options);
+        if (result.connection) {
+            connection_ = std::move(result.connection);
+            return;
+        }
+        if (std::exchange(last, result.text) != result.text) {
+            say(Priority::Warning, "no connection to the bus: " + result.text);
+        }
+        std::this_thread::sleep_for(milliseconds(500));
+    }
+}
+
+bool CentreProgram::ensureStreams() {
+    for (const StreamSettings& stream :
+         {tasksStream(settings_.limits), outStream(settings_.limits), hostsStream(settings_.limits),
+          centreStream(settings_.limits)}) {
+        const EnsureResult ensured = ensureStream(*connection_, stream, kAnswerTime);
+        if (!ensured.status.done()) {
+            say(Priority::Warning, "stream " + stream.name + ": " + ensured.status.text);
+            return false;
+        }
+        if (ensured.made) say(Priority::Notice, "made the stream " + stream.name);
+        for (const std::string& difference : ensured.differences)
+            say(Priority::Warning, "stream " + stream.name + ": " + difference);
+    }
+    return true;
+}
+
+/// Waits until this centre may work. False if it is to end before.
+bool CentreProgram::claim() {
+    std::string last;
+    lease_ = std::make_unique<Lease>(*connection_,
+                                     Lease::Settings{kCentreStream, kLeaseSubject, settings_.holder,
+                                                     settings_.leaseTerm, kAnswerTime});
+    while (!isEnding_) {
+        const auto asked = Steady::now();
+        if (ensureStreams()) {
+            const Lease::State state = lease_->claim();
+            if (state.kind == Lease::State::Kind::Ours) {
+                leaseUntil_ = (asked + settings_.leaseTerm).time_since_epoch().count();
+                return true;
+            }
+            if (std::exchange(last, state.text) != state.text) {
+                say(Priority::Notice, "waiting for the lease: " + state.text);
+            }
+        }
+        std::this_thread::sleep_for(std::min<milliseconds>(kPause, settings_.leaseTerm / 3));
+    }
+    return false;
+}
+
+void CentreProgram::renewLease() {
+    while (renewer_->pause(settings_.leaseTerm / 3)) {
+        const auto asked = Steady::now();
+        const Lease::State state = lease_->renew();
+        if (state.kind != Lease::State::Kind::Ours) {
+            mailbox_.put([this, text = state.text] {
+                say(Priority::Error, "the lease is lost: " + text);
+                if (!end_) end_ = End::LeaseLost;
+            });
+            return;
+        }
+        leaseUntil_ = (asked + settings_.leaseTerm).time_since_epoch().count();
+    }
+}
+
+bool CentreProgram::beginWork() {
+    bus_ = std::make_unique<NatsCentreBus>(
+        *connection_, [this] { return Steady::now().time_since_epoch().count() < leaseUntil_; });
+    centre_ = std::make_unique<Centre>(store_, *bus_, settings_.alarm);
+    Connection::Subscribed made = connection_->subscribe(
+        std::string(kHelloSubject) + '*', [this](const BusMessage& message) { takeHello(message); },
+        kAnswerTime);
+    hellos_ = std::move(made.subscription);
+    if (!hellos_) {
+        say(Priority::Error, "hellos cannot be heard: " + made.status.text);
+        return false;
+    }
+    outcomes_ = std::make_unique<OutcomeFeed>(
+        *connection_, [this](const auto& told) { return takeOutcomes(told); });
+    renewer_ = std::make_unique<Worker>();
+    renewer_->add([this] { renewLease(); });
+    sweeper_ = std::make_unique<Worker>();
+    sweeper_->add([this] { sweep(); });
+    isWorking_ = true;
+    say(Priority::Info, "the centre works");
+    return true;
+}
+
+void CentreProgram::loop() {
+    auto nextWork = Steady::now();
+    while (!end_) {
+        std::optional<Mailbox::Letter> letter = mailbox_.take(nextWork);
+        if (letter) {
+            readLetters(std::move(*letter));
+        } else if (Steady::now() < nextWork) {
+            continue;
+        }
+        if (end_) return;
+        nextWork = Steady::now() + (workOnBus() ? milliseconds(0) : milliseconds(kPause));
+    }
+}
+
+/// Those that wait already share the transaction. What they let others know is told when it is
+/// durable.
+void CentreProgram::readLetters(Mailbox::Letter first) {
+    sqlite::Transaction batch(database_.connection());
+    first();
+    for (std::size_t i = 1; i < kMostAtOnce && !end_; ++i) {
+        const std::optional<Mailbox::Letter> next = mailbox_.take(Mailbox::Clock::time_point());
+        if (!next) break;
+        (*next)();
+    }
+    batch.commit();
+    for (const auto& tell : std::exchange(afterCommit_, {}))
+        tell();
+}
+
+/// Notes of what was published share a transaction, too: what is published and not noted is found
+/// on the bus when it is published again. Returns whether there is more to do at once.
+bool CentreProgram::workOnBus() {
+    sqlite::Transaction batch(database_.connection());
+    const bool isMore = centre_->work(kMostAtOnce);
+    batch.commit();
+    return isMore;
+}
+
+/// On a thread of the bus.
+void CentreProgram::takeHello(const BusMessage& message) {
+    const std::string host = message.subject.substr(sizeof kHelloSubject - 1);
+    if (!helloLimit_.admits(host, Steady::now())) return;
+    if (waitingHellos_ >= kMostHellos || message.reply.empty()) return;
+    ++waitingHellos_;
+    mailbox_.put([this, host, reply = message.reply, bytes = message.data] {
+        --waitingHellos_;
+        answerHello(host, reply, bytes);
+    });
+}
+
+void CentreProgram::answerHello(const std::string& host, const std::string& reply,
+                                const std::string& bytes) {
+    const std::optional<HostRecord> record = store_.host(host);
+    if (!record) return;
+    try {
+        const Hello hello = readHello(bytes, host, record->signing);
+        std::optional<Reply> answer = centre_->greet(host, hello, now());
+        if (!answer) return;
+        if (settings_.revoked) answer->revoked = settings_.revoked();
+        noteNews(host, hello, now());
+        afterCommit_.push_back([this, reply, text = signReply(host, *answer, settings_.key)] {
+            static_cast<void>(connection_->publish(reply, text));
+        });
+    } catch (const MessageError& error) {
+        say(Priority::Warning, "a hello in the name of " + record->name + ": " + error.what());
+    }
+}
+
+void CentreProgram::noteNews(const std::string& host, const Hello& hello, Moment at) {
+    HostNews& news = news_[host];
+    news.heard = at;
+    news.taken = hello.taken;
+    news.blocked = hello.blocked;
+    news.journalNow = hello.journalNow;
+    news.skew = hello.time - at;
+}
+
+/// On the feed's thread. One that is not its host's own counts for nothing, and is done with.
+bool CentreProgram::takeOutcomes(const std::vector<OutcomeFeed::Told>& told) {
+    auto taken = ask([told](Parts& parts) {
+        for (const OutcomeFeed::Told& one : told) {
+            const std::optional<HostRecord> record = parts.store.host(one.host);
+            if (!record) continue;
+            try {
+                parts.centre.hear(readOutcome(one.bytes, one.host, record->signing));
+            } catch (const MessageError& error) {
+                say(Priority::Warning,
+                    "an outcome in the name of " + record->name + ": " + error.what());
+            }
+        }
+        return true;
+    });
+    try {
+        return taken.get();
+    } catch (const std::future_error&) {
+        return false;  // it ends
+    } catch (const std::exception& error) {
+        say(Priority::Error, std::string("outcomes not kept: ") + error.what());
+        return false;
+    }
+}
+
+std::future<std::optional<Number>> CentreProgram::submit(std::string orderBytes) {
+    return ask([this, bytes = std::move(orderBytes)](Parts& parts) {
+        const SignedOrder read = readOrder(bytes);
+        const std::string host = read.order.host;
+        const std::string order = read.order.id;
+        return parts.centre.submit(host, order, [&](Number number) {
+            return signNumber(host, number, order, bytes, settings_.key);
+        });
+    });
+}
+
+std::future<std::map<std::string, HostNews>> CentreProgram::news() {
+    return ask([this](Parts&) { return news_; });
+}
+
+/// On the sweeper's thread: makes streams that the bus has lost, and looks for orders that are
+/// over, and for such as the database does not know.
+void CentreProgram::sweep() {
+    do {
+        ensureStreams();
+        const SubjectsResult found =
+            subjectsOf(*connection_, kTasksStream, kTaskSubjects, kAnswerTime);
+        if (!found.status.done()) {
+            say(Priority::Warning, "the orders on the bus cannot be listed: " + found.status.text);
+        }
+        for (const std::string& subject : found.subjects) {
+            // Each waits for its turn, so that nobody waits for all of them.
+            try {
+                ask([this, subject](Parts&) {
+                    checkOnBus(subject);
+                    return true;
+                }).get();
+            } catch (const std::future_error&) {
+                return;
+            } catch (const std::exception& error) {
+                say(Priority::Warning, "order at " + subject + ": " + error.what());
+            }
+        }
+    } while (sweeper_->pause(settings_.sweepTime));
+}
+
+void CentreProgram::checkOnBus(const std::string& subject) {
+    const auto place = placeOf(subject);
+    if (!place) return;
+    const auto& [host, number] = *place;
+    if (const std::optional<OrderRecord> known = store_.orderAt(host, number)) {
+        if (known->outcome) centre_->foundOnBus(*known);
+        return;
+    }
+    const FetchAnswer answer = bus_->fetch(host, number);
+    const auto* const stored = std::get_if<StoredOrder>(&answer);
+    if (stored == nullptr) return;
+    // Only what this centre has signed itself is adopted.
+    const std::optional<NumberedOrder> numbered =
+        readNumber(stored->bytes, host, number, settings_.key.publicKey());
+    if (!numbered) return;
+    OrderRecord order;
+    order.host = host;
+    order.number = number;
+    order.order = numbered->order;
+    order.bytes = stored->bytes;
+    centre_->foundOnBus(order);
+}
+
+}  // namespace fleet

@@ -1,0 +1,71 @@
+#include "fleet/server/program/outcome_feed.h"
+
+#include <chrono>
+#include <memory>
+#include <utility>
+
+#include "fleet/bus/nats/streams.h"
+#include "fleet/log/log.h"
+
+namespace fleet {
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+
+constexpr seconds kAnswerTime{5};
+/// How long the bus waits for the first message of a batch; also how long an end takes.
+constexpr seconds kPatience{1};
+constexpr int kBatch = 256;
+constexpr char kSubject[] = "out.";
+
+}  // namespace
+
+OutcomeFeed::OutcomeFeed(Connection& connection, Take take)
+    : connection_(connection), take_(std::move(take)), thread_([this] { work(); }) {}
+
+OutcomeFeed::~OutcomeFeed() {
+    isEnding_ = true;
+    thread_.join();
+}
+
+/// Null at the end.
+std::unique_ptr<Pull> OutcomeFeed::opened() {
+    std::string last;
+    while (!isEnding_) {
+        Pull::Result result =
+            Pull::open(connection_, {kOutStream, "centre", seconds(30), 1000}, kAnswerTime);
+        if (result.pull) return std::move(result.pull);
+        if (std::exchange(last, result.status.text) != result.status.text) {
+            say(Priority::Warning, "outcomes cannot be taken from the bus: " + result.status.text);
+        }
+        std::this_thread::sleep_for(milliseconds(200));
+    }
+    return nullptr;
+}
+
+void OutcomeFeed::work() {
+    std::unique_ptr<Pull> pull;
+    while (!isEnding_) {
+        if (!pull) pull = opened();
+        if (!pull) return;
+        const Pull::Batch batch = pull->fetch(kBatch, kPatience, kAnswerTime);
+        if (!batch.messages.empty()) handOn(*pull, batch.messages);
+        // A bus that has lost its disk has lost the consumer, too.
+        if (!batch.status.done()) pull.reset();
+    }
+}
+
+void OutcomeFeed::handOn(Pull& pull, const std::vector<Pull::Taken>& messages) {
+    std::vector<Told> told;
+    for (const Pull::Taken& message : messages) {
+        if (message.subject.rfind(kSubject, 0) != 0) continue;
+        told.push_back({message.subject.substr(sizeof kSubject - 1), message.bytes});
+    }
+    const bool isTaken = take_(std::move(told));
+    for (const Pull::Taken& message : messages) {
+        static_cast<void>(isTaken ? pull.acknowledge(message) : pull.refuse(message));
+    }
+}
+
+}  // namespace fleet
