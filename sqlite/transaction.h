@@ -5,22 +5,21 @@
 
 namespace sqlite {
 
-/// Its connection outlives it. One that begins while another is open belongs to that: it can be
-/// taken back alone, and what it commits counts when the outer one commits. They end in the reverse
-/// order of their beginnings.
+/// Inside another one it is a part of that: it can be taken back alone, and is durable with the
+/// outermost. The connection outlives it.
 class Transaction {
 public:
     /// Begins to write. Throws DatabaseError.
     explicit Transaction(Database& database)
-        : database_(database), isInner_(database.inTransaction()) {
-        database_.run(isInner_ ? "SAVEPOINT inner" : "BEGIN IMMEDIATE");
+        : database_(database), isPart_(database.inTransaction()) {
+        database_.run(isPart_ ? "SAVEPOINT part" : "BEGIN IMMEDIATE");
     }
     ~Transaction() {
         if (isCommitted_) return;
         try {
             // A failure may have ended it before.
             if (!database_.inTransaction()) return;
-            database_.run(isInner_ ? "ROLLBACK TO inner; RELEASE inner" : "ROLLBACK");
+            database_.run(isPart_ ? "ROLLBACK TO part; RELEASE part" : "ROLLBACK");
         } catch (const DatabaseError&) {
             // The connection's end takes it back.
         }
@@ -30,13 +29,13 @@ public:
 
     /// Throws DatabaseError; then nothing of the transaction happened.
     void commit() {
-        database_.run(isInner_ ? "RELEASE inner" : "COMMIT");
+        database_.run(isPart_ ? "RELEASE part" : "COMMIT");
         isCommitted_ = true;
     }
 
 private:
     Database& database_;
-    const bool isInner_;
+    const bool isPart_;
     bool isCommitted_ = false;
 };
 
