@@ -5,15 +5,6 @@
 #include "fleet/server/rollouts/end_states.h"
 
 namespace fleet {
-namespace {
-
-void pauseBecause(Rollout& rollout, PauseCause cause, const std::string& reason) {
-    rollout.state = RolloutState::Paused;
-    rollout.cause = cause;
-    rollout.reason = reason;
-}
-
-}  // namespace
 
 bool RolloutPace::step(Moment now) {
     bool isMore = releaseCancels();
@@ -33,7 +24,7 @@ bool RolloutPace::stepOf(const Rollout& known, Moment now) {
 }
 
 bool RolloutPace::stepOn(Rollout& rollout, Moment now) {
-    if (pauseForFailures(rollout)) return false;
+    if (pauseForFailures(rollout, now)) return false;
     const bool isBetweenWaves = rollout.wave == 0 || rollout.waveEnd.has_value();
     if (isBetweenWaves && !beginNextWave(rollout, now)) return false;
     const bool isMore = release(rollout, now);
@@ -42,13 +33,13 @@ bool RolloutPace::stepOn(Rollout& rollout, Moment now) {
 }
 
 /// When everything has been released there is nothing left to hold back.
-bool RolloutPace::pauseForFailures(Rollout& rollout) {
+bool RolloutPace::pauseForFailures(Rollout& rollout, Moment now) {
     const std::size_t most = rollout.mostFailures;
     if (!store_.hasMoreFailures(rollout.row, most)) return false;
     if (!store_.hasWaiting(rollout.row)) return false;
-    pauseBecause(rollout, PauseCause::Failures,
-                 "more than " + std::to_string(most) + " of " + std::to_string(rollout.hosts) +
-                     " hosts failed");
+    enterState(rollout, RolloutState::Paused, now, PauseCause::Failures,
+               "more than " + std::to_string(most) + " of " + std::to_string(rollout.hosts) +
+                   " hosts failed");
     store_.keep(rollout);
     return true;
 }
@@ -73,9 +64,9 @@ bool RolloutPace::release(Rollout& rollout, Moment now) {
     const std::vector<Part> parts = store_.waiting(rollout.row, rollout.wave, most);
     for (const Part& part : parts) {
         if (part.expires <= now) {
-            pauseBecause(rollout, PauseCause::Expiry,
-                         "orders have expired before they were released, that of host " +
-                             part.host + " among them; they must be signed anew");
+            enterState(rollout, RolloutState::Paused, now, PauseCause::Expiry,
+                       "orders have expired before they were released, that of host " + part.host +
+                           " among them; they must be signed anew");
             store_.keep(rollout);
             return false;
         }
@@ -108,7 +99,7 @@ bool RolloutPace::endWave(Rollout& rollout, Moment now) {
         store_.postponeWaiting(rollout.row, rollout.wave);
         rollout.waves = std::max(rollout.waves, rollout.wave + 1);
     }
-    if (rollout.wave == rollout.waves) rollout.state = RolloutState::Finished;
+    if (rollout.wave == rollout.waves) enterState(rollout, RolloutState::Finished, now);
     store_.keep(rollout);
     return rollout.state == RolloutState::Running && rollout.plan.pause == Moment{};
 }

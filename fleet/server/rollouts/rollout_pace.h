@@ -34,7 +34,7 @@ public:
 private:
     bool stepOf(const Rollout& known, Moment now);
     bool stepOn(Rollout& rollout, Moment now);
-    bool pauseForFailures(Rollout& rollout);
+    bool pauseForFailures(Rollout& rollout, Moment now);
     bool beginNextWave(Rollout& rollout, Moment now);
     bool release(Rollout& rollout, Moment now);
     void releasePart(Part part);

@@ -62,11 +62,20 @@ struct Rollout {
     RolloutState state = RolloutState::Running;
     PauseCause cause = PauseCause::None;
     std::string reason;             ///< why it is paused or aborted, for people
+    Moment since{};                 ///< when it came into this state
     std::size_t waves = 0;          ///< how many there are
     std::size_t wave = 0;           ///< the latest one that was released, from 1; 0: none yet
     Moment began{};                 ///< when that was; anew when the wave goes on after a pause
     std::optional<Moment> waveEnd;  ///< when that wave ended
 };
+
+inline void enterState(Rollout& rollout, RolloutState state, Moment now,
+                       PauseCause cause = PauseCause::None, const std::string& reason = "") {
+    rollout.state = state;
+    rollout.cause = cause;
+    rollout.reason = reason;
+    rollout.since = now;
+}
 
 /// The numbers are those of the database.
 enum class PartState {

@@ -45,7 +45,7 @@ Rollout draftOf(const NewRollout& wanted, const IncomingOrder& first, std::size_
     rollout.kind = first.kind;
     rollout.product = first.product;
     rollout.selector = first.selector;
-    rollout.created = now;
+    rollout.created = rollout.since = now;
     rollout.plan = wanted.plan;
     rollout.hosts = hosts;
     rollout.mostFailures = Share(wanted.plan.maxFailures).atMost(hosts);
@@ -122,15 +122,14 @@ void Rollouts::insistOnNewOrder(const IncomingOrder& order) const {
                "the order for host " + order.host + " was handed over before");
 }
 
-void Rollouts::pause(const std::string& id, const RolloutOperator& by) {
+void Rollouts::pause(const std::string& id, const RolloutOperator& by, Moment now) {
     checkOperator(by);
     store_.atomically([&] {
         Rollout rollout = find(id);
         insistOnState(rollout.state == RolloutState::Running,
                       std::string("the roll-out is ") + nameOf(rollout.state) + ", not running");
-        rollout.state = RolloutState::Paused;
-        rollout.cause = PauseCause::Operator;
-        rollout.reason = "paused by " + by.name;
+        enterState(rollout, RolloutState::Paused, now, PauseCause::Operator,
+                   "paused by " + by.name);
         store_.keep(rollout);
     });
 }
@@ -153,9 +152,7 @@ void Rollouts::resume(const std::string& id, const RolloutOperator& by,
         }
         insistThatNoneExpired(rollout, now);
         if (rollout.cause == PauseCause::Failures) store_.forgiveFailures(rollout.row);
-        rollout.state = RolloutState::Running;
-        rollout.cause = PauseCause::None;
-        rollout.reason.clear();
+        enterState(rollout, RolloutState::Running, now);
         // What a wave may take does not pass while nothing is released.
         rollout.began = now;
         store_.keep(rollout);
@@ -202,20 +199,18 @@ void Rollouts::abort(const std::string& id, const RolloutOperator& by,
         if (rollout.state == RolloutState::Aborted) {
             insistOnState(!incoming.empty(), "the roll-out has been aborted already");
         } else {
-            endAsAborted(rollout, by);
+            endAsAborted(rollout, by, now);
         }
         for (const IncomingOrder& cancel : incoming)
             keepCancel(rollout, cancel);
     });
 }
 
-void Rollouts::endAsAborted(Rollout& rollout, const RolloutOperator& by) {
+void Rollouts::endAsAborted(Rollout& rollout, const RolloutOperator& by, Moment now) {
     insistOnState(rollout.state != RolloutState::Finished || store_.hasReleased(rollout.row),
                   "the roll-out has finished, and no host has its order any more");
     store_.cancelWaiting(rollout.row, "the roll-out was aborted before its turn came");
-    rollout.state = RolloutState::Aborted;
-    rollout.cause = PauseCause::None;
-    rollout.reason = "aborted by " + by.name;
+    enterState(rollout, RolloutState::Aborted, now, PauseCause::None, "aborted by " + by.name);
     store_.keep(rollout);
 }
 
@@ -256,7 +251,7 @@ void Rollouts::retryFailed(const std::string& id, const RolloutOperator& by,
             replaceOrder(part, order);
         }
         if (rollout.state == RolloutState::Finished) {
-            rollout.state = RolloutState::Running;
+            enterState(rollout, RolloutState::Running, now);
             // The others that failed are no reason to hold these back: it went on in spite of them.
             store_.forgiveFailures(rollout.row);
         }
@@ -272,12 +267,11 @@ bool Rollouts::tick(Moment now) {
     return pace_.step(now);
 }
 
-void Rollouts::restored() {
+void Rollouts::restored(Moment now) {
     store_.atomically([&] {
         for (Rollout& rollout : store_.running()) {
-            rollout.state = RolloutState::Paused;
-            rollout.cause = PauseCause::Restore;
-            rollout.reason = "the database was put back from a backup";
+            enterState(rollout, RolloutState::Paused, now, PauseCause::Restore,
+                       "the database was put back from a backup");
             store_.keep(rollout);
         }
     });

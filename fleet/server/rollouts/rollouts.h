@@ -47,7 +47,7 @@ public:
     std::string create(const NewRollout& wanted, Moment now);
 
     /// Nothing more is released. What was released goes on.
-    void pause(const std::string& id, const RolloutOperator& by);
+    void pause(const std::string& id, const RolloutOperator& by, Moment now);
 
     /// Goes on with a roll-out that is paused. `orders` replace those of hosts that still wait, and
     /// must do so for all that have expired: see toSignAnew(). Failures that have paused it are
@@ -73,7 +73,7 @@ public:
 
     /// The end of a restore: the database may have forgotten that a roll-out was paused or aborted.
     /// So all that run are paused.
-    void restored();
+    void restored(Moment now);
 
     // What resume(), abort() and retryFailed() want orders for. It changes while hosts tell.
     std::vector<HostToSign> toSignAnew(const std::string& id, Moment now) const;
@@ -98,7 +98,7 @@ private:
     void replaceOrder(Part part, const IncomingOrder& order);
     Part partFor(const Rollout& rollout, const IncomingOrder& order) const;
     void insistThatNoneExpired(const Rollout& rollout, Moment now) const;
-    void endAsAborted(Rollout& rollout, const RolloutOperator& by);
+    void endAsAborted(Rollout& rollout, const RolloutOperator& by, Moment now);
     void keepCancel(const Rollout& rollout, const IncomingOrder& order);
 
     RolloutStore& store_;

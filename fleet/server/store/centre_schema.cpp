@@ -49,8 +49,8 @@ CREATE TABLE rollouts (
     created INTEGER NOT NULL, plan_waves BLOB NOT NULL, plan_failures BLOB NOT NULL,
     pause INTEGER NOT NULL, wait INTEGER, parallel INTEGER, hosts INTEGER NOT NULL,
     most_failures INTEGER NOT NULL, state INTEGER NOT NULL, cause INTEGER NOT NULL,
-    reason BLOB NOT NULL, waves INTEGER NOT NULL, wave INTEGER NOT NULL, began INTEGER NOT NULL,
-    wave_end INTEGER);
+    reason BLOB NOT NULL, since INTEGER NOT NULL, waves INTEGER NOT NULL, wave INTEGER NOT NULL,
+    began INTEGER NOT NULL, wave_end INTEGER);
 CREATE INDEX rollouts_running ON rollouts (id) WHERE state = 0;
 CREATE TABLE rollout_parts (
     rollout INTEGER NOT NULL, place INTEGER NOT NULL, host INTEGER NOT NULL, wave INTEGER NOT NULL,

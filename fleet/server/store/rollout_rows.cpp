@@ -21,10 +21,11 @@ Rollout rolloutIn(const sqlite::Statement& row) {
     rollout.state = static_cast<RolloutState>(row.integer(15));
     rollout.cause = static_cast<PauseCause>(row.integer(16));
     rollout.reason = row.bytes(17);
-    rollout.waves = static_cast<std::size_t>(row.integer(18));
-    rollout.wave = static_cast<std::size_t>(row.integer(19));
-    rollout.began = Moment(row.integer(20));
-    if (!row.isNull(21)) rollout.waveEnd = Moment(row.integer(21));
+    rollout.since = Moment(row.integer(18));
+    rollout.waves = static_cast<std::size_t>(row.integer(19));
+    rollout.wave = static_cast<std::size_t>(row.integer(20));
+    rollout.began = Moment(row.integer(21));
+    if (!row.isNull(22)) rollout.waveEnd = Moment(row.integer(22));
     return rollout;
 }
 

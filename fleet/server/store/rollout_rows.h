@@ -22,24 +22,24 @@ inline constexpr const char* kKnowsOrder =
 inline constexpr const char* kAddRollout =
     "INSERT INTO rollouts (name, operator, operator_key, kind, product, selector, created,"
     " plan_waves, plan_failures, pause, wait, parallel, hosts, most_failures, state, cause, reason,"
-    " waves, wave, began, wave_end)"
-    " VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)";
+    " since, waves, wave, began, wave_end)"
+    " VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)";
 inline constexpr const char* kRolloutByName =
     "SELECT id, name, operator, operator_key, kind, product, selector, created, plan_waves,"
-    " plan_failures, pause, wait, parallel, hosts, most_failures, state, cause, reason, waves,"
-    " wave, began, wave_end FROM rollouts WHERE name = ?";
+    " plan_failures, pause, wait, parallel, hosts, most_failures, state, cause, reason, since,"
+    " waves, wave, began, wave_end FROM rollouts WHERE name = ?";
 inline constexpr const char* kRolloutsBefore =
     "SELECT id, name, operator, operator_key, kind, product, selector, created, plan_waves,"
-    " plan_failures, pause, wait, parallel, hosts, most_failures, state, cause, reason, waves,"
-    " wave, began, wave_end FROM rollouts WHERE id < ? ORDER BY id DESC LIMIT ?";
+    " plan_failures, pause, wait, parallel, hosts, most_failures, state, cause, reason, since,"
+    " waves, wave, began, wave_end FROM rollouts WHERE id < ? ORDER BY id DESC LIMIT ?";
 inline constexpr const char* kRolloutsRunning =
     "SELECT id, name, operator, operator_key, kind, product, selector, created, plan_waves,"
-    " plan_failures, pause, wait, parallel, hosts, most_failures, state, cause, reason, waves,"
-    " wave, began, wave_end FROM rollouts INDEXED BY rollouts_running"
+    " plan_failures, pause, wait, parallel, hosts, most_failures, state, cause, reason, since,"
+    " waves, wave, began, wave_end FROM rollouts INDEXED BY rollouts_running"
     " WHERE id > 0 AND state = 0 ORDER BY id";
 inline constexpr const char* kKeepRollout =
-    "UPDATE rollouts SET state = ?, cause = ?, reason = ?, waves = ?, wave = ?, began = ?,"
-    " wave_end = ? WHERE id = ?";
+    "UPDATE rollouts SET state = ?, cause = ?, reason = ?, since = ?, waves = ?, wave = ?,"
+    " began = ?, wave_end = ? WHERE id = ?";
 
 // Parts. CROSS JOIN fixes which table comes first.
 inline constexpr const char* kAddPart =

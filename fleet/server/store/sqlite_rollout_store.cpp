@@ -79,8 +79,8 @@ void SqliteRolloutStore::add(Rollout& rollout) {
                      asInteger(rollout.plan.wait), asInteger(rollout.plan.parallel),
                      asInteger(rollout.hosts), asInteger(rollout.mostFailures),
                      static_cast<int>(rollout.state), static_cast<int>(rollout.cause),
-                     rollout.reason, asInteger(rollout.waves), asInteger(rollout.wave),
-                     asInteger(rollout.began), asInteger(rollout.waveEnd));
+                     rollout.reason, asInteger(rollout.since), asInteger(rollout.waves),
+                     asInteger(rollout.wave), asInteger(rollout.began), asInteger(rollout.waveEnd));
     rollout.row = database_.lastInserted();
 }
 
@@ -108,8 +108,9 @@ std::vector<Rollout> SqliteRolloutStore::running() const {
 
 void SqliteRolloutStore::keep(const Rollout& rollout) {
     database_.change(kKeepRollout, static_cast<int>(rollout.state), static_cast<int>(rollout.cause),
-                     rollout.reason, asInteger(rollout.waves), asInteger(rollout.wave),
-                     asInteger(rollout.began), asInteger(rollout.waveEnd), rollout.row);
+                     rollout.reason, asInteger(rollout.since), asInteger(rollout.waves),
+                     asInteger(rollout.wave), asInteger(rollout.began), asInteger(rollout.waveEnd),
+                     rollout.row);
 }
 
 std::optional<Part> SqliteRolloutStore::part(std::int64_t row, const std::string& host) const {

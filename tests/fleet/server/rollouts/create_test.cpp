@@ -33,6 +33,7 @@ TEST_F(NewRolloutTest, KeepsWhatItsOrdersSayAndReleasesNothing) {
     EXPECT_EQ(made.product, "ux");
     EXPECT_EQ(made.selector, "env=test");
     EXPECT_EQ(made.created, now_);
+    EXPECT_EQ(made.since, now_);
     EXPECT_EQ(made.plan.waves, "1,50%");
     EXPECT_EQ(made.plan.maxFailures, "20%");
     EXPECT_EQ(made.plan.pause, kMinute);
@@ -198,7 +199,7 @@ TEST_F(NewRolloutTest, IsFoundByItsIdentifierOnly) {
         expectRefusal(RolloutError::Kind::NotFound, "there is no such roll-out", call);
     };
     expectMissing([&] { rollouts_->show("x", now_); });
-    expectMissing([&] { rollouts_->pause("x", by()); });
+    expectMissing([&] { rollouts_->pause("x", by(), now_); });
     expectMissing([&] { rollouts_->resume("x", by(), {}, now_); });
     expectMissing([&] { rollouts_->abort("x", by(), {}, now_); });
     expectMissing([&] { rollouts_->retryFailed("x", by(), orders({"h00"}), false, now_); });

@@ -13,7 +13,7 @@ protected:
     void expectInvalid(const std::string& words, const std::function<void()>& call) {
         expectRefusal(RolloutError::Kind::Invalid, words, call);
     }
-    void pause() { rollouts_->pause(id_, by()); }
+    void pause() { rollouts_->pause(id_, by(), now_); }
     void resume(const Names& fresh = {}) { rollouts_->resume(id_, by(), fresh, now_); }
     void abort(const Names& cancels = {}) { rollouts_->abort(id_, by(), cancels, now_); }
     void retry(const Names& fresh, bool isForced = false) {
@@ -41,6 +41,7 @@ TEST_F(RolloutPause, HoldsBackWhatWasNotReleased) {
     EXPECT_EQ(view().rollout.reason, "paused by anna");
     end("h00", "done");
     tickAfter(kHour);
+    EXPECT_EQ(view().rollout.since, now_ - kHour);
     EXPECT_EQ(hostsThatAre("done"), (Names{"h00"}));
     EXPECT_EQ(hostsThatAre("released"), (Names{"h01"}));
     EXPECT_EQ(hostsThatAre("waiting"), (Names{"h02", "h03"}));
@@ -64,7 +65,7 @@ TEST_F(RolloutPause, ComesWithARestore) {
     const std::string first = create(1);
     pause();
     create(1);
-    rollouts_->restored();
+    rollouts_->restored(now_);
     EXPECT_EQ(state(), RolloutState::Paused);
     EXPECT_EQ(cause(), PauseCause::Restore);
     tick();

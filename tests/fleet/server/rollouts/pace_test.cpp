@@ -133,6 +133,7 @@ TEST_F(RolloutPaceTest, GoesOnWithAsManyFailuresAsArePlanned) {
     EXPECT_EQ(view().rollout.reason, "more than 2 of 4 hosts failed");
     EXPECT_EQ(hostsThatAre("waiting"), (Names{"h03"}));
     tickAfter(kHour);
+    EXPECT_EQ(view().rollout.since, now_ - kHour);
     EXPECT_EQ(hostsThatAre("waiting"), (Names{"h03"}));
 }
 

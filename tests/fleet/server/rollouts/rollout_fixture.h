@@ -174,7 +174,7 @@ protected:
     /// All that the roll-outs' tables hold.
     std::string allRows() {
         std::string text;
-        for (const auto& [table, columns] : std::map<std::string, int>{{"rollouts", 22},
+        for (const auto& [table, columns] : std::map<std::string, int>{{"rollouts", 23},
                                                                        {"rollout_parts", 13},
                                                                        {"rollout_orders", 3},
                                                                        {"rollout_cancels", 3},
