@@ -5,6 +5,7 @@
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/order.h"
+#include "fleet/bus/trust/signed.h"
 #include "fleet/server/rollouts/rollout_error.h"
 
 using nlohmann::json;
@@ -12,12 +13,17 @@ using nlohmann::json;
 namespace fleet {
 namespace {
 
+/// The number that the centre puts around an order needs room, and a host's link could not read a
+/// longer message: it would wait for ever for what has that number.
+constexpr std::size_t kMostOrderBytes = kMostSignedBytes - 4 * 1024;
+
 std::string textOr(const json& body, const char* member) {
     return body.contains(member) ? textIn(body, member) : "";
 }
 
 IncomingOrder incomingOrderOf(const std::string& bytes, const RolloutOperator& by,
                               const std::string& fleet, Moment now) {
+    insistThat(bytes.size() <= kMostOrderBytes, "it is too long");
     const SignedOrder read = readOrder(bytes);
     const Order& order = read.order;
     insistThat(isSignedByOperator(read, by.key), "the operator who asks has not signed it");

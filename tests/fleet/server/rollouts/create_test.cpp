@@ -1,4 +1,6 @@
 /// Which roll-outs are made, and from what.
+#include "fleet/bus/messages/numbered_order.h"
+#include "fleet/bus/trust/signed.h"
 #include "tests/fleet/server/rollouts/rollout_fixture.h"
 
 namespace {
@@ -110,6 +112,27 @@ TEST_F(NewRolloutTest, HasOrdersThatStillHaveTimeButNotForEver) {
     expectInvalid(made, "has expired");
     made.expires = now_ + fleet::kLongestOrder + Moment{1};
     expectInvalid(made, "more than 7 days");
+}
+
+TEST_F(NewRolloutTest, HasOrdersThatTheirNumbersFitAround) {
+    enrol(2);
+    fleet::NewRollout made = wanted({"h00"});
+    const auto longOrder = [&](std::size_t bytes) {
+        fleet::Order sized = order("h00");
+        const std::size_t others = sign(sized).size();
+        sized.body = R"({"product":"ux","text":")" + std::string(bytes - others - 10, 'x') + "\"}";
+        return sign(sized);
+    };
+    const std::size_t most = fleet::kMostSignedBytes - 4 * 1024;
+    made.orders = {longOrder(most + 1)};
+    ASSERT_EQ(made.orders[0].size(), most + 1);
+    expectInvalid(made, "too long");
+    made.orders = {longOrder(most)};
+    id_ = rollouts_->create(made, now_);
+    EXPECT_LE(
+        fleet::signNumber("h00", fleet::kHighestNumber, part("h00").order, made.orders[0], key_)
+            .size(),
+        fleet::kMostSignedBytes);
 }
 
 TEST_F(NewRolloutTest, HasOrdersThatDoTheSame) {
