@@ -15,7 +15,7 @@ namespace {
 
 /// The number that the centre puts around an order needs room, and a host's link could not read a
 /// longer message: it would wait for ever for what has that number.
-constexpr std::size_t kMostOrderBytes = kMostSignedBytes - 4 * 1024;
+constexpr std::size_t kMostOrderBytes = kMostSignedBytes - 4'096;
 
 std::string textOr(const json& body, const char* member) {
     return body.contains(member) ? textIn(body, member) : "";

@@ -123,7 +123,7 @@ TEST_F(NewRolloutTest, HasOrdersThatTheirNumbersFitAround) {
         sized.body = R"({"product":"ux","text":")" + std::string(bytes - others - 10, 'x') + "\"}";
         return sign(sized);
     };
-    const std::size_t most = fleet::kMostSignedBytes - 4 * 1024;
+    const std::size_t most = fleet::kMostSignedBytes - 4'096;
     made.orders = {longOrder(most + 1)};
     ASSERT_EQ(made.orders[0].size(), most + 1);
     expectInvalid(made, "too long");
