@@ -100,7 +100,6 @@ bool Centre::publishOne(const OrderRecord& order) {
 std::optional<Reply> Centre::greet(const std::string& host, const Hello& hello, Moment now) {
     std::optional<HostRecord> record = store_.host(host);
     if (!record) return std::nullopt;
-    const HostRecord before = *record;
     const bool isListing = now < store_.listUntil();
     if (hello.have && isListing) adoptListed(host, hello);
     Reply reply;
@@ -112,7 +111,8 @@ std::optional<Reply> Centre::greet(const std::string& host, const Hello& hello, 
     } else if (record->journal.empty()) {
         record->journal = hello.journalNow;
     }
-    if (!(*record == before)) store_.keepHost(*record);
+    record->heard = now;
+    store_.keepHost(*record);
 
     reply.nonce = hello.nonce;
     reply.time = now;

@@ -3,7 +3,6 @@
 
 #include <optional>
 #include <string>
-#include <tuple>
 
 #include "fleet/bus/messages/outcome.h"
 
@@ -21,16 +20,8 @@ struct HostRecord {
     std::string earlierSession;  ///< of the start before it
     std::string stopped;         ///< why its link must not go on; "" if it may
     std::string unpublished;     ///< why nothing is published for it; "" if nothing is wrong
+    Moment heard{};              ///< when the latest hello came
 };
-
-inline bool operator==(const HostRecord& a, const HostRecord& b) {
-    const auto all = [](const HostRecord& record) {
-        return std::tie(record.host, record.signing, record.name, record.last, record.told,
-                        record.machine, record.journal, record.session, record.earlierSession,
-                        record.stopped, record.unpublished);
-    };
-    return all(a) == all(b);
-}
 
 /// An order, with its number.
 struct OrderRecord {

@@ -22,7 +22,7 @@ CREATE TABLE hosts (
     id INTEGER PRIMARY KEY, host BLOB NOT NULL UNIQUE, last INTEGER NOT NULL,
     told INTEGER NOT NULL, machine BLOB NOT NULL, journal BLOB NOT NULL, session BLOB NOT NULL,
     earlier_session BLOB NOT NULL, stopped BLOB NOT NULL, unpublished BLOB NOT NULL,
-    signing BLOB NOT NULL, name BLOB NOT NULL);
+    heard INTEGER NOT NULL);
 CREATE TABLE orders (
     id INTEGER PRIMARY KEY, host INTEGER NOT NULL, number INTEGER NOT NULL, name BLOB NOT NULL,
     bytes BLOB NOT NULL, published INTEGER NOT NULL, held INTEGER NOT NULL, state BLOB,
@@ -35,8 +35,51 @@ CREATE INDEX orders_waiting ON orders (number, host)
 CREATE INDEX orders_held ON orders (host) WHERE held = 1;
 )";
 
+/// The keys with which links sign, names of hosts for people, and roll-outs. States, causes and
+/// failures are numbers of rollout_records.h. rollouts.wait and .parallel are null where the plan
+/// names none, .wave_end while a wave goes on. outcome is empty before a part is over.
+/// rollout_orders has the orders that wait for their release, and rollout_cancels those that cancel
+/// others.
+///
+/// An outcome that the centre keeps is noted in rollout_news by a trigger, whoever has told it and
+/// however it came: so nobody has to look through orders for it, and none is missed by a kill.
+constexpr const char* kSecond = R"(
+ALTER TABLE hosts ADD COLUMN signing BLOB NOT NULL DEFAULT x'';
+ALTER TABLE hosts ADD COLUMN name BLOB NOT NULL DEFAULT x'';
+CREATE TABLE rollouts (
+    id INTEGER PRIMARY KEY AUTOINCREMENT, name BLOB NOT NULL UNIQUE, operator BLOB NOT NULL,
+    operator_key BLOB NOT NULL, kind BLOB NOT NULL, product BLOB NOT NULL, selector BLOB NOT NULL,
+    created INTEGER NOT NULL, plan_waves BLOB NOT NULL, plan_failures BLOB NOT NULL,
+    pause INTEGER NOT NULL, wait INTEGER, parallel INTEGER, hosts INTEGER NOT NULL,
+    most_failures INTEGER NOT NULL, state INTEGER NOT NULL, cause INTEGER NOT NULL,
+    reason BLOB NOT NULL, since INTEGER NOT NULL, waves INTEGER NOT NULL, wave INTEGER NOT NULL,
+    began INTEGER NOT NULL, wave_end INTEGER);
+CREATE INDEX rollouts_running ON rollouts (id) WHERE state = 0;
+CREATE TABLE rollout_parts (
+    rollout INTEGER NOT NULL, place INTEGER NOT NULL, host INTEGER NOT NULL, wave INTEGER NOT NULL,
+    name BLOB NOT NULL, expires INTEGER NOT NULL, tries INTEGER NOT NULL, state INTEGER NOT NULL,
+    number INTEGER NOT NULL, outcome BLOB NOT NULL, reason BLOB NOT NULL, failure INTEGER NOT NULL,
+    cancel BLOB NOT NULL, PRIMARY KEY (rollout, place)) WITHOUT ROWID;
+CREATE UNIQUE INDEX rollout_parts_by_host ON rollout_parts (rollout, host);
+CREATE UNIQUE INDEX rollout_parts_by_order ON rollout_parts (host, name);
+CREATE INDEX rollout_parts_by_state ON rollout_parts (rollout, state, wave, outcome);
+CREATE INDEX rollout_parts_failed ON rollout_parts (rollout, failure) WHERE failure > 0;
+CREATE TABLE rollout_orders (
+    rollout INTEGER NOT NULL, place INTEGER NOT NULL, bytes BLOB NOT NULL,
+    UNIQUE (rollout, place));
+CREATE TABLE rollout_cancels (
+    rollout INTEGER NOT NULL, place INTEGER NOT NULL, bytes BLOB NOT NULL,
+    UNIQUE (rollout, place));
+CREATE TABLE rollout_news (
+    rollout INTEGER NOT NULL, place INTEGER NOT NULL, PRIMARY KEY (rollout, place)) WITHOUT ROWID;
+CREATE TRIGGER orders_told AFTER UPDATE OF state ON orders WHEN new.state IS NOT NULL BEGIN
+    INSERT OR IGNORE INTO rollout_news
+        SELECT rollout, place FROM rollout_parts WHERE host = new.host AND name = new.name;
+END;
+)";
+
 /// What brings version N to version N + 1, from 0 on. A row is never changed once it was released.
-constexpr std::array<const char*, kCentreSchemaVersion> kMigrations = {kFirst};
+constexpr std::array<const char*, kCentreSchemaVersion> kMigrations = {kFirst, kSecond};
 
 void migrate(sqlite::Database& database, int version) {
     sqlite::Transaction transaction(database);

@@ -36,7 +36,7 @@ std::vector<OrderRecord> allOf(Statement rows) {
 std::optional<HostRecord> SqliteCentreStore::host(const std::string& host) const {
     Statement found = database_.ask(
         "SELECT last, told, machine, journal, session, earlier_session, stopped, unpublished,"
-        " signing, name FROM hosts WHERE host = ?",
+        " signing, name, heard FROM hosts WHERE host = ?",
         host);
     if (!found.step()) return std::nullopt;
     HostRecord record;
@@ -51,6 +51,7 @@ std::optional<HostRecord> SqliteCentreStore::host(const std::string& host) const
     record.unpublished = found.bytes(7);
     record.signing = found.bytes(8);
     record.name = found.bytes(9);
+    record.heard = Moment(found.integer(10));
     return record;
 }
 
@@ -59,14 +60,15 @@ void SqliteCentreStore::keepHost(const HostRecord& record) {
     const std::optional<HostRow> before = row(record.host);
     database_.change(
         "INSERT INTO hosts (host, last, told, machine, journal, session, earlier_session, stopped,"
-        " unpublished, signing, name) VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"
+        " unpublished, signing, name, heard) VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"
         " ON CONFLICT (host) DO UPDATE SET last = excluded.last, told = excluded.told,"
         " machine = excluded.machine, journal = excluded.journal, session = excluded.session,"
         " earlier_session = excluded.earlier_session, stopped = excluded.stopped,"
-        " unpublished = excluded.unpublished, signing = excluded.signing, name = excluded.name",
+        " unpublished = excluded.unpublished, signing = excluded.signing, name = excluded.name,"
+        " heard = excluded.heard",
         record.host, bounded(record.last), bounded(record.told), record.machine, record.journal,
         record.session, record.earlierSession, record.stopped, record.unpublished, record.signing,
-        record.name);
+        record.name, std::int64_t{record.heard.count()});
     if (before) holdOrders(*before, !record.unpublished.empty());
     transaction.commit();
 }
