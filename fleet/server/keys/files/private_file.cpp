@@ -102,6 +102,17 @@ void writeNewPrivateFile(const std::string& file, std::string_view content) {
     syncDirectoryOf(file);
 }
 
+void putInPlace(const std::string& complete, const std::string& file) {
+    {
+        const Descriptor opened(::open(complete.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
+        if (!opened.isOpen() || ::fsync(opened.get()) != 0) {
+            throw keysErrorOf("cannot sync " + complete);
+        }
+    }
+    if (::rename(complete.c_str(), file.c_str()) != 0) throw keysErrorOf("cannot replace " + file);
+    syncDirectoryOf(file);
+}
+
 SecretText readPrivateFile(const std::string& file) {
     const Descriptor opened(::open(file.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
     if (!opened.isOpen()) throw keysErrorOf("cannot read " + file);

@@ -31,6 +31,8 @@ private:
 void writePrivateFile(const std::string& file, std::string_view content);
 /// A new one; KeysError if there is anything of that name.
 void writeNewPrivateFile(const std::string& file, std::string_view content);
+/// Puts a file that is complete in the place of another one, durably. Throws KeysError.
+void putInPlace(const std::string& complete, const std::string& file);
 /// Its content. Throws KeysError if it cannot be read, if others than the process's user may read
 /// it, or if it has more than 4 MiB.
 SecretText readPrivateFile(const std::string& file);

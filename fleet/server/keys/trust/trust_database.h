@@ -25,7 +25,14 @@ public:
 
     sqlite::Database& connection() { return *connection_; }
 
+    /// Writes a consistent copy of what is committed to a file with mode 0600, which replaces an
+    /// older one at once and when it is complete. Any thread, while others use the file. Throws
+    /// KeysError; then an older copy is as it was. Who puts a copy back revokes again what was
+    /// revoked since.
+    void backup(const std::string& to) const;
+
 private:
+    const std::string file_;
     std::optional<sqlite::Database> connection_;
 };
 

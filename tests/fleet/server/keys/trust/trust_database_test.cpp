@@ -68,6 +68,31 @@ TEST_F(TrustFile, IsRefusedWhenItIsNewerOrForeignOrDamaged) {
     expectRefusal("is damaged (it has no tables)");
 }
 
+TEST(TrustRecords, AreCopiedWhileTheyAreInUseAndCanBePutBack) {
+    joining::Fleet made;
+    const std::string copy = made.made.scratch().write("copy.db", "older");
+    made.made.scratch().write("copy.db.new", "what a copy has left that was cut off");
+    made.redeem(joining::Machine().request(made.invite("web1")));
+    made.revoked.revokeHost("web1", kNow);
+    made.trust.backup(copy);
+    made.invite("web2");
+    EXPECT_EQ(fs::status(copy).permissions(), fs::perms(0600));
+    EXPECT_FALSE(made.made.scratch().exists("copy.db.new"));
+    TrustDatabase restored(copy);
+    EXPECT_EQ(fleet::RevokedKeys(restored.connection()).hosts(), made.revoked.hosts());
+    EXPECT_EQ(made.revoked.hosts().size(), 1U);
+    EXPECT_EQ(restored.connection().number("SELECT count(*) FROM hosts"), 1);
+}
+
+TEST(TrustRecords, LeaveAnOlderCopyWhenANewOneFails) {
+    joining::Fleet made;
+    const std::string copy = made.made.scratch().write("copy.db", "older");
+    made.made.scratch().write("copy.db.new/in the way", "");
+    EXPECT_THROW(made.trust.backup(copy), KeysError);
+    EXPECT_EQ(made.made.scratch().read("copy.db"), "older");
+    EXPECT_THROW(made.trust.backup(made.made.directory().trustDatabase()), KeysError);
+}
+
 TEST(TrustRecords, HoldNoTokenInAnyFile) {
     joining::Fleet made;
     std::string tokens[] = {
