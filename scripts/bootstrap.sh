@@ -10,7 +10,7 @@ cd "$(dirname "$0")/.."
 
 packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev libexpat1-dev
 libsqlite3-dev libssl-dev libnats-dev libsodium-dev libboost-dev nlohmann-json3-dev libcli11-dev libtomlplusplus-dev mksh curl pkgconf procps
-shellcheck nats-server clang libclang-rt-dev python3 python3-jsonschema mandoc'
+shellcheck nats-server openssl clang libclang-rt-dev python3 python3-jsonschema mandoc'
 # Programs that only judge the product from outside; their tests are skipped without them.
 judges='python3-impacket tshark zsh fish tmux'
 

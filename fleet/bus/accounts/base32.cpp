@@ -14,6 +14,8 @@ constexpr unsigned kBitsOfByte = 8;
 
 std::string base32Encoded(std::string_view bytes) {
     std::string text;
+    // No copies of a secret are left behind.
+    text.reserve((bytes.size() * kBitsOfByte + kBitsOfDigit - 1) / kBitsOfDigit);
     unsigned pending = 0;
     unsigned bits = 0;
     for (const char byte : bytes) {

@@ -47,13 +47,13 @@ Json shared(Make make) {
 }
 
 /// What one host may do. The server puts the host's key in: the key, as a name may be anything.
-Json scopeOfHost(const FleetKeys& keys) {
+Json scopeOfHost(const AccountKeys& accounts) {
     const std::string self = "{{subject()}}";
     const Json publish = {"$JS.API.DIRECT.GET.TASKS.task." + self + ".*", "out." + self,
                           "hello." + self, "ans." + self, "$KV.HOSTS." + self};
     const Json subscribe = {"rp.task." + self + ".*", "rp.ask." + self, inboxPrefixOf(self) + ".>"};
     return {{"kind", "user_scope"},
-            {"key", keys.hostSigner.publicKey()},
+            {"key", accounts.hostSigner},
             {"role", "host"},
             {"template",
              {{"pub", {{"allow", publish}}},
@@ -69,49 +69,68 @@ void needUserKey(const std::string& key) {
     }
 }
 
-std::string accountToken(const FleetKeys& keys, const KeyPair& account, const char* name,
+std::string accountToken(const KeyPair& signer, const std::string& account, const char* name,
                          TokenTime issuedAt, const Json& json) {
-    return signedToken({account.publicKey(), name, issuedAt, {}}, json.dump(), keys.root);
+    return signedToken({account, name, issuedAt, {}}, json.dump(), signer);
 }
 
 }  // namespace
 
 FleetKeys FleetKeys::make() {
     return {KeyPair::make(KeyKind::Operator), KeyPair::make(KeyKind::Account),
-            KeyPair::make(KeyKind::Account), KeyPair::make(KeyKind::Account),
-            KeyPair::make(KeyKind::Account)};
+            KeyPair::make(KeyKind::Account),  KeyPair::make(KeyKind::Account),
+            KeyPair::make(KeyKind::Account),  KeyPair::make(KeyKind::Operator)};
+}
+
+AccountKeys AccountKeys::of(const FleetKeys& keys) {
+    return {keys.control.publicKey(), keys.hosts.publicKey(), keys.hostSigner.publicKey(),
+            keys.system.publicKey()};
 }
 
 std::string operatorToken(const FleetKeys& keys, TokenTime issuedAt) {
     const Json json = {{"type", "operator"},
                        {"version", kTokenVersion},
+                       {"signing_keys", Json::array({keys.accountSigner.publicKey()})},
                        {"system_account", keys.system.publicKey()}};
     return signedToken({keys.root.publicKey(), "fleet", issuedAt, {}}, json.dump(), keys.root);
 }
 
-std::string controlToken(const FleetKeys& keys, TokenTime issuedAt,
+std::string controlToken(const AccountKeys& accounts, const KeyPair& signer, TokenTime issuedAt,
                          const Revocations& revocations) {
     Json json = accountJson(true, revocations);
     json["exports"] = shared([](const char* subject, const char* type) {
         return Json{{"name", subject}, {"subject", subject}, {"type", type}};
     });
-    return accountToken(keys, keys.control, "CTRL", issuedAt, json);
+    return accountToken(signer, accounts.control, "CTRL", issuedAt, json);
+}
+
+std::string hostsToken(const AccountKeys& accounts, const KeyPair& signer, TokenTime issuedAt,
+                       const Revocations& revocations) {
+    Json json = accountJson(false, revocations);
+    json["imports"] = shared([&](const char* subject, const char* type) {
+        return Json{
+            {"name", subject}, {"subject", subject}, {"account", accounts.control}, {"type", type}};
+    });
+    json["signing_keys"] = Json::array({scopeOfHost(accounts)});
+    return accountToken(signer, accounts.hosts, "HOSTS", issuedAt, json);
+}
+
+std::string systemToken(const AccountKeys& accounts, const KeyPair& signer, TokenTime issuedAt,
+                        const Revocations& revocations) {
+    return accountToken(signer, accounts.system, "SYS", issuedAt, accountJson(false, revocations));
+}
+
+std::string controlToken(const FleetKeys& keys, TokenTime issuedAt,
+                         const Revocations& revocations) {
+    return controlToken(AccountKeys::of(keys), keys.root, issuedAt, revocations);
 }
 
 std::string hostsToken(const FleetKeys& keys, TokenTime issuedAt, const Revocations& revocations) {
-    Json json = accountJson(false, revocations);
-    json["imports"] = shared([&](const char* subject, const char* type) {
-        return Json{{"name", subject},
-                    {"subject", subject},
-                    {"account", keys.control.publicKey()},
-                    {"type", type}};
-    });
-    json["signing_keys"] = Json::array({scopeOfHost(keys)});
-    return accountToken(keys, keys.hosts, "HOSTS", issuedAt, json);
+    return hostsToken(AccountKeys::of(keys), keys.root, issuedAt, revocations);
 }
 
 std::string systemToken(const FleetKeys& keys, TokenTime issuedAt) {
-    return accountToken(keys, keys.system, "SYS", issuedAt, accountJson(false, {}));
+    return systemToken(AccountKeys::of(keys), keys.root, issuedAt, {});
 }
 
 std::string hostUserToken(const KeyPair& hostSigner, const std::string& hostsAccount,

@@ -26,6 +26,10 @@ std::string_view nameOf(Purpose purpose) {
             return "ask";
         case Purpose::Answering:
             return "ans";
+        case Purpose::Enrolling:
+            return "enrol";
+        case Purpose::LoggingIn:
+            return "login";
     }
     return "";
 }

@@ -22,7 +22,9 @@ enum class Purpose {
     Replying,
     Reporting,
     Asking,
-    Answering
+    Answering,
+    Enrolling,
+    LoggingIn
 };
 
 /// The parts of a message, somewhere in its bytes.

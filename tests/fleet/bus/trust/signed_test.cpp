@@ -47,6 +47,19 @@ TEST(SignedMessage, IsWorthNothingForAnotherPurposeOrAsAnothers) {
     EXPECT_FALSE(isSigned(*partsOf(bytes), Purpose::Greeting, "no key"));
 }
 
+TEST(SignedMessage, OfEachPurposeCountsForThatOneOnly) {
+    const KeyPair key = KeyPair::make(KeyKind::User);
+    const Purpose purposes[] = {Purpose::Certifying, Purpose::Ordering,  Purpose::Numbering,
+                                Purpose::Greeting,   Purpose::Replying,  Purpose::Reporting,
+                                Purpose::Asking,     Purpose::Answering, Purpose::Enrolling,
+                                Purpose::LoggingIn};
+    for (const Purpose made : purposes) {
+        const std::string bytes = signMessage(made, key, "{}");
+        for (const Purpose asked : purposes)
+            EXPECT_EQ(isSigned(*partsOf(bytes), asked, key.publicKey()), made == asked);
+    }
+}
+
 TEST(SignedMessage, IsWorthNothingWhenAnyByteIsAnotherOne) {
     const KeyPair key = KeyPair::make(KeyKind::User);
     const std::string bytes = signMessage(Purpose::Greeting, key, "{}", "more");

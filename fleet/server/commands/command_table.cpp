@@ -1,0 +1,23 @@
+#include "fleet/server/commands/command_table.h"
+
+namespace fleet {
+
+const std::vector<Command>& commandTable() {
+    static const std::vector<Command> table = {
+        {"keys", "init", "Make all keys of a new fleet", declareKeysInit},
+        {"keys", "rotate", "Give the centre new keys and certificates", declareKeysRotate},
+        {"", "enrol", "Invite a host, and print the line that it needs", declareEnrol},
+        {"operator", "add", "Invite an operator, and print the line that zavctl login needs",
+         declareOperatorAdd},
+        {"operator", "certify", "Certify operators' keys that wait for the root",
+         declareOperatorCertify},
+        {"operator", "ls", "List the operators and their keys", declareOperatorList},
+        {"revoke", "operator", "Let an operator's keys count no longer", declareRevokeOperator},
+        {"revoke", "host", "Let a host's key count no longer", declareRevokeHost},
+        {"revoke", "ls", "List the keys that count no longer", declareRevokeList},
+        {"", "doctor", "Look for keys and certificates that end soon", declareDoctor},
+    };
+    return table;
+}
+
+}  // namespace fleet
