@@ -96,12 +96,20 @@ foreach(program host ctl)
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 endforeach()
 
+# What several programs share.
+file(GLOB sources http/*.cpp metrics/*.cpp sqlite/*.cpp)
+file(GLOB headers http/*.h metrics/*.h secrets/*.h sqlite/*.h system/*.h)
+zav_verify(shared LIBRARIES zav_http zav_metrics zav_database
+  DEFINITIONS $<TARGET_PROPERTY:zav_http,COMPILE_DEFINITIONS>
+  SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
+
 set(fleet_libraries "")
 if(TARGET zavfleet_bus)
   set(fleet_libraries zavfleet_bus zav_nats zav_sodium)
   file(GLOB_RECURSE sources fleet/*.cpp)
   file(GLOB_RECURSE headers fleet/*.h)
-  zav_verify(fleet LIBRARIES ${fleet_libraries}
+  zav_verify(fleet LIBRARIES ${fleet_libraries} zavctl_client zav_database
+    DEFINITIONS ZAV_VERSION="${PROJECT_VERSION}"
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 endif()
 

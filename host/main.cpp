@@ -28,8 +28,7 @@
 #include "host/depot/depot_directory.h"
 #include "host/home/parameter_copy.h"
 #include "host/home/temporary_directory.h"
-#include "host/http/peer.h"
-#include "host/http/server.h"
+#include "host/peers/peer_of.h"
 #include "host/process/children/orphans.h"
 #include "host/process/configuration/options.h"
 #include "host/process/configuration/task_timeout.h"
@@ -47,6 +46,7 @@
 #include "host/service/task_log.h"
 #include "host/service/task_status.h"
 #include "host/service/watchdog.h"
+#include "http/server.h"
 
 namespace host {
 namespace {
@@ -68,7 +68,7 @@ std::vector<oxa::Table> startPlugin(const HostOptions& options) {
 /// Serves file transfers on a socket of their own, and on a loopback port if one was asked for.
 void serveTransfers(ncs::Server& transfers, SocketFile& socket, const HostOptions& options) {
     transfers.listen(socket.listen(), [groups = options.groups](int accepted) {
-        return peerOf(accepted, groups).access == Access::Act;
+        return peerOf(accepted, groups).access == http::Access::Act;
     });
     if (!options.rpcPort) return;
     try {
@@ -161,7 +161,7 @@ void reopenLogs(int signals) {
 
 /// Ends what a command leaves behind when its time is over, and reaps it. run() is called on the
 /// main thread, which has no other children.
-void attendToOrphans(HttpServer& server, int childSignals) {
+void attendToOrphans(http::HttpServer& server, int childSignals) {
     adoptOrphans();
     endWhatGivenUpCommandsStarted();
     // Each child of the plug-in sends a signal, too, and needs nothing of this thread.
@@ -200,7 +200,7 @@ std::chrono::milliseconds feedingTime(std::chrono::microseconds watchdog) {
 }
 
 /// On the thread that serves clients: so its own life is what the service manager hears of.
-void feedWatchdog(HttpServer& server, const Notifier& notifier, const Journal& journal,
+void feedWatchdog(http::HttpServer& server, const Notifier& notifier, const Journal& journal,
                   const ServiceEnvironment& service) {
     if (!service.watchdog || !notifier.isWanted()) return;
     server.every(feedingTime(*service.watchdog), [&notifier, &journal] {
@@ -267,9 +267,7 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     ncs::Server transfers({}, &services.transfers);
     services.transferServer = [&transfers] { return transfers.counts(); };
     serveTransfers(transfers, transferSocket, options);
-    ServerLimits limits;
-    limits.groups = options.groups;
-    HttpServer server(socket.listen(), api, services.counts, limits);
+    http::HttpServer server(socket.listen(), doorFor(options.groups), api, services.counts);
     if (keepsListener) server.leaveListenerOpen();
     server.endWhenReadable(endDescriptor, options.grace,
                            [&notifier] { notifier.tell("STOPPING=1\n"); });

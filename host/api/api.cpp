@@ -39,31 +39,32 @@ std::string journalMeant(const Call& call) {
     return member == call.body().end() ? std::string() : member->get<std::string>();
 }
 
-Answer answerTo(Services& services, Call& call) {
+http::Answer answerTo(Services& services, Call& call) {
     try {
         call.readBody();
         const std::string& own = services.journal.identity();
         const std::string meant = journalMeant(call);
         if (!meant.empty() && meant != own) {
-            return errorReply(412, "this host's journal is " + own + ", not " + meant);
+            return http::errorReply(412, "this host's journal is " + own + ", not " + meant);
         }
         return call.route().endpoint(services, call);
     } catch (const BadRequest& bad) {
-        return errorReply(400, bad.what());
+        return http::errorReply(400, bad.what());
     } catch (const Refusal& refused) {
         services.refusals.at(refused.guard()).add();
-        return guardReply(refused.httpStatus(), refused.what(), refused.guard(), refused.hint());
+        return http::guardReply(refused.httpStatus(), refused.what(), refused.guard(),
+                                refused.hint());
     } catch (const DepotError& error) {
-        return errorReply(statusOf(error.kind()), error.what());
+        return http::errorReply(statusOf(error.kind()), error.what());
     } catch (const NotKept& failure) {
         if (!failure.guard().empty()) services.refusals.at(failure.guard()).add();
-        Reply reply = failure.guard().empty()
-                          ? errorReply(503, failure.what())
-                          : guardReply(503, failure.what(), failure.guard(), "");
+        http::Reply reply = failure.guard().empty()
+                                ? http::errorReply(503, failure.what())
+                                : http::guardReply(503, failure.what(), failure.guard(), "");
         reply.fields.emplace_back("Retry-After", "5");
         return reply;
     } catch (const QueryFailed& failed) {
-        return errorReply(failed.gone() ? 404 : 500, failed.what());
+        return http::errorReply(failed.gone() ? 404 : 500, failed.what());
     }
 }
 
@@ -72,12 +73,13 @@ Answer answerTo(Services& services, Call& call) {
 Api::Api(Services& services, std::vector<Route> routes)
     : services_(services), router_(std::move(routes)) {}
 
-std::variant<Answer, Job> Api::handle(Request request) {
-    std::variant<Match, Reply> found = router_.find(request);
-    if (auto* const reply = std::get_if<Reply>(&found)) return Answer(std::move(*reply));
+std::variant<http::Answer, http::Job> Api::handle(http::Request request) {
+    std::variant<Match, http::Reply> found = router_.find(request);
+    if (auto* const reply = std::get_if<http::Reply>(&found))
+        return http::Answer(std::move(*reply));
     const auto call = std::make_shared<Call>(std::get<Match>(std::move(found)), std::move(request));
     if (call->route().runs == Runs::AtOnce) return answerTo(services_, *call);
-    return Job([call, &services = services_] { return answerTo(services, *call); });
+    return http::Job([call, &services = services_] { return answerTo(services, *call); });
 }
 
 void Api::prepareForEnd() {

@@ -4,16 +4,16 @@
 #include <vector>
 
 #include "host/api/router.h"
-#include "host/http/handler.h"
+#include "http/handler.h"
 
 namespace host {
 
-class Api final : public Handler {
+class Api final : public http::Handler {
 public:
     /// The services outlive this object.
     Api(Services& services, std::vector<Route> routes);
 
-    std::variant<Answer, Job> handle(Request request) override;
+    std::variant<http::Answer, http::Job> handle(http::Request request) override;
     void prepareForEnd() override;
     bool quiet() const override;
 

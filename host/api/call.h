@@ -14,13 +14,14 @@ namespace host {
 /// Immutable after readBody(); belongs to one request.
 class Call {
 public:
-    Call(Match match, Request request) : match_(std::move(match)), request_(std::move(request)) {}
+    Call(Match match, http::Request request)
+        : match_(std::move(match)), request_(std::move(request)) {}
 
     /// Parses the body and checks it against the route's members, if it has any. Throws BadRequest.
     void readBody();
 
     const Route& route() const { return *match_.route; }
-    const Peer& peer() const { return request_.peer; }
+    const http::Peer& peer() const { return request_.peer; }
     /// The event after which a client that reads a stream wants to continue, from its field
     /// Last-Event-ID or else the parameter "after"; empty if it names none.
     std::string after() const;
@@ -46,7 +47,7 @@ public:
 
 private:
     const Match match_;
-    Request request_;
+    http::Request request_;
     std::shared_ptr<const nlohmann::json> body_;
 };
 

@@ -12,7 +12,7 @@ namespace host {
 Endpoint getDoctor;
 Schema doctorSchema;
 
-Answer getDoctor(Services& services, const Call&) {
+http::Answer getDoctor(Services& services, const Call&) {
     const CodePage& codePage = services.codePage;
     CheckSubject subject = services.checkSubject();
     nlohmann::ordered_json document = nlohmann::ordered_json::array();
@@ -22,7 +22,7 @@ Answer getDoctor(Services& services, const Call&) {
                             {"text", codePage.toUtf8(result.finding.text)},
                             {"remedy", codePage.toUtf8(result.finding.remedy)}});
     }
-    return jsonReply(200, document.dump());
+    return http::jsonReply(200, document.dump());
 }
 
 nlohmann::ordered_json doctorSchema(Components&) {

@@ -12,7 +12,7 @@ namespace host {
 Endpoint getHealth;
 Schema healthSchema;
 
-Answer getHealth(Services& services, const Call&) {
+http::Answer getHealth(Services& services, const Call&) {
     using std::chrono::duration_cast;
     const auto uptime = std::chrono::steady_clock::now() - services.started;
     const nlohmann::ordered_json document = {
@@ -24,7 +24,7 @@ Answer getHealth(Services& services, const Call&) {
         {"subscriptions", services.counts.streams.load()},
         {"guarded", services.guarded},
         {"journal", services.journal.identity()}};
-    return jsonReply(200, document.dump());
+    return http::jsonReply(200, document.dump());
 }
 
 nlohmann::ordered_json healthSchema(Components&) {

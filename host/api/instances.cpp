@@ -31,21 +31,22 @@ nlohmann::ordered_json documentOf(const AgentInstance& instance, const CodePage&
 
 }  // namespace
 
-Answer getInstances(Services& services, const Call&) {
+http::Answer getInstances(Services& services, const Call&) {
     const CodePage& codePage = services.codePage;
     const InstanceList list = readInstances(services.home);
     if (!list.isOffered) {
-        return errorReply(404, "the home has no program bin/instances, which tells what runs");
+        return http::errorReply(404,
+                                "the home has no program bin/instances, which tells what runs");
     }
     if (!list.result.succeeded()) {
-        return errorReply(500, "bin/instances " + endInWords(list.result) + ": " +
-                                   codePage.toUtf8(list.result.err));
+        return http::errorReply(500, "bin/instances " + endInWords(list.result) + ": " +
+                                         codePage.toUtf8(list.result.err));
     }
     nlohmann::ordered_json instances = nlohmann::ordered_json::array();
     for (const AgentInstance& instance : list.instances)
         instances.push_back(documentOf(instance, codePage));
     const nlohmann::ordered_json document = {{"instances", std::move(instances)}};
-    return jsonReply(200, document.dump());
+    return http::jsonReply(200, document.dump());
 }
 
 nlohmann::ordered_json instancesSchema(Components&) {
@@ -60,9 +61,8 @@ nlohmann::ordered_json instancesSchema(Components&) {
                        {nameOf(State::Running), nameOf(State::Missing), nameOf(State::Stopped)})},
          {"user", shape::orNull(shape::text("who runs it, or would; null: it is stopped"))},
          {"pid", shape::orNull(shape::wholeNumber("its process; null unless it runs", 1))}});
-    return shape::object(
-        "Instances", "What the home says of its agents.",
-        {{"instances", shape::listOf("by product and instance", instance)}});
+    return shape::object("Instances", "What the home says of its agents.",
+                         {{"instances", shape::listOf("by product and instance", instance)}});
 }
 
 }  // namespace host

@@ -56,14 +56,14 @@ void lookAtWaits(const Services& services, Reasons& reasons) {
 Endpoint getReady;
 Schema readySchema;
 
-Answer getReady(Services& services, const Call&) {
+http::Answer getReady(Services& services, const Call&) {
     Reasons reasons(services.codePage);
     lookAtPlugin(services, reasons);
     lookAtJournal(services, reasons);
     lookAtWaits(services, reasons);
     const bool ready = reasons.list().empty();
     const Document document = {{"ready", ready}, {"reasons", reasons.list()}};
-    return jsonReply(ready ? 200 : 503, document.dump());
+    return http::jsonReply(ready ? 200 : 503, document.dump());
 }
 
 nlohmann::ordered_json readySchema(Components&) {

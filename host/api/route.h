@@ -6,7 +6,7 @@
 #include <nlohmann/json_fwd.hpp>
 #include <vector>
 
-#include "host/http/handler.h"
+#include "http/handler.h"
 
 namespace host {
 
@@ -17,7 +17,7 @@ struct Services;
 /// Answers one request that fits its route. What it throws as BadRequest is answered with 400, as
 /// Refusal with 409 or 400, as DepotError with 400, 403, 404 or 500, as QueryFailed with 404 or
 /// 500.
-using Endpoint = Answer(Services& services, const Call& call);
+using Endpoint = http::Answer(Services& services, const Call& call);
 
 /// The shape of a document, for the interface's description; see api/description/schema.h. What it
 /// refers to it adds to the components.
@@ -83,8 +83,8 @@ struct Route {
     /// Segments between slashes. "{name}" stands for one segment that is not empty: the parameter
     /// of that name.
     const char* path;
-    const char* doc;  ///< one line
-    Access access;    ///< what a client must at least be allowed to do
+    const char* doc;      ///< one line
+    http::Access access;  ///< what a client must at least be allowed to do
     Runs runs;
     Endpoint* endpoint;
     std::vector<RouteAnswer> answers{};

@@ -93,13 +93,13 @@ std::string allowed(const std::vector<const Route*>& routes) {
     return list;
 }
 
-Reply wrongMethod(const std::string& path, const std::vector<const Route*>& routes) {
+http::Reply wrongMethod(const std::string& path, const std::vector<const Route*>& routes) {
     std::string text = path + (routes.size() == 1 ? " knows only the method " : " knows only ");
     for (std::size_t i = 0; i < routes.size(); ++i) {
         if (i > 0) text += i + 1 == routes.size() ? " and " : ", ";
         text += routes[i]->method;
     }
-    Reply reply = errorReply(405, text);
+    http::Reply reply = http::errorReply(405, text);
     reply.fields.emplace_back("Allow", allowed(routes));
     return reply;
 }
@@ -116,14 +116,14 @@ void takeParameter(Match& match, const Parameter& parameter, const std::string& 
     match.parameters.emplace_back(name, value);
 }
 
-void takePath(Match& match, const std::vector<std::string>& pattern, const Target& target) {
+void takePath(Match& match, const std::vector<std::string>& pattern, const http::Target& target) {
     for (std::size_t i = 0; i < pattern.size(); ++i) {
         if (!isVariable(pattern[i])) continue;
         match.parameters.emplace_back(variableName(pattern[i]), target.segments[i]);
     }
 }
 
-void takeQuery(Match& match, const Target& target) {
+void takeQuery(Match& match, const http::Target& target) {
     for (const auto& [name, value] : target.parameters) {
         if (const Parameter* const parameter = parameterOf(*match.route, name)) {
             takeParameter(match, *parameter, value);
@@ -147,7 +147,7 @@ void takeQuery(Match& match, const Target& target) {
 
 Router::Router(std::vector<Route> routes) : routes_(std::move(routes)) {
     for (const Route& route : routes_) {
-        const std::optional<Target> pattern = parseTarget(route.path);
+        const std::optional<http::Target> pattern = http::parseTarget(route.path);
         if (!pattern) throw std::logic_error(std::string("malformed path ") + route.path);
         for (const std::string& segment : pattern->segments) {
             if (isVariable(segment) && parameterOf(route, variableName(segment)) == nullptr) {
@@ -169,7 +169,7 @@ Router::Router(std::vector<Route> routes) : routes_(std::move(routes)) {
     });
 }
 
-std::vector<const Router::Entry*> Router::atPath(const Target& target) const {
+std::vector<const Router::Entry*> Router::atPath(const http::Target& target) const {
     std::vector<const Entry*> found;
     for (const Entry& entry : entries_) {
         // What a more exact path stands for is no longer looked for among the others.
@@ -186,28 +186,28 @@ std::vector<const Router::Entry*> Router::atPath(const Target& target) const {
     return found;
 }
 
-std::variant<Match, Reply> Router::find(const Request& request) const {
-    const std::optional<Target> target = parseTarget(request.target);
-    if (!target) return errorReply(400, "the request's target has a malformed escape");
+std::variant<Match, http::Reply> Router::find(const http::Request& request) const {
+    const std::optional<http::Target> target = http::parseTarget(request.target);
+    if (!target) return http::errorReply(400, "the request's target has a malformed escape");
     const std::vector<const Entry*> entries = atPath(*target);
-    if (entries.empty()) return errorReply(404, "there is nothing at " + target->path);
+    if (entries.empty()) return http::errorReply(404, "there is nothing at " + target->path);
     std::vector<const Route*> here;
     const Entry* wanted = nullptr;
     for (const Entry* entry : entries) {
         here.push_back(entry->route);
         if (wanted == nullptr && answers(*entry->route, request.method)) wanted = entry;
     }
-    if (request.method == "OPTIONS") return Reply{204, "", "", {{"Allow", allowed(here)}}};
+    if (request.method == "OPTIONS") return http::Reply{204, "", "", {{"Allow", allowed(here)}}};
     if (wanted == nullptr) return wrongMethod(target->path, here);
     if (request.peer.access < wanted->route->access) {
-        return errorReply(403, "you may only read from this host");
+        return http::errorReply(403, "you may only read from this host");
     }
     Match match{wanted->route, target->path, {}, {}};
     takePath(match, wanted->segments, *target);
     try {
         takeQuery(match, *target);
     } catch (const BadRequest& bad) {
-        return errorReply(400, bad.what());
+        return http::errorReply(400, bad.what());
     }
     return match;
 }

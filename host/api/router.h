@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "host/api/route.h"
-#include "host/http/url.h"
+#include "http/url.h"
 
 namespace host {
 
@@ -28,7 +28,7 @@ public:
 
     /// The route, or the reply that says why there is none: 400, 403, 404, 405, and the reply to
     /// OPTIONS. Looks at the method, the target and what the peer may do; not at the body.
-    std::variant<Match, Reply> find(const Request& request) const;
+    std::variant<Match, http::Reply> find(const http::Request& request) const;
 
     const std::vector<Route>& routes() const { return routes_; }
 
@@ -37,7 +37,7 @@ private:
         const Route* route;
         std::vector<std::string> segments;  ///< of its path
     };
-    std::vector<const Entry*> atPath(const Target& target) const;
+    std::vector<const Entry*> atPath(const http::Target& target) const;
 
     const std::vector<Route> routes_;
     std::vector<Entry> entries_;

@@ -18,11 +18,11 @@ Schema depotListingSchema, depotRemovalSchema, depotSumsSchema, depotCheckSchema
 std::vector<Route> routes() {
     return {
         {"GET", "/v1/tables", "The tables with their columns.",
-         Access::Read, Runs::AtOnce, getTables,
+         http::Access::Read, Runs::AtOnce, getTables,
          {{200, "the tables", tablesSchema}}},
 
         {"POST", "/v1/query", "Queries a table; on the request table, asks for a command.",
-         Access::Read, Runs::OnWorker, postQuery,
+         http::Access::Read, Runs::OnWorker, postQuery,
          {{200, "what the table answered", queryAnswerSchema}}, {}, Others::None,
          {{"table", JsonType::String, Need::Required, "the name of the table"},
           {"where", JsonType::Array, Need::Optional, "conditions, all of which a row satisfies",
@@ -33,7 +33,7 @@ std::vector<Route> routes() {
          {404, 409}},
 
         {"GET", "/v1/events", "Streams the rows of a table as they come.",
-         Access::Read, Runs::OnWorker, getEvents,
+         http::Access::Read, Runs::OnWorker, getEvents,
          {{200, "the events, until somebody ends the connection", nullptr,
            {{"message", rowSchema}, {"task", taskSchema}, {"gap", gapSchema},
             {"overflow", overflowSchema}}}},
@@ -43,7 +43,7 @@ std::vector<Route> routes() {
          Others::Columns, {}, {404}},
 
         {"POST", "/v1/tasks", "Accepts a command for its turn.",
-         Access::Act, Runs::OnWorker, postTask,
+         http::Access::Act, Runs::OnWorker, postTask,
          {{202, "the task, which is on disk", taskSchema}}, {}, Others::None,
          {{"command", JsonType::String, Need::Optional, "the command; needed unless only recorded"},
           {"product", JsonType::String, Need::Optional, "the product's code"},
@@ -67,7 +67,7 @@ std::vector<Route> routes() {
          {404, 409, 429}},
 
         {"GET", "/v1/tasks", "Lists tasks, newest first.",
-         Access::Read, Runs::OnWorker, getTasks,
+         http::Access::Read, Runs::OnWorker, getTasks,
          {{200, "the tasks", taskListSchema}},
          {{"state", Type::Text, Need::Optional, "only those in this state", taskStateSchema},
           {"product", Type::Text, Need::Optional, "only those for this product"},
@@ -79,7 +79,7 @@ std::vector<Route> routes() {
           {"journal", Type::Text, Need::Optional, "the journal that must be this host's"}}},
 
         {"GET", "/v1/tasks/{id}", "Tells everything about one task.",
-         Access::Read, Runs::OnWorker, getTask,
+         http::Access::Read, Runs::OnWorker, getTask,
          {{200, "the task", taskSchema}},
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
           {"wait", Type::Number, Need::Optional, "seconds to wait for the task's end"},
@@ -88,7 +88,7 @@ std::vector<Route> routes() {
 
         // What commands write may hold anything.
         {"GET", "/v1/tasks/{id}/output", "Streams what a task's commands write.",
-         Access::Act, Runs::OnWorker, getTaskOutput,
+         http::Access::Act, Runs::OnWorker, getTaskOutput,
          {{200, "the output, piece by piece", nullptr,
            {{"message", outputPieceSchema}, {"overflow", overflowSchema},
             {"end", outputEndSchema}}}},
@@ -99,7 +99,7 @@ std::vector<Route> routes() {
          Others::None, {}, {404}},
 
         {"POST", "/v1/tasks/{id}/cancel", "Cancels a task.",
-         Access::Act, Runs::OnWorker, cancelTask,
+         http::Access::Act, Runs::OnWorker, cancelTask,
          {{200, "the task, which is cancelled", taskSchema},
           {202, "the task, whose commands have not ended yet", taskSchema}},
          {{"id", Type::Text, Need::Required, "the task's identifier, or a TRANSID"},
@@ -107,53 +107,53 @@ std::vector<Route> routes() {
          Others::None, {}, {404, 409}},
 
         {"GET", "/v1/doctor", "Checks the home and the machine.",
-         Access::Read, Runs::OnWorker, getDoctor,
+         http::Access::Read, Runs::OnWorker, getDoctor,
          {{200, "what was found", doctorSchema}}},
 
         {"GET", "/v1/instances", "Which instances of agents run, and which should.",
-         Access::Read, Runs::OnWorker, getInstances,
+         http::Access::Read, Runs::OnWorker, getInstances,
          {{200, "the instances", instancesSchema}}, {}, Others::None, {}, {404}},
 
         {"GET", "/v1/health", "What the host says about itself.",
-         Access::Read, Runs::AtOnce, getHealth,
+         http::Access::Read, Runs::AtOnce, getHealth,
          {{200, "the host is alive", healthSchema}}},
 
         {"GET", "/v1/ready", "Whether the host takes and carries out commands, and why not.",
-         Access::Read, Runs::OnWorker, getReady,
+         http::Access::Read, Runs::OnWorker, getReady,
          {{200, "it does", readySchema}, {503, "it does not", readySchema}}},
 
         {"GET", "/v1/whoami", "Who the client is to the host, and what he may do.",
-         Access::Read, Runs::OnWorker, getWhoami,
+         http::Access::Read, Runs::OnWorker, getWhoami,
          {{200, "the client", whoamiSchema}}},
 
         {"GET", "/v1/metrics", "What the host counts, for a monitoring system.",
-         Access::Read, Runs::OnWorker, getMetrics,
+         http::Access::Read, Runs::OnWorker, getMetrics,
          {{200, "the figures, in Prometheus' text format 0.0.4", nullptr}}},
 
         {"GET", "/v1/openapi.json", "This interface, described for machines.",
-         Access::Read, Runs::OnWorker, getOpenapi,
+         http::Access::Read, Runs::OnWorker, getOpenapi,
          {{200, "the description", descriptionSchema}}},
 
         {"GET", "/v1/depot", "What the depot holds.",
-         Access::Read, Runs::OnWorker, getDepot,
+         http::Access::Read, Runs::OnWorker, getDepot,
          {{200, "the entries", depotListingSchema}},
          {{"path", Type::Text, Need::Optional, "a directory or file; the depot if not given"}},
          Others::None, {}, {404}},
 
         {"DELETE", "/v1/depot", "Removes a file or a directory of the depot.",
-         Access::Act, Runs::OnWorker, deleteDepot,
+         http::Access::Act, Runs::OnWorker, deleteDepot,
          {{200, "it is gone", depotRemovalSchema}},
          {{"path", Type::Text, Need::Required, "what is to be removed"},
           {"recursive", Type::Flag, Need::Optional, "1: a directory with everything in it"}},
          Others::None, {}, {404, 409}},
 
         {"GET", "/v1/depot/sum", "The SHA-256 of files of the depot.",
-         Access::Read, Runs::AtOnce, getDepotSum,
+         http::Access::Read, Runs::AtOnce, getDepotSum,
          {{200, "a row for each file", depotSumsSchema}},
          {{"path", Type::Texts, Need::Required, "a file; may be given several times"}}},
 
         {"GET", "/v1/depot/check", "Whether the host would take files.",
-         Access::Read, Runs::OnWorker, getDepotCheck,
+         http::Access::Read, Runs::OnWorker, getDepotCheck,
          {{200, "a row for each file", depotCheckSchema}},
          {{"path", Type::Texts, Need::Required, "the name to be; may be given several times"},
           {"bytes", Type::Number, Need::Optional, "the size of all of them together"}}},

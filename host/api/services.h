@@ -16,12 +16,8 @@
 #include "host/depot/transfers/transfer_rules.h"
 #include "host/guard/guards.h"
 #include "host/guard/parameter_keeper.h"
-#include "host/http/server_counts.h"
-#include "host/http/worker_pool.h"
 #include "host/journal/dispatcher.h"
 #include "host/journal/journal.h"
-#include "host/metrics/by_label.h"
-#include "host/metrics/counter.h"
 #include "host/outcomes/outcome_feed.h"
 #include "host/outcomes/task_list.h"
 #include "host/outcomes/task_watch.h"
@@ -29,6 +25,10 @@
 #include "host/tables/code_page.h"
 #include "host/tables/row_queue.h"
 #include "host/tables/table_set.h"
+#include "http/server_counts.h"
+#include "http/worker_pool.h"
+#include "metrics/by_label.h"
+#include "metrics/counter.h"
 
 namespace host {
 
@@ -73,12 +73,12 @@ struct Services {
     std::function<CheckSubject()> checkSubject;
     const Depot depotFiles;
     const TransferRules transferRules{depotFiles, home, codePage, guarded};
-    ByLabel<Counter> refusals{refusingGuards()};  ///< by the names of the guards
+    metrics::ByLabel<metrics::Counter> refusals{refusingGuards()};  ///< by the names of the guards
     TransferGate transfers{transferRules, &refusals};
     /// What the server of file transfers counts; main() sets it before it serves.
     std::function<ncs::Counts()> transferServer;
     const std::chrono::steady_clock::time_point started = std::chrono::steady_clock::now();
-    ServerCounts counts;
+    http::ServerCounts counts;
     Journal journal;
     EventPump events{journal};
     OutcomeFeed outcomes{tables};
@@ -91,7 +91,8 @@ struct Services {
     Dispatcher dispatcher{
         journal, tasks, [this](const Task& task) { return handOver(*this, task); },
         [this](Task task) { return endOfRestartInstall(*this, std::move(task)); }};
-    WorkerPool checksums{kChecksumsAtOnce, kWaitingChecksums};  ///< requests for checksums of files
+    http::WorkerPool checksums{kChecksumsAtOnce,
+                               kWaitingChecksums};  ///< requests for checksums of files
 
 private:
     /// The end that came with the last end of the host.

@@ -12,16 +12,16 @@ namespace host {
 Endpoint getWhoami;
 Schema whoamiSchema;
 
-Answer getWhoami(Services& services, const Call& call) {
-    const Peer& peer = call.peer();
+http::Answer getWhoami(Services& services, const Call& call) {
+    const http::Peer& peer = call.peer();
     const nlohmann::ordered_json document = {
         {"user", services.codePage.toUtf8(userName(peer.user))},
         {"uid", peer.user},
         {"gid", peer.group},
         {"pid", peer.process},
-        {"access", peer.access == Access::Act ? "act" : "read"},
+        {"access", peer.access == http::Access::Act ? "act" : "read"},
         {"reason", services.codePage.toUtf8(peer.reason)}};
-    return jsonReply(200, document.dump());
+    return http::jsonReply(200, document.dump());
 }
 
 nlohmann::ordered_json whoamiSchema(Components&) {

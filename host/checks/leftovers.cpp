@@ -16,7 +16,7 @@
 
 #include "host/checks/check.h"
 #include "host/checks/wording.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -89,7 +89,8 @@ std::string productOf(const std::string& folder) {
 /// Whether a program of the home is installing, removing, starting or stopping the product.
 bool isBusyWith(CheckSubject& subject, const std::string& product) {
     const std::string path = subject.inHome("run/." + product + ".lock");
-    const FileDescriptor lock(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    const sys::FileDescriptor lock(
+        ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
     return lock && ::flock(lock.get(), LOCK_SH | LOCK_NB) != 0;
 }
 

@@ -9,7 +9,7 @@
 #include <ctime>
 
 #include "host/process/children/pidfd.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -55,7 +55,7 @@ std::optional<ChildEnd> awaitByLooking(pid_t child, Clock::time_point until) {
 std::optional<ChildEnd> awaitChildEnd(pid_t child, Clock::time_point until) {
     const Look found = look(P_PID, static_cast<id_t>(child));
     if (found.over || Clock::now() >= until) return found.end;
-    const FileDescriptor handle = openPidfd(child);
+    const sys::FileDescriptor handle = openPidfd(child);
     if (handle.get() == -1) return awaitByLooking(child, until);
     pollfd ended{handle.get(), POLLIN, 0};
     while (::poll(&ended, 1, timeLeft(until)) <= 0 && Clock::now() < until) {

@@ -9,14 +9,15 @@
 #include <string_view>
 
 #include "host/commands/trace_texts.h"
-#include "host/process/system/file_descriptor.h"
 #include "secrets/masked.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
 
 void addEnd(const std::string& path, Tail& tail) {
-    const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_CLOEXEC));
+    const sys::FileDescriptor file(
+        ::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_CLOEXEC));
     struct stat found {};
     if (!file || ::fstat(file.get(), &found) != 0 || !S_ISREG(found.st_mode)) return;
     // More than is kept: a secret that begins before the end of the file that is kept is one, too.

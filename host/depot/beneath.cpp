@@ -38,7 +38,7 @@ public:
     Walk(int root, std::string path, int flags)
         : root_(root), rest_(std::move(path)), flags_(flags) {}
 
-    FileDescriptor run() {
+    sys::FileDescriptor run() {
         if (!rest_.empty() && rest_.front() == '/') return fail(EXDEV);
         for (;;) {
             const std::string component = takeComponent(rest_);
@@ -60,22 +60,23 @@ public:
 private:
     int here() const { return below_.empty() ? root_ : below_.back().get(); }
 
-    FileDescriptor fail(int reason) const {
+    sys::FileDescriptor fail(int reason) const {
         errno = reason;
         return {};
     }
 
-    FileDescriptor open(const std::string& component, int flags) const {
-        return FileDescriptor(::openat(here(), component.c_str(), flags | O_NOFOLLOW | O_CLOEXEC));
+    sys::FileDescriptor open(const std::string& component, int flags) const {
+        return sys::FileDescriptor(
+            ::openat(here(), component.c_str(), flags | O_NOFOLLOW | O_CLOEXEC));
     }
 
-    FileDescriptor openHere() const {
-        return FileDescriptor(::openat(here(), ".", flags_ | O_CLOEXEC));
+    sys::FileDescriptor openHere() const {
+        return sys::FileDescriptor(::openat(here(), ".", flags_ | O_CLOEXEC));
     }
 
     /// Goes to a component, or takes a link's text in its place. Sets last_ when it is the end.
     bool enter(const std::string& component, bool isEnd) {
-        FileDescriptor found = open(component, O_PATH);
+        sys::FileDescriptor found = open(component, O_PATH);
         struct stat status {};
         if (!found || ::fstat(found.get(), &status) != 0) return false;
         if (S_ISLNK(status.st_mode)) return replaceByTarget(found);
@@ -95,7 +96,7 @@ private:
         return static_cast<bool>(last_);
     }
 
-    bool replaceByTarget(const FileDescriptor& link) {
+    bool replaceByTarget(const sys::FileDescriptor& link) {
         char target[PATH_MAX];
         const ssize_t length = ::readlinkat(link.get(), "", target, sizeof target);
         if (length <= 0) return false;
@@ -114,31 +115,31 @@ private:
     const int root_;
     std::string rest_;
     const int flags_;
-    std::vector<FileDescriptor> below_;
-    FileDescriptor last_;
+    std::vector<sys::FileDescriptor> below_;
+    sys::FileDescriptor last_;
     int links_ = 0;
 };
 
-FileDescriptor askKernel(int root, const std::string& path, int flags) {
+sys::FileDescriptor askKernel(int root, const std::string& path, int flags) {
     open_how how{};
     how.flags = static_cast<unsigned>(flags) | O_CLOEXEC;
     how.resolve = RESOLVE_BENEATH | RESOLVE_NO_MAGICLINKS;
     // EAGAIN: something was renamed meanwhile, so that the kernel could not be sure about a "..".
     for (int attempts = 0;; ++attempts) {
         const long opened = ::syscall(SYS_openat2, root, path.c_str(), &how, sizeof how);
-        if (opened >= 0) return FileDescriptor(static_cast<int>(opened));
+        if (opened >= 0) return sys::FileDescriptor(static_cast<int>(opened));
         if (errno != EAGAIN || attempts == 100) return {};
     }
 }
 
 }  // namespace
 
-FileDescriptor walkBeneath(int root, const std::string& path, int flags) {
+sys::FileDescriptor walkBeneath(int root, const std::string& path, int flags) {
     return Walk(root, path, flags).run();
 }
 
-FileDescriptor openBeneath(int root, const std::string& path, int flags) {
-    FileDescriptor opened = askKernel(root, path.empty() ? "." : path, flags);
+sys::FileDescriptor openBeneath(int root, const std::string& path, int flags) {
+    sys::FileDescriptor opened = askKernel(root, path.empty() ? "." : path, flags);
     // EPERM: some sandboxes do not know the call and forbid it.
     if (opened || (errno != ENOSYS && errno != EPERM)) return opened;
     return walkBeneath(root, path, flags);

@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -11,9 +11,9 @@ namespace host {
 /// as long as they stay below it; absolute links and ".." above it are refused, and so are links of
 /// the kind that /proc has. `flags` are those of open(2), without O_CREAT; close-on-exec is added.
 /// On failure the result is empty and errno says why: EXDEV when the path leads out.
-FileDescriptor openBeneath(int root, const std::string& path, int flags);
+sys::FileDescriptor openBeneath(int root, const std::string& path, int flags);
 
 /// The same on a kernel that cannot do this by itself: component by component.
-FileDescriptor walkBeneath(int root, const std::string& path, int flags);
+sys::FileDescriptor walkBeneath(int root, const std::string& path, int flags);
 
 }  // namespace host

@@ -70,7 +70,7 @@ DepotEntry entryOf(std::string name, const struct stat& found) {
 }
 
 /// The first `most` names in a directory; false if there are more.
-bool readNames(FileDescriptor opened, std::size_t most, std::vector<std::string>& names) {
+bool readNames(sys::FileDescriptor opened, std::size_t most, std::vector<std::string>& names) {
     const DirectoryStream directory(::fdopendir(opened.get()));
     if (!directory) throw std::system_error(errno, std::generic_category(), "fdopendir");
     opened.release();
@@ -83,7 +83,8 @@ bool readNames(FileDescriptor opened, std::size_t most, std::vector<std::string>
     return true;
 }
 
-std::vector<DepotEntry> entriesOf(const FileDescriptor& directory, std::vector<std::string> names) {
+std::vector<DepotEntry> entriesOf(const sys::FileDescriptor& directory,
+                                  std::vector<std::string> names) {
     std::sort(names.begin(), names.end());
     std::vector<DepotEntry> entries;
     for (std::string& name : names) {
@@ -109,16 +110,17 @@ std::pair<std::string, std::string> split(std::string path) {
 Depot::Depot(std::string directory, std::vector<std::string> keptOut, std::size_t mostEntries)
     : directory_(std::move(directory)), keptOut_(std::move(keptOut)), mostEntries_(mostEntries) {}
 
-FileDescriptor Depot::root() const {
-    FileDescriptor opened(
+sys::FileDescriptor Depot::root() const {
+    sys::FileDescriptor opened(
         ::open(directory_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NONBLOCK));
     if (opened) return opened;
     throw DepotError(Kind::Failed,
                      "the depot " + directory_ + " cannot be opened: " + std::strerror(errno));
 }
 
-FileDescriptor Depot::open(const FileDescriptor& root, const std::string& path, int flags) const {
-    FileDescriptor opened = openBeneath(root.get(), path, flags);
+sys::FileDescriptor Depot::open(const sys::FileDescriptor& root, const std::string& path,
+                                int flags) const {
+    sys::FileDescriptor opened = openBeneath(root.get(), path, flags);
     if (!opened) throw errorAbout(path, errno);
     refuseKept(pathOfDescriptor(opened.get()), path);
     return opened;
@@ -134,8 +136,8 @@ void Depot::refuseKept(const std::string& real, const std::string& path) const {
 
 DepotListing Depot::list(const std::string& given) const {
     const std::string path = withoutSlashes(given);
-    const FileDescriptor top = root();
-    FileDescriptor found = openBeneath(top.get(), path, O_PATH);
+    const sys::FileDescriptor top = root();
+    sys::FileDescriptor found = openBeneath(top.get(), path, O_PATH);
     if (!found) found = open(top, path, O_PATH | O_NOFOLLOW);
     refuseKept(pathOfDescriptor(found.get()), path);
     struct stat status {};
@@ -143,7 +145,7 @@ DepotListing Depot::list(const std::string& given) const {
     DepotListing listing;
     listing.self = entryOf(split(path).second, status);
     if (listing.self.type != DepotEntry::Type::Directory) return listing;
-    FileDescriptor directory(
+    sys::FileDescriptor directory(
         ::openat(found.get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC | O_NONBLOCK));
     if (!directory) throw errorAbout(path, errno);
     std::vector<std::string> names;
@@ -154,9 +156,9 @@ DepotListing Depot::list(const std::string& given) const {
 
 Checksum Depot::sum(const std::string& given) const {
     const std::string path = withoutSlashes(given);
-    const FileDescriptor top = root();
+    const sys::FileDescriptor top = root();
     // Without waiting for the other end of what may be a pipe.
-    const FileDescriptor file = open(top, path, O_RDONLY | O_NONBLOCK | O_NOCTTY);
+    const sys::FileDescriptor file = open(top, path, O_RDONLY | O_NONBLOCK | O_NOCTTY);
     struct stat found {};
     if (::fstat(file.get(), &found) != 0) throw errorAbout(path, errno);
     if (!S_ISREG(found.st_mode)) throw DepotError(Kind::WrongKind, path + " is no regular file");
@@ -173,8 +175,8 @@ void Depot::remove(const std::string& given, bool recursive) const {
     if (name.empty() || name == "." || name == "..") {
         throw DepotError(Kind::WrongKind, "the name of a file in the depot is missing");
     }
-    const FileDescriptor top = root();
-    const FileDescriptor parent = open(top, above, O_PATH | O_DIRECTORY);
+    const sys::FileDescriptor top = root();
+    const sys::FileDescriptor parent = open(top, above, O_PATH | O_DIRECTORY);
     const std::string real = pathOfDescriptor(parent.get()) + "/" + name;
     refuseKept(real, path);
     struct stat found {};

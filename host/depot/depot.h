@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "host/depot/checksum.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -51,8 +51,9 @@ public:
     std::uint64_t freeBytes() const;
 
 private:
-    FileDescriptor root() const;
-    FileDescriptor open(const FileDescriptor& root, const std::string& path, int flags) const;
+    sys::FileDescriptor root() const;
+    sys::FileDescriptor open(const sys::FileDescriptor& root, const std::string& path,
+                             int flags) const;
     void refuseKept(const std::string& realPath, const std::string& path) const;
 
     const std::string directory_;

@@ -9,7 +9,7 @@
 #include <charconv>
 #include <string_view>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -31,7 +31,7 @@ bool isNumber(std::string_view text) {
 InstallResult::InstallResult(const std::string& depot) : path_(depot + "/rc.txt") {}
 
 InstallResult::Content InstallResult::look() const {
-    const FileDescriptor file(
+    const sys::FileDescriptor file(
         ::open(path_.c_str(), O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_CLOEXEC));
     if (!file) return errno == ENOENT ? Content::Missing : Content::Other;
     struct stat found {};

@@ -8,7 +8,7 @@
 #include <cerrno>
 #include <filesystem>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -23,7 +23,7 @@ std::string pathOfDescriptor(int descriptor) {
 std::string realPath(const std::string& path) {
     std::string existing = path;
     while (!existing.empty()) {
-        const FileDescriptor found(::open(existing.c_str(), O_PATH | O_CLOEXEC));
+        const sys::FileDescriptor found(::open(existing.c_str(), O_PATH | O_CLOEXEC));
         if (found) {
             const std::string real = pathOfDescriptor(found.get());
             if (real.empty()) return "";

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "host/process/system/directory_stream.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -17,7 +17,7 @@ namespace {
 constexpr std::size_t kDeepest = 200;
 
 DirectoryStream openDirectory(int parent, const char* name) {
-    FileDescriptor opened(
+    sys::FileDescriptor opened(
         ::openat(parent, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC | O_NONBLOCK));
     DirectoryStream directory(opened ? ::fdopendir(opened.get()) : nullptr);
     if (directory) opened.release();

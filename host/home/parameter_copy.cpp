@@ -9,7 +9,7 @@
 #include <system_error>
 #include <vector>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -29,7 +29,8 @@ struct Content {
 
 /// Nothing if there is no such regular file.
 std::optional<Content> contentOf(const std::string& path) {
-    const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    const sys::FileDescriptor file(
+        ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
     if (!file && (errno == ENOENT || errno == ENOTDIR || errno == ELOOP)) return std::nullopt;
     if (!file) fail("cannot read " + path);
     Content content;
@@ -63,7 +64,7 @@ void writeAll(int descriptor, std::string_view text, const std::string& path) {
 /// A new file with this content, on the disk.
 void writeFile(const std::string& path, const Content& content) {
     ::unlink(path.c_str());  // of a host that was killed here
-    const FileDescriptor file(
+    const sys::FileDescriptor file(
         ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!file) fail("cannot make " + path);
     writeAll(file.get(), content.text, path);
@@ -78,7 +79,7 @@ void writeFile(const std::string& path, const Content& content) {
 
 /// Of a file or a directory, if it is there.
 void syncIfThere(const std::string& path) {
-    const FileDescriptor opened(
+    const sys::FileDescriptor opened(
         ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
     if (opened && ::fsync(opened.get()) != 0 && errno != EINVAL) fail("cannot write " + path);
 }

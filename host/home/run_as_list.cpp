@@ -11,8 +11,8 @@
 #include <string_view>
 #include <system_error>
 
-#include "host/process/system/file_descriptor.h"
 #include "platform/xml1.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -128,7 +128,7 @@ std::string parseFault(XML1_PARSER* parser) {
 }
 
 /// Why the file is not XML; "" if it is.
-std::string parse(const FileDescriptor& file, XML1_PARSER* parser) {
+std::string parse(const sys::FileDescriptor& file, XML1_PARSER* parser) {
     for (std::size_t total = 0; total <= kLargest;) {
         void* const piece = XML1_GetBuffer(parser, kPiece);
         if (piece == nullptr) return "it cannot be parsed for want of memory";
@@ -146,7 +146,7 @@ std::string parse(const FileDescriptor& file, XML1_PARSER* parser) {
 
 /// Fills in the users. Returns why the list as a whole is none; "" if it is one.
 std::string read(RunAsList& list) {
-    const FileDescriptor file(::open(list.path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+    const sys::FileDescriptor file(::open(list.path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
     if (!file) return unreadable(errno);
     struct stat found {};
     if (::fstat(file.get(), &found) != 0 || !S_ISREG(found.st_mode)) return "it is not a file";

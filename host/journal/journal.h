@@ -142,8 +142,8 @@ public:
     /// Transactions so far.
     std::uint64_t transactions() const { return writer_->transactions(); }
     /// See Writer.
-    const Histogram& commitTimes() const { return writer_->commitTimes(); }
-    const Counter& failedCommits() const { return writer_->failures(); }
+    const metrics::Histogram& commitTimes() const { return writer_->commitTimes(); }
+    const metrics::Counter& failedCommits() const { return writer_->failures(); }
 
 private:
     template <typename Reader>

@@ -42,7 +42,7 @@ void insistOnPrivacy(const std::string& path) {
 }
 
 void syncDirectory(const std::string& path) {
-    const FileDescriptor directory(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    const sys::FileDescriptor directory(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (directory) ::fsync(directory.get());
 }
 
@@ -74,10 +74,10 @@ StateDirectory::StateDirectory(const std::string& path)
 }
 
 void StateDirectory::noteCleanEnd() const noexcept {
-    const FileDescriptor mark(
+    const sys::FileDescriptor mark(
         ::open((path_ + kClean).c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (mark) ::fsync(mark.get());
-    const FileDescriptor directory(::open(path_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    const sys::FileDescriptor directory(::open(path_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (directory) ::fsync(directory.get());
 }
 
@@ -97,7 +97,7 @@ std::string StateDirectory::setAside() const {
 }
 
 std::string StateDirectory::notedIdentity() const {
-    const FileDescriptor file(
+    const sys::FileDescriptor file(
         ::open((path_ + kIdentity).c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
     char text[64];
     const ssize_t size = file ? ::read(file.get(), text, sizeof text) : 0;
@@ -105,8 +105,8 @@ std::string StateDirectory::notedIdentity() const {
 }
 
 void StateDirectory::noteIdentity(const std::string& identity) const noexcept {
-    const FileDescriptor file(::open((path_ + kIdentity).c_str(),
-                                     O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOFOLLOW, 0600));
+    const sys::FileDescriptor file(::open(
+        (path_ + kIdentity).c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!file) return;
     const ssize_t written = ::write(file.get(), identity.data(), identity.size());
     if (written > 0) ::fsync(file.get());
@@ -114,7 +114,7 @@ void StateDirectory::noteIdentity(const std::string& identity) const noexcept {
 
 bool StateDirectory::takeReserve() const {
     const std::string name = path_ + kReserveFile;
-    const FileDescriptor file(
+    const sys::FileDescriptor file(
         ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!file) return false;
     struct stat found {};

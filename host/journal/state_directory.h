@@ -5,7 +5,7 @@
 #include <string>
 
 #include "host/process/home_lock.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 

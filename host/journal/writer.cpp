@@ -15,7 +15,7 @@ constexpr std::chrono::seconds kNextTry{1};
 constexpr std::chrono::milliseconds kWipeDelay{500};
 
 /// From a solid-state disk to one that hangs.
-std::vector<Histogram::Duration> commitBounds() {
+std::vector<metrics::Histogram::Duration> commitBounds() {
     using std::chrono::milliseconds;
     return {std::chrono::microseconds(500),
             milliseconds(1),

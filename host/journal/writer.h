@@ -16,8 +16,8 @@
 
 #include "embedded/mutex.h"
 #include "host/journal/database.h"
-#include "host/metrics/counter.h"
-#include "host/metrics/histogram.h"
+#include "metrics/counter.h"
+#include "metrics/histogram.h"
 
 namespace host {
 
@@ -78,9 +78,9 @@ public:
     /// Transactions that were written so far.
     std::uint64_t transactions() const;
     /// How long each of them took, from its begin until it was durable.
-    const Histogram& commitTimes() const { return commitTimes_; }
+    const metrics::Histogram& commitTimes() const { return commitTimes_; }
     /// Transactions that could not be written; each new try of the same changes is one.
-    const Counter& failures() const { return failures_; }
+    const metrics::Counter& failures() const { return failures_; }
 
 private:
     struct Job {
@@ -108,8 +108,8 @@ private:
     const Watch watch_;
 
     std::atomic<Clock::rep> busySince_{0};  ///< 0: it has nothing to do
-    Histogram commitTimes_;
-    Counter failures_;
+    metrics::Histogram commitTimes_;
+    metrics::Counter failures_;
 
     mutable std::mutex lock_;  // around everything below
     std::condition_variable changed_;

@@ -23,7 +23,7 @@ std::vector<std::string> endNames() {
 }
 
 /// From a start that finds the agent running to an install that takes an hour.
-std::vector<Histogram::Duration> taskBounds() {
+std::vector<metrics::Histogram::Duration> taskBounds() {
     using std::chrono::milliseconds;
     using std::chrono::seconds;
     return {milliseconds(100), milliseconds(500), seconds(1),    seconds(5),

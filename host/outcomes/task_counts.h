@@ -6,10 +6,10 @@
 #include <string_view>
 #include <vector>
 
-#include "host/metrics/by_label.h"
-#include "host/metrics/counter.h"
-#include "host/metrics/histogram.h"
 #include "host/outcomes/task.h"
+#include "metrics/by_label.h"
+#include "metrics/counter.h"
+#include "metrics/histogram.h"
 
 namespace host {
 
@@ -25,18 +25,18 @@ public:
     /// commands of the plug-in, "other" among them, and all states that are an end.
     template <typename Visit>
     void eachEnd(const Visit& visit) const {
-        ends_.each([&](std::string_view command, const ByLabel<Counter>& states) {
-            states.each([&](std::string_view state, const Counter& counter) {
-                if (state != kOtherLabel) visit(command, state, counter.value());
+        ends_.each([&](std::string_view command, const metrics::ByLabel<metrics::Counter>& states) {
+            states.each([&](std::string_view state, const metrics::Counter& counter) {
+                if (state != metrics::kOtherLabel) visit(command, state, counter.value());
             });
         });
     }
     /// How long tasks ran that did run, by command.
-    const ByLabel<Histogram>& durations() const { return durations_; }
+    const metrics::ByLabel<metrics::Histogram>& durations() const { return durations_; }
 
 private:
-    ByLabel<ByLabel<Counter>> ends_;
-    ByLabel<Histogram> durations_;
+    metrics::ByLabel<metrics::ByLabel<metrics::Counter>> ends_;
+    metrics::ByLabel<metrics::Histogram> durations_;
 };
 
 }  // namespace host

@@ -22,14 +22,14 @@ constexpr const char* kFileName = "/.zavhost.lock";
 constexpr std::chrono::seconds kWritingTime{2};
 constexpr std::chrono::milliseconds kReadPause{1};
 
-FileDescriptor openFile(const std::string& name) {
-    FileDescriptor file(
+sys::FileDescriptor openFile(const std::string& name) {
+    sys::FileDescriptor file(
         ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
     if (!file) throw StartError("cannot make " + name, errno);
     return file;
 }
 
-bool tryLock(const FileDescriptor& file, const std::string& name) {
+bool tryLock(const sys::FileDescriptor& file, const std::string& name) {
     while (::flock(file.get(), LOCK_EX | LOCK_NB) != 0) {
         if (errno == EWOULDBLOCK) return false;
         if (errno != EINTR) throw StartError("cannot lock " + name, errno);
@@ -39,7 +39,7 @@ bool tryLock(const FileDescriptor& file, const std::string& name) {
 
 /// The process id in the file, if it is that of a process. It is not while the owner has not
 /// written yet: then the file is empty or still has the id of an owner that was killed.
-std::optional<pid_t> ownerIn(const FileDescriptor& file) {
+std::optional<pid_t> ownerIn(const sys::FileDescriptor& file) {
     char text[32];
     const ssize_t length = ::pread(file.get(), text, sizeof text, 0);
     if (length <= 0) return std::nullopt;
@@ -50,7 +50,7 @@ std::optional<pid_t> ownerIn(const FileDescriptor& file) {
     return pid;
 }
 
-void writeOwner(const FileDescriptor& file, const std::string& name) {
+void writeOwner(const sys::FileDescriptor& file, const std::string& name) {
     const std::string text = std::to_string(::getpid()) + "\n";
     if (::ftruncate(file.get(), 0) != 0 ||
         ::pwrite(file.get(), text.data(), text.size(), 0) != static_cast<ssize_t>(text.size())) {
@@ -65,7 +65,7 @@ std::string wordsFor(const std::optional<pid_t>& owner) {
 }  // namespace
 
 std::string HomeLock::ownerOf(const std::string& directory) {
-    const FileDescriptor file(
+    const sys::FileDescriptor file(
         ::open((directory + kFileName).c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
     if (!file || ::flock(file.get(), LOCK_SH | LOCK_NB) == 0 || errno != EWOULDBLOCK) return "";
     return wordsFor(ownerIn(file));
@@ -73,7 +73,7 @@ std::string HomeLock::ownerOf(const std::string& directory) {
 
 HomeLock::HomeLock(const std::string& directory, const std::string& what) {
     const std::string name = directory + kFileName;
-    FileDescriptor file = openFile(name);
+    sys::FileDescriptor file = openFile(name);
     std::optional<pid_t> owner;
     const auto deadline = std::chrono::steady_clock::now() + kWritingTime;
     while (!tryLock(file, name)) {

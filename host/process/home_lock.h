@@ -4,7 +4,7 @@
 #include <string>
 
 #include "host/process/start_error.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -30,7 +30,7 @@ public:
     explicit HomeLock(const std::string& directory, const std::string& what = "home");
 
 private:
-    FileDescriptor file_;
+    sys::FileDescriptor file_;
 };
 
 }  // namespace host

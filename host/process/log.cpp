@@ -13,8 +13,8 @@
 #include <cstdlib>
 #include <nlohmann/json.hpp>
 
-#include "host/process/system/file_descriptor.h"
 #include "host/text/utc_time.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -135,7 +135,7 @@ bool sendToJournal(const LogEntry& entry, std::string_view path) {
     if (path.size() >= sizeof address.sun_path) return false;
     address.sun_family = AF_UNIX;
     path.copy(address.sun_path, path.size());
-    const FileDescriptor socket(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+    const sys::FileDescriptor socket(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     if (!socket) return false;
     // A journal that is stuck holds nobody up.
     const ssize_t sent =

@@ -41,8 +41,8 @@ const sockaddr* generic(const sockaddr_un& address) {
     return reinterpret_cast<const sockaddr*>(&address);
 }
 
-FileDescriptor newSocket(const std::string& path) {
-    FileDescriptor made(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+sys::FileDescriptor newSocket(const std::string& path) {
+    sys::FileDescriptor made(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
     if (!made) throw StartError("socket " + path, errno);
     return made;
 }
@@ -57,9 +57,9 @@ bool isStill(int descriptor, const std::string& name) {
 }
 
 /// The locked file; none if somebody else has locked it.
-FileDescriptor lockedFile(const std::string& name) {
+sys::FileDescriptor lockedFile(const std::string& name) {
     while (true) {
-        FileDescriptor lock(
+        sys::FileDescriptor lock(
             ::open(name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK, 0600));
         if (!lock) throw StartError("cannot make " + name, errno);
         if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
@@ -71,10 +71,10 @@ FileDescriptor lockedFile(const std::string& name) {
     }
 }
 
-FileDescriptor takeLock(const std::string& path) {
+sys::FileDescriptor takeLock(const std::string& path) {
     const auto until = std::chrono::steady_clock::now() + kChildHolds;
     while (true) {
-        if (FileDescriptor lock = lockedFile(path + ".lock")) return lock;
+        if (sys::FileDescriptor lock = lockedFile(path + ".lock")) return lock;
         if (std::chrono::steady_clock::now() >= until) failInUse(path);
         std::this_thread::sleep_for(kChildPause);
     }
@@ -116,7 +116,7 @@ void SocketFile::takePath() {
     lock_ = takeLock(path_);
 }
 
-SocketFile::SocketFile(const std::string& path, Connects connects, FileDescriptor passed)
+SocketFile::SocketFile(const std::string& path, Connects connects, sys::FileDescriptor passed)
     : path_(path), connects_(connects) {
     takePath();
     socket_ = std::move(passed);
@@ -146,7 +146,7 @@ void SocketFile::replaceStale() const {
     }
     if (!S_ISSOCK(found.st_mode)) throw StartError(path_ + " exists and is not a socket");
     const sockaddr_un address = addressOf(path_);
-    const FileDescriptor probe = newSocket(path_);
+    const sys::FileDescriptor probe = newSocket(path_);
     // EAGAIN: a process listens, but is too busy to accept.
     if (::connect(probe.get(), generic(address), sizeof address) == 0 || errno == EAGAIN) {
         failInUse(path_);

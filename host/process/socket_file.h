@@ -5,7 +5,7 @@
 
 #include <string>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -35,7 +35,7 @@ public:
     explicit SocketFile(const std::string& path, Connects connects = Connects::Owner);
     /// Takes a listening socket that somebody else has bound at this path, such as a service
     /// manager, and leaves its file, with its mode, where it is. Throws StartError as above.
-    SocketFile(const std::string& path, Connects connects, FileDescriptor passed);
+    SocketFile(const std::string& path, Connects connects, sys::FileDescriptor passed);
     ~SocketFile();
     SocketFile(const SocketFile&) = delete;
     SocketFile& operator=(const SocketFile&) = delete;
@@ -55,8 +55,8 @@ private:
 
     const std::string path_;
     const Connects connects_;
-    FileDescriptor lock_;
-    FileDescriptor socket_;
+    sys::FileDescriptor lock_;
+    sys::FileDescriptor socket_;
     dev_t device_ = 0;
     ino_t inode_ = 0;
 };

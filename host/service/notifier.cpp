@@ -31,8 +31,8 @@ std::string systemAddress(std::string address) {
     return address;
 }
 
-FileDescriptor datagramSocket() {
-    FileDescriptor made(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+sys::FileDescriptor datagramSocket() {
+    sys::FileDescriptor made(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     const timeval wait{kLongestWait, 0};
     if (!made || ::setsockopt(made.get(), SOL_SOCKET, SO_SNDTIMEO, &wait, sizeof wait) != 0) {
         throw StartError("no socket for the service manager: " +

@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -27,7 +27,7 @@ private:
     bool send(const std::string& lines, bool waits) const;
 
     std::string address_;  ///< as the system takes it, with 0 in the place of '@'
-    FileDescriptor socket_;
+    sys::FileDescriptor socket_;
 };
 
 /// RELOADING=1 with the time that goes with it. READY=1 has to follow.

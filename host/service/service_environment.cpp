@@ -86,7 +86,7 @@ std::string socketPathOf(int descriptor) {
 }
 
 PassedSocket adopt(int number, std::string name) {
-    PassedSocket socket{FileDescriptor(number), std::move(name), socketPathOf(number)};
+    PassedSocket socket{sys::FileDescriptor(number), std::move(name), socketPathOf(number)};
     if (socket.path.empty()) {
         throw StartError("the service manager passed descriptor " + std::to_string(number) +
                          ", which is no listening Unix stream socket with a path");

@@ -7,13 +7,13 @@
 #include <vector>
 
 #include "host/process/configuration/environment.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
 /// A listening socket that the service manager has made.
 struct PassedSocket {
-    FileDescriptor descriptor;
+    sys::FileDescriptor descriptor;
     std::string name;  ///< as the service manager calls it; may be empty
     std::string path;  ///< of its file
 };

@@ -35,20 +35,20 @@ host::Api& api() {
     return made;
 }
 
-host::Answer answerTo(host::Request request) {
+Answer answerTo(Request request) {
     auto handled = api().handle(std::move(request));
-    if (auto* const job = std::get_if<host::Job>(&handled)) return (*job)();
-    return std::get<host::Answer>(std::move(handled));
+    if (auto* const job = std::get_if<Job>(&handled)) return (*job)();
+    return std::get<Answer>(std::move(handled));
 }
 
-void checkError(const host::Reply& reply, const json& document) {
+void checkError(const Reply& reply, const json& document) {
     require(reply.status == 400 || reply.status == 404 || reply.status == 405,
             "a refusal has one of three statuses");
     require(!document.at("error").get<std::string>().empty(), "a refusal says why");
     require(reply.fields.empty() == (reply.status != 405), "a wrong method says the right one");
 }
 
-void checkReply(const host::Reply& reply) {
+void checkReply(const Reply& reply) {
     if (reply.status == 204) {
         require(reply.body.empty() && !reply.fields.empty(), "methods stand in the head alone");
         return;
@@ -60,7 +60,7 @@ void checkReply(const host::Reply& reply) {
 }
 
 /// A row that is published meanwhile is an event, or it is not what the stream is for.
-void checkStream(host::EventSource& source) {
+void checkStream(EventSource& source) {
     require(source.empty(), "a stream begins with nothing");
     require(table().publish(sampleRow("two", -2, "\xC3\xA9\xFF")) == OXA_OK, "streams take rows");
     const std::string text = source.take();
@@ -76,14 +76,14 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const std::string_view line = input.line();
     const std::size_t blank = std::min(line.find(' '), line.size());
     const std::string_view target = line.substr(std::min(blank + 1, line.size()));
-    const host::Answer answer = answerTo({std::string(line.substr(0, blank)),
-                                          std::string(target),
-                                          std::string(input.rest()),
-                                          {0, 0, 0, host::Access::Act}});
-    if (const auto* const reply = std::get_if<host::Reply>(&answer)) {
+    const Answer answer = answerTo({std::string(line.substr(0, blank)),
+                                    std::string(target),
+                                    std::string(input.rest()),
+                                    {0, 0, 0, http::Access::Act}});
+    if (const auto* const reply = std::get_if<Reply>(&answer)) {
         checkReply(*reply);
     } else {
-        checkStream(*std::get<std::unique_ptr<host::EventSource>>(answer));
+        checkStream(*std::get<std::unique_ptr<EventSource>>(answer));
     }
     return 0;
 }

@@ -3,8 +3,8 @@
 #include <iterator>
 #include <nlohmann/json.hpp>
 
-#include "host/http/url.h"
 #include "host/tables/code_page.h"
+#include "http/url.h"
 #include "support/fuzz_support.h"
 
 using fuzz::require;
@@ -24,7 +24,7 @@ std::string escaped(const std::string& text) {
 void checkTarget(std::string_view text) {
     // Values that hold the character 0 unescaped are refused by the HTTP parser before.
     if (text.find('\0') != std::string_view::npos) return;
-    const auto parsed = host::parseTarget(text);
+    const auto parsed = http::parseTarget(text);
     if (!parsed) return;
     std::string again = escaped(parsed->path);
     char separator = '?';
@@ -33,7 +33,7 @@ void checkTarget(std::string_view text) {
         again += separator + escaped(name) + "=" + escaped(value);
         separator = '&';
     }
-    const auto second = host::parseTarget(again);
+    const auto second = http::parseTarget(again);
     require(second.has_value() && second->path == parsed->path &&
                 second->parameters == parsed->parameters,
             "what was decoded can be encoded again");

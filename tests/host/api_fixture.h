@@ -21,21 +21,21 @@ protected:
     }
 
     /// The answer, whoever makes it.
-    host::Answer answerTo(const std::string& method, const std::string& target,
-                          const std::string& body = "", host::Access access = host::Access::Act) {
+    http::Answer answerTo(const std::string& method, const std::string& target,
+                          const std::string& body = "", http::Access access = http::Access::Act) {
         auto handled = api->handle({method, target, body, {0, 0, 0, access}});
-        if (auto* const job = std::get_if<host::Job>(&handled)) return (*job)();
-        return std::get<host::Answer>(std::move(handled));
+        if (auto* const job = std::get_if<http::Job>(&handled)) return (*job)();
+        return std::get<http::Answer>(std::move(handled));
     }
     /// An answer that is complete.
-    host::Reply ask(const std::string& method, const std::string& target,
-                    const std::string& body = "", host::Access access = host::Access::Act) {
-        host::Answer answer = answerTo(method, target, body, access);
-        if (auto* const reply = std::get_if<host::Reply>(&answer)) return std::move(*reply);
+    http::Reply ask(const std::string& method, const std::string& target,
+                    const std::string& body = "", http::Access access = http::Access::Act) {
+        http::Answer answer = answerTo(method, target, body, access);
+        if (auto* const reply = std::get_if<http::Reply>(&answer)) return std::move(*reply);
         return {0, "not a reply"};
     }
-    void expectError(unsigned status, const std::string& text, const host::Reply& reply) {
-        EXPECT_EQ(reply.body, host::errorReply(status, text).body);
+    void expectError(unsigned status, const std::string& text, const http::Reply& reply) {
+        EXPECT_EQ(reply.body, http::errorReply(status, text).body);
         EXPECT_EQ(reply.status, status) << text;
     }
 

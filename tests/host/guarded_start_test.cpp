@@ -11,10 +11,10 @@
 #include <vector>
 
 #include "host/checks/check_list.h"
-#include "host/process/system/file_descriptor.h"
 #include "host/raw_client.h"
 #include "support/host/program.h"
 #include "support/host/starter_home.h"
+#include "system/file_descriptor.h"
 
 namespace {
 
@@ -59,7 +59,7 @@ protected:
     }
     /// A port of the loopback address that nobody uses.
     static std::uint16_t freePort() {
-        const host::FileDescriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
+        const sys::FileDescriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
         sockaddr_in address{};
         address.sin_family = AF_INET;
         address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);

@@ -14,10 +14,11 @@
 #include "host/api/api.h"
 #include "host/api/routes.h"
 #include "host/api/services.h"
-#include "host/http/server.h"
 #include "host/made_up_table.h"
+#include "host/peers/peer_of.h"
 #include "host/process/socket_file.h"
 #include "host/raw_client.h"
+#include "http/server.h"
 #include "support/scratch_dir.h"
 
 /// Holds samples until it is opened; opened at the latest when the test ends.
@@ -41,13 +42,13 @@ protected:
     ServerTest() { table.RegisterWithManager(); }
     ~ServerTest() override { stop(); }
 
-    void start(const host::ServerLimits& limits = {}) {
+    void start(const http::ServerLimits& limits = {}, const host::AccessGroups& groups = {}) {
         socket.emplace(scratch.path("s"));
         services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it",
                          host::RowQueue::Limits{}, true, host::Places{}, journal);
         api.emplace(*services, host::routes());
-        server =
-            std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts, limits);
+        server = std::make_unique<http::HttpServer>(socket->listen(), host::doorFor(groups), *api,
+                                                    services->counts, limits);
         serving = std::thread([this] {
             server->run();
             ended = true;
@@ -85,7 +86,7 @@ protected:
     std::optional<host::SocketFile> socket;
     std::optional<host::Services> services;
     std::optional<host::Api> api;
-    std::unique_ptr<host::HttpServer> server;
+    std::unique_ptr<http::HttpServer> server;
     std::thread serving;
     std::atomic<bool> ended{false};
 };

@@ -16,7 +16,7 @@ namespace host {
 Endpoint getDepot, deleteDepot;
 Schema depotListingSchema, depotRemovalSchema, depotEntrySchema;
 
-Answer getDepot(Services& services, const Call& call) {
+http::Answer getDepot(Services& services, const Call& call) {
     const std::string* const given = call.text("path");
     const std::string path = given != nullptr ? *given : "";
     const DepotListing listing = services.depotFiles.list(path);
@@ -29,10 +29,10 @@ Answer getDepot(Services& services, const Call& call) {
         document["entries"].push_back(documentOf(entry));
     if (!isDirectory) document["entries"].push_back(documentOf(listing.self));
     document["complete"] = listing.complete;
-    return jsonReply(200, document.dump());
+    return http::jsonReply(200, document.dump());
 }
 
-Answer deleteDepot(Services& services, const Call& call) {
+http::Answer deleteDepot(Services& services, const Call& call) {
     const std::string& path = call.required("path");
     if (services.guarded &&
         services.transfers.isReceiving(services.transferRules.destination(path))) {
@@ -42,7 +42,7 @@ Answer deleteDepot(Services& services, const Call& call) {
     services.depotFiles.remove(path, call.flag("recursive"));
     nlohmann::ordered_json document;
     putName(document, "removed", path);
-    return jsonReply(200, document.dump());
+    return http::jsonReply(200, document.dump());
 }
 
 nlohmann::ordered_json depotListingSchema(Components& components) {

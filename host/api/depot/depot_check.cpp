@@ -99,7 +99,7 @@ Objection tooLittleSpace(std::uint64_t needed, std::uint64_t free) {
 
 }  // namespace
 
-Answer getDepotCheck(Services& services, const Call& call) {
+http::Answer getDepotCheck(Services& services, const Call& call) {
     const std::uint64_t free = services.depotFiles.freeBytes();
     PushVerdict verdict = lookAt(services, call.texts("path"));
     ordered_json document;
@@ -111,7 +111,8 @@ Answer getDepotCheck(Services& services, const Call& call) {
     document["replaced_bytes"] = verdict.freed;
     if (!fits) putObjection(document, tooLittleSpace(needed, free + verdict.freed));
     document["files"] = std::move(verdict.files);
-    return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+    return http::jsonReply(200,
+                           document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
 }
 
 namespace {

@@ -12,15 +12,15 @@
 #include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/depot/depot_error.h"
-#include "host/http/responder.h"
+#include "http/responder.h"
 
 namespace host {
 namespace {
 
 constexpr std::chrono::hours kLongest{1};
 
-Reply tryAgain(const char* reason) {
-    Reply reply = errorReply(503, reason);
+http::Reply tryAgain(const char* reason) {
+    http::Reply reply = http::errorReply(503, reason);
     reply.fields.emplace_back("Retry-After", "5");
     return reply;
 }
@@ -42,13 +42,14 @@ nlohmann::ordered_json rowOf(const Depot& depot, const std::string& path) {
 struct Sums {
     Services& services;
     const std::vector<std::string> paths;
-    const Responder responder;
+    const http::Responder responder;
     nlohmann::ordered_json files = nlohmann::ordered_json::array();
 };
 
-Reply replyWith(nlohmann::ordered_json files) {
+http::Reply replyWith(nlohmann::ordered_json files) {
     const nlohmann::ordered_json document = {{"files", std::move(files)}};
-    return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+    return http::jsonReply(200,
+                           document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
 }
 
 /// Computes the next sum. Between two of them other requests have their turn, if there is room to
@@ -63,7 +64,7 @@ void advance(const std::shared_ptr<Sums>& sums) {
             }
         } while (!sums->services.checksums.submit([sums] { advance(sums); }));
     } catch (const std::exception& error) {
-        sums->responder(errorReply(500, error.what()));
+        sums->responder(http::errorReply(500, error.what()));
     }
 }
 
@@ -72,14 +73,14 @@ void advance(const std::shared_ptr<Sums>& sums) {
 Endpoint getDepotSum;
 Schema depotSumsSchema;
 
-Answer getDepotSum(Services& services, const Call& call) {
-    const auto begin = [&services, paths = call.texts("path")](const Responder& responder) {
+http::Answer getDepotSum(Services& services, const Call& call) {
+    const auto begin = [&services, paths = call.texts("path")](const http::Responder& responder) {
         const auto sums = std::make_shared<Sums>(Sums{services, paths, responder});
         const bool taken = services.checksums.submit([sums] { advance(sums); });
         if (!taken) responder(tryAgain("too many requests for checksums are waiting"));
     };
-    const auto atLimit = []() -> Answer { return tryAgain("the checksums are not ready"); };
-    return Later{begin, kLongest, atLimit};
+    const auto atLimit = []() -> http::Answer { return tryAgain("the checksums are not ready"); };
+    return http::Later{begin, kLongest, atLimit};
 }
 
 nlohmann::ordered_json depotSumsSchema(Components&) {

@@ -204,7 +204,7 @@ Json errorAnswers(Components& components) {
 Json operationOf(const Route& route, Components& components) {
     Json operation = {{"operationId", operationName(route)},
                       {"summary", route.doc},
-                      {"x-access", route.access == Access::Act ? "act" : "read"}};
+                      {"x-access", route.access == http::Access::Act ? "act" : "read"}};
     const Json parameters = parametersOf(route, components);
     if (!parameters.empty()) operation["parameters"] = parameters;
     if (!route.body.empty()) operation["requestBody"] = bodyOf(route, components);

@@ -10,9 +10,9 @@ namespace host {
 Endpoint getOpenapi;
 Schema descriptionSchema;
 
-Answer getOpenapi(Services&, const Call&) {
+http::Answer getOpenapi(Services&, const Call&) {
     static const std::string document = describe(routes());
-    return Reply{200, document};
+    return http::Reply{200, document};
 }
 
 nlohmann::ordered_json descriptionSchema(Components&) {

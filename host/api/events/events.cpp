@@ -17,7 +17,7 @@
 namespace host {
 namespace {
 
-class RowEvents final : public EventSource {
+class RowEvents final : public http::EventSource {
 public:
     /// `table` and `codePage` outlive the source.
     RowEvents(const oxa::Table& table, const CodePage& codePage, RowQueue::Limits limits)
@@ -38,10 +38,11 @@ public:
         const RowQueue::Batch batch = queue_->take();
         std::string text;
         for (std::size_t i = 0; i < batch.rows.count(); ++i) {
-            appendEvent(text, {rowDocument(table_, rowOf(batch.rows, i), codePage_), {}, {}});
+            http::appendEvent(text, {rowDocument(table_, rowOf(batch.rows, i), codePage_), {}, {}});
         }
         if (batch.lost > 0) {
-            appendEvent(text, {"{\"lost\":" + std::to_string(batch.lost) + "}", "overflow", {}});
+            http::appendEvent(text,
+                              {"{\"lost\":" + std::to_string(batch.lost) + "}", "overflow", {}});
         }
         return text;
     }
@@ -53,8 +54,8 @@ private:
     std::unique_ptr<oxa::Subscription> subscription_;
 };
 
-std::unique_ptr<EventSource> rowEvents(Services& services, const oxa::Table& table,
-                                       const std::vector<oxa::Predicate>& where) {
+std::unique_ptr<http::EventSource> rowEvents(Services& services, const oxa::Table& table,
+                                             const std::vector<oxa::Predicate>& where) {
     auto source = std::make_unique<RowEvents>(table, services.codePage, services.eventLimits);
     if (!source->subscribe(where)) return nullptr;
     return source;
@@ -75,12 +76,13 @@ void checkOutcomeParameters(const Call& call, const std::string& table) {
 Endpoint getEvents;
 Schema overflowSchema;
 
-Answer getEvents(Services& services, const Call& call) {
+http::Answer getEvents(Services& services, const Call& call) {
     const std::string& name = call.required("table");
     const oxa::Table* const table = services.tables.find(name);
-    if (table == nullptr) return errorReply(404, "there is no table \"" + name + "\"");
-    if (name == plugin::kRequestTable && call.peer().access < Access::Act) {
-        return errorReply(403, "you may only read from this host; " + name + " takes requests");
+    if (table == nullptr) return http::errorReply(404, "there is no table \"" + name + "\"");
+    if (name == plugin::kRequestTable && call.peer().access < http::Access::Act) {
+        return http::errorReply(403,
+                                "you may only read from this host; " + name + " takes requests");
     }
     const ConditionReader reader(*table, services.codePage);
     std::vector<oxa::Predicate> where;
@@ -92,8 +94,8 @@ Answer getEvents(Services& services, const Call& call) {
                                       {std::move(where), call.flag("tasks"),
                                        outputsFor(call.peer()), call.after()})
                       : rowEvents(services, *table, where);
-    if (!source) return errorReply(500, "the table takes no subscription");
-    return Answer(std::move(source));
+    if (!source) return http::errorReply(500, "the table takes no subscription");
+    return http::Answer(std::move(source));
 }
 
 nlohmann::ordered_json overflowSchema(Components&) {

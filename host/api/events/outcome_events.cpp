@@ -135,20 +135,20 @@ private:
     void passTo(std::int64_t number, std::string& text) {
         if (!lost_ && number == position_) return;
         const std::string missing = lost_ ? "null" : std::to_string(number - position_);
-        appendEvent(text, {"{\"missing\":" + missing + "}", "gap", idOf(number)});
+        http::appendEvent(text, {"{\"missing\":" + missing + "}", "gap", idOf(number)});
         lost_ = false;
         position_ = number;
     }
     void append(const JournalEvent& event, std::string& text) {
         if (event.kind == EventKind::Row) {
             if (filter_ && !filter_->takes(whole(event.row, table_).data())) return;
-            appendEvent(
+            http::appendEvent(
                 text, {rowDocument(table_, event.row, services_.codePage), {}, idOf(event.number)});
         } else if (tasks_) {
             const std::optional<Task> task = services_.journal.byNumber(event.task);
             if (!task || !wants(*task)) return;
-            appendEvent(text,
-                        {taskDocument(*task, services_, outputs_), "task", idOf(event.number)});
+            http::appendEvent(
+                text, {taskDocument(*task, services_, outputs_), "task", idOf(event.number)});
         }
     }
     bool wants(const Task& task) {
@@ -185,7 +185,7 @@ private:
     std::function<void()> wake_ ZAV_GUARDED_BY(lock_);
 };
 
-class OutcomeEvents final : public EventSource {
+class OutcomeEvents final : public http::EventSource {
 public:
     OutcomeEvents(std::shared_ptr<OutcomeStream> stream, std::string position)
         : stream_(std::move(stream)), position_(std::move(position)) {}
@@ -212,8 +212,8 @@ EventPosition positionOf(const std::string& text) {
 
 }  // namespace
 
-std::unique_ptr<EventSource> outcomeEvents(Services& services, const oxa::Table& table,
-                                           const OutcomeWish& wish) {
+std::unique_ptr<http::EventSource> outcomeEvents(Services& services, const oxa::Table& table,
+                                                 const OutcomeWish& wish) {
     const EventPosition position =
         wish.after.empty() ? services.journal.lastEvent() : positionOf(wish.after);
     const auto stream = std::make_shared<OutcomeStream>(services, table, wish, position);

@@ -7,7 +7,7 @@
 
 #include "embedded/oxa_host.h"
 #include "host/api/tasks/task_document.h"
-#include "host/http/event_source.h"
+#include "http/event_source.h"
 
 namespace host {
 
@@ -30,7 +30,7 @@ struct OutcomeWish {
 ///
 /// The services outlive the source. Null when the table makes no filter. Throws BadRequest for an
 /// event that cannot be one.
-std::unique_ptr<EventSource> outcomeEvents(Services& services, const oxa::Table& table,
-                                           const OutcomeWish& wish);
+std::unique_ptr<http::EventSource> outcomeEvents(Services& services, const oxa::Table& table,
+                                                 const OutcomeWish& wish);
 
 }  // namespace host

@@ -15,59 +15,60 @@ double secondsOf(Time time) {
     return std::max(0.0, std::chrono::duration<double>(time).count());
 }
 
-double figure(const Counter& counter) {
+double figure(const metrics::Counter& counter) {
     return static_cast<double>(counter.value());
 }
 
-void add(Exposition& out, const std::optional<double>& value) {
+void add(metrics::Exposition& out, const std::optional<double>& value) {
     if (value) out.sample(*value);
 }
 
-void tellTasks(const Scrape& scrape, Exposition& out) {
+void tellTasks(const Scrape& scrape, metrics::Exposition& out) {
     scrape.services.tasks.counts().eachEnd(
         [&out](std::string_view command, std::string_view outcome, std::uint64_t count) {
             out.sample({{"command", command}, {"outcome", outcome}}, static_cast<double>(count));
         });
 }
 
-void tellDurations(const Scrape& scrape, Exposition& out) {
+void tellDurations(const Scrape& scrape, metrics::Exposition& out) {
     scrape.services.tasks.counts().durations().each(
-        [&out](std::string_view command, const Histogram& durations) {
+        [&out](std::string_view command, const metrics::Histogram& durations) {
             out.sample({{"command", command}}, durations.snapshot());
         });
 }
 
-void tellQueueAge(const Scrape& scrape, Exposition& out) {
+void tellQueueAge(const Scrape& scrape, metrics::Exposition& out) {
     if (!scrape.unfinished) return;
     const auto oldest = scrape.unfinished->oldestQueued;
     out.sample(oldest ? secondsOf(scrape.now - *oldest) : 0);
 }
 
-void tellRefusals(const Scrape& scrape, Exposition& out) {
-    scrape.services.refusals.each([&out](std::string_view guard, const Counter& counter) {
+void tellRefusals(const Scrape& scrape, metrics::Exposition& out) {
+    scrape.services.refusals.each([&out](std::string_view guard, const metrics::Counter& counter) {
         out.sample({{"guard", guard}}, figure(counter));
     });
 }
 
 /// The connections of both sockets. `rpc` is a figure of the one for file transfers.
 template <typename Rpc>
-void tellSockets(const Scrape& scrape, Exposition& out, double http, Rpc ncs::Counts::*rpc) {
+void tellSockets(const Scrape& scrape, metrics::Exposition& out, double http,
+                 Rpc ncs::Counts::*rpc) {
     out.sample({{"socket", "http"}}, http);
     if (!scrape.services.transferServer) return;
     out.sample({{"socket", "rpc"}}, static_cast<double>(scrape.services.transferServer().*rpc));
 }
 
-void tellInventoryAge(const Scrape&, Exposition& out) {
+void tellInventoryAge(const Scrape&, metrics::Exposition& out) {
     const auto last = lastInventory();
     if (last) out.sample(secondsOf(std::chrono::steady_clock::now() - last->read));
 }
 
-void tellInventorySize(const Scrape&, Exposition& out) {
+void tellInventorySize(const Scrape&, metrics::Exposition& out) {
     const auto last = lastInventory();
     if (last) out.sample(static_cast<double>(last->products));
 }
 
-void tellBuild(const Scrape&, Exposition& out) {
+void tellBuild(const Scrape&, metrics::Exposition& out) {
     const std::string width = std::to_string(sizeof(void*) * 8);
     out.sample({{"version", kVersion}, {"width", width}}, 1);
 }
@@ -75,11 +76,11 @@ void tellBuild(const Scrape&, Exposition& out) {
 }  // namespace
 
 const std::vector<Metric>& metricTable() {
-    constexpr auto kCounter = MetricType::Counter;
-    constexpr auto kGauge = MetricType::Gauge;
-    constexpr auto kHistogram = MetricType::Histogram;
+    constexpr auto kCounter = metrics::MetricType::Counter;
+    constexpr auto kGauge = metrics::MetricType::Gauge;
+    constexpr auto kHistogram = metrics::MetricType::Histogram;
     using S = const Scrape&;
-    using Out = Exposition&;
+    using Out = metrics::Exposition&;
     // clang-format off
     static const std::vector<Metric> table = {
         {"zavhost_tasks_total", kCounter, "command, outcome",

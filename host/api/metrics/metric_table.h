@@ -5,8 +5,8 @@
 #include <vector>
 
 #include "host/api/services.h"
-#include "host/metrics/exposition.h"
 #include "host/process/figures.h"
+#include "metrics/exposition.h"
 
 namespace host {
 
@@ -21,11 +21,11 @@ struct Scrape {
 /// One metric. The values of its labels are fixed sets: none comes from a client.
 struct Metric {
     const char* name;  ///< with "_total" for counters, and the unit, in its plural, before that
-    MetricType type;
+    metrics::MetricType type;
     const char* labels;  ///< their names, for the documentation, with ", " between them
     const char* help;    ///< one sentence
     /// Adds the metric's samples; none where the value is not known.
-    void (*collect)(const Scrape& scrape, Exposition& out);
+    void (*collect)(const Scrape& scrape, metrics::Exposition& out);
 };
 
 /// In the order in which they are told.

@@ -21,15 +21,15 @@ std::optional<Journal::Unfinished> readUnfinished(Journal& journal) {
 
 Endpoint getMetrics;
 
-Answer getMetrics(Services& services, const Call&) {
+http::Answer getMetrics(Services& services, const Call&) {
     const Scrape scrape{services, readUnfinished(services.journal), services.journal.latestTime(),
                         readProcessFigures()};
-    Exposition out;
+    metrics::Exposition out;
     for (const Metric& metric : metricTable()) {
         out.metric(metric.name, metric.type, metric.help);
         metric.collect(scrape, out);
     }
-    return Reply{200, out.text(), std::string(Exposition::kContentType)};
+    return http::Reply{200, out.text(), std::string(metrics::Exposition::kContentType)};
 }
 
 }  // namespace host

@@ -41,20 +41,20 @@ bool isForced(const nlohmann::json& body) {
 Endpoint postQuery;
 Schema conditionsSchema;
 
-Answer postQuery(Services& services, const Call& call) {
+http::Answer postQuery(Services& services, const Call& call) {
     const auto& name = call.body().at("table").get_ref<const std::string&>();
     const oxa::Table* const table = services.tables.find(name);
-    if (table == nullptr) return errorReply(404, "there is no table \"" + name + "\"");
-    if (call.peer().access < Access::Act && table->name != plugin::kInventoryTable) {
-        return errorReply(403,
-                          table->name == plugin::kRequestTable
-                              ? "you may only read from this host; a query on " + name + " acts"
-                              : "you may only read from this host, and query " +
-                                    std::string(plugin::kInventoryTable) + " only");
+    if (table == nullptr) return http::errorReply(404, "there is no table \"" + name + "\"");
+    if (call.peer().access < http::Access::Act && table->name != plugin::kInventoryTable) {
+        return http::errorReply(
+            403, table->name == plugin::kRequestTable
+                     ? "you may only read from this host; a query on " + name + " acts"
+                     : "you may only read from this host, and query " +
+                           std::string(plugin::kInventoryTable) + " only");
     }
     const Query query{table, queryConditions(call.body(), *table, services)};
     const WatchedAnswer answer = runWatched(services, query, isForced(call.body()), call.peer());
-    return jsonReply(200, queryDocument(services, query, answer, outputsFor(call.peer())));
+    return http::jsonReply(200, queryDocument(services, query, answer, outputsFor(call.peer())));
 }
 
 nlohmann::ordered_json conditionsSchema(Components&) {

@@ -10,8 +10,8 @@ namespace host {
 Endpoint getTables;
 Schema tablesSchema, rowSchema;
 
-Answer getTables(Services& services, const Call&) {
-    return jsonReply(200, tablesDocument(services.tables.all()));
+http::Answer getTables(Services& services, const Call&) {
+    return http::jsonReply(200, tablesDocument(services.tables.all()));
 }
 
 nlohmann::ordered_json tablesSchema(Components&) {

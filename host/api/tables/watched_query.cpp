@@ -44,7 +44,7 @@ bool mayBeQueued(const Query& query) {
     return false;
 }
 
-std::string askerOf(const Query& query, const Peer& peer) {
+std::string askerOf(const Query& query, const http::Peer& peer) {
     return query.table->name == plugin::kRequestTable ? userName(peer.user) : std::string();
 }
 
@@ -103,7 +103,8 @@ std::optional<Task> tryHandOver(Services& services, const Task& task) {
 
 }  // namespace
 
-WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer) {
+WatchedAnswer runWatched(Services& services, const Query& query, bool force,
+                         const http::Peer& peer) {
     if (mayBeQueued(query) && services.guarded) insistOnTurn(services, query);
     const bool wantsOutput = services.guarded && readsConfiguration(query);
     TaskWatch::Request watched(services.watch, *query.table);

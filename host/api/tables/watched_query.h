@@ -6,8 +6,8 @@
 
 #include "host/api/services.h"
 #include "host/commands/recorder.h"
-#include "host/http/peer.h"
 #include "host/tables/query.h"
+#include "http/peer.h"
 
 namespace host {
 
@@ -19,7 +19,8 @@ struct WatchedAnswer {
 /// Runs the query on the calling thread; a request becomes a task of this peer once the guards have
 /// admitted it. `force` passes the guard of products. Throws Refusal and QueryFailed.
 /// Throws NotKept, too.
-WatchedAnswer runWatched(Services& services, const Query& query, bool force, const Peer& peer);
+WatchedAnswer runWatched(Services& services, const Query& query, bool force,
+                         const http::Peer& peer);
 
 /// Hands a task that was entered to the plug-in, once the guards have admitted it. Returns how it
 /// ends if the plug-in did not get it, which is for the caller to have kept. Throws NotKept, and

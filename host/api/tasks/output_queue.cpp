@@ -6,7 +6,7 @@
 #include <nlohmann/json.hpp>
 
 #include "host/api/description/schema.h"
-#include "host/http/event_source.h"
+#include "http/event_source.h"
 
 namespace host {
 
@@ -143,7 +143,7 @@ void OutputQueue::addEvent(bool isError, std::string_view text) {
     OutputPosition behind = position_;
     for (std::size_t i = 0; i < cut_.size(); ++i)
         behind.bytes.at(i) = std::max(behind.bytes.at(i) - cut_.at(i).size(), had_.at(i));
-    appendEvent(ready_, {dump(piece), {}, textOf(behind)});
+    http::appendEvent(ready_, {dump(piece), {}, textOf(behind)});
 }
 
 void OutputQueue::addEnd() {
@@ -173,11 +173,11 @@ std::string OutputQueue::take() {
     const embedded::MutexLock lock(lock_);
     std::string text = std::exchange(ready_, {});
     if (const std::size_t lost = std::exchange(lost_, 0)) {
-        appendEvent(text, {"{\"lost\":" + std::to_string(lost) + "}", "overflow", {}});
+        http::appendEvent(text, {"{\"lost\":" + std::to_string(lost) + "}", "overflow", {}});
     }
     if (begun_ && over_ && !endTaken_) {
         endTaken_ = true;
-        appendEvent(text, {dump({{"state", nameOf(over_->state)}}), "end", {}});
+        http::appendEvent(text, {dump({{"state", nameOf(over_->state)}}), "end", {}});
     }
     return text;
 }

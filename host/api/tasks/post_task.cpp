@@ -108,17 +108,17 @@ void checkCommand(const Task& task) {
 }
 
 /// A repetition gets the answer that the first one got.
-Reply replyAgain(const Task& first, const Task& task, const Services& services) {
+http::Reply replyAgain(const Task& first, const Task& task, const Services& services) {
     if (first.once != task.once) {
-        return errorReply(409, "another request has this transid already: task " + first.id);
+        return http::errorReply(409, "another request has this transid already: task " + first.id);
     }
     if (first.way == TaskWay::AtOnce && !first.guard.empty()) {
-        return guardReply(409, first.reason, first.guard, first.hint);
+        return http::guardReply(409, first.reason, first.guard, first.hint);
     }
     return taskReply(202, first, services, Outputs::Shown);
 }
 
-Reply enter(Task task, Services& services) {
+http::Reply enter(Task task, Services& services) {
     if (!task.once) {
         services.journal.enter(task);
     } else if (const std::optional<Task> first = services.journal.enterOnce(task)) {
@@ -180,7 +180,7 @@ const RecordedEnd* recordedEndIn(const Call& call) {
     return told;
 }
 
-Reply enterEnded(const Call& call, Task task, const RecordedEnd& end, Services& services) {
+http::Reply enterEnded(const Call& call, Task task, const RecordedEnd& end, Services& services) {
     if (!task.once) throw BadRequest('"' + std::string(end.member) + "\" needs \"once\"");
     const std::string reason = textIn(call.body(), end.member);
     return enter(neverBegun(std::move(task), end.state,
@@ -192,9 +192,9 @@ Reply enterEnded(const Call& call, Task task, const RecordedEnd& end, Services& 
 
 Endpoint postTask;
 
-Answer postTask(Services& services, const Call& call) {
+http::Answer postTask(Services& services, const Call& call) {
     const oxa::Table* const table = services.tables.find(std::string(plugin::kRequestTable));
-    if (table == nullptr) return errorReply(404, "the plug-in takes no requests");
+    if (table == nullptr) return http::errorReply(404, "the plug-in takes no requests");
     Task task = taskOf(call, *table, services);
     if (const RecordedEnd* const end = recordedEndIn(call)) {
         return enterEnded(call, std::move(task), *end, services);
@@ -205,7 +205,7 @@ Answer postTask(Services& services, const Call& call) {
         if (first) return replyAgain(*first, task, services);
     }
     if (services.journal.waiting() >= services.maxQueued) {
-        Reply reply = errorReply(429, "as many tasks wait as may");
+        http::Reply reply = http::errorReply(429, "as many tasks wait as may");
         reply.fields.emplace_back("Retry-After", kRetryAfter);
         return reply;
     }

@@ -7,29 +7,30 @@
 #include "host/api/call.h"
 #include "host/api/services.h"
 #include "host/api/tasks/task_document.h"
-#include "host/http/responder.h"
+#include "http/responder.h"
 
 namespace host {
 namespace {
 
 constexpr long long kLongestTaskWait = 24 * 60 * 60;  // seconds
 
-Reply replyAbout(const std::string& name, const Services& services, Outputs outputs) {
+http::Reply replyAbout(const std::string& name, const Services& services, Outputs outputs) {
     const std::optional<Task> task = services.tasks.find(name);
-    if (!task) return errorReply(404, "there is no task \"" + services.codePage.toUtf8(name) + '"');
+    if (!task)
+        return http::errorReply(404, "there is no task \"" + services.codePage.toUtf8(name) + '"');
     return taskReply(200, *task, services, outputs);
 }
 
 /// Answers when the task is over or the time is.
-Later waitFor(const std::string& id, std::chrono::seconds time, Services& services,
-              Outputs outputs) {
+http::Later waitFor(const std::string& id, std::chrono::seconds time, Services& services,
+                    Outputs outputs) {
     const auto waiter = std::make_shared<std::atomic<std::uint64_t>>(0);
-    const auto begin = [id, waiter, &services, outputs](const Responder& responder) {
+    const auto begin = [id, waiter, &services, outputs](const http::Responder& responder) {
         *waiter = services.tasks.awaitEnd(id, [responder, &services, outputs](const Task& task) {
             responder(taskReply(200, task, services, outputs));
         });
     };
-    const auto atLimit = [id, waiter, &services, outputs]() -> Answer {
+    const auto atLimit = [id, waiter, &services, outputs]() -> http::Answer {
         services.tasks.cancel(*waiter);
         return replyAbout(id, services, outputs);
     };
@@ -40,7 +41,7 @@ Later waitFor(const std::string& id, std::chrono::seconds time, Services& servic
 
 Endpoint getTask;
 
-Answer getTask(Services& services, const Call& call) {
+http::Answer getTask(Services& services, const Call& call) {
     const std::string& given = call.required("id");
     const std::string name = services.codePage.fromUtf8(given).value_or(given);
     const std::optional<Task> task = services.tasks.find(name);

@@ -48,8 +48,8 @@ std::string bootOf(const Task& task, const Services& services) {
 
 }  // namespace
 
-Outputs outputsFor(const Peer& peer) {
-    return peer.access == Access::Act ? Outputs::Shown : Outputs::Hidden;
+Outputs outputsFor(const http::Peer& peer) {
+    return peer.access == http::Access::Act ? Outputs::Shown : Outputs::Hidden;
 }
 
 Json commandObject(const Command& command, const CodePage& codePage, Outputs outputs) {
@@ -109,8 +109,9 @@ std::string taskDocument(const Task& task, const Services& services, Outputs out
     return document.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 
-Reply taskReply(unsigned status, const Task& task, const Services& services, Outputs outputs) {
-    return jsonReply(status, taskDocument(task, services, outputs));
+http::Reply taskReply(unsigned status, const Task& task, const Services& services,
+                      Outputs outputs) {
+    return http::jsonReply(status, taskDocument(task, services, outputs));
 }
 
 nlohmann::ordered_json taskStateSchema(Components&) {

@@ -7,9 +7,9 @@
 
 #include "host/api/description/schema.h"
 #include "host/api/services.h"
-#include "host/http/peer.h"
-#include "host/http/reply.h"
 #include "host/outcomes/task.h"
+#include "http/peer.h"
+#include "http/reply.h"
 
 namespace host {
 
@@ -17,7 +17,7 @@ namespace host {
 enum class Outputs { Hidden, Shown };
 
 /// Shown to those who may act only: it may hold anything.
-Outputs outputsFor(const Peer& peer);
+Outputs outputsFor(const http::Peer& peer);
 
 /// {"command", "pid", "started", "ended", "exit" | "signal" | "error", "timed_out"?, "stdout",
 /// "stderr"}. Members that are not known are left out, and so are outputs that are hidden.
@@ -35,6 +35,6 @@ nlohmann::ordered_json taskSummary(const Task& task, const CodePage& codePage);
 std::string taskDocument(const Task& task, const Services& services, Outputs outputs);
 
 /// Answers with that document.
-Reply taskReply(unsigned status, const Task& task, const Services& services, Outputs outputs);
+http::Reply taskReply(unsigned status, const Task& task, const Services& services, Outputs outputs);
 
 }  // namespace host

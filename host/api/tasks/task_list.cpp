@@ -50,7 +50,7 @@ TaskFilter filterOf(const Call& call, const CodePage& codePage) {
 Endpoint getTasks;
 Schema taskListSchema, taskSummarySchema;
 
-Answer getTasks(Services& services, const Call& call) {
+http::Answer getTasks(Services& services, const Call& call) {
     TaskFilter filter = filterOf(call, services.codePage);
     const std::size_t limit = filter.limit++;  // one more shows whether there is more
     std::vector<Task> found = services.tasks.newest(filter);
@@ -63,7 +63,8 @@ Answer getTasks(Services& services, const Call& call) {
     for (const Task& task : found)
         tasks.push_back(taskSummary(task, services.codePage));
     const nlohmann::ordered_json document = {{"tasks", std::move(tasks)}, {"next", next}};
-    return jsonReply(200, document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
+    return http::jsonReply(200,
+                           document.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace));
 }
 
 nlohmann::ordered_json taskListSchema(Components& components) {

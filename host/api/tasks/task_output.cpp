@@ -13,7 +13,7 @@
 namespace host {
 namespace {
 
-class TaskOutput final : public EventSource {
+class TaskOutput final : public http::EventSource {
 public:
     /// `services` outlive the source.
     TaskOutput(Services& services, std::optional<OutputPosition> after)
@@ -62,19 +62,19 @@ std::optional<OutputPosition> wantedPosition(const Call& call) {
 
 Endpoint getTaskOutput;
 
-Answer getTaskOutput(Services& services, const Call& call) {
+http::Answer getTaskOutput(Services& services, const Call& call) {
     const std::string& given = call.required("id");
     const std::string name = services.codePage.fromUtf8(given).value_or(given);
     const std::optional<OutputPosition> after = wantedPosition(call);
     const std::optional<Task> task = services.tasks.find(name);
-    if (!task) return errorReply(404, "there is no task \"" + given + '"');
+    if (!task) return http::errorReply(404, "there is no task \"" + given + '"');
     auto source = std::make_unique<TaskOutput>(services, after);
     if (call.flag("follow")) {
         source->follow(*task);
     } else {
         source->show(*task);
     }
-    return Answer(std::move(source));
+    return http::Answer(std::move(source));
 }
 
 }  // namespace host

@@ -53,7 +53,7 @@ constexpr const char* kPartIsTooLong = "a part of the name is too long";
 
 ArrivalDirectory::ArrivalDirectory(const std::string& depot, std::string name)
     : name_(std::move(name)), real_(host::realPath(depot + "/" + name_)) {
-    const FileDescriptor top(::open(depot.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    const sys::FileDescriptor top(::open(depot.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
     if (!top) return;
     longestPart_ = ::fpathconf(top.get(), _PC_NAME_MAX);
     if (hasLongPart(name_, longestPart_)) obstacle_ = kPartIsTooLong;
@@ -64,7 +64,7 @@ ArrivalDirectory::ArrivalDirectory(const std::string& depot, std::string name)
 void ArrivalDirectory::lookFrom(int depot) {
     std::string directory = above(name_);
     for (bool isItself = true; obstacle_.empty(); isItself = false) {
-        FileDescriptor found = openBeneath(depot, directory, O_PATH | O_DIRECTORY);
+        sys::FileDescriptor found = openBeneath(depot, directory, O_PATH | O_DIRECTORY);
         if (found) {
             if (::faccessat(found.get(), ".", W_OK | X_OK, AT_EACCESS) != 0) {
                 obstacle_ = "the host's user may not write to " + named(directory);

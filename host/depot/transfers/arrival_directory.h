@@ -6,7 +6,7 @@
 #include <optional>
 #include <string>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -37,9 +37,9 @@ private:
     std::string name_;
     std::string real_;
     bool leadsOut_ = false;
-    std::string obstacle_;   ///< to all of its files
-    long longestPart_ = 0;   ///< of a name, in bytes; 0 or less when there is no limit
-    FileDescriptor opened_;  ///< not open when it is yet to be made
+    std::string obstacle_;        ///< to all of its files
+    long longestPart_ = 0;        ///< of a name, in bytes; 0 or less when there is no limit
+    sys::FileDescriptor opened_;  ///< not open when it is yet to be made
 };
 
 }  // namespace host

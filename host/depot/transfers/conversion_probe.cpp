@@ -6,7 +6,7 @@
 #include <cerrno>
 #include <cstring>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
@@ -14,7 +14,7 @@ std::string conversionProblem(const std::string& temporaries, const std::string&
     const std::string name = "/.zavhost-probe-" + std::to_string(::getpid());
     const std::string made = temporaries + name;
     const std::string linked = depot + name;
-    const FileDescriptor file(
+    const sys::FileDescriptor file(
         ::open(made.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
     if (!file) return "cannot write to " + temporaries + ": " + std::strerror(errno);
     const bool works = ::link(made.c_str(), linked.c_str()) == 0;

@@ -11,16 +11,17 @@
 #include "embedded/ncs_host.h"
 #include "host/depot/transfers/transfer_call.h"
 #include "host/depot/transfers/transfer_rules.h"
-#include "host/metrics/by_label.h"
-#include "host/metrics/counter.h"
+#include "metrics/by_label.h"
+#include "metrics/counter.h"
 
 namespace host {
 
 /// What came of the transfers so far. Any thread.
 struct TransferCounts {
-    Counter begun;   ///< files that clients began to send, those that were refused among them
-    Counter failed;  ///< batches that were refused, or that the plug-in did not take
-    Counter bytes;   ///< of files, that the plug-in took
+    metrics::Counter
+        begun;  ///< files that clients began to send, those that were refused among them
+    metrics::Counter failed;  ///< batches that were refused, or that the plug-in did not take
+    metrics::Counter bytes;   ///< of files, that the plug-in took
 };
 
 /// Refuses transfers with status 6 before the plug-in sees them: those that the rules forbid and,
@@ -30,7 +31,8 @@ struct TransferCounts {
 class TransferGate final : public ncs::CallWatch {
 public:
     /// Both outlive this object. `refusals` counts by the name of the guard; may be null.
-    explicit TransferGate(const TransferRules& rules, ByLabel<Counter>* refusals = nullptr)
+    explicit TransferGate(const TransferRules& rules,
+                          metrics::ByLabel<metrics::Counter>* refusals = nullptr)
         : rules_(rules), refusals_(refusals) {}
 
     std::optional<std::string> before(const ncs::Call& call) override;
@@ -64,7 +66,7 @@ private:
     bool isOneOf(const std::string& name, const std::vector<std::string>& others) const;
 
     const TransferRules& rules_;
-    ByLabel<Counter>* const refusals_;
+    metrics::ByLabel<metrics::Counter>* const refusals_;
     TransferCounts counts_;
     mutable embedded::Mutex lock_;
     /// What each association is sending.

@@ -9,7 +9,7 @@
 #include <cerrno>
 #include <filesystem>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace fs = std::filesystem;
 
@@ -36,14 +36,14 @@ DepotFile findByResolving(const std::string& depot, const std::string& name) {
 }  // namespace
 
 DepotFile findInDepot(const std::string& depot, const std::string& name) {
-    const FileDescriptor root(::open(depot.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    const sys::FileDescriptor root(::open(depot.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
     if (!root) return DepotFile::Missing;
     open_how how{};
     how.flags = O_PATH | O_CLOEXEC;
     how.resolve = RESOLVE_BENEATH | RESOLVE_NO_MAGICLINKS;
     // The plug-in appends the name to the depot's, so slashes at its beginning mean nothing.
     const std::string relative = name.substr(std::min(name.find_first_not_of('/'), name.size()));
-    const FileDescriptor file(
+    const sys::FileDescriptor file(
         static_cast<int>(::syscall(SYS_openat2, root.get(), relative.c_str(), &how, sizeof how)));
     if (!file) {
         if (errno == ENOSYS || errno == EPERM) return findByResolving(depot, relative);

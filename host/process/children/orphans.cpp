@@ -13,7 +13,7 @@
 
 #include "host/process/start_error.h"
 #include "host/process/system/directory_stream.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -33,13 +33,13 @@ std::vector<pid_t> numbersIn(const std::string& text) {
 }
 
 /// The list of the children of a thread of this process; no descriptor when there is none.
-FileDescriptor openChildren(pid_t thread) {
+sys::FileDescriptor openChildren(pid_t thread) {
     const std::string path = "/proc/self/task/" + std::to_string(thread) + "/children";
-    return FileDescriptor(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    return sys::FileDescriptor(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
 }
 
 /// All that a file holds.
-std::string textOf(const FileDescriptor& file) {
+std::string textOf(const sys::FileDescriptor& file) {
     std::string text;
     std::array<char, 4096> piece{};
     ssize_t length = 0;
@@ -88,7 +88,7 @@ bool adoptsOrphans() {
 std::vector<pid_t> orphans() {
     // Asked for before each command, and opening it costs the most. The kernel makes the list anew
     // for whoever reads from its beginning.
-    static const FileDescriptor list = openChildren(::getpid());
+    static const sys::FileDescriptor list = openChildren(::getpid());
     static const pid_t opener = ::getpid();
     if (!adoptsOrphans()) return {};
     return opener == ::getpid() ? numbersIn(textOf(list)) : childrenOf(::getpid());

@@ -5,20 +5,20 @@
 #include <sys/types.h>
 #include <unistd.h>
 
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 
 /// A descriptor that is readable once the process has ended. None, with errno set, if there is no
 /// such process or the kernel has no such descriptors.
-inline FileDescriptor openPidfd(pid_t process) {
+inline sys::FileDescriptor openPidfd(pid_t process) {
     // Older C libraries do not have the name; the number is the same on every architecture.
 #ifdef SYS_pidfd_open
     constexpr long kCall = SYS_pidfd_open;
 #else
     constexpr long kCall = 434;
 #endif
-    return FileDescriptor(static_cast<int>(::syscall(kCall, process, 0)));
+    return sys::FileDescriptor(static_cast<int>(::syscall(kCall, process, 0)));
 }
 
 }  // namespace host

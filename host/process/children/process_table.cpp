@@ -9,7 +9,7 @@
 #include <string>
 
 #include "host/process/system/directory_stream.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -31,7 +31,7 @@ Number statNumber(std::string_view text) {
 
 std::optional<ProcessEntry> readEntry(const std::string& pid) {
     const std::string path = "/proc/" + pid + "/stat";
-    const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    const sys::FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
     if (!file) return std::nullopt;
     std::array<char, 1024> text{};
     const ssize_t length = ::read(file.get(), text.data(), text.size());

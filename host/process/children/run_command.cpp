@@ -13,7 +13,7 @@
 #include <system_error>
 
 #include "host/process/children/pidfd.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -27,15 +27,15 @@ constexpr int kPollStep = 20;
 constexpr long kLongestPoll = 60'000;
 
 struct Pipe {
-    FileDescriptor readEnd;
-    FileDescriptor writeEnd;
+    sys::FileDescriptor readEnd;
+    sys::FileDescriptor writeEnd;
 };
 
 /// No other child of the host inherits it. The reading end never blocks.
 Pipe makePipe() {
     int ends[2];
     if (::pipe2(ends, O_CLOEXEC) != 0) throw std::system_error(errno, std::generic_category());
-    Pipe made{FileDescriptor(ends[0]), FileDescriptor(ends[1])};
+    Pipe made{sys::FileDescriptor(ends[0]), sys::FileDescriptor(ends[1])};
     ::fcntl(ends[0], F_SETFL, O_NONBLOCK);
     return made;
 }
@@ -129,14 +129,14 @@ public:
 
 private:
     const pid_t pid_;
-    const FileDescriptor handle_;
+    const sys::FileDescriptor handle_;
     bool reaped_ = false;
 };
 
 /// One of the child's outputs.
 class Output {
 public:
-    Output(FileDescriptor end, std::string& text, std::size_t limit)
+    Output(sys::FileDescriptor end, std::string& text, std::size_t limit)
         : end_(std::move(end)), text_(text), limit_(limit) {}
 
     /// -1 once it has ended: poll ignores that.
@@ -161,7 +161,7 @@ public:
     }
 
 private:
-    FileDescriptor end_;
+    sys::FileDescriptor end_;
     std::string& text_;
     const std::size_t limit_;
 };

@@ -21,9 +21,9 @@
 
 #include "host/process/configuration/option_table.h"
 #include "host/process/start_error.h"
-#include "host/process/system/file_descriptor.h"
 #include "host/process/system/trusted_file.h"
 #include "host/text/nearest_name.h"
+#include "system/file_descriptor.h"
 
 namespace host {
 namespace {
@@ -41,8 +41,8 @@ constexpr std::size_t kLongestFile = std::size_t{1} << 20;
 
 /// Looks at the open file, so that nobody can put another in its place in between. It does not wait
 /// for a pipe's other end.
-FileDescriptor openTrusted(const std::string& path) {
-    FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+sys::FileDescriptor openTrusted(const std::string& path) {
+    sys::FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
     struct stat found {};
     if (!file || ::fstat(file.get(), &found) != 0) {
         refuseFile(path, std::generic_category().message(errno));
@@ -58,7 +58,7 @@ FileDescriptor openTrusted(const std::string& path) {
 }
 
 std::string readTrusted(const std::string& path) {
-    const FileDescriptor file = openTrusted(path);
+    const sys::FileDescriptor file = openTrusted(path);
     std::string content(kLongestFile + 1, '\0');
     std::size_t length = 0;
     while (length < content.size()) {

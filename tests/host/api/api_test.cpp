@@ -5,7 +5,7 @@
 
 namespace {
 
-using host::Access;
+using http::Access;
 
 class Interface : public ApiTest {};
 
@@ -17,11 +17,11 @@ TEST_F(Interface, RefusesOtherPaths) {
 }
 
 TEST_F(Interface, RefusesOtherMethodsAndNamesTheRightOne) {
-    const host::Reply query = ask("GET", "/v1/query");
+    const http::Reply query = ask("GET", "/v1/query");
     expectError(405, "/v1/query knows only the method POST", query);
     EXPECT_EQ(query.fields.at(0).second, "POST");
     for (const char* method : {"POST", "PUT", "DELETE", "get", "BREW"}) {
-        const host::Reply reply = ask(method, "/v1/tables");
+        const http::Reply reply = ask(method, "/v1/tables");
         expectError(405, "/v1/tables knows only the method GET", reply);
         ASSERT_EQ(reply.fields.size(), 1U);
         EXPECT_EQ(reply.fields[0].first, "Allow");
@@ -50,8 +50,8 @@ TEST_F(Interface, RefusesEventsThatMakeNoSense) {
 }
 
 TEST_F(Interface, EventsTakeEveryOtherParameterAsEquality) {
-    host::Answer answer = answerTo("GET", "/v1/events?NAME=a%20b&table=PLAIN&NUMBER=5&TEXT=");
-    const auto& source = std::get<std::unique_ptr<host::EventSource>>(answer);
+    http::Answer answer = answerTo("GET", "/v1/events?NAME=a%20b&table=PLAIN&NUMBER=5&TEXT=");
+    const auto& source = std::get<std::unique_ptr<http::EventSource>>(answer);
     table.publish(plainRow("a b", 5, "text"));
     table.publish(plainRow("a b", 4, ""));
     table.publish(plainRow("a", 5, ""));
@@ -91,13 +91,15 @@ TEST_F(Interface, LetsReadersGetEverythingButOutput) {
         const bool reads = std::string(route.method) == "GET" &&
                            std::string(route.path) != "/v1/tasks/{id}/output";
         const bool asks = std::string(route.path) == "/v1/query";  // judged by its table
-        EXPECT_EQ(route.access, reads || asks ? Access::Read : Access::Act) << route.path;
+        EXPECT_EQ(route.access, reads || asks ? http::Access::Read : http::Access::Act)
+            << route.path;
     }
 }
 
 TEST_F(Interface, IsClosedToPeersWithoutAccess) {
     for (const host::Route& route : api->router().routes()) {
-        EXPECT_EQ(ask(route.method, route.path, "{}", Access::None).status, 403U) << route.path;
+        EXPECT_EQ(ask(route.method, route.path, "{}", http::Access::None).status, 403U)
+            << route.path;
     }
 }
 

@@ -16,7 +16,7 @@ TEST_F(ApiTest, TheDoctorTellsEveryCheckInItsOrder) {
         options.state = home.path() + "/zavhost";
         return host::CheckSubject(options, [](const char*) { return nullptr; });
     };
-    const host::Reply reply = ask("GET", "/v1/doctor");
+    const http::Reply reply = ask("GET", "/v1/doctor");
     EXPECT_EQ(reply.status, 200U);
     const json document = json::parse(reply.body);
     ASSERT_EQ(document.size(), host::checks().size());

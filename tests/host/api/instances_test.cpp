@@ -25,7 +25,7 @@ TEST_F(InstancesApi, HaveTheNamesThatCommandsTake) {
     home.script("bin/instances",
                 "printf 'ux\\tdb1\\troot\\trunning\\t17\\n"
                 "um\\t\\t\\tstopped\\t\\n'");
-    const host::Reply reply = ask("GET", "/v1/instances");
+    const http::Reply reply = ask("GET", "/v1/instances");
     EXPECT_EQ(reply.status, 200U);
     const std::string here = host::shortHostName();
     EXPECT_EQ(json::parse(reply.body)["instances"], (json{{{"product", "ux"},
@@ -45,7 +45,7 @@ TEST_F(InstancesApi, HaveTheNamesThatCommandsTake) {
 TEST_F(InstancesApi, OfAHomeThatCannotTellAreNotThere) {
     EXPECT_EQ(ask("GET", "/v1/instances").status, 404U);
     home.script("bin/instances", "echo 'no home' >&2; exit 2");
-    const host::Reply reply = ask("GET", "/v1/instances");
+    const http::Reply reply = ask("GET", "/v1/instances");
     EXPECT_EQ(reply.status, 500U);
     EXPECT_EQ(json::parse(reply.body)["error"], "bin/instances ended with exit code 2: no home\n");
 }

@@ -10,20 +10,20 @@
 
 namespace {
 
-using host::Access;
 using host::Call;
 using host::JsonType;
 using host::Match;
 using host::Need;
 using host::Others;
-using host::Reply;
 using host::Route;
 using host::Router;
 using host::Runs;
 using host::Type;
+using http::Access;
+using http::Reply;
 
-host::Answer nothing(host::Services&, const Call&) {
-    return Reply{};
+http::Answer nothing(host::Services&, const Call&) {
+    return http::Reply{};
 }
 
 const std::vector<host::Parameter> kId = {{"id", Type::Text, Need::Required, ""}};
@@ -34,11 +34,11 @@ std::vector<Route> someRoutes() {
                                                {"follow", Type::Flag, Need::Optional, ""}};
     const std::vector<host::Parameter> page = {{"number", Type::Number, Need::Required, ""}};
     return {
-        {"GET", "/v1/tasks", "", Access::Read, Runs::AtOnce, nothing, {}, list},
+        {"GET", "/v1/tasks", "", http::Access::Read, Runs::AtOnce, nothing, {}, list},
         {"POST",
          "/v1/tasks",
          "",
-         Access::Act,
+         http::Access::Act,
          Runs::AtOnce,
          nothing,
          {},
@@ -49,24 +49,24 @@ std::vector<Route> someRoutes() {
           {"once", JsonType::Boolean, Need::Optional, ""},
           {"where", JsonType::Array, Need::Optional, ""},
           {"more", JsonType::Object, Need::Optional, ""}}},
-        {"GET", "/v1/tasks/{id}", "", Access::Read, Runs::AtOnce, nothing, {}, kId},
-        {"DELETE", "/v1/tasks/{id}", "", Access::Act, Runs::AtOnce, nothing, {}, kId},
-        {"POST", "/v1/tasks/{id}/cancel", "", Access::Act, Runs::AtOnce, nothing, {}, kId},
-        {"GET", "/v1/pages/{number}", "", Access::Read, Runs::AtOnce, nothing, {}, page},
+        {"GET", "/v1/tasks/{id}", "", http::Access::Read, Runs::AtOnce, nothing, {}, kId},
+        {"DELETE", "/v1/tasks/{id}", "", http::Access::Act, Runs::AtOnce, nothing, {}, kId},
+        {"POST", "/v1/tasks/{id}/cancel", "", http::Access::Act, Runs::AtOnce, nothing, {}, kId},
+        {"GET", "/v1/pages/{number}", "", http::Access::Read, Runs::AtOnce, nothing, {}, page},
     };
 }
 
 class Routes : public testing::Test {
 protected:
-    std::variant<Match, Reply> find(const std::string& method, const std::string& target,
-                                    Access access = Access::Act) const {
+    std::variant<Match, http::Reply> find(const std::string& method, const std::string& target,
+                                          http::Access access = http::Access::Act) const {
         return router.find({method, target, "", {0, 0, 0, access}});
     }
     /// The route's method and path, and the parameters; or the reply's status and body.
     std::string found(const std::string& method, const std::string& target,
-                      Access access = Access::Act) const {
+                      http::Access access = http::Access::Act) const {
         const auto result = find(method, target, access);
-        if (const auto* const reply = std::get_if<Reply>(&result))
+        if (const auto* const reply = std::get_if<http::Reply>(&result))
             return std::to_string(reply->status) + " " + reply->body;
         const auto& match = std::get<Match>(result);
         std::string text = match.route->method + std::string(" ") + match.route->path;
@@ -75,7 +75,7 @@ protected:
         return text;
     }
     std::string allow(const std::string& method, const std::string& target) const {
-        return std::get<Reply>(find(method, target)).fields.at(0).second;
+        return std::get<http::Reply>(find(method, target)).fields.at(0).second;
     }
     static std::string error(const std::string& status, const std::string& text) {
         return status + " {\"error\":\"" + text + "\"}\n";
@@ -141,30 +141,32 @@ TEST_F(Routes, CheckTheTypesOfTheirParameters) {
 
 TEST_F(Routes, AreClosedToThoseWhoMayNotUseThem) {
     const std::string refused = error("403", "you may only read from this host");
-    EXPECT_EQ(found("DELETE", "/v1/tasks/7", Access::Read), refused);
-    EXPECT_EQ(found("POST", "/v1/tasks?odd=1", Access::Read), refused) << "before anything else";
-    EXPECT_EQ(found("GET", "/v1/tasks/7", Access::Read), "GET /v1/tasks/{id} id=7");
+    EXPECT_EQ(found("DELETE", "/v1/tasks/7", http::Access::Read), refused);
+    EXPECT_EQ(found("POST", "/v1/tasks?odd=1", http::Access::Read), refused)
+        << "before anything else";
+    EXPECT_EQ(found("GET", "/v1/tasks/7", http::Access::Read), "GET /v1/tasks/{id} id=7");
 }
 
 TEST(RouteTable, FindsLiteralSegmentsFirstWhateverTheOrderOfItsRows) {
-    const Route one{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, {}, kId};
-    const Route removal{"DELETE", "/a/{id}", "", Access::Act, Runs::AtOnce, nothing, {}, kId};
-    const Route all{"GET", "/a/all", "", Access::Read, Runs::AtOnce, nothing};
+    const Route one{"GET", "/a/{id}", "", http::Access::Read, Runs::AtOnce, nothing, {}, kId};
+    const Route removal{"DELETE", "/a/{id}", "", http::Access::Act, Runs::AtOnce, nothing, {}, kId};
+    const Route all{"GET", "/a/all", "", http::Access::Read, Runs::AtOnce, nothing};
     for (const Router& router : {Router({one, removal, all}), Router({all, removal, one})}) {
         const auto find = [&router](const char* method, const char* target) {
-            return router.find({method, target, "", {0, 0, 0, Access::Act}});
+            return router.find({method, target, "", {0, 0, 0, http::Access::Act}});
         };
         EXPECT_STREQ(std::get<Match>(find("GET", "/a/all")).route->path, "/a/all");
         EXPECT_STREQ(std::get<Match>(find("GET", "/a/7")).route->path, "/a/{id}");
-        EXPECT_EQ(std::get<Reply>(find("DELETE", "/a/all")).status, 405U);
+        EXPECT_EQ(std::get<http::Reply>(find("DELETE", "/a/all")).status, 405U);
     }
 }
 
 TEST(RouteTable, ThatContradictsItselfIsRefused) {
     const host::Parameter other{"other", host::Type::Text, host::Need::Required, ""};
-    const Route alike{"GET", "/a/{other}", "", Access::Read, Runs::AtOnce, nothing, {}, {other}};
-    const Route good{"GET", "/a/{id}", "", Access::Read, Runs::AtOnce, nothing, {}, kId};
-    const Route lacking{"GET", "/b/{id}", "", Access::Read, Runs::AtOnce, nothing};
+    const Route alike{"GET",        "/a/{other}", "", http::Access::Read,
+                      Runs::AtOnce, nothing,      {}, {other}};
+    const Route good{"GET", "/a/{id}", "", http::Access::Read, Runs::AtOnce, nothing, {}, kId};
+    const Route lacking{"GET", "/b/{id}", "", http::Access::Read, Runs::AtOnce, nothing};
     EXPECT_THROW(Router({lacking}), std::logic_error);
     EXPECT_THROW(Router({good, good}), std::logic_error);
     EXPECT_THROW(Router({good, alike}), std::logic_error);

@@ -6,7 +6,7 @@
 #include <filesystem>
 
 #include "host/checks/check_fixture.h"
-#include "host/process/system/file_descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace {
 
@@ -85,14 +85,14 @@ TEST_F(LeftoversCheck, AnInstallationThatGoesOnIsNoLeftover) {
         scratch.write(std::string("home/run/.") + product + ".lock", "");
     expectFinding("leftovers", Verdict::Warning, ".ux.new");
     const auto hold = [this](const std::string& product) {
-        host::FileDescriptor lock(
+        sys::FileDescriptor lock(
             ::open((home + "/run/." + product + ".lock").c_str(), O_RDONLY | O_CLOEXEC));
         EXPECT_EQ(::flock(lock.get(), LOCK_EX | LOCK_NB), 0);
         return lock;
     };
-    const host::FileDescriptor ux = hold("ux");
+    const sys::FileDescriptor ux = hold("ux");
     EXPECT_THAT(find("leftovers").text, Not(HasSubstr(".ux.new")));
-    const host::FileDescriptor um = hold("um");
+    const sys::FileDescriptor um = hold("um");
     expectNone();
 }
 

@@ -11,9 +11,9 @@
 
 namespace {
 
-using host::FileDescriptor;
+using sys::FileDescriptor;
 
-using Opener = FileDescriptor (*)(int root, const std::string& path, int flags);
+using Opener = sys::FileDescriptor (*)(int root, const std::string& path, int flags);
 
 /// Both ways must answer alike.
 class Beneath : public testing::TestWithParam<Opener> {
@@ -30,7 +30,7 @@ protected:
         link(scratch_.path("root/file"), "root/absolute");
         link("loop", "root/loop");
         link("nowhere", "root/dangling");
-        root_ = FileDescriptor(::open(scratch_.path("root").c_str(), O_PATH | O_CLOEXEC));
+        root_ = sys::FileDescriptor(::open(scratch_.path("root").c_str(), O_PATH | O_CLOEXEC));
     }
     void link(const std::string& target, const std::string& name) const {
         ASSERT_EQ(::symlink(target.c_str(), scratch_.path(name).c_str()), 0);
@@ -38,7 +38,7 @@ protected:
     /// The content, or the name of the error.
     std::string read(const std::string& path, int flags = O_RDONLY) const {
         errno = 0;
-        const FileDescriptor opened = GetParam()(root_.get(), path, flags);
+        const sys::FileDescriptor opened = GetParam()(root_.get(), path, flags);
         if (!opened)
             return errno == EXDEV     ? "EXDEV"
                    : errno == ELOOP   ? "ELOOP"
@@ -55,7 +55,7 @@ protected:
     }
 
     ScratchDir scratch_;
-    FileDescriptor root_;
+    sys::FileDescriptor root_;
 };
 
 TEST_P(Beneath, OpensWhatStandsBelow) {
@@ -106,7 +106,7 @@ TEST(WalkBeneath, EndsWhenDirectoriesLieTooDeep) {
     for (int i = 0; i < 300; ++i)
         path += "d/";
     scratch.makeDir("root/" + path);
-    const FileDescriptor root(::open(scratch.path("root").c_str(), O_PATH | O_CLOEXEC));
+    const sys::FileDescriptor root(::open(scratch.path("root").c_str(), O_PATH | O_CLOEXEC));
     EXPECT_FALSE(host::walkBeneath(root.get(), path, O_RDONLY));
     EXPECT_EQ(errno, ENAMETOOLONG);
 }

@@ -5,15 +5,15 @@
 
 #include <system_error>
 
-#include "host/process/system/file_descriptor.h"
 #include "support/scratch_dir.h"
+#include "system/file_descriptor.h"
 
 namespace {
 
 host::Checksum sumOf(const std::string& content) {
     const ScratchDir scratch;
     const std::string path = scratch.write("file", content);
-    return host::checksumOf(host::FileDescriptor(::open(path.c_str(), O_RDONLY)).get());
+    return host::checksumOf(sys::FileDescriptor(::open(path.c_str(), O_RDONLY)).get());
 }
 
 TEST(Checksum, IsTheOneOfTheStandard) {

@@ -6,15 +6,15 @@
 
 #include <cerrno>
 
-#include "host/process/system/file_descriptor.h"
 #include "support/scratch_dir.h"
+#include "system/file_descriptor.h"
 
 namespace {
 
 class RemoveTree : public testing::Test {
 protected:
     int remove(const std::string& name) const {
-        const host::FileDescriptor parent(::open(scratch_.path().c_str(), O_PATH | O_CLOEXEC));
+        const sys::FileDescriptor parent(::open(scratch_.path().c_str(), O_PATH | O_CLOEXEC));
         return host::removeTree(parent.get(), name);
     }
     ScratchDir scratch_;

@@ -150,7 +150,7 @@ TEST_F(Events, ThatASlowReaderMissesAreCountedInTheirPlace) {
 }
 
 TEST_F(Events, AreFollowedByASignOfLifeWhenThereAreNone) {
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.heartbeat = milliseconds(20);
     start(limits);
     RawClient client = subscribe();

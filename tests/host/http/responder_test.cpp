@@ -8,30 +8,31 @@
 #include <stdexcept>
 #include <thread>
 
-#include "host/http/responder.h"
-#include "host/http/server.h"
+#include "host/peers/peer_of.h"
 #include "host/process/socket_file.h"
 #include "host/raw_client.h"
+#include "http/responder.h"
+#include "http/server.h"
 #include "support/scratch_dir.h"
 
 namespace {
 
-using host::Answer;
-using host::Job;
-using host::Later;
-using host::Reply;
-using host::Request;
-using host::Responder;
+using http::Answer;
+using http::Job;
+using http::Later;
+using http::Reply;
+using http::Request;
+using http::Responder;
 using std::chrono::milliseconds;
 using std::chrono::seconds;
 
-class TestHandler final : public host::Handler {
+class TestHandler final : public http::Handler {
 public:
-    std::function<std::variant<Answer, Job>(const Request&)> answer;
+    std::function<std::variant<http::Answer, http::Job>(const http::Request&)> answer;
     std::atomic<bool> isQuiet{true};
 
-    std::variant<Answer, Job> handle(Request request) override {
-        if (request.target == "/alive") return Answer(Reply{200, "alive"});
+    std::variant<http::Answer, http::Job> handle(http::Request request) override {
+        if (request.target == "/alive") return http::Answer(http::Reply{200, "alive"});
         return answer(request);
     }
     void prepareForEnd() override {}
@@ -41,7 +42,7 @@ public:
 class Answers : public testing::Test {
 protected:
     Answers() {
-        server.emplace(socket.listen(), handler, counts);
+        server.emplace(socket.listen(), host::doorFor(), handler, counts);
         serving = std::thread([this] {
             server->run();
             ended = true;
@@ -58,25 +59,25 @@ protected:
     std::string aliveness() { return connect().get("/alive").body; }
 
     /// Answers with `later`, and keeps the responder.
-    Later keepResponder(milliseconds limit, std::function<Answer()> atLimit) {
-        return {[this](const Responder& given) { responder.set_value(given); }, limit,
+    http::Later keepResponder(milliseconds limit, std::function<http::Answer()> atLimit) {
+        return {[this](const http::Responder& given) { responder.set_value(given); }, limit,
                 std::move(atLimit)};
     }
-    static Answer inTime() { return Reply{200, "the time is over"}; }
+    static http::Answer inTime() { return http::Reply{200, "the time is over"}; }
 
     ScratchDir scratch;
     host::SocketFile socket{scratch.path("s")};
     TestHandler handler;
-    host::ServerCounts counts;
-    std::promise<Responder> responder;
-    std::optional<host::HttpServer> server;
+    http::ServerCounts counts;
+    std::promise<http::Responder> responder;
+    std::optional<http::HttpServer> server;
     std::thread serving;
     std::atomic<bool> ended{false};
 };
 
 TEST_F(Answers, CarryTypeAndFieldsOfTheirReply) {
-    handler.answer = [](const Request& request) {
-        return Answer(Reply{
+    handler.answer = [](const http::Request& request) {
+        return http::Answer(http::Reply{
             201, request.method + request.target + request.body, "text/plain", {{"X-Odd", "yes"}}});
     };
     RawClient client = connect();
@@ -88,29 +89,29 @@ TEST_F(Answers, CarryTypeAndFieldsOfTheirReply) {
 }
 
 TEST_F(Answers, MayBeEmpty) {
-    handler.answer = [](const Request&) { return Answer(Reply{}); };
+    handler.answer = [](const http::Request&) { return http::Answer(http::Reply{}); };
     RawClient client = connect();
     EXPECT_NE(client.get("/").head.find("Content-Length: 0\r\n"), std::string::npos);
     EXPECT_EQ(client.get("/alive").body, "alive");
 }
 
 TEST_F(Answers, TellTheHandlerWhoAsks) {
-    host::Peer peer;
-    handler.answer = [&](const Request& request) {
+    http::Peer peer;
+    handler.answer = [&](const http::Request& request) {
         peer = request.peer;
-        return Answer(Reply{});
+        return http::Answer(http::Reply{});
     };
     EXPECT_EQ(connect().get("/").status, 200);
     EXPECT_EQ(peer.process, ::getpid());
     EXPECT_EQ(peer.user, ::geteuid());
     EXPECT_EQ(peer.group, ::getegid());
-    EXPECT_EQ(peer.access, host::Access::Act);
+    EXPECT_EQ(peer.access, http::Access::Act);
 }
 
 TEST_F(Answers, OfAHandlerOrAJobThatThrowsAreErrors) {
-    handler.answer = [](const Request& request) -> std::variant<Answer, Job> {
+    handler.answer = [](const http::Request& request) -> std::variant<http::Answer, http::Job> {
         if (request.target == "/handler") throw std::bad_alloc();
-        return Job([]() -> Answer { throw std::runtime_error("x"); });
+        return http::Job([]() -> http::Answer { throw std::runtime_error("x"); });
     };
     RawClient client = connect();
     for (const char* target : {"/handler", "/job"}) {
@@ -121,49 +122,53 @@ TEST_F(Answers, OfAHandlerOrAJobThatThrowsAreErrors) {
 }
 
 TEST_F(Answers, MayComeLaterWithoutAWorker) {
-    handler.answer = [&](const Request&) { return Answer(keepResponder(seconds(60), inTime)); };
+    handler.answer = [&](const http::Request&) {
+        return http::Answer(keepResponder(seconds(60), inTime));
+    };
     RawClient client = connect();
     client.send("GET /later HTTP/1.1\r\n\r\n");
-    const Responder respond = responder.get_future().get();
+    const http::Responder respond = responder.get_future().get();
     EXPECT_EQ(aliveness(), "alive");
-    respond(Reply{200, "late"});
-    respond(Reply{200, "too late"});
+    respond(http::Reply{200, "late"});
+    respond(http::Reply{200, "too late"});
     EXPECT_EQ(client.readAnswer().body, "late");
     EXPECT_EQ(client.get("/alive").body, "alive") << "the second answer is dropped";
 }
 
 TEST_F(Answers, MayComeBeforeBeginReturns) {
-    handler.answer = [&](const Request&) {
-        return Answer(Later{[](const Responder& respond) {
-                                respond(Reply{200, "at once"});
-                            },
-                            seconds(60), inTime});
+    handler.answer = [&](const http::Request&) {
+        return http::Answer(http::Later{[](const http::Responder& respond) {
+                                            respond(http::Reply{200, "at once"});
+                                        },
+                                        seconds(60), inTime});
     };
     EXPECT_EQ(connect().get("/").body, "at once");
 }
 
 TEST_F(Answers, MayComeLaterAfterAJob) {
-    handler.answer = [&](const Request&) {
-        return Job([&]() -> Answer { return keepResponder(seconds(60), inTime); });
+    handler.answer = [&](const http::Request&) {
+        return http::Job([&]() -> http::Answer { return keepResponder(seconds(60), inTime); });
     };
     RawClient client = connect();
     client.send("GET /later HTTP/1.1\r\n\r\n");
-    responder.get_future().get()(Reply{200, "late"});
+    responder.get_future().get()(http::Reply{200, "late"});
     EXPECT_EQ(client.readAnswer().body, "late");
 }
 
 TEST_F(Answers, ThatDoNotComeInTimeAreMadeAtTheLimit) {
-    handler.answer = [&](const Request&) {
-        return Answer(keepResponder(milliseconds(20), inTime));
+    handler.answer = [&](const http::Request&) {
+        return http::Answer(keepResponder(milliseconds(20), inTime));
     };
     RawClient client = connect();
     EXPECT_EQ(client.get("/later").body, "the time is over");
-    responder.get_future().get()(Reply{200, "late"});
+    responder.get_future().get()(http::Reply{200, "late"});
     EXPECT_EQ(client.get("/alive").body, "alive") << "the late answer belongs to no request";
 }
 
 TEST_F(Answers, ThatNobodyGaveYetAreMadeWhenTheServerEnds) {
-    handler.answer = [&](const Request&) { return Answer(keepResponder(seconds(60), inTime)); };
+    handler.answer = [&](const http::Request&) {
+        return http::Answer(keepResponder(seconds(60), inTime));
+    };
     RawClient client = connect();
     client.send("GET /later HTTP/1.1\r\n\r\n");
     responder.get_future().get();
@@ -173,15 +178,17 @@ TEST_F(Answers, ThatNobodyGaveYetAreMadeWhenTheServerEnds) {
 }
 
 TEST_F(Answers, ForAClientOrAServerThatHasGoneAreDropped) {
-    handler.answer = [&](const Request&) { return Answer(keepResponder(seconds(60), inTime)); };
+    handler.answer = [&](const http::Request&) {
+        return http::Answer(keepResponder(seconds(60), inTime));
+    };
     RawClient client = connect();
     client.send("GET /later HTTP/1.1\r\n\r\n");
-    const Responder respond = responder.get_future().get();
+    const http::Responder respond = responder.get_future().get();
     client.close();
-    respond(Reply{200, "nobody reads this"});
+    respond(http::Reply{200, "nobody reads this"});
     EXPECT_EQ(aliveness(), "alive");
     stop();
-    respond(Reply{200, "nobody sends this"});
+    respond(http::Reply{200, "nobody sends this"});
 }
 
 TEST_F(Answers, OfAHandlerThatIsBusyDelayTheEnd) {
@@ -194,7 +201,7 @@ TEST_F(Answers, OfAHandlerThatIsBusyDelayTheEnd) {
 }
 
 /// Events that are the test's.
-class TestSource final : public host::EventSource {
+class TestSource final : public http::EventSource {
 public:
     explicit TestSource(std::string first, std::atomic<bool>& gone)
         : text_(std::move(first)), gone_(gone) {}
@@ -210,10 +217,10 @@ private:
 
 TEST_F(Answers, MayBeStreamsOfAnyKind) {
     std::atomic<bool> gone{false};
-    handler.answer = [&](const Request&) -> std::variant<Answer, Job> {
+    handler.answer = [&](const http::Request&) -> std::variant<http::Answer, http::Job> {
         std::string text;
-        host::appendEvent(text, {"7", "tick", "n-1"});
-        return Answer(std::make_unique<TestSource>(text, gone));
+        http::appendEvent(text, {"7", "tick", "n-1"});
+        return http::Answer(std::make_unique<TestSource>(text, gone));
     };
     RawClient client = connect();
     client.send("GET /ticks HTTP/1.1\r\n\r\n");
@@ -229,8 +236,8 @@ TEST_F(Answers, MayBeStreamsOfAnyKind) {
 
 TEST_F(Answers, ThatAreStreamsEndWithTheServer) {
     std::atomic<bool> gone{false};
-    handler.answer = [&](const Request&) -> std::variant<Answer, Job> {
-        return Answer(std::make_unique<TestSource>("data: x\n\n", gone));
+    handler.answer = [&](const http::Request&) -> std::variant<http::Answer, http::Job> {
+        return http::Answer(std::make_unique<TestSource>("data: x\n\n", gone));
     };
     RawClient client = connect();
     client.send("GET /ticks HTTP/1.1\r\n\r\n");

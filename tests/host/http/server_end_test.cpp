@@ -47,13 +47,13 @@ TEST_F(End, LeavesAListenerOpenThatSomebodyElseGoesOnWith) {
     services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
     api.emplace(*services, host::routes());
     const int listener = socket->listen();
-    server = std::make_unique<host::HttpServer>(listener, *api, services->counts);
+    server = std::make_unique<http::HttpServer>(listener, host::doorFor(), *api, services->counts);
     server->leaveListenerOpen();
     server->end(seconds(60));
     server->run();
     RawClient waiting = connect();
     ASSERT_TRUE(waiting.connected());
-    server = std::make_unique<host::HttpServer>(listener, *api, services->counts);
+    server = std::make_unique<http::HttpServer>(listener, host::doorFor(), *api, services->counts);
     serving = std::thread([this] { server->run(); });
     EXPECT_EQ(waiting.get("/v1/health").status, 200);
 }
@@ -62,11 +62,12 @@ TEST_F(End, SaysThatItBegins) {
     socket.emplace(scratch.path("s"));
     services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
     api.emplace(*services, host::routes());
-    server = std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts);
+    server = std::make_unique<http::HttpServer>(socket->listen(), host::doorFor(), *api,
+                                                services->counts);
     int ends[2];
     ASSERT_EQ(::pipe(ends), 0);
-    const host::FileDescriptor reader(ends[0]);
-    host::FileDescriptor writer(ends[1]);
+    const sys::FileDescriptor reader(ends[0]);
+    sys::FileDescriptor writer(ends[1]);
     int begun = 0;
     server->endWhenReadable(reader.get(), seconds(60), [&begun] { ++begun; });
     writer.reset();
@@ -85,7 +86,8 @@ TEST_F(End, WhatIsRegularGoesOnWhileItWaits) {
     socket.emplace(scratch.path("s"));
     services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
     api.emplace(*services, host::routes());
-    server = std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts);
+    server = std::make_unique<http::HttpServer>(socket->listen(), host::doorFor(), *api,
+                                                services->counts);
     std::atomic<int> times{0};
     server->every(milliseconds(1), [&times] { ++times; });
     serving = std::thread([this] {

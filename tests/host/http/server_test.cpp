@@ -260,7 +260,7 @@ TEST_F(BadRequests, ThatEndEarlyAreRefused) {
 }
 
 TEST_F(Connections, OfSlowClientsEnd) {
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.requestTime = milliseconds(150);
     start(limits);
     std::vector<RawClient> clients;
@@ -274,7 +274,7 @@ TEST_F(Connections, OfSlowClientsEnd) {
 }
 
 TEST_F(Connections, ThatDripBytesEndTooBecauseTheTimeIsForTheWholeRequest) {
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.requestTime = milliseconds(300);
     start(limits);
     RawClient client = connect();
@@ -283,7 +283,7 @@ TEST_F(Connections, ThatDripBytesEndTooBecauseTheTimeIsForTheWholeRequest) {
 }
 
 TEST_F(Connections, ThatAreIdleEnd) {
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.idleTime = milliseconds(1000);
     start(limits);
     RawClient fresh = connect();
@@ -299,7 +299,7 @@ TEST_F(Connections, OfClientsThatDoNotReadEnd) {
             insert(request, plainRow("row", i, "filling text"));
         return static_cast<int>(OXA_OK);
     };
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.answerTime = milliseconds(200);
     limits.connections = 1;
     start(limits);
@@ -344,7 +344,7 @@ TEST_F(Connections, ThatAreIdleBeyondTheLimitAllGet503) {
 }
 
 TEST_F(Connections, BeyondTheLimitGet503WhateverTheySend) {
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.connections = 1;
     limits.refusals = 0;
     start(limits);
@@ -355,7 +355,7 @@ TEST_F(Connections, BeyondTheLimitGet503WhateverTheySend) {
 }
 
 TEST_F(Connections, FarBeyondTheLimitCostNothing) {
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.connections = 2;
     limits.refusals = 3;
     start(limits);
@@ -426,10 +426,11 @@ TEST_F(Connections, OfOtherUsersAreRefused) {
 
 TEST_F(Connections, OfReadersShutNobodyElseOut) {
     if (::geteuid() != 0) GTEST_SKIP() << "only root can become another user";
-    host::ServerLimits limits;
-    limits.groups.read = host::Group{"nogroup", 65534};
+    http::ServerLimits limits;
     limits.readers = 2;
-    start(limits);
+    host::AccessGroups groups;
+    groups.read = host::Group{"nogroup", 65534};
+    start(limits, groups);
     ASSERT_EQ(::chmod(scratch.path().c_str(), 0755), 0);
     ASSERT_EQ(::chmod(scratch.path("s").c_str(), 0666), 0);
     const pid_t child = ::fork();
@@ -490,7 +491,7 @@ TEST_F(Samples, BeyondThoseThatMayWaitGet503) {
         gate.wait();
         return static_cast<int>(OXA_OK);
     };
-    host::ServerLimits limits;
+    http::ServerLimits limits;
     limits.workers = 2;
     limits.waitingRequests = 1;
     start(limits);

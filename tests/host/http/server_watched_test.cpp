@@ -5,8 +5,8 @@
 
 #include <cstdint>
 
-#include "host/process/system/file_descriptor.h"
 #include "host/server_fixture.h"
+#include "system/file_descriptor.h"
 
 namespace {
 
@@ -26,7 +26,7 @@ public:
     }
 
 private:
-    const host::FileDescriptor descriptor_{::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)};
+    const sys::FileDescriptor descriptor_{::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)};
 };
 
 class Watched : public ServerTest {
@@ -36,7 +36,8 @@ protected:
         socket.emplace(scratch.path("s"));
         services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
         api.emplace(*services, host::routes());
-        server = std::make_unique<host::HttpServer>(socket->listen(), *api, services->counts);
+        server = std::make_unique<http::HttpServer>(socket->listen(), host::doorFor(), *api,
+                                                    services->counts);
     }
 
     /// The numbers of events of which each call of a server with this delay learned, where ten

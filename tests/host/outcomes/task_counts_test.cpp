@@ -73,7 +73,7 @@ TEST(CountsOfTasks, MeasureOnlyTasksThatRan) {
     Task expired = taskOf("STOP", TaskState::Expired);
     expired.ended = ran.ended;
     counts.add(expired);
-    const host::Histogram::Snapshot taken = counts.durations().at("STOP").snapshot();
+    const metrics::Histogram::Snapshot taken = counts.durations().at("STOP").snapshot();
     EXPECT_EQ(taken.count, 1U);
     EXPECT_EQ(taken.sum, std::chrono::seconds(7));
     EXPECT_EQ(counts.durations().at("START").snapshot().count, 0U);

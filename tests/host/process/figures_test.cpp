@@ -8,8 +8,8 @@
 
 #include <chrono>
 
-#include "host/process/system/file_descriptor.h"
 #include "support/host/program.h"
+#include "system/file_descriptor.h"
 
 namespace {
 
@@ -25,8 +25,8 @@ TEST(FiguresOfTheProcess, AreAllKnown) {
 
 TEST(FiguresOfTheProcess, CountDescriptors) {
     const host::ProcessFigures before = host::readProcessFigures();
-    const host::FileDescriptor one(::open("/dev/null", O_RDONLY | O_CLOEXEC));
-    const host::FileDescriptor two(::open("/dev/null", O_RDONLY | O_CLOEXEC));
+    const sys::FileDescriptor one(::open("/dev/null", O_RDONLY | O_CLOEXEC));
+    const sys::FileDescriptor two(::open("/dev/null", O_RDONLY | O_CLOEXEC));
     EXPECT_EQ(*host::readProcessFigures().openDescriptors, *before.openDescriptors + 2);
     rlimit limit{};
     ASSERT_EQ(::getrlimit(RLIMIT_NOFILE, &limit), 0);

@@ -11,9 +11,9 @@
 #include <climits>
 #include <nlohmann/json.hpp>
 
-#include "host/process/system/file_descriptor.h"
 #include "support/scoped_env.h"
 #include "support/scratch_dir.h"
+#include "system/file_descriptor.h"
 
 namespace {
 
@@ -69,7 +69,7 @@ TEST(Log, NothingInALineSteersATerminal) {
 TEST(Log, TheJournalGetsFields) {
     const ScratchDir scratch;
     const std::string path = scratch.path("journal");
-    const host::FileDescriptor journal(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
+    const sys::FileDescriptor journal(::socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     path.copy(address.sun_path, sizeof address.sun_path - 1);
@@ -100,14 +100,14 @@ public:
     StandardError& operator=(const StandardError&) = delete;
 
 private:
-    const host::FileDescriptor kept_;
+    const sys::FileDescriptor kept_;
 };
 
 TEST(Log, NobodyWhoDoesNotReadHoldsTheHostUp) {
     int ends[2] = {};
     ASSERT_EQ(::pipe2(ends, O_CLOEXEC), 0);
-    const host::FileDescriptor reading(ends[0]);
-    const host::FileDescriptor writing(ends[1]);
+    const sys::FileDescriptor reading(ends[0]);
+    const sys::FileDescriptor writing(ends[1]);
     {
         const StandardError pipe(writing.get());
         for (int i = 0; i < 1'000; ++i)

@@ -102,7 +102,7 @@ TEST_F(Socket, ThatIsServedIsLeftAlone) {
 }
 
 TEST_F(Socket, ThatAProgramWithoutLockServesIsLeftAloneToo) {
-    const host::FileDescriptor other(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    const sys::FileDescriptor other(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     path.copy(address.sun_path, path.size());
@@ -130,7 +130,7 @@ TEST_F(Socket, OfAHostThatWasKilledIsReplaced) {
 }
 
 TEST_F(Socket, IsAwaitedWhileAChildOfAKilledHostStillHasItsLock) {
-    host::FileDescriptor lock(::open((path + ".lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+    sys::FileDescriptor lock(::open((path + ".lock").c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
     ASSERT_EQ(::flock(lock.get(), LOCK_EX), 0);
     std::thread child([&lock] {
         std::this_thread::sleep_for(std::chrono::milliseconds(100));
@@ -216,7 +216,7 @@ TEST_F(Socket, InADirectoryThatIsNotThereIsAnError) {
 
 TEST_F(Socket, OneThatSomebodyElseBoundStaysWhenItIsGivenUp) {
     SocketFile theirs(path);
-    host::FileDescriptor passed(::fcntl(theirs.listen(), F_DUPFD_CLOEXEC, 0));
+    sys::FileDescriptor passed(::fcntl(theirs.listen(), F_DUPFD_CLOEXEC, 0));
     ASSERT_EQ(::unlink((path + ".lock").c_str()), 0) << "the one who passes it holds no lock";
     {
         SocketFile socket(path, host::Connects::Owner, std::move(passed));

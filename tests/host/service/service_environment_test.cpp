@@ -78,7 +78,7 @@ TEST_F(ServiceVariables, AreGoneForChildren) {
 class PassedSockets : public testing::Test {
 protected:
     void add(const std::string& name, const std::string& path) {
-        sockets.push_back({host::FileDescriptor(), name, path});
+        sockets.push_back({sys::FileDescriptor(), name, path});
     }
     std::vector<PassedSocket> sockets;
 };

@@ -18,8 +18,8 @@ namespace host {
 Endpoint answerNothing;
 Schema whatIsThere, thePlace, alsoAPlace;
 
-Answer answerNothing(Services&, const Call&) {
-    return Reply{};
+http::Answer answerNothing(Services&, const Call&) {
+    return http::Reply{};
 }
 
 nlohmann::ordered_json thePlace(Components&) {
@@ -42,13 +42,13 @@ nlohmann::ordered_json whatIsThere(Components& components) {
 
 namespace {
 
-using host::Access;
 using host::JsonType;
 using host::Need;
 using host::Others;
 using host::Route;
 using host::Runs;
 using host::Type;
+using http::Access;
 using Json = nlohmann::ordered_json;
 
 Json described(const std::vector<Route>& routes) {
@@ -56,7 +56,7 @@ Json described(const std::vector<Route>& routes) {
 }
 
 Route routeOf(const char* method, const char* path) {
-    return {method, path, "Says something.", Access::Read, Runs::AtOnce, host::answerNothing};
+    return {method, path, "Says something.", http::Access::Read, Runs::AtOnce, host::answerNothing};
 }
 
 std::set<std::string> keysOf(const Json& object) {

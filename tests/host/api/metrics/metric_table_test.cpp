@@ -14,10 +14,10 @@
 namespace {
 
 using host::Metric;
-using host::MetricType;
+using metrics::MetricType;
 
 std::string rowOf(const Metric& metric) {
-    return "| `" + std::string(metric.name) + "` | " + std::string(host::nameOf(metric.type)) +
+    return "| `" + std::string(metric.name) + "` | " + std::string(metrics::nameOf(metric.type)) +
            " | " + metric.labels + (*metric.labels == '\0' ? "| " : " | ") + metric.help + " |";
 }
 
@@ -44,9 +44,9 @@ TEST(TableOfMetrics, KeepsToTheConventionsForNames) {
         const std::string name = metric.name;
         EXPECT_TRUE(names.insert(name).second) << name << " comes twice";
         EXPECT_TRUE(name.rfind("zavhost_", 0) == 0 || name.rfind("process_", 0) == 0) << name;
-        EXPECT_EQ(endsWith(name, "_total"), metric.type == MetricType::Counter) << name;
+        EXPECT_EQ(endsWith(name, "_total"), metric.type == metrics::MetricType::Counter) << name;
         EXPECT_EQ(name.find_first_not_of("abcdefghijklmnopqrstuvwxyz_"), std::string::npos);
-        if (metric.type == MetricType::Histogram) {
+        if (metric.type == metrics::MetricType::Histogram) {
             EXPECT_TRUE(endsWith(name, "_seconds")) << name;
         }
         EXPECT_TRUE(endsWith(metric.help, ".")) << name;
@@ -56,7 +56,7 @@ TEST(TableOfMetrics, KeepsToTheConventionsForNames) {
 class MetricsEndpoint : public ApiTest {
 protected:
     MetricsPage page() {
-        const host::Reply reply = ask("GET", "/v1/metrics");
+        const http::Reply reply = ask("GET", "/v1/metrics");
         EXPECT_EQ(reply.status, 200U);
         EXPECT_EQ(reply.type, "text/plain; version=0.0.4; charset=utf-8");
         return MetricsPage(reply.body);

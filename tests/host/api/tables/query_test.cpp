@@ -7,7 +7,7 @@ namespace {
 
 class QueryEndpoint : public ApiTest {
 protected:
-    host::Reply post(const std::string& body) { return ask("POST", "/v1/query", body); }
+    http::Reply post(const std::string& body) { return ask("POST", "/v1/query", body); }
 };
 
 TEST_F(QueryEndpoint, HandsTheConditionsOnInTheirOrder) {
@@ -60,7 +60,7 @@ TEST_F(QueryEndpoint, RefusesWhatIsNotJson) {
          {std::string("{"), std::string("{'table':'PLAIN'}"), std::string("{\"table\":\"\xFF\"}"),
           std::string("{\"table\":\"\\ud800\"}"), std::string("\0", 1), std::string("NaN"),
           std::string("{\"table\":1e999}")}) {
-        const host::Reply reply = post(body);
+        const http::Reply reply = post(body);
         EXPECT_EQ(reply.status, 400U) << body;
         EXPECT_EQ(reply.body.find("{\"error\":\"the body is not JSON"), 0U) << reply.body;
     }
@@ -126,21 +126,21 @@ TEST_F(QueryEndpoint, LetsReadersQueryTheInventoryAndNothingElse) {
     api.reset();
     services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
     api.emplace(*services, host::routes());
-    const auto query = [&](const char* name, host::Access access) {
+    const auto query = [&](const char* name, http::Access access) {
         return ask("POST", "/v1/query", R"({"table":")" + std::string(name) + "\"}", access);
     };
     expectError(403, "you may only read from this host, and query KINAGT only",
-                query("PLAIN", host::Access::Read));
+                query("PLAIN", http::Access::Read));
     expectError(403, "you may only read from this host; a query on KAGREQT acts",
-                query("KAGREQT", host::Access::Read));
+                query("KAGREQT", http::Access::Read));
     EXPECT_EQ(requestSamples, 0);
-    EXPECT_EQ(query("KINAGT", host::Access::Read).status, 200U);
+    EXPECT_EQ(query("KINAGT", http::Access::Read).status, 200U);
     EXPECT_EQ(inventorySamples, 1);
-    EXPECT_EQ(query("KAGREQT", host::Access::Act).status, 200U);
-    EXPECT_EQ(query("PLAIN", host::Access::Act).status, 200U);
+    EXPECT_EQ(query("KAGREQT", http::Access::Act).status, 200U);
+    EXPECT_EQ(query("PLAIN", http::Access::Act).status, 200U);
     EXPECT_EQ(requestSamples, 1);
     expectError(403, "you may only read from this host; KAGREQT takes requests",
-                ask("GET", "/v1/events?table=KAGREQT", "", host::Access::Read));
+                ask("GET", "/v1/events?table=KAGREQT", "", http::Access::Read));
     EXPECT_EQ(requestSamples, 1);
 }
 
@@ -176,7 +176,7 @@ TEST_F(GuardedQuery, ARefusedRequestIsNotHandedOn) {
     const std::string body =
         R"({"table":"KAGREQT","where":[{"column":"PRODUCT","op":"like","value":"u*"}]})";
     serve(true);
-    const host::Reply reply = post(body);
+    const http::Reply reply = post(body);
     EXPECT_EQ(reply.status, 400U);
     EXPECT_EQ(reply.body,
               "{\"error\":\"a request gives values; PRODUCT has an operator other than \\\"=\\\", "

@@ -52,7 +52,7 @@ protected:
 };
 
 TEST_F(AGate, CountsFilesBytesAndFailures) {
-    host::ByLabel<host::Counter> refusals({"depot-transfers"});
+    metrics::ByLabel<metrics::Counter> refusals({"depot-transfers"});
     gate_.emplace(*rules_, &refusals);
     EXPECT_EQ(send(1, "a", true, false), 0);
     EXPECT_EQ(send(1, "a", false, true), 0);

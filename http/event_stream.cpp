@@ -1,0 +1,107 @@
+#include "http/event_stream.h"
+
+#include <boost/asio/buffer.hpp>
+#include <boost/asio/write.hpp>
+#include <boost/beast/http/write.hpp>
+#include <utility>
+
+namespace http {
+
+namespace net = boost::asio;
+namespace wire = boost::beast::http;
+
+EventStream::EventStream(ServerCore& core, Stream stream, std::unique_ptr<EventSource> source,
+                         bool clientOnlyReads)
+    : core_(core),
+      stream_(std::move(stream)),
+      source_(std::move(source)),
+      onlyReads_(clientOnlyReads),
+      heartbeat_(core.io) {}
+
+EventStream::~EventStream() {
+    if (!closed_) --core_.counts.streams;
+}
+
+void EventStream::start() {
+    core_.add(shared_from_this());
+    ++core_.counts.streams;
+    closed_ = false;
+    stream_.expires_never();
+    awaitHangUp();
+    awaitHeartbeat();
+    writeHead();
+    source_->start([mailbox = core_.mailbox, weak = weak_from_this()] {
+        mailbox->post([weak] {
+            if (const auto self = weak.lock()) self->pump();
+        });
+    });
+}
+
+bool EventStream::quiet() const {
+    return closed_ || (!writing_ && source_->empty());
+}
+
+/// Does not wait for the end of input: a client that has shut down its sending side may still read.
+/// Only when both sides are closed is the socket in an error state.
+void EventStream::awaitHangUp() {
+    stream_.socket().async_wait(net::socket_base::wait_error,
+                                [self = shared_from_this()](Error) { self->close(); });
+}
+
+void EventStream::awaitHeartbeat() {
+    heartbeat_.expires_after(core_.limits.heartbeat);
+    heartbeat_.async_wait([self = shared_from_this()](Error error) {
+        if (error || self->closed_) return;
+        if (!self->writing_) self->write(std::string(kHeartbeat));
+        self->awaitHeartbeat();
+    });
+}
+
+void EventStream::writeHead() {
+    writing_ = true;
+    head_.result(wire::status::ok);
+    head_.version(11);
+    head_.set(wire::field::content_type, "text/event-stream");
+    head_.set(wire::field::cache_control, "no-cache");
+    const std::string position = source_->position();
+    if (!position.empty()) head_.set("Last-Event-ID", position);
+    head_.keep_alive(false);  // the stream is as long as the connection
+    headWriter_.emplace(head_);
+    wire::async_write_header(
+        stream_, *headWriter_,
+        [self = shared_from_this()](Error error, std::size_t) { self->onWritten(error); });
+}
+
+void EventStream::write(std::string text) {
+    writing_ = true;
+    out_ = std::move(text);
+    net::async_write(
+        stream_, net::buffer(out_),
+        [self = shared_from_this()](Error error, std::size_t) { self->onWritten(error); });
+}
+
+void EventStream::pump() {
+    if (writing_ || closed_) return;
+    std::string text = source_->take();
+    if (!text.empty()) return write(std::move(text));
+    if (source_->over()) close();
+}
+
+void EventStream::onWritten(Error error) {
+    writing_ = false;
+    std::string().swap(out_);  // a large batch does not stay allocated
+    if (error) return close();
+    pump();
+}
+
+void EventStream::close() {
+    if (closed_) return;
+    closed_ = true;
+    stream_.close();
+    heartbeat_.cancel();
+    source_.reset();
+    --core_.counts.streams;
+    core_.remove(this);
+}
+
+}  // namespace http

@@ -1,0 +1,292 @@
+#include "http/session.h"
+
+#include <boost/asio/buffer.hpp>
+#include <boost/asio/write.hpp>
+#include <boost/beast/core/bind_handler.hpp>
+#include <boost/beast/core/string.hpp>
+#include <boost/beast/http/read.hpp>
+#include <boost/beast/http/write.hpp>
+#include <exception>
+#include <optional>
+#include <utility>
+#include <variant>
+
+#include "http/event_stream.h"
+#include "http/head_check.h"
+
+namespace http {
+namespace {
+
+namespace net = boost::asio;
+namespace beast = boost::beast;
+namespace wire = beast::http;
+
+constexpr unsigned kNoContent = 204;
+constexpr std::size_t kReadBytes = 4096;
+constexpr std::size_t kBufferBytes = 64 * 1024;
+/// A client that keeps sending after the last answer is cut off after this many bytes.
+constexpr std::size_t kDrainBytes = 4 * 1024 * 1024;
+
+std::string_view view(beast::string_view text) {
+    return {text.data(), text.size()};
+}
+
+bool wantsContinue(const wire::request<wire::string_body>& request) {
+    return request.version() >= 11 && beast::iequals(request[wire::field::expect], "100-continue");
+}
+
+/// Looks at the extensions of each chunk, which the parser passes by as far as the end of the line.
+void checkChunk(std::uint64_t, beast::string_view extensions, beast::error_code& error) {
+    if (hidesALine(view(extensions))) error = wire::error::bad_chunk_extension;
+}
+
+/// Composes no text: memory may be what is missing.
+Reply failure() {
+    return {500, "{\"error\":\"the request failed for want of memory\"}\n"};
+}
+
+}  // namespace
+
+HttpSession::HttpSession(ServerCore& core, Stream stream, const Peer& peer)
+    : core_(core), stream_(std::move(stream)), peer_(peer), buffer_(kBufferBytes) {}
+
+void HttpSession::serve() {
+    core_.add(shared_from_this());
+    awaitRequest();
+}
+
+void HttpSession::refuse(unsigned status, std::string_view text) {
+    core_.add(shared_from_this());
+    refusal_ = true;
+    ++core_.refusals;
+    respond(errorReply(status, text));
+}
+
+bool HttpSession::quiet() const {
+    return state_ != State::Working && state_ != State::Writing;
+}
+
+void HttpSession::prepareForEnd() {
+    if (state_ == State::Idle) close();
+    if (atLimit_) endWait();
+}
+
+void HttpSession::awaitRequest() {
+    state_ = State::Idle;
+    if (core_.ending) return close();
+    if (buffer_.size() > 0) return readRequest();  // it came together with the last one
+    buffer_.shrink_to_fit();
+    stream_.expires_after(core_.limits.idleTime);
+    stream_.async_read_some(buffer_.prepare(kReadBytes),
+                            [self = shared_from_this()](Error error, std::size_t bytes) {
+                                if (error) return self->close();
+                                self->buffer_.commit(bytes);
+                                self->readRequest();
+                            });
+}
+
+void HttpSession::readRequest() {
+    if (state_ == State::Closed) return;
+    state_ = State::Reading;
+    parser_.emplace();
+    parser_->header_limit(core_.limits.headBytes);
+    parser_->body_limit(core_.limits.bodyBytes);
+    parser_->on_chunk_header(checkChunk);
+    keepAlive_ = false;
+    isHead_ = false;
+    head_.clear();
+    stream_.expires_after(core_.limits.requestTime);
+    readHead();
+}
+
+/// Keeps the head's bytes, because the parser mends some of what is to be refused.
+void HttpSession::readHead() {
+    Error error;
+    while (buffer_.size() > 0 && !error && !parser_->is_header_done()) {
+        const std::size_t taken = parser_->put(buffer_.data(), error);
+        head_.append(static_cast<const char*>(buffer_.data().data()), taken);
+        buffer_.consume(taken);
+    }
+    if (parser_->is_header_done() || (error && error != wire::error::need_more)) {
+        return onHead(error);
+    }
+    stream_.async_read_some(buffer_.prepare(kReadBytes),
+                            [self = shared_from_this()](Error failure, std::size_t bytes) {
+                                if (failure) return self->onEndInHead(failure);
+                                self->buffer_.commit(bytes);
+                                self->readHead();
+                            });
+}
+
+void HttpSession::onEndInHead(Error error) {
+    const bool begun = parser_->got_some() || buffer_.size() > 0;
+    onReadError(error == net::error::eof && begun ? wire::error::partial_message : error);
+}
+
+void HttpSession::onHead(Error error) {
+    if (error) return onReadError(error);
+    std::optional<Reply> refused = refusalOfHead(head_, parser_->get());
+    head_ = {};
+    if (refused) return respond(std::move(*refused));
+    if (parser_->is_done() || buffer_.size() > 0 || !wantsContinue(parser_->get())) {
+        return readBody();
+    }
+    static constexpr std::string_view kContinue = "HTTP/1.1 100 Continue\r\n\r\n";
+    net::async_write(stream_, net::buffer(kContinue.data(), kContinue.size()),
+                     [self = shared_from_this()](Error failure, std::size_t) {
+                         if (failure) return self->close();
+                         self->readBody();
+                     });
+}
+
+void HttpSession::readBody() {
+    wire::async_read(
+        stream_, buffer_, *parser_,
+        [self = shared_from_this()](Error error, std::size_t) { self->onRequest(error); });
+}
+
+void HttpSession::onRequest(Error error) {
+    if (error) return onReadError(error);
+    stream_.expires_never();
+    dispatch();
+}
+
+void HttpSession::onReadError(Error error) {
+    static const beast::error_category& kHttpErrors =
+        wire::make_error_code(wire::error::end_of_stream).category();
+    if (error == wire::error::end_of_stream || error.category() != kHttpErrors) return close();
+    if (error == wire::error::body_limit) {
+        return respond(errorReply(
+            413, "the body is larger than " + std::to_string(core_.limits.bodyBytes) + " bytes"));
+    }
+    if (error == wire::error::header_limit || error == wire::error::buffer_overflow) {
+        return respond(errorReply(400, "the request's head is larger than " +
+                                           std::to_string(core_.limits.headBytes) + " bytes"));
+    }
+    if (error == wire::error::partial_message) {
+        return respond(errorReply(400, "the request ended before it was complete"));
+    }
+    respond(errorReply(400, "the request is not HTTP/1.1: " + error.message()));
+}
+
+void HttpSession::dispatch() {
+    auto& message = parser_->get();
+    keepAlive_ = message.keep_alive() && !core_.ending;
+    isHead_ = message.method() == wire::verb::head;
+    state_ = State::Working;
+    ++exchange_;
+    if (core_.ending) return respond(errorReply(503, "the host is about to end"));
+    try {
+        Request request{std::string(view(message.method_string())),
+                        std::string(view(message.target())), std::move(message.body()), peer_,
+                        std::string(view(message["Last-Event-ID"]))};
+        parser_.reset();
+        std::variant<Answer, Job> wanted = core_.handler.handle(std::move(request));
+        if (auto* const job = std::get_if<Job>(&wanted)) return submit(std::move(*job));
+        answer(std::get<Answer>(std::move(wanted)));
+    } catch (const std::exception&) {
+        respond(failure());
+    }
+}
+
+void HttpSession::submit(Job job) {
+    const Responder responder(core_.mailbox, weak_from_this(), exchange_);
+    const bool taken = core_.pool.submit([responder, job = std::move(job)] {
+        try {
+            responder(job());
+        } catch (...) {
+            responder(failure());
+        }
+    });
+    if (!taken) respond(errorReply(503, "too many requests are waiting"));
+}
+
+void HttpSession::take(unsigned exchange, Answer given) {
+    if (state_ == State::Working && exchange == exchange_) answer(std::move(given));
+}
+
+void HttpSession::answer(Answer given) {
+    atLimit_ = nullptr;
+    if (waitTimer_) waitTimer_->cancel();
+    std::visit([this](auto&& kind) { answer(std::move(kind)); }, std::move(given));
+}
+
+void HttpSession::answer(std::unique_ptr<EventSource> source) {
+    if (core_.ending) return respond(errorReply(503, "the host is about to end"));
+    if (isHead_) return respond({200, "", "text/event-stream"});
+    const auto self = shared_from_this();  // what the books hold may be all that holds it
+    state_ = State::Closed;
+    core_.remove(this);
+    std::make_shared<EventStream>(core_, std::move(stream_), std::move(source), onlyReads())
+        ->start();
+}
+
+void HttpSession::answer(Later later) {
+    atLimit_ = std::move(later.atLimit);
+    if (core_.ending) return endWait();
+    if (!waitTimer_) waitTimer_.emplace(core_.io);
+    waitTimer_->expires_after(later.limit);
+    waitTimer_->async_wait([weak = weak_from_this(), exchange = exchange_](Error error) {
+        const auto self = weak.lock();
+        if (!error && self && self->exchange_ == exchange && self->atLimit_) self->endWait();
+    });
+    later.begin(Responder(core_.mailbox, weak_from_this(), exchange_));
+}
+
+void HttpSession::endWait() {
+    submit(std::exchange(atLimit_, nullptr));
+}
+
+void HttpSession::respond(Reply reply) {
+    if (state_ == State::Closed) return;
+    state_ = State::Writing;
+    parser_.reset();
+    keepAlive_ = keepAlive_ && !core_.ending;
+    response_.emplace(static_cast<wire::status>(reply.status), 11);
+    for (const auto& [name, value] : reply.fields)
+        response_->set(name, value);
+    response_->keep_alive(keepAlive_);
+    if (reply.status != kNoContent) {
+        response_->set(wire::field::content_type, reply.type);
+        // HEAD may ask about a stream, which has no length.
+        if (!isHead_ || !reply.body.empty()) response_->content_length(reply.body.size());
+    }
+    if (!isHead_) response_->body() = std::move(reply.body);
+    stream_.expires_after(core_.limits.answerTime);
+    wire::async_write(stream_, *response_, [self = shared_from_this()](Error error, std::size_t) {
+        self->onWritten(error);
+    });
+}
+
+void HttpSession::onWritten(Error error) {
+    response_.reset();
+    if (error) return close();
+    if (keepAlive_) return awaitRequest();
+    // Closing a socket with unread bytes resets the connection, and the client might lose the
+    // answer. So read until the client has closed its side.
+    stream_.socket().shutdown(net::socket_base::shutdown_send, error);
+    if (error) return close();
+    state_ = State::Lingering;
+    stream_.expires_after(core_.limits.lingerTime);
+    linger(0);
+}
+
+void HttpSession::linger(std::size_t drained) {
+    if (drained > kDrainBytes) return close();
+    buffer_.clear();
+    stream_.async_read_some(buffer_.prepare(kReadBytes),
+                            [self = shared_from_this(), drained](Error error, std::size_t bytes) {
+                                if (error) return self->close();
+                                self->linger(drained + bytes);
+                            });
+}
+
+void HttpSession::close() {
+    if (state_ == State::Closed) return;
+    state_ = State::Closed;
+    stream_.close();
+    if (refusal_) --core_.refusals;
+    core_.remove(this);
+}
+
+}  // namespace http
