@@ -13,7 +13,7 @@ find tests platform/conformance -name '*.cpp' -exec cat {} + | tr '\n' ' ' |
 sed 's/\..*/.*/' "$scratch/cases" | sort -u | cat - "$scratch/cases" >"$scratch/there"
 
 status=0
-for document in docs/guards.md docs/security.md; do
+for document in docs/guards.md docs/security.md docs/fleet-security.md; do
     # shellcheck disable=SC2016
     grep '^|' "$document" | grep -oE '`[A-Z][A-Za-z0-9_]*\.([A-Z][A-Za-z0-9_]*|\*)`' |
         tr -d '`' | sort -u >"$scratch/named"
