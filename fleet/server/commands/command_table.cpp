@@ -4,6 +4,7 @@ namespace fleet {
 
 const std::vector<Command>& commandTable() {
     static const std::vector<Command> table = {
+        {"", "serve", "Give hosts their orders, and keep how they ended", declareServe},
         {"keys", "init", "Make all keys of a new fleet", declareKeysInit},
         {"keys", "rotate", "Give the centre new keys and certificates", declareKeysRotate},
         {"", "enrol", "Invite a host, and print the line that it needs", declareEnrol},

@@ -1,4 +1,4 @@
-/// All subcommands of zavfleetd that need no running centre.
+/// All subcommands of zavfleetd.
 #pragma once
 
 #include <vector>
@@ -10,6 +10,7 @@ namespace fleet {
 const std::vector<Command>& commandTable();
 
 // Each is declared in a file of its name.
+Action declareServe(CLI::App& app);
 Action declareKeysInit(CLI::App& app);
 Action declareKeysRotate(CLI::App& app);
 Action declareEnrol(CLI::App& app);

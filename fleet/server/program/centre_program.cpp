@@ -191,6 +191,7 @@ bool CentreProgram::beginWork() {
 
 void CentreProgram::loop() {
     auto nextWork = Steady::now();
+    auto nextLook = nextWork;
     while (!end_) {
         std::optional<Mailbox::Letter> letter = mailbox_.take(nextWork);
         if (letter) {
@@ -199,7 +200,10 @@ void CentreProgram::loop() {
             continue;
         }
         if (end_) return;
-        nextWork = Steady::now() + (workOnBus() ? milliseconds(0) : milliseconds(kPause));
+        const bool isDue = Steady::now() >= nextLook;
+        if (isDue) nextLook = Steady::now() + (attend() ? milliseconds(0) : milliseconds(kPause));
+        const bool isMore = workOnBus();
+        nextWork = isMore ? Steady::now() : nextLook;
     }
 }
 
@@ -216,6 +220,15 @@ void CentreProgram::readLetters(Mailbox::Letter first) {
     batch.commit();
     for (const auto& tell : std::exchange(afterCommit_, {}))
         tell();
+}
+
+bool CentreProgram::attend() {
+    if (!settings_.attend) return false;
+    sqlite::Transaction step(database_.connection());
+    CentreParts parts{*centre_, store_, database_.connection()};
+    const bool isMore = settings_.attend(parts, now());
+    step.commit();
+    return isMore;
 }
 
 /// Notes of what was published share a transaction, too: what is published and not noted is found

@@ -27,6 +27,13 @@
 
 namespace fleet {
 
+/// What the functions given to a CentreProgram may use.
+struct CentreParts {
+    Centre& centre;
+    CentreStore& store;
+    sqlite::Database& database;
+};
+
 /// What a centre needs to work.
 struct CentreSettings {
     std::string directory;  ///< of its database
@@ -40,7 +47,10 @@ struct CentreSettings {
     std::chrono::milliseconds sweepTime = std::chrono::hours(1);
     /// Signing keys of operators that count no longer. Called on the thread of run().
     std::function<std::vector<std::string>()> revoked = {};
-    Centre::TellAlarm alarm;  ///< called on the thread of run()
+    Centre::TellAlarm alarm = {};  ///< called on the thread of run()
+    /// Called once before anything else, and then each second as a transaction of its own; again at
+    /// once while it returns true. On the thread of run(). May be empty.
+    std::function<bool(CentreParts& parts, Moment now)> attend = {};
 };
 
 /// What the last hello of a host has told. Only in memory: half a minute after a start it is there
@@ -73,12 +83,7 @@ public:
     /// Any thread, at any time.
     void end();
 
-    /// What the functions given to ask() may use.
-    struct Parts {
-        Centre& centre;
-        CentreStore& store;
-        sqlite::Database& database;
-    };
+    using Parts = CentreParts;
     /// Runs on the thread of run() as one transaction of the database. The future is ready when
     /// that is durable, and has what the function has returned; or what it has thrown, and then
     /// nothing has changed; or std::future_error, if run() has ended first. Any other thread.
@@ -103,6 +108,7 @@ private:
     bool beginWork();
     void loop();
     void readLetters(Mailbox::Letter first);
+    bool attend();
     bool workOnBus();
     void takeHello(const BusMessage& message);
     void answerHello(const std::string& host, const std::string& reply, const std::string& bytes);

@@ -1,0 +1,92 @@
+#include "fleet/server/service/centre_service.h"
+
+#include <unistd.h>
+
+#include <array>
+#include <utility>
+
+#include "fleet/bus/messages/numbered_order.h"
+#include "fleet/log/log.h"
+#include "fleet/server/keys/trust/host_enrolment.h"
+#include "fleet/server/keys/trust/revocations.h"
+#include "fleet/server/service/store_register.h"
+
+namespace fleet {
+namespace {
+
+/// For another centre that finds the lease taken.
+std::string holderName() {
+    std::array<char, 256> host{};
+    if (::gethostname(host.data(), host.size() - 1) != 0) return "a centre";
+    return std::string(host.data()) + ", process " + std::to_string(::getpid());
+}
+
+void sayAlarm(const Alarm& alarm) {
+    say(Priority::Error, "host " + alarm.host + ": " + alarm.text);
+}
+
+}  // namespace
+
+CentreService::CentreService(const ServiceOptions& options)
+    : directory_(options.directory),
+      facts_(directory_.facts()),
+      key_(directory_.centre()),
+      trust_(directory_.trustDatabase()),
+      centre_(std::make_unique<CentreProgram>(settings(options))) {}
+
+CentreService::~CentreService() = default;
+
+ConnectionOptions CentreService::busOptions() const {
+    ConnectionOptions options;
+    options.urls = facts_.busUrls;
+    options.tls = TlsOptions{directory_.authorityFile(), facts_.names.front()};
+    options.name = "zavfleetd";
+    return options;
+}
+
+CentreSettings CentreService::settings(const ServiceOptions& options) {
+    CentreSettings settings{options.directory + "/orders", busOptions(), key_.key,
+                            StreamLimits{options.tasksBytes, options.replicas}, holderName()};
+    const BusUser user = directory_.bus().centre;
+    settings.bus.credentials =
+        UserToken{[token = user.token] { return token; },
+                  [key = user.key](std::string_view nonce) { return key.sign(nonce); }};
+    settings.revoked = [this] { return revoked_; };
+    settings.alarm = sayAlarm;
+    settings.attend = [this](CentreParts& parts, Moment now) { return attend(parts, now); };
+    return settings;
+}
+
+CentreProgram::End CentreService::run() {
+    // The accounts are up to date whether or not this centre has the lease: a stolen key waits for
+    // nobody.
+    accounts_ = std::make_unique<AccountKeeper>(directory_.path(), busOptions());
+    const CentreProgram::End end = centre_->run();
+    accounts_.reset();
+    return end;
+}
+
+/// Between two letters of the centre's.
+bool CentreService::attend(CentreParts& parts, Moment now) {
+    if (!rollouts_) begin(parts);
+    revoked_ = RevokedKeys(trust_.connection()).operators(now);
+    return rollouts_->tick(now);
+}
+
+void CentreService::begin(CentreParts& parts) {
+    // It may have been killed after a host had joined and before the orders' database knew of it.
+    StoreRegister hosts(parts.store);
+    HostEnrolment(trust_.connection()).tell(hosts);
+    rolloutStore_ = std::make_unique<SqliteRolloutStore>(parts.database);
+    Centre& centre = parts.centre;
+    rollouts_ = std::make_unique<Rollouts>(
+        *rolloutStore_, facts_.fleet,
+        [this, &centre](const std::string& host, const std::string& order,
+                        const std::string& bytes) {
+            return centre.submit(host, order, [&](Number number) {
+                return signNumber(host, number, order, bytes, key_.key);
+            });
+        });
+}
+
+}  // namespace fleet

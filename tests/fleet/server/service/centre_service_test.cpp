@@ -1,0 +1,110 @@
+// ctest-label: threaded
+#include "fleet/server/service/centre_service.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <future>
+#include <memory>
+#include <string>
+
+#include "fleet/bus/messages/enrolment.h"
+#include "fleet/server/keys/trust/host_enrolment.h"
+#include "fleet/server/keys/trust/revocations.h"
+#include "tests/fleet/server/keys/running_fleet.h"
+
+namespace {
+
+using fleet::CentreProgram;
+using fleet::CentreService;
+using fleet::KeyKind;
+using fleet::KeyPair;
+using made_fleet::kPatience;
+using made_fleet::RunningFleet;
+using made_fleet::today;
+
+/// Takes nobody up: the centre is told at its start.
+class NoRegister : public fleet::HostRegister {
+public:
+    void enrol(const fleet::EnrolledHost&) override {}
+};
+
+class RunningCentre : public testing::Test {
+protected:
+    ~RunningCentre() override {
+        if (running.valid()) stop();
+    }
+    const fleet::FleetDirectory& directory() const { return fleet_->made().directory(); }
+
+    /// A host that has joined.
+    fleet::EnrolmentAnswer join(const std::string& name) const {
+        fleet::TrustDatabase trust(directory().trustDatabase());
+        fleet::HostEnrolment enrolment(trust.connection());
+        fleet::EnrolmentRequest request;
+        request.fleet = "demo";
+        request.token = enrolment.invite({name, {}}, today());
+        request.host = bus.publicKey();
+        request.signing = signing.publicKey();
+        request.machine = "machine";
+        NoRegister nobody;
+        return enrolment.redeem(fleet::signEnrolment(request, bus, signing), directory(), nobody,
+                                today());
+    }
+    void start() {
+        service = std::make_unique<CentreService>(fleet::ServiceOptions{directory().path()});
+        running = std::async(std::launch::async, [this] { return service->run(); });
+        ASSERT_TRUE(eventually([this] { return service->centre().isWorking(); }));
+    }
+    CentreProgram::End stop() {
+        service->end();
+        return running.get();
+    }
+    std::optional<fleet::HostRecord> recordOf(const std::string& host) const {
+        return service->centre()
+            .ask([host](fleet::CentreParts& parts) { return parts.store.host(host); })
+            .get();
+    }
+
+    const std::unique_ptr<RunningFleet> fleet_ = RunningFleet::start();
+    const KeyPair bus = KeyPair::make(KeyKind::User);
+    const KeyPair signing = KeyPair::make(KeyKind::User);
+    std::unique_ptr<CentreService> service;
+    std::future<CentreProgram::End> running;
+};
+
+TEST_F(RunningCentre, KnowsTheHostsThatJoinedBeforeItsStart) {
+    join("web-1");
+    start();
+    ASSERT_TRUE(eventually([this] { return recordOf(bus.publicKey()).has_value(); }));
+    const fleet::HostRecord record = *recordOf(bus.publicKey());
+    EXPECT_EQ(record.name, "web-1");
+    EXPECT_EQ(record.signing, signing.publicKey());
+    EXPECT_EQ(record.machine, "machine");
+    EXPECT_EQ(stop(), CentreProgram::End::Asked);
+}
+
+TEST_F(RunningCentre, HasTheBusCutOffAHostThatIsRevokedWhileItRuns) {
+    const fleet::EnrolmentAnswer answer = join("web-1");
+    start();
+    std::atomic<bool> isCut{false};
+    fleet::ConnectionEvents events;
+    events.closed = [&isCut](const std::string&) { isCut = true; };
+    const auto host = fleet_->connect(bus, answer.userToken, events);
+    ASSERT_TRUE(host.connection) << host.text;
+    fleet::TrustDatabase trust(directory().trustDatabase());
+    fleet::RevokedKeys(trust.connection()).revokeHost("web-1", today());
+    EXPECT_TRUE(eventually([&isCut] { return isCut.load(); }));
+}
+
+TEST_F(RunningCentre, IsAProgramThatEndsWhenItIsTold) {
+    Program program({ZAV_BUILD_DIR "/bin/zavfleetd", "--directory", directory().path(), "serve"});
+    ASSERT_TRUE(program.awaitOutput("started", kPatience)) << program.err();
+    EXPECT_TRUE(eventually(
+        [&program] { return program.err().find("the centre works") != std::string::npos; }));
+    program.signal(SIGTERM);
+    const ProgramResult result = program.wait();
+    EXPECT_EQ(result.status, 0) << result.err;
+    EXPECT_EQ(result.err.find("error"), std::string::npos) << result.err;
+}
+
+}  // namespace
