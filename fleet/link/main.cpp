@@ -11,7 +11,6 @@
 
 #include "fleet/files/files.h"
 #include "fleet/link/program/link_program.h"
-#include "fleet/link/program/machine.h"
 #include "fleet/log/log.h"
 
 namespace fleet {
@@ -66,14 +65,13 @@ int run(const std::string& file) {
     const sigset_t signals = blockSignals();
     const LinkConfiguration configuration =
         parseLinkConfiguration(readFile(file, Secrecy::Public), file);
-    const std::string host = LinkFile(configuration.state).bus().publicKey();
-    LinkProgram program(configuration, machineIdentity(host));
+    LinkProgram program(configuration);
     std::thread waiter([&program, &signals] {
         int signal = 0;
         ::sigwait(&signals, &signal);
         program.end();
     });
-    std::printf("ready: %s\n", host.c_str());
+    std::printf("ready: %s\n", program.host().c_str());
     std::fflush(stdout);
     LinkProgram::End end = LinkProgram::End::Asked;
     try {

@@ -14,6 +14,9 @@ namespace {
 
 constexpr std::size_t kMostOrders = 20'000;
 constexpr std::size_t kMostKeys = 10'000;
+/// Of what stands for something: sessions, machines, journals.
+constexpr std::size_t kLongestName = 128;
+constexpr std::size_t kLongestReason = 4096;
 
 json readSigned(std::string_view bytes, Purpose purpose, const std::string& host,
                 std::string_view key) {
@@ -22,6 +25,21 @@ json readSigned(std::string_view bytes, Purpose purpose, const std::string& host
     json document = readDocument(parts->text);
     if (textIn(document, "host") != host) throw MessageError("it is about another host");
     return document;
+}
+
+std::string shortTextIn(const json& document, const char* member, std::size_t longest) {
+    std::string text = textIn(document, member);
+    if (text.size() > longest) throw MessageError('"' + std::string(member) + "\" is too long");
+    return text;
+}
+
+/// They become parts of requests to the host, so nothing but identifiers is let through.
+std::vector<std::string> ordersIn(const json& document, const char* member) {
+    std::vector<std::string> orders = textsIn(document, member, kMostOrders);
+    for (const std::string& order : orders) {
+        if (!isOrderId(order)) throw MessageError("an order's identifier is none");
+    }
+    return orders;
 }
 
 std::string orderIn(const json& document) {
@@ -66,14 +84,14 @@ std::string signHello(const std::string& host, const Hello& hello, const KeyPair
 Hello readHello(std::string_view bytes, const std::string& host, std::string_view key) {
     const json document = readSigned(bytes, Purpose::Greeting, host, key);
     Hello hello;
-    hello.session = textIn(document, "session");
-    hello.nonce = textIn(document, "nonce");
-    hello.machine = textIn(document, "machine");
+    hello.session = shortTextIn(document, "session", kLongestName);
+    hello.nonce = shortTextIn(document, "nonce", kLongestName);
+    hello.machine = shortTextIn(document, "machine", kLongestName);
     hello.time = momentIn(document, "time");
     hello.taken = numberIn(document, "taken");
-    hello.journal = textIn(document, "journal");
-    hello.journalNow = textIn(document, "journal_now");
-    hello.blocked = textIn(document, "blocked");
+    hello.journal = shortTextIn(document, "journal", kLongestName);
+    hello.journalNow = shortTextIn(document, "journal_now", kLongestName);
+    hello.blocked = shortTextIn(document, "blocked", kLongestReason);
     hello.have = heldIn(document);
     return hello;
 }
@@ -99,7 +117,7 @@ Reply readReply(std::string_view bytes, const std::string& host, std::string_vie
     reply.time = momentIn(document, "time");
     reply.over = numberIn(document, "over");
     reply.last = numberIn(document, "last");
-    reply.open = textsIn(document, "open", kMostOrders);
+    reply.open = ordersIn(document, "open");
     reply.forget = flagIn(document, "forget");
     reply.list = flagIn(document, "list");
     reply.stop = textIn(document, "stop");

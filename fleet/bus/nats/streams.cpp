@@ -1,6 +1,7 @@
 #include "fleet/bus/nats/streams.h"
 
 #include <nlohmann/json.hpp>
+#include <set>
 #include <utility>
 
 #include "fleet/bus/nats/api.h"
@@ -109,6 +110,7 @@ EnsureResult ensureStream(Connection& connection, const StreamSettings& settings
 SubjectsResult subjectsOf(Connection& connection, const std::string& stream,
                           const std::string& filter, Connection::Milliseconds deadline) {
     SubjectsResult result;
+    std::set<std::string> seen;  // a server that repeats a page is not asked without end
     for (;;) {
         const Json request = {{"subjects_filter", filter}, {"offset", result.subjects.size()}};
         const ApiAnswer answer =
@@ -117,12 +119,12 @@ SubjectsResult subjectsOf(Connection& connection, const std::string& stream,
         if (!answer.status.done()) return result;
         const Json info = Json::parse(answer.json);
         const Json subjects = info.value(Json::json_pointer("/state/subjects"), Json::object());
-        for (const auto& subject : subjects.items())
-            result.subjects.push_back(subject.key());
-        // Some go while they are listed; the next listing shows what came instead.
-        if (subjects.empty() || result.subjects.size() >= info.value("total", std::size_t{0})) {
-            return result;
+        const std::size_t before = result.subjects.size();
+        for (const auto& subject : subjects.items()) {
+            if (seen.insert(subject.key()).second) result.subjects.push_back(subject.key());
         }
+        // Some go while they are listed; the next listing shows what came instead.
+        if (result.subjects.size() == before) return result;
     }
 }
 

@@ -10,7 +10,10 @@ using std::chrono::seconds;
 
 /// Between two hellos, however urgent.
 constexpr Moment kHelloPause = seconds(2);
+constexpr Moment kScanPause = seconds(1);
 constexpr Moment kFirstPatience = seconds(2);
+/// Of why an order waits, in a hello: it may be in others' words.
+constexpr std::size_t kLongestReason = 1024;
 constexpr Moment kMostPatience = seconds(30);
 
 Moment longer(Moment patience) {
@@ -57,7 +60,14 @@ void Link::disconnected() {
 
 Actions Link::seen(Number number, Moment now) {
     see(now);
-    if (number <= kHighestNumber) ahead_.expect(number);
+    if (number <= kept_.taken) return {};
+    // Anybody may have said that number; only a scan shows what there is. One a second is enough.
+    if (kept_.latest >= lastSeen_ + kScanPause) {
+        lastSeen_ = kept_.latest;
+        ahead_.scanAgain();
+    } else {
+        nextScan_ = std::min(nextScan_, lastSeen_ + kScanPause);
+    }
     return goOn();
 }
 
@@ -153,11 +163,18 @@ bool Link::adopt(const Reply& reply, Actions& out) {
 
 Actions Link::hostIs(const std::string& journal, std::set<std::string> unfinished, Moment now) {
     see(now);
+    Actions out;
+    if (journal == journalNow_) {
+        // What has begun or ended while the list was made, nobody knows.
+        unfinished.insert(unfinished_.begin(), unfinished_.end());
+        for (const std::string& order : unfinished)
+            out.push_back(LookUp{order});
+    }
     journalNow_ = journal;
     unfinished_ = std::move(unfinished);
     isListedMeanwhile_ = true;
     if (journal != kept_.journal) soonHello();
-    return goOn();
+    return andOn(std::move(out));
 }
 
 Actions Link::hostIsAway(Moment now) {
@@ -210,6 +227,8 @@ Actions Link::andOn(Actions out) {
     if (!isConnected_) return out;
     if (kept_.latest >= nextHello_) sayHello(out);
     handOverNext(out);
+    // Before the centre has replied nobody knows whose cancels count no longer.
+    if (!isGreeted_) return out;
     if (const std::optional<Number> number = ahead_.next()) out.push_back(ReadOrder{*number});
     return out;
 }
@@ -219,10 +238,11 @@ void Link::sayHello(Actions& out) {
     hello.session = settings_.session;
     hello.nonce = settings_.nonce();
     hello.machine = settings_.machine;
+    hello.time = kept_.latest;
     hello.taken = kept_.taken;
     hello.journal = kept_.journal;
     hello.journalNow = journalNow_;
-    hello.blocked = blocked_;
+    hello.blocked = blocked_.substr(0, kLongestReason);
     lastHello_ = kept_.latest;
     nextHello_ = kept_.latest + settings_.pause();
     asked_ = hello;
@@ -279,6 +299,7 @@ void Link::handOverNext(Actions& out) {
 
 void Link::enter(const Directive& directive, const End& end, Actions& out) {
     busy_ = directive;
+    isEntering_ = true;
     out.push_back(EnterEnd{directive, end.state, end.reason, kept_.journal});
 }
 
@@ -298,6 +319,7 @@ void Link::handOver(const Directive& directive, Actions& out) {
         return;
     }
     busy_ = directive;
+    isEntering_ = false;
     endedMeanwhile_.clear();
     isListedMeanwhile_ = false;
     out.push_back(HandOver{directive, kept_.journal});
@@ -358,7 +380,9 @@ Actions Link::recorded(Number number, const HandOverAnswer& answer, Moment now) 
         blocked_.clear();
         patience_ = {};
     } else if (const auto* words = std::get_if<Unacceptable>(&answer)) {
-        if (number == kept_.taken + 1) {
+        if (isEntering_) {
+            postpone("the host does not record how orders end: " + words->words);
+        } else if (number == kept_.taken + 1) {
             enter(directive, {"refused", words->words}, out);
             return out;
         }

@@ -44,7 +44,7 @@ public:
     // What happens on the bus.
     Actions connected(Moment now);
     void disconnected();
-    /// An order with this number was republished.
+    /// Somebody says that an order with this number was published.
     Actions seen(Number number, Moment now);
     /// What ReadOrder came to: an order of this host whose number the centre has signed.
     Actions read(Number number, Directive directive, Moment now);
@@ -111,6 +111,7 @@ private:
     Moment lastHello_{};
     Moment helloPatience_{};  ///< how long after an unheard hello the next one comes
     Moment nextScan_{};
+    Moment lastSeen_{};  ///< when the latest scan was begun because of a number that was seen
     bool listWanted_ = false;
     std::set<std::string> revoked_;
 
@@ -120,6 +121,7 @@ private:
 
     // The order whose turn it is.
     std::optional<Directive> busy_;         ///< an answer about it is awaited
+    bool isEntering_ = false;               ///< it is about the record of an end
     std::set<std::string> endedMeanwhile_;  ///< tasks that were over before their record was known
     bool isListedMeanwhile_ = false;        ///< the host has told anew what is unfinished
     Number placed_ = 0;                     ///< the order whose files lie where they belong

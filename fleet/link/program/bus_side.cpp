@@ -23,6 +23,8 @@ using std::chrono::seconds;
 /// second or two.
 constexpr seconds kAnswerTime{5};
 constexpr seconds kConnectPause{2};
+/// After the bus has refused this host.
+constexpr seconds kRefusedPause{30};
 /// The bus takes 256 KiB a message, its headers included.
 constexpr std::size_t kMostOutcome = 255 * 1024;
 
@@ -68,9 +70,6 @@ BusSide::BusSide(ConnectionOptions options, Trust trust, const KeyPair& bus, con
       events_(std::move(events)) {
     options_.events.disconnected = events_.disconnected;
     options_.events.reconnected = events_.connected;
-    options_.events.closed = [this](const std::string& why) {
-        if (!isEnding_) events_.refused(why);
-    };
     options_.events.error = [](const std::string& what) {
         say(Priority::Warning, "the bus: " + what);
     };
@@ -84,15 +83,37 @@ BusSide::~BusSide() {
     if (connection_) connection_->close(kAnswerTime);
 }
 
+/// A server that refuses the credentials ends the connection for good. That may be a revocation, or
+/// a server that has lost its accounts for a while: only the centre's word ends a link.
+ConnectionOptions BusSide::optionsOfThis() {
+    ConnectionOptions options = options_;
+    options.events.closed = [this, attempt = ++attempt_](const std::string& why) {
+        if (isEnding_ || attempt != attempt_) return;
+        say(Priority::Warning, "the bus refuses this host: " + why);
+        events_.disconnected();
+        worker_.add([this] {
+            disconnect();
+            if (worker_.pause(kRefusedPause)) connect();
+        });
+    };
+    return options;
+}
+
+void BusSide::disconnect() {
+    ++attempt_;
+    published_.reset();
+    connection_.reset();
+}
+
 /// On the worker, where everything else waits for it.
 void BusSide::connect() {
     std::string last;
     while (!isEnding_) {
-        Connection::Result result = Connection::connect(options_);
+        Connection::Result result = Connection::connect(optionsOfThis());
         if (result.connection) {
             connection_ = std::move(result.connection);
             if (subscribe()) return events_.connected();
-            connection_.reset();
+            disconnect();
             result.text = "the bus does not let this host hear of its orders";
         }
         if (std::exchange(last, result.text) != result.text) {
@@ -120,6 +141,7 @@ void BusSide::read(Number number) {
 }
 
 void BusSide::readNow(Number number) {
+    if (!connection_) return events_.unanswered(number);
     const std::string subject = "task." + trust_.host + '.' + std::to_string(number);
     const LastResult found = lastOn(*connection_, kTasksStream, subject, kAnswerTime);
     if (found.kind == LastResult::Kind::Missing) return events_.missing(number);
@@ -137,6 +159,7 @@ void BusSide::sayHello(Hello hello) {
 }
 
 void BusSide::sayHelloNow(const Hello& hello) {
+    if (!connection_) return events_.unheard(hello.nonce);
     const Connection::Reply answer = connection_->request(
         "hello." + trust_.host, signHello(trust_.host, hello, signing_), kAnswerTime);
     if (!answer.status.done()) return events_.unheard(hello.nonce);
@@ -153,12 +176,11 @@ void BusSide::report(const Outcome& outcome) {
 }
 
 void BusSide::reportNow(const Outcome& outcome) {
-    // What is lost is asked for by the next reply.
-    const StoreResult result =
-        store(*connection_, "out." + trust_.host, publishedOutcome(outcome, signing_), kAnswerTime);
-    if (result.kind == StoreResult::Kind::Refused || result.kind == StoreResult::Kind::Forbidden) {
-        say(Priority::Warning, "the bus does not take an outcome: " + result.text);
-    }
+    if (!connection_) return;
+    // Nobody waits for the bus's acknowledgement, which confirms nothing: what is lost is asked for
+    // by the next reply.
+    static_cast<void>(
+        connection_->publish("out." + trust_.host, publishedOutcome(outcome, signing_)));
 }
 
 }  // namespace fleet

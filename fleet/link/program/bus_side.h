@@ -28,8 +28,6 @@ public:
         std::function<void(Number)> unanswered;
         std::function<void(Reply)> replied;
         std::function<void(const std::string& nonce)> unheard;
-        /// The bus wants this host no more: its key is revoked, or its token has ended.
-        std::function<void(const std::string& why)> refused;
     };
 
     /// `signing` and the bus's key in `options` are this host's.
@@ -49,6 +47,8 @@ public:
 
 private:
     void connect();
+    void disconnect();
+    ConnectionOptions optionsOfThis();
     bool subscribe();
     void readNow(Number number);
     void sayHelloNow(const Hello& hello);
@@ -63,7 +63,8 @@ private:
     std::unique_ptr<Connection> connection_;  ///< the worker's
     std::unique_ptr<Subscription> published_;
     std::atomic<bool> isEnding_{false};
-    Worker worker_;  ///< last: it uses everything above
+    std::atomic<int> attempt_{0};  ///< tells events of this connection from those of earlier ones
+    Worker worker_;                ///< last: it uses everything above
 };
 
 /// The outcome as it is published: without the outputs of its commands, and in the end without the

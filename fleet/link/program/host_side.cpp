@@ -32,7 +32,8 @@ struct Ending {};
 
 std::string taskTarget(const std::string& order, const std::string& more,
                        const std::string& journal) {
-    return "/v1/tasks/" + order + more + "?journal=" + ctl::percentEncoded(journal);
+    return "/v1/tasks/" + ctl::percentEncoded(order) + more +
+           "?journal=" + ctl::percentEncoded(journal);
 }
 
 json answered(const HostAnswer& answer) {

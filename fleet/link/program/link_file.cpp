@@ -1,7 +1,12 @@
 #include "fleet/link/program/link_file.h"
 
+#include <fcntl.h>
+#include <sys/file.h>
+
+#include <cerrno>
 #include <nlohmann/json.hpp>
 #include <optional>
+#include <system_error>
 #include <utility>
 
 #include "fleet/bus/messages/document.h"
@@ -34,6 +39,17 @@ Kept keptIn(const json& document) {
     return kept;
 }
 
+/// Two links with one file would each undo what the other has kept.
+Descriptor lockOf(const std::string& directory) {
+    const std::string path = directory + "/lock";
+    Descriptor lock(::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (!lock) throw FileError(path + ": " + std::generic_category().message(errno));
+    if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
+        throw FileError(directory + " is in use by another zavlink");
+    }
+    return lock;
+}
+
 std::string contentOf(const KeyPair& bus, const KeyPair& signing, const std::string& token,
                       const Kept& kept) {
     return textOf({{"bus", bus.seed()},
@@ -56,10 +72,11 @@ struct LinkFile::Content {
 };
 
 LinkFile::LinkFile(const std::string& directory)
-    : LinkFile(fileIn(directory), read(fileIn(directory))) {}
+    : LinkFile(fileIn(directory), lockOf(directory), read(fileIn(directory))) {}
 
-LinkFile::LinkFile(std::string path, Content content)
+LinkFile::LinkFile(std::string path, Descriptor lock, Content content)
     : path_(std::move(path)),
+      lock_(std::move(lock)),
       bus_(content.bus),
       signing_(content.signing),
       token_(std::move(content.token)),

@@ -4,6 +4,7 @@
 #include <string>
 
 #include "fleet/bus/accounts/nkey.h"
+#include "fleet/files/descriptor.h"
 #include "fleet/link/core/kept.h"
 
 namespace fleet {
@@ -15,7 +16,8 @@ namespace fleet {
 /// anything.
 class LinkFile {
 public:
-    /// Reads it. Throws FileError.
+    /// Reads it, and holds the directory's lock as long as it lives. Throws FileError, also when
+    /// another process has that.
     explicit LinkFile(const std::string& directory);
 
     /// Makes the file of a host that has just been enrolled: its keys and its token of the bus.
@@ -33,10 +35,11 @@ public:
 
 private:
     struct Content;
-    LinkFile(std::string path, Content content);
+    LinkFile(std::string path, Descriptor lock, Content content);
     static Content read(const std::string& path);
 
     const std::string path_;
+    const Descriptor lock_;
     const KeyPair bus_;
     const KeyPair signing_;
     const std::string token_;

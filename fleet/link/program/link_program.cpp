@@ -1,5 +1,6 @@
 #include "fleet/link/program/link_program.h"
 
+#include <algorithm>
 #include <chrono>
 #include <random>
 #include <utility>
@@ -7,16 +8,13 @@
 
 #include "fleet/bus/accounts/fleet_accounts.h"
 #include "fleet/bus/messages/order.h"
+#include "fleet/link/program/machine.h"
 #include "fleet/log/log.h"
 
 namespace fleet {
 namespace {
 
 using std::chrono::seconds;
-
-Moment now() {
-    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
-}
 
 /// 20 to 40 seconds.
 Moment drawnPause() {
@@ -26,8 +24,8 @@ Moment drawnPause() {
 
 }  // namespace
 
-LinkProgram::LinkProgram(const LinkConfiguration& configuration, const std::string& machine)
-    : file_(configuration.state), link_(settings(machine), file_.kept()) {
+LinkProgram::LinkProgram(const LinkConfiguration& configuration)
+    : file_(configuration.state), latest_(file_.kept().latest), link_(settings(), file_.kept()) {
     bus_ = std::make_unique<BusSide>(busOptions(configuration), trust(configuration), file_.bus(),
                                      file_.signing(), busEvents());
     host_ = std::make_unique<HostSide>(configuration.hostSocket, hostEvents());
@@ -64,11 +62,21 @@ Trust LinkProgram::trust(const LinkConfiguration& configuration) const {
     return trusted;
 }
 
-LinkSettings LinkProgram::settings(const std::string& machine) const {
+Moment LinkProgram::now() {
+    const auto steady = std::chrono::steady_clock::now();
+    const auto wall =
+        std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+    const auto passed = std::chrono::duration_cast<Moment>(steady - latestAt_);
+    latest_ = std::max(wall, latest_ + passed);
+    latestAt_ = steady;
+    return latest_;
+}
+
+LinkSettings LinkProgram::settings() const {
     LinkSettings made;
     made.host = file_.bus().publicKey();
     made.session = makeOrderId();
-    made.machine = machine;
+    made.machine = machineIdentity(made.host);
     made.nonce = makeOrderId;
     made.pause = drawnPause;
     return made;
@@ -118,7 +126,12 @@ BusSide::Events LinkProgram::busEvents() {
         });
     };
     events.seen = [this](Number number) {
-        tell([number](Link& link, Moment at) { return link.seen(number, at); });
+        // Others may say so without end; one letter at a time is enough.
+        if (isSeenWaiting_.exchange(true)) return;
+        tell([this, number](Link& link, Moment at) {
+            isSeenWaiting_ = false;
+            return link.seen(number, at);
+        });
     };
     events.read = [this](Number number, Directive directive) {
         tell([number, directive = std::move(directive)](Link& link, Moment at) {
@@ -136,9 +149,6 @@ BusSide::Events LinkProgram::busEvents() {
     };
     events.unheard = [this](const std::string& nonce) {
         tell([nonce](Link& link, Moment at) { return link.unheard(nonce, at); });
-    };
-    events.refused = [this](const std::string& why) {
-        mailbox_.put([this, why] { apply(StopLink{"the bus refuses this host: " + why}); });
     };
     return events;
 }

@@ -1,6 +1,8 @@
 /// zavlink: carries out what a link decides.
 #pragma once
 
+#include <atomic>
+#include <chrono>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -25,8 +27,8 @@ public:
         Stopped,  ///< this link must not run: starting it again would not help
     };
 
-    /// Throws FileError when the link's file cannot be used. `machine` is the machine's identity.
-    LinkProgram(const LinkConfiguration& configuration, const std::string& machine);
+    /// Throws FileError when the link's file cannot be used, or another process uses it.
+    explicit LinkProgram(const LinkConfiguration& configuration);
     ~LinkProgram();
     LinkProgram(const LinkProgram&) = delete;
     LinkProgram& operator=(const LinkProgram&) = delete;
@@ -36,11 +38,15 @@ public:
     End run();
     /// Any thread, at any time.
     void end();
+    /// The host's bus key.
+    const std::string& host() const { return file_.bus().publicKey(); }
 
 private:
+    /// The time, which goes on as it should when somebody puts the clock back.
+    Moment now();
     ConnectionOptions busOptions(const LinkConfiguration& configuration) const;
     Trust trust(const LinkConfiguration& configuration) const;
-    LinkSettings settings(const std::string& machine) const;
+    LinkSettings settings() const;
     HostSide::Events hostEvents();
     BusSide::Events busEvents();
 
@@ -63,6 +69,9 @@ private:
 
     Mailbox mailbox_;
     LinkFile file_;
+    Moment latest_{};
+    std::chrono::steady_clock::time_point latestAt_ = std::chrono::steady_clock::now();
+    std::atomic<bool> isSeenWaiting_{false};
     Link link_;
     std::string journal_;  ///< the host's, as it was last told; "" while no host answers
     std::string blocked_;  ///< what was last said of it

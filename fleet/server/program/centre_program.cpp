@@ -8,6 +8,7 @@
 #include "fleet/bus/messages/hello_bytes.h"
 #include "fleet/bus/messages/numbered_order.h"
 #include "fleet/bus/messages/order.h"
+#include "fleet/bus/trust/signed.h"
 #include "fleet/log/log.h"
 #include "sqlite/transaction.h"
 
@@ -24,6 +25,8 @@ constexpr seconds kPause{1};
 constexpr std::size_t kMostAtOnce = 256;
 /// Hellos that wait; those beyond are said again.
 constexpr int kMostHellos = 20'000;
+/// What a number adds to an order, at most.
+constexpr std::size_t kNumberBytes = 4096;
 constexpr char kHelloSubject[] = "hello.";
 constexpr char kTaskSubjects[] = "task.>";
 constexpr char kLeaseSubject[] = "$KV.CENTRE.lease";
@@ -72,10 +75,11 @@ CentreProgram::End CentreProgram::run() {
         throw;
     }
     finish();
-    return end_.value_or(End::Asked);
+    return end_.value_or(isBusLost_ ? End::LeaseLost : End::Asked);
 }
 
 void CentreProgram::finish() {
+    isEnding_ = true;
     isWorking_ = false;
     // Who waits for an answer to a letter is told that none comes.
     mailbox_.close();
@@ -96,8 +100,11 @@ void CentreProgram::connect() {
         say(Priority::Warning, "the bus: " + what);
     };
     options.events.closed = [this](const std::string& why) {
-        if (!isEnding_) say(Priority::Error, "the bus refuses this centre: " + why);
-        end();
+        if (isEnding_ || isBusLost_.exchange(true)) return;
+        say(Priority::Error, "the bus refuses this centre: " + why);
+        mailbox_.put([this] {
+            if (!end_) end_ = End::LeaseLost;
+        });
     };
     while (!isEnding_) {
         Connection::Result result = Connection::connect(options);
@@ -134,7 +141,7 @@ bool CentreProgram::claim() {
     lease_ = std::make_unique<Lease>(*connection_,
                                      Lease::Settings{kCentreStream, kLeaseSubject, settings_.holder,
                                                      settings_.leaseTerm, kAnswerTime});
-    while (!isEnding_) {
+    while (!isEnding_ && !isBusLost_) {
         const auto asked = Steady::now();
         if (ensureStreams()) {
             const Lease::State state = lease_->claim();
@@ -166,9 +173,12 @@ void CentreProgram::renewLease() {
     }
 }
 
+bool CentreProgram::hasLease() const {
+    return Steady::now().time_since_epoch().count() < leaseUntil_;
+}
+
 bool CentreProgram::beginWork() {
-    bus_ = std::make_unique<NatsCentreBus>(
-        *connection_, [this] { return Steady::now().time_since_epoch().count() < leaseUntil_; });
+    bus_ = std::make_unique<NatsCentreBus>(*connection_, [this] { return hasLease(); });
     centre_ = std::make_unique<Centre>(store_, *bus_, settings_.alarm);
     Connection::Subscribed made = connection_->subscribe(
         std::string(kHelloSubject) + '*', [this](const BusMessage& message) { takeHello(message); },
@@ -263,7 +273,7 @@ void CentreProgram::answerHello(const std::string& host, const std::string& repl
         if (settings_.revoked) answer->revoked = settings_.revoked();
         noteNews(host, hello, now());
         afterCommit_.push_back([this, reply, text = signReply(host, *answer, settings_.key)] {
-            static_cast<void>(connection_->publish(reply, text));
+            if (hasLease()) static_cast<void>(connection_->publish(reply, text));
         });
     } catch (const MessageError& error) {
         say(Priority::Warning, "a hello in the name of " + record->name + ": " + error.what());
@@ -306,6 +316,10 @@ bool CentreProgram::takeOutcomes(const std::vector<OutcomeFeed::Told>& told) {
 
 std::future<std::optional<Number>> CentreProgram::submit(std::string orderBytes) {
     return ask([this, bytes = std::move(orderBytes)](Parts& parts) {
+        // One that the bus does not take would stand in the way of all others for ever.
+        if (bytes.size() > kMostSignedBytes - kNumberBytes) {
+            throw MessageError("the order is too long");
+        }
         const SignedOrder read = readOrder(bytes);
         const std::string host = read.order.host;
         const std::string order = read.order.id;
@@ -323,26 +337,29 @@ std::future<std::map<std::string, HostNews>> CentreProgram::news() {
 /// over, and for such as the database does not know.
 void CentreProgram::sweep() {
     do {
-        ensureStreams();
-        const SubjectsResult found =
-            subjectsOf(*connection_, kTasksStream, kTaskSubjects, kAnswerTime);
-        if (!found.status.done()) {
-            say(Priority::Warning, "the orders on the bus cannot be listed: " + found.status.text);
-        }
-        for (const std::string& subject : found.subjects) {
-            // Each waits for its turn, so that nobody waits for all of them.
-            try {
-                ask([this, subject](Parts&) {
-                    checkOnBus(subject);
-                    return true;
-                }).get();
-            } catch (const std::future_error&) {
-                return;
-            } catch (const std::exception& error) {
-                say(Priority::Warning, "order at " + subject + ": " + error.what());
-            }
+        try {
+            sweepOnce();
+        } catch (const std::future_error&) {
+            return;  // it ends
+        } catch (const std::exception& error) {
+            say(Priority::Warning, std::string("the sweep: ") + error.what());
         }
     } while (sweeper_->pause(settings_.sweepTime));
+}
+
+void CentreProgram::sweepOnce() {
+    ensureStreams();
+    const SubjectsResult found = subjectsOf(*connection_, kTasksStream, kTaskSubjects, kAnswerTime);
+    if (!found.status.done()) {
+        say(Priority::Warning, "the orders on the bus cannot be listed: " + found.status.text);
+    }
+    for (const std::string& subject : found.subjects) {
+        // Each waits for its turn, so that nobody waits for all of them.
+        ask([this, subject](Parts&) {
+            checkOnBus(subject);
+            return true;
+        }).get();
+    }
 }
 
 void CentreProgram::checkOnBus(const std::string& subject) {

@@ -68,7 +68,7 @@ class CentreProgram {
 public:
     enum class End {
         Asked,     ///< end() was called
-        LeaseLost  ///< another centre may work now; starting anew waits for it
+        LeaseLost  ///< lease or bus: another centre may work now; starting anew waits for both
     };
 
     /// Opens the database. Throws StoreError.
@@ -115,6 +115,8 @@ private:
     bool takeOutcomes(const std::vector<OutcomeFeed::Told>& told);
     void noteNews(const std::string& host, const Hello& hello, Moment now);
     void sweep();
+    void sweepOnce();
+    bool hasLease() const;
     void checkOnBus(const std::string& subject);
     void renewLease();
 
@@ -127,6 +129,7 @@ private:
     std::optional<End> end_;
     std::atomic<bool> isEnding_{false};
     std::atomic<bool> isWorking_{false};  // and the loop reads letters
+    std::atomic<bool> isBusLost_{false};  // the bus wants this centre no more
     /// Until when the lease is surely ours, in ticks of the steady clock.
     std::atomic<std::chrono::steady_clock::rep> leaseUntil_{0};
     std::map<std::string, HostNews> news_;

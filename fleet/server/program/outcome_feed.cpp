@@ -63,6 +63,8 @@ void OutcomeFeed::handOn(Pull& pull, const std::vector<Pull::Taken>& messages) {
         told.push_back({message.subject.substr(sizeof kSubject - 1), message.bytes});
     }
     const bool isTaken = take_(std::move(told));
+    // What cannot be kept now is not asked for again at once.
+    if (!isTaken && !isEnding_) std::this_thread::sleep_for(kPatience);
     for (const Pull::Taken& message : messages) {
         static_cast<void>(isTaken ? pull.acknowledge(message) : pull.refuse(message));
     }

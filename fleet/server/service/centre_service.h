@@ -15,9 +15,9 @@ namespace fleet {
 
 /// What an administrator chooses for a run of the centre.
 struct ServiceOptions {
-    std::string directory;                            ///< see FleetDirectory
-    std::int64_t tasksBytes = std::int64_t{1} << 30;  ///< all orders on the bus together
-    int replicas = 1;                                 ///< servers of the bus that have each message
+    std::string directory;                              ///< see FleetDirectory
+    std::int64_t tasksBytes = std::int64_t{512} << 20;  ///< all orders on the bus together
+    int replicas = 1;  ///< servers of the bus that have each message
 };
 
 /// The centre with its roll-outs, its list of revoked keys and the bus's accounts. The orders'

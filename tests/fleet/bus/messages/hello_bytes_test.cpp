@@ -54,13 +54,30 @@ TEST(HelloBytes, KeepAllOfAHello) {
         fleet::readHello(signHello("H", hello, kKey), "H", kKey.publicKey()).have.has_value());
 }
 
+TEST(HelloBytes, OpenOrdersAreIdentifiersAndNothingElse) {
+    Reply reply;
+    reply.open = {"0 HTTP/1.1\r\nHost: localhost\r\n\r\nPOST /v1/tasks HTTP/1.1\r\n\r\n"};
+    EXPECT_THROW(fleet::readReply(signReply("H", reply, kKey), "H", kKey.publicKey()),
+                 fleet::MessageError);
+}
+
+TEST(HelloBytes, AHelloIsNoLongerThanItMustBe) {
+    for (std::string Hello::*const member :
+         {&Hello::session, &Hello::machine, &Hello::journal, &Hello::journalNow, &Hello::blocked}) {
+        Hello hello;
+        hello.*member = std::string(5'000, 'x');
+        EXPECT_THROW(fleet::readHello(signHello("H", hello, kKey), "H", kKey.publicKey()),
+                     fleet::MessageError);
+    }
+}
+
 TEST(HelloBytes, KeepAllOfAReply) {
     Reply reply;
     reply.nonce = "n";
     reply.time = Moment(5);
     reply.over = 3;
     reply.last = 9;
-    reply.open = {"a", "b"};
+    reply.open = {std::string(32, 'a'), std::string(32, 'b')};
     reply.forget = true;
     reply.list = true;
     reply.stop = "why";

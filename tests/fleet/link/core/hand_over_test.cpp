@@ -57,12 +57,12 @@ TEST(HandingOver, WaitsForTheFirstReplyOnEachConnection) {
     LinkDriver driver(kept(0));
     driver.note(driver.link().hostIs("journal", {}, kNow));
     driver.note(driver.link().connected(kNow));
-    driver.bring({directive(1)});
-    EXPECT_EQ(driver.count<HandOver>(), 0U);
+    EXPECT_EQ(driver.count<fleet::ReadOrder>(), 0U) << "a cancel might be a revoked operator's";
     fleet::Reply reply;
     reply.nonce = driver.nonce();
     reply.last = 1;
     driver.note(driver.link().replied(reply, kNow));
+    driver.bring({directive(1)});
     EXPECT_EQ(driver.count<HandOver>(), 1U);
 }
 
@@ -153,6 +153,27 @@ TEST(HandingOver, WhatTheHostWillNeverTakeIsRecordedAsRefusedWithItsWords) {
     EXPECT_EQ(driver.link().kept().taken, Number{0});
     driver.note(driver.link().recorded(1, fleet::Recorded{true}, kNow));
     EXPECT_EQ(driver.link().kept().taken, Number{1});
+}
+
+TEST(HandingOver, AHostThatDoesNotRecordARefusalIsAskedAgainLater) {
+    LinkDriver driver = linkWith({directive(1)});
+    driver.note(driver.link().recorded(1, fleet::Unacceptable{"no such command"}, kNow));
+    driver.forget();
+    driver.note(driver.link().recorded(1, fleet::Unacceptable{"no such member"}, kNow));
+    EXPECT_EQ(driver.count<EnterEnd>(), 0U);
+    EXPECT_NE(driver.link().blocked().find("no such member"), std::string::npos);
+    driver.wait(Moment(2'000));
+    EXPECT_EQ(driver.count<HandOver>(), 1U);
+    EXPECT_EQ(driver.link().kept().taken, Number{0});
+}
+
+TEST(HandingOver, WhatIsListedAnewIsLookedUpBecauseTheListMayBeOlder) {
+    LinkDriver driver = linkWith({directive(1)});
+    driver.note(driver.link().recorded(1, fleet::Recorded{false}, kNow));
+    driver.forget();
+    driver.note(driver.link().hostIs("journal", {"order-7"}, kNow));
+    EXPECT_EQ(driver.count<fleet::LookUp>(), 2U)
+        << "the one that is listed, and the one that is not";
 }
 
 TEST(HandingOver, AHostThatIsBusyGetsTheSameOrderLaterAndMoreSeldom) {

@@ -43,6 +43,7 @@ TEST(Hello, IsSaidAtOnceAndThenAfterThePause) {
     EXPECT_EQ(driver.hello().taken, Number{3});
     EXPECT_EQ(driver.hello().session, "session");
     EXPECT_EQ(driver.hello().machine, "machine");
+    EXPECT_EQ(driver.hello().time, kNow);
     EXPECT_EQ(driver.hello().journal, "journal");
     EXPECT_EQ(driver.hello().journalNow, "journal");
     driver.wait(Moment(29'000));
@@ -89,6 +90,20 @@ TEST(Hello, AnOlderOneThatNobodyHasHeardChangesNothing) {
     driver.note(driver.link().unheard("another nonce", driver.now));
     driver.forget();
     driver.wait(Moment(29'000));
+    EXPECT_EQ(driver.count<SayHello>(), 0U);
+}
+
+TEST(Hello, NumbersThatSomebodyMakesUpLeadToOneScanASecondAndNoHello) {
+    LinkDriver driver(kept(0));
+    driver.greet(0);
+    driver.bring({});
+    driver.forget();
+    for (int i = 0; i < 10'000; ++i) {
+        driver.now += Moment(1);
+        driver.note(driver.link().seen(Number{1} << 52U, driver.now));
+        driver.note(driver.link().missing(1, driver.now));
+    }
+    EXPECT_LE(driver.count<fleet::ReadOrder>(), 11U);
     EXPECT_EQ(driver.count<SayHello>(), 0U);
 }
 

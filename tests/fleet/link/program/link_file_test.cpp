@@ -50,6 +50,12 @@ TEST_F(LinksFile, RemembersWhatIsKept) {
     EXPECT_EQ(again.token(), "a.token");
 }
 
+TEST_F(LinksFile, BelongsToOneProcessAtATime) {
+    create();
+    const LinkFile file(scratch.path());
+    EXPECT_THROW(LinkFile{scratch.path()}, FileError);
+}
+
 TEST_F(LinksFile, IsForItsUserOnly) {
     create();
     LinkFile(scratch.path()).keep({});
