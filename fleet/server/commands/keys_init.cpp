@@ -54,7 +54,7 @@ Action declareKeysInit(CLI::App& app) {
     app.add_option("--bus-directory", plan.busDirectory, "Where the bus's server has its files")
         ->default_str("bus in the centre's directory");
     app.add_option("--store-bytes", arguments->storeBytes, "What the bus may store, in bytes")
-        ->check(CLI::Range(std::uint64_t{1} << 26, std::uint64_t{1} << 50))
+        ->check(CLI::Range(std::uint64_t{1} << 16, std::uint64_t{1} << 50))
         ->default_str("80 % of what is free");
     app.add_option("--valid", arguments->validDays, "Days until the certificates end")
         ->capture_default_str();

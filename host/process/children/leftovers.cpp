@@ -4,11 +4,13 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cstdlib>
 #include <fstream>
 #include <iterator>
 #include <map>
 #include <optional>
+#include <thread>
 
 #include "host/process/children/process_table.h"
 
@@ -17,10 +19,22 @@ namespace {
 
 constexpr const char* kVariable = "ZAVHOST_RUN";
 
+/// Not so of the kernel's own, of those that have ended, and of those of others.
+bool executesAProgram(pid_t pid) {
+    char name[1];
+    return ::readlink(("/proc/" + std::to_string(pid) + "/exe").c_str(), name, sizeof name) > 0;
+}
+
 /// The environment that a process was started with; empty when it may not be read.
 std::string environmentOf(pid_t pid) {
-    std::ifstream file("/proc/" + std::to_string(pid) + "/environ", std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), {}};
+    constexpr int kLooks = 20;
+    for (int look = 1;; ++look) {
+        std::ifstream file("/proc/" + std::to_string(pid) + "/environ", std::ios::binary);
+        std::string text{std::istreambuf_iterator<char>(file), {}};
+        if (!text.empty() || look == kLooks || !executesAProgram(pid)) return text;
+        // It looks empty while the process begins to execute its next program.
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
 }
 
 std::string markOf(const std::string& journal) {
