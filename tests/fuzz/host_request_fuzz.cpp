@@ -11,6 +11,11 @@
 #include "support/fuzz_support.h"
 
 using fuzz::require;
+using http::Answer;
+using http::EventSource;
+using http::Job;
+using http::Reply;
+using http::Request;
 using nlohmann::json;
 
 namespace {
