@@ -51,6 +51,7 @@ struct CentreSettings {
     /// Called once before anything else, and then each second as a transaction of its own; again at
     /// once while it returns true. On the thread of run(). May be empty.
     std::function<bool(CentreParts& parts, Moment now)> attend = {};
+    std::vector<std::string> earlierKeys = {};  ///< public keys that have numbered orders before
 };
 
 /// What the last hello of a host has told. Only in memory: half a minute after a start it is there
@@ -116,6 +117,7 @@ private:
     void noteNews(const std::string& host, const Hello& hello, Moment now);
     void sweep();
     void sweepOnce();
+    std::vector<std::string> ownKeys() const;
     bool hasLease() const;
     void checkOnBus(const std::string& subject);
     void renewLease();

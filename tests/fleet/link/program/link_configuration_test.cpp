@@ -59,7 +59,7 @@ TEST_F(LinksConfiguration, IsReadWhole) {
     EXPECT_EQ(read.ca, "/etc/zavlink/ca.pem");
     EXPECT_EQ(read.serverName, "bus.example");
     EXPECT_EQ(read.root, root);
-    EXPECT_EQ(read.centre, centre);
+    EXPECT_EQ(read.centres, (std::vector<std::string>{centre}));
     EXPECT_EQ(read.hostSocket, "/run/h.sock");
     EXPECT_EQ(read.state, "/var/lib/zavlink");
     EXPECT_EQ(read.labels, (fleet::Labels{{"env", "test"}}));
@@ -86,6 +86,15 @@ TEST_F(LinksConfiguration, NothingThatIsNeededMayBeMissing) {
 TEST_F(LinksConfiguration, KeysMustBeOfTheirKind) {
     expectRefusal(with("root", "root = \"" + centre + '"'), "no public key of that kind");
     expectRefusal(with("centre", "centre = \"U\""), "no public key of that kind");
+}
+
+TEST_F(LinksConfiguration, TheCentreMayHaveSeveralKeys) {
+    const std::string next = KeyPair::make(KeyKind::User).publicKey();
+    const std::string line = "centre = [\"" + centre + "\", \"" + next + "\"]";
+    EXPECT_EQ(fleet::parseLinkConfiguration(with("centre", line), "zavlink.toml").centres,
+              (std::vector<std::string>{centre, next}));
+    expectRefusal(with("centre", "centre = []"), "must be a list");
+    expectRefusal(with("centre", "centre = [\"U\"]"), "no public key of that kind");
 }
 
 TEST_F(LinksConfiguration, NothingLeavesTheMachineUnencrypted) {
