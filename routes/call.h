@@ -44,6 +44,11 @@ public:
         return match_.others;
     }
 
+    /// The field Authorization; empty if there is none.
+    const std::string& authorization() const { return request_.authorization; }
+    /// The body as it came, where the route describes none.
+    const std::string& bytes() const { return request_.body; }
+
     /// The body, an object; only where the route describes it.
     const nlohmann::json& body() const { return *body_; }
 

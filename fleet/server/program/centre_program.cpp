@@ -235,7 +235,7 @@ void CentreProgram::readLetters(Mailbox::Letter first) {
 bool CentreProgram::attend() {
     if (!settings_.attend) return false;
     sqlite::Transaction step(database_.connection());
-    CentreParts parts{*centre_, store_, database_.connection()};
+    CentreParts parts{*centre_, store_, database_.connection(), news_};
     const bool isMore = settings_.attend(parts, now());
     step.commit();
     return isMore;

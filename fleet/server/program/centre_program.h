@@ -27,12 +27,7 @@
 
 namespace fleet {
 
-/// What the functions given to a CentreProgram may use.
-struct CentreParts {
-    Centre& centre;
-    CentreStore& store;
-    sqlite::Database& database;
-};
+struct CentreParts;
 
 /// What a centre needs to work.
 struct CentreSettings {
@@ -62,6 +57,14 @@ struct HostNews {
     std::string blocked;
     std::string journalNow;
     Moment skew{};  ///< how far its clock is ahead of the centre's
+};
+
+/// What the functions given to a CentreProgram may use.
+struct CentreParts {
+    Centre& centre;
+    CentreStore& store;
+    sqlite::Database& database;
+    const std::map<std::string, HostNews>& news;  ///< by the hosts' bus keys
 };
 
 /// One centre of a fleet: as long as another one has the lease it waits.
@@ -157,7 +160,7 @@ auto CentreProgram::ask(Act act) -> std::future<decltype(act(std::declval<Parts&
     const auto promise = std::make_shared<std::promise<Result>>();
     std::future<Result> future = promise->get_future();
     mailbox_.put([this, promise, act = std::move(act)] {
-        Parts parts{*centre_, store_, database_.connection()};
+        Parts parts{*centre_, store_, database_.connection(), news_};
         try {
             sqlite::Transaction part(database_.connection());
             const auto result = std::make_shared<Result>(act(parts));

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <chrono>
 #include <utility>
 
 #include "fleet/bus/messages/certificate.h"
@@ -69,6 +70,10 @@ CentreProgram::End CentreService::run() {
     const CentreProgram::End end = centre_->run();
     accounts_.reset();
     return end;
+}
+
+Moment CentreService::currentMoment() {
+    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
 }
 
 /// Between two letters of the centre's.
