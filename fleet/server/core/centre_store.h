@@ -39,8 +39,6 @@ public:
     /// Orders without an outcome whose number is at least `from` and at most `upTo`, ascending.
     virtual std::vector<OrderRecord> open(const std::string& host, Number from, Number upTo,
                                           std::size_t most) const = 0;
-    /// The host's orders with the highest numbers, descending.
-    virtual std::vector<OrderRecord> latest(const std::string& host, std::size_t most) const = 0;
     virtual void keepOutcome(const Outcome& outcome) = 0;
 
     /// Skips `count` numbers of every host, and all below `atLeast`; publishes for all of them

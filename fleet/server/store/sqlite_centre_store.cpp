@@ -154,11 +154,6 @@ std::vector<OrderRecord> SqliteCentreStore::open(const std::string& host, Number
     return allOf(database_.ask(kOpen, host, bounded(from), bounded(upTo), bounded(most)));
 }
 
-std::vector<OrderRecord> SqliteCentreStore::latest(const std::string& host,
-                                                   std::size_t most) const {
-    return allOf(database_.ask(kLatest, host, bounded(most)));
-}
-
 void SqliteCentreStore::keepOutcome(const Outcome& outcome) {
     const int kept = database_.change(kKeepOutcome, outcome.state, bounded(outcome.number),
                                       outcome.journal, outcome.task, outcome.host, outcome.order);

@@ -26,7 +26,6 @@ public:
     void notePublished(const std::string& host, Number number) override;
     std::vector<OrderRecord> open(const std::string& host, Number from, Number upTo,
                                   std::size_t most) const override;
-    std::vector<OrderRecord> latest(const std::string& host, std::size_t most) const override;
     void keepOutcome(const Outcome& outcome) override;
     void skipNumbers(Number count, Number atLeast, Moment listUntil) override;
     Moment listUntil() const override;

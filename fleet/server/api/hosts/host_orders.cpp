@@ -7,6 +7,7 @@
 #include "fleet/bus/trust/signed.h"
 #include "fleet/server/api/documents/host_sight.h"
 #include "fleet/server/api/documents/page.h"
+#include "fleet/server/store/latest_orders.h"
 
 using nlohmann::json;
 
@@ -52,7 +53,7 @@ http::Answer getHostOrders(Visit& visit, const Call& call) {
     const std::string host = hostNamed(visit, *visit.services.members(), call.required("host"));
     const std::size_t most = pageSize(call, 20, 100);
     const auto records = visit.services.ask(
-        [host, most](CentreDesk& desk) { return desk.parts.store.latest(host, most); });
+        [host, most](CentreDesk& desk) { return latestOrders(desk.parts.database, host, most); });
     json document = {{"orders", json::array()}};
     for (const OrderRecord& record : records)
         document["orders"].push_back(orderDocument(record));
