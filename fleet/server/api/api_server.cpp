@@ -29,9 +29,9 @@ ApiServer::ApiServer(CentreService& service, const ListenPlace& place)
     : services_(service),
       api_(services_, apiRoutes()),
       server_(-1, openDoor(), api_, counts_, limits()),
-      thread_([this] { server_.run(); }),
       front_(frontSettings(service.directory(), place),
-             [this](sys::FileDescriptor connection) { server_.adopt(std::move(connection)); }) {}
+             [this](sys::FileDescriptor connection) { server_.adopt(std::move(connection)); }),
+      thread_([this] { server_.run(); }) {}
 
 ApiServer::~ApiServer() {
     server_.end(kGrace);

@@ -38,8 +38,8 @@ private:
     CentreApi api_;
     http::ServerCounts counts_;
     http::HttpServer server_;
-    std::thread thread_;
     TlsFront front_;
+    std::thread thread_;  ///< last: nothing may fail once it runs
 };
 
 }  // namespace fleet
