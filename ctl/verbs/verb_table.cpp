@@ -1,19 +1,15 @@
 #include "ctl/verbs/verb_table.h"
 
+#include "ctl/verbs/vocabulary.h"
+
 namespace ctl {
 
 const Verb* findVerb(std::string_view name) {
-    for (const Verb* const verb : kVerbs) {
-        if (name == verb->name) return verb;
-    }
-    return nullptr;
+    return hostVocabulary().findVerb(name);
 }
 
 const VerbGroup* findVerbGroup(std::string_view name) {
-    for (const VerbGroup& group : kVerbGroups) {
-        if (name == group.name) return &group;
-    }
-    return nullptr;
+    return hostVocabulary().findGroup(name);
 }
 
 }  // namespace ctl
