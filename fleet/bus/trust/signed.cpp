@@ -30,6 +30,8 @@ std::string_view nameOf(Purpose purpose) {
             return "enrol";
         case Purpose::LoggingIn:
             return "login";
+        case Purpose::OpeningSession:
+            return "session";
     }
     return "";
 }

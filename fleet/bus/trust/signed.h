@@ -24,7 +24,8 @@ enum class Purpose {
     Asking,
     Answering,
     Enrolling,
-    LoggingIn
+    LoggingIn,
+    OpeningSession
 };
 
 /// The parts of a message, somewhere in its bytes.
