@@ -7,7 +7,7 @@
 #include "ctl/show/page.h"
 #include "ctl/verbs/arguments/values.h"
 #include "ctl/verbs/verb.h"
-#include "ctl/verbs/vocabulary.h"
+#include "ctl/verbs/verb_table.h"
 
 namespace ctl {
 

@@ -1,10 +1,5 @@
 #include "ctl/verbs/vocabulary.h"
 
-#include <iterator>
-
-#include "ctl/verbs/arguments/global_arguments.h"
-#include "ctl/verbs/verb_table.h"
-
 namespace ctl {
 
 const Verb* Vocabulary::findVerb(std::string_view name) const {
@@ -19,17 +14,6 @@ const VerbGroup* Vocabulary::findGroup(std::string_view name) const {
         if (name == group->name) return group;
     }
     return nullptr;
-}
-
-const Vocabulary& hostVocabulary() {
-    static const Vocabulary vocabulary = [] {
-        Vocabulary words{"Manages the monitoring agents of one host", kGlobalArguments, {}, {}};
-        words.verbs.assign(std::begin(kVerbs), std::end(kVerbs));
-        for (const VerbGroup& group : kVerbGroups)
-            words.groups.push_back(&group);
-        return words;
-    }();
-    return vocabulary;
 }
 
 }  // namespace ctl

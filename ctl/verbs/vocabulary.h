@@ -22,7 +22,4 @@ struct Vocabulary {
     const VerbGroup* findGroup(std::string_view name) const;
 };
 
-/// That of zavctl, for one host.
-const Vocabulary& hostVocabulary();
-
 }  // namespace ctl

@@ -126,13 +126,14 @@ Entries commands(const Vocabulary& vocabulary) {
         const auto group = std::find_if(groups.begin(), groups.end(), [verb](const auto* one) {
             return isMemberOf(*verb, *one);
         });
-        if (group == groups.end()) {
+        // Where a group's name is a verb as well, its line would be taken for that of the group.
+        const bool isListed =
+            group == groups.end() || vocabulary.findVerb((*group)->name) != nullptr;
+        if (isListed) {
             entries.emplace_back(verb->name, verb->help);
         } else if (last != *group) {
             last = *group;
-            // One that can stand alone has its line already.
-            if (vocabulary.findVerb(last->name) == nullptr)
-                entries.emplace_back(last->name, last->help);
+            entries.emplace_back(last->name, last->help);
         }
     }
     return entries;

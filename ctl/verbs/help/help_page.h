@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "ctl/verbs/vocabulary.h"
+#include "ctl/verbs/verb_table.h"
 
 namespace ctl {
 
