@@ -1,6 +1,7 @@
 #include "fleet/bus/messages/session.h"
 
 #include <nlohmann/json.hpp>
+#include <optional>
 #include <stdexcept>
 
 #include "fleet/bus/messages/document.h"
@@ -16,6 +17,11 @@ constexpr std::size_t kLongestSessionRequest = 4096;
 
 }  // namespace
 
+std::string makeSessionNonce() {
+    // As many bits, written the same way.
+    return makeOrderId();
+}
+
 std::string signSessionRequest(const SessionRequest& request, const KeyPair& key) {
     if (key.publicKey() != request.key) {
         throw std::invalid_argument("an operator opens a session with their own key");
@@ -30,7 +36,9 @@ std::string signSessionRequest(const SessionRequest& request, const KeyPair& key
 
 SessionRequest readSessionRequest(std::string_view bytes) {
     const auto parts = bytes.size() > kLongestSessionRequest ? std::nullopt : partsOf(bytes);
-    if (!parts || !parts->carried.empty()) throw MessageError("this is no request for a session");
+    if (!parts || !parts->carried.empty()) {
+        throw MessageError("this is no request for a session");
+    }
     const json document = readDocument(parts->text);
     SessionRequest request;
     request.fleet = textIn(document, "fleet");
@@ -39,8 +47,7 @@ SessionRequest readSessionRequest(std::string_view bytes) {
     request.time = momentIn(document, "time");
     request.nonce = textIn(document, "nonce");
     if (!isPublicKey(request.key, KeyKind::User)) throw MessageError("\"key\" is no key");
-    // The same form: 128 bits.
-    if (!isOrderId(request.nonce)) throw MessageError("\"nonce\" has not 32 hexadecimal digits");
+    if (!isOrderId(request.nonce)) throw MessageError("\"nonce\" is none");
     if (!isSigned(*parts, Purpose::OpeningSession, request.key)) {
         throw MessageError("the request is not signed by its key");
     }
