@@ -12,12 +12,14 @@
 #include "ctl/verbs/arguments/global_arguments.h"
 #include "ctl/verbs/help/help_page.h"
 #include "ctl/verbs/help/usage_mistake.h"
-#include "ctl/verbs/verb_table.h"
 
 namespace ctl {
 namespace {
 
 using Words = std::vector<std::string>;
+
+/// Every vocabulary has this verb.
+constexpr const char* kVersionName = "version";
 
 /// "config" and "get" of "config get"; nothing and "start" of "start".
 std::pair<std::string, std::string> splitName(const std::string& name) {
@@ -95,7 +97,8 @@ private:
 /// Takes words apart, for one verb or for none.
 class Parser {
 public:
-    explicit Parser(const Verb* verb) : app_("", "zavctl"), globals_(app_, kGlobalArguments) {
+    Parser(const Verb* verb, const ArgumentList& globals)
+        : app_("", "zavctl"), globals_(app_, globals) {
         app_.fallthrough();  // global options may stand behind the verb
         app_.allow_extras();
         app_.set_version_flag("--version", "zavctl " ZAV_VERSION);
@@ -138,34 +141,38 @@ private:
     std::optional<DeclaredArguments> arguments_;
 };
 
-bool takesValue(const std::string& option) {
-    for (const Argument& argument : kGlobalArguments) {
+bool takesValue(const std::string& option, const ArgumentList& globals) {
+    for (const Argument& argument : globals) {
         if (option == argument.name) return argument.kind == Argument::Kind::Option;
     }
     return false;
 }
 
 /// How far the words name a command, seen without parsing them.
-NamedCommand nameIn(const Words& words) {
+NamedCommand nameIn(const Words& words, const Vocabulary& vocabulary) {
     NamedCommand named;
     for (std::size_t i = 0; i < words.size(); ++i) {
         const bool isOption = words[i].rfind('-', 0) == 0;
-        if (takesValue(words[i])) ++i;
+        if (takesValue(words[i], vocabulary.globals)) ++i;
         if (isOption) continue;
         named.name += (named.name.empty() ? "" : " ") + words[i];
-        const VerbGroup* const group = findVerbGroup(named.name);
+        const VerbGroup* const group = vocabulary.findGroup(named.name);
         if (group == nullptr) break;
         named.group = group;
     }
-    named.verb = findVerb(named.name);
+    named.verb = vocabulary.findVerb(named.name);
+    if (named.verb == nullptr && named.group != nullptr) {
+        // A group's name may be a verb as well, and what follows it an argument.
+        named.verb = vocabulary.findVerb(named.group->name);
+    }
     return named;
 }
 
-CommandLine helpFor(const NamedCommand& named) {
+CommandLine helpFor(const NamedCommand& named, const Vocabulary& vocabulary) {
     CommandLine line;
-    line.page.out = named.verb != nullptr    ? verbHelp(*named.verb)
-                    : named.group != nullptr ? groupHelp(*named.group)
-                                             : programHelp();
+    line.page.out = named.verb != nullptr    ? verbHelp(*named.verb, vocabulary)
+                    : named.group != nullptr ? groupHelp(*named.group, vocabulary)
+                                             : programHelp(vocabulary);
     return line;
 }
 
@@ -190,13 +197,13 @@ CommandLine wrongUsage(const std::string& mistake, const NamedCommand& named, co
 }
 
 /// "--version" is the verb "version", whatever else stands on the line.
-CommandLine versionLine(const Words& words) {
+CommandLine versionLine(const Words& words, const Vocabulary& vocabulary) {
     CommandLine line;
-    line.verb = &kVersionVerb;
-    Words options = {kVersionVerb.name};
+    line.verb = vocabulary.findVerb(kVersionName);
+    Words options = {kVersionName};
     std::copy_if(words.begin(), words.end(), std::back_inserter(options),
                  [](const std::string& word) { return word != "--version"; });
-    line.given = Parser(&kVersionVerb).parse(options);
+    line.given = Parser(line.verb, vocabulary.globals).parse(options);
     return line;
 }
 
@@ -210,31 +217,32 @@ CommandLine dashesMissing(const Verb& verb, const std::string& corrected, const 
 
 }  // namespace
 
-const Verb* namedVerb(const std::vector<std::string>& words) {
-    return nameIn(words).verb;
+const Verb* namedVerb(const std::vector<std::string>& words, const Vocabulary& vocabulary) {
+    return nameIn(words, vocabulary).verb;
 }
 
-CommandLine parseCommandLine(const std::vector<std::string>& words) {
-    const NamedCommand named = nameIn(words);
+CommandLine parseCommandLine(const std::vector<std::string>& words, const Vocabulary& vocabulary) {
+    const NamedCommand named = nameIn(words, vocabulary);
     if (named.verb != nullptr) {
-        const std::string corrected = lineWithDashes(*named.verb, words);
+        const std::string corrected = lineWithDashes(*named.verb, words, vocabulary.globals);
         if (!corrected.empty()) return dashesMissing(*named.verb, corrected, words);
     }
-    Parser parser(named.verb);
+    Parser parser(named.verb, vocabulary.globals);
     CommandLine line;
     try {
         line.given = parser.parse(words);
     } catch (const CLI::CallForHelp&) {
-        return helpFor(named);
+        return helpFor(named, vocabulary);
     } catch (const CLI::CallForVersion&) {
-        return versionLine(words);
+        return versionLine(words, vocabulary);
     } catch (const CLI::ArgumentMismatch& mismatch) {
         const std::string text = mismatch.what();
         return wrongUsage(text.substr(0, text.find(':')) + " needs a value", named, words);
     } catch (const CLI::ParseError& error) {
         return wrongUsage(error.what(), named, words);
     }
-    const std::string mistake = firstMistake(named, {words, parser.unknown(), line.given});
+    const std::string mistake =
+        firstMistake(named, {words, parser.unknown(), line.given}, vocabulary);
     if (!mistake.empty()) return wrongUsage(mistake, named, words);
     line.verb = named.verb;
     return line;

@@ -7,6 +7,7 @@
 #include "ctl/show/page.h"
 #include "ctl/verbs/arguments/values.h"
 #include "ctl/verbs/verb.h"
+#include "ctl/verbs/verb_table.h"
 
 namespace ctl {
 
@@ -18,9 +19,11 @@ struct CommandLine {
 };
 
 /// The verb that the words name, if that can be seen without parsing them; else null.
-const Verb* namedVerb(const std::vector<std::string>& words);
+const Verb* namedVerb(const std::vector<std::string>& words,
+                      const Vocabulary& vocabulary = hostVocabulary());
 
 /// Takes the words behind the program's name apart. Nothing is run.
-CommandLine parseCommandLine(const std::vector<std::string>& words);
+CommandLine parseCommandLine(const std::vector<std::string>& words,
+                             const Vocabulary& vocabulary = hostVocabulary());
 
 }  // namespace ctl

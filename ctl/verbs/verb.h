@@ -7,6 +7,8 @@
 namespace ctl {
 
 struct Invocation;
+struct TaskRequest;
+class Values;
 
 /// One row of the table of verbs.
 struct Verb {
@@ -16,6 +18,9 @@ struct Verb {
     const char* examples[2];  ///< whole command lines
     /// Does what the invocation asks for and shows the result. May throw Failure.
     ExitStatus (*run)(const Invocation& invocation);
+    /// The task that it asks of a host, without an identifier: what each of many hosts gets. Null
+    /// if the verb is for one host at a time. May throw Failure.
+    TaskRequest (*requestOf)(const Values& given) = nullptr;
 };
 
 /// Verbs whose names have their first word in common.

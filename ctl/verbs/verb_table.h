@@ -4,6 +4,7 @@
 #include <string_view>
 
 #include "ctl/verbs/verb.h"
+#include "ctl/verbs/vocabulary.h"
 
 namespace ctl {
 
@@ -77,6 +78,9 @@ constexpr VerbGroup kVerbGroups[] = {
     {"depot", "Look into the depot and remove files from it"},
     {"task", "Look at a task, wait for it or cancel it"},
 };
+
+/// The words of zavctl, for one host.
+const Vocabulary& hostVocabulary();
 
 /// The verb of a full name such as "config get"; null if there is none.
 const Verb* findVerb(std::string_view name);

@@ -76,6 +76,7 @@ constexpr Verb kInstallVerb = {
     {"zavctl install ux 7.1 -- /bin/sh '|DEPLOYDIR|/install.sh' -h '|TOVRINHOME|'",
      "zavctl install ux 7.1 --restart --complete -- '|DEPLOYDIR|/setup.sh'"},
     run,
+    requestOf,
 };
 
 std::string joinedCommand(const std::vector<std::string>& words) {

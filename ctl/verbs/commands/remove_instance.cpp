@@ -13,12 +13,17 @@ constexpr Argument kTargetName =
 constexpr Argument kContext = textOption("--context", "Text for the translator's standard input");
 constexpr Argument kArguments[] = {kProduct, kTargetName, kContext, kNoWait, kTransid, kOnce};
 
-ExitStatus run(const Invocation& invocation) {
+TaskRequest requestOf(const Values& given) {
     TaskRequest request;
     request.command = "REMOVEINSTANCE";
-    request.product = invocation.given.text(kProduct);
-    request.targetmsn = invocation.given.text(kTargetName);
-    request.context = invocation.given.text(kContext);
+    request.product = given.text(kProduct);
+    request.targetmsn = given.text(kTargetName);
+    request.context = given.text(kContext);
+    return request;
+}
+
+ExitStatus run(const Invocation& invocation) {
+    const TaskRequest request = requestOf(invocation.given);
     const std::string title = "remove-instance " + request.product + " " + request.targetmsn;
     return runQueued(invocation, queuedCommand(invocation, request, title));
 }
@@ -32,6 +37,7 @@ constexpr Verb kRemoveInstanceVerb = {
     {"zavctl remove-instance ux db1:myhost:UX",
      "zavctl remove-instance ux db1:myhost:UX --context INSTANCE=db1"},
     run,
+    requestOf,
 };
 
 }  // namespace ctl

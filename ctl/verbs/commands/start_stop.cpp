@@ -34,30 +34,42 @@ ExitStatus send(const Invocation& invocation, const TaskRequest& request, const 
     return runQueued(invocation, command);
 }
 
-ExitStatus start(const Invocation& invocation) {
-    TaskRequest request = requestOf(invocation.given, "START");
-    if (const std::string& instance = invocation.given.text(kInstance); !instance.empty()) {
+TaskRequest startRequest(const Values& given) {
+    TaskRequest request = requestOf(given, "START");
+    if (const std::string& instance = given.text(kInstance); !instance.empty()) {
         request.optional = "INSTANCE";
         request.targetmsn = instance;
     }
-    return send(invocation, request, "start");
+    return request;
+}
+
+ExitStatus start(const Invocation& invocation) {
+    return send(invocation, startRequest(invocation.given), "start");
 }
 
 /// Only START has a way to name an instance outright. The others resolve a managed system name.
-ExitStatus runOnTarget(const Invocation& invocation, const std::string& command,
-                       const std::string& name) {
-    if (!invocation.given.text(kInstance).empty()) {
+TaskRequest targetRequest(const Values& given, const std::string& command,
+                          const std::string& name) {
+    if (!given.text(kInstance).empty()) {
         throw Failure(kWrongUsage, name + " takes --target, not --instance");
     }
-    return send(invocation, requestOf(invocation.given, command), name);
+    return requestOf(given, command);
+}
+
+TaskRequest stopRequest(const Values& given) {
+    return targetRequest(given, "STOP", "stop");
+}
+
+TaskRequest restartRequest(const Values& given) {
+    return targetRequest(given, "RESTART", "restart");
 }
 
 ExitStatus stop(const Invocation& invocation) {
-    return runOnTarget(invocation, "STOP", "stop");
+    return send(invocation, stopRequest(invocation.given), "stop");
 }
 
 ExitStatus restart(const Invocation& invocation) {
-    return runOnTarget(invocation, "RESTART", "restart");
+    return send(invocation, restartRequest(invocation.given), "restart");
 }
 
 }  // namespace
@@ -65,19 +77,19 @@ ExitStatus restart(const Invocation& invocation) {
 constexpr Verb kStartVerb = {
     "start",         "Start an agent",
     kStartArguments, {"zavctl start ux", "zavctl start ux --instance db1"},
-    start,
+    start,           startRequest,
 };
 
 constexpr Verb kStopVerb = {
     "stop",     "Stop an agent",
     kArguments, {"zavctl stop ux", "zavctl stop ux --target db1:myhost:UX"},
-    stop,
+    stop,       stopRequest,
 };
 
 constexpr Verb kRestartVerb = {
     "restart",  "Stop an agent and start it again",
     kArguments, {"zavctl restart ux", "zavctl --timeout 120 restart ux"},
-    restart,
+    restart,    restartRequest,
 };
 
 }  // namespace ctl

@@ -10,11 +10,16 @@ namespace {
 
 constexpr Argument kArguments[] = {kProduct, kForce, kNoVerify, kNoWait, kTransid, kOnce};
 
-ExitStatus run(const Invocation& invocation) {
+TaskRequest requestOf(const Values& given) {
     TaskRequest request;
     request.command = "UNINSTALL";
-    request.product = invocation.given.text(kProduct);
-    request.isForced = invocation.given.flag(kForce);
+    request.product = given.text(kProduct);
+    request.isForced = given.flag(kForce);
+    return request;
+}
+
+ExitStatus run(const Invocation& invocation) {
+    const TaskRequest request = requestOf(invocation.given);
     QueuedCommand command = queuedCommand(invocation, request, "uninstall " + request.product);
     command.isVerified = !invocation.given.flag(kNoVerify);
     return runQueued(invocation, command);
@@ -25,7 +30,7 @@ ExitStatus run(const Invocation& invocation) {
 constexpr Verb kUninstallVerb = {
     "uninstall", "Remove a product",
     kArguments,  {"zavctl uninstall ux", "zavctl uninstall ux --no-wait --transid cleanup-7"},
-    run,
+    run,         requestOf,
 };
 
 }  // namespace ctl

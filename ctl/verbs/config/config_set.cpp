@@ -50,13 +50,12 @@ bool isFileName(const std::string& text) {
 }
 
 /// Somebody who forgets --file would replace the agent's configuration by a file's name.
-void refuseFileName(const Invocation& invocation) {
-    const std::string& text = invocation.given.text(kText);
-    if (!isFileName(text) || !isGuarded(invocation.host, invocation.deadline())) return;
+void refuseFileName(const Values& given) {
+    const std::string& text = given.text(kText);
+    if (!isFileName(text)) return;
     throw Failure(kWrongUsage, text + " is the name of a file, and no configuration",
-                  "To send what is in it: zavctl config set " +
-                      shellQuoted(invocation.given.text(kProduct)) + " --file " +
-                      shellQuoted(text));
+                  "To send what is in it: zavctl config set " + shellQuoted(given.text(kProduct)) +
+                      " --file " + shellQuoted(text));
 }
 
 std::string textToSet(const Values& given) {
@@ -69,12 +68,24 @@ std::string textToSet(const Values& given) {
     return text == "-" ? readDescriptor(STDIN_FILENO, "standard input") : text;
 }
 
-ExitStatus run(const Invocation& invocation) {
-    const Values& given = invocation.given;
-    refuseFileName(invocation);
+TaskRequest requestOf(const Values& given) {
     TaskRequest request =
         configurationRequest(given.text(kProduct), given.text(kTarget), textToSet(given));
     request.isForced = given.flag(kForce);
+    return request;
+}
+
+TaskRequest checkedRequest(const Values& given) {
+    refuseFileName(given);
+    return requestOf(given);
+}
+
+ExitStatus run(const Invocation& invocation) {
+    const Values& given = invocation.given;
+    if (isFileName(given.text(kText)) && isGuarded(invocation.host, invocation.deadline())) {
+        refuseFileName(given);
+    }
+    const TaskRequest request = requestOf(given);
     return runQueued(invocation,
                      queuedCommand(invocation, request, "config set " + request.product));
 }
@@ -88,6 +99,7 @@ constexpr Verb kConfigSetVerb = {
     {"zavctl config set ux --file ux.config",
      "printf 'INSTANCE=\\nA=1\\n' | zavctl config set ux -"},
     run,
+    checkedRequest,
 };
 
 TaskRequest configurationRequest(const std::string& product, const std::string& target,

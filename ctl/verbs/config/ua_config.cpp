@@ -29,13 +29,14 @@ std::string contextOf(const Values& given) {
     return text;
 }
 
-ExitStatus run(const Invocation& invocation) {
-    const Values& given = invocation.given;
-    // The host takes scripts alone for done, and copies none.
-    if (given.text(kMetafile).empty() && isGuarded(invocation.host, invocation.deadline())) {
-        throw Failure(kWrongUsage, "ua-config imports nothing without a metafile",
-                      "Name one of the depot with --metafile.");
-    }
+/// The host takes scripts alone for done, and copies none.
+void refuseMissingMetafile(const Values& given) {
+    if (!given.text(kMetafile).empty()) return;
+    throw Failure(kWrongUsage, "ua-config imports nothing without a metafile",
+                  "Name one of the depot with --metafile.");
+}
+
+TaskRequest requestOf(const Values& given) {
     TaskRequest request;
     request.command = "SETCONFIG";
     request.product = "um";
@@ -44,7 +45,20 @@ ExitStatus run(const Invocation& invocation) {
     request.uaconfig = given.text(kMetafile);
     request.uascript = given.text(kScripts);
     request.targetmsn = given.text(kTarget);
-    return runQueued(invocation, queuedCommand(invocation, request, "ua-config"));
+    return request;
+}
+
+TaskRequest checkedRequest(const Values& given) {
+    refuseMissingMetafile(given);
+    return requestOf(given);
+}
+
+ExitStatus run(const Invocation& invocation) {
+    const Values& given = invocation.given;
+    if (given.text(kMetafile).empty() && isGuarded(invocation.host, invocation.deadline())) {
+        refuseMissingMetafile(given);
+    }
+    return runQueued(invocation, queuedCommand(invocation, requestOf(given), "ua-config"));
 }
 
 }  // namespace
@@ -56,6 +70,7 @@ constexpr Verb kUaConfigVerb = {
     {"zavctl ua-config --metafile disks.mdl --scripts disks.sh --restart",
      "zavctl ua-config --metafile disks.mdl --port 7700"},
     run,
+    checkedRequest,
 };
 
 }  // namespace ctl

@@ -5,9 +5,10 @@
 #include <utility>
 #include <vector>
 
-#include "ctl/verbs/arguments/global_arguments.h"
+#include "ctl/client/failure.h"
+#include "ctl/show/nearest.h"
+#include "ctl/show/printable.h"
 #include "ctl/verbs/help/argument_text.h"
-#include "ctl/verbs/verb_table.h"
 
 namespace ctl {
 namespace {
@@ -92,8 +93,8 @@ Entries entriesOf(const ArgumentList& arguments, bool positionals) {
     return entries;
 }
 
-std::string globalOptions(const std::string& title) {
-    Entries entries = entriesOf(kGlobalArguments, false);
+std::string globalOptions(const std::string& title, const Vocabulary& vocabulary) {
+    Entries entries = entriesOf(vocabulary.globals, false);
     entries.emplace_back("-h, --help", "Print the help");
     entries.emplace_back("--version", "Print the version");
     return section(title, entries);
@@ -112,22 +113,27 @@ std::string positionalsOf(const Verb& verb) {
 }
 
 /// Whether the verb stands in the group, and is not just called alike.
-bool isIn(const Verb& verb, const VerbGroup& group) {
+bool isMemberOf(const Verb& verb, const VerbGroup& group) {
     return std::string(verb.name).rfind(std::string(group.name) + " ", 0) == 0;
 }
 
 /// A line for each verb, groups being one line.
-Entries commands() {
+Entries commands(const Vocabulary& vocabulary) {
     Entries entries;
     const VerbGroup* last = nullptr;
-    for (const Verb* const verb : kVerbs) {
-        const auto group = std::find_if(std::begin(kVerbGroups), std::end(kVerbGroups),
-                                        [verb](const VerbGroup& one) { return isIn(*verb, one); });
-        if (group == std::end(kVerbGroups)) {
+    const auto& groups = vocabulary.groups;
+    for (const Verb* const verb : vocabulary.verbs) {
+        const auto group = std::find_if(groups.begin(), groups.end(), [verb](const auto* one) {
+            return isMemberOf(*verb, *one);
+        });
+        // Where a group's name is a verb as well, its line would be taken for that of the group.
+        const bool isListed =
+            group == groups.end() || vocabulary.findVerb((*group)->name) != nullptr;
+        if (isListed) {
             entries.emplace_back(verb->name, verb->help);
-        } else if (last != &*group) {
-            last = &*group;
-            entries.emplace_back(group->name, group->help);
+        } else if (last != *group) {
+            last = *group;
+            entries.emplace_back(last->name, last->help);
         }
     }
     return entries;
@@ -135,17 +141,18 @@ Entries commands() {
 
 }  // namespace
 
-std::string programHelp() {
-    return "Manages the monitoring agents of one host.\n\nUsage: zavctl [OPTIONS] COMMAND ...\n" +
-           section("Commands", commands()) + globalOptions("Options of every command") +
+std::string programHelp(const Vocabulary& vocabulary) {
+    return std::string(vocabulary.purpose) + ".\n\nUsage: zavctl [OPTIONS] COMMAND ...\n" +
+           section("Commands", commands(vocabulary)) +
+           globalOptions("Options of every command", vocabulary) +
            "\nzavctl help COMMAND explains a command, with examples.\n" + exitStatuses();
 }
 
-std::string groupHelp(const VerbGroup& group) {
+std::string groupHelp(const VerbGroup& group, const Vocabulary& vocabulary) {
     Entries entries;
     std::string examples;
-    for (const Verb* const verb : kVerbs) {
-        if (!isIn(*verb, group)) continue;
+    for (const Verb* const verb : vocabulary.verbs) {
+        if (!isMemberOf(*verb, group)) continue;
         entries.emplace_back(verb->name, verb->help);
         examples += std::string("  ") + verb->examples[0] + "\n";
     }
@@ -154,12 +161,28 @@ std::string groupHelp(const VerbGroup& group) {
            group.name + " COMMAND explains a command, with more examples.\n";
 }
 
-std::string verbHelp(const Verb& verb) {
+std::string verbHelp(const Verb& verb, const Vocabulary& vocabulary) {
     return std::string(verb.help) + ".\n\nUsage: zavctl " + verb.name + " [OPTIONS]" +
            positionalsOf(verb) + "\n" + section("Arguments", entriesOf(verb.arguments, true)) +
            section("Options", entriesOf(verb.arguments, false)) +
-           globalOptions("Options of every command") + "\nExamples:\n  " + verb.examples[0] +
-           "\n  " + verb.examples[1] + "\n" + exitStatuses();
+           globalOptions("Options of every command", vocabulary) + "\nExamples:\n  " +
+           verb.examples[0] + "\n  " + verb.examples[1] + "\n" + exitStatuses();
+}
+
+std::string helpAbout(const std::vector<std::string>& words, const Vocabulary& vocabulary) {
+    std::string name;
+    for (const std::string& word : words)
+        name += (name.empty() ? "" : " ") + word;
+    if (name.empty()) return programHelp(vocabulary);
+    if (const Verb* const verb = vocabulary.findVerb(name)) return verbHelp(*verb, vocabulary);
+    if (const VerbGroup* const group = vocabulary.findGroup(name)) {
+        return groupHelp(*group, vocabulary);
+    }
+    std::vector<std::string> known;
+    for (const Verb* const verb : vocabulary.verbs)
+        known.emplace_back(verb->name);
+    throw Failure(kWrongUsage,
+                  "there is no command \"" + printable(name) + "\"" + suggestion(name, known));
 }
 
 }  // namespace ctl

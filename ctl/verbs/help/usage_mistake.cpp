@@ -5,8 +5,6 @@
 
 #include "ctl/show/nearest.h"
 #include "ctl/show/printable.h"
-#include "ctl/verbs/arguments/global_arguments.h"
-#include "ctl/verbs/verb_table.h"
 
 namespace ctl {
 namespace {
@@ -36,8 +34,8 @@ std::vector<std::string> optionsOf(const ArgumentList& arguments) {
     return options;
 }
 
-std::string unknownOption(const std::string& word, const Verb* verb) {
-    std::vector<std::string> known = optionsOf(kGlobalArguments);
+std::string unknownOption(const std::string& word, const Verb* verb, const Vocabulary& vocabulary) {
+    std::vector<std::string> known = optionsOf(vocabulary.globals);
     known.insert(known.end(), {"--help", "--version"});
     std::string subject = "there is";
     if (verb != nullptr) {
@@ -49,26 +47,27 @@ std::string unknownOption(const std::string& word, const Verb* verb) {
            suggestion(word.substr(0, word.find('=')), known);
 }
 
-std::string commandMistake(const NamedCommand& named, const TakenWords& taken) {
+std::string commandMistake(const NamedCommand& named, const TakenWords& taken,
+                           const Vocabulary& vocabulary) {
     if (named.group != nullptr && named.name == named.group->name) {
         return named.name + " needs a command behind it";
     }
     if (named.name.empty()) {
         if (taken.leftOver.empty()) return "a command is missing";
         const std::string word = firstOf(taken.leftOver, taken.words);
-        return isOption(word) ? unknownOption(word, nullptr) : "a command is missing";
+        return isOption(word) ? unknownOption(word, nullptr, vocabulary) : "a command is missing";
     }
     std::vector<std::string> known;
-    for (const Verb* const verb : kVerbs)
+    for (const Verb* const verb : vocabulary.verbs)
         known.emplace_back(verb->name);
-    for (const VerbGroup& group : kVerbGroups)
-        known.emplace_back(group.name);
+    for (const VerbGroup* const group : vocabulary.groups)
+        known.emplace_back(group->name);
     return "there is no command " + quoted(named.name) + suggestion(named.name, known);
 }
 
-std::string unknownWord(const Verb& verb, const TakenWords& taken) {
+std::string unknownWord(const Verb& verb, const TakenWords& taken, const Vocabulary& vocabulary) {
     const std::string word = firstOf(taken.leftOver, taken.words);
-    if (isOption(word)) return unknownOption(word, &verb);
+    if (isOption(word)) return unknownOption(word, &verb, vocabulary);
     return std::string(verb.name) + " does not know what to do with " + quoted(word);
 }
 
@@ -103,9 +102,10 @@ std::string argumentMistake(const Verb& verb, const Values& given) {
 
 }  // namespace
 
-std::string firstMistake(const NamedCommand& named, const TakenWords& taken) {
-    if (named.verb == nullptr) return commandMistake(named, taken);
-    if (!taken.leftOver.empty()) return unknownWord(*named.verb, taken);
+std::string firstMistake(const NamedCommand& named, const TakenWords& taken,
+                         const Vocabulary& vocabulary) {
+    if (named.verb == nullptr) return commandMistake(named, taken, vocabulary);
+    if (!taken.leftOver.empty()) return unknownWord(*named.verb, taken, vocabulary);
     return argumentMistake(*named.verb, taken.given);
 }
 

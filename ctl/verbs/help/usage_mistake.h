@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "ctl/verbs/arguments/values.h"
-#include "ctl/verbs/verb.h"
+#include "ctl/verbs/vocabulary.h"
 
 namespace ctl {
 
@@ -26,6 +26,7 @@ struct TakenWords {
 /// A sentence about the first mistake, without a full stop; empty if there is none. A command that
 /// is unknown comes first, then unknown words, missing arguments, and those that do not go
 /// together.
-std::string firstMistake(const NamedCommand& named, const TakenWords& taken);
+std::string firstMistake(const NamedCommand& named, const TakenWords& taken,
+                         const Vocabulary& vocabulary);
 
 }  // namespace ctl

@@ -1,5 +1,6 @@
 #include "fleet/bus/trust/signed.h"
 
+#include <algorithm>
 #include <cstdint>
 
 namespace fleet {
@@ -30,6 +31,8 @@ std::string_view nameOf(Purpose purpose) {
             return "enrol";
         case Purpose::LoggingIn:
             return "login";
+        case Purpose::OpeningSession:
+            return "session";
     }
     return "";
 }
@@ -81,6 +84,13 @@ std::optional<SignedParts> partsOf(std::string_view bytes) {
 
 bool isSigned(const SignedParts& parts, Purpose purpose, std::string_view publicKey) {
     return isSignedBy(publicKey, coveredBytes(purpose, parts.covered), parts.signature);
+}
+
+bool isSigned(const SignedParts& parts, Purpose purpose,
+              const std::vector<std::string>& publicKeys) {
+    return std::any_of(publicKeys.begin(), publicKeys.end(), [&](const std::string& publicKey) {
+        return isSigned(parts, purpose, publicKey);
+    });
 }
 
 }  // namespace fleet

@@ -7,9 +7,9 @@
 #include <istream>
 #include <ostream>
 
+#include "ctl/client/address/host_address.h"
 #include "fleet/link/enrol/enrol_error.h"
 #include "fleet/link/enrol/enrol_host.h"
-#include "fleet/link/program/link_configuration.h"
 #include "fleet/log/log.h"
 
 namespace fleet {
@@ -66,7 +66,7 @@ void declareEnrolment(CLI::App& app, EnrolWords& words) {
     app.add_option("--config", options.configuration, "The configuration to write")
         ->capture_default_str();
     app.add_option("--host-socket", options.hostSocket, "Where zavlink asks the host")
-        ->default_str(LinkConfiguration{}.hostSocket);
+        ->default_str(ctl::defaultSocket());
     app.add_option("--label", words.labels, "NAME=VALUE, by which operators select hosts")
         ->allow_extra_args(false);
     app.footer(kFooter);

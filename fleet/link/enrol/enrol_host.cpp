@@ -11,6 +11,7 @@
 #include <nlohmann/json.hpp>
 #include <system_error>
 
+#include "ctl/client/address/host_address.h"
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/enrolment.h"
 #include "fleet/bus/messages/invitation.h"
@@ -116,7 +117,8 @@ LinkConfiguration ownPartOf(const EnrolOptions& options) {
     own.state = absolute(options.directory);
     own.ca = own.state + "/ca.pem";
     own.labels = options.labels;
-    if (!options.hostSocket.empty()) own.hostSocket = options.hostSocket;
+    own.hostSocket =
+        absolute(options.hostSocket.empty() ? ctl::defaultSocket() : options.hostSocket);
     return own;
 }
 

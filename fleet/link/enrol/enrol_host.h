@@ -12,8 +12,8 @@ struct EnrolOptions {
     std::string invitation;                           ///< the line that the centre has printed
     std::string directory = "/var/lib/zavlink";       ///< of the link; made if it is not there
     std::string configuration = "/etc/zavlink.toml";  ///< the file to write
-    std::string hostSocket;                           ///< "" is the link's own default
-    Labels labels;                                    ///< of the host's own configuration
+    std::string hostSocket;  ///< where the host is asked; "" is where zavctl would ask it
+    Labels labels;           ///< of the host's own configuration
     std::string machineFile = "/etc/machine-id";
 };
 

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cctype>
+#include <string>
+#include <vector>
 
 #include "fleet/bus/messages/certificate.h"
 #include "fleet/bus/messages/document.h"
@@ -13,20 +15,23 @@ namespace {
 
 constexpr const char* kPemStart = "-----BEGIN CERTIFICATE-----";
 
-/// The newest one stands first.
-std::string centreKeyIn(const EnrolmentAnswer& answer, const Invitation& invitation, Moment now) {
+/// While a key is being replaced there are several.
+std::vector<std::string> centreKeysIn(const EnrolmentAnswer& answer, const Invitation& invitation,
+                                      Moment now) {
+    std::vector<std::string> keys;
     bool hasEnded = false;
     for (const std::string& bytes : answer.centres) {
         try {
             const Certificate certificate =
                 readCertificate(bytes, invitation.root, invitation.fleet);
             if (certificate.holder != Certificate::Holder::Centre) continue;
-            if (certificate.until > now) return certificate.key;
-            hasEnded = true;
+            if (certificate.until > now) keys.push_back(certificate.key);
+            hasEnded = hasEnded || certificate.until <= now;
         } catch (const MessageError&) {
             // It counts as none.
         }
     }
+    if (!keys.empty()) return keys;
     throw EnrolError(hasEnded ? "the certificate of the centre has ended; if not, the clock of "
                                 "this machine is wrong"
                               : "the centre cannot show that the root of the fleet has certified "
@@ -37,7 +42,7 @@ std::string centreKeyIn(const EnrolmentAnswer& answer, const Invitation& invitat
 
 void adoptAnswer(LinkConfiguration& configuration, const Invitation& invitation,
                  const EnrolmentAnswer& answer, Moment now) {
-    configuration.centre = centreKeyIn(answer, invitation, now);
+    configuration.centres = centreKeysIn(answer, invitation, now);
     configuration.fleet = invitation.fleet;
     configuration.root = invitation.root;
     configuration.name = answer.name;

@@ -10,10 +10,10 @@
 
 namespace fleet {
 
-/// Fills in what the invitation and the centre's answer tell, and leaves the rest as it is. Of the
-/// centre's keys it is the newest one that counts. Throws EnrolError if the answer cannot be meant:
-/// nothing in it proves that the invitation's root has certified the centre, or a link could not
-/// work with it.
+/// Fills in what the invitation and the centre's answer tell, and leaves the rest as it is. All
+/// keys of the centre count that the root has certified and that have not ended. Throws EnrolError
+/// if the answer cannot be meant: nothing in it proves that the invitation's root has certified the
+/// centre, or a link could not work with it.
 void adoptAnswer(LinkConfiguration& configuration, const Invitation& invitation,
                  const EnrolmentAnswer& answer, Moment now);
 

@@ -46,7 +46,7 @@ std::string linkConfigurationText(const LinkConfiguration& configuration) {
         lineWith("fleet", configuration.fleet) + lineWith("name", configuration.name) +
         "bus = " + listed(configuration.bus) + '\n' + lineWith("ca", configuration.ca) +
         lineWith("server-name", configuration.serverName) + lineWith("root", configuration.root) +
-        lineWith("centre", configuration.centre) +
+        "centre = " + listed(configuration.centres) + '\n' +
         lineWith("host-socket", configuration.hostSocket) + lineWith("state", configuration.state);
     if (!configuration.labels.empty()) text += "\n[labels]\n";
     for (const auto& [name, value] : configuration.labels)

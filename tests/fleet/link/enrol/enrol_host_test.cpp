@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "fleet/bus/accounts/token.h"
 #include "fleet/bus/messages/certificate.h"
@@ -66,7 +67,8 @@ TEST_F(EnrollingHost, HasAllThatALinkNeeds) {
     EXPECT_EQ(read.bus, facts.busUrls);
     EXPECT_EQ(read.serverName, "localhost");
     EXPECT_EQ(read.root, facts.root);
-    EXPECT_EQ(read.centre, host_.fleet.made.directory().centre().key.publicKey());
+    EXPECT_EQ(read.centres,
+              std::vector<std::string>{host_.fleet.made.directory().centre().key.publicKey()});
     EXPECT_EQ(read.hostSocket, "/run/other.sock");
     EXPECT_EQ(read.state, host_.options.directory);
     EXPECT_EQ(read.labels, (fleet::Labels{{"env", "test"}}));
@@ -227,22 +229,28 @@ TEST_F(EnrollingHost, TakesNoCentreThatTheRootHasNotCertified) {
     EXPECT_EQ(with(ended, root).rfind("the certificate of the centre has ended", 0), 0U);
 }
 
-TEST_F(EnrollingHost, GoesByTheNewestOfTheCentresKeysThatCounts) {
+TEST_F(EnrollingHost, GoesByAllKeysOfTheCentreThatCount) {
     const KeyPair root = host_.fleet.made.root().root;
-    const KeyPair newest = KeyPair::make(KeyKind::User);
-    fleet::Certificate certificate;
-    certificate.fleet = "demo";
-    certificate.holder = fleet::Certificate::Holder::Centre;
-    certificate.name = "centre";
-    certificate.key = newest.publicKey();
-    certificate.until = kNow + kDay;
+    const auto certified = [&](const KeyPair& key, fleet::Moment until) {
+        fleet::Certificate certificate;
+        certificate.fleet = "demo";
+        certificate.holder = fleet::Certificate::Holder::Centre;
+        certificate.name = "centre";
+        certificate.key = key.publicKey();
+        certificate.until = until;
+        return signCertificate(certificate, root);
+    };
+    const KeyPair newer = KeyPair::make(KeyKind::User);
+    const KeyPair older = KeyPair::make(KeyKind::User);
+    const KeyPair ended = KeyPair::make(KeyKind::User);
     host_.startCentre(host_.takesUpWith([&](fleet::EnrolmentAnswer& answer) {
-        answer.centres.insert(answer.centres.begin(), signCertificate(certificate, root));
-        answer.centres.insert(answer.centres.begin(), "nothing that can be read");
+        answer.centres = {"nothing that can be read", certified(newer, kNow + 2 * kDay),
+                          certified(older, kNow + kDay), certified(ended, kNow)};
     }));
     host_.options.invitation = host_.invitation();
     EXPECT_EQ(host_.refusal(), "");
-    EXPECT_EQ(configuration().centre, newest.publicKey());
+    EXPECT_EQ(configuration().centres,
+              (std::vector<std::string>{newer.publicKey(), older.publicKey()}));
 }
 
 TEST_F(EnrollingHost, TakesNoAnswerWithWhichALinkCouldNotWork) {

@@ -59,7 +59,7 @@ TEST_F(LinksConfiguration, IsReadWhole) {
     EXPECT_EQ(read.ca, "/etc/zavlink/ca.pem");
     EXPECT_EQ(read.serverName, "bus.example");
     EXPECT_EQ(read.root, root);
-    EXPECT_EQ(read.centre, centre);
+    EXPECT_EQ(read.centres, (std::vector<std::string>{centre}));
     EXPECT_EQ(read.hostSocket, "/run/h.sock");
     EXPECT_EQ(read.state, "/var/lib/zavlink");
     EXPECT_EQ(read.labels, (fleet::Labels{{"env", "test"}}));
@@ -88,6 +88,15 @@ TEST_F(LinksConfiguration, KeysMustBeOfTheirKind) {
     expectRefusal(with("centre", "centre = \"U\""), "no public key of that kind");
 }
 
+TEST_F(LinksConfiguration, TheCentreMayHaveSeveralKeys) {
+    const std::string next = KeyPair::make(KeyKind::User).publicKey();
+    const std::string line = "centre = [\"" + centre + "\", \"" + next + "\"]";
+    EXPECT_EQ(fleet::parseLinkConfiguration(with("centre", line), "zavlink.toml").centres,
+              (std::vector<std::string>{centre, next}));
+    expectRefusal(with("centre", "centre = []"), "must be a list");
+    expectRefusal(with("centre", "centre = [\"U\"]"), "no public key of that kind");
+}
+
 TEST_F(LinksConfiguration, NothingLeavesTheMachineUnencrypted) {
     expectRefusal(with("bus", "bus = [\"nats://bus.example:4222\"]"), "tls://HOST:PORT");
     expectRefusal(with("bus", "bus = [\"nats://127.0.0.1.example:4222\"]"), "tls://HOST:PORT");
@@ -104,7 +113,7 @@ TEST_F(LinksConfiguration, IsReadAsItWasWritten) {
     written.ca = "/etc/zavlink/ca.pem";
     written.serverName = "bus.example";
     written.root = root;
-    written.centre = centre;
+    written.centres = {centre, KeyPair::make(KeyKind::User).publicKey()};
     written.state = "/var/lib/zavlink";
     written.labels = {{"env", "test"}, {"a b.c", "1=2"}};
     const LinkConfiguration read =
@@ -115,7 +124,7 @@ TEST_F(LinksConfiguration, IsReadAsItWasWritten) {
     EXPECT_EQ(read.ca, written.ca);
     EXPECT_EQ(read.serverName, written.serverName);
     EXPECT_EQ(read.root, written.root);
-    EXPECT_EQ(read.centre, written.centre);
+    EXPECT_EQ(read.centres, written.centres);
     EXPECT_EQ(read.hostSocket, written.hostSocket);
     EXPECT_EQ(read.state, written.state);
     EXPECT_EQ(read.labels, written.labels);

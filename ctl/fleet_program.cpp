@@ -1,0 +1,77 @@
+#include "ctl/fleet_program.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <filesystem>
+#include <system_error>
+
+#include "ctl/client/failure.h"
+#include "ctl/verbs/arguments/global_arguments.h"
+
+namespace ctl {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr const char* kFleetProgram = "zavctl-fleet";
+constexpr const char* kFleetOptions[] = {"--fleet", "--on"};
+constexpr const char* kFleetVerbs[] = {"login", "hosts", "rollout"};
+
+template <typename List>
+bool isAmong(const std::string& word, const List& list) {
+    return std::find(std::begin(list), std::end(list), word) != std::end(list);
+}
+
+bool hasValueBehind(const std::string& option) {
+    return std::any_of(
+        kGlobalArguments.begin(), kGlobalArguments.end(), [&](const Argument& argument) {
+            return argument.kind == Argument::Kind::Option && option == argument.name;
+        });
+}
+
+/// The words that are neither global options nor their values.
+std::vector<std::string> commandWords(const std::vector<std::string>& words) {
+    std::vector<std::string> command;
+    for (std::size_t i = 0; i < words.size() && words[i] != "--"; ++i) {
+        if (hasValueBehind(words[i]))
+            ++i;
+        else if (words[i].rfind('-', 0) != 0)
+            command.push_back(words[i]);
+    }
+    return command;
+}
+
+}  // namespace
+
+bool isForFleet(const std::vector<std::string>& words) {
+    const auto end = std::find(words.begin(), words.end(), "--");
+    const bool hasOption = std::any_of(words.begin(), end, [](const std::string& word) {
+        return isAmong(word.substr(0, word.find('=')), kFleetOptions);
+    });
+    if (hasOption) return true;
+    const std::vector<std::string> command = commandWords(words);
+    const std::size_t verb = !command.empty() && command.front() == "help" ? 1 : 0;
+    return command.size() > verb && isAmong(command[verb], kFleetVerbs);
+}
+
+void becomeFleetProgram(char* const* argv) {
+    std::error_code error;
+    const fs::path here = fs::read_symlink("/proc/self/exe", error).parent_path();
+    const fs::path places[] = {here / kFleetProgram,
+                               here.parent_path() / "libexec" / "zavmgmt" / kFleetProgram};
+    int reason = ENOENT;
+    for (const fs::path& place : places) {
+        ::execv(place.c_str(), argv);
+        if (errno != ENOENT) reason = errno;
+    }
+    if (reason == ENOENT) {
+        throw Failure(kWrongUsage, "what manages fleets is not installed here",
+                      "The program " + std::string(kFleetProgram) + " is missing beside zavctl.");
+    }
+    throw Failure(kWrongUsage, std::string(kFleetProgram) +
+                                   " cannot be run: " + std::generic_category().message(reason));
+}
+
+}  // namespace ctl

@@ -1,0 +1,18 @@
+/// The part of the program that manages many hosts at once. It is a program of its own, which is
+/// not there on every machine: what one host needs shall stay small.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace ctl {
+
+/// Whether a command line is about a fleet: it has --fleet or --on, or its verb is one of a fleet
+/// alone. What stands behind "--" does not count.
+bool isForFleet(const std::vector<std::string>& words);
+
+/// Runs zavctl-fleet with the same words in the place of this process. It is looked for beside this
+/// program, and in ../libexec/zavmgmt from there. Throws Failure(kWrongUsage) if it cannot be run.
+[[noreturn]] void becomeFleetProgram(char* const* argv);
+
+}  // namespace ctl

@@ -1,0 +1,62 @@
+#include "fleet/operator/centre/answers.h"
+
+#include <nlohmann/json.hpp>
+
+#include "ctl/client/http/bounded_json.h"
+
+using nlohmann::json;
+
+namespace fleet {
+namespace {
+
+const json* memberIn(const json& object, const char* member) {
+    if (!object.is_object()) return nullptr;
+    const auto found = object.find(member);
+    return found == object.end() ? nullptr : &*found;
+}
+
+}  // namespace
+
+std::string memberText(const json& object, const char* member) {
+    const json* const found = memberIn(object, member);
+    return found != nullptr && found->is_string() ? found->get<std::string>() : "";
+}
+
+std::uint64_t memberNumber(const json& object, const char* member) {
+    const json* const found = memberIn(object, member);
+    return found != nullptr && found->is_number_unsigned() ? found->get<std::uint64_t>() : 0;
+}
+
+bool memberFlag(const json& object, const char* member) {
+    const json* const found = memberIn(object, member);
+    return found != nullptr && found->is_boolean() && found->get<bool>();
+}
+
+const json& memberList(const json& answer, const char* member) {
+    const json* const found = memberIn(answer, member);
+    if (found == nullptr || !found->is_array()) {
+        throw senseless(std::string("it has no list \"") + member + '"');
+    }
+    return *found;
+}
+
+ctl::Failure senseless(const std::string& what) {
+    return {ctl::kNoHost, "the centre's answer makes no sense: " + what};
+}
+
+ctl::Failure centreRefusal(unsigned status, const std::string& body) {
+    if (status < 400) return senseless("its status is " + std::to_string(status));
+    std::string reason = memberText(ctl::objectIn(body), "error");
+    if (reason.empty()) reason = "status " + std::to_string(status);
+    const bool isForNow =
+        status == 401 || status == 403 || status == 409 || status == 429 || status >= 500;
+    return {isForNow ? ctl::kHostReportedFailure : ctl::kWrongUsage,
+            "the centre refused the request: " + reason};
+}
+
+ctl::Failure centreFailure(const HttpsError& error) {
+    const bool isLate = error.kind() == HttpsError::Kind::TooLate;
+    return {isLate ? ctl::kNoOutcome : ctl::kNoHost, error.what()};
+}
+
+}  // namespace fleet

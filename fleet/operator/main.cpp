@@ -1,0 +1,69 @@
+// zavctl-fleet: the part of zavctl that manages many hosts. zavctl runs it.
+
+#include <csignal>
+#include <exception>
+#include <string>
+#include <vector>
+
+#include "ctl/client/failure.h"
+#include "ctl/command_line.h"
+#include "ctl/show/page.h"
+#include "ctl/show/standard_streams.h"
+#include "ctl/show/terminal.h"
+#include "ctl/verbs/invocation.h"
+#include "fleet/bus/messages/document.h"
+#include "fleet/files/file_error.h"
+#include "fleet/https/client/https_error.h"
+#include "fleet/https/client/server_url.h"
+#include "fleet/operator/centre/answers.h"
+#include "fleet/operator/verbs/fleet_arguments.h"
+#include "fleet/operator/verbs/fleet_verbs.h"
+#include "fleet/operator/verbs/many_hosts.h"
+
+namespace {
+
+ctl::ExitStatus runVerb(const ctl::CommandLine& line, ctl::Format format) {
+    fleet::insistOnMeaning(*line.verb, line.given);
+    const ctl::Invocation invocation{line.given, {}, format};
+    if (line.verb->requestOf != nullptr) return fleet::runOnMany(*line.verb, invocation);
+    return line.verb->run(invocation);
+}
+
+/// What the parts of a fleet throw, as failures of the program.
+ctl::ExitStatus runWithFailures(const ctl::CommandLine& line, ctl::Format format) {
+    try {
+        return runVerb(line, format);
+    } catch (const fleet::HttpsError& error) {
+        throw fleet::centreFailure(error);
+    } catch (const fleet::UrlError& error) {
+        throw ctl::Failure(ctl::kWrongUsage, error.what());
+    } catch (const fleet::FileError& error) {
+        throw ctl::Failure(ctl::kWrongUsage, error.what());
+    } catch (const fleet::MessageError& error) {
+        throw fleet::senseless(error.what());
+    }
+}
+
+ctl::ExitStatus run(const std::vector<std::string>& words) {
+    const ctl::CommandLine line = ctl::parseCommandLine(words, fleet::fleetVocabulary());
+    const ctl::Format format = line.verb == nullptr ? ctl::Format::Text : ctl::formatOf(line.given);
+    ctl::lookAtTerminals(line.verb != nullptr && format == ctl::Format::Text);
+    if (line.verb == nullptr) return ctl::print(line.page);
+    try {
+        return runWithFailures(line, format);
+    } catch (const ctl::Failure& failure) {
+        return ctl::print(ctl::failurePage(failure, format));
+    }
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    ctl::occupyStandardDescriptors();
+    std::signal(SIGPIPE, SIG_IGN);  // a centre that goes away is an error of the write
+    try {
+        return ctl::withOutputWritten(run({argv + 1, argv + argc}));
+    } catch (const std::exception& error) {
+        return ctl::print({{}, ctl::complaint(error.what()), ctl::kNoHost});
+    }
+}

@@ -1,0 +1,60 @@
+/// Makes orders and signs them: on the operator's machine, and nowhere else.
+#pragma once
+
+#include <nlohmann/json.hpp>
+#include <string>
+
+#include "ctl/client/tasks/task_request.h"
+#include "fleet/bus/messages/order.h"
+#include "fleet/operator/identity/operator_identity.h"
+#include "fleet/operator/orders/chosen_hosts.h"
+
+namespace fleet {
+
+/// What each of many hosts is to do.
+struct Work {
+    std::string kind;     ///< the command
+    nlohmann::json body;  ///< the other members of the task, as everybody on the way may read them
+    std::string
+        hidden;  ///< JSON with the members that only the host may read; "" if there are none
+
+    std::string product() const;
+};
+
+/// The work that a task of one host is for many. A configuration is hidden, and every other text in
+/// which something looks like a password.
+Work workOf(const ctl::TaskRequest& request);
+
+/// No order is longer: it has to fit into one request to the centre.
+constexpr std::size_t kMostOrderBytes = 700'000;
+
+class OrderMaker {
+public:
+    /// The orders are issued now and end so much later. Borrows the identity. Throws ctl::Failure
+    /// if the certificate has ended, or `lasting` is above kLongestOrder or not above 0.
+    OrderMaker(const OperatorIdentity& identity, Moment now, Moment lasting);
+
+    /// Throws ctl::Failure if the certificate does not allow a command, for which no host would
+    /// carry it out.
+    void insistThatAllowed(const std::string& kind, const std::string& product) const;
+
+    /// The signed order for one host. Throws ctl::Failure if it gets too long, or if something has
+    /// to be sealed and the host has no key for that.
+    std::string orderFor(const ChosenHost& host, const Work& work,
+                         const std::string& selector) const;
+
+    /// A signed order that does the same as another one, with another identifier and other times.
+    std::string again(const Order& order) const;
+    /// A signed order that cancels another one.
+    std::string cancelOf(const Order& order) const;
+
+private:
+    std::string sign(Order order) const;
+
+    const OperatorIdentity& identity_;
+    const Certificate grant_;
+    const Moment now_;
+    const Moment lasting_;
+};
+
+}  // namespace fleet

@@ -1,0 +1,108 @@
+#include "fleet/operator/orders/renewed_orders.h"
+
+#include <algorithm>
+#include <nlohmann/json.hpp>
+#include <set>
+
+#include "ctl/client/failure.h"
+#include "fleet/bus/messages/document.h"
+#include "fleet/operator/centre/answers.h"
+
+using nlohmann::json;
+
+namespace fleet {
+namespace {
+
+bool isEverything(const std::vector<std::string>& patterns) {
+    return std::find(patterns.begin(), patterns.end(), "*") != patterns.end();
+}
+
+/// Whether a holder of this certificate may put an order of their own in the place of another's.
+bool mayTakeOver(const Certificate& grant) {
+    return isEverything(grant.commands) && isEverything(grant.products) && grant.selector == "*";
+}
+
+void insistOn(bool holds, const std::string& otherwise) {
+    if (!holds) throw MessageError(otherwise);
+}
+
+/// Whoever has signed it: this operator, or another one of the fleet.
+void checkSigner(const SignedOrder& read, const OperatorIdentity& identity) {
+    if (isSignedByOperator(read, identity.key.publicKey())) return;
+    insistOn(mayTakeOver(identity.grant()), "it is another operator's");
+    const Certificate other = readCertificate(read.certificate, identity.root, identity.fleet);
+    insistOn(other.holder == Certificate::Holder::Operator && isSignedByOperator(read, other.key),
+             "no operator of the fleet has signed it");
+}
+
+void checkWork(const Order& order, const json& listed, const json& rollout,
+               const OperatorIdentity& identity) {
+    insistOn(order.fleet == identity.fleet, "it is for another fleet");
+    insistOn(order.host == memberText(listed, "host"), "it is for another host");
+    insistOn(order.id == memberText(listed, "order"), "it is another order");
+    insistOn(order.kind == memberText(rollout, "kind") && order.kind != kCancel,
+             "it is of another kind than the roll-out");
+    insistOn(order.selector == memberText(rollout, "selector"),
+             "it has another selector than the roll-out");
+    insistOn(memberText(readDocument(order.body), "product") == memberText(rollout, "product"),
+             "it is for another product than the roll-out");
+}
+
+/// The order that a member of the list holds. Throws MessageError.
+Order checkedOrder(const json& listed, const json& rollout, const OperatorIdentity& identity) {
+    const std::string bytes = bytesOfBase64(textIn(listed, "signed"));
+    const SignedOrder read = readOrder(bytes);
+    checkSigner(read, identity);
+    checkWork(read.order, listed, rollout, identity);
+    return read.order;
+}
+
+/// What the orders have in common, and must: all but what is sealed for each host.
+json openPartOf(const Order& order) {
+    json body = readDocument(order.body);
+    body.erase("sealed");
+    return body;
+}
+
+}  // namespace
+
+const char* nameOf(Renewal renewal) {
+    switch (renewal) {
+        case Renewal::Resume:
+            return "resume";
+        case Renewal::Abort:
+            return "abort";
+        case Renewal::RetryFailed:
+            return "retry-failed";
+    }
+    return "";
+}
+
+std::vector<std::string> renewedOrders(const json& toSign, const json& rollout, Renewal renewal,
+                                       const OperatorIdentity& identity, const OrderMaker& maker) {
+    const bool isAbort = renewal == Renewal::Abort;
+    std::vector<std::string> orders;
+    std::set<std::string> hosts;
+    json common;
+    for (const json& listed : memberList(toSign, "hosts")) {
+        try {
+            const Order order = checkedOrder(listed, rollout, identity);
+            const json open = openPartOf(order);
+            if (common.is_null()) common = open;
+            insistOn(open == common, "it is not the same work as the others");
+            insistOn(hosts.insert(order.host).second, "there is another one for the same host");
+            if (orders.empty()) {
+                maker.insistThatAllowed(isAbort ? kCancel : order.kind,
+                                        isAbort ? "" : memberText(open, "product"));
+            }
+            orders.push_back(isAbort ? maker.cancelOf(order) : maker.again(order));
+        } catch (const MessageError& error) {
+            throw ctl::Failure(
+                ctl::kHostReportedFailure,
+                "the centre lists an order that is not signed anew: " + std::string(error.what()));
+        }
+    }
+    return orders;
+}
+
+}  // namespace fleet

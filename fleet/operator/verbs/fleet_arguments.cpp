@@ -1,0 +1,79 @@
+#include "fleet/operator/verbs/fleet_arguments.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdlib>
+#include <string>
+#include <utility>
+
+#include "ctl/client/failure.h"
+#include "ctl/show/printable.h"
+
+namespace fleet {
+namespace {
+
+constexpr std::array<std::pair<char, int>, 4> kUnits = {
+    {{'s', 1}, {'m', 60}, {'h', 3600}, {'d', 86400}}};
+constexpr std::size_t kMostDigits = 8;
+constexpr Moment kLongestTime = std::chrono::hours(24 * 365);
+
+constexpr const ctl::Argument* kOfRollouts[] = {&kOn,   &kWaves,    &kMaxFailures, &kPause,
+                                                &kWait, &kParallel, &kDryRun};
+/// What only makes sense for one host: orders have identifiers of their own, and each host sees an
+/// install to its end by itself.
+constexpr const char* kOfOneHost[] = {"--transid", "--once", "--complete"};
+/// The verbs that sign orders anew.
+constexpr const char* kRenewals[] = {"rollout resume", "rollout abort", "rollout retry-failed"};
+
+ctl::Failure misplaced(const ctl::Verb& verb, const std::string& option) {
+    return {ctl::kWrongUsage, std::string(verb.name) + " does not go with " + option};
+}
+
+bool isRenewal(const ctl::Verb& verb) {
+    return std::find(std::begin(kRenewals), std::end(kRenewals), std::string(verb.name)) !=
+           std::end(kRenewals);
+}
+
+}  // namespace
+
+Moment timeOf(const ctl::Values& given, const ctl::Argument& option) {
+    std::string digits = given.text(option);
+    const ctl::Failure wrong(ctl::kWrongUsage, std::string(option.name) + ": \"" +
+                                                   ctl::printable(digits) +
+                                                   "\" is no time such as 60s, 10m, 24h or 7d");
+    int unit = 1;
+    for (const auto& [letter, seconds] : kUnits) {
+        if (digits.empty() || digits.back() != letter) continue;
+        unit = seconds;
+        digits.pop_back();
+        break;
+    }
+    if (digits.empty() || digits.size() > kMostDigits ||
+        digits.find_first_not_of("0123456789") != std::string::npos) {
+        throw wrong;
+    }
+    const Moment time = std::chrono::seconds(std::strtoll(digits.c_str(), nullptr, 10) * unit);
+    if (time > kLongestTime) throw wrong;
+    return time;
+}
+
+void insistOnMeaning(const ctl::Verb& verb, const ctl::Values& given) {
+    if (verb.requestOf == nullptr) {
+        for (const ctl::Argument* const option : kOfRollouts) {
+            if (given.has(*option)) throw misplaced(verb, option->name);
+        }
+        if (given.has(kExpires) && !isRenewal(verb)) throw misplaced(verb, kExpires.name);
+        return;
+    }
+    if (given.text(kOn).empty()) {
+        throw ctl::Failure(ctl::kWrongUsage, "--on is missing: it says which hosts are meant",
+                           "--on '*' means all of them.");
+    }
+    for (const ctl::Argument& argument : verb.arguments) {
+        const bool isOfOne = std::find(std::begin(kOfOneHost), std::end(kOfOneHost),
+                                       std::string(argument.name)) != std::end(kOfOneHost);
+        if (isOfOne && given.has(argument)) throw misplaced(verb, argument.name);
+    }
+}
+
+}  // namespace fleet

@@ -1,0 +1,32 @@
+#include "fleet/operator/verbs/fleet_verbs.h"
+
+#include "ctl/verbs/verb_table.h"
+#include "fleet/operator/verbs/fleet_arguments.h"
+
+namespace fleet {
+namespace {
+
+constexpr ctl::VerbGroup kFleetGroups[] = {
+    {"hosts", "List the hosts of a fleet, or show one"},
+    {"rollout", "Look at roll-outs, stop them, and let them go on"},
+    {"config", "Change an agent's configuration on many hosts"},
+};
+
+}  // namespace
+
+const ctl::Vocabulary& fleetVocabulary() {
+    static const ctl::Vocabulary vocabulary{
+        "Manages the monitoring agents of many hosts: a fleet",
+        kFleetArguments,
+        {&ctl::kStartVerb,     &ctl::kStopVerb,          &ctl::kRestartVerb,
+         &ctl::kInstallVerb,   &ctl::kUninstallVerb,     &ctl::kRemoveInstanceVerb,
+         &ctl::kConfigSetVerb, &ctl::kUaConfigVerb,      &kHostsVerb,
+         &kHostsShowVerb,      &kRolloutLsVerb,          &kRolloutShowVerb,
+         &kRolloutWatchVerb,   &kRolloutPauseVerb,       &kRolloutResumeVerb,
+         &kRolloutAbortVerb,   &kRolloutRetryFailedVerb, &kLoginVerb,
+         &kFleetWhoamiVerb,    &kFleetVersionVerb,       &kFleetHelpVerb},
+        {&kFleetGroups[0], &kFleetGroups[1], &kFleetGroups[2]}};
+    return vocabulary;
+}
+
+}  // namespace fleet

@@ -1,0 +1,147 @@
+#include "fleet/operator/verbs/rollout_renewal.h"
+
+#include <chrono>
+#include <nlohmann/json.hpp>
+#include <utility>
+#include <vector>
+
+#include "ctl/client/failure.h"
+#include "ctl/verbs/invocation.h"
+#include "fleet/operator/centre/answers.h"
+#include "fleet/operator/orders/order_batch.h"
+#include "fleet/operator/rollouts/rollout_page.h"
+#include "fleet/operator/verbs/fleet_arguments.h"
+#include "fleet/operator/verbs/fleet_verbs.h"
+#include "fleet/operator/verbs/operator_side.h"
+#include "fleet/operator/verbs/rollout_argument.h"
+
+using nlohmann::json;
+
+namespace fleet {
+namespace {
+
+constexpr ctl::Argument kUnknownToo =
+    ctl::flag("--force", "Try again also where nobody knows whether it ran: it may run twice");
+constexpr ctl::Argument kRenewedRollout[] = {kRollout};
+constexpr ctl::Argument kRetriedRollout[] = {kRollout, kUnknownToo};
+
+/// The orders that the roll-out wants, signed.
+std::vector<std::string> wantedOrders(Centre& centre, const std::string& id, Renewal renewal,
+                                      bool isForced, const OperatorIdentity& identity,
+                                      const OrderMaker& maker) {
+    const json rollout = centre.get(rolloutTarget(id));
+    const json toSign = centre.get(rolloutTarget(id) + "/to-sign?for=" + nameOf(renewal) +
+                                   (isForced ? "&force=1" : ""));
+    return renewedOrders(toSign, rollout, renewal, identity, maker);
+}
+
+json handOver(Centre& centre, const std::string& id, Renewal renewal, bool isForced,
+              const std::vector<std::string>& orders) {
+    json body = json::object();
+    if (orders.empty())
+        body["orders"] = json::array();
+    else
+        body["batch"] = sendOrders(centre, orders);
+    if (isForced) body["force"] = true;
+    return centre.post(rolloutTarget(id) + "/" + nameOf(renewal), body);
+}
+
+RenewalResult abortRollout(Centre& centre, const std::string& id, const OperatorIdentity& identity,
+                           const OrderMaker& maker) {
+    RenewalResult result{handOver(centre, id, Renewal::Abort, false, {}), 0, ""};
+    try {
+        const std::vector<std::string> cancels =
+            wantedOrders(centre, id, Renewal::Abort, false, identity, maker);
+        if (cancels.empty()) return result;
+        result.rollout = handOver(centre, id, Renewal::Abort, false, cancels);
+        result.orders = cancels.size();
+    } catch (const ctl::Failure& failure) {
+        result.note = "nothing more is released, but hosts that have their orders keep them: " +
+                      std::string(failure.what());
+    }
+    return result;
+}
+
+ctl::ExitStatus runRenewal(const ctl::Invocation& invocation, Renewal renewal, bool isForced) {
+    OperatorSide side(invocation);
+    const OrderMaker maker(
+        side.identity,
+        std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch()),
+        timeOf(invocation.given, kExpires));
+    const RenewalResult result = renewRollout(side.centre, rolloutIn(invocation.given), renewal,
+                                              isForced, side.identity, maker);
+    return ctl::print(showRenewal(result, renewal, invocation.format));
+}
+
+ctl::ExitStatus runResume(const ctl::Invocation& invocation) {
+    return runRenewal(invocation, Renewal::Resume, false);
+}
+
+ctl::ExitStatus runAbort(const ctl::Invocation& invocation) {
+    return runRenewal(invocation, Renewal::Abort, false);
+}
+
+ctl::ExitStatus runRetryFailed(const ctl::Invocation& invocation) {
+    return runRenewal(invocation, Renewal::RetryFailed, invocation.given.flag(kUnknownToo));
+}
+
+std::string signedText(std::size_t orders, Renewal renewal) {
+    if (orders == 0) return {};
+    const bool isOne = orders == 1;
+    return std::to_string(orders) + (isOne ? " order was" : " orders were") + " signed" +
+           (renewal == Renewal::Abort ? (isOne ? " that cancels another" : " that cancel others")
+                                      : " anew") +
+           ".\n";
+}
+
+}  // namespace
+
+constexpr ctl::Verb kRolloutResumeVerb = {
+    "rollout resume",
+    "Let a roll-out go on that is paused; what has expired is signed anew",
+    kRenewedRollout,
+    {"zavctl --fleet https://centre.example rollout resume ID",
+     "zavctl --fleet https://centre.example --expires 2h rollout resume ID"},
+    runResume,
+};
+
+constexpr ctl::Verb kRolloutAbortVerb = {
+    "rollout abort",
+    "End a roll-out, and cancel what hosts have not done yet",
+    kRenewedRollout,
+    {"zavctl --fleet https://centre.example rollout abort ID",
+     "zavctl --fleet https://centre.example --json rollout abort ID"},
+    runAbort,
+};
+
+constexpr ctl::Verb kRolloutRetryFailedVerb = {
+    "rollout retry-failed",
+    "Try again on the hosts where it failed",
+    kRetriedRollout,
+    {"zavctl --fleet https://centre.example rollout retry-failed ID",
+     "zavctl --fleet https://centre.example rollout retry-failed ID --force"},
+    runRetryFailed,
+};
+
+RenewalResult renewRollout(Centre& centre, const std::string& id, Renewal renewal, bool isForced,
+                           const OperatorIdentity& identity, const OrderMaker& maker) {
+    if (renewal == Renewal::Abort) return abortRollout(centre, id, identity, maker);
+    const std::vector<std::string> orders =
+        wantedOrders(centre, id, renewal, isForced, identity, maker);
+    if (renewal == Renewal::RetryFailed && orders.empty()) {
+        throw ctl::Failure(ctl::kHostReportedFailure, "there is nothing to try again");
+    }
+    return {handOver(centre, id, renewal, isForced, orders), orders.size(), ""};
+}
+
+ctl::Page showRenewal(const RenewalResult& result, Renewal renewal, ctl::Format format) {
+    ctl::Page page = showChanged(result.rollout, format);
+    if (!result.note.empty()) {
+        page.err = ctl::complaint(result.note);
+        page.status = ctl::kHostReportedFailure;
+    }
+    if (format == ctl::Format::Text) page.out = signedText(result.orders, renewal) + page.out;
+    return page;
+}
+
+}  // namespace fleet

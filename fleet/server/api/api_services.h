@@ -1,0 +1,97 @@
+/// What the endpoints of the centre's interface work with.
+#pragma once
+
+#include <chrono>
+#include <future>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <stdexcept>
+#include <string>
+#include <utility>
+
+#include "fleet/server/api/sessions/batches.h"
+#include "fleet/server/api/sessions/sessions.h"
+#include "fleet/server/keys/trust/members.h"
+#include "fleet/server/keys/trust/operators.h"
+#include "fleet/server/service/centre_service.h"
+
+namespace fleet {
+
+/// The centre cannot do it now; what() is for the operator.
+class Unavailable : public std::runtime_error {
+public:
+    using std::runtime_error::runtime_error;
+};
+
+/// Made once, and shared by all requests. Any thread. The service outlives it.
+class ApiServices {
+public:
+    /// How long a request waits for the centre's thread.
+    static constexpr std::chrono::seconds kPatience{25};
+
+    /// Throws KeysError and sqlite::DatabaseError.
+    explicit ApiServices(CentreService& service)
+        : directory(service.directory()),
+          facts(directory.facts()),
+          service_(service),
+          trust_(directory.trustDatabase()),
+          members_(trust_.connection()) {}
+
+    const FleetDirectory directory;
+    const FleetFacts facts;
+    Sessions sessions;
+    Batches batches;
+
+    bool isWorking() const { return service_.centre().isWorking(); }
+
+    /// What `act` returns, which gets a CentreDesk and runs on the centre's thread as one
+    /// transaction. Throws Unavailable, or what it throws. After a wait that was too long, what it
+    /// does may still be done.
+    template <typename Act>
+    auto ask(Act act) {
+        if (!isWorking()) {
+            throw Unavailable(
+                "the centre does not work now: it waits for the bus, or for another centre to end");
+        }
+        auto answer = service_.ask(std::move(act));
+        if (answer.wait_for(kPatience) != std::future_status::ready) {
+            throw Unavailable("the centre is too busy");
+        }
+        try {
+            return answer.get();
+        } catch (const std::future_error&) {
+            throw Unavailable("the centre is about to end");
+        }
+    }
+
+    /// What `act` returns, which gets the connection to the database of who may take part.
+    template <typename Act>
+    auto withTrust(Act act) {
+        const std::lock_guard lock(mutex_);
+        return act(trust_.connection());
+    }
+
+    /// The hosts of the fleet.
+    std::shared_ptr<const Members> members() {
+        const std::lock_guard lock(mutex_);
+        return members_.current();
+    }
+    bool label(const std::string& host, const Labels& labels) {
+        const std::lock_guard lock(mutex_);
+        return members_.label(host, labels);
+    }
+
+    static Moment now() {
+        return std::chrono::duration_cast<Moment>(
+            std::chrono::system_clock::now().time_since_epoch());
+    }
+
+private:
+    CentreService& service_;
+    std::mutex mutex_;  ///< for both below
+    TrustDatabase trust_;
+    MemberList members_;
+};
+
+}  // namespace fleet
