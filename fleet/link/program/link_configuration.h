@@ -39,4 +39,7 @@ struct LinkConfiguration {
 /// one, keys that are none, an address without encryption that leaves this machine.
 LinkConfiguration parseLinkConfiguration(const std::string& text, const std::string& path);
 
+/// The text of such a file.
+std::string linkConfigurationText(const LinkConfiguration& configuration);
+
 }  // namespace fleet

@@ -105,4 +105,29 @@ TEST_F(LinksConfiguration, NothingLeavesTheMachineUnencrypted) {
     EXPECT_EQ(refusal(with("bus", "bus = [\"nats://127.0.0.1:4222\"]")), "");
 }
 
+TEST_F(LinksConfiguration, IsReadAsItWasWritten) {
+    LinkConfiguration written;
+    written.fleet = "example";
+    written.name = "a \"quoted\" \\ name\twith\x01 and \xc3\xa4";
+    written.bus = {"tls://a.example:4222", "tls://b.example:4222"};
+    written.ca = "/etc/zavlink/ca.pem";
+    written.serverName = "bus.example";
+    written.root = root;
+    written.centres = {centre, KeyPair::make(KeyKind::User).publicKey()};
+    written.state = "/var/lib/zavlink";
+    written.labels = {{"env", "test"}, {"a b.c", "1=2"}};
+    const LinkConfiguration read =
+        fleet::parseLinkConfiguration(fleet::linkConfigurationText(written), "zavlink.toml");
+    EXPECT_EQ(read.fleet, written.fleet);
+    EXPECT_EQ(read.name, written.name);
+    EXPECT_EQ(read.bus, written.bus);
+    EXPECT_EQ(read.ca, written.ca);
+    EXPECT_EQ(read.serverName, written.serverName);
+    EXPECT_EQ(read.root, written.root);
+    EXPECT_EQ(read.centres, written.centres);
+    EXPECT_EQ(read.hostSocket, written.hostSocket);
+    EXPECT_EQ(read.state, written.state);
+    EXPECT_EQ(read.labels, written.labels);
+}
+
 }  // namespace
