@@ -70,6 +70,7 @@ void fill(Directive& directive, const NumberedOrder& numbered, const Trust& trus
     directive.issued = order.issued;
     directive.expires = order.expires;
     directive.allowedUntil = certificate.until;
+    directive.files = order.files;
     directive.hasFiles = !order.files.empty();
     json body = openBody(order, key);
     refuseUnless(allows(certificate, order.kind, productIn(body)),
@@ -82,6 +83,10 @@ void fill(Directive& directive, const NumberedOrder& numbered, const Trust& trus
         refuseUnless(isOrderId(directive.cancels), "what is to be cancelled is no order");
         return;
     }
+    for (const OrderFile& file : order.files)
+        refuseUnless(isDepotPath(file.path), "one of the files would not lie in the depot");
+    directive.onlyBringsFiles = order.kind == kPush;
+    refuseUnless(!directive.onlyBringsFiles || directive.hasFiles, "the order brings no file");
     body["command"] = order.kind;
     directive.request = textOf(body);
 }

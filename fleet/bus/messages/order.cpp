@@ -61,6 +61,20 @@ bool isOrderId(std::string_view text) {
     return isHexadecimal(text, kIdDigits);
 }
 
+bool isDepotPath(std::string_view path) {
+    constexpr std::size_t kLongestPath = 255;
+    if (path.empty() || path.size() > kLongestPath) return false;
+    const auto isOdd = [](char c) { return static_cast<unsigned char>(c) < ' ' || c == '\\'; };
+    if (std::any_of(path.begin(), path.end(), isOdd)) return false;
+    for (std::size_t begin = 0; begin <= path.size();) {
+        const std::size_t end = std::min(path.find('/', begin), path.size());
+        const std::string_view name = path.substr(begin, end - begin);
+        if (name.empty() || name == "." || name == "..") return false;
+        begin = end + 1;
+    }
+    return true;
+}
+
 std::string makeOrderId() {
     if (sodium_init() < 0) throw MessageError("libsodium cannot be used");
     std::array<unsigned char, kIdDigits / 2> bits{};

@@ -33,6 +33,13 @@ struct Order {
 /// The kind of an order that cancels another one, whose identifier its body names as "order".
 constexpr const char* kCancel = "CANCEL";
 
+/// The kind of an order that only brings files into the host's depot.
+constexpr const char* kPush = "PUSH";
+
+/// Whether a file of an order may have this path: names joined by "/", none of them empty, "." or
+/// "..", without control characters and backslashes.
+bool isDepotPath(std::string_view path);
+
 /// An order may wait so long at most.
 constexpr Moment kLongestOrder{7LL * 24 * 60 * 60 * 1000};
 

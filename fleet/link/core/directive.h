@@ -2,7 +2,9 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
+#include "fleet/bus/messages/order.h"
 #include "fleet/bus/messages/values.h"
 
 namespace fleet {
@@ -12,6 +14,8 @@ struct Directive {
     std::string order;    ///< its identifier, and the TRANSID of the host's task
     std::string cancels;  ///< the order that this one cancels; "" for all other kinds
     bool hasFiles = false;
+    bool onlyBringsFiles = false;  ///< it is done when they lie where they belong
+    std::vector<OrderFile> files;
     std::string signer;  ///< the operator's signing key
     Moment issued{};
     Moment expires{};

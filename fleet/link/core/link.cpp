@@ -320,6 +320,11 @@ void Link::handOver(const Directive& directive, Actions& out) {
         out.push_back(PrepareFiles{directive});
         return;
     }
+    if (directive.onlyBringsFiles) {
+        const std::size_t count = directive.files.size();
+        const std::string what = count == 1 ? "1 file is" : std::to_string(count) + " files are";
+        return enter(directive, {"done", what + " in the depot"}, out);
+    }
     busy_ = directive;
     isEntering_ = false;
     endedMeanwhile_.clear();

@@ -48,6 +48,7 @@ void adoptAnswer(LinkConfiguration& configuration, const Invitation& invitation,
     configuration.name = answer.name;
     configuration.bus = answer.busUrls;
     configuration.serverName = answer.serverName;
+    configuration.url = invitation.url;
     if (std::any_of(answer.name.begin(), answer.name.end(),
                     [](unsigned char c) { return std::iscntrl(c) != 0; })) {
         throw EnrolError("the centre's answer has a name that is none");

@@ -12,6 +12,7 @@
 
 #include "fleet/bus/accounts/nkey.h"
 #include "fleet/files/file_error.h"
+#include "fleet/https/client/server_url.h"
 
 namespace fleet {
 namespace {
@@ -111,6 +112,15 @@ constexpr Member kMembers[] = {
      }},
     {"ca", false, readText<&LinkConfiguration::ca>},
     {"server-name", false, readText<&LinkConfiguration::serverName>},
+    {"url", false,
+     [](const toml::node& value, const Place& place, LinkConfiguration& into) {
+         into.url = textOf(value, place);
+         try {
+             readServerUrl(into.url);
+         } catch (const UrlError& error) {
+             place.refuse(std::string("must be the centre's URL: ") + error.what());
+         }
+     }},
     {"root", true,
      [](const toml::node& value, const Place& place, LinkConfiguration& into) {
          into.root = checkedKey(textOf(value, place), place, KeyKind::Operator);
@@ -144,6 +154,9 @@ toml::table parsed(const std::string& text, const std::string& path) {
 }
 
 void insistOnTrust(const LinkConfiguration& read, const std::string& path) {
+    if (!read.url.empty() && read.ca.empty()) {
+        throw FileError(path + ": \"ca\" is missing, the file with whom to trust");
+    }
     for (const std::string& address : read.bus) {
         if (address.rfind("tls://", 0) != 0) continue;
         if (read.ca.empty())

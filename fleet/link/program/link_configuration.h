@@ -15,6 +15,7 @@ namespace fleet {
 ///   bus         = ["tls://bus.example:4222"]
 ///   ca          = "/etc/zavlink/ca.pem"
 ///   server-name = "bus.example"
+///   url         = "https://centre.example:8443"
 ///   root        = "O..."
 ///   centre      = ["U..."]
 ///   host-socket = "/run/zavhost/zavhost.sock"
@@ -27,6 +28,7 @@ struct LinkConfiguration {
     std::vector<std::string> bus;                  ///< addresses of the bus's servers
     std::string ca;                                ///< a file with whom to trust as a server; ""
     std::string serverName;                        ///< that the server's certificate must have
+    std::string url;                               ///< of the centre, by HTTPS; "": no files come
     std::string root;                              ///< the public key that certifies operators
     std::vector<std::string> centres;              ///< the centre's signing keys
     std::string hostSocket = "/run/zavhost.sock";  ///< where the host is asked

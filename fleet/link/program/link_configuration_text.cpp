@@ -45,8 +45,8 @@ std::string linkConfigurationText(const LinkConfiguration& configuration) {
     std::string text =
         lineWith("fleet", configuration.fleet) + lineWith("name", configuration.name) +
         "bus = " + listed(configuration.bus) + '\n' + lineWith("ca", configuration.ca) +
-        lineWith("server-name", configuration.serverName) + lineWith("root", configuration.root) +
-        "centre = " + listed(configuration.centres) + '\n' +
+        lineWith("server-name", configuration.serverName) + lineWith("url", configuration.url) +
+        lineWith("root", configuration.root) + "centre = " + listed(configuration.centres) + '\n' +
         lineWith("host-socket", configuration.hostSocket) + lineWith("state", configuration.state);
     if (!configuration.labels.empty()) text += "\n[labels]\n";
     for (const auto& [name, value] : configuration.labels)

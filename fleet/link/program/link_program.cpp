@@ -8,6 +8,7 @@
 
 #include "fleet/bus/accounts/fleet_accounts.h"
 #include "fleet/bus/messages/order.h"
+#include "fleet/files/files.h"
 #include "fleet/link/program/machine.h"
 #include "fleet/log/log.h"
 
@@ -26,6 +27,7 @@ Moment drawnPause() {
 
 LinkProgram::LinkProgram(const LinkConfiguration& configuration)
     : file_(configuration.state), latest_(file_.kept().latest), link_(settings(), file_.kept()) {
+    files_ = std::make_unique<FileSide>(fileSettings(configuration));
     bus_ = std::make_unique<BusSide>(busOptions(configuration), trust(configuration), file_.bus(),
                                      file_.signing(), busEvents());
     host_ = std::make_unique<HostSide>(configuration.hostSocket, hostEvents());
@@ -35,6 +37,7 @@ LinkProgram::~LinkProgram() {
     // Each of them may still put letters into the mailbox, and nothing else.
     host_.reset();
     bus_.reset();
+    files_.reset();
 }
 
 ConnectionOptions LinkProgram::busOptions(const LinkConfiguration& configuration) const {
@@ -70,6 +73,16 @@ Moment LinkProgram::now() {
     latest_ = std::max(wall, latest_ + passed);
     latestAt_ = steady;
     return latest_;
+}
+
+FileSideSettings LinkProgram::fileSettings(const LinkConfiguration& configuration) const {
+    FileSideSettings settings{{configuration.fleet, configuration.url, "", file_.signing()},
+                              configuration.state + "/spool",
+                              configuration.hostSocket};
+    if (!configuration.url.empty()) {
+        settings.source.authority = readFile(configuration.ca, Secrecy::Public);
+    }
+    return settings;
 }
 
 LinkSettings LinkProgram::settings() const {
@@ -134,6 +147,7 @@ BusSide::Events LinkProgram::busEvents() {
         });
     };
     events.read = [this](Number number, Directive directive) {
+        if (directive.refusal.empty() && directive.hasFiles) files_->fetchAhead(directive);
         tell([number, directive = std::move(directive)](Link& link, Moment at) {
             return link.read(number, directive, at);
         });
@@ -189,8 +203,9 @@ void LinkProgram::apply(const ReadOrder& action) {
 }
 
 void LinkProgram::apply(const PrepareFiles& action) {
-    tell([number = action.directive.number](Link& link, Moment at) {
-        return link.prepared(number, Unacceptable{"this link does not bring files"}, at);
+    files_->prepare(action.directive, [this, number = action.directive.number](
+                                          const PrepareAnswer& answer) {
+        tell([number, answer](Link& link, Moment at) { return link.prepared(number, answer, at); });
     });
 }
 

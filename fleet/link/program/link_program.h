@@ -9,6 +9,7 @@
 #include <string>
 
 #include "fleet/link/core/link.h"
+#include "fleet/link/files/file_side.h"
 #include "fleet/link/program/bus_side.h"
 #include "fleet/link/program/host_side.h"
 #include "fleet/link/program/link_configuration.h"
@@ -47,6 +48,7 @@ private:
     ConnectionOptions busOptions(const LinkConfiguration& configuration) const;
     Trust trust(const LinkConfiguration& configuration) const;
     LinkSettings settings() const;
+    FileSideSettings fileSettings(const LinkConfiguration& configuration) const;
     HostSide::Events hostEvents();
     BusSide::Events busEvents();
 
@@ -77,6 +79,7 @@ private:
     std::string blocked_;  ///< what was last said of it
     std::optional<End> end_;
     // They end first: their threads use everything above.
+    std::unique_ptr<FileSide> files_;  ///< the bus's threads use it, too
     std::unique_ptr<BusSide> bus_;
     std::unique_ptr<HostSide> host_;
 };

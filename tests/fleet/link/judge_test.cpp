@@ -242,6 +242,23 @@ TEST_F(JudgeTest, AnOrderWithFilesSaysSo) {
     expectRefusal("sum");
 }
 
+TEST_F(JudgeTest, AFileThatWouldLeaveTheDepotIsRefused) {
+    for (const char* const path :
+         {"/etc/passwd", "../x", "a/../x", "a//b", "a/", "", ".", "a\\b", "a\nb"}) {
+        order_.files = {{path, std::string(64, 'a'), 12}};
+        expectRefusal("depot");
+    }
+}
+
+TEST_F(JudgeTest, AnOrderThatOnlyBringsFilesHasSome) {
+    order_.kind = fleet::kPush;
+    order_.body = "{}";
+    certificate_.commands = {"PUSH"};
+    expectRefusal("brings no file");
+    order_.files = {{"ux.tar", std::string(64, 'a'), 12}};
+    EXPECT_TRUE(judged(numbered(orderBytes()))->onlyBringsFiles);
+}
+
 TEST_F(JudgeTest, TextsThatAreNestedDeepAreRefused) {
     std::string deep = "{\"product\":\"ux\",\"x\":";
     for (int i = 0; i < 100'000; ++i)

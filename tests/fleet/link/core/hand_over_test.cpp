@@ -136,6 +136,18 @@ TEST(HandingOver, PlacesFilesOnlyWhenAllBeforeAreOver) {
     EXPECT_EQ(driver.count<HandOver>(), 2U);
 }
 
+TEST(HandingOver, AnOrderThatOnlyBringsFilesIsDoneWhenTheyAreThere) {
+    Directive push = directive(1);
+    push.hasFiles = push.onlyBringsFiles = true;
+    push.files = {{"ux.tar", std::string(64, 'a'), 7}};
+    LinkDriver driver = linkWith({push});
+    ASSERT_EQ(driver.count<PrepareFiles>(), 1U);
+    EXPECT_EQ(driver.count<EnterEnd>(), 0U);
+    driver.note(driver.link().prepared(1, fleet::FilesPlaced{}, kNow));
+    EXPECT_EQ(driver.count<HandOver>(), 0U);
+    expectEnd(driver, "done", "1 file is in the depot");
+}
+
 TEST(HandingOver, FilesThatNeverComeEndTheOrder) {
     Directive withFiles = directive(1);
     withFiles.hasFiles = true;

@@ -1,0 +1,62 @@
+#include "fleet/link/files/file_side.h"
+
+#include <exception>
+#include <utility>
+
+#include "fleet/log/log.h"
+
+namespace fleet {
+namespace {
+
+Moment wallNow() {
+    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+}
+
+}  // namespace
+
+FileSide::FileSide(FileSideSettings settings)
+    : settings_(std::move(settings)),
+      spool_(settings_.spool, wallNow()),
+      source_(settings_.source, isEnding_),
+      depot_(settings_.hostSocket) {}
+
+FileSide::~FileSide() {
+    isEnding_ = true;
+    worker_.await();
+}
+
+void FileSide::fetchAhead(const Directive& directive) {
+    worker_.add([this, directive] {
+        try {
+            for (const OrderFile& file : directive.files)
+                source_.fetch(file, spool_);
+        } catch (const std::exception& error) {
+            say(Priority::Info, "order " + std::to_string(directive.number) +
+                                    ": its files do not come yet: " + error.what());
+        }
+    });
+}
+
+void FileSide::prepare(const Directive& directive, std::function<void(PrepareAnswer)> answer) {
+    worker_.add([this, directive, answer = std::move(answer)] {
+        PrepareAnswer told = prepared(directive);
+        if (!isEnding_) answer(std::move(told));
+    });
+}
+
+PrepareAnswer FileSide::prepared(const Directive& directive) {
+    try {
+        for (const OrderFile& file : directive.files)
+            source_.fetch(file, spool_);
+        PrepareAnswer answer = depot_.place(directive.files, spool_);
+        if (std::holds_alternative<NotNow>(answer)) return answer;
+        for (const OrderFile& file : directive.files)
+            spool_.forget(file.sha256);
+        return answer;
+    } catch (const std::exception& error) {
+        // The centre, the network or the disk: none of them says anything about the order.
+        return NotNow{error.what()};
+    }
+}
+
+}  // namespace fleet

@@ -1,0 +1,92 @@
+#include "fleet/link/files/spool.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <filesystem>
+#include <system_error>
+#include <utility>
+
+#include "fleet/bus/trust/checksum.h"
+#include "fleet/files/descriptor.h"
+#include "fleet/files/file_error.h"
+
+namespace fs = std::filesystem;
+
+namespace fleet {
+namespace {
+
+/// No order waits for longer.
+constexpr Moment kKept = std::chrono::hours(24 * 8);
+
+[[noreturn]] void failOn(const std::string& path) {
+    throw FileError(path + ": " + std::generic_category().message(errno));
+}
+
+bool isFile(const std::string& path) {
+    struct stat found {};
+    return ::lstat(path.c_str(), &found) == 0 && S_ISREG(found.st_mode);
+}
+
+}  // namespace
+
+Spool::Spool(std::string directory, Moment now) : directory_(std::move(directory)) {
+    if (::mkdir(directory_.c_str(), 0700) != 0 && errno != EEXIST) failOn(directory_);
+    forgetOld(now);
+}
+
+bool Spool::has(const std::string& sum) const {
+    return isFile(pathOf(sum));
+}
+
+std::uint64_t Spool::partOf(const std::string& sum) const {
+    struct stat found {};
+    if (::lstat(partPath(sum).c_str(), &found) != 0 || !S_ISREG(found.st_mode)) return 0;
+    return static_cast<std::uint64_t>(found.st_size);
+}
+
+void Spool::append(const std::string& sum, std::string_view piece) {
+    const std::string path = partPath(sum);
+    const Descriptor part(
+        ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (!part) failOn(path);
+    while (!piece.empty()) {
+        const ssize_t put = ::write(part.get(), piece.data(), piece.size());
+        if (put < 0 && errno == EINTR) continue;
+        if (put < 0) failOn(path);
+        piece.remove_prefix(static_cast<std::size_t>(put));
+    }
+}
+
+bool Spool::complete(const std::string& sum) {
+    const std::string path = partPath(sum);
+    const Descriptor part(::open(path.c_str(), O_RDONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (!part) failOn(path);
+    if (checksumOfFile(part.get()) != sum) {
+        static_cast<void>(::unlink(path.c_str()));
+        return false;
+    }
+    if (std::rename(path.c_str(), pathOf(sum).c_str()) != 0) failOn(path);
+    return true;
+}
+
+void Spool::forget(const std::string& sum) {
+    static_cast<void>(::unlink(pathOf(sum).c_str()));
+    static_cast<void>(::unlink(partPath(sum).c_str()));
+}
+
+void Spool::forgetOld(Moment now) const {
+    std::error_code error;
+    for (const auto& entry : fs::directory_iterator(directory_, error)) {
+        struct stat found {};
+        if (::lstat(entry.path().c_str(), &found) != 0) continue;
+        if (now - std::chrono::seconds(found.st_mtim.tv_sec) > kKept) {
+            static_cast<void>(::unlink(entry.path().c_str()));
+        }
+    }
+}
+
+}  // namespace fleet
