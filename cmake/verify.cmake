@@ -105,11 +105,11 @@ zav_verify(shared LIBRARIES zav_http zav_metrics zav_database
 
 set(fleet_libraries "")
 if(TARGET zavfleet_bus)
-  set(fleet_libraries zavfleet_bus zav_nats zav_sodium)
+  set(fleet_libraries zavfleet_bus zavfleet_https zav_nats zav_sodium)
   file(GLOB_RECURSE sources fleet/*.cpp)
   file(GLOB_RECURSE headers fleet/*.h)
   zav_verify(fleet LIBRARIES ${fleet_libraries} zavctl_client zav_database
-    DEFINITIONS ZAV_VERSION="${PROJECT_VERSION}"
+    DEFINITIONS ZAV_VERSION="${PROJECT_VERSION}" $<TARGET_PROPERTY:zav_http,COMPILE_DEFINITIONS>
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 endif()
 

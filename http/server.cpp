@@ -4,6 +4,7 @@
 #include <sys/socket.h>
 
 #include <algorithm>
+#include <boost/asio/executor_work_guard.hpp>
 #include <boost/asio/posix/stream_descriptor.hpp>
 #include <boost/asio/post.hpp>
 #include <cerrno>
@@ -74,10 +75,13 @@ struct HttpServer::Implementation {
                    const ServerLimits& limits)
         : door(std::move(clientsDoor)),
           core(handler, counts, limits),
-          listener(core.io, duplicate(listenerDescriptor)),
+          goesOn(core.io.get_executor()),
+          listener(core.io),
           signal(core.io),
           timer(core.io),
-          regular(core.io) {}
+          regular(core.io) {
+        if (listenerDescriptor >= 0) listener.assign(duplicate(listenerDescriptor));
+    }
 
     void awaitConnection();
     void acceptAll();
@@ -85,6 +89,7 @@ struct HttpServer::Implementation {
     void refuse(sys::FileDescriptor connection, const Peer& peer, unsigned status,
                 std::string_view text);
     std::shared_ptr<HttpSession> sessionOn(sys::FileDescriptor connection, const Peer& peer);
+    void closeListener();
     void beginEnd(std::chrono::milliseconds grace);
     void pollEnd();
     void pollFlush(Clock::time_point deadline);
@@ -94,6 +99,8 @@ struct HttpServer::Implementation {
 
     const Door door;
     ServerCore core;
+    /// Without a listener there may be nothing to wait for until somebody brings a connection.
+    const net::executor_work_guard<net::io_context::executor_type> goesOn;
     Descriptor listener;
     Descriptor signal;
     std::vector<std::unique_ptr<Watched>> watched;
@@ -182,14 +189,19 @@ void HttpServer::Implementation::after(std::chrono::milliseconds time, Next next
     });
 }
 
-void HttpServer::Implementation::beginEnd(std::chrono::milliseconds grace) {
-    if (core.ending) return;
-    core.ending = true;
-    deadline = Clock::now() + grace;
+void HttpServer::Implementation::closeListener() {
+    if (!listener.is_open()) return;
     // A client that connects now is refused at once instead of waiting in vain.
     if (!leavesListenerOpen) ::shutdown(listener.native_handle(), SHUT_RDWR);
     Error ignored;
     listener.close(ignored);
+}
+
+void HttpServer::Implementation::beginEnd(std::chrono::milliseconds grace) {
+    if (core.ending) return;
+    core.ending = true;
+    deadline = Clock::now() + grace;
+    closeListener();
     std::vector<std::shared_ptr<Connection>> open;
     for (const auto& entry : core.connections)
         open.push_back(entry.second);
@@ -218,7 +230,7 @@ HttpServer::HttpServer(int listener, Door door, Handler& handler, ServerCounts& 
                        const ServerLimits& limits)
     : implementation_(
           std::make_unique<Implementation>(listener, std::move(door), handler, counts, limits)) {
-    implementation_->awaitConnection();
+    if (implementation_->listener.is_open()) implementation_->awaitConnection();
 }
 
 HttpServer::~HttpServer() = default;
@@ -232,6 +244,14 @@ void HttpServer::run() {
             // Memory ran out in one connection's handler. Only that connection stops.
         }
     }
+}
+
+void HttpServer::adopt(sys::FileDescriptor connection) {
+    Implementation& implementation = *implementation_;
+    net::post(implementation.core.io,
+              [&implementation, connection = std::move(connection)]() mutable {
+                  if (!implementation.core.ending) implementation.admit(std::move(connection));
+              });
 }
 
 void HttpServer::stop() {

@@ -1,4 +1,4 @@
-/// An HTTP interface on a listening socket.
+/// An HTTP interface on a listening socket, or on connections that somebody else has accepted.
 #pragma once
 
 #include <chrono>
@@ -9,6 +9,7 @@
 #include "http/handler.h"
 #include "http/server_counts.h"
 #include "http/server_limits.h"
+#include "system/file_descriptor.h"
 
 namespace http {
 
@@ -16,8 +17,9 @@ namespace http {
 /// takes long delays nobody else. A server without connections sleeps until a client comes.
 class HttpServer {
 public:
-    /// `listener` is a non-blocking Unix socket that stays the caller's; handler and counts outlive
-    /// the server. Throws std::runtime_error.
+    /// `listener` is a non-blocking Unix socket that stays the caller's, or -1 for a server that
+    /// gets all its connections from adopt(); handler and counts outlive the server. Throws
+    /// std::runtime_error.
     HttpServer(int listener, Door door, Handler& handler, ServerCounts& counts,
                const ServerLimits& limits = {});
     ~HttpServer();
@@ -26,6 +28,10 @@ public:
 
     /// Serves on the calling thread until the server has ended or been stopped.
     void run();
+    /// Serves a client on this connected Unix stream socket, like one that the listener brought:
+    /// the door is asked about it, and the limits count it. A server that is about to end, or has
+    /// ended, closes it. Any thread. Throws std::bad_alloc; then it is closed as well.
+    void adopt(sys::FileDescriptor connection);
     /// Makes run() return as soon as it can. Any thread.
     void stop();
     /// Ends the server. It takes no connection and no request from now on. It waits until the

@@ -178,8 +178,12 @@ void HttpSession::dispatch() {
     if (core_.ending) return respond(errorReply(503, "the host is about to end"));
     try {
         Request request{std::string(view(message.method_string())),
-                        std::string(view(message.target())), std::move(message.body()), peer_,
-                        std::string(view(message["Last-Event-ID"]))};
+                        std::string(view(message.target())),
+                        std::move(message.body()),
+                        peer_,
+                        std::string(view(message["Last-Event-ID"])),
+                        std::string(view(message[wire::field::authorization])),
+                        std::string(view(message[wire::field::range]))};
         parser_.reset();
         std::variant<Answer, Job> wanted = core_.handler.handle(std::move(request));
         if (auto* const job = std::get_if<Job>(&wanted)) return submit(std::move(*job));

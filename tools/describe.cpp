@@ -3,8 +3,8 @@
 #include <cstdio>
 #include <fstream>
 
-#include "host/api/description/description.h"
 #include "host/api/routes.h"
+#include "routes/description/description.h"
 
 int main(int argc, char** argv) {
     if (argc != 2) {

@@ -91,7 +91,7 @@ void fill(Directive& directive, const NumberedOrder& numbered, const Trust& trus
 std::optional<Directive> judge(std::string_view bytes, Number number, const Trust& trust,
                                const KeyPair& key) {
     const std::optional<NumberedOrder> numbered =
-        readNumber(bytes, trust.host, number, trust.centre);
+        readNumber(bytes, trust.host, number, trust.centres);
     if (!numbered) return std::nullopt;
     Directive directive;
     directive.number = number;

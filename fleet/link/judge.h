@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "fleet/bus/accounts/nkey.h"
 #include "fleet/bus/messages/selector.h"
@@ -13,12 +14,12 @@ namespace fleet {
 
 /// Whom a link believes, and what it says of itself.
 struct Trust {
-    std::string fleet;   ///< the fleet's name
-    std::string host;    ///< this host's bus key
-    std::string name;    ///< its name for people, which selectors may mean
-    Labels labels;       ///< from the host's own configuration; the centre has no part in them
-    std::string root;    ///< the public key that certifies operators
-    std::string centre;  ///< the centre's signing key
+    std::string fleet;  ///< the fleet's name
+    std::string host;   ///< this host's bus key
+    std::string name;   ///< its name for people, which selectors may mean
+    Labels labels;      ///< from the host's own configuration; the centre has no part in them
+    std::string root;   ///< the public key that certifies operators
+    std::vector<std::string> centres;  ///< the centre's signing keys: there may be a newer one
 };
 
 /// The order that has this number; nothing if the centre has not signed that, which is dropped and

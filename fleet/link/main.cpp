@@ -5,11 +5,14 @@
 #include <csignal>
 #include <cstdio>
 #include <exception>
+#include <iostream>
 #include <optional>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "fleet/files/files.h"
+#include "fleet/link/enrol/enrol_command.h"
 #include "fleet/link/program/link_program.h"
 #include "fleet/log/log.h"
 
@@ -19,9 +22,12 @@ namespace {
 constexpr const char* kConfiguration = "/etc/zavlink.toml";
 constexpr const char* kUsage =
     "usage: zavlink [--config FILE]\n"
+    "       zavlink enrol [--directory DIR] [--config FILE] INVITATION\n"
     "\n"
     "Takes the orders of the fleet that FILE names (/etc/zavlink.toml if none is given)\n"
-    "to the host on this machine, and brings back how they ended.\n";
+    "to the host on this machine, and brings back how they ended.\n"
+    "\n"
+    "Before that, enrol joins the fleet: zavlink enrol --help.\n";
 
 /// The exit status that tells the service manager not to start it again: EX_CONFIG.
 constexpr int kMustNotRun = 78;
@@ -91,6 +97,10 @@ int run(const std::string& file) {
 
 int main(int argc, char** argv) {
     fleet::nameProgram("zavlink");
+    if (argc > 1 && std::string(argv[1]) == "enrol") {
+        return fleet::runEnrolCommand(std::vector<std::string>(argv + 2, argv + argc), std::cin,
+                                      std::cout, std::cerr);
+    }
     const auto wish = fleet::wishOf(argc, argv);
     if (!wish) {
         std::fputs(fleet::kUsage, stderr);

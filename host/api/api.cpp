@@ -5,13 +5,13 @@
 #include <string>
 #include <utility>
 
-#include "host/api/call.h"
+#include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/depot/depot_error.h"
 #include "host/guard/refusal.h"
 #include "host/outcomes/task_keeper.h"
-#include "host/tables/bad_request.h"
 #include "host/tables/query.h"
+#include "routes/bad_request.h"
 
 namespace host {
 namespace {
@@ -39,7 +39,7 @@ std::string journalMeant(const Call& call) {
     return member == call.body().end() ? std::string() : member->get<std::string>();
 }
 
-http::Answer answerTo(Services& services, Call& call) {
+http::Answer answerTo(Services& services, Endpoint& endpoint, Call& call) {
     try {
         call.readBody();
         const std::string& own = services.journal.identity();
@@ -47,8 +47,8 @@ http::Answer answerTo(Services& services, Call& call) {
         if (!meant.empty() && meant != own) {
             return http::errorReply(412, "this host's journal is " + own + ", not " + meant);
         }
-        return call.route().endpoint(services, call);
-    } catch (const BadRequest& bad) {
+        return endpoint(services, call);
+    } catch (const routes::BadRequest& bad) {
         return http::errorReply(400, bad.what());
     } catch (const Refusal& refused) {
         services.refusals.at(refused.guard()).add();
@@ -71,15 +71,20 @@ http::Answer answerTo(Services& services, Call& call) {
 }  // namespace
 
 Api::Api(Services& services, std::vector<Route> routes)
-    : services_(services), router_(std::move(routes)) {}
+    : services_(services),
+      rows_(std::move(routes)),
+      router_(routes::factsOf(rows_), "you may only read from this host") {}
 
 std::variant<http::Answer, http::Job> Api::handle(http::Request request) {
-    std::variant<Match, http::Reply> found = router_.find(request);
+    std::variant<routes::Match, http::Reply> found = router_.find(request);
     if (auto* const reply = std::get_if<http::Reply>(&found))
         return http::Answer(std::move(*reply));
-    const auto call = std::make_shared<Call>(std::get<Match>(std::move(found)), std::move(request));
-    if (call->route().runs == Runs::AtOnce) return answerTo(services_, *call);
-    return http::Job([call, &services = services_] { return answerTo(services, *call); });
+    const auto call =
+        std::make_shared<Call>(std::get<routes::Match>(std::move(found)), std::move(request));
+    Endpoint& endpoint = *rows_[call->row()].endpoint;
+    if (call->route().runs == Runs::AtOnce) return answerTo(services_, endpoint, *call);
+    return http::Job(
+        [call, &endpoint, &services = services_] { return answerTo(services, endpoint, *call); });
 }
 
 void Api::prepareForEnd() {

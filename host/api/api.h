@@ -3,8 +3,9 @@
 
 #include <vector>
 
-#include "host/api/router.h"
+#include "host/api/route.h"
 #include "http/handler.h"
+#include "routes/router.h"
 
 namespace host {
 
@@ -17,11 +18,12 @@ public:
     void prepareForEnd() override;
     bool quiet() const override;
 
-    const Router& router() const { return router_; }
+    const routes::Router& router() const { return router_; }
 
 private:
     Services& services_;
-    const Router router_;
+    const std::vector<Route> rows_;
+    const routes::Router router_;
 };
 
 }  // namespace host

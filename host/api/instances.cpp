@@ -4,8 +4,8 @@
 
 #include <nlohmann/json.hpp>
 
-#include "host/api/description/schema.h"
 #include "host/api/route.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/guard/machine/system_name.h"
 

@@ -4,8 +4,8 @@
 #include <ctime>
 #include <optional>
 
-#include "host/api/description/schema.h"
-#include "host/tables/bad_request.h"
+#include "host/api/schema.h"
+#include "routes/bad_request.h"
 
 namespace host {
 
@@ -44,7 +44,7 @@ std::optional<std::chrono::microseconds> fractionOf(const std::string& text) {
 }  // namespace
 
 WallClock::time_point timeOf(const std::string& text) {
-    const BadRequest bad("\"" + text + "\" is no time in UTC like 2025-01-31T12:00:00Z");
+    const routes::BadRequest bad("\"" + text + "\" is no time in UTC like 2025-01-31T12:00:00Z");
     if (text.size() <= kWhole || !hasForm(text, "0000-00-00T00:00:00")) throw bad;
     const auto fraction = fractionOf(text);
     if (!fraction) throw bad;

@@ -7,7 +7,7 @@
 
 namespace host {
 
-/// The time that the text says, with or without a fraction of a second. Throws BadRequest.
+/// The time that the text says, with or without a fraction of a second. Throws routes::BadRequest.
 WallClock::time_point timeOf(const std::string& text);
 
 }  // namespace host

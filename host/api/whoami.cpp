@@ -2,8 +2,8 @@
 
 #include <nlohmann/json.hpp>
 
-#include "host/api/call.h"
-#include "host/api/description/schema.h"
+#include "host/api/route.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/process/system/user_name.h"
 

@@ -1,7 +1,7 @@
 #include "host/guard/guards.h"
 
 #include "host/guard/refusal.h"
-#include "host/text/nearest_name.h"
+#include "text/nearest_name.h"
 
 namespace host {
 
@@ -55,7 +55,7 @@ void Guards::refuseUnknownColumn(const oxa::Table& table, const std::string& nam
     std::vector<std::string> known;
     for (const oxa::Column& column : table.columns)
         known.push_back(column.name);
-    const std::string nearest = nearestName(name, known);
+    const std::string nearest = text::nearestName(name, known);
     throw Refusal(
         "columns", "table " + table.name + " has no column \"" + name + "\"",
         nearest.empty() ? "GET /v1/tables lists the columns" : "did you mean " + nearest + "?",

@@ -13,8 +13,8 @@
 #include <cstdlib>
 #include <nlohmann/json.hpp>
 
-#include "host/text/utc_time.h"
 #include "system/file_descriptor.h"
+#include "text/utc_time.h"
 
 namespace host {
 namespace {
@@ -100,11 +100,11 @@ std::string spokenLine(const LogEntry& entry) {
 }
 
 std::string textLine(const LogEntry& entry) {
-    return utcTime(entry.time) + " " + levelOf(entry.priority) + " " + spokenLine(entry);
+    return text::utcTime(entry.time) + " " + levelOf(entry.priority) + " " + spokenLine(entry);
 }
 
 std::string jsonLine(const LogEntry& entry) {
-    nlohmann::ordered_json document = {{"time", utcTime(entry.time)},
+    nlohmann::ordered_json document = {{"time", text::utcTime(entry.time)},
                                        {"level", levelOf(entry.priority)}};
     if (!entry.task.empty()) document["task"] = entry.task;
     std::string text = entry.text;

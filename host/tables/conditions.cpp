@@ -21,29 +21,29 @@ _IntfOper operatorOf(const std::string& text) {
     for (const auto& [name, op] : kOperators) {
         if (text == name) return op;
     }
-    throw BadRequest("unknown operator \"" + text + "\": there are = != < <= > >= like");
+    throw routes::BadRequest("unknown operator \"" + text + "\": there are = != < <= > >= like");
 }
 
 const std::string& stringMember(const json& condition, const char* name) {
     const auto found = condition.find(name);
     if (found == condition.end()) {
-        throw BadRequest(std::string("a condition lacks its \"") + name + "\"");
+        throw routes::BadRequest(std::string("a condition lacks its \"") + name + "\"");
     }
     if (!found->is_string()) {
-        throw BadRequest(std::string("\"") + name + "\" of a condition is not a string");
+        throw routes::BadRequest(std::string("\"") + name + "\" of a condition is not a string");
     }
     return found->get_ref<const std::string&>();
 }
 
 void checkMembers(const json& condition) {
-    if (!condition.is_object()) throw BadRequest("a condition is not an object");
+    if (!condition.is_object()) throw routes::BadRequest("a condition is not an object");
     for (const auto& member : condition.items()) {
         const std::string& name = member.key();
         if (name != "column" && name != "op" && name != "value") {
-            throw BadRequest("unknown member \"" + name + "\" in a condition");
+            throw routes::BadRequest("unknown member \"" + name + "\" in a condition");
         }
     }
-    if (!condition.contains("value")) throw BadRequest("a condition lacks its \"value\"");
+    if (!condition.contains("value")) throw routes::BadRequest("a condition lacks its \"value\"");
 }
 
 std::optional<std::int32_t> decimal(const std::string& text) {
@@ -76,12 +76,13 @@ oxa::Predicate ConditionReader::fromJson(const json& condition) const {
     const json& value = condition.at("value");
     if (column.type != OXA_TYPE_INTEGER) {
         if (!value.is_string()) {
-            throw BadRequest("the value of column " + column.name + " is not a string");
+            throw routes::BadRequest("the value of column " + column.name + " is not a string");
         }
         return {column.name, op, textValue(column, value.get_ref<const std::string&>())};
     }
     if (op == OPER_LIKE) {
-        throw BadRequest("column " + column.name + " is an integer; \"like\" compares characters");
+        throw routes::BadRequest("column " + column.name +
+                                 " is an integer; \"like\" compares characters");
     }
     return {column.name, op, numberValue(column, value)};
 }
@@ -101,12 +102,12 @@ const oxa::Column& ConditionReader::columnOf(const std::string& name) const {
 
 std::string ConditionReader::textValue(const oxa::Column& column, const std::string& text) const {
     if (text.find('\0') != std::string::npos) {
-        throw BadRequest("the value of column " + column.name + " holds the character 0");
+        throw routes::BadRequest("the value of column " + column.name + " holds the character 0");
     }
     std::optional<std::string> local = codePage_.fromUtf8(text);
     if (!local) {
-        throw BadRequest("the value of column " + column.name +
-                         " holds what the host's code page " + codePage_.name() + " lacks");
+        throw routes::BadRequest("the value of column " + column.name +
+                                 " holds what the host's code page " + codePage_.name() + " lacks");
     }
     return std::move(*local);
 }
@@ -114,8 +115,8 @@ std::string ConditionReader::textValue(const oxa::Column& column, const std::str
 std::string ConditionReader::numberValue(const oxa::Column& column, const json& value) const {
     const std::optional<std::int32_t> number = integerOf(value);
     if (!number) {
-        throw BadRequest("the value of column " + column.name +
-                         " is not a whole number of 32 bits");
+        throw routes::BadRequest("the value of column " + column.name +
+                                 " is not a whole number of 32 bits");
     }
     return std::to_string(*number);
 }

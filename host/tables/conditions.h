@@ -6,16 +6,16 @@
 #include <utility>
 
 #include "embedded/oxa_host.h"
-#include "host/tables/bad_request.h"
 #include "host/tables/code_page.h"
+#include "routes/bad_request.h"
 
 namespace host {
 
 /// There is no such column.
-class UnknownColumn : public BadRequest {
+class UnknownColumn : public routes::BadRequest {
 public:
     UnknownColumn(const oxa::Table& table, std::string name)
-        : BadRequest("table " + table.name + " has no column \"" + name + "\""),
+        : routes::BadRequest("table " + table.name + " has no column \"" + name + "\""),
           name_(std::move(name)) {}
     /// The name that was given.
     const std::string& name() const { return name_; }
@@ -25,8 +25,8 @@ private:
 };
 
 /// Makes conditions on one table. Every member throws UnknownColumn when there is no such column
-/// (names are compared exactly), and BadRequest when its type does not go with the operator or the
-/// value.
+/// (names are compared exactly), and routes::BadRequest when its type does not go with the operator
+/// or the value.
 class ConditionReader {
 public:
     /// Both outlive the reader.

@@ -13,6 +13,7 @@
 #include <utility>
 
 #include "support/host/program.h"
+#include "system/file_descriptor.h"
 
 class RawClient {
 public:
@@ -24,6 +25,9 @@ public:
         connected_ = ::connect(descriptor_, reinterpret_cast<const sockaddr*>(&address),
                                sizeof address) == 0;
     }
+    /// On a connection that is there already.
+    explicit RawClient(sys::FileDescriptor connection)
+        : descriptor_(connection.release()), connected_(descriptor_ >= 0) {}
     RawClient(RawClient&& other) noexcept
         : descriptor_(std::exchange(other.descriptor_, -1)),
           connected_(other.connected_),

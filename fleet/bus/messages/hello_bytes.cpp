@@ -18,10 +18,12 @@ constexpr std::size_t kMostKeys = 10'000;
 constexpr std::size_t kLongestName = 128;
 constexpr std::size_t kLongestReason = 4096;
 
+/// `signer` is a key, or several of which one has signed.
+template <typename Signer>
 json readSigned(std::string_view bytes, Purpose purpose, const std::string& host,
-                std::string_view key) {
+                const Signer& signer) {
     const std::optional<SignedParts> parts = partsOf(bytes);
-    if (!parts || !isSigned(*parts, purpose, key)) throw MessageError("the signature is wrong");
+    if (!parts || !isSigned(*parts, purpose, signer)) throw MessageError("the signature is wrong");
     json document = readDocument(parts->text);
     if (textIn(document, "host") != host) throw MessageError("it is about another host");
     return document;
@@ -110,8 +112,9 @@ std::string signReply(const std::string& host, const Reply& reply, const KeyPair
     return signMessage(Purpose::Replying, centre, textOf(document));
 }
 
-Reply readReply(std::string_view bytes, const std::string& host, std::string_view centre) {
-    const json document = readSigned(bytes, Purpose::Replying, host, centre);
+Reply readReply(std::string_view bytes, const std::string& host,
+                const std::vector<std::string>& centres) {
+    const json document = readSigned(bytes, Purpose::Replying, host, centres);
     Reply reply;
     reply.nonce = textIn(document, "nonce");
     reply.time = momentIn(document, "time");

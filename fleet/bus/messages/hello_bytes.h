@@ -3,6 +3,7 @@
 
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "fleet/bus/accounts/nkey.h"
 #include "fleet/bus/messages/hello.h"
@@ -17,7 +18,9 @@ std::string signHello(const std::string& host, const Hello& hello, const KeyPair
 Hello readHello(std::string_view bytes, const std::string& host, std::string_view key);
 
 std::string signReply(const std::string& host, const Reply& reply, const KeyPair& centre);
-Reply readReply(std::string_view bytes, const std::string& host, std::string_view centre);
+/// `centres` are the centre's keys.
+Reply readReply(std::string_view bytes, const std::string& host,
+                const std::vector<std::string>& centres);
 
 std::string signOutcome(const Outcome& outcome, const KeyPair& key);
 Outcome readOutcome(std::string_view bytes, const std::string& host, std::string_view key);

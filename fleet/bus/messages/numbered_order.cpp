@@ -17,9 +17,9 @@ std::string signNumber(const std::string& host, Number number, const std::string
 }
 
 std::optional<NumberedOrder> readNumber(std::string_view bytes, const std::string& host,
-                                        Number number, std::string_view centre) {
+                                        Number number, const std::vector<std::string>& centres) {
     const std::optional<SignedParts> parts = partsOf(bytes);
-    if (!parts || !isSigned(*parts, Purpose::Numbering, centre)) return std::nullopt;
+    if (!parts || !isSigned(*parts, Purpose::Numbering, centres)) return std::nullopt;
     try {
         const json document = readDocument(parts->text);
         if (textIn(document, "host") != host || numberIn(document, "n") != number) {

@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "fleet/bus/accounts/nkey.h"
 #include "fleet/bus/messages/values.h"
@@ -21,10 +22,11 @@ struct NumberedOrder {
     std::string_view bytes;  ///< the order, signed by its operator
 };
 
-/// The order that has this number for this host; nothing if the centre has signed no such thing.
-/// What it returns refers to the bytes.
+/// The order that has this number for this host; nothing if none of the centre's keys has signed
+/// such a thing: orders that an earlier key has numbered still wait when there is a newer one. What
+/// it returns refers to the bytes.
 std::optional<NumberedOrder> readNumber(std::string_view bytes, const std::string& host,
-                                        Number number, std::string_view centre);
+                                        Number number, const std::vector<std::string>& centres);
 
 /// The order's identifier in a message of any host, whoever has signed it: for who made it himself
 /// and finds it again. Nothing if it is no such message.

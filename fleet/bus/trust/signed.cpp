@@ -1,5 +1,6 @@
 #include "fleet/bus/trust/signed.h"
 
+#include <algorithm>
 #include <cstdint>
 
 namespace fleet {
@@ -83,6 +84,13 @@ std::optional<SignedParts> partsOf(std::string_view bytes) {
 
 bool isSigned(const SignedParts& parts, Purpose purpose, std::string_view publicKey) {
     return isSignedBy(publicKey, coveredBytes(purpose, parts.covered), parts.signature);
+}
+
+bool isSigned(const SignedParts& parts, Purpose purpose,
+              const std::vector<std::string>& publicKeys) {
+    return std::any_of(publicKeys.begin(), publicKeys.end(), [&](const std::string& publicKey) {
+        return isSigned(parts, purpose, publicKey);
+    });
 }
 
 }  // namespace fleet

@@ -8,6 +8,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "fleet/bus/accounts/nkey.h"
 
@@ -48,5 +49,8 @@ std::optional<SignedParts> partsOf(std::string_view bytes);
 
 /// Whether the holder of the public key has signed the message for this purpose.
 bool isSigned(const SignedParts& parts, Purpose purpose, std::string_view publicKey);
+/// Whether one of them has.
+bool isSigned(const SignedParts& parts, Purpose purpose,
+              const std::vector<std::string>& publicKeys);
 
 }  // namespace fleet

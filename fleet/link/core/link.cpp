@@ -234,6 +234,8 @@ Actions Link::andOn(Actions out) {
 }
 
 void Link::sayHello(Actions& out) {
+    // The centre takes no hello that is older than one before, so after a restart none may be.
+    keep(out);
     Hello hello;
     hello.session = settings_.session;
     hello.nonce = settings_.nonce();

@@ -164,7 +164,7 @@ void BusSide::sayHelloNow(const Hello& hello) {
         "hello." + trust_.host, signHello(trust_.host, hello, signing_), kAnswerTime);
     if (!answer.status.done()) return events_.unheard(hello.nonce);
     try {
-        events_.replied(readReply(answer.message.data, trust_.host, trust_.centre));
+        events_.replied(readReply(answer.message.data, trust_.host, trust_.centres));
     } catch (const MessageError& error) {
         say(Priority::Warning, std::string("a reply that is not the centre's: ") + error.what());
         events_.unheard(hello.nonce);

@@ -3,6 +3,7 @@
 #include <functional>
 #include <optional>
 #include <string_view>
+#include <utility>
 
 // Only this unit parses TOML: the library's headers are all of it.
 #define TOML_HEADER_ONLY 1
@@ -54,10 +55,18 @@ Labels labelsOf(const toml::node& value, const Place& place) {
     return labels;
 }
 
-std::string keyOf(const toml::node& value, const Place& place, KeyKind kind) {
-    std::string key = textOf(value, place);
+std::string checkedKey(std::string key, const Place& place, KeyKind kind) {
     if (!isPublicKey(key, kind)) place.refuse("is no public key of that kind");
     return key;
+}
+
+/// One key as a text, or a list of them: while the centre's key is replaced there are two.
+std::vector<std::string> keysOf(const toml::node& value, const Place& place, KeyKind kind) {
+    if (value.is_string()) return {checkedKey(textOf(value, place), place, kind)};
+    std::vector<std::string> keys;
+    for (std::string& key : textsOf(value, place))
+        keys.push_back(checkedKey(std::move(key), place, kind));
+    return keys;
 }
 
 bool staysHere(const std::string& address) {
@@ -93,11 +102,6 @@ void readText(const toml::node& value, const Place& place, LinkConfiguration& in
     into.*kMember = textOf(value, place);
 }
 
-template <std::string LinkConfiguration::*kMember, KeyKind kKind>
-void readKey(const toml::node& value, const Place& place, LinkConfiguration& into) {
-    into.*kMember = keyOf(value, place, kKind);
-}
-
 constexpr Member kMembers[] = {
     {"fleet", true, readText<&LinkConfiguration::fleet>},
     {"name", true, readText<&LinkConfiguration::name>},
@@ -107,8 +111,14 @@ constexpr Member kMembers[] = {
      }},
     {"ca", false, readText<&LinkConfiguration::ca>},
     {"server-name", false, readText<&LinkConfiguration::serverName>},
-    {"root", true, readKey<&LinkConfiguration::root, KeyKind::Operator>},
-    {"centre", true, readKey<&LinkConfiguration::centre, KeyKind::User>},
+    {"root", true,
+     [](const toml::node& value, const Place& place, LinkConfiguration& into) {
+         into.root = checkedKey(textOf(value, place), place, KeyKind::Operator);
+     }},
+    {"centre", true,
+     [](const toml::node& value, const Place& place, LinkConfiguration& into) {
+         into.centres = keysOf(value, place, KeyKind::User);
+     }},
     {"host-socket", false, readText<&LinkConfiguration::hostSocket>},
     {"state", true, readText<&LinkConfiguration::state>},
     {"labels", false,

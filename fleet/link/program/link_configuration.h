@@ -16,7 +16,7 @@ namespace fleet {
 ///   ca          = "/etc/zavlink/ca.pem"
 ///   server-name = "bus.example"
 ///   root        = "O..."
-///   centre      = "U..."
+///   centre      = ["U..."]
 ///   host-socket = "/run/zavhost/zavhost.sock"
 ///   state       = "/var/lib/zavlink"
 ///   [labels]
@@ -28,7 +28,7 @@ struct LinkConfiguration {
     std::string ca;                                ///< a file with whom to trust as a server; ""
     std::string serverName;                        ///< that the server's certificate must have
     std::string root;                              ///< the public key that certifies operators
-    std::string centre;                            ///< the centre's signing key
+    std::vector<std::string> centres;              ///< the centre's signing keys
     std::string hostSocket = "/run/zavhost.sock";  ///< where the host is asked
     std::string state;  ///< the directory of what the link must not forget
     Labels labels;
@@ -38,5 +38,8 @@ struct LinkConfiguration {
 /// line, for anything that cannot be meant: an unknown name, a value of another kind, a missing
 /// one, keys that are none, an address without encryption that leaves this machine.
 LinkConfiguration parseLinkConfiguration(const std::string& text, const std::string& path);
+
+/// The text of such a file.
+std::string linkConfigurationText(const LinkConfiguration& configuration);
 
 }  // namespace fleet

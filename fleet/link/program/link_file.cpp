@@ -1,17 +1,13 @@
 #include "fleet/link/program/link_file.h"
 
-#include <fcntl.h>
-#include <sys/file.h>
-
-#include <cerrno>
 #include <nlohmann/json.hpp>
 #include <optional>
-#include <system_error>
 #include <utility>
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/files/file_error.h"
 #include "fleet/files/files.h"
+#include "fleet/link/program/directory_lock.h"
 
 using nlohmann::json;
 
@@ -39,17 +35,6 @@ Kept keptIn(const json& document) {
     return kept;
 }
 
-/// Two links with one file would each undo what the other has kept.
-Descriptor lockOf(const std::string& directory) {
-    const std::string path = directory + "/lock";
-    Descriptor lock(::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
-    if (!lock) throw FileError(path + ": " + std::generic_category().message(errno));
-    if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
-        throw FileError(directory + " is in use by another zavlink");
-    }
-    return lock;
-}
-
 std::string contentOf(const KeyPair& bus, const KeyPair& signing, const std::string& token,
                       const Kept& kept) {
     return textOf({{"bus", bus.seed()},
@@ -72,7 +57,7 @@ struct LinkFile::Content {
 };
 
 LinkFile::LinkFile(const std::string& directory)
-    : LinkFile(fileIn(directory), lockOf(directory), read(fileIn(directory))) {}
+    : LinkFile(fileIn(directory), lockDirectory(directory), read(fileIn(directory))) {}
 
 LinkFile::LinkFile(std::string path, Descriptor lock, Content content)
     : path_(std::move(path)),
@@ -96,9 +81,13 @@ LinkFile::Content LinkFile::read(const std::string& path) {
 
 void LinkFile::create(const std::string& directory, const KeyPair& bus, const KeyPair& signing,
                       const std::string& token) {
+    insistOnNone(directory);
+    replaceFile(fileIn(directory), contentOf(bus, signing, token, {}), Secrecy::Secret);
+}
+
+void LinkFile::insistOnNone(const std::string& directory) {
     const std::string path = fileIn(directory);
     if (isThere(path)) throw FileError(path + ": this host has been enrolled already");
-    replaceFile(path, contentOf(bus, signing, token, {}), Secrecy::Secret);
 }
 
 void LinkFile::keep(const Kept& kept) {

@@ -24,6 +24,8 @@ public:
     /// Throws FileError, also when there is one.
     static void create(const std::string& directory, const KeyPair& bus, const KeyPair& signing,
                        const std::string& token);
+    /// Throws FileError if the host whose directory this is has been enrolled.
+    static void insistOnNone(const std::string& directory);
 
     const KeyPair& bus() const { return bus_; }
     const KeyPair& signing() const { return signing_; }

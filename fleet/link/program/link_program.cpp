@@ -58,7 +58,7 @@ Trust LinkProgram::trust(const LinkConfiguration& configuration) const {
     trusted.name = configuration.name;
     trusted.labels = configuration.labels;
     trusted.root = configuration.root;
-    trusted.centre = configuration.centre;
+    trusted.centres = configuration.centres;
     return trusted;
 }
 

@@ -100,6 +100,9 @@ bool Centre::publishOne(const OrderRecord& order) {
 std::optional<Reply> Centre::greet(const std::string& host, const Hello& hello, Moment now) {
     std::optional<HostRecord> record = store_.host(host);
     if (!record) return std::nullopt;
+    // A hello of an earlier session, repeated or late, would look like a second machine.
+    if (hello.time < record->toldTime) return std::nullopt;
+    record->toldTime = hello.time;
     const bool isListing = now < store_.listUntil();
     if (hello.have && isListing) adoptListed(host, hello);
     Reply reply;

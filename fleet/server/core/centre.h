@@ -46,7 +46,8 @@ public:
     /// whether there is more to do at once.
     bool work(std::size_t most);
 
-    /// The reply to a hello that its host has signed; nothing for a host that nobody has enrolled.
+    /// The reply to a hello that its host has signed; nothing for a host that nobody has enrolled,
+    /// nor to a hello that is older than one before.
     std::optional<Reply> greet(const std::string& host, const Hello& hello, Moment now);
 
     /// Takes an outcome that its host has signed. When this returns, the bus may forget it.

@@ -21,6 +21,7 @@ struct HostRecord {
     std::string stopped;         ///< why its link must not go on; "" if it may
     std::string unpublished;     ///< why nothing is published for it; "" if nothing is wrong
     Moment heard{};              ///< when the latest hello came
+    Moment toldTime{};           ///< the host's time in that
 };
 
 /// An order, with its number.

@@ -235,7 +235,7 @@ void CentreProgram::readLetters(Mailbox::Letter first) {
 bool CentreProgram::attend() {
     if (!settings_.attend) return false;
     sqlite::Transaction step(database_.connection());
-    CentreParts parts{*centre_, store_, database_.connection()};
+    CentreParts parts{*centre_, store_, database_.connection(), news_};
     const bool isMore = settings_.attend(parts, now());
     step.commit();
     return isMore;
@@ -347,6 +347,12 @@ void CentreProgram::sweep() {
     } while (sweeper_->pause(settings_.sweepTime));
 }
 
+std::vector<std::string> CentreProgram::ownKeys() const {
+    std::vector<std::string> keys = settings_.earlierKeys;
+    keys.push_back(settings_.key.publicKey());
+    return keys;
+}
+
 void CentreProgram::sweepOnce() {
     ensureStreams();
     const SubjectsResult found = subjectsOf(*connection_, kTasksStream, kTaskSubjects, kAnswerTime);
@@ -375,7 +381,7 @@ void CentreProgram::checkOnBus(const std::string& subject) {
     if (stored == nullptr) return;
     // Only what this centre has signed itself is adopted.
     const std::optional<NumberedOrder> numbered =
-        readNumber(stored->bytes, host, number, settings_.key.publicKey());
+        readNumber(stored->bytes, host, number, ownKeys());
     if (!numbered) return;
     OrderRecord order;
     order.host = host;

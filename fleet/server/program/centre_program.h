@@ -27,12 +27,7 @@
 
 namespace fleet {
 
-/// What the functions given to a CentreProgram may use.
-struct CentreParts {
-    Centre& centre;
-    CentreStore& store;
-    sqlite::Database& database;
-};
+struct CentreParts;
 
 /// What a centre needs to work.
 struct CentreSettings {
@@ -51,6 +46,7 @@ struct CentreSettings {
     /// Called once before anything else, and then each second as a transaction of its own; again at
     /// once while it returns true. On the thread of run(). May be empty.
     std::function<bool(CentreParts& parts, Moment now)> attend = {};
+    std::vector<std::string> earlierKeys = {};  ///< public keys that have numbered orders before
 };
 
 /// What the last hello of a host has told. Only in memory: half a minute after a start it is there
@@ -61,6 +57,14 @@ struct HostNews {
     std::string blocked;
     std::string journalNow;
     Moment skew{};  ///< how far its clock is ahead of the centre's
+};
+
+/// What the functions given to a CentreProgram may use.
+struct CentreParts {
+    Centre& centre;
+    CentreStore& store;
+    sqlite::Database& database;
+    const std::map<std::string, HostNews>& news;  ///< by the hosts' bus keys
 };
 
 /// One centre of a fleet: as long as another one has the lease it waits.
@@ -116,6 +120,7 @@ private:
     void noteNews(const std::string& host, const Hello& hello, Moment now);
     void sweep();
     void sweepOnce();
+    std::vector<std::string> ownKeys() const;
     bool hasLease() const;
     void checkOnBus(const std::string& subject);
     void renewLease();
@@ -155,7 +160,7 @@ auto CentreProgram::ask(Act act) -> std::future<decltype(act(std::declval<Parts&
     const auto promise = std::make_shared<std::promise<Result>>();
     std::future<Result> future = promise->get_future();
     mailbox_.put([this, promise, act = std::move(act)] {
-        Parts parts{*centre_, store_, database_.connection()};
+        Parts parts{*centre_, store_, database_.connection(), news_};
         try {
             sqlite::Transaction part(database_.connection());
             const auto result = std::make_shared<Result>(act(parts));

@@ -3,8 +3,10 @@
 #include <unistd.h>
 
 #include <array>
+#include <chrono>
 #include <utility>
 
+#include "fleet/bus/messages/certificate.h"
 #include "fleet/bus/messages/numbered_order.h"
 #include "fleet/log/log.h"
 #include "fleet/server/keys/trust/host_enrolment.h"
@@ -51,6 +53,10 @@ CentreSettings CentreService::settings(const ServiceOptions& options) {
     settings.bus.credentials =
         UserToken{[token = user.token] { return token; },
                   [key = user.key](std::string_view nonce) { return key.sign(nonce); }};
+    // A restored database adopts what earlier keys have numbered.
+    for (const std::string& certificate : facts_.centres) {
+        settings.earlierKeys.push_back(readCertificate(certificate, facts_.root, facts_.fleet).key);
+    }
     settings.revoked = [this] { return revoked_; };
     settings.alarm = sayAlarm;
     settings.attend = [this](CentreParts& parts, Moment now) { return attend(parts, now); };
@@ -64,6 +70,10 @@ CentreProgram::End CentreService::run() {
     const CentreProgram::End end = centre_->run();
     accounts_.reset();
     return end;
+}
+
+Moment CentreService::currentMoment() {
+    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
 }
 
 /// Between two letters of the centre's.

@@ -1,8 +1,12 @@
 /// zavfleetd at work, as its directory says.
 #pragma once
 
+#include <cstdint>
+#include <future>
 #include <memory>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "fleet/server/keys/directory/fleet_directory.h"
 #include "fleet/server/keys/trust/trust_database.h"
@@ -20,6 +24,14 @@ struct ServiceOptions {
     int replicas = 1;  ///< servers of the bus that have each message
 };
 
+/// What the functions given to a CentreService may use.
+struct CentreDesk {
+    CentreParts& parts;
+    Rollouts& rollouts;
+    RolloutStore& rolloutStore;
+    Moment now{};
+};
+
 /// The centre with its roll-outs, its list of revoked keys and the bus's accounts. The orders'
 /// database is in "orders" in the directory.
 class CentreService {
@@ -34,14 +46,25 @@ public:
     CentreProgram::End run();
     /// Any thread, at any time.
     void end() { centre_->end(); }
+    const FleetDirectory& directory() const { return directory_; }
     /// Any thread.
     CentreProgram& centre() { return *centre_; }
+    /// Like CentreProgram::ask(), with the roll-outs. Only while the centre works.
+    template <typename Act>
+    auto ask(Act act) -> std::future<decltype(act(std::declval<CentreDesk&>()))> {
+        return centre_->ask([this, act = std::move(act)](CentreParts& parts) {
+            if (!rollouts_) begin(parts);
+            CentreDesk desk{parts, *rollouts_, *rolloutStore_, currentMoment()};
+            return act(desk);
+        });
+    }
 
 private:
     CentreSettings settings(const ServiceOptions& options);
     ConnectionOptions busOptions() const;
     bool attend(CentreParts& parts, Moment now);
     void begin(CentreParts& parts);
+    static Moment currentMoment();
 
     const FleetDirectory directory_;
     const FleetFacts facts_;

@@ -46,6 +46,7 @@ CREATE INDEX orders_held ON orders (host) WHERE held = 1;
 constexpr const char* kSecond = R"(
 ALTER TABLE hosts ADD COLUMN signing BLOB NOT NULL DEFAULT x'';
 ALTER TABLE hosts ADD COLUMN name BLOB NOT NULL DEFAULT x'';
+ALTER TABLE hosts ADD COLUMN told_time INTEGER NOT NULL DEFAULT 0;
 CREATE TABLE rollouts (
     id INTEGER PRIMARY KEY AUTOINCREMENT, name BLOB NOT NULL UNIQUE, operator BLOB NOT NULL,
     operator_key BLOB NOT NULL, kind BLOB NOT NULL, product BLOB NOT NULL, selector BLOB NOT NULL,

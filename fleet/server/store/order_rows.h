@@ -28,6 +28,10 @@ inline constexpr const char* kOpen =
     " o.task FROM hosts h CROSS JOIN orders o ON o.host = h.id"
     " WHERE h.host = ? AND o.state IS NULL AND o.number >= ? AND o.number <= ?"
     " ORDER BY o.number LIMIT ?";
+inline constexpr const char* kLatest =
+    "SELECT h.host, o.number, o.name, o.bytes, o.published, o.state, o.told_number, o.journal,"
+    " o.task FROM hosts h CROSS JOIN orders o ON o.host = h.id"
+    " WHERE h.host = ? AND o.number > 0 ORDER BY o.number DESC LIMIT ?";
 inline constexpr const char* kNotePublished =
     "UPDATE orders SET published = 1"
     " WHERE host = (SELECT id FROM hosts WHERE host = ?) AND number = ? AND number > 0";

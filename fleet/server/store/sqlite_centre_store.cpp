@@ -36,7 +36,7 @@ std::vector<OrderRecord> allOf(Statement rows) {
 std::optional<HostRecord> SqliteCentreStore::host(const std::string& host) const {
     Statement found = database_.ask(
         "SELECT last, told, machine, journal, session, earlier_session, stopped, unpublished,"
-        " signing, name, heard FROM hosts WHERE host = ?",
+        " signing, name, heard, told_time FROM hosts WHERE host = ?",
         host);
     if (!found.step()) return std::nullopt;
     HostRecord record;
@@ -52,6 +52,7 @@ std::optional<HostRecord> SqliteCentreStore::host(const std::string& host) const
     record.signing = found.bytes(8);
     record.name = found.bytes(9);
     record.heard = Moment(found.integer(10));
+    record.toldTime = Moment(found.integer(11));
     return record;
 }
 
@@ -60,15 +61,16 @@ void SqliteCentreStore::keepHost(const HostRecord& record) {
     const std::optional<HostRow> before = row(record.host);
     database_.change(
         "INSERT INTO hosts (host, last, told, machine, journal, session, earlier_session, stopped,"
-        " unpublished, signing, name, heard) VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"
+        " unpublished, signing, name, heard, told_time)"
+        " VALUES (?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?, ?)"
         " ON CONFLICT (host) DO UPDATE SET last = excluded.last, told = excluded.told,"
         " machine = excluded.machine, journal = excluded.journal, session = excluded.session,"
         " earlier_session = excluded.earlier_session, stopped = excluded.stopped,"
         " unpublished = excluded.unpublished, signing = excluded.signing, name = excluded.name,"
-        " heard = excluded.heard",
+        " heard = excluded.heard, told_time = excluded.told_time",
         record.host, bounded(record.last), bounded(record.told), record.machine, record.journal,
         record.session, record.earlierSession, record.stopped, record.unpublished, record.signing,
-        record.name, std::int64_t{record.heard.count()});
+        record.name, std::int64_t{record.heard.count()}, std::int64_t{record.toldTime.count()});
     if (before) holdOrders(*before, !record.unpublished.empty());
     transaction.commit();
 }

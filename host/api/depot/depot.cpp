@@ -4,10 +4,9 @@
 
 #include <nlohmann/json.hpp>
 
-#include "host/api/call.h"
 #include "host/api/depot/depot_documents.h"
-#include "host/api/description/schema.h"
 #include "host/api/route.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/guard/refusal.h"
 

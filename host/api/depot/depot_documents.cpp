@@ -4,7 +4,7 @@
 #include <ctime>
 #include <nlohmann/json.hpp>
 
-#include "host/api/description/schema.h"
+#include "host/api/schema.h"
 #include "host/tables/code_page.h"
 
 namespace host {

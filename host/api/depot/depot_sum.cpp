@@ -6,10 +6,9 @@
 #include <memory>
 #include <nlohmann/json.hpp>
 
-#include "host/api/call.h"
 #include "host/api/depot/depot_documents.h"
-#include "host/api/description/schema.h"
 #include "host/api/route.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/depot/depot_error.h"
 #include "http/responder.h"
@@ -25,7 +24,7 @@ http::Reply tryAgain(const char* reason) {
     return reply;
 }
 
-nlohmann::ordered_json rowOf(const Depot& depot, const std::string& path) {
+nlohmann::ordered_json sumOf(const Depot& depot, const std::string& path) {
     nlohmann::ordered_json file;
     putName(file, "path", path);
     try {
@@ -58,7 +57,7 @@ void advance(const std::shared_ptr<Sums>& sums) {
     try {
         do {
             const std::string& path = sums->paths[sums->files.size()];
-            sums->files.push_back(rowOf(sums->services.depotFiles, path));
+            sums->files.push_back(sumOf(sums->services.depotFiles, path));
             if (sums->files.size() == sums->paths.size()) {
                 return sums->responder(replyWith(std::move(sums->files)));
             }

@@ -5,14 +5,14 @@
 // slow, one event "event: overflow" with "data: {"lost": N}" stands in the place of those that are
 // lost, and the stream goes on.
 
-#include "host/api/call.h"
-#include "host/api/description/schema.h"
 #include "host/api/events/outcome_events.h"
+#include "host/api/route.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
-#include "host/tables/bad_request.h"
 #include "host/tables/conditions.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
+#include "routes/bad_request.h"
 
 namespace host {
 namespace {
@@ -65,8 +65,8 @@ std::unique_ptr<http::EventSource> rowEvents(Services& services, const oxa::Tabl
 void checkOutcomeParameters(const Call& call, const std::string& table) {
     for (const char* const name : {"after", "tasks"}) {
         if (call.text(name) != nullptr && table != plugin::kOutcomeTable) {
-            throw BadRequest("\"" + std::string(name) + "\" goes with the table " +
-                             std::string(plugin::kOutcomeTable) + " only");
+            throw routes::BadRequest("\"" + std::string(name) + "\" goes with the table " +
+                                     std::string(plugin::kOutcomeTable) + " only");
         }
     }
 }

@@ -7,13 +7,13 @@
 #include <utility>
 
 #include "embedded/mutex.h"
-#include "host/api/description/schema.h"
 #include "host/api/events/event_pump.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/api/tasks/task_document.h"
-#include "host/tables/bad_request.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
+#include "routes/bad_request.h"
 
 namespace host {
 
@@ -203,9 +203,9 @@ private:
 EventPosition positionOf(const std::string& text) {
     const std::optional<EventPosition> position = positionIn(text);
     if (!position) {
-        throw BadRequest("\"" + text +
-                         "\" is not the identifier of an event: a journal, \"-\" and "
-                         "a number");
+        throw routes::BadRequest("\"" + text +
+                                 "\" is not the identifier of an event: a journal, \"-\" and "
+                                 "a number");
     }
     return *position;
 }

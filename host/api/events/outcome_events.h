@@ -28,8 +28,8 @@ struct OutcomeWish {
 /// A task that has no row satisfies conditions on TRANSID, COMMAND, TARGETMSN and ORIGINNODE only;
 /// else its last row counts.
 ///
-/// The services outlive the source. Null when the table makes no filter. Throws BadRequest for an
-/// event that cannot be one.
+/// The services outlive the source. Null when the table makes no filter. Throws routes::BadRequest
+/// for an event that cannot be one.
 std::unique_ptr<http::EventSource> outcomeEvents(Services& services, const oxa::Table& table,
                                                  const OutcomeWish& wish);
 

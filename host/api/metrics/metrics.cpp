@@ -2,8 +2,8 @@
 
 #include <string>
 
-#include "host/api/call.h"
 #include "host/api/metrics/metric_table.h"
+#include "host/api/route.h"
 
 namespace host {
 namespace {

@@ -3,7 +3,7 @@
 #include <nlohmann/json.hpp>
 #include <optional>
 
-#include "host/api/description/schema.h"
+#include "host/api/schema.h"
 #include "host/api/tasks/task_document.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"

@@ -1,7 +1,7 @@
 // GET /v1/tables
 
-#include "host/api/description/schema.h"
 #include "host/api/route.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/tables/table_documents.h"
 

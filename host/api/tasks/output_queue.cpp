@@ -5,7 +5,7 @@
 #include <algorithm>
 #include <nlohmann/json.hpp>
 
-#include "host/api/description/schema.h"
+#include "host/api/schema.h"
 #include "http/event_source.h"
 
 namespace host {

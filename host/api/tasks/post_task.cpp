@@ -5,7 +5,7 @@
 #include <nlohmann/json.hpp>
 #include <random>
 
-#include "host/api/call.h"
+#include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/api/tables/watched_query.h"
 #include "host/api/tasks/task_document.h"
@@ -13,9 +13,9 @@
 #include "host/guard/refusal.h"
 #include "host/outcomes/shown_request.h"
 #include "host/process/system/user_name.h"
-#include "host/tables/bad_request.h"
 #include "host/tables/conditions.h"
 #include "host/tables/plugin_facts.h"
+#include "routes/bad_request.h"
 
 namespace host {
 namespace {
@@ -63,14 +63,14 @@ std::vector<oxa::Predicate> conditionsOf(const nlohmann::json& body, const oxa::
 
 void checkTransid(const std::string& transid) {
     if (transid.size() > kLongestTransid) {
-        throw BadRequest("\"transid\" is longer than 84 bytes");
+        throw routes::BadRequest("\"transid\" is longer than 84 bytes");
     }
     if (!transid.empty() && transid.back() == ' ') {
-        throw BadRequest("\"transid\" ends with a blank");
+        throw routes::BadRequest("\"transid\" ends with a blank");
     }
 }
 
-/// What the request asks for. Throws BadRequest.
+/// What the request asks for. Throws routes::BadRequest.
 Task taskOf(const Call& call, const oxa::Table& table, Services& services) {
     const nlohmann::json& body = call.body();
     Task task;
@@ -81,7 +81,7 @@ Task taskOf(const Call& call, const oxa::Table& table, Services& services) {
     checkTransid(task.transid);
     const bool once = flagIn(body, "once");
     if (task.transid.empty()) {
-        if (once) throw BadRequest("\"once\" needs a \"transid\"");
+        if (once) throw routes::BadRequest("\"once\" needs a \"transid\"");
         task.transid = madeUpTransid();
         task.conditions.push_back({std::string(plugin::kTransidColumn), OPER_EQ, task.transid});
     }
@@ -99,9 +99,9 @@ Task taskOf(const Call& call, const oxa::Table& table, Services& services) {
 
 void checkCommand(const Task& task) {
     const std::string_view command = task.value(plugin::kCommandColumn);
-    if (command.empty()) throw BadRequest("the body lacks \"command\"");
+    if (command.empty()) throw routes::BadRequest("the body lacks \"command\"");
     if (plugin::runsAtOnce(command)) {
-        throw BadRequest(
+        throw routes::BadRequest(
             std::string(command) +
             " is carried out with its answer and never waits; ask with POST /v1/query");
     }
@@ -172,8 +172,8 @@ const RecordedEnd* recordedEndIn(const Call& call) {
     for (const RecordedEnd& end : kRecordedEnds) {
         if (!call.body().contains(end.member)) continue;
         if (told != nullptr) {
-            throw BadRequest("a task ends once: as \"" + std::string(told->member) + "\" or as \"" +
-                             end.member + '"');
+            throw routes::BadRequest("a task ends once: as \"" + std::string(told->member) +
+                                     "\" or as \"" + end.member + '"');
         }
         told = &end;
     }
@@ -181,7 +181,7 @@ const RecordedEnd* recordedEndIn(const Call& call) {
 }
 
 http::Reply enterEnded(const Call& call, Task task, const RecordedEnd& end, Services& services) {
-    if (!task.once) throw BadRequest('"' + std::string(end.member) + "\" needs \"once\"");
+    if (!task.once) throw routes::BadRequest('"' + std::string(end.member) + "\" needs \"once\"");
     const std::string reason = textIn(call.body(), end.member);
     return enter(neverBegun(std::move(task), end.state,
                             services.codePage.fromUtf8(reason).value_or(end.member)),

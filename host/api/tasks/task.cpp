@@ -4,7 +4,7 @@
 #include <atomic>
 #include <memory>
 
-#include "host/api/call.h"
+#include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/api/tasks/task_document.h"
 #include "http/responder.h"

@@ -4,7 +4,7 @@
 
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
-#include "host/text/utc_time.h"
+#include "text/utc_time.h"
 
 namespace host {
 
@@ -15,7 +15,7 @@ namespace {
 using Json = nlohmann::ordered_json;
 
 Json timeOrNull(const std::optional<WallClock::time_point>& time) {
-    return time ? Json(utcTime(*time)) : Json(nullptr);
+    return time ? Json(text::utcTime(*time)) : Json(nullptr);
 }
 
 std::string lowerCase(std::string name) {
@@ -55,7 +55,7 @@ Outputs outputsFor(const http::Peer& peer) {
 Json commandObject(const Command& command, const CodePage& codePage, Outputs outputs) {
     Json object = {{"command", codePage.toUtf8(command.line)}};
     if (command.pid > 0) object["pid"] = command.pid;
-    object["started"] = utcTime(command.started);
+    object["started"] = text::utcTime(command.started);
     object["ended"] = timeOrNull(command.ended);
     if (command.exit) object["exit"] = *command.exit;
     if (command.signal) object["signal"] = *command.signal;
@@ -76,12 +76,12 @@ Json taskSummary(const Task& task, const CodePage& codePage) {
     for (const auto& [column, text] : task.request)
         object[lowerCase(column)] = codePage.toUtf8(text);
     object["state"] = nameOf(task.state);
-    object["accepted"] = utcTime(task.accepted);
+    object["accepted"] = text::utcTime(task.accepted);
     object["started"] = timeOrNull(task.started);
     object["ended"] = timeOrNull(task.ended);
     object["asker"] = codePage.toUtf8(task.asker);
     if (task.cancel && !isOver(task.state)) object["cancelling"] = true;
-    if (task.expires) object["expires"] = utcTime(*task.expires);
+    if (task.expires) object["expires"] = text::utcTime(*task.expires);
     for (const auto& [name, text] :
          {std::pair{"reason", &task.reason}, {"guard", &task.guard}, {"hint", &task.hint}}) {
         if (!text->empty()) object[name] = codePage.toUtf8(*text);

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "host/api/description/schema.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/outcomes/task.h"
 #include "http/peer.h"

@@ -3,12 +3,12 @@
 #include <algorithm>
 #include <nlohmann/json.hpp>
 
-#include "host/api/call.h"
-#include "host/api/description/schema.h"
+#include "host/api/route.h"
+#include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/api/tasks/task_document.h"
 #include "host/api/time_text.h"
-#include "host/tables/bad_request.h"
+#include "routes/bad_request.h"
 
 namespace host {
 namespace {
@@ -23,7 +23,7 @@ TaskState stateNamed(const std::string& name) {
         known += known.empty() ? "" : ", ";
         known += text;
     }
-    throw BadRequest("there is no state \"" + name + "\" but " + known);
+    throw routes::BadRequest("there is no state \"" + name + "\" but " + known);
 }
 
 /// The value in the code page of the tables. What that cannot say, no task has been asked with.

@@ -5,10 +5,10 @@
 // reader that is too slow, "event: overflow" with "data: {"lost": N}" stands in the place of N
 // bytes.
 
-#include "host/api/call.h"
+#include "host/api/route.h"
 #include "host/api/services.h"
 #include "host/api/tasks/output_queue.h"
-#include "host/tables/bad_request.h"
+#include "routes/bad_request.h"
 
 namespace host {
 namespace {
@@ -54,7 +54,7 @@ std::optional<OutputPosition> wantedPosition(const Call& call) {
     const std::string text = call.after();
     if (text.empty()) return std::nullopt;
     const std::optional<OutputPosition> position = outputPositionIn(text);
-    if (!position) throw BadRequest("\"" + text + "\" is no position in a task's output");
+    if (!position) throw routes::BadRequest("\"" + text + "\" is no position in a task's output");
     return position;
 }
 

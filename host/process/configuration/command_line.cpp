@@ -8,7 +8,7 @@
 #include "host/process/configuration/option_table.h"
 #include "host/process/start_error.h"
 #include "host/process/version.h"
-#include "host/text/nearest_name.h"
+#include "text/nearest_name.h"
 
 namespace host {
 namespace {
@@ -44,7 +44,7 @@ std::vector<std::string> namesOf(const CLI::App& app) {
 [[noreturn]] void failOnStray(const CLI::App& app, const std::string& stray) {
     const bool isOption = !stray.empty() && stray.front() == '-';
     const std::string name = stray.substr(0, stray.find('='));
-    const std::string nearest = isOption ? nearestName(name, namesOf(app)) : "";
+    const std::string nearest = isOption ? text::nearestName(name, namesOf(app)) : "";
     throw StartError(
         (isOption ? "there is no option " + name : "the argument \"" + stray + "\" has no place") +
         (nearest.empty() ? "" : "; did you mean " + nearest + "?") + kHint);

@@ -22,8 +22,8 @@
 #include "host/process/configuration/option_table.h"
 #include "host/process/start_error.h"
 #include "host/process/system/trusted_file.h"
-#include "host/text/nearest_name.h"
 #include "system/file_descriptor.h"
+#include "text/nearest_name.h"
 
 namespace host {
 namespace {
@@ -78,7 +78,7 @@ std::string nearestKey(const std::string& key) {
     for (const OptionRow& row : optionTable()) {
         if (row.place == OptionPlace::Anywhere) names.emplace_back(row.name);
     }
-    return nearestName(key, names);
+    return text::nearestName(key, names);
 }
 
 const OptionRow& optionOf(const std::string& path, int line, const std::string& key) {

@@ -37,7 +37,7 @@ protected:
         trust_.name = "web-7";
         trust_.labels = {{"env", "test"}};
         trust_.root = root_.publicKey();
-        trust_.centre = centre_.publicKey();
+        trust_.centres = {centre_.publicKey()};
         certificate_.fleet = "north";
         certificate_.name = "mira";
         certificate_.key = operator_.publicKey();
@@ -106,6 +106,11 @@ TEST_F(JudgeTest, ANumberThatTheCentreHasNotSignedDoesNotCount) {
     EXPECT_FALSE(judged(order));
     EXPECT_FALSE(judged(""));
     EXPECT_FALSE(judged("garbage"));
+}
+
+TEST_F(JudgeTest, AnyOfTheCentresKeysMayHaveSignedANumber) {
+    trust_.centres.insert(trust_.centres.begin(), KeyPair::make(KeyKind::User).publicKey());
+    EXPECT_TRUE(judged(numbered(orderBytes())));
 }
 
 TEST_F(JudgeTest, AnOrderMayNotBeExchangedUnderItsNumber) {

@@ -87,7 +87,7 @@ TEST_F(Interface, RefusesRequestsThatMeanAnotherJournal) {
 }
 
 TEST_F(Interface, LetsReadersGetEverythingButOutput) {
-    for (const host::Route& route : api->router().routes()) {
+    for (const routes::RouteFacts& route : api->router().routes()) {
         const bool reads = std::string(route.method) == "GET" &&
                            std::string(route.path) != "/v1/tasks/{id}/output";
         const bool asks = std::string(route.path) == "/v1/query";  // judged by its table
@@ -97,7 +97,7 @@ TEST_F(Interface, LetsReadersGetEverythingButOutput) {
 }
 
 TEST_F(Interface, IsClosedToPeersWithoutAccess) {
-    for (const host::Route& route : api->router().routes()) {
+    for (const routes::RouteFacts& route : api->router().routes()) {
         EXPECT_EQ(ask(route.method, route.path, "{}", http::Access::None).status, 403U)
             << route.path;
     }

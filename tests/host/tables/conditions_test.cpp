@@ -26,7 +26,7 @@ std::string read(Read reading, const char* codePageName) {
     try {
         const oxa::Predicate found = reading(ConditionReader(plainTable(), codePage));
         return found.column + names[found.op] + found.value;
-    } catch (const host::BadRequest& bad) {
+    } catch (const routes::BadRequest& bad) {
         return std::string("refused: ") + bad.what();
     }
 }

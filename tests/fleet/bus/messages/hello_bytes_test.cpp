@@ -57,7 +57,7 @@ TEST(HelloBytes, KeepAllOfAHello) {
 TEST(HelloBytes, OpenOrdersAreIdentifiersAndNothingElse) {
     Reply reply;
     reply.open = {"0 HTTP/1.1\r\nHost: localhost\r\n\r\nPOST /v1/tasks HTTP/1.1\r\n\r\n"};
-    EXPECT_THROW(fleet::readReply(signReply("H", reply, kKey), "H", kKey.publicKey()),
+    EXPECT_THROW(fleet::readReply(signReply("H", reply, kKey), "H", {kKey.publicKey()}),
                  fleet::MessageError);
 }
 
@@ -82,7 +82,7 @@ TEST(HelloBytes, KeepAllOfAReply) {
     reply.list = true;
     reply.stop = "why";
     reply.revoked = {"key"};
-    const Reply read = fleet::readReply(signReply("H", reply, kKey), "H", kKey.publicKey());
+    const Reply read = fleet::readReply(signReply("H", reply, kKey), "H", {kKey.publicKey()});
     EXPECT_EQ(read.nonce, "n");
     EXPECT_EQ(read.time, Moment(5));
     EXPECT_EQ(read.over, Number{3});
@@ -115,7 +115,7 @@ TEST(HelloBytes, OfAnotherHostOrSignerOrPurposeDoNotCount) {
     EXPECT_THROW(fleet::readHello(hello, "G", kKey.publicKey()), MessageError);
     const KeyPair other = KeyPair::make(KeyKind::User);
     EXPECT_THROW(fleet::readHello(hello, "H", other.publicKey()), MessageError);
-    EXPECT_THROW(fleet::readReply(hello, "H", kKey.publicKey()), MessageError);
+    EXPECT_THROW(fleet::readReply(hello, "H", {kKey.publicKey()}), MessageError);
     EXPECT_THROW(fleet::readOutcome(hello, "H", kKey.publicKey()), MessageError);
     EXPECT_THROW(fleet::readHello("", "H", kKey.publicKey()), MessageError);
 }

@@ -228,6 +228,19 @@ TEST_F(CentreTest, TwoSessionsInTurnAreTwoMachines) {
     EXPECT_EQ(alarms_, std::vector<std::string>{"a"});
 }
 
+TEST_F(CentreTest, AHelloThatIsOlderThanOneBeforeCountsNothing) {
+    Hello before = hello(3);
+    before.time = Moment(1'000);
+    greet("a", before);
+    Hello after = hello(4);
+    after.session = "after a new start";
+    after.time = Moment(2'000);
+    greet("a", after);
+    EXPECT_FALSE(centre_.greet("a", before, kNow).has_value());
+    EXPECT_EQ(greet("a", after).stop, "");
+    EXPECT_TRUE(alarms_.empty());
+}
+
 TEST_F(CentreTest, StartsOneAfterTheOtherAreNoAlarm) {
     for (int start = 0; start < 5; ++start) {
         Hello said = hello(0);

@@ -97,7 +97,8 @@ TEST_F(RunningCentre, HasTheBusCutOffAHostThatIsRevokedWhileItRuns) {
 }
 
 TEST_F(RunningCentre, IsAProgramThatEndsWhenItIsTold) {
-    Program program({ZAV_BUILD_DIR "/bin/zavfleetd", "--directory", directory().path(), "serve"});
+    Program program({ZAV_BUILD_DIR "/bin/zavfleetd", "--directory", directory().path(), "serve",
+                     "--port", "0"});
     ASSERT_TRUE(program.awaitOutput("started", kPatience)) << program.err();
     EXPECT_TRUE(eventually(
         [&program] { return program.err().find("the centre works") != std::string::npos; }));

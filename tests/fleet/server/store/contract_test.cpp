@@ -89,6 +89,7 @@ TYPED_TEST(CentreStoreContract, KeepsAllOfAHost) {
     record.unpublished = "unpublished";
     record.signing = "UKEY";
     record.name = "web-1";
+    record.toldTime = fleet::Moment(1'234'567'890'000);
     record.heard = fleet::Moment(1'234'567'890'123);
     this->store().keepHost(record);
     const fleet::HostRecord kept = this->store().host("c").value();
@@ -103,6 +104,7 @@ TYPED_TEST(CentreStoreContract, KeepsAllOfAHost) {
     EXPECT_EQ(kept.unpublished, "unpublished");
     EXPECT_EQ(kept.signing, "UKEY");
     EXPECT_EQ(kept.name, "web-1");
+    EXPECT_EQ(kept.toldTime, fleet::Moment(1'234'567'890'000));
     EXPECT_EQ(kept.heard, fleet::Moment(1'234'567'890'123));
     record.machine.clear();
     this->store().keepHost(record);

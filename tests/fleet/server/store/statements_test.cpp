@@ -30,7 +30,8 @@ TEST_P(StoreStatement, NeitherGoesThroughAllOrdersNorSortsThem) {
 
 INSTANTIATE_TEST_SUITE_P(All, StoreStatement,
                          testing::Values(fleet::kOrderByName, fleet::kOrderByNumber,
-                                         fleet::kUnpublished, fleet::kOpen, fleet::kNotePublished,
+                                         fleet::kUnpublished, fleet::kOpen, fleet::kLatest,
+                                         fleet::kNotePublished,
                                          fleet::kKeepOutcome, fleet::kHold, fleet::kRelease,
                                          fleet::kReleaseAll, fleet::kComplete));
 

@@ -1,0 +1,14 @@
+/// One link, or one enrolment, for each directory.
+#pragma once
+
+#include <string>
+
+#include "fleet/files/descriptor.h"
+
+namespace fleet {
+
+/// Two that use one directory would each undo what the other has kept. The lock lasts as long as
+/// the descriptor. Throws FileError, also when another process has it.
+Descriptor lockDirectory(const std::string& directory);
+
+}  // namespace fleet

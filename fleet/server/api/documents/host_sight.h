@@ -1,0 +1,38 @@
+/// A host as operators see it.
+#pragma once
+
+#include <nlohmann/json_fwd.hpp>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "fleet/server/api/visit.h"
+#include "fleet/server/core/records.h"
+#include "fleet/server/program/centre_program.h"
+
+namespace fleet {
+
+/// What is known of a host, from both databases and from its last hello.
+struct HostSight {
+    std::string host;
+    Member member;
+    std::optional<HostRecord> record;
+    std::optional<HostNews> news;
+};
+
+/// Whether the visitor may see a host of the fleet.
+bool maySee(const Visit& visit, const Member& member);
+
+/// The bus key of a host that the visitor may see, by its name or its key. Throws NothingThere.
+std::string hostNamed(const Visit& visit, const Members& members, const std::string& nameOrKey);
+
+/// What is known of these members. Throws Unavailable.
+std::vector<HostSight> sightsOf(const Visit& visit, const Members& members,
+                                const std::vector<std::string>& hosts);
+
+nlohmann::json hostDocument(const HostSight& sight, Moment now);
+
+/// A time as documents have it.
+std::string timeOfDocument(Moment time);
+
+}  // namespace fleet

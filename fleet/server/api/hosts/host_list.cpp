@@ -1,0 +1,52 @@
+// GET /v1/hosts
+
+#include <nlohmann/json.hpp>
+
+#include "fleet/bus/messages/document.h"
+#include "fleet/server/api/documents/host_sight.h"
+#include "fleet/server/api/documents/page.h"
+
+using nlohmann::json;
+
+namespace fleet {
+
+ApiEndpoint getHosts;
+
+namespace {
+
+/// The hosts behind `after` that the visitor means and may see, one more than wanted.
+std::vector<std::string> hostsMeant(const Visit& visit, const Members& members,
+                                    const std::string& selector, const std::string& after,
+                                    std::size_t most) {
+    const Selector meant(selector);
+    const Selector visible(visit.grant.selector);
+    std::vector<std::string> hosts;
+    for (auto member = members.upper_bound(after); member != members.end(); ++member) {
+        const auto& [name, signing, labels] = member->second;
+        if (!meant.matches(name, labels) || !visible.matches(name, labels)) continue;
+        hosts.push_back(member->first);
+        if (hosts.size() > most) break;
+    }
+    return hosts;
+}
+
+}  // namespace
+
+http::Answer getHosts(Visit& visit, const Call& call) {
+    const std::string* const selector = call.text("selector");
+    const std::string* const after = call.text("after");
+    const std::size_t most = pageSize(call, 100, 1000);
+    const auto members = visit.services.members();
+    std::vector<std::string> hosts = hostsMeant(visit, *members, selector ? *selector : "*",
+                                                after ? *after : std::string(), most);
+    json document = {{"hosts", json::array()}};
+    if (hosts.size() > most) {
+        hosts.pop_back();
+        document["next"] = hosts.back();
+    }
+    for (const HostSight& sight : sightsOf(visit, *members, hosts))
+        document["hosts"].push_back(hostDocument(sight, ApiServices::now()));
+    return http::jsonReply(200, textOf(document));
+}
+
+}  // namespace fleet

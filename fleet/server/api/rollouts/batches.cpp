@@ -1,0 +1,24 @@
+// POST /v1/batches, POST /v1/batches/{batch}/orders: signed orders, before a roll-out takes them.
+
+#include <nlohmann/json.hpp>
+
+#include "fleet/bus/messages/document.h"
+#include "fleet/server/api/rollouts/given_orders.h"
+
+namespace fleet {
+
+ApiEndpoint postBatch, postBatchOrders;
+
+http::Answer postBatch(Visit& visit, const Call&) {
+    return http::jsonReply(
+        201, textOf({{"batch", visit.services.batches.open(visit.key, ApiServices::now())}}));
+}
+
+http::Answer postBatchOrders(Visit& visit, const Call& call) {
+    const auto total = visit.services.batches.add(
+        visit.key, call.required("batch"), ordersIn(call.body().at("orders")), ApiServices::now());
+    if (!total) throw NothingThere("there is no such batch; it may have been left for too long");
+    return http::jsonReply(200, textOf({{"orders", *total}}));
+}
+
+}  // namespace fleet

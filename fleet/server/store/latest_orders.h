@@ -1,0 +1,17 @@
+/// What a host was asked for last, for people.
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <vector>
+
+#include "fleet/server/core/records.h"
+#include "sqlite/database.h"
+
+namespace fleet {
+
+/// The host's orders with the highest numbers, descending. Throws sqlite::DatabaseError.
+std::vector<OrderRecord> latestOrders(sqlite::Database& database, const std::string& host,
+                                      std::size_t most);
+
+}  // namespace fleet

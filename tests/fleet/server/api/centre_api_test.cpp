@@ -1,0 +1,441 @@
+// ctest-label: threaded
+// The centre's interface with a real centre behind it, without its connections.
+#include "fleet/server/api/centre_api.h"
+
+#include <gtest/gtest.h>
+
+#include <future>
+#include <map>
+#include <memory>
+#include <nlohmann/json.hpp>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "fleet/bus/messages/document.h"
+#include "fleet/bus/messages/enrolment.h"
+#include "fleet/bus/messages/login.h"
+#include "fleet/bus/messages/order.h"
+#include "fleet/bus/trust/checksum.h"
+#include "fleet/server/api/routes.h"
+#include "fleet/server/keys/trust/host_enrolment.h"
+#include "fleet/server/keys/trust/revocations.h"
+#include "tests/fleet/server/keys/running_fleet.h"
+
+namespace {
+
+using fleet::KeyKind;
+using fleet::KeyPair;
+using fleet::Moment;
+using fleet::OperatorGrant;
+using fleet::Role;
+using made_fleet::RunningFleet;
+using made_fleet::today;
+using nlohmann::json;
+
+struct Answered {
+    unsigned status = 0;
+    json document;
+};
+
+/// An operator's key with what makes it count.
+struct LoggedIn {
+    KeyPair key = KeyPair::make(KeyKind::User);
+    std::string certificate;
+    std::string session;
+};
+
+class CentreInterface : public testing::Test {
+protected:
+    CentreInterface() {
+        service_ = std::make_unique<fleet::CentreService>(
+            fleet::ServiceOptions{fleet_->made().directory().path()});
+        running_ = std::async(std::launch::async, [this] { return service_->run(); });
+        eventually([this] { return service_->centre().isWorking(); });
+        services_ = std::make_unique<fleet::ApiServices>(*service_);
+        api_ = std::make_unique<fleet::CentreApi>(*services_, fleet::apiRoutes());
+    }
+    ~CentreInterface() override {
+        service_->end();
+        running_.get();
+    }
+
+    Answered ask(const std::string& method, const std::string& target,
+                 const std::string& session = "", const std::string& body = "") {
+        http::Request request{method, target, body, {0, 0, 0, http::Access::Act}};
+        if (!session.empty()) request.authorization = "Bearer " + session;
+        auto handled = api_->handle(std::move(request));
+        if (auto* const job = std::get_if<http::Job>(&handled)) handled = (*job)();
+        const auto& reply = std::get<http::Reply>(std::get<http::Answer>(handled));
+        return {reply.status, json::parse(reply.body)};
+    }
+    Answered get(const std::string& target, const LoggedIn& who) {
+        return ask("GET", target, who.session);
+    }
+    Answered post(const std::string& target, const LoggedIn& who, const json& body = {}) {
+        return ask("POST", target, who.session, body.is_null() ? "" : body.dump());
+    }
+
+    std::string sessionRequest(const KeyPair& key) const {
+        return signSessionRequest({services_->facts.fleet, key.publicKey(), services_->facts.url,
+                                   today(), fleet::makeOrderId()},
+                                  key);
+    }
+    /// An operator who has got their certificate and opened a session.
+    LoggedIn login(const OperatorGrant& grant) {
+        LoggedIn who;
+        const std::string token = services_->withTrust([&](sqlite::Database& database) {
+            return fleet::Operators(database).invite(grant, made_fleet::kDay, today());
+        });
+        const std::string request = signLogin({"demo", token, who.key.publicKey()}, who.key);
+        const Answered waits = ask("POST", "/v1/logins", "", request);
+        EXPECT_EQ(waits.status, 200U) << waits.document;
+        EXPECT_FALSE(waits.document.contains("certificate"));
+        services_->withTrust([&](sqlite::Database& database) {
+            fleet::Operators(database).certify({who.key.publicKey()}, fleet_->made().root(),
+                                               today());
+            return 0;
+        });
+        const Answered answer = ask("POST", "/v1/logins", "", request);
+        who.certificate =
+            fleet::bytesOfBase64(answer.document.at("certificate").get<std::string>());
+        who.session =
+            ask("POST", "/v1/sessions", "", sessionRequest(who.key)).document.value("session", "");
+        EXPECT_FALSE(who.session.empty());
+        return who;
+    }
+    LoggedIn admin() { return login({"ada", Role::Admin, {}, {}, "*", made_fleet::kDay}); }
+
+    /// A host that has joined; returns its bus key.
+    std::string join(const std::string& name, const fleet::Labels& labels = {}) {
+        const KeyPair bus = KeyPair::make(KeyKind::User);
+        const KeyPair signing = KeyPair::make(KeyKind::User);
+        const std::string token = services_->withTrust([&](sqlite::Database& database) {
+            return fleet::HostEnrolment(database).invite({name, labels}, today());
+        });
+        const Answered answer =
+            ask("POST", "/v1/enrolments", "",
+                signEnrolment({"demo", token, bus.publicKey(), signing.publicKey(), "machine"}, bus,
+                              signing));
+        EXPECT_EQ(answer.status, 200U) << answer.document;
+        EXPECT_EQ(fleet::readEnrolmentAnswer(answer.document.dump()).name, name);
+        signers_.emplace(name, signing);
+        return bus.publicKey();
+    }
+
+    static std::string orderFor(const std::string& host, const LoggedIn& who,
+                                const std::string& id = fleet::makeOrderId(),
+                                const std::vector<fleet::OrderFile>& files = {}) {
+        fleet::Order order;
+        order.fleet = "demo";
+        order.id = id;
+        order.host = host;
+        order.selector = "*";
+        order.kind = "START";
+        order.body = R"({"product":"ux"})";
+        order.files = files;
+        order.issued = today();
+        order.expires = today() + made_fleet::kDay;
+        return fleet::base64Of(signOrder(order, who.key, who.certificate));
+    }
+
+    std::map<std::string, KeyPair> signers_;  ///< of the hosts that have joined, by their names
+    const std::unique_ptr<RunningFleet> fleet_ = RunningFleet::start();
+    std::unique_ptr<fleet::CentreService> service_;
+    std::future<fleet::CentreProgram::End> running_;
+    std::unique_ptr<fleet::ApiServices> services_;
+    std::unique_ptr<fleet::CentreApi> api_;
+};
+
+TEST_F(CentreInterface, TellsAnybodyWhetherItWorks) {
+    const Answered answer = ask("GET", "/v1/health");
+    EXPECT_EQ(answer.status, 200U);
+    EXPECT_EQ(answer.document["program"], "zavfleetd");
+    EXPECT_EQ(answer.document["fleet"], "demo");
+    EXPECT_EQ(answer.document["state"], "working");
+}
+
+TEST_F(CentreInterface, AnswersNothingElseWithoutASession) {
+    for (const fleet::ApiRoute& route : fleet::apiRoutes()) {
+        if (route.access == http::Access::None) continue;
+        const std::string query =
+            std::string(route.path).find("to-sign") == std::string::npos ? "" : "?for=abort";
+        EXPECT_EQ(ask(route.method, route.path + query).status, 401U) << route.path;
+        EXPECT_EQ(ask(route.method, route.path + query, "no session").status, 401U) << route.path;
+    }
+}
+
+TEST_F(CentreInterface, OpensSessionsForCertifiedKeysOnly) {
+    const KeyPair stranger = KeyPair::make(KeyKind::User);
+    EXPECT_EQ(ask("POST", "/v1/sessions", "", sessionRequest(stranger)).status, 403U);
+    EXPECT_EQ(ask("POST", "/v1/sessions", "", "nonsense").status, 400U);
+    const LoggedIn ada = admin();
+    const std::string request = signSessionRequest(
+        {"demo", ada.key.publicKey(), "https://elsewhere", today(), fleet::makeOrderId()}, ada.key);
+    EXPECT_EQ(ask("POST", "/v1/sessions", "", request).status, 403U);
+    const std::string once = sessionRequest(ada.key);
+    EXPECT_EQ(ask("POST", "/v1/sessions", "", once).status, 200U);
+    EXPECT_EQ(ask("POST", "/v1/sessions", "", once).status, 403U);
+}
+
+TEST_F(CentreInterface, TellsAnOperatorWhoHeIs) {
+    const LoggedIn otto =
+        login({"otto", Role::Operator, {"START"}, {"ux"}, "env=test", made_fleet::kDay});
+    const Answered answer = get("/v1/whoami", otto);
+    EXPECT_EQ(answer.status, 200U);
+    EXPECT_EQ(answer.document, (json{{"operator", "otto"},
+                                     {"key", otto.key.publicKey()},
+                                     {"role", "operator"},
+                                     {"commands", {"START"}},
+                                     {"products", {"ux"}},
+                                     {"selector", "env=test"},
+                                     {"fleet", "demo"}}));
+}
+
+TEST_F(CentreInterface, EndsTheSessionsOfAKeyThatIsRevoked) {
+    const LoggedIn ada = admin();
+    EXPECT_EQ(get("/v1/hosts", ada).status, 200U);
+    services_->withTrust([&](sqlite::Database& database) {
+        return fleet::RevokedKeys(database).revokeOperator("ada", today());
+    });
+    EXPECT_EQ(get("/v1/hosts", ada).status, 401U);
+    EXPECT_EQ(ask("POST", "/v1/sessions", "", sessionRequest(ada.key)).status, 403U);
+}
+
+TEST_F(CentreInterface, LetsNobodyJoinWithoutAnInvitation) {
+    const KeyPair bus = KeyPair::make(KeyKind::User);
+    const KeyPair signing = KeyPair::make(KeyKind::User);
+    const std::string request = signEnrolment(
+        {"demo", "A123456789012345678901", bus.publicKey(), signing.publicKey(), "machine"}, bus,
+        signing);
+    EXPECT_EQ(ask("POST", "/v1/enrolments", "", request).status, 403U);
+    EXPECT_EQ(ask("POST", "/v1/enrolments", "", "").status, 400U);
+    EXPECT_EQ(ask("POST", "/v1/logins", "", "{}").status, 400U);
+}
+
+TEST_F(CentreInterface, ListsTheHostsThatHaveJoined) {
+    const LoggedIn ada = admin();
+    const std::string web = join("web-1", {{"env", "test"}});
+    const std::string db = join("db-1", {{"env", "prod"}});
+    const Answered all = get("/v1/hosts", ada);
+    ASSERT_EQ(all.document["hosts"].size(), 2U);
+    const Answered some = get("/v1/hosts?selector=env%3Dtest", ada);
+    ASSERT_EQ(some.document["hosts"].size(), 1U);
+    const json& host = some.document["hosts"][0];
+    EXPECT_EQ(host["host"], web);
+    EXPECT_EQ(host["name"], "web-1");
+    EXPECT_EQ(host["labels"], (json{{"env", "test"}}));
+    EXPECT_EQ(host["state"], "unknown") << "it was never heard";
+    EXPECT_EQ(get("/v1/hosts/db-1", ada).document["host"], db);
+    EXPECT_EQ(get("/v1/hosts/" + db, ada).document["name"], "db-1");
+    EXPECT_EQ(get("/v1/hosts/nobody", ada).status, 404U);
+    EXPECT_EQ(get("/v1/hosts?selector=%3D", ada).status, 400U);
+}
+
+TEST_F(CentreInterface, ListsHostsInPages) {
+    const LoggedIn ada = admin();
+    std::set<std::string> joined, listed;
+    for (int i = 0; i < 5; ++i)
+        joined.insert(join("web-" + std::to_string(i)));
+    std::string after;
+    for (int page = 0; page < 3; ++page) {
+        const Answered answer = get("/v1/hosts?limit=2&after=" + after, ada);
+        for (const json& host : answer.document["hosts"])
+            listed.insert(host["host"].get<std::string>());
+        EXPECT_EQ(answer.document.contains("next"), page < 2);
+        after = answer.document.value("next", "");
+    }
+    EXPECT_EQ(listed, joined);
+}
+
+TEST_F(CentreInterface, ShowsAViewerOnlyTheirHosts) {
+    join("web-1", {{"env", "test"}});
+    join("db-1", {{"env", "prod"}});
+    const LoggedIn vera = login({"vera", Role::Viewer, {}, {}, "env=test", made_fleet::kDay});
+    const Answered hosts = get("/v1/hosts", vera);
+    ASSERT_EQ(hosts.document["hosts"].size(), 1U);
+    EXPECT_EQ(hosts.document["hosts"][0]["name"], "web-1");
+    EXPECT_EQ(get("/v1/hosts/db-1", vera).status, 404U);
+    EXPECT_EQ(get("/v1/hosts/db-1/orders", vera).status, 404U);
+}
+
+TEST_F(CentreInterface, LetsAViewerChangeNothing) {
+    const LoggedIn vera = login({"vera", Role::Viewer, {}, {}, "*", made_fleet::kDay});
+    for (const fleet::ApiRoute& route : fleet::apiRoutes()) {
+        if (route.access != http::Access::Act) continue;
+        EXPECT_EQ(ask(route.method, route.path, vera.session, "{}").status, 403U) << route.path;
+    }
+}
+
+TEST_F(CentreInterface, LetsAdminsLabelHosts) {
+    const LoggedIn ada = admin();
+    const LoggedIn otto = login({"otto", Role::Operator, {"START"}, {"ux"}, "*", made_fleet::kDay});
+    join("web-1", {{"env", "test"}});
+    const json labels = {{"labels", {{"env", "prod"}, {"rack", "7"}}}};
+    EXPECT_EQ(post("/v1/hosts/web-1/labels", otto, labels).status, 403U);
+    EXPECT_EQ(post("/v1/hosts/web-1/labels", ada, labels).document["labels"], labels["labels"]);
+    EXPECT_EQ(get("/v1/hosts?selector=rack%3D7", ada).document["hosts"].size(), 1U);
+    for (const json& bad : {json{{"a b", "x"}}, json{{"a", 7}}, json{{"a", "x,b=y"}}}) {
+        EXPECT_EQ(post("/v1/hosts/web-1/labels", ada, {{"labels", bad}}).status, 400U) << bad;
+    }
+    EXPECT_EQ(get("/v1/hosts/web-1", ada).document["labels"], labels["labels"]);
+}
+
+TEST_F(CentreInterface, MakesARollOutOfOrders) {
+    const LoggedIn ada = admin();
+    const std::string one = join("web-1");
+    const std::string other = join("web-2");
+    const std::string order = fleet::makeOrderId();
+    const Answered made = post("/v1/rollouts", ada,
+                               {{"waves", "1,100%"},
+                                {"maxFailures", "1"},
+                                {"pause", 0.5},
+                                {"orders", {orderFor(one, ada, order), orderFor(other, ada)}}});
+    ASSERT_EQ(made.status, 201U) << made.document;
+    EXPECT_EQ(made.document["kind"], "START");
+    EXPECT_EQ(made.document["product"], "ux");
+    EXPECT_EQ(made.document["operator"], "ada");
+    EXPECT_EQ(made.document["hosts"], 2);
+    EXPECT_EQ(made.document["plan"]["pause"], 0.5);
+    const std::string path = "/v1/rollouts/" + made.document["id"].get<std::string>();
+    // The first wave is released with the next look, and its host is never heard of.
+    EXPECT_TRUE(eventually([&] { return get(path, ada).document["counts"]["released"] == 1; }));
+    const json parts = get(path + "/hosts", ada).document["hosts"];
+    ASSERT_EQ(parts.size(), 2U);
+    EXPECT_EQ(parts[0]["name"], "web-1");
+    EXPECT_EQ(parts[0]["state"], "released");
+    EXPECT_EQ(parts[0]["order"], order);
+    EXPECT_EQ(parts[1]["state"], "waiting");
+    EXPECT_EQ(get("/v1/rollouts", ada).document["rollouts"][0]["id"], made.document["id"]);
+    const json given = get("/v1/hosts/web-1/orders", ada).document["orders"];
+    ASSERT_EQ(given.size(), 1U);
+    EXPECT_EQ(given[0]["order"], order);
+    EXPECT_EQ(given[0]["kind"], "START");
+    EXPECT_EQ(given[0]["product"], "ux");
+    EXPECT_EQ(given[0]["state"], "open");
+}
+
+TEST_F(CentreInterface, TakesOrdersInABatch) {
+    const LoggedIn ada = admin();
+    const std::string batch = post("/v1/batches", ada).document["batch"];
+    const std::string path = "/v1/batches/" + batch + "/orders";
+    EXPECT_EQ(post(path, ada, {{"orders", {orderFor(join("web-1"), ada)}}}).document["orders"], 1);
+    EXPECT_EQ(post(path, ada, {{"orders", {orderFor(join("web-2"), ada)}}}).document["orders"], 2);
+    EXPECT_EQ(post(path, ada, {{"orders", {"@"}}}).status, 400U);
+    EXPECT_EQ(post(path, ada, {{"orders", {7}}}).status, 400U);
+    EXPECT_EQ(post("/v1/rollouts", ada, {{"batch", batch}, {"orders", json::array()}}).status,
+              400U);
+    EXPECT_EQ(post("/v1/rollouts", ada, {{"batch", batch}}).document["hosts"], 2);
+    EXPECT_EQ(post("/v1/rollouts", ada, {{"batch", batch}}).status, 404U) << "it was taken";
+}
+
+TEST_F(CentreInterface, RefusesRollOutsThatCannotBe) {
+    const LoggedIn ada = admin();
+    const LoggedIn otto = login({"otto", Role::Operator, {"START"}, {"ux"}, "*", made_fleet::kDay});
+    const std::string host = join("web-1");
+    const json orders = {orderFor(host, ada)};
+    EXPECT_EQ(post("/v1/rollouts", ada, json::object()).status, 400U);
+    EXPECT_EQ(post("/v1/rollouts", ada, {{"orders", {"AAAA"}}}).status, 400U);
+    EXPECT_EQ(post("/v1/rollouts", otto, {{"orders", orders}}).status, 400U)
+        << "signed by somebody else";
+    for (const json& bad : {json{{"waves", "0"}}, json{{"maxFailures", "x"}}, json{{"pause", -1}},
+                            json{{"pause", 1e300}}, json{{"parallel", 0}}, json{{"parallel", -1}},
+                            json{{"parallel", 1.5}}, json{{"id", "x"}}, json{{"wait", 0}}}) {
+        json body = bad;
+        body["orders"] = orders;
+        EXPECT_EQ(post("/v1/rollouts", ada, body).status, 400U) << bad;
+    }
+    EXPECT_EQ(get("/v1/rollouts", ada).document["rollouts"].size(), 0U);
+    EXPECT_EQ(get("/v1/rollouts/nothing", ada).status, 404U);
+}
+
+TEST_F(CentreInterface, PausesResumesAndAbortsRollOuts) {
+    const LoggedIn ada = admin();
+    const LoggedIn otto = login({"otto", Role::Operator, {"START"}, {"ux"}, "*", made_fleet::kDay});
+    const std::string host = join("web-1");
+    const std::string order = fleet::makeOrderId();
+    const std::string id =
+        post("/v1/rollouts", ada, {{"orders", {orderFor(host, ada, order)}}}).document["id"];
+    const std::string path = "/v1/rollouts/" + id;
+    EXPECT_EQ(post(path + "/pause", otto).status, 403U) << "it is somebody else's";
+    EXPECT_EQ(post(path + "/pause", ada).document["state"], "paused");
+    EXPECT_EQ(post(path + "/pause", ada).status, 409U);
+    EXPECT_EQ(post(path + "/resume", ada, json::object()).document["state"], "running");
+    EXPECT_TRUE(eventually([&] { return get(path, ada).document["counts"]["released"] == 1; }));
+    EXPECT_EQ(post(path + "/abort", ada, json::object()).document["state"], "aborted");
+    const json toSign = get(path + "/to-sign?for=abort", ada).document;
+    EXPECT_EQ(toSign["total"], 1);
+    ASSERT_EQ(toSign["hosts"].size(), 1U);
+    EXPECT_EQ(toSign["hosts"][0]["host"], host);
+    EXPECT_EQ(toSign["hosts"][0]["order"], order);
+    const std::string bytes = fleet::bytesOfBase64(toSign["hosts"][0]["signed"].get<std::string>());
+    EXPECT_EQ(fleet::readOrder(bytes).order.id, order);
+    EXPECT_TRUE(isSignedByOperator(fleet::readOrder(bytes), ada.key.publicKey()));
+    EXPECT_EQ(get(path + "/to-sign?for=nothing", ada).status, 400U);
+    EXPECT_EQ(get(path + "/failures", ada).document["hosts"].size(), 0U);
+}
+
+TEST_F(CentreInterface, GivesAFileToTheHostWhoseOrderNeedsIt) {
+    const LoggedIn ada = admin();
+    const std::string web = join("web-1");
+    join("web-2");
+    fleet::Checksum sum;
+    sum.add("package");
+    const std::string path = "/v1/files/" + sum.hex();
+    const std::vector<fleet::OrderFile> files = {{"ux.tar", path.substr(10), 7}};
+    const json orders = {orderFor(web, ada, fleet::makeOrderId(), files)};
+    EXPECT_EQ(post("/v1/rollouts", ada, {{"orders", orders}}).status, 400U) << "it is not here";
+    EXPECT_EQ(get(path + "?size=7", ada).status, 404U);
+    EXPECT_EQ(ask("POST", path + "?size=7&from=0", ada.session, "pack").document["have"], 4);
+    EXPECT_EQ(get(path + "?size=7", ada).document["complete"], false);
+    EXPECT_EQ(ask("POST", path + "?size=7&from=4", ada.session, "age").document["complete"], true);
+
+    const auto sessionOf = [&](const std::string& host) {
+        return ask("POST", "/v1/sessions", "", sessionRequest(signers_.at(host)))
+            .document.value("session", "");
+    };
+    const auto fetch = [&](const std::string& session, const std::string& range) {
+        http::Request request{"GET", path + "/content", "", {0, 0, 0, http::Access::Act}};
+        request.authorization = "Bearer " + session;
+        request.range = range;
+        auto handled = api_->handle(std::move(request));
+        handled = std::get<http::Job>(handled)();
+        return std::get<http::Reply>(std::get<http::Answer>(handled));
+    };
+    const std::string host = sessionOf("web-1");
+    EXPECT_EQ(fetch(host, "").status, 403U) << "no order of it needs the file yet";
+    const json made = post("/v1/rollouts", ada, {{"orders", orders}}).document;
+    ASSERT_TRUE(eventually([&] { return fetch(host, "").status == 206; })) << made;
+    EXPECT_EQ(fetch(host, "").body, "package");
+    const http::Reply piece = fetch(host, "bytes=2-3");
+    EXPECT_EQ(piece.body, "ck");
+    EXPECT_EQ(piece.fields.at(0).second, "bytes 2-3/7");
+    EXPECT_EQ(fetch(host, "bytes=5-").body, "ge");
+    EXPECT_EQ(fetch(host, "bytes=7-").status, 416U);
+    EXPECT_EQ(fetch(host, "bytes=-3").body, "package");
+    EXPECT_EQ(fetch(host, "bytes=99999999999999999999-").body, "package");
+    EXPECT_EQ(fetch(sessionOf("web-2"), "").status, 403U);
+    EXPECT_EQ(fetch(ada.session, "").status, 401U);
+    EXPECT_EQ(get("/v1/hosts", {signers_.at("web-1"), "", host}).status, 401U)
+        << "a host is no operator";
+}
+
+TEST_F(CentreInterface, TakesNoFileThatIsNotWhatItWasSaidToBe) {
+    const LoggedIn ada = admin();
+    const std::string path = "/v1/files/" + std::string(64, 'a');
+    EXPECT_EQ(ask("POST", path + "?size=1&from=0", ada.session, "x").status, 400U);
+    EXPECT_EQ(ask("POST", path + "?size=1", ada.session, "x").status, 400U);
+    EXPECT_EQ(ask("POST", "/v1/files/x?size=1&from=0", ada.session, "x").status, 400U);
+    EXPECT_EQ(ask("POST", path + "?size=999999999999999&from=0", ada.session, "x").status, 507U);
+}
+
+TEST_F(CentreInterface, SaysWhenItCannotDoAnythingNow) {
+    const LoggedIn ada = admin();
+    service_->end();
+    eventually([this] { return !service_->centre().isWorking(); });
+    EXPECT_EQ(ask("GET", "/v1/health").document["state"], "waiting");
+    EXPECT_EQ(get("/v1/rollouts", ada).status, 503U);
+    EXPECT_EQ(get("/v1/whoami", ada).status, 200U);
+}
+
+}  // namespace
