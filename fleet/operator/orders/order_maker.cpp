@@ -1,5 +1,6 @@
 #include "fleet/operator/orders/order_maker.h"
 
+#include <optional>
 #include <utility>
 
 #include "ctl/client/failure.h"
@@ -44,8 +45,13 @@ Work workOf(const ctl::TaskRequest& request) {
     return work;
 }
 
-OrderMaker::OrderMaker(const OperatorIdentity& identity, Moment now, Moment lasting)
-    : identity_(identity), grant_(identity.grant()), now_(now), lasting_(lasting) {
+OrderMaker::OrderMaker(const OperatorIdentity& identity, std::string rollout, Moment now,
+                       Moment lasting)
+    : identity_(identity),
+      grant_(identity.grant()),
+      rollout_(std::move(rollout)),
+      now_(now),
+      lasting_(lasting) {
     if (grant_.until <= now) {
         throw ctl::Failure(ctl::kHostReportedFailure, "your certificate has ended",
                            "Ask for another invitation, and log in with that.");
@@ -63,9 +69,16 @@ void OrderMaker::insistThatAllowed(const std::string& kind, const std::string& p
                        "zavctl whoami with --fleet shows what it allows.");
 }
 
+OrderChain OrderMaker::chainOf(const std::string& host) const {
+    return {identity_.key, rollout_, host};
+}
+
+bool OrderMaker::isOwn(const Order& order) const {
+    return chainOf(order.host).numberOf(order.id).has_value();
+}
+
 std::string OrderMaker::sign(Order order) const {
     order.fleet = identity_.fleet;
-    order.id = makeOrderId();
     order.issued = now_;
     order.expires = now_ + lasting_;
     std::string bytes = signOrder(order, identity_.key, identity_.certificate);
@@ -89,6 +102,7 @@ std::string OrderMaker::orderFor(const ChosenHost& host, const Work& work,
         body["sealed"] = base64Of(sealFor(host.signing, work.hidden));
     }
     Order order;
+    order.id = chainOf(host.key).identifier(0);
     order.host = host.key;
     order.selector = selector;
     order.kind = work.kind;
@@ -97,11 +111,22 @@ std::string OrderMaker::orderFor(const ChosenHost& host, const Work& work,
 }
 
 std::string OrderMaker::again(const Order& order) const {
-    return sign(order);
+    const OrderChain chain = chainOf(order.host);
+    const std::optional<std::size_t> known = chain.numberOf(order.id);
+    // The first one of this operator, if the order is another one's.
+    const std::size_t next = known ? *known + 1 : 0;
+    if (next >= kMostTries) {
+        throw ctl::Failure(ctl::kHostReportedFailure,
+                           "the roll-out has tried too often; begin another one");
+    }
+    Order another = order;
+    another.id = chain.identifier(next);
+    return sign(std::move(another));
 }
 
 std::string OrderMaker::cancelOf(const Order& order) const {
     Order cancel;
+    cancel.id = makeOrderId();
     cancel.host = order.host;
     cancel.selector = order.selector;
     cancel.kind = kCancel;

@@ -8,6 +8,7 @@
 #include "fleet/bus/messages/order.h"
 #include "fleet/operator/identity/operator_identity.h"
 #include "fleet/operator/orders/chosen_hosts.h"
+#include "fleet/operator/orders/order_chain.h"
 
 namespace fleet {
 
@@ -30,9 +31,10 @@ constexpr std::size_t kMostOrderBytes = 700'000;
 
 class OrderMaker {
 public:
-    /// The orders are issued now and end so much later. Borrows the identity. Throws ctl::Failure
-    /// if the certificate has ended, or `lasting` is above kLongestOrder or not above 0.
-    OrderMaker(const OperatorIdentity& identity, Moment now, Moment lasting);
+    /// The orders are those of one roll-out, are issued now and end so much later. Borrows the
+    /// identity. Throws ctl::Failure if the certificate has ended, or `lasting` is above
+    /// kLongestOrder or not above 0.
+    OrderMaker(const OperatorIdentity& identity, std::string rollout, Moment now, Moment lasting);
 
     /// Throws ctl::Failure if the certificate does not allow a command, for which no host would
     /// carry it out.
@@ -43,16 +45,22 @@ public:
     std::string orderFor(const ChosenHost& host, const Work& work,
                          const std::string& selector) const;
 
+    /// Whether this operator has made the order, for this roll-out.
+    bool isOwn(const Order& order) const;
+
     /// A signed order that does the same as another one, with another identifier and other times.
+    /// Throws ctl::Failure for more tries than kMostTries.
     std::string again(const Order& order) const;
     /// A signed order that cancels another one.
     std::string cancelOf(const Order& order) const;
 
 private:
+    OrderChain chainOf(const std::string& host) const;
     std::string sign(Order order) const;
 
     const OperatorIdentity& identity_;
     const Certificate grant_;
+    const std::string rollout_;
     const Moment now_;
     const Moment lasting_;
 };

@@ -26,9 +26,13 @@ void insistOn(bool holds, const std::string& otherwise) {
     if (!holds) throw MessageError(otherwise);
 }
 
-/// Whoever has signed it: this operator, or another one of the fleet.
-void checkSigner(const SignedOrder& read, const OperatorIdentity& identity) {
-    if (isSignedByOperator(read, identity.key.publicKey())) return;
+/// Whoever has made it: this operator for this roll-out, or another one of the fleet. That another
+/// one's was for this roll-out, only the centre says.
+void checkSigner(const SignedOrder& read, const OperatorIdentity& identity,
+                 const OrderMaker& maker) {
+    if (isSignedByOperator(read, identity.key.publicKey())) {
+        return insistOn(maker.isOwn(read.order), "it is not of this roll-out");
+    }
     insistOn(mayTakeOver(identity.grant()), "it is another operator's");
     const Certificate other = readCertificate(read.certificate, identity.root, identity.fleet);
     insistOn(other.holder == Certificate::Holder::Operator && isSignedByOperator(read, other.key),
@@ -49,10 +53,11 @@ void checkWork(const Order& order, const json& listed, const json& rollout,
 }
 
 /// The order that a member of the list holds. Throws MessageError.
-Order checkedOrder(const json& listed, const json& rollout, const OperatorIdentity& identity) {
+Order checkedOrder(const json& listed, const json& rollout, const OperatorIdentity& identity,
+                   const OrderMaker& maker) {
     const std::string bytes = bytesOfBase64(textIn(listed, "signed"));
     const SignedOrder read = readOrder(bytes);
-    checkSigner(read, identity);
+    checkSigner(read, identity, maker);
     checkWork(read.order, listed, rollout, identity);
     return read.order;
 }
@@ -86,7 +91,7 @@ std::vector<std::string> renewedOrders(const json& toSign, const json& rollout, 
     json common;
     for (const json& listed : memberList(toSign, "hosts")) {
         try {
-            const Order order = checkedOrder(listed, rollout, identity);
+            const Order order = checkedOrder(listed, rollout, identity, maker);
             const json open = openPartOf(order);
             if (common.is_null()) common = open;
             insistOn(open == common, "it is not the same work as the others");

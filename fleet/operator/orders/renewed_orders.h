@@ -21,9 +21,10 @@ enum class Renewal {
 const char* nameOf(Renewal renewal);
 
 /// Orders for what the centre lists as to be signed for the roll-out. The centre is not believed:
-/// each order in the list must be signed by this operator, or, if the certificate allows this
-/// operator everything, by another one whom the root has certified; it must be the roll-out's work,
-/// and nothing in it is changed but its identifier and its times. Throws ctl::Failure otherwise;
+/// each order in the list must be one that this operator has made for this roll-out, or, if the
+/// certificate allows this operator everything, one of another operator whom the root has
+/// certified; it must be the roll-out's work, and nothing in it is changed but its identifier and
+/// its times. Throws ctl::Failure otherwise;
 /// then nothing is signed.
 std::vector<std::string> renewedOrders(const nlohmann::json& toSign, const nlohmann::json& rollout,
                                        Renewal renewal, const OperatorIdentity& identity,

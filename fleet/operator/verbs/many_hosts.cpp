@@ -135,12 +135,12 @@ ctl::ExitStatus runOnMany(const ctl::Verb& verb, const ctl::Invocation& invocati
     const json plan = planOf(given);
     const Moment lasting = timeOf(given, kExpires);
     OperatorSide side(invocation);
+    const std::string id = makeOrderId();
     const OrderMaker maker(
-        side.identity,
+        side.identity, id,
         std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch()),
         lasting);
     maker.insistThatAllowed(work.kind, work.product());
-    const std::string id = makeOrderId();
     json rollout;
     {
         ctl::InterruptNote note = nothingDone(invocation.format);

@@ -104,6 +104,8 @@ public:
     TlsPeer accept() {
         return {context_.get(), ::accept4(listener_.get(), nullptr, nullptr, SOCK_CLOEXEC)};
     }
+    /// No connection comes from now on.
+    void stop() { ::shutdown(listener_.get(), SHUT_RDWR); }
     /// Waits until the part is over. What it has seen may be read after that.
     void join() {
         if (thread_.joinable()) thread_.join();

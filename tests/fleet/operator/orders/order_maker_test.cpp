@@ -4,6 +4,7 @@
 
 #include <nlohmann/json.hpp>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -56,7 +57,7 @@ protected:
 
     const operator_test::Root root_;
     const fleet::OperatorIdentity identity_ = root_.certified({"START", "SETCONFIG"}, {"ux"});
-    const OrderMaker maker_{identity_, kNow, 24 * kHour};
+    const OrderMaker maker_{identity_, "r1", kNow, 24 * kHour};
     const fleet::KeyPair signing_ = newUser();
     const ChosenHost host_{newUser().publicKey(), "web-1", signing_.publicKey(), "here"};
 };
@@ -72,8 +73,6 @@ TEST_F(OrderMakerTest, SaysWhatTheHostIsToDoAndUntilWhen) {
     EXPECT_EQ(json::parse(read.order.body), (json{{"product", "ux"}, {"force", true}}));
     EXPECT_EQ(read.order.issued, kNow);
     EXPECT_EQ(read.order.expires, kNow + 24 * kHour);
-    EXPECT_NE(fleet::readOrder(maker_.orderFor(host_, workOf(startOfUx()), "env=test")).order.id,
-              read.order.id);
 }
 
 TEST_F(OrderMakerTest, MakesOrdersThatTheCentreAndTheHostTake) {
@@ -138,13 +137,13 @@ TEST_F(OrderMakerTest, RefusesWhatTheCertificateDoesNotAllow) {
 }
 
 TEST_F(OrderMakerTest, RefusesTimesThatNoHostWouldTake) {
-    EXPECT_NO_THROW(OrderMaker(identity_, kNow, 7 * 24 * kHour));
+    EXPECT_NO_THROW(OrderMaker(identity_, "r1", kNow, 7 * 24 * kHour));
     for (const fleet::Moment lasting : {fleet::Moment{}, 7 * 24 * kHour + fleet::Moment{1}}) {
-        EXPECT_EQ(failureOf([&] { OrderMaker(identity_, kNow, lasting); }).status(),
+        EXPECT_EQ(failureOf([&] { OrderMaker(identity_, "r1", kNow, lasting); }).status(),
                   ctl::kWrongUsage);
     }
     const fleet::OperatorIdentity ended = root_.certified({"*"}, {"*"}, "*", kNow);
-    EXPECT_EQ(failureOf([&] { OrderMaker(ended, kNow, kHour); }).status(),
+    EXPECT_EQ(failureOf([&] { OrderMaker(ended, "r1", kNow, kHour); }).status(),
               ctl::kHostReportedFailure);
 }
 
@@ -154,9 +153,22 @@ TEST_F(OrderMakerTest, RefusesAnOrderThatIsTooLong) {
               ctl::kWrongUsage);
 }
 
+TEST_F(OrderMakerTest, TriesAgainWithAnotherIdentifierAsOftenAsItMay) {
+    std::string bytes = maker_.orderFor(host_, workOf(startOfUx()), "*");
+    std::set<std::string> identifiers;
+    for (std::size_t tries = 1; tries < fleet::kMostTries; ++tries) {
+        const Order order = fleet::readOrder(bytes).order;
+        EXPECT_TRUE(maker_.isOwn(order));
+        EXPECT_TRUE(identifiers.insert(order.id).second);
+        bytes = maker_.again(order);
+    }
+    EXPECT_EQ(failureOf([&] { maker_.again(fleet::readOrder(bytes).order); }).status(),
+              ctl::kHostReportedFailure);
+}
+
 TEST_F(OrderMakerTest, CancelsAnOrder) {
     const fleet::OperatorIdentity canceller = root_.certified({"START", "CANCEL"}, {"ux"});
-    const OrderMaker maker(canceller, kNow, kHour);
+    const OrderMaker maker(canceller, "r1", kNow, kHour);
     const Order order =
         fleet::readOrder(maker_.orderFor(host_, workOf(startOfUx()), "env=test")).order;
     const std::optional<fleet::Directive> directive = judged(maker.cancelOf(order));

@@ -30,8 +30,9 @@ protected:
     }
     /// A line of the list to be signed, with an order of this operator.
     static json listed(const OperatorIdentity& by, const fleet::Work& work,
-                       const std::string& selector = "env=test") {
-        const OrderMaker maker(by, kNow - kHour, kHour);
+                       const std::string& selector = "env=test",
+                       const std::string& rollout = "r1") {
+        const OrderMaker maker(by, rollout, kNow - kHour, kHour);
         const ChosenHost host{newUser().publicKey(), "web", newUser().publicKey(), "here"};
         const std::string bytes = maker.orderFor(host, work, selector);
         return {{"host", host.key},
@@ -44,7 +45,7 @@ protected:
     }
     std::vector<std::string> renewBy(const OperatorIdentity& identity,
                                      const std::vector<json>& hosts, Renewal renewal) const {
-        const OrderMaker maker(identity, kNow, 2 * kHour);
+        const OrderMaker maker(identity, "r1", kNow, 2 * kHour);
         return renewedOrders({{"hosts", hosts}}, rollout_, renewal, identity, maker);
     }
     void expectRefused(const std::vector<json>& hosts, const std::string& reason) const {
@@ -79,7 +80,7 @@ TEST_F(RenewedOrders, KeepWhatIsSealedForEachHost) {
     rollout["kind"] = "SETCONFIG";
     const fleet::Work work{"SETCONFIG", {{"product", "ux"}}, R"({"context":"A=b"})"};
     const std::vector<json> hosts = {listed(identity_, work), listed(identity_, work)};
-    const OrderMaker maker(identity_, kNow, kHour);
+    const OrderMaker maker(identity_, "r1", kNow, kHour);
     const auto orders =
         renewedOrders({{"hosts", hosts}}, rollout, Renewal::RetryFailed, identity_, maker);
     ASSERT_EQ(orders.size(), 2U);
@@ -126,6 +127,10 @@ TEST_F(RenewedOrders, AreTheRolloutsWorkOnly) {
     expectRefused({listed(identity_, startOf("ux")),
                    listed(identity_, {"START", {{"product", "ux"}, {"force", true}}, ""})},
                   "not the same work");
+}
+
+TEST_F(RenewedOrders, AreNoneThatWereMadeForAnotherRollout) {
+    expectRefused({listed(identity_, startOf("ux"), "env=test", "r0")}, "not of this roll-out");
 }
 
 TEST_F(RenewedOrders, AreForTheHostsThatTheListNames) {

@@ -37,7 +37,7 @@ protected:
     }
 
     const fleet::OperatorIdentity identity_ = operator_test::Root().certified({"START"}, {"ux"});
-    const fleet::OrderMaker maker_{identity_, kNow, 24 * kHour};
+    const fleet::OrderMaker maker_{identity_, kId, kNow, 24 * kHour};
     const fleet::Choice choice_{"env=test", {host("web-1"), host("web-2")}};
     const fleet::Work work_{"START", {{"product", "ux"}}, ""};
     operator_test::FakeCentre centre_;

@@ -42,7 +42,7 @@ protected:
     const std::string at_ = "/v1/rollouts/" + kId;
     const fleet::OperatorIdentity identity_ =
         operator_test::Root().certified({"START", "CANCEL"}, {"ux"});
-    const fleet::OrderMaker maker_{identity_, kNow, kHour};
+    const fleet::OrderMaker maker_{identity_, kId, kNow, kHour};
     operator_test::FakeCentre centre_;
 };
 
