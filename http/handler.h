@@ -41,6 +41,7 @@ struct Request {
     Peer peer;
     std::string lastEventId{};    ///< the field of this name; empty if there is none
     std::string authorization{};  ///< likewise
+    std::string range{};          ///< likewise
 };
 
 /// The application behind a server. Everything is called on the I/O thread and must not block.

@@ -182,7 +182,8 @@ void HttpSession::dispatch() {
                         std::move(message.body()),
                         peer_,
                         std::string(view(message["Last-Event-ID"])),
-                        std::string(view(message[wire::field::authorization]))};
+                        std::string(view(message[wire::field::authorization])),
+                        std::string(view(message[wire::field::range]))};
         parser_.reset();
         std::variant<Answer, Job> wanted = core_.handler.handle(std::move(request));
         if (auto* const job = std::get_if<Job>(&wanted)) return submit(std::move(*job));

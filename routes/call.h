@@ -46,6 +46,8 @@ public:
 
     /// The field Authorization; empty if there is none.
     const std::string& authorization() const { return request_.authorization; }
+    /// The field Range; empty if there is none.
+    const std::string& range() const { return request_.range; }
     /// The body as it came, where the route describes none.
     const std::string& bytes() const { return request_.body; }
 

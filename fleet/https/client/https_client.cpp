@@ -38,6 +38,7 @@ WireRequest wireRequestOf(const HttpsRequest& request, const ServerUrl& url) {
     if (!request.session.empty()) {
         sent.set(wire::field::authorization, "Bearer " + request.session);
     }
+    if (!request.range.empty()) sent.set(wire::field::range, request.range);
     if (!request.body.empty()) sent.set(wire::field::content_type, request.contentType);
     sent.body() = request.body;
     sent.prepare_payload();

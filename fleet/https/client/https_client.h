@@ -18,6 +18,7 @@ struct HttpsRequest {
     std::string body = {};
     std::string contentType = "application/json";  ///< of the body, if there is one
     std::string session = {};  ///< for "Authorization: Bearer"; "" sends no such field
+    std::string range = {};    ///< for "Range", such as "bytes=0-99"; likewise
 };
 
 struct HttpsAnswer {

@@ -24,7 +24,9 @@ std::string memberText(const json& object, const char* member) {
 
 std::uint64_t memberNumber(const json& object, const char* member) {
     const json* const found = memberIn(object, member);
-    return found != nullptr && found->is_number_unsigned() ? found->get<std::uint64_t>() : 0;
+    if (found == nullptr || !found->is_number_integer()) return 0;
+    const bool isNegative = !found->is_number_unsigned() && found->get<std::int64_t>() < 0;
+    return isNegative ? 0 : found->get<std::uint64_t>();
 }
 
 bool memberFlag(const json& object, const char* member) {

@@ -27,7 +27,7 @@ json membersOf(const json& document, const char* member) {
 std::uint64_t sumOf(const json& over) {
     std::uint64_t sum = 0;
     for (const auto& item : over.items())
-        sum += item.value().is_number_unsigned() ? item.value().get<std::uint64_t>() : 0;
+        sum += memberNumber(over, item.key().c_str());
     return sum;
 }
 

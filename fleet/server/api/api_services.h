@@ -1,6 +1,7 @@
 /// What the endpoints of the centre's interface work with.
 #pragma once
 
+#include <algorithm>
 #include <chrono>
 #include <future>
 #include <memory>
@@ -12,6 +13,7 @@
 
 #include "fleet/server/api/sessions/batches.h"
 #include "fleet/server/api/sessions/sessions.h"
+#include "fleet/server/depot/file_depot.h"
 #include "fleet/server/keys/trust/members.h"
 #include "fleet/server/keys/trust/operators.h"
 #include "fleet/server/service/centre_service.h"
@@ -30,10 +32,11 @@ public:
     /// How long a request waits for the centre's thread.
     static constexpr std::chrono::seconds kPatience{25};
 
-    /// Throws KeysError and sqlite::DatabaseError.
+    /// Throws KeysError, DepotError and sqlite::DatabaseError.
     explicit ApiServices(CentreService& service)
         : directory(service.directory()),
           facts(directory.facts()),
+          files(directory.path() + "/files"),
           service_(service),
           trust_(directory.trustDatabase()),
           members_(trust_.connection()) {}
@@ -42,6 +45,7 @@ public:
     const FleetFacts facts;
     Sessions sessions;
     Batches batches;
+    FileDepot files;
 
     bool isWorking() const { return service_.centre().isWorking(); }
 
@@ -76,6 +80,14 @@ public:
     std::shared_ptr<const Members> members() {
         const std::lock_guard lock(mutex_);
         return members_.current();
+    }
+    /// The bus key of the host whose link signs with this key; "" if it is none of the fleet's.
+    std::string hostSigningWith(const std::string& key) {
+        const auto known = members();
+        const auto found = std::find_if(known->begin(), known->end(), [&](const auto& member) {
+            return member.second.signing == key;
+        });
+        return found == known->end() ? std::string() : found->first;
     }
     bool label(const std::string& host, const Labels& labels) {
         const std::lock_guard lock(mutex_);

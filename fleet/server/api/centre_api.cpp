@@ -16,6 +16,7 @@ namespace {
 
 constexpr unsigned kUnauthorized = 401;
 constexpr unsigned kTooMany = 429;
+constexpr unsigned kNoRoom = 507;
 
 unsigned statusOf(RolloutError::Kind kind) {
     switch (kind) {
@@ -51,11 +52,11 @@ std::string_view tokenIn(std::string_view authorization) {
 
 /// Who makes the request, if they have a session and their key counts still.
 std::optional<Visit> visitOf(ApiServices& services, const Call& call) {
-    const Moment now = ApiServices::now();
-    const auto key = services.sessions.keyOf(tokenIn(call.authorization()), now);
+    const auto key = sessionKey(services, call);
     if (!key) return std::nullopt;
-    auto grant = services.withTrust(
-        [&](sqlite::Database& database) { return Operators(database).grantOf(*key, now); });
+    auto grant = services.withTrust([&](sqlite::Database& database) {
+        return Operators(database).grantOf(*key, ApiServices::now());
+    });
     if (!grant) return std::nullopt;
     return Visit{services, *key, std::move(*grant)};
 }
@@ -80,6 +81,10 @@ http::Answer answerIn(Visit& visit, ApiEndpoint& endpoint, Call& call) {
         return http::errorReply(statusOf(error.kind()), error.what());
     } catch (const BatchesFull& full) {
         return later(kTooMany, full.what());
+    } catch (const DepotError& error) {
+        if (error.kind() == DepotError::Kind::Failed) throw;
+        return http::errorReply(error.kind() == DepotError::Kind::Full ? kNoRoom : 400,
+                                error.what());
     } catch (const Unavailable& unavailable) {
         return later(503, unavailable.what());
     }
@@ -106,6 +111,10 @@ http::Answer answerTo(ApiServices& services, const ApiRoute& route, Call& call) 
 }
 
 }  // namespace
+
+std::optional<std::string> sessionKey(ApiServices& services, const Call& call) {
+    return services.sessions.keyOf(tokenIn(call.authorization()), ApiServices::now());
+}
 
 CentreApi::CentreApi(ApiServices& services, std::vector<ApiRoute> routes)
     : services_(services), rows_(std::move(routes)), router_(routes::factsOf(rows_), "") {}

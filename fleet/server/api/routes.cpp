@@ -7,6 +7,7 @@ ApiEndpoint getCentreHealth, postEnrolment, postLogin, postSession, getOperator;
 ApiEndpoint getHosts, getHost, getHostOrders, postLabels;
 ApiEndpoint postBatch, postBatchOrders, postRollout, getRollouts, getRollout;
 ApiEndpoint getRolloutHosts, getRolloutFailures, getToSign;
+ApiEndpoint getFile, postFile, getFileContent;
 ApiEndpoint postPause, postResume, postAbort, postRetryFailed;
 
 namespace {
@@ -23,6 +24,9 @@ const Parameter kHost = {"host", Type::Text, Need::Required, "the host's bus key
 const Parameter kRollout = {"id", Type::Text, Need::Required, "the roll-out's identifier"};
 const Parameter kLimit = {"limit", Type::Number, Need::Optional, "how many at most"};
 const Parameter kFrom = {"from", Type::Number, Need::Optional, "the first place, from 0"};
+
+const Parameter kSum = {"sha256", Type::Text, Need::Required, "the file's SHA-256"};
+const Parameter kSize = {"size", Type::Number, Need::Required, "the whole file's size in bytes"};
 
 const routes::Member kBatch = {"batch", JsonType::String, Need::Optional,
                                "the batch that has the orders"};
@@ -59,6 +63,14 @@ std::vector<ApiRoute> apiRoutes() {
         {"POST", "/v1/hosts/{host}/labels", "Gives a host other labels.",
          Access::Act, kWorker, postLabels, {{200, "the host", nullptr}}, {kHost}, kNone,
          {{"labels", JsonType::Object, Need::Required, "all of them"}}},
+
+        {"GET", "/v1/files/{sha256}", "How far a file is.",
+         Access::Act, kWorker, getFile, {{200, "the file", nullptr}}, {kSum, kSize}},
+        {"POST", "/v1/files/{sha256}", "Brings a piece of a file.",
+         Access::Act, kWorker, postFile, {{200, "how far the file is now", nullptr}},
+         {kSum, kSize, {"from", Type::Number, Need::Required, "where the piece begins"}}},
+        {"GET", "/v1/files/{sha256}/content", "A host fetches what its order needs.",
+         Access::None, kWorker, getFileContent, {{206, "a piece of it", nullptr}}, {kSum}},
 
         {"POST", "/v1/batches", "Makes a place for signed orders.",
          Access::Act, kWorker, postBatch, {{201, "the batch", nullptr}}},

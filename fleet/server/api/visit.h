@@ -1,6 +1,8 @@
 /// One request to the centre, and who makes it.
 #pragma once
 
+#include <optional>
+#include <stdexcept>
 #include <string>
 
 #include "fleet/server/api/api_services.h"
@@ -37,9 +39,13 @@ struct Visit {
 /// The rows of the centre's route table. Access::None needs no session; Access::Read needs one, and
 /// Access::Act that of an operator or an admin. Endpoints throw routes::BadRequest, MessageError
 /// and SelectorError (400), JoinRefused and Forbidden (403), NothingThere (404), RolloutError (400,
-/// 404 or 409), BatchesFull (429), and Unavailable (503).
+/// 404 or 409), BatchesFull (429), Unavailable (503), and
+/// DepotError (400, 507 or 500).
 using ApiRoute = routes::Route<Visit>;
 using ApiEndpoint = ApiRoute::Endpoint;
+
+/// The key that has opened the request's session; nothing without one.
+std::optional<std::string> sessionKey(ApiServices& services, const routes::Call& call);
 
 using routes::Call;
 

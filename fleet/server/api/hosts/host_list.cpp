@@ -22,7 +22,7 @@ std::vector<std::string> hostsMeant(const Visit& visit, const Members& members,
     const Selector visible(visit.grant.selector);
     std::vector<std::string> hosts;
     for (auto member = members.upper_bound(after); member != members.end(); ++member) {
-        const auto& [name, labels] = member->second;
+        const auto& [name, signing, labels] = member->second;
         if (!meant.matches(name, labels) || !visible.matches(name, labels)) continue;
         hosts.push_back(member->first);
         if (hosts.size() > most) break;

@@ -1,4 +1,4 @@
-// POST /v1/sessions: an operator's key opens a session.
+// POST /v1/sessions: the key of an operator, or that with which a host signs, opens a session.
 
 #include <nlohmann/json.hpp>
 
@@ -6,9 +6,22 @@
 #include "fleet/server/api/documents/host_sight.h"
 #include "fleet/server/api/visit.h"
 
+using nlohmann::json;
+
 namespace fleet {
 
 ApiEndpoint postSession;
+
+namespace {
+
+/// Whose session it is.
+json holderOf(const ApiServices& services, const std::optional<OperatorGrant>& grant,
+              const std::string& host) {
+    if (grant) return {{"operator", grant->name}, {"role", textOf(grant->role)}};
+    return {{"fleet", services.facts.fleet}, {"host", host}};
+}
+
+}  // namespace
 
 http::Answer postSession(Visit& visit, const Call& call) {
     ApiServices& services = visit.services;
@@ -20,7 +33,10 @@ http::Answer postSession(Visit& visit, const Call& call) {
     }
     const auto grant = services.withTrust(
         [&](sqlite::Database& database) { return Operators(database).grantOf(request.key, now); });
-    if (!grant) throw Forbidden("this key is not certified, was revoked, or is over");
+    const std::string host = grant ? "" : services.hostSigningWith(request.key);
+    if (!grant && host.empty()) {
+        throw Forbidden("this key is not certified, was revoked, or is over");
+    }
     const auto opened = services.sessions.open(request, now);
     if (!opened) {
         throw Forbidden(
@@ -28,10 +44,10 @@ http::Answer postSession(Visit& visit, const Call& call) {
             "wrong; here it is " +
             timeOfDocument(now));
     }
-    return http::jsonReply(200, textOf({{"session", opened->token},
-                                        {"expires", timeOfDocument(opened->expires)},
-                                        {"operator", grant->name},
-                                        {"role", textOf(grant->role)}}));
+    json document = holderOf(services, grant, host);
+    document["session"] = opened->token;
+    document["expires"] = timeOfDocument(opened->expires);
+    return http::jsonReply(200, textOf(document));
 }
 
 }  // namespace fleet

@@ -46,6 +46,17 @@ RolloutPlan planIn(const json& body) {
     return plan;
 }
 
+/// Hosts would wait for files that nobody brings.
+void insistOnFiles(const ApiServices& services, const std::vector<std::string>& orders) {
+    for (const std::string& bytes : orders) {
+        for (const OrderFile& file : readOrder(bytes).order.files) {
+            if (services.files.has(file.sha256)) continue;
+            throw routes::BadRequest("the file " + file.path +
+                                     " is not at the centre; bring it first");
+        }
+    }
+}
+
 }  // namespace
 
 http::Answer postRollout(Visit& visit, const Call& call) {
@@ -54,6 +65,7 @@ http::Answer postRollout(Visit& visit, const Call& call) {
     wanted.by = visit.asOperator();
     wanted.plan = planIn(call.body());
     wanted.orders = givenOrders(visit, call);
+    insistOnFiles(visit.services, wanted.orders);
     const RolloutView made = visit.services.ask([wanted = std::move(wanted)](CentreDesk& desk) {
         return desk.rollouts.show(desk.rollouts.create(wanted, desk.now), desk.now);
     });

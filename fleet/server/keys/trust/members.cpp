@@ -11,10 +11,10 @@ std::shared_ptr<const Members> MemberList::current() {
     if (members_ && state == seen_) return members_;
     Members members;
     sqlite::Statement rows = database_.ask(
-        "SELECT host, name, labels FROM hosts h WHERE host IS NOT NULL AND NOT EXISTS "
+        "SELECT host, name, signing, labels FROM hosts h WHERE host IS NOT NULL AND NOT EXISTS "
         "(SELECT 1 FROM revocations r WHERE r.key = h.host)");
     while (rows.step())
-        members[rows.bytes(0)] = {rows.bytes(1), labelsKept(rows.bytes(2))};
+        members[rows.bytes(0)] = {rows.bytes(1), rows.bytes(2), labelsKept(rows.bytes(3))};
     members_ = std::make_shared<const Members>(std::move(members));
     seen_ = state;
     return members_;

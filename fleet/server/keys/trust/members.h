@@ -14,7 +14,8 @@ namespace fleet {
 
 struct Member {
     std::string name;
-    Labels labels;  ///< the centre's; the host's own may differ
+    std::string signing;  ///< the public key with which its link signs
+    Labels labels;        ///< the centre's; the host's own may differ
 };
 
 /// By the hosts' bus keys.

@@ -5,14 +5,18 @@
 #include <gtest/gtest.h>
 
 #include <future>
+#include <map>
 #include <memory>
 #include <nlohmann/json.hpp>
+#include <set>
 #include <string>
+#include <vector>
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/enrolment.h"
 #include "fleet/bus/messages/login.h"
 #include "fleet/bus/messages/order.h"
+#include "fleet/bus/trust/checksum.h"
 #include "fleet/server/api/routes.h"
 #include "fleet/server/keys/trust/host_enrolment.h"
 #include "fleet/server/keys/trust/revocations.h"
@@ -115,11 +119,13 @@ protected:
                               signing));
         EXPECT_EQ(answer.status, 200U) << answer.document;
         EXPECT_EQ(fleet::readEnrolmentAnswer(answer.document.dump()).name, name);
+        signers_.emplace(name, signing);
         return bus.publicKey();
     }
 
     static std::string orderFor(const std::string& host, const LoggedIn& who,
-                                const std::string& id = fleet::makeOrderId()) {
+                                const std::string& id = fleet::makeOrderId(),
+                                const std::vector<fleet::OrderFile>& files = {}) {
         fleet::Order order;
         order.fleet = "demo";
         order.id = id;
@@ -127,11 +133,13 @@ protected:
         order.selector = "*";
         order.kind = "START";
         order.body = R"({"product":"ux"})";
+        order.files = files;
         order.issued = today();
         order.expires = today() + made_fleet::kDay;
         return fleet::base64Of(signOrder(order, who.key, who.certificate));
     }
 
+    std::map<std::string, KeyPair> signers_;  ///< of the hosts that have joined, by their names
     const std::unique_ptr<RunningFleet> fleet_ = RunningFleet::start();
     std::unique_ptr<fleet::CentreService> service_;
     std::future<fleet::CentreProgram::End> running_;
@@ -365,6 +373,60 @@ TEST_F(CentreInterface, PausesResumesAndAbortsRollOuts) {
     EXPECT_TRUE(isSignedByOperator(fleet::readOrder(bytes), ada.key.publicKey()));
     EXPECT_EQ(get(path + "/to-sign?for=nothing", ada).status, 400U);
     EXPECT_EQ(get(path + "/failures", ada).document["hosts"].size(), 0U);
+}
+
+TEST_F(CentreInterface, GivesAFileToTheHostWhoseOrderNeedsIt) {
+    const LoggedIn ada = admin();
+    const std::string web = join("web-1");
+    join("web-2");
+    fleet::Checksum sum;
+    sum.add("package");
+    const std::string path = "/v1/files/" + sum.hex();
+    const std::vector<fleet::OrderFile> files = {{"ux.tar", path.substr(10), 7}};
+    const json orders = {orderFor(web, ada, fleet::makeOrderId(), files)};
+    EXPECT_EQ(post("/v1/rollouts", ada, {{"orders", orders}}).status, 400U) << "it is not here";
+    EXPECT_EQ(get(path + "?size=7", ada).status, 404U);
+    EXPECT_EQ(ask("POST", path + "?size=7&from=0", ada.session, "pack").document["have"], 4);
+    EXPECT_EQ(get(path + "?size=7", ada).document["complete"], false);
+    EXPECT_EQ(ask("POST", path + "?size=7&from=4", ada.session, "age").document["complete"], true);
+
+    const auto sessionOf = [&](const std::string& host) {
+        return ask("POST", "/v1/sessions", "", sessionRequest(signers_.at(host)))
+            .document.value("session", "");
+    };
+    const auto fetch = [&](const std::string& session, const std::string& range) {
+        http::Request request{"GET", path + "/content", "", {0, 0, 0, http::Access::Act}};
+        request.authorization = "Bearer " + session;
+        request.range = range;
+        auto handled = api_->handle(std::move(request));
+        handled = std::get<http::Job>(handled)();
+        return std::get<http::Reply>(std::get<http::Answer>(handled));
+    };
+    const std::string host = sessionOf("web-1");
+    EXPECT_EQ(fetch(host, "").status, 403U) << "no order of it needs the file yet";
+    const json made = post("/v1/rollouts", ada, {{"orders", orders}}).document;
+    ASSERT_TRUE(eventually([&] { return fetch(host, "").status == 206; })) << made;
+    EXPECT_EQ(fetch(host, "").body, "package");
+    const http::Reply piece = fetch(host, "bytes=2-3");
+    EXPECT_EQ(piece.body, "ck");
+    EXPECT_EQ(piece.fields.at(0).second, "bytes 2-3/7");
+    EXPECT_EQ(fetch(host, "bytes=5-").body, "ge");
+    EXPECT_EQ(fetch(host, "bytes=7-").status, 416U);
+    EXPECT_EQ(fetch(host, "bytes=-3").body, "package");
+    EXPECT_EQ(fetch(host, "bytes=99999999999999999999-").body, "package");
+    EXPECT_EQ(fetch(sessionOf("web-2"), "").status, 403U);
+    EXPECT_EQ(fetch(ada.session, "").status, 401U);
+    EXPECT_EQ(get("/v1/hosts", {signers_.at("web-1"), "", host}).status, 401U)
+        << "a host is no operator";
+}
+
+TEST_F(CentreInterface, TakesNoFileThatIsNotWhatItWasSaidToBe) {
+    const LoggedIn ada = admin();
+    const std::string path = "/v1/files/" + std::string(64, 'a');
+    EXPECT_EQ(ask("POST", path + "?size=1&from=0", ada.session, "x").status, 400U);
+    EXPECT_EQ(ask("POST", path + "?size=1", ada.session, "x").status, 400U);
+    EXPECT_EQ(ask("POST", "/v1/files/x?size=1&from=0", ada.session, "x").status, 400U);
+    EXPECT_EQ(ask("POST", path + "?size=999999999999999&from=0", ada.session, "x").status, 507U);
 }
 
 TEST_F(CentreInterface, SaysWhenItCannotDoAnythingNow) {
