@@ -2,12 +2,12 @@
 # Checks the manual pages: that mandoc finds no fault with them, that there is one for every verb, and
 # that they name every option.
 #
-#   tests/docs/manual.sh TEMPLATES PAGES ZAVCTL ZAVHOST
+#   tests/docs/manual.sh TEMPLATES PAGES ZAVCTL ZAVHOST [ZAVLINK ZAVFLEETD]
 #
 # TEMPLATES is the folder of the hand-written text. PAGES is that of the pages as the build lays them out,
-# one folder for each program.
+# one folder for each program. The last two programs are not built for every width.
 set -eu
-templates=$1 pages=$2 zavctl=$3 zavhost=$4
+templates=$1 pages=$2 zavctl=$3 zavhost=$4 zavlink=${5-} zavfleetd=${6-}
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 status=0
@@ -20,6 +20,10 @@ complain() {
 mkdir -p "$scratch/man1" "$scratch/man5" "$scratch/man7" "$scratch/man8"
 cp "$pages"/zavctl/* "$scratch/man1"
 for section in 5 7 8; do cp "$pages"/zavhost/*.$section "$scratch/man$section"; done
+if [ -n "$zavlink" ]; then
+    cp "$pages"/zavlink/*.5 "$scratch/man5"
+    cp "$pages"/zavlink/*.8 "$pages"/zavfleetd/*.8 "$scratch/man8"
+fi
 # mandoc looks for other pages in the system only, so references are checked here.
 mandoc -T lint -W all "$scratch"/man*/* | grep -v 'STYLE: referenced manual not found' &&
     complain "mandoc finds faults"
@@ -69,6 +73,29 @@ check_options() {
 "$zavhost" --help | grep -oE '^ +(-h,)?--[a-z-]+' | tr -d ' ' | sed 's/^-h,//' | check_options man8/zavhost.8
 "$zavctl" help install | grep -oE '^  (-h, )?--[a-z-]+' | sed 's/^ *\(-h, \)*//' |
     grep -vxE -e '--help|--version' | check_options man1/zavctl-install.1
+# CLI11 writes them so: "  -h,--help", "  --label TEXT ...".
+cli_options() {
+    grep -oE '^  (-h,)?--[a-z][a-z-]*' | sed 's/^  //' | grep -v -e '^-h,--help$'
+}
+if [ -n "$zavlink" ]; then
+    {
+        "$zavlink" --help | grep -oE -e '--[a-z]+' | grep -v -e '^--help$'
+        "$zavlink" enrol --help | cli_options
+    } | check_options man8/zavlink.8
+    # Groups have no options of their own, but the commands that they name.
+    subcommands_in() {
+        sed -n '/^Subcommands:/,$s/^  \([a-z]*\) .*/\1/p'
+    }
+    "$zavfleetd" --help | subcommands_in >"$scratch/words"
+    [ "$(wc -l <"$scratch/words")" -gt 5 ] || complain "zavfleetd --help lists hardly any command"
+    while read -r word; do
+        "$zavfleetd" "$word" --help | cli_options
+        "$zavfleetd" "$word" --help | subcommands_in | while read -r second; do
+            "$zavfleetd" "$word" "$second" --help | cli_options
+        done
+    done <"$scratch/words" >"$scratch/fleet_options" || true
+    check_options man8/zavfleetd.8 <"$scratch/fleet_options"
+fi
 # The keys of the file are those that a host lists.
 "$zavhost" --print-config --home "$scratch" --plugin /none 2>/dev/null |
     sed -n 's/^\(# \)\{0,1\}\([a-z-]*\) .*/\2/p' | LC_ALL=C sort >"$scratch/keys"

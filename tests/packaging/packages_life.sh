@@ -10,7 +10,7 @@ set -eu
 packages=$1
 agent=ux
 home=/var/lib/zavmgmt
-ours='libzavmgmt1 libzavplatform1 zavmgmt-dev zavhost zavctl zavmgmt-doc'
+ours='libzavmgmt1 libzavplatform1 zavmgmt-dev zavhost zavctl zavctl-fleet zavlink zavfleetd zavmgmt-doc'
 foreign='libzavmgmt1:i386 libzavplatform1:i386 zavmgmt-dev:i386'
 
 say() { echo "-- $*"; }

@@ -63,6 +63,10 @@ case $action$units in
 "preset "*) link_unit "${units# }" ;;
 "is-active zavhost.service") lives ;;
 "is-active zavhost.socket") ;;
+# Their conditions do not hold: this machine has no part in a fleet.
+"start zavlink.service" | "stop zavlink.service" | "restart zavlink.service") ;;
+"start zavfleetd.service" | "stop zavfleetd.service" | "restart zavfleetd.service") ;;
+"is-active zavlink.service" | "is-active zavfleetd.service") exit 3 ;;
 "is-enabled "*)
     find /etc/systemd/system -name "${units# }" | grep -q . && echo enabled
     ;;

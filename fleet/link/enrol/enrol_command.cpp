@@ -7,7 +7,6 @@
 #include <istream>
 #include <ostream>
 
-#include "ctl/client/address/host_address.h"
 #include "fleet/link/enrol/enrol_error.h"
 #include "fleet/link/enrol/enrol_host.h"
 #include "fleet/log/log.h"
@@ -65,8 +64,8 @@ void declareEnrolment(CLI::App& app, EnrolWords& words) {
         ->capture_default_str();
     app.add_option("--config", options.configuration, "The configuration to write")
         ->capture_default_str();
-    app.add_option("--host-socket", options.hostSocket, "Where zavlink asks the host")
-        ->default_str(ctl::defaultSocket());
+    app.add_option("--host-socket", options.hostSocket,
+                   "Where zavlink asks the host; without it where zavctl does on this machine");
     app.add_option("--label", words.labels, "NAME=VALUE, by which operators select hosts")
         ->allow_extra_args(false);
     app.footer(kFooter);
@@ -106,6 +105,11 @@ int runEnrolCommand(std::vector<std::string> words, std::istream& in, std::ostre
         err << lineOf(Priority::Error, error.what(), false);
         return 1;
     }
+}
+
+void describeEnrolment(CLI::App& app) {
+    static EnrolWords nowhere;
+    declareEnrolment(app, nowhere);
 }
 
 }  // namespace fleet

@@ -38,6 +38,16 @@ std::vector<std::string> centreKeysIn(const EnrolmentAnswer& answer, const Invit
                                 "it; it is not the one that the invitation means");
 }
 
+/// The centre knows the bus's servers by addresses that leave open how they are spoken to. A host
+/// speaks to each of them by TLS, because their certificates come with the answer.
+std::vector<std::string> encrypted(std::vector<std::string> addresses) {
+    const std::string open = "nats://";
+    for (std::string& address : addresses) {
+        if (address.rfind(open, 0) == 0) address.replace(0, open.size(), "tls://");
+    }
+    return addresses;
+}
+
 }  // namespace
 
 void adoptAnswer(LinkConfiguration& configuration, const Invitation& invitation,
@@ -46,7 +56,7 @@ void adoptAnswer(LinkConfiguration& configuration, const Invitation& invitation,
     configuration.fleet = invitation.fleet;
     configuration.root = invitation.root;
     configuration.name = answer.name;
-    configuration.bus = answer.busUrls;
+    configuration.bus = encrypted(answer.busUrls);
     configuration.serverName = answer.serverName;
     configuration.url = invitation.url;
     if (std::any_of(answer.name.begin(), answer.name.end(),

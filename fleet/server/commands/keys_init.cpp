@@ -47,9 +47,9 @@ Action declareKeysInit(CLI::App& app) {
                    "DNS names and IP addresses of the servers, joined by commas; a DNS name first")
         ->delimiter(',')
         ->required();
-    app.add_option("--bus", plan.busUrls, "nats://HOST:PORT, for each server of the bus")
+    app.add_option("--bus", plan.busUrls, "Each server of the bus, as nats://HOST:PORT")
         ->default_str("the first name, port 4222");
-    app.add_option("--url", plan.url, "https://HOST[:PORT] of the centre")
+    app.add_option("--url", plan.url, "The centre, as https://HOST[:PORT]")
         ->default_str("the first name, port 8443");
     app.add_option("--bus-directory", plan.busDirectory, "Where the bus's server has its files")
         ->default_str("bus in the centre's directory");

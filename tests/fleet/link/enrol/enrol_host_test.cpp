@@ -64,7 +64,8 @@ TEST_F(EnrollingHost, HasAllThatALinkNeeds) {
     const LinkConfiguration read = configuration();
     EXPECT_EQ(read.fleet, "demo");
     EXPECT_EQ(read.name, "web1");
-    EXPECT_EQ(read.bus, facts.busUrls);
+    EXPECT_EQ(facts.busUrls, std::vector<std::string>{"nats://localhost:4222"});
+    EXPECT_EQ(read.bus, std::vector<std::string>{"tls://localhost:4222"});
     EXPECT_EQ(read.serverName, "localhost");
     EXPECT_EQ(read.root, facts.root);
     EXPECT_EQ(read.centres,
@@ -253,9 +254,19 @@ TEST_F(EnrollingHost, GoesByAllKeysOfTheCentreThatCount) {
               (std::vector<std::string>{newer.publicKey(), older.publicKey()}));
 }
 
+TEST_F(EnrollingHost, SpeaksToTheBusByTlsWhereverThatIs) {
+    host_.startCentre(host_.takesUpWith([](fleet::EnrolmentAnswer& answer) {
+        answer.busUrls = {"nats://a.example:4222", "tls://b.example:4222"};
+    }));
+    host_.options.invitation = host_.invitation();
+    EXPECT_EQ(host_.refusal(), "");
+    EXPECT_EQ(configuration().bus,
+              (std::vector<std::string>{"tls://a.example:4222", "tls://b.example:4222"}));
+}
+
 TEST_F(EnrollingHost, TakesNoAnswerWithWhichALinkCouldNotWork) {
     EXPECT_NE(refusalOf([](auto& answer) {
-                  answer.busUrls = {"nats://elsewhere:4222"};
+                  answer.busUrls = {"http://elsewhere:4222"};
               }).find("\"bus\" must name servers as tls://HOST:PORT"),
               std::string::npos);
     EXPECT_NE(
