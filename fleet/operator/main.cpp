@@ -11,6 +11,7 @@
 #include "ctl/show/standard_streams.h"
 #include "ctl/show/terminal.h"
 #include "ctl/verbs/invocation.h"
+#include "ctl/verbs/verb_table.h"
 #include "fleet/bus/messages/document.h"
 #include "fleet/files/file_error.h"
 #include "fleet/https/client/https_error.h"
@@ -25,8 +26,9 @@ namespace {
 ctl::ExitStatus runVerb(const ctl::CommandLine& line, ctl::Format format) {
     fleet::insistOnMeaning(*line.verb, line.given);
     const ctl::Invocation invocation{line.given, {}, format};
-    if (line.verb->requestOf != nullptr) return fleet::runOnMany(*line.verb, invocation);
-    return line.verb->run(invocation);
+    // A verb of one host, which is done on many.
+    const bool isOfOne = ctl::hostVocabulary().findVerb(line.verb->name) == line.verb;
+    return isOfOne ? fleet::runOnMany(*line.verb, invocation) : line.verb->run(invocation);
 }
 
 /// What the parts of a fleet throw, as failures of the program.

@@ -16,6 +16,8 @@ public:
     /// `target` is the path and what follows it; see percentEncoded() for what it may hold.
     virtual nlohmann::json get(const std::string& target) = 0;
     virtual nlohmann::json post(const std::string& target, const nlohmann::json& body) = 0;
+    /// Sends bytes in the place of a document.
+    virtual nlohmann::json postBytes(const std::string& target, std::string bytes) = 0;
 };
 
 }  // namespace fleet

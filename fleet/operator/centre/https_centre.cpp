@@ -83,4 +83,8 @@ json HttpsCentre::post(const std::string& target, const json& body) {
     return request({"POST", target, textOf(body)});
 }
 
+json HttpsCentre::postBytes(const std::string& target, std::string bytes) {
+    return request({"POST", target, std::move(bytes), "application/octet-stream"});
+}
+
 }  // namespace fleet

@@ -20,6 +20,7 @@ public:
 
     nlohmann::json get(const std::string& target) override;
     nlohmann::json post(const std::string& target, const nlohmann::json& body) override;
+    nlohmann::json postBytes(const std::string& target, std::string bytes) override;
 
     static constexpr std::chrono::seconds kAnswerTime{60};
 

@@ -87,7 +87,7 @@ json hostDocuments(Centre& centre, const std::string& selector) {
 
 ChosenHost hostOf(const json& document) {
     ChosenHost host{memberText(document, "host"), memberText(document, "name"),
-                    memberText(document, "signing"), memberText(document, "state")};
+                    memberText(document, "state")};
     if (!isPublicKey(host.key, KeyKind::User)) throw senseless("a host has no key");
     if (host.name.empty()) host.name = host.key;
     return host;

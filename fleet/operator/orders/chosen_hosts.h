@@ -9,10 +9,9 @@
 namespace fleet {
 
 struct ChosenHost {
-    std::string key;      ///< the bus key: what orders call it
-    std::string name;     ///< for people
-    std::string signing;  ///< what is sealed for the host is sealed for this key
-    std::string state;    ///< "here", "away", "stopped" or "unknown"
+    std::string key;    ///< the bus key: what orders call it, and what texts are sealed for
+    std::string name;   ///< for people
+    std::string state;  ///< "here", "away", "stopped" or "unknown"
 };
 
 /// A choice of hosts, and how the orders for them say it.

@@ -31,7 +31,7 @@ std::string Work::product() const {
 }
 
 Work workOf(const ctl::TaskRequest& request) {
-    Work work{request.command, request.document(), ""};
+    Work work{request.command, request.document(), "", {}};
     for (const char* const member : kOwnOfOrders)
         work.body.erase(member);
     json hidden = json::object();
@@ -94,12 +94,8 @@ std::string OrderMaker::orderFor(const ChosenHost& host, const Work& work,
                                  const std::string& selector) const {
     json body = work.body;
     if (!work.hidden.empty()) {
-        if (!isPublicKey(host.signing, KeyKind::User)) {
-            throw ctl::Failure(ctl::kHostReportedFailure,
-                               "the centre knows no key of host " + host.name +
-                                   " for which the text could be sealed");
-        }
-        body["sealed"] = base64Of(sealFor(host.signing, work.hidden));
+        // The order's own host is meant, whatever the centre says of its keys.
+        body["sealed"] = base64Of(sealFor(host.key, work.hidden));
     }
     Order order;
     order.id = chainOf(host.key).identifier(0);
@@ -107,6 +103,7 @@ std::string OrderMaker::orderFor(const ChosenHost& host, const Work& work,
     order.selector = selector;
     order.kind = work.kind;
     order.body = textOf(body);
+    order.files = work.files;
     return sign(std::move(order));
 }
 

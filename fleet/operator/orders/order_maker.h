@@ -3,6 +3,7 @@
 
 #include <nlohmann/json.hpp>
 #include <string>
+#include <vector>
 
 #include "ctl/client/tasks/task_request.h"
 #include "fleet/bus/messages/order.h"
@@ -18,6 +19,7 @@ struct Work {
     nlohmann::json body;  ///< the other members of the task, as everybody on the way may read them
     std::string
         hidden;  ///< JSON with the members that only the host may read; "" if there are none
+    std::vector<OrderFile> files = {};  ///< that are to lie in the depot
 
     std::string product() const;
 };
@@ -40,8 +42,7 @@ public:
     /// carry it out.
     void insistThatAllowed(const std::string& kind, const std::string& product) const;
 
-    /// The signed order for one host. Throws ctl::Failure if it gets too long, or if something has
-    /// to be sealed and the host has no key for that.
+    /// The signed order for one host. Throws ctl::Failure if it gets too long.
     std::string orderFor(const ChosenHost& host, const Work& work,
                          const std::string& selector) const;
 

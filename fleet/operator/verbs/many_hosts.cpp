@@ -131,7 +131,13 @@ json beginRollout(Centre& centre, const Choice& choice, const Work& work, const 
 
 ctl::ExitStatus runOnMany(const ctl::Verb& verb, const ctl::Invocation& invocation) {
     const ctl::Values& given = invocation.given;
-    const Work work = workOf(verb.requestOf(given));
+    const bool isAwaited = !declares(verb, ctl::kNoWait) || !given.flag(ctl::kNoWait);
+    return runWork(workOf(verb.requestOf(given)), invocation, isAwaited);
+}
+
+ctl::ExitStatus runWork(const Work& work, const ctl::Invocation& invocation, bool isAwaited,
+                        const BringFiles& bringFiles) {
+    const ctl::Values& given = invocation.given;
     const json plan = planOf(given);
     const Moment lasting = timeOf(given, kExpires);
     OperatorSide side(invocation);
@@ -148,10 +154,10 @@ ctl::ExitStatus runOnMany(const ctl::Verb& verb, const ctl::Invocation& invocati
         if (given.flag(kDryRun)) {
             return ctl::print(showDryRun(choice, work, plan, lasting, invocation.format));
         }
+        if (bringFiles) bringFiles(side.centre);
         noteThatItMayBegin(note, id, invocation.format);
         rollout = beginRollout(side.centre, choice, work, plan, maker, id);
     }
-    const bool isAwaited = !declares(verb, ctl::kNoWait) || !given.flag(ctl::kNoWait);
     if (invocation.format == ctl::Format::Json && !isAwaited) {
         return ctl::print(ctl::jsonPage(rollout));
     }

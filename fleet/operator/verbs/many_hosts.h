@@ -1,6 +1,7 @@
 /// Verbs of one host on many of them: a roll-out.
 #pragma once
 
+#include <functional>
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
@@ -24,6 +25,14 @@ ctl::Page showDryRun(const Choice& choice, const Work& work, const nlohmann::jso
 nlohmann::json beginRollout(Centre& centre, const Choice& choice, const Work& work,
                             const nlohmann::json& plan, const OrderMaker& maker,
                             const std::string& id);
+
+/// Called before any order is made: brings what the work needs to the centre.
+using BringFiles = std::function<void(Centre& centre)>;
+
+/// Has the hosts of --on do some work, and waits for the end. `isAwaited`: false returns when the
+/// roll-out has begun. For the thread of main() alone.
+ctl::ExitStatus runWork(const Work& work, const ctl::Invocation& invocation, bool isAwaited,
+                        const BringFiles& bringFiles = {});
 
 /// Does what the verb does, on the hosts of --on, and waits for the end. The verb has a requestOf.
 /// For the thread of main() alone.

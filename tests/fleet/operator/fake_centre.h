@@ -40,6 +40,9 @@ public:
     nlohmann::json post(const std::string& target, const nlohmann::json& body) override {
         return reply({"POST " + target, body});
     }
+    nlohmann::json postBytes(const std::string& target, std::string bytes) override {
+        return reply({"POST " + target, bytes});
+    }
 
 private:
     nlohmann::json reply(Asked question) {

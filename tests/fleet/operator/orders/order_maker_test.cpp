@@ -51,15 +51,15 @@ protected:
         const std::string numbered =
             signNumber(host_.key, 7, fleet::readOrder(order).order.id, order, centre);
         const fleet::Trust trust{"demo",         host_.key,         "web-1", {{"env", "test"}},
-                                 identity_.root, centre.publicKey()};
-        return judge(numbered, 7, trust, signing_);
+                                 identity_.root, {centre.publicKey()}};
+        return judge(numbered, 7, trust, bus_);
     }
 
     const operator_test::Root root_;
     const fleet::OperatorIdentity identity_ = root_.certified({"START", "SETCONFIG"}, {"ux"});
     const OrderMaker maker_{identity_, "r1", kNow, 24 * kHour};
-    const fleet::KeyPair signing_ = newUser();
-    const ChosenHost host_{newUser().publicKey(), "web-1", signing_.publicKey(), "here"};
+    const fleet::KeyPair bus_ = newUser();
+    const ChosenHost host_{bus_.publicKey(), "web-1", "here"};
 };
 
 TEST_F(OrderMakerTest, SaysWhatTheHostIsToDoAndUntilWhen) {
@@ -98,14 +98,6 @@ TEST_F(OrderMakerTest, SealsAConfigurationForTheHostAlone) {
     EXPECT_EQ(json::parse(directive->request), (json{{"command", "SETCONFIG"},
                                                      {"product", "ux"},
                                                      {"context", "INSTANCE=\nA=veryspecial\n"}}));
-}
-
-TEST_F(OrderMakerTest, SealsNothingForAHostWithoutAKey) {
-    ChosenHost keyless = host_;
-    keyless.signing = "";
-    EXPECT_EQ(failureOf([&] { maker_.orderFor(keyless, workOf(setConfig("A=b")), "*"); }).status(),
-              ctl::kHostReportedFailure);
-    EXPECT_NO_THROW(maker_.orderFor(keyless, workOf(startOfUx()), "*"));
 }
 
 TEST_F(OrderMakerTest, HidesPasswordsOfOtherCommands) {

@@ -33,7 +33,7 @@ protected:
                        const std::string& selector = "env=test",
                        const std::string& rollout = "r1") {
         const OrderMaker maker(by, rollout, kNow - kHour, kHour);
-        const ChosenHost host{newUser().publicKey(), "web", newUser().publicKey(), "here"};
+        const ChosenHost host{newUser().publicKey(), "web", "here"};
         const std::string bytes = maker.orderFor(host, work, selector);
         return {{"host", host.key},
                 {"order", fleet::readOrder(bytes).order.id},

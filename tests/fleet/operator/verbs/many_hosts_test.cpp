@@ -30,7 +30,7 @@ protected:
         centre_.answer("POST /v1/batches/b1/orders", json{{"orders", 2}});
     }
     static fleet::ChosenHost host(const std::string& name) {
-        return {newUser().publicKey(), name, newUser().publicKey(), "here"};
+        return {newUser().publicKey(), name, "here"};
     }
     json begin() {
         return fleet::beginRollout(centre_, choice_, work_, {{"waves", "1,100%"}}, maker_, kId);
@@ -80,8 +80,7 @@ TEST_F(ManyHosts, GetNothingThatTheCentreRefuses) {
 }
 
 TEST_F(ManyHosts, AreShownBeforeAnythingIsSent) {
-    const fleet::Choice choice{"env=test",
-                               {{"UA", "web-1", "", "here"}, {"UB", "web-2", "", "away"}}};
+    const fleet::Choice choice{"env=test", {{"UA", "web-1", "here"}, {"UB", "web-2", "away"}}};
     EXPECT_EQ(fleet::showDryRun(choice, work_, json::object(), 24 * kHour, Format::Text).out,
               "HOST   STATE  KEY\n"
               "web-1  here   UA\n"

@@ -29,7 +29,7 @@ protected:
         centre_.answer("POST /v1/batches/b1/orders", json{{"orders", 1}});
     }
     json listed() const {
-        const fleet::ChosenHost host{newUser().publicKey(), "web-1", "", "here"};
+        const fleet::ChosenHost host{newUser().publicKey(), "web-1", "here"};
         const std::string bytes = maker_.orderFor(host, {"START", {{"product", "ux"}}, ""}, "*");
         return {{"host", host.key},
                 {"order", fleet::readOrder(bytes).order.id},

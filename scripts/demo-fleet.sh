@@ -1,0 +1,194 @@
+#!/bin/sh
+# Shows a fleet on this machine: builds the programs, makes a fleet's keys, starts the bus and the
+# centre, has five hosts and an operator join, deploys a real agent to all hosts in waves, kills one
+# host half-way and shows it coming back, and removes everything. Asks nothing, leaves no process
+# behind, and ends with status 0 when all of it worked.
+set -eu
+cd "$(dirname "$0")/.."
+
+hosts="web-1 web-2 web-3 db-1 db-2"
+
+say() { printf '\n\033[1m== %s\033[0m\n' "$*"; }
+run() { printf '$ %s\n' "$*"; "$@"; }
+
+# ---- Build ---------------------------------------------------------------------------------------
+
+scripts/bootstrap.sh
+say "Build"
+scripts/build.sh native --target zavmgmt zavhost zavctl zavctl-fleet zavlink zavfleetd
+PATH=$PWD/build/native/bin:$PATH
+
+# ---- What is started and what is left ------------------------------------------------------------
+
+scratch=$(mktemp -d)
+running=  # the processes, the newest first
+cleanup() {
+    status=$?
+    trap - EXIT
+    for name in $hosts; do
+        ZAV_SOCKET=$scratch/$name/host.sock zavctl stop ne >/dev/null 2>&1 || true
+    done
+    for process in $running; do kill "$process" 2>/dev/null || true; done
+    for process in $running; do wait "$process" 2>/dev/null || true; done
+    rm -rf "$scratch"
+    [ "$status" -eq 0 ] || echo "demo-fleet: failed"
+    exit "$status"
+}
+trap cleanup EXIT
+trap 'exit 130' INT TERM
+
+# begin NAME COMMAND...: starts a process whose output goes to a file of that name; sets process.
+begin() {
+    output=$scratch/$1.out
+    shift
+    "$@" >"$output" 2>&1 &
+    process=$!
+    running="$process $running"
+}
+# await WORDS: until the process that was started last has said so.
+await() {
+    tries=0
+    until grep -q "$1" "$output"; do
+        tries=$((tries + 1))
+        if [ "$tries" -gt 300 ] || ! kill -0 "$process" 2>/dev/null; then
+            cat "$output"
+            exit 1
+        fi
+        sleep 0.1
+    done
+}
+# A port that nothing listens on.
+free_port() {
+    port=$1
+    while grep -qi ":$(printf '%04X' "$port") 00000000:0000 0A" /proc/net/tcp /proc/net/tcp6; do
+        port=$((port + 1))
+    done
+    echo "$port"
+}
+
+# ---- The fleet's keys, its bus and its centre ----------------------------------------------------
+
+bus_port=$(free_port 24222)
+ZAV_FLEET=https://localhost:$(free_port 28443)
+XDG_CONFIG_HOME=$scratch/operator
+export ZAV_FLEET XDG_CONFIG_HOME
+centre="zavfleetd --directory $scratch/keys"
+root=$scratch/usb-stick/root.key
+mkdir "$scratch/usb-stick"
+
+say "Make the fleet's keys; the root goes elsewhere"
+# shellcheck disable=SC2086
+run $centre keys init --fleet demo --root "$root" --name localhost,127.0.0.1 \
+    --bus "nats://localhost:$bus_port" --url "$ZAV_FLEET" --store-bytes 1073741824
+say "Start the bus and the centre"
+begin bus nats-server -c "$scratch/keys/bus/nats-server.conf"
+await 'Server is ready'
+# shellcheck disable=SC2086
+begin centre $centre serve
+await 'the centre works'
+cat "$output"
+
+# ---- Hosts and an operator join ------------------------------------------------------------------
+
+# start_host NAME: the host and then its link.
+start_host() {
+    begin "$1.host" env ZAV_SOCKET="$scratch/$1/host.sock" \
+        QVSDEPLOY_AGENTDEPOT="$scratch/$1/home/depot" KBB_RAS1_LOG="$scratch/$1/trace.log" \
+        zavhost --home "$scratch/$1/home" --origin-node "$1:DEMO" --socket "$scratch/$1/host.sock"
+    await '^ready:'
+    host_process=$process
+}
+
+say "Five hosts join: each with the one line that the centre prints for it"
+for name in $hosts; do
+    mkdir -p "$scratch/$name/link"
+    home/bin/prepare-home "$scratch/$name/home" >/dev/null
+    start_host "$name"
+    case $name in web-*) role=web ;; *) role=db ;; esac
+    # shellcheck disable=SC2086
+    $centre enrol "$name" --labels "role=$role" 2>/dev/null |
+        zavlink enrol --directory "$scratch/$name/link" --config "$scratch/$name/zavlink.toml" \
+            --host-socket "$scratch/$name/host.sock" --label "role=$role" -
+    begin "$name.link" zavlink --config "$scratch/$name/zavlink.toml"
+    await 'connected to the bus'
+    [ "$name" != db-1 ] || killed_host=$host_process
+done
+
+say "An operator joins: the key is made here, and the root certifies it"
+# shellcheck disable=SC2086
+invitation=$($centre operator add anna --role admin 2>/dev/null)
+begin login zavctl login "$invitation"
+await 'U[A-Z0-9]\{55\}'
+# shellcheck disable=SC2086
+run $centre operator certify --root "$root" --all
+await 'logged in'
+run zavctl --fleet "$ZAV_FLEET" whoami
+tries=0
+until [ "$(zavctl hosts | grep -c ' here ')" -eq 5 ]; do
+    tries=$((tries + 1))
+    [ "$tries" -le 100 ]
+    sleep 0.5
+done
+run zavctl hosts
+
+# ---- A real agent, in waves ----------------------------------------------------------------------
+
+product=ne
+if version=$(home/bundles/make-bundle ne "$scratch/bundle" 2>"$scratch/bundle.err"); then
+    say "Deploy the distribution's node exporter"
+else
+    sed 's/^/  /' "$scratch/bundle.err"
+    say "The distribution cannot be reached; deploy another agent instead"
+    product=w1
+    version=1.0
+    mkdir -p "$scratch/bundle"
+    printf '#!/bin/sh\necho "installed"\n' >"$scratch/bundle/install.sh"
+fi
+fleet() { run zavctl --fleet "$ZAV_FLEET" "$@"; }
+fleet push "$scratch/bundle" "$product/$version" --on '*'
+fleet install "$product" "$version" --on 'role=web' --waves 1,100% --dry-run -- \
+    /bin/sh '|DEPLOYDIR|/install.sh' -h '|TOVRINHOME|'
+fleet install "$product" "$version" --on 'role=web' --waves 1,100% -- \
+    /bin/sh '|DEPLOYDIR|/install.sh' -h '|TOVRINHOME|'
+
+say "The others: and one of these hosts is killed with -9"
+kill -9 "$killed_host"
+wait "$killed_host" 2>/dev/null || true
+fleet install "$product" "$version" --on 'role=db' --no-wait -- \
+    /bin/sh '|DEPLOYDIR|/install.sh' -h '|TOVRINHOME|'
+sleep 3
+run zavctl rollout ls
+say "It comes back, and gets what it has missed"
+start_host db-1
+rollout=$(zavctl --json rollout ls | sed -n 's/.*"id": *"\([0-9a-f]*\)".*/\1/p' | head -n 1)
+run zavctl rollout watch "$rollout"
+run zavctl rollout show "$rollout"
+
+if [ "$product" = ne ]; then
+    say "Configure each host's agent, and start all of them"
+    port=19200
+    for name in $hosts; do
+        port=$(free_port $((port + 1)))
+        printf 'INSTANCE=\nPORT=%s\n' "$port" >"$scratch/$name.conf"
+        fleet config set ne --on "$name" --file "$scratch/$name.conf"
+    done
+    fleet start ne --on '*'
+    echo "The figures of db-1:"
+    db_port=$(sed -n 's/^PORT=//p' "$scratch/db-1.conf")
+    curl -s --max-time 5 --retry 20 --retry-delay 1 --retry-connrefused \
+        "http://127.0.0.1:$db_port/metrics" | grep -E '^node_(load1|boot_time_seconds) '
+    fleet stop ne --on '*'
+fi
+fleet uninstall "$product" --on '*'
+run zavctl hosts show db-1
+
+say "End everything"
+for process in $running; do kill "$process" 2>/dev/null || true; done
+for process in $running; do wait "$process" 2>/dev/null || true; done
+running=
+if pgrep -f "$scratch" >/dev/null; then
+    echo "A process was left behind:"
+    pgrep -af "$scratch"
+    exit 1
+fi
+echo "Nothing is left running."
