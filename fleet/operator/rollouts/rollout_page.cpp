@@ -1,5 +1,6 @@
 #include "fleet/operator/rollouts/rollout_page.h"
 
+#include <cmath>
 #include <nlohmann/json.hpp>
 #include <vector>
 
@@ -75,17 +76,27 @@ std::string line(const std::string& title, const std::string& text) {
     return title + std::string(kTitleWidth - title.size(), ' ') + text + "\n";
 }
 
+/// A time within a few years; 0 for everything else.
+double memberSeconds(const json& object, const char* member) {
+    constexpr double kMostSeconds = 1e8;
+    const auto found = object.find(member);
+    const bool isNumber = found != object.end() && found->is_number();
+    const double seconds = isNumber ? found->get<double>() : 0;
+    return seconds > 0 && seconds < kMostSeconds ? seconds : 0;
+}
+
 std::string planText(const json& plan) {
     std::string text = "waves " + memberText(plan, "waves") + ", at most " +
                        memberText(plan, "maxFailures") + " failures";
-    const auto add = [&](const char* member, const std::string& before, const char* unit) {
-        if (const std::uint64_t number = memberNumber(plan, member)) {
-            text += ", " + before + " " + std::to_string(number) + unit;
-        }
+    const auto addTime = [&](const char* member, const std::string& before, const char* behind) {
+        const std::chrono::seconds time(std::llround(memberSeconds(plan, member)));
+        if (time.count() > 0) text += ", " + before + " " + ctl::spanText(time) + behind;
     };
-    add("pause", "a pause of", " s between them");
-    add("wait", "each at most", " s");
-    add("parallel", "at most", " hosts at the same time");
+    addTime("pause", "a pause of", " between them");
+    addTime("wait", "each at most", "");
+    if (const std::uint64_t parallel = memberNumber(plan, "parallel")) {
+        text += ", at most " + hostsText(parallel) + " at the same time";
+    }
     return ctl::printable(text);
 }
 

@@ -29,9 +29,9 @@ public:
     void progress(const json& rollout) {
         if (!isText_) return;
         const std::uint64_t wave = memberNumber(rollout, "wave");
-        const std::string text = "wave " + std::to_string(wave) + " of " +
-                                 std::to_string(memberList(rollout, "waves").size()) + ", " +
-                                 progressText(rollout);
+        const std::string waves = "wave " + std::to_string(wave) + " of " +
+                                  std::to_string(memberList(rollout, "waves").size()) + ", ";
+        const std::string text = (wave == 0 ? "" : waves) + progressText(rollout);
         if (isDrawn_) {
             std::fprintf(stderr, "\r%s\033[K", text.c_str());
             std::fflush(stderr);

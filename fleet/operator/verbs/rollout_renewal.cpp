@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <nlohmann/json.hpp>
+#include <set>
 #include <utility>
 #include <vector>
 
@@ -23,16 +24,40 @@ namespace {
 constexpr ctl::Argument kUnknownToo =
     ctl::flag("--force", "Try again also where nobody knows whether it ran: it may run twice");
 constexpr ctl::Argument kRenewedRollout[] = {kRollout};
+/// A bad centre could go on for ever.
+constexpr std::size_t kMostToSign = 1'000'000;
+
 constexpr ctl::Argument kRetriedRollout[] = {kRollout, kUnknownToo};
+
+/// What the centre lists as to be signed, page by page. It changes while hosts tell how their
+/// orders have ended, so a host may stand on two pages.
+json listToSign(Centre& centre, const std::string& id, Renewal renewal, bool isForced) {
+    json hosts = json::array();
+    std::set<std::string> seen;
+    std::size_t from = 0;
+    std::uint64_t total = 0;
+    do {
+        const json page =
+            centre.get(rolloutTarget(id) + "/to-sign?for=" + nameOf(renewal) +
+                       (isForced ? "&force=1" : "") + "&from=" + std::to_string(from));
+        const json& listed = memberList(page, "hosts");
+        for (const json& host : listed) {
+            if (seen.insert(memberText(host, "host")).second) hosts.push_back(host);
+        }
+        if (listed.empty()) break;
+        from += listed.size();
+        total = memberNumber(page, "total");
+    } while (from < total && from < kMostToSign);
+    return {{"hosts", hosts}};
+}
 
 /// The orders that the roll-out wants, signed.
 std::vector<std::string> wantedOrders(Centre& centre, const std::string& id, Renewal renewal,
                                       bool isForced, const OperatorIdentity& identity,
                                       const OrderMaker& maker) {
     const json rollout = centre.get(rolloutTarget(id));
-    const json toSign = centre.get(rolloutTarget(id) + "/to-sign?for=" + nameOf(renewal) +
-                                   (isForced ? "&force=1" : ""));
-    return renewedOrders(toSign, rollout, renewal, identity, maker);
+    return renewedOrders(listToSign(centre, id, renewal, isForced), rollout, renewal, identity,
+                         maker);
 }
 
 json handOver(Centre& centre, const std::string& id, Renewal renewal, bool isForced,

@@ -94,7 +94,7 @@ TEST(RolloutPage, ShowsAllAboutOne) {
         << text;
     EXPECT_NE(text.find(", 12 min ago\n"), std::string::npos) << text;
     EXPECT_NE(
-        text.find("plan       waves 1,100%, at most 0 failures, a pause of 60 s between them\n"
+        text.find("plan       waves 1,100%, at most 0 failures, a pause of 1 min between them\n"
                   "state      running\n"),
         std::string::npos)
         << text;

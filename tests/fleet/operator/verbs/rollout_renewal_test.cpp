@@ -26,7 +26,10 @@ protected:
     RolloutRenewal() {
         centre_.answer("GET " + at_, json{{"kind", "START"}, {"product", "ux"}, {"selector", "*"}});
         centre_.answer("POST /v1/batches", json{{"batch", "b1"}});
-        centre_.answer("POST /v1/batches/b1/orders", json{{"orders", 1}});
+    }
+    /// The centre has so many orders in its batch.
+    void keepOrders(unsigned orders) {
+        centre_.answer("POST /v1/batches/b1/orders", json{{"orders", orders}});
     }
     json listed() const {
         const fleet::ChosenHost host{newUser().publicKey(), "web-1", "here"};
@@ -47,7 +50,8 @@ protected:
 };
 
 TEST_F(RolloutRenewal, ResumesWithWhatHasExpired) {
-    centre_.answer("GET " + at_ + "/to-sign?for=resume", json{{"hosts", {listed()}}});
+    keepOrders(1);
+    centre_.answer("GET " + at_ + "/to-sign?for=resume&from=0", json{{"hosts", {listed()}}});
     centre_.answer("POST " + at_ + "/resume", json{{"state", "running"}});
     const fleet::RenewalResult result = renew(Renewal::Resume);
     EXPECT_EQ(result.orders, 1U);
@@ -55,16 +59,32 @@ TEST_F(RolloutRenewal, ResumesWithWhatHasExpired) {
     EXPECT_EQ(centre_.asked().back().body, (json{{"batch", "b1"}}));
 }
 
+TEST_F(RolloutRenewal, SignsWhatStandsOnSeveralPages) {
+    const json first = listed();
+    const json second = listed();
+    centre_.answer("GET " + at_ + "/to-sign?for=resume&from=0",
+                   json{{"total", 3}, {"hosts", {first, second}}});
+    // One more host has told meanwhile, so the second one has moved.
+    centre_.answer("GET " + at_ + "/to-sign?for=resume&from=2",
+                   json{{"total", 3}, {"hosts", {second}}});
+    centre_.answer("POST " + at_ + "/resume", json{{"state", "running"}});
+    keepOrders(2);
+    EXPECT_EQ(renew(Renewal::Resume).orders, 2U);
+}
+
 TEST_F(RolloutRenewal, ResumesWithoutOrdersWhenNoneHasExpired) {
-    centre_.answer("GET " + at_ + "/to-sign?for=resume", json{{"hosts", json::array()}});
+    centre_.answer("GET " + at_ + "/to-sign?for=resume&from=0", json{{"hosts", json::array()}});
     centre_.answer("POST " + at_ + "/resume", json{{"state", "running"}});
     EXPECT_EQ(renew(Renewal::Resume).orders, 0U);
     EXPECT_EQ(centre_.asked().back().body, (json{{"orders", json::array()}}));
 }
 
 TEST_F(RolloutRenewal, TriesAgainWhereNobodyKnowsOnlyIfThatIsForced) {
-    centre_.answer("GET " + at_ + "/to-sign?for=retry-failed", json{{"hosts", json::array()}});
-    centre_.answer("GET " + at_ + "/to-sign?for=retry-failed&force=1", json{{"hosts", {listed()}}});
+    keepOrders(1);
+    centre_.answer("GET " + at_ + "/to-sign?for=retry-failed&from=0",
+                   json{{"hosts", json::array()}});
+    centre_.answer("GET " + at_ + "/to-sign?for=retry-failed&force=1&from=0",
+                   json{{"hosts", {listed()}}});
     centre_.answer("POST " + at_ + "/retry-failed", json{{"state", "running"}});
     EXPECT_EQ(failureOf([&] { renew(Renewal::RetryFailed); }).status(), ctl::kHostReportedFailure);
     EXPECT_EQ(renew(Renewal::RetryFailed, true).orders, 1U);
@@ -72,8 +92,9 @@ TEST_F(RolloutRenewal, TriesAgainWhereNobodyKnowsOnlyIfThatIsForced) {
 }
 
 TEST_F(RolloutRenewal, StopsTheReleaseOfOrdersBeforeItCancelsOthers) {
+    keepOrders(1);
     centre_.answer("POST " + at_ + "/abort", json{{"state", "aborted"}});
-    centre_.answer("GET " + at_ + "/to-sign?for=abort", json{{"hosts", {listed()}}});
+    centre_.answer("GET " + at_ + "/to-sign?for=abort&from=0", json{{"hosts", {listed()}}});
     const fleet::RenewalResult result = renew(Renewal::Abort);
     EXPECT_EQ(result.orders, 1U);
     EXPECT_EQ(result.note, "");
@@ -84,7 +105,8 @@ TEST_F(RolloutRenewal, StopsTheReleaseOfOrdersBeforeItCancelsOthers) {
 
 TEST_F(RolloutRenewal, AbortsAlsoWhenNothingCanBeCancelled) {
     centre_.answer("POST " + at_ + "/abort", json{{"state", "aborted"}});
-    centre_.answer("GET " + at_ + "/to-sign?for=abort", json{{"hosts", {{{"signed", "no"}}}}});
+    centre_.answer("GET " + at_ + "/to-sign?for=abort&from=0",
+                   json{{"hosts", {{{"signed", "no"}}}}});
     const fleet::RenewalResult result = renew(Renewal::Abort);
     EXPECT_EQ(result.rollout["state"], "aborted");
     EXPECT_NE(result.note, "");
