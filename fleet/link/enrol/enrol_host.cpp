@@ -74,6 +74,16 @@ std::string absolute(const std::string& path) {
     return std::string(folder.get()) + '/' + path;
 }
 
+HttpsAnswer answerTo(HttpsClient& centre, const HttpsRequest& request) {
+    try {
+        return centre.ask(request, std::chrono::steady_clock::now() + kPatience);
+    } catch (const HttpsError& error) {
+        if (error.kind() == HttpsError::Kind::NotTrusted) throw;
+        throw EnrolError(std::string(error.what()) +
+                         "; the same invitation may be used for another try");
+    }
+}
+
 /// Who this host is, before it has joined.
 class Applicant {
 public:
@@ -98,8 +108,7 @@ public:
         request.body = signEnrolment({invitation.fleet, invitation.token, keys_.bus.publicKey(),
                                       keys_.signing.publicKey(), machine_},
                                      keys_.bus, keys_.signing);
-        const HttpsAnswer answer =
-            centre.ask(request, std::chrono::steady_clock::now() + kPatience);
+        const HttpsAnswer answer = answerTo(centre, request);
         if (answer.status != kAccepted) {
             throw EnrolError("the centre at " + invitation.url +
                              " does not take this host: " + reasonIn(answer));
