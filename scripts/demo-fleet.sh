@@ -48,7 +48,7 @@ begin() {
 # await WORDS: until the process that was started last has said so.
 await() {
     tries=0
-    until grep -q "$1" "$output"; do
+    until grep -qs "$1" "$output"; do
         tries=$((tries + 1))
         if [ "$tries" -gt 300 ] || ! kill -0 "$process" 2>/dev/null; then
             cat "$output"
@@ -121,7 +121,8 @@ begin login zavctl login "$invitation"
 await 'U[A-Z0-9]\{55\}'
 # shellcheck disable=SC2086
 run $centre operator certify --root "$root" --all
-await 'logged in'
+await 'You are'
+cat "$output"
 run zavctl --fleet "$ZAV_FLEET" whoami
 tries=0
 until [ "$(zavctl hosts | grep -c ' here ')" -eq 5 ]; do
@@ -170,7 +171,9 @@ if [ "$product" = ne ]; then
     for name in $hosts; do
         port=$(free_port $((port + 1)))
         printf 'INSTANCE=\nPORT=%s\n' "$port" >"$scratch/$name.conf"
-        fleet config set ne --on "$name" --file "$scratch/$name.conf"
+        # A name without * is a label's: hosts are named one on a line.
+        echo "$name" >"$scratch/this-host"
+        fleet config set ne --on "@$scratch/this-host" --file "$scratch/$name.conf"
     done
     fleet start ne --on '*'
     echo "The figures of db-1:"
