@@ -100,7 +100,10 @@ Choice chooseHosts(Centre& centre, const std::string& selector) {
     if (choice.hosts.empty()) {
         throw ctl::Failure(ctl::kHostReportedFailure,
                            isFile ? "no host is named in " + ctl::printable(selector.substr(1))
-                                  : "no host is selected by " + ctl::printable(selector));
+                                  : "no host is selected by " + ctl::printable(selector),
+                           isFile ? ""
+                                  : "A word without * is a label's name; hosts' names have "
+                                    "one, as web-1*, or stand in a file: --on @FILE.");
     }
     return choice;
 }

@@ -7,7 +7,7 @@ namespace fleet {
 namespace {
 
 constexpr ctl::VerbGroup kFleetGroups[] = {
-    {"hosts", "List the hosts of a fleet, or show one"},
+    {"hosts", "List the hosts of a fleet, show, label or retire one"},
     {"rollout", "Look at roll-outs, stop them, and let them go on"},
     {"config", "Change an agent's configuration on many hosts"},
 };
@@ -18,14 +18,14 @@ const ctl::Vocabulary& fleetVocabulary() {
     static const ctl::Vocabulary vocabulary{
         "Manages the monitoring agents of many hosts: a fleet",
         kFleetArguments,
-        {&ctl::kStartVerb,     &ctl::kStopVerb,      &ctl::kRestartVerb,
-         &ctl::kInstallVerb,   &ctl::kUninstallVerb, &ctl::kRemoveInstanceVerb,
-         &ctl::kConfigSetVerb, &ctl::kUaConfigVerb,  &kFleetPushVerb,
-         &kHostsVerb,          &kHostsShowVerb,      &kRolloutLsVerb,
-         &kRolloutShowVerb,    &kRolloutWatchVerb,   &kRolloutPauseVerb,
-         &kRolloutResumeVerb,  &kRolloutAbortVerb,   &kRolloutRetryFailedVerb,
-         &kLoginVerb,          &kFleetWhoamiVerb,    &kFleetVersionVerb,
-         &kFleetHelpVerb},
+        {&ctl::kStartVerb,     &ctl::kStopVerb,          &ctl::kRestartVerb,
+         &ctl::kInstallVerb,   &ctl::kUninstallVerb,     &ctl::kRemoveInstanceVerb,
+         &ctl::kConfigSetVerb, &ctl::kUaConfigVerb,      &kFleetPushVerb,
+         &kHostsVerb,          &kHostsShowVerb,          &kHostsLabelVerb,
+         &kHostsRetireVerb,    &kRolloutLsVerb,          &kRolloutShowVerb,
+         &kRolloutWatchVerb,   &kRolloutPauseVerb,       &kRolloutResumeVerb,
+         &kRolloutAbortVerb,   &kRolloutRetryFailedVerb, &kLoginVerb,
+         &kFleetWhoamiVerb,    &kFleetVersionVerb,       &kFleetHelpVerb},
         {&kFleetGroups[0], &kFleetGroups[1], &kFleetGroups[2]}};
     return vocabulary;
 }

@@ -10,6 +10,8 @@ extern const ctl::Verb kFleetWhoamiVerb;
 extern const ctl::Verb kFleetPushVerb;
 extern const ctl::Verb kHostsVerb;
 extern const ctl::Verb kHostsShowVerb;
+extern const ctl::Verb kHostsLabelVerb;
+extern const ctl::Verb kHostsRetireVerb;
 extern const ctl::Verb kRolloutLsVerb;
 extern const ctl::Verb kRolloutShowVerb;
 extern const ctl::Verb kRolloutWatchVerb;

@@ -4,7 +4,7 @@ namespace fleet {
 
 /// The endpoints. Each has a file of its own below this folder and a row here.
 ApiEndpoint getCentreHealth, postEnrolment, postLogin, postSession, getOperator;
-ApiEndpoint getHosts, getHost, getHostOrders, postLabels;
+ApiEndpoint getHosts, getHost, getHostOrders, postLabels, postRetire;
 ApiEndpoint postBatch, postBatchOrders, postRollout, getRollouts, getRollout;
 ApiEndpoint getRolloutHosts, getRolloutFailures, getToSign;
 ApiEndpoint getFile, postFile, getFileContent;
@@ -63,6 +63,10 @@ std::vector<ApiRoute> apiRoutes() {
         {"POST", "/v1/hosts/{host}/labels", "Gives a host other labels.",
          Access::Act, kWorker, postLabels, {{200, "the host", nullptr}}, {kHost}, kNone,
          {{"labels", JsonType::Object, Need::Required, "all of them"}}},
+
+        {"POST", "/v1/hosts/{host}/retire", "Takes a host out of the fleet for ever.",
+         Access::Act, kWorker, postRetire, {{200, "the orders whose ends nobody tells", nullptr}},
+         {kHost}},
 
         {"GET", "/v1/files/{sha256}", "How far a file is.",
          Access::Act, kWorker, getFile, {{200, "the file", nullptr}}, {kSum, kSize}},

@@ -281,6 +281,23 @@ TEST_F(CentreInterface, LetsAdminsLabelHosts) {
     EXPECT_EQ(get("/v1/hosts/web-1", ada).document["labels"], labels["labels"]);
 }
 
+TEST_F(CentreInterface, LetsAnAdminRetireAHost) {
+    const LoggedIn ada = admin();
+    const LoggedIn otto = login({"otto", Role::Operator, {"START"}, {"ux"}, "*", made_fleet::kDay});
+    const std::string host = join("web-1");
+    post("/v1/rollouts", ada, {{"orders", {orderFor(host, ada)}}});
+    ASSERT_TRUE(eventually(
+        [&] { return get("/v1/hosts/web-1/orders", ada).document["orders"].size() == 1; }));
+    EXPECT_EQ(post("/v1/hosts/web-1/retire", otto).status, 403U);
+    EXPECT_EQ(post("/v1/hosts/web-1/retire", ada).document["unknown"], 1);
+    EXPECT_EQ(get("/v1/hosts/web-1", ada).status, 404U);
+    const std::string path =
+        "/v1/rollouts/" + get("/v1/rollouts", ada).document["rollouts"][0]["id"].get<std::string>();
+    EXPECT_TRUE(eventually([&] { return get(path, ada).document["state"] != "running"; }));
+    EXPECT_EQ(get(path, ada).document["counts"]["over"], (json{{"unknown", 1}}));
+    EXPECT_EQ(ask("POST", "/v1/sessions", "", sessionRequest(signers_.at("web-1"))).status, 403U);
+}
+
 TEST_F(CentreInterface, MakesARollOutOfOrders) {
     const LoggedIn ada = admin();
     const std::string one = join("web-1");
@@ -312,6 +329,7 @@ TEST_F(CentreInterface, MakesARollOutOfOrders) {
     EXPECT_EQ(given[0]["order"], order);
     EXPECT_EQ(given[0]["kind"], "START");
     EXPECT_EQ(given[0]["product"], "ux");
+    EXPECT_EQ(given[0]["operator"], "ada");
     EXPECT_EQ(given[0]["state"], "open");
 }
 
