@@ -3,8 +3,19 @@
 # centre, has five hosts and an operator join, deploys a real agent to all hosts in waves, kills one
 # host half-way and shows it coming back, and removes everything. Asks nothing, leaves no process
 # behind, and ends with status 0 when all of it worked.
+#
+#   scripts/demo-fleet.sh [--built DIR]
+#
+#   --built DIR  uses the programs there, and a made-up agent: nothing is built, nothing fetched
 set -eu
 cd "$(dirname "$0")/.."
+built=
+if [ "${1-}" = --built ] && [ $# -eq 2 ]; then
+    built=$2
+elif [ $# -gt 0 ]; then
+    sed -n '7,9s/^# \{0,1\}//p' "$0" >&2
+    exit 2
+fi
 
 hosts="web-1 web-2 web-3 db-1 db-2"
 
@@ -13,10 +24,14 @@ run() { printf '$ %s\n' "$*"; "$@"; }
 
 # ---- Build ---------------------------------------------------------------------------------------
 
-scripts/bootstrap.sh
-say "Build"
-scripts/build.sh native --target zavmgmt zavhost zavctl zavctl-fleet zavlink zavfleetd
-PATH=$PWD/build/native/bin:$PATH
+if [ -z "$built" ]; then
+    scripts/bootstrap.sh
+    say "Build"
+    scripts/build.sh native --target zavmgmt zavhost zavctl zavctl-fleet zavlink zavfleetd
+    built=$PWD/build/native/bin
+    fetches=yes
+fi
+PATH=$built:$PATH
 
 # ---- What is started and what is left ------------------------------------------------------------
 
@@ -68,8 +83,10 @@ free_port() {
 
 # ---- The fleet's keys, its bus and its centre ----------------------------------------------------
 
-bus_port=$(free_port 24222)
-ZAV_FLEET=https://localhost:$(free_port 28443)
+# Others may look for ports at the same time.
+first_port=$((20000 + $$ % 10000))
+bus_port=$(free_port "$first_port")
+ZAV_FLEET=https://localhost:$(free_port $((bus_port + 1)))
 XDG_CONFIG_HOME=$scratch/operator
 export ZAV_FLEET XDG_CONFIG_HOME
 centre="zavfleetd --directory $scratch/keys"
@@ -135,11 +152,12 @@ run zavctl hosts
 # ---- A real agent, in waves ----------------------------------------------------------------------
 
 product=ne
-if version=$(home/bundles/make-bundle ne "$scratch/bundle" 2>"$scratch/bundle.err"); then
+if [ -n "${fetches-}" ] &&
+    version=$(home/bundles/make-bundle ne "$scratch/bundle" 2>"$scratch/bundle.err"); then
     say "Deploy the distribution's node exporter"
 else
-    sed 's/^/  /' "$scratch/bundle.err"
-    say "The distribution cannot be reached; deploy another agent instead"
+    [ -z "${fetches-}" ] || sed 's/^/  /' "$scratch/bundle.err"
+    say "Deploy a made-up agent: the distribution's cannot be had"
     product=w1
     version=1.0
     mkdir -p "$scratch/bundle"
@@ -167,7 +185,7 @@ run zavctl rollout show "$rollout"
 
 if [ "$product" = ne ]; then
     say "Configure each host's agent, and start all of them"
-    port=19200
+    port=$((bus_port + 100))
     for name in $hosts; do
         port=$(free_port $((port + 1)))
         printf 'INSTANCE=\nPORT=%s\n' "$port" >"$scratch/$name.conf"
