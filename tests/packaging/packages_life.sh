@@ -81,6 +81,9 @@ say "installs"
 put_in before
 holds /run/systemctl.log "start zavhost.service"
 expect "rights of the state" "$(stat -c '%a %U' /var/lib/zavhost)" "700 root"
+for program in zavlink zavfleetd; do
+    expect "rights of $program" "$(stat -c '%a %U %G' "/var/lib/$program")" "700 $program $program"
+done
 [ -x "$home/bin/TovrinAgent" ] || fail "there is no home"
 holds /etc/group "zavmgmt:"
 holds /etc/zavmgmt/zavhost.conf 'home = "/var/lib/zavmgmt"'
@@ -199,6 +202,18 @@ zavctl stop "$agent" >/dev/null
 zavctl uninstall "$agent" >/dev/null
 zavctl start um >/dev/null
 process=$(cut -d ' ' -f 1 "$home/run/um.pid")
+
+say "keeps the keys of a fleet"
+runuser -u zavfleetd -- zavfleetd keys init --fleet demo --root /tmp/root.key --name bus.example \
+    --store-bytes 1000000 2>/tmp/keys.log
+apt purge zavfleetd >/tmp/apt.log 2>&1 || {
+    cat /tmp/apt.log >&2
+    fail "zavfleetd cannot be purged"
+}
+holds /tmp/apt.log "the keys and the records of a fleet stay in /var/lib/zavfleetd"
+[ -e /var/lib/zavfleetd/keys/centre.key ] || fail "the purge took the keys of a fleet"
+rm -rf /var/lib/zavfleetd/keys
+put_in new
 
 say "purges everything"
 # shellcheck disable=SC2086
