@@ -24,8 +24,8 @@ struct Trust {
 
 /// The order that has this number; nothing if the centre has not signed that, which is dropped and
 /// counted. Everything else that is wrong becomes the directive's refusal, which the host records.
-/// Times are not judged: that is done when its turn has come. `key` unseals what was sealed for
-/// this host.
+/// Times are not judged: that is done when its turn has come. `key` is the host's signing key,
+/// which unseals what was sealed for it.
 std::optional<Directive> judge(std::string_view bytes, Number number, const Trust& trust,
                                const KeyPair& key);
 

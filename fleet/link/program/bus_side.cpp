@@ -61,11 +61,9 @@ std::string publishedOutcome(const Outcome& outcome, const KeyPair& signing) {
     return signOutcome(shorter, signing);
 }
 
-BusSide::BusSide(ConnectionOptions options, Trust trust, const KeyPair& bus, const KeyPair& signing,
-                 Events events)
+BusSide::BusSide(ConnectionOptions options, Trust trust, const KeyPair& signing, Events events)
     : options_(std::move(options)),
       trust_(std::move(trust)),
-      bus_(bus),
       signing_(signing),
       events_(std::move(events)) {
     options_.events.disconnected = events_.disconnected;
@@ -146,7 +144,7 @@ void BusSide::readNow(Number number) {
     const LastResult found = lastOn(*connection_, kTasksStream, subject, kAnswerTime);
     if (found.kind == LastResult::Kind::Missing) return events_.missing(number);
     if (found.kind != LastResult::Kind::Found) return events_.unanswered(number);
-    std::optional<Directive> directive = judge(found.bytes, number, trust_, bus_);
+    std::optional<Directive> directive = judge(found.bytes, number, trust_, signing_);
     if (directive) return events_.read(number, std::move(*directive));
     ++unsignedNumbers_;
     say(Priority::Warning,

@@ -31,8 +31,7 @@ public:
     };
 
     /// `signing` and the bus's key in `options` are this host's.
-    BusSide(ConnectionOptions options, Trust trust, const KeyPair& bus, const KeyPair& signing,
-            Events events);
+    BusSide(ConnectionOptions options, Trust trust, const KeyPair& signing, Events events);
     /// No event comes any more once it is over. What is under way is waited for, some seconds.
     ~BusSide();
     BusSide(const BusSide&) = delete;
@@ -56,7 +55,6 @@ private:
 
     ConnectionOptions options_;
     const Trust trust_;
-    const KeyPair bus_;
     const KeyPair signing_;
     const Events events_;
     std::atomic<std::uint64_t> unsignedNumbers_{0};

@@ -26,7 +26,7 @@ Moment drawnPause() {
 
 LinkProgram::LinkProgram(const LinkConfiguration& configuration)
     : file_(configuration.state), latest_(file_.kept().latest), link_(settings(), file_.kept()) {
-    bus_ = std::make_unique<BusSide>(busOptions(configuration), trust(configuration), file_.bus(),
+    bus_ = std::make_unique<BusSide>(busOptions(configuration), trust(configuration),
                                      file_.signing(), busEvents());
     host_ = std::make_unique<HostSide>(configuration.hostSocket, hostEvents());
 }

@@ -9,6 +9,7 @@ extern const ctl::Verb kLoginVerb;
 extern const ctl::Verb kFleetWhoamiVerb;
 extern const ctl::Verb kHostsVerb;
 extern const ctl::Verb kHostsShowVerb;
+extern const ctl::Verb kHostsLabelVerb;
 extern const ctl::Verb kRolloutLsVerb;
 extern const ctl::Verb kRolloutShowVerb;
 extern const ctl::Verb kRolloutWatchVerb;

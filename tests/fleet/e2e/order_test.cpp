@@ -115,10 +115,12 @@ TEST_F(FleetOrders, CanBeCancelledBeforeTheirTurn) {
 TEST_F(FleetOrders, KeepTheirSecretsFromBusAndCentre) {
     const std::string secret = "a-password-that-nobody-else-may-see";
     const std::string sealed =
-        fleet::sealFor(host->key(), json({{"context", "PASSWORD=" + secret}}).dump());
+        fleet::sealFor(host->signing(), json({{"context", "PASSWORD=" + secret}}).dump());
     const std::string order = scene.submit(scene.order(
         *host, "SETCONFIG", json({{"product", "ux"}, {"sealed", fleet::base64Of(sealed)}}).dump()));
-    EXPECT_NE(scene.awaitEnd(*host, order), "");
+    const std::string end = scene.awaitEnd(*host, order);
+    EXPECT_NE(end, "");
+    EXPECT_NE(end, "refused") << taskOf(order);
     EXPECT_NE(taskOf(order).at("command"), "");
     scene.stopCentre();
     for (const std::string& directory : {scene.bus().server().dir().path(), scene.files().path()}) {
