@@ -50,8 +50,8 @@ protected:
         const fleet::KeyPair centre = newUser();
         const std::string numbered =
             signNumber(host_.key, 7, fleet::readOrder(order).order.id, order, centre);
-        const fleet::Trust trust{"demo",         host_.key,         "web-1", {{"env", "test"}},
-                                 identity_.root, centre.publicKey()};
+        const fleet::Trust trust{"demo",         host_.key,           "web-1", {{"env", "test"}},
+                                 identity_.root, {centre.publicKey()}};
         return judge(numbered, 7, trust, signing_);
     }
 
