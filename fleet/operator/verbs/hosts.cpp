@@ -22,9 +22,6 @@ constexpr ctl::Argument kSelector = ctl::positional("SELECTOR", "Which hosts; se
 constexpr ctl::Argument kHostsArguments[] = {kSelector};
 constexpr ctl::Argument kHostName = ctl::positional("HOST", "Its name or its key").required();
 constexpr ctl::Argument kHostArguments[] = {kHostName};
-constexpr ctl::Argument kLabelChanges =
-    ctl::positionals("LABEL", "NAME=VALUE gives a label, !NAME takes it away").required();
-constexpr ctl::Argument kLabelArguments[] = {kHostName, kLabelChanges};
 
 constexpr const char* kAllHosts = "*";
 constexpr const char* kOrdersShown = "10";
@@ -48,30 +45,6 @@ ctl::ExitStatus runHostsShow(const ctl::Invocation& invocation) {
     const json host = side.centre.get(target);
     const json orders = side.centre.get(target + "/orders?limit=" + kOrdersShown);
     return ctl::print(showHost(host, orders, std::chrono::system_clock::now(), invocation.format));
-}
-
-ctl::ExitStatus runHostsLabel(const ctl::Invocation& invocation) {
-    OperatorSide side(invocation);
-    const std::string target = targetOf(invocation);
-    const json labels =
-        changedLabels(side.centre.get(target), invocation.given.texts(kLabelChanges));
-    const json host = side.centre.post(target + "/labels", {{"labels", labels}});
-    return ctl::print(
-        showHosts(json::array({host}), std::chrono::system_clock::now(), invocation.format));
-}
-
-ctl::ExitStatus runHostsRetire(const ctl::Invocation& invocation) {
-    OperatorSide side(invocation);
-    const json told = side.centre.post(targetOf(invocation) + "/retire", json::object());
-    if (invocation.format == ctl::Format::Json) return ctl::print(ctl::jsonPage(told));
-    const std::uint64_t open = memberNumber(told, "unknown");
-    return ctl::print(
-        {ctl::printable(invocation.given.text(kHostName)) +
-             " is no longer in the fleet; its key never counts again.\n" +
-             (open == 0 ? std::string()
-                        : "How " + std::to_string(open) + (open == 1 ? " order" : " orders") +
-                              " of it ended, nobody will know.\n"),
-         {}});
 }
 
 std::string labelsText(const json& host) {
@@ -141,22 +114,6 @@ constexpr ctl::Verb kHostsShowVerb = {
     runHostsShow,
 };
 
-constexpr ctl::Verb kHostsLabelVerb = {
-    "hosts label",
-    "Give a host other labels at the centre",
-    kLabelArguments,
-    {"zavctl --fleet https://centre.example hosts label web-1 env=prod",
-     "zavctl --fleet https://centre.example hosts label web-1 '!env'"},
-    runHostsLabel,
-};
-
-constexpr ctl::Verb kHostsRetireVerb = {
-    "hosts retire", "Take a host out of the fleet for ever",
-    kHostArguments, {"zavctl --fleet https://centre.example hosts retire web-1",
-     "zavctl --fleet https://centre.example --json hosts retire web-1"},
-    runHostsRetire,
-};
-
 std::string troubleOf(const json& host) {
     std::string text;
     const auto add = [&text](const std::string& what) {
@@ -173,23 +130,6 @@ std::string troubleOf(const json& host) {
         add("its clock is " + ctl::spanText(seconds) + (skew > 0 ? " ahead" : " behind"));
     }
     return text;
-}
-
-json changedLabels(const json& host, const std::vector<std::string>& changes) {
-    const auto found = host.find("labels");
-    json labels = found != host.end() && found->is_object() ? *found : json::object();
-    for (const std::string& change : changes) {
-        const std::size_t equal = change.find('=');
-        if (change.size() > 1 && change.front() == '!' && equal == std::string::npos) {
-            labels.erase(change.substr(1));
-        } else if (equal != std::string::npos && equal > 0 && equal + 1 < change.size()) {
-            labels[change.substr(0, equal)] = change.substr(equal + 1);
-        } else {
-            throw ctl::Failure(ctl::kWrongUsage, "\"" + ctl::printable(change) +
-                                                     "\" is neither NAME=VALUE nor !NAME");
-        }
-    }
-    return labels;
 }
 
 ctl::Page showHosts(const json& hosts, ctl::WallTime now, ctl::Format format) {

@@ -1,9 +1,8 @@
-/// hosts: lists the hosts of a fleet; hosts show: all about one; hosts label and hosts retire.
+/// hosts: lists the hosts of a fleet; hosts show: all about one.
 #pragma once
 
 #include <nlohmann/json_fwd.hpp>
 #include <string>
-#include <vector>
 
 #include "ctl/show/page.h"
 #include "ctl/show/time_text.h"
@@ -12,10 +11,6 @@ namespace fleet {
 
 /// What holds a host up, or is odd about it; empty if nothing.
 std::string troubleOf(const nlohmann::json& host);
-
-/// A host's labels with some changes, each "name=value", or "!name" to take one away. Throws
-/// ctl::Failure(kWrongUsage) for other texts.
-nlohmann::json changedLabels(const nlohmann::json& host, const std::vector<std::string>& changes);
 
 /// A line for each of the hosts' documents.
 ctl::Page showHosts(const nlohmann::json& hosts, ctl::WallTime now, ctl::Format format);

@@ -41,14 +41,6 @@ TEST(HostsPage, HasALineForEachHost) {
               (json{{"hosts", {webHost()}}}));
 }
 
-TEST(HostsLabels, AreGivenAndTakenAway) {
-    EXPECT_EQ(fleet::changedLabels(webHost(), {"env=prod", "!site", "rack=a=b"}),
-              (json{{"env", "prod"}, {"rack", "a=b"}}));
-    EXPECT_EQ(fleet::changedLabels(json::object(), {"env=prod"}), (json{{"env", "prod"}}));
-    for (const char* const bad : {"env", "=x", "env=", "!", "!env=x", ""})
-        EXPECT_THROW(fleet::changedLabels(webHost(), {bad}), ctl::Failure) << bad;
-}
-
 TEST(HostsPage, SaysWhatIsOddAboutAHost) {
     EXPECT_EQ(fleet::troubleOf({{"stopped", "two machines claim to be it"}}),
               "stopped: two machines claim to be it");
