@@ -36,7 +36,7 @@ public:
     explicit ApiServices(CentreService& service)
         : directory(service.directory()),
           facts(directory.facts()),
-          files(directory.path() + "/files"),
+          files(directory.files()),
           service_(service),
           trust_(directory.trustDatabase()),
           members_(trust_.connection()) {}

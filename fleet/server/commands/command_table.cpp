@@ -16,6 +16,8 @@ const std::vector<Command>& commandTable() {
         {"revoke", "operator", "Let an operator's keys count no longer", declareRevokeOperator},
         {"revoke", "host", "Let a host's key count no longer", declareRevokeHost},
         {"revoke", "ls", "List the keys that count no longer", declareRevokeList},
+        {"", "backup", "Copy the databases, also while the centre works", declareBackup},
+        {"", "restore", "Put a copy of the orders back; the centre must not run", declareRestore},
         {"", "doctor", "Look for keys and certificates that end soon", declareDoctor},
     };
     return table;

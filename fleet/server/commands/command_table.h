@@ -21,5 +21,7 @@ Action declareRevokeHost(CLI::App& app);
 Action declareRevokeOperator(CLI::App& app);
 Action declareRevokeList(CLI::App& app);
 Action declareDoctor(CLI::App& app);
+Action declareBackup(CLI::App& app);
+Action declareRestore(CLI::App& app);
 
 }  // namespace fleet

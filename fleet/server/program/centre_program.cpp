@@ -180,6 +180,7 @@ bool CentreProgram::hasLease() const {
 bool CentreProgram::beginWork() {
     bus_ = std::make_unique<NatsCentreBus>(*connection_, [this] { return hasLease(); });
     centre_ = std::make_unique<Centre>(store_, *bus_, settings_.alarm);
+    if (store_.isPutBack() && !completePutBack()) return false;
     Connection::Subscribed made = connection_->subscribe(
         std::string(kHelloSubject) + '*', [this](const BusMessage& message) { takeHello(message); },
         kAnswerTime);
@@ -196,6 +197,29 @@ bool CentreProgram::beginWork() {
     sweeper_->add([this] { sweep(); });
     isWorking_ = true;
     say(Priority::Info, "the centre works");
+    return true;
+}
+
+/// A copy does not know what was given after it was made. What is still on the bus is adopted, all
+/// numbers that may have been given are skipped, and hosts are asked what they have. Before that
+/// nobody is answered.
+bool CentreProgram::completePutBack() {
+    const SubjectsResult found = subjectsOf(*connection_, kTasksStream, kTaskSubjects, kAnswerTime);
+    if (!found.status.done()) {
+        say(Priority::Error, "the orders on the bus cannot be listed: " + found.status.text);
+        return false;
+    }
+    sqlite::Transaction all(database_.connection());
+    for (const std::string& subject : found.subjects)
+        checkOnBus(subject);
+    const Moment at = now();
+    centre_->restored(at);
+    CentreParts parts{*centre_, store_, database_.connection(), news_};
+    if (settings_.putBack) settings_.putBack(parts, at);
+    store_.noteCompleted();
+    all.commit();
+    say(Priority::Notice, "the database was put back: " + std::to_string(found.subjects.size()) +
+                              " orders are on the bus, and roll-outs are paused");
     return true;
 }
 

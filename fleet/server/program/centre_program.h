@@ -46,6 +46,9 @@ struct CentreSettings {
     /// Called once before anything else, and then each second as a transaction of its own; again at
     /// once while it returns true. On the thread of run(). May be empty.
     std::function<bool(CentreParts& parts, Moment now)> attend = {};
+    /// Called once, within the transaction that completes a database which was put back from a
+    /// backup. On the thread of run(). May be empty.
+    std::function<void(CentreParts& parts, Moment now)> putBack = {};
     std::vector<std::string> earlierKeys = {};  ///< public keys that have numbered orders before
 };
 
@@ -110,6 +113,7 @@ private:
     bool claim();
     bool ensureStreams();
     bool beginWork();
+    bool completePutBack();
     void loop();
     void readLetters(Mailbox::Letter first);
     bool attend();

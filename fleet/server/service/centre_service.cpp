@@ -47,7 +47,7 @@ ConnectionOptions CentreService::busOptions() const {
 }
 
 CentreSettings CentreService::settings(const ServiceOptions& options) {
-    CentreSettings settings{options.directory + "/orders", busOptions(), key_.key,
+    CentreSettings settings{directory_.orders(), busOptions(), key_.key,
                             StreamLimits{options.tasksBytes, options.replicas}, holderName()};
     const BusUser user = directory_.bus().centre;
     settings.bus.credentials =
@@ -60,6 +60,10 @@ CentreSettings CentreService::settings(const ServiceOptions& options) {
     settings.revoked = [this] { return revoked_; };
     settings.alarm = sayAlarm;
     settings.attend = [this](CentreParts& parts, Moment now) { return attend(parts, now); };
+    settings.putBack = [this](CentreParts& parts, Moment now) {
+        begin(parts);
+        rollouts_->restored(now);
+    };
     return settings;
 }
 

@@ -56,6 +56,36 @@ void makePrivateFile(const std::string& file) {
     ::close(made);
 }
 
+void copyDatabase(const std::string& file, const std::string& to) {
+    const std::string made = to + ".new";
+    try {
+        if (fs::exists(to) && fs::equivalent(to, file)) {
+            throw StoreError(to + " is the database itself");
+        }
+        removeDatabase(made);
+        makePrivateFile(made);
+        // A connection of its own reads beside the one that writes.
+        sqlite::Database reader(file);
+        reader.change("VACUUM INTO CAST(? AS TEXT)", made);
+        syncFile(made);
+        fs::rename(made, to);
+        syncFolderOf(to);
+    } catch (const fs::filesystem_error& error) {
+        throw StoreError(error.what());
+    }
+}
+
+/// Nothing of an older database may be taken for changes of the one that comes in its place.
+void emptyLog(const std::string& file) {
+    try {
+        sqlite::Database(file).run("PRAGMA journal_mode = DELETE");
+    } catch (const sqlite::DatabaseError&) {
+        // A damaged one: that is why there is another.
+    }
+    for (const char* const ending : {"-journal", "-wal", "-shm"})
+        fs::remove(file + ending);
+}
+
 }  // namespace
 
 CentreDatabase::CentreDatabase(const std::string& directory) try : directory_(directory) {
@@ -80,20 +110,32 @@ void CentreDatabase::openDatabase(const std::string& file) {
 }
 
 void CentreDatabase::backup(const std::string& to) const {
-    const std::string file = directory_.database();
-    const std::string made = to + ".new";
+    copyDatabase(directory_.database(), to);
+}
+
+void backUpCentre(const std::string& directory, const std::string& to) {
+    const std::string file = CentreDirectory::databaseIn(directory);
+    if (!fs::exists(file)) throw StoreError("there is no centre's database in " + directory);
+    copyDatabase(file, to);
+}
+
+void putBackCentre(const std::string& directory, const std::string& from) {
+    if (!fs::exists(from)) throw StoreError(from + " is missing");
+    const CentreDirectory owned(directory);
+    const std::string file = owned.database();
+    const std::string made = file + ".put-back";
+    copyDatabase(from, made);
+    {
+        sqlite::Database copy(made);
+        adoptCentreTables(copy, from);
+        copy.run("INSERT OR REPLACE INTO facts VALUES ('put_back', 1)");
+        // So that all of it is in the one file.
+        copy.run("PRAGMA journal_mode = DELETE");
+    }
     try {
-        if (fs::exists(to) && fs::equivalent(to, file)) {
-            throw StoreError(to + " is the database itself");
-        }
-        removeDatabase(made);
-        makePrivateFile(made);
-        // A connection of its own reads beside the one that writes.
-        sqlite::Database reader(file);
-        reader.change("VACUUM INTO CAST(? AS TEXT)", made);
-        syncFile(made);
-        fs::rename(made, to);
-        syncFolderOf(to);
+        if (fs::exists(file)) emptyLog(file);
+        fs::rename(made, file);
+        syncFolderOf(file);
     } catch (const fs::filesystem_error& error) {
         throw StoreError(error.what());
     }

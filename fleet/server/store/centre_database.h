@@ -31,4 +31,12 @@ private:
     std::optional<sqlite::Database> connection_;
 };
 
+/// CentreDatabase::backup() of the database in a directory, which another process may have open.
+void backUpCentre(const std::string& directory, const std::string& to);
+
+/// Puts a copy in the place of the database in a directory, which nobody may have open. The centre
+/// that opens it next learns that; see SqliteCentreStore::isPutBack(). Throws StoreError or
+/// sqlite::DatabaseError, before anything was changed if the copy is no centre's.
+void putBackCentre(const std::string& directory, const std::string& from);
+
 }  // namespace fleet

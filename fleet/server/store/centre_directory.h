@@ -15,7 +15,9 @@ public:
     CentreDirectory(const CentreDirectory&) = delete;
     CentreDirectory& operator=(const CentreDirectory&) = delete;
 
-    std::string database() const { return path_ + "/centre.db"; }
+    std::string database() const { return databaseIn(path_); }
+    /// The database of a directory that may be another process's.
+    static std::string databaseIn(const std::string& path) { return path + "/centre.db"; }
 
 private:
     const std::string path_;

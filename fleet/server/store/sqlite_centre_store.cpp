@@ -171,6 +171,14 @@ void SqliteCentreStore::skipNumbers(Number count, Number atLeast, Moment listUnt
     transaction.commit();
 }
 
+bool SqliteCentreStore::isPutBack() const {
+    return database_.number("SELECT count(*) FROM facts WHERE name = 'put_back'") > 0;
+}
+
+void SqliteCentreStore::noteCompleted() {
+    database_.change("DELETE FROM facts WHERE name = 'put_back'");
+}
+
 Moment SqliteCentreStore::listUntil() const {
     return Moment(database_.number("SELECT value FROM facts WHERE name = 'list_until'"));
 }

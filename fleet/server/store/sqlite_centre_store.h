@@ -30,6 +30,10 @@ public:
     void skipNumbers(Number count, Number atLeast, Moment listUntil) override;
     Moment listUntil() const override;
 
+    /// Whether this is a copy that was put back, and has not been completed since.
+    bool isPutBack() const;
+    void noteCompleted();
+
 private:
     struct HostRow {
         std::int64_t id;

@@ -27,6 +27,9 @@ public:
     const std::string& path() const { return path_; }
     /// The database of who may take part, see TrustDatabase.
     std::string trustDatabase() const { return path_ + "/trust.db"; }
+    /// The directory of the database of orders, see CentreDatabase; and that of operators' files.
+    std::string orders() const { return path_ + "/orders"; }
+    std::string files() const { return path_ + "/files"; }
     /// The certificate of the TLS authority, and the centre's own with its key in one file: so
     /// they change together. Both PEM.
     std::string authorityFile() const { return path_ + "/ca.pem"; }

@@ -9,8 +9,10 @@
 #include <string>
 
 #include "fleet/bus/messages/enrolment.h"
+#include "fleet/bus/messages/order.h"
 #include "fleet/server/keys/trust/host_enrolment.h"
 #include "fleet/server/keys/trust/revocations.h"
+#include "fleet/server/store/centre_database.h"
 #include "tests/fleet/server/keys/running_fleet.h"
 
 namespace {
@@ -94,6 +96,47 @@ TEST_F(RunningCentre, HasTheBusCutOffAHostThatIsRevokedWhileItRuns) {
     fleet::TrustDatabase trust(directory().trustDatabase());
     fleet::RevokedKeys(trust.connection()).revokeHost("web-1", today());
     EXPECT_TRUE(eventually([&isCut] { return isCut.load(); }));
+}
+
+TEST_F(RunningCentre, TakesUpWhatACopyThatWasPutBackDoesNotKnow) {
+    join("web-1");
+    start();
+    const std::string host = bus.publicKey();
+    ASSERT_TRUE(eventually([&] { return recordOf(host).has_value(); }));
+    const ScratchDir copies;
+    fleet::backUpCentre(directory().orders(), copies.path("orders.db"));
+    fleet::Order order;
+    order.fleet = "demo";
+    order.id = fleet::makeOrderId();
+    order.host = host;
+    order.selector = "*";
+    order.kind = "START";
+    order.body = "{}";
+    order.issued = today();
+    order.expires = today() + made_fleet::kDay;
+    const KeyPair key = KeyPair::make(KeyKind::User);
+    ASSERT_EQ(service->centre().submit(signOrder(order, key, "certificate")).get(),
+              fleet::Number{1});
+    const auto orderNow = [&] {
+        return service->centre()
+            .ask([&](fleet::CentreParts& parts) { return parts.store.order(host, order.id); })
+            .get();
+    };
+    ASSERT_TRUE(eventually([&] { return orderNow()->isPublished; }));
+    stop();
+
+    fleet::putBackCentre(directory().orders(), copies.path("orders.db"));
+    start();
+    const auto known = orderNow();
+    ASSERT_TRUE(known.has_value()) << "it is on the bus";
+    EXPECT_EQ(known->number, fleet::Number{1});
+    order.id = fleet::makeOrderId();
+    const auto next = service->centre().submit(signOrder(order, key, "certificate")).get();
+    EXPECT_GT(next.value(), fleet::Centre::kRestoreGap);
+    EXPECT_GT(service->centre()
+                  .ask([](fleet::CentreParts& parts) { return parts.store.listUntil(); })
+                  .get(),
+              today());
 }
 
 TEST_F(RunningCentre, IsAProgramThatEndsWhenItIsTold) {

@@ -219,4 +219,53 @@ TEST_F(CentreDatabaseFile, RefusesToGiveANumberTwice) {
     });
 }
 
+TEST_F(CentreDatabaseFile, IsAnOlderOneOnceACopyWasPutBack) {
+    make();
+    const std::string copy = scratch_.path("copy.db");
+    fleet::backUpCentre(directory(), copy);
+    with([](SqliteCentreStore& store) {
+        give(store, "two");
+        EXPECT_FALSE(store.isPutBack());
+    });
+    fleet::putBackCentre(directory(), copy);
+    EXPECT_EQ(modeOf(file()), 0600U);
+    with([](SqliteCentreStore& store) {
+        EXPECT_TRUE(store.order("a", "one").has_value());
+        EXPECT_FALSE(store.order("a", "two").has_value());
+        EXPECT_TRUE(store.isPutBack());
+        store.noteCompleted();
+    });
+    with([](SqliteCentreStore& store) { EXPECT_FALSE(store.isPutBack()); });
+}
+
+TEST_F(CentreDatabaseFile, IsPutBackAlsoInThePlaceOfADamagedOneOrOfNone) {
+    make();
+    const std::string copy = scratch_.path("copy.db");
+    fleet::backUpCentre(directory(), copy);
+    for (const char* const left : {"", "-wal", "-shm", "-journal"})
+        scratch_.write(std::string("centre/centre.db") + left, "damaged");
+    fleet::putBackCentre(directory(), copy);
+    with([](SqliteCentreStore& store) { EXPECT_TRUE(store.order("a", "one").has_value()); });
+    fs::remove_all(directory());
+    fleet::putBackCentre(directory(), copy);
+    with([](SqliteCentreStore& store) { EXPECT_TRUE(store.order("a", "one").has_value()); });
+}
+
+TEST_F(CentreDatabaseFile, IsNotReplacedByWhatIsNoCopyNorWhileItIsUsed) {
+    make();
+    const std::string copy = scratch_.path("copy.db");
+    fleet::backUpCentre(directory(), copy);
+    scratch_.write("nonsense", "no database");
+    EXPECT_ANY_THROW(fleet::putBackCentre(directory(), scratch_.path("nonsense")));
+    EXPECT_THROW(fleet::putBackCentre(directory(), scratch_.path("nothing")), fleet::StoreError);
+    {
+        const CentreDatabase inUse(directory());
+        EXPECT_THROW(fleet::putBackCentre(directory(), copy), fleet::StoreError);
+    }
+    with([](SqliteCentreStore& store) {
+        EXPECT_TRUE(store.order("a", "one").has_value());
+        EXPECT_FALSE(store.isPutBack());
+    });
+}
+
 }  // namespace

@@ -31,9 +31,8 @@ TEST_P(StoreStatement, NeitherGoesThroughAllOrdersNorSortsThem) {
 INSTANTIATE_TEST_SUITE_P(All, StoreStatement,
                          testing::Values(fleet::kOrderByName, fleet::kOrderByNumber,
                                          fleet::kUnpublished, fleet::kOpen, fleet::kLatest,
-                                         fleet::kNotePublished,
-                                         fleet::kKeepOutcome, fleet::kHold, fleet::kRelease,
-                                         fleet::kReleaseAll, fleet::kComplete));
+                                         fleet::kNotePublished, fleet::kKeepOutcome, fleet::kHold,
+                                         fleet::kRelease, fleet::kReleaseAll, fleet::kComplete));
 
 TEST(StoreStatements, ThoseWithoutAnIndexAreSeenToGoThroughAllOrders) {
     const std::string plan = planOf("SELECT name FROM orders WHERE bytes = x'' ORDER BY task");
