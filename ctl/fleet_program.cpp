@@ -59,6 +59,8 @@ bool isForFleet(const std::vector<std::string>& words) {
 void becomeFleetProgram(char* const* argv) {
     std::error_code error;
     const fs::path here = fs::read_symlink("/proc/self/exe", error).parent_path();
+    // Without it, names would be looked for in the working directory.
+    if (error) throw Failure(kWrongUsage, "cannot tell where zavctl is: " + error.message());
     const fs::path places[] = {here / kFleetProgram,
                                here.parent_path() / "libexec" / "zavmgmt" / kFleetProgram};
     int reason = ENOENT;

@@ -43,7 +43,7 @@ bool wereTaken(const std::vector<ctl::PushedFile>& files) {
 
 }  // namespace
 
-PrepareAnswer DepotSide::place(const std::vector<OrderFile>& files, const Spool& spool) const {
+PrepareAnswer DepotSide::place(const std::vector<OrderFile>& files, Spool& spool) const {
     const ctl::HostAddress host{hostSocket_, hostSocket_ + ".rpc", kTransferTime};
     try {
         std::vector<ctl::PushedFile> pushed = filesOf(files, spool);
@@ -57,6 +57,14 @@ PrepareAnswer DepotSide::place(const std::vector<OrderFile>& files, const Spool&
         for (ctl::PushedFile& file : pushed)
             pusher.push(file);
         pusher.finish();
+        for (std::size_t i = 0; i < pushed.size(); ++i) {
+            // What was read is what the operator has signed, unless it changed on its way.
+            const bool isOther =
+                check.guarded && !pushed[i].converted && pushed[i].sha256 != files[i].sha256;
+            if (!isOther) continue;
+            spool.forget(files[i].sha256);
+            return NotNow{files[i].path + " is not what it was when it was fetched"};
+        }
         if (!wereTaken(pushed)) {
             ctl::explainRefusals(host, pushed);
             return Unacceptable{problemIn(pushed).value_or("the host did not take all files")};

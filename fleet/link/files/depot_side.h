@@ -17,7 +17,8 @@ public:
     /// `hostSocket` is the host's; the one for files has ".rpc" behind its name.
     explicit DepotSide(std::string hostSocket) : hostSocket_(std::move(hostSocket)) {}
 
-    PrepareAnswer place(const std::vector<OrderFile>& files, const Spool& spool) const;
+    /// A file that is no longer what it was when it was fetched is forgotten.
+    PrepareAnswer place(const std::vector<OrderFile>& files, Spool& spool) const;
 
 private:
     const std::string hostSocket_;

@@ -17,7 +17,7 @@ Moment wallNow() {
 FileSide::FileSide(FileSideSettings settings)
     : settings_(std::move(settings)),
       spool_(settings_.spool, wallNow()),
-      source_(settings_.source, isEnding_),
+      source_(settings_.source, [this] { return !isEnding_ && !(isPatient_ && wanted_ > 0); }),
       depot_(settings_.hostSocket) {}
 
 FileSide::~FileSide() {
@@ -26,20 +26,27 @@ FileSide::~FileSide() {
 }
 
 void FileSide::fetchAhead(const Directive& directive) {
+    if (wanted_ > 0 || isAhead_.exchange(true)) return;
     worker_.add([this, directive] {
+        isPatient_ = true;
         try {
+            spool_.sweep(wallNow());
             for (const OrderFile& file : directive.files)
                 source_.fetch(file, spool_);
         } catch (const std::exception& error) {
             say(Priority::Info, "order " + std::to_string(directive.number) +
                                     ": its files do not come yet: " + error.what());
         }
+        isPatient_ = false;
+        isAhead_ = false;
     });
 }
 
 void FileSide::prepare(const Directive& directive, std::function<void(PrepareAnswer)> answer) {
+    ++wanted_;
     worker_.add([this, directive, answer = std::move(answer)] {
         PrepareAnswer told = prepared(directive);
+        --wanted_;
         if (!isEnding_) answer(std::move(told));
     });
 }

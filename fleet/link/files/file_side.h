@@ -31,8 +31,8 @@ public:
     FileSide(const FileSide&) = delete;
     FileSide& operator=(const FileSide&) = delete;
 
-    /// Fetches an order's files, so that they are there when its turn comes. Why they do not come
-    /// is told then.
+    /// Fetches an order's files, so that they are there when its turn comes; one order's at a time,
+    /// and not while another's are wanted. Why they do not come is told then.
     void fetchAhead(const Directive& directive);
     /// Has an order's files in the depot, and then they are no longer in the spool.
     void prepare(const Directive& directive, std::function<void(PrepareAnswer)> answer);
@@ -42,6 +42,9 @@ private:
 
     const FileSideSettings settings_;
     std::atomic<bool> isEnding_{false};
+    std::atomic<bool> isAhead_{false};  ///< files are being fetched ahead, or about to be
+    std::atomic<int> wanted_{0};        ///< orders whose files are wanted now
+    bool isPatient_ = false;            ///< worker's: what is fetched is ahead
     Spool spool_;
     FileSource source_;
     DepotSide depot_;

@@ -30,8 +30,8 @@ std::string wordsOf(const HttpsAnswer& answer) {
 
 }  // namespace
 
-FileSource::FileSource(FileSourceSettings settings, const std::atomic<bool>& isEnding)
-    : settings_(std::move(settings)), isEnding_(isEnding) {}
+FileSource::FileSource(FileSourceSettings settings, std::function<bool()> isWanted)
+    : settings_(std::move(settings)), isWanted_(std::move(isWanted)) {}
 
 void FileSource::fetch(const OrderFile& file, Spool& spool) {
     if (spool.has(file.sha256)) return;
@@ -41,7 +41,10 @@ void FileSource::fetch(const OrderFile& file, Spool& spool) {
         have = 0;
     }
     while (have < file.size) {
-        if (isEnding_) throw NotFetched("the link ends");
+        if (!isWanted_()) throw NotFetched("something else comes first");
+        if (!spool.hasRoomFor(file.size - have)) {
+            throw NotFetched(file.path + " does not fit on this disk, of which a tenth stays free");
+        }
         const HttpsAnswer answer = piece(file.sha256, have);
         if (answer.status != kPiece || answer.body.empty() ||
             answer.body.size() > file.size - have) {

@@ -1,7 +1,7 @@
 /// Fetches the files of orders from the centre.
 #pragma once
 
-#include <atomic>
+#include <functional>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -30,8 +30,8 @@ public:
 /// One thread at a time.
 class FileSource {
 public:
-    /// `isEnding` becomes true when nothing more is to be fetched.
-    FileSource(FileSourceSettings settings, const std::atomic<bool>& isEnding);
+    /// `isWanted` is asked before each piece, whether what is fetched is still wanted.
+    FileSource(FileSourceSettings settings, std::function<bool()> isWanted);
 
     /// Has the file in the spool when it returns. Goes on with what is there of it. Throws
     /// NotFetched, and FileError if it cannot be written.
@@ -43,7 +43,7 @@ private:
     void openSession();
 
     const FileSourceSettings settings_;
-    const std::atomic<bool>& isEnding_;
+    const std::function<bool()> isWanted_;
     std::unique_ptr<HttpsClient> client_;
     std::string session_;
 };

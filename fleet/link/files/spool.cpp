@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/statvfs.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -35,7 +36,7 @@ bool isFile(const std::string& path) {
 
 Spool::Spool(std::string directory, Moment now) : directory_(std::move(directory)) {
     if (::mkdir(directory_.c_str(), 0700) != 0 && errno != EEXIST) failOn(directory_);
-    forgetOld(now);
+    sweep(now);
 }
 
 bool Spool::has(const std::string& sum) const {
@@ -48,15 +49,38 @@ std::uint64_t Spool::partOf(const std::string& sum) const {
     return static_cast<std::uint64_t>(found.st_size);
 }
 
+bool Spool::hasRoomFor(std::uint64_t bytes) const {
+    constexpr double kFreeShare = 0.1;
+    struct statvfs disk {};
+    if (::statvfs(directory_.c_str(), &disk) != 0) return false;
+    const double free = static_cast<double>(disk.f_bavail) * static_cast<double>(disk.f_frsize);
+    const double whole = static_cast<double>(disk.f_blocks) * static_cast<double>(disk.f_frsize);
+    return free - static_cast<double>(bytes) >= kFreeShare * whole;
+}
+
+void Spool::sweep(Moment now) {
+    constexpr Moment kSweepTime = std::chrono::hours(1);
+    if (now - swept_ < kSweepTime) return;
+    swept_ = now;
+    forgetOld(now);
+}
+
 void Spool::append(const std::string& sum, std::string_view piece) {
     const std::string path = partPath(sum);
+    const std::uint64_t before = partOf(sum);
     const Descriptor part(
         ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!part) failOn(path);
     while (!piece.empty()) {
         const ssize_t put = ::write(part.get(), piece.data(), piece.size());
         if (put < 0 && errno == EINTR) continue;
-        if (put < 0) failOn(path);
+        if (put < 0) {
+            const int error = errno;
+            // A disk that is full stays no fuller than it was.
+            if (::ftruncate(part.get(), static_cast<off_t>(before)) != 0) forget(sum);
+            errno = error;
+            failOn(path);
+        }
         piece.remove_prefix(static_cast<std::size_t>(put));
     }
 }
@@ -69,6 +93,8 @@ bool Spool::complete(const std::string& sum) {
         static_cast<void>(::unlink(path.c_str()));
         return false;
     }
+    // What has this name after a power cut has that sum.
+    if (::fsync(part.get()) != 0) failOn(path);
     if (std::rename(path.c_str(), pathOf(sum).c_str()) != 0) failOn(path);
     return true;
 }

@@ -22,17 +22,22 @@ public:
     bool has(const std::string& sum) const;
     /// How much of an incomplete file is there.
     std::uint64_t partOf(const std::string& sum) const;
-    /// Adds a piece at the part's end.
+    /// Whether so much more may be written: the disk has what the link must not forget.
+    bool hasRoomFor(std::uint64_t bytes) const;
+    /// Adds a piece at the part's end, or nothing of it.
     void append(const std::string& sum, std::string_view piece);
     /// The part is complete. False if it has another sum; then it is forgotten.
     bool complete(const std::string& sum);
     void forget(const std::string& sum);
+    /// Forgets what was left for days, at most once an hour.
+    void sweep(Moment now);
 
 private:
     std::string partPath(const std::string& sum) const { return pathOf(sum) + ".part"; }
     void forgetOld(Moment now) const;
 
     const std::string directory_;
+    Moment swept_{};
 };
 
 }  // namespace fleet

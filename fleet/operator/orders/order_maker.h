@@ -1,6 +1,7 @@
 /// Makes orders and signs them: on the operator's machine, and nowhere else.
 #pragma once
 
+#include <chrono>
 #include <nlohmann/json.hpp>
 #include <string>
 #include <vector>
@@ -49,6 +50,9 @@ public:
     /// Whether this operator has made the order, for this roll-out.
     bool isOwn(const Order& order) const;
 
+    /// Whether an order ends so soon that it may be replaced before it has: within 10 minutes.
+    bool isOverSoon(const Order& order) const { return order.expires <= now_ + kSoonOver; }
+
     /// A signed order that does the same as another one, with another identifier and other times.
     /// Throws ctl::Failure for more tries than kMostTries.
     std::string again(const Order& order) const;
@@ -56,6 +60,9 @@ public:
     std::string cancelOf(const Order& order) const;
 
 private:
+    /// Twice what the centre calls soon: clocks differ.
+    static constexpr Moment kSoonOver = std::chrono::minutes(10);
+
     OrderChain chainOf(const std::string& host) const;
     std::string sign(Order order) const;
 

@@ -37,6 +37,13 @@ void checkSigner(const SignedOrder& read, const OperatorIdentity& identity,
     const Certificate other = readCertificate(read.certificate, identity.root, identity.fleet);
     insistOn(other.holder == Certificate::Holder::Operator && isSignedByOperator(read, other.key),
              "no operator of the fleet has signed it");
+    // Under this operator's certificate it would run where the other's did not let it.
+    const Order& order = read.order;
+    insistOn(allows(other, order.kind, memberText(readDocument(order.body), "product")),
+             other.name + " was not allowed to give it");
+    insistOn(other.selector == "*" || other.selector == order.selector,
+             other.name + " was not allowed to give it to those hosts");
+    insistOn(order.issued < other.until, other.name + " was no operator any more");
 }
 
 void checkWork(const Order& order, const json& listed, const json& rollout,
@@ -66,7 +73,10 @@ Order checkedOrder(const json& listed, const json& rollout, const OperatorIdenti
 json openPartOf(const Order& order) {
     json body = readDocument(order.body);
     body.erase("sealed");
-    return body;
+    json files = json::array();
+    for (const OrderFile& file : order.files)
+        files.push_back({file.path, file.sha256});
+    return {{"body", body}, {"files", files}};
 }
 
 }  // namespace
@@ -95,10 +105,13 @@ std::vector<std::string> renewedOrders(const json& toSign, const json& rollout, 
             const json open = openPartOf(order);
             if (common.is_null()) common = open;
             insistOn(open == common, "it is not the same work as the others");
+            // A centre that lists others wants the work done twice.
+            insistOn(renewal != Renewal::Resume || maker.isOverSoon(order),
+                     "it is good for long enough");
             insistOn(hosts.insert(order.host).second, "there is another one for the same host");
             if (orders.empty()) {
                 maker.insistThatAllowed(isAbort ? kCancel : order.kind,
-                                        isAbort ? "" : memberText(open, "product"));
+                                        isAbort ? "" : memberText(open["body"], "product"));
             }
             orders.push_back(isAbort ? maker.cancelOf(order) : maker.again(order));
         } catch (const MessageError& error) {

@@ -142,11 +142,13 @@ ctl::ExitStatus runWork(const Work& work, const ctl::Invocation& invocation, boo
     const Moment lasting = timeOf(given, kExpires);
     OperatorSide side(invocation);
     const std::string id = makeOrderId();
-    const OrderMaker maker(
-        side.identity, id,
-        std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch()),
-        lasting);
-    maker.insistThatAllowed(work.kind, work.product());
+    const auto makerNow = [&] {
+        return OrderMaker(
+            side.identity, id,
+            std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch()),
+            lasting);
+    };
+    makerNow().insistThatAllowed(work.kind, work.product());
     json rollout;
     {
         ctl::InterruptNote note = nothingDone(invocation.format);
@@ -156,7 +158,7 @@ ctl::ExitStatus runWork(const Work& work, const ctl::Invocation& invocation, boo
         }
         if (bringFiles) bringFiles(side.centre);
         noteThatItMayBegin(note, id, invocation.format);
-        rollout = beginRollout(side.centre, choice, work, plan, maker, id);
+        rollout = beginRollout(side.centre, choice, work, plan, makerNow(), id);
     }
     if (invocation.format == ctl::Format::Json && !isAwaited) {
         return ctl::print(ctl::jsonPage(rollout));

@@ -11,6 +11,7 @@
 #include <string>
 #include <utility>
 
+#include "fleet/server/api/files/known_fetches.h"
 #include "fleet/server/api/sessions/batches.h"
 #include "fleet/server/api/sessions/sessions.h"
 #include "fleet/server/depot/file_depot.h"
@@ -43,9 +44,10 @@ public:
 
     const FleetDirectory directory;
     const FleetFacts facts;
-    Sessions sessions;
+    Sessions sessions{now()};
     Batches batches;
     FileDepot files;
+    KnownFetches fetches;
 
     bool isWorking() const { return service_.centre().isWorking(); }
 

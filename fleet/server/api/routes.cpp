@@ -103,7 +103,7 @@ std::vector<ApiRoute> apiRoutes() {
          Access::Read, kWorker, getRolloutFailures, {{200, "those that count first", nullptr}},
          {kRollout, kLimit}},
         {"GET", "/v1/rollouts/{id}/to-sign", "The hosts that need other orders.",
-         Access::Read, kWorker, getToSign, {{200, "with the orders that they have", nullptr}},
+         Access::Act, kWorker, getToSign, {{200, "with the orders that they have", nullptr}},
          {kRollout, {"for", Type::Text, Need::Required, "resume, abort or retry-failed"},
           {"force", Type::Flag, Need::Optional, "1: also those whose end nobody knows"},
           kFrom, kLimit}},

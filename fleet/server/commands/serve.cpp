@@ -1,6 +1,8 @@
 #include <pthread.h>
+#include <sys/resource.h>
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <csignal>
 #include <memory>
 #include <ostream>
@@ -59,9 +61,19 @@ ListenPlace placeOf(const ServeOptions& options, const CentreService& service) {
     return {options.address, static_cast<std::uint16_t>(std::stoi(url.port))};
 }
 
+/// A client takes three; the usual limit of 1,024 would be used up by those of one place.
+void raiseDescriptorLimit() {
+    rlimit limit{};
+    if (::getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+    constexpr rlim_t kWanted = 16'384;
+    limit.rlim_cur = std::min(kWanted, limit.rlim_max);
+    static_cast<void>(::setrlimit(RLIMIT_NOFILE, &limit));
+}
+
 int serve(ServeOptions options, Surroundings& around) {
     nameProgram("zavfleetd");
     options.service.directory = around.directory;
+    raiseDescriptorLimit();
     const sigset_t signals = blockSignals();
     CentreService service(options.service);
     const ApiServer server(service, placeOf(options, service));

@@ -5,8 +5,10 @@
 #include <sys/statvfs.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <filesystem>
 #include <system_error>
 #include <utility>
@@ -38,8 +40,15 @@ std::optional<std::uint64_t> sizeOf(const std::string& path) {
 }
 
 /// Its time of change is when it was used last.
-void noteUse(const std::string& path) {
+void touch(const std::string& path) {
     static_cast<void>(::utimensat(AT_FDCWD, path.c_str(), nullptr, 0));
+}
+
+/// What a file is to take once it is complete: a part says so in its name, "SUM.SIZE.part".
+std::uint64_t declaredSize(const fs::path& path) {
+    const std::string size = path.stem().extension().string();
+    if (path.extension() != ".part" || size.size() < 2) return sizeOf(path).value_or(0);
+    return std::strtoull(size.c_str() + 1, nullptr, 10);
 }
 
 sys::FileDescriptor opened(const std::string& path, int flags) {
@@ -102,6 +111,12 @@ std::optional<DepotFile> FileDepot::find(const std::string& sum, std::uint64_t s
     return DepotFile{size, *have};
 }
 
+bool FileDepot::noteUse(const std::string& sum) const {
+    if (!has(sum)) return false;
+    touch(pathOf(sum));
+    return true;
+}
+
 bool FileDepot::has(const std::string& sum) const {
     return isChecksum(sum) && sizeOf(pathOf(sum)).has_value();
 }
@@ -115,14 +130,20 @@ DepotFile FileDepot::add(const std::string& sum, std::uint64_t size, std::uint64
     const std::optional<DepotFile> known = find(sum, size);
     const std::uint64_t have = known ? known->have : 0;
     if (known && known->isComplete() && has(sum)) {
-        noteUse(pathOf(sum));
+        touch(pathOf(sum));
         return *known;
     }
-    if (!busy.isMine() || from != have) return {size, have};
+    if (!busy.isMine()) return {size, have};
+    if (known && known->isComplete()) {
+        // Somebody was killed before it had its name.
+        complete(sum, size);
+        return *known;
+    }
+    if (from != have) return {size, have};
     if (piece.size() > size - have) {
         throw DepotError(Kind::Wrong, "the file is longer than was said");
     }
-    if (!known) insistOnRoom(size);
+    insistOnRoom(known ? 0 : size, piece.size());
     const DepotFile grown = append(sum, size, from, piece);
     if (grown.isComplete()) complete(sum, size);
     return grown;
@@ -137,7 +158,7 @@ DepotFile FileDepot::append(const std::string& sum, std::uint64_t size, std::uin
     } catch (const DepotError&) {
         // What was written of the piece is of no use, and may be what fills the disk. If it cannot
         // be taken back, it is written over.
-        if (::ftruncate(part.get(), static_cast<off_t>(from)) != 0) noteUse(path);
+        if (::ftruncate(part.get(), static_cast<off_t>(from)) != 0) touch(path);
         throw;
     }
     return {size, from + piece.size()};
@@ -160,7 +181,7 @@ std::optional<std::string> FileDepot::read(const std::string& sum, std::uint64_t
     if (!has(sum)) return std::nullopt;
     const std::string path = pathOf(sum);
     const sys::FileDescriptor file = opened(path, O_RDONLY);
-    noteUse(path);
+    touch(path);
     std::string bytes(most, '\0');
     std::size_t have = 0;
     while (have < most) {
@@ -175,11 +196,13 @@ std::optional<std::string> FileDepot::read(const std::string& sum, std::uint64_t
     return bytes;
 }
 
-void FileDepot::insistOnRoom(std::uint64_t size) const {
-    std::uint64_t all = size;
-    std::error_code error;
-    for (const auto& entry : fs::directory_iterator(directory_, error)) {
-        all += sizeOf(entry.path()).value_or(0);
+/// `more` is what a new file takes in the end, and `now` what is about to be written.
+void FileDepot::insistOnRoom(std::uint64_t more, std::uint64_t now) const {
+    std::uint64_t all = more;
+    if (more > 0) {
+        std::error_code error;
+        for (const auto& entry : fs::directory_iterator(directory_, error))
+            all += declaredSize(entry.path());
     }
     if (all > limits_.allBytes) {
         throw DepotError(Kind::Full,
@@ -190,7 +213,7 @@ void FileDepot::insistOnRoom(std::uint64_t size) const {
     if (::statvfs(directory_.c_str(), &disk) != 0) fail(directory_);
     const double free = static_cast<double>(disk.f_bavail) * static_cast<double>(disk.f_frsize);
     const double whole = static_cast<double>(disk.f_blocks) * static_cast<double>(disk.f_frsize);
-    if (free - static_cast<double>(size) < limits_.freeShare * whole) {
+    if (free - static_cast<double>(std::max(more, now)) < limits_.freeShare * whole) {
         throw DepotError(Kind::Full, "the centre's disk would be too full with this file");
     }
 }

@@ -55,6 +55,8 @@ public:
     /// A file of that sum and size; nothing if not even a part of it is here.
     std::optional<DepotFile> find(const std::string& sum, std::uint64_t size) const;
     bool has(const std::string& sum) const;
+    /// The same, and keeps it from being forgotten for as long as any order lives.
+    bool noteUse(const std::string& sum) const;
     /// Takes a piece of a file that begins there. One that does not begin where the file ends now,
     /// or comes while another is being taken, changes nothing. Returns how far the file is then.
     /// When it is whole and has another sum, it is forgotten and this throws.
@@ -69,7 +71,7 @@ private:
     std::string partOf(const std::string& sum, std::uint64_t size) const {
         return pathOf(sum) + '.' + std::to_string(size) + ".part";
     }
-    void insistOnRoom(std::uint64_t size) const;
+    void insistOnRoom(std::uint64_t more, std::uint64_t now) const;
     void forgetUnused(Moment now);
     DepotFile append(const std::string& sum, std::uint64_t size, std::uint64_t from,
                      std::string_view piece) const;

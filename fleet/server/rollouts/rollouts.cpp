@@ -134,6 +134,17 @@ void Rollouts::pause(const std::string& id, const RolloutOperator& by, Moment no
     });
 }
 
+void Rollouts::pauseThoseOf(const std::vector<std::string>& revoked, Moment now) {
+    for (Rollout& rollout : store_.running()) {
+        if (std::find(revoked.begin(), revoked.end(), rollout.by.key) == revoked.end()) continue;
+        store_.atomically([&] {
+            enterState(rollout, RolloutState::Paused, now, PauseCause::Operator,
+                       "the key of " + rollout.by.name + " was revoked");
+            store_.keep(rollout);
+        });
+    }
+}
+
 void Rollouts::resume(const std::string& id, const RolloutOperator& by,
                       const std::vector<std::string>& orders, Moment now) {
     checkOperator(by);

@@ -49,6 +49,9 @@ public:
     /// Nothing more is released. What was released goes on.
     void pause(const std::string& id, const RolloutOperator& by, Moment now);
 
+    /// Pauses all that were made with one of these keys, which count no longer.
+    void pauseThoseOf(const std::vector<std::string>& revoked, Moment now);
+
     /// Goes on with a roll-out that is paused. `orders` replace those of hosts that still wait, and
     /// must do so for all that have expired: see toSignAnew(). Failures that have paused it are
     /// forgiven; it pauses again after as many others.

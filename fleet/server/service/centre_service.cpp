@@ -84,6 +84,7 @@ Moment CentreService::currentMoment() {
 bool CentreService::attend(CentreParts& parts, Moment now) {
     if (!rollouts_) begin(parts);
     revoked_ = RevokedKeys(trust_.connection()).operators(now);
+    if (!revoked_.empty()) rollouts_->pauseThoseOf(revoked_, now);
     return rollouts_->tick(now);
 }
 

@@ -18,6 +18,8 @@ ApiEndpoint getHostOrders;
 
 namespace {
 
+constexpr std::size_t kMostOutcomeBytes = 64 * 1024;
+
 /// What the operator has signed, within what the centre has.
 void addSigned(json& document, const OrderRecord& record, const FleetFacts& facts) {
     const auto numbered = partsOf(record.bytes);
@@ -42,7 +44,9 @@ json orderDocument(const OrderRecord& record, const FleetFacts& facts) {
     } catch (const MessageError&) {
         // An older centre may have taken what this one would not.
     }
-    if (record.outcome && !record.outcome->task.empty()) {
+    if (record.outcome && record.outcome->task.size() > kMostOutcomeBytes) {
+        document["reason"] = "its outcome is too long to be shown in a list";
+    } else if (record.outcome && !record.outcome->task.empty()) {
         const json task = json::parse(record.outcome->task, nullptr, false);
         document["outcome"] = task.is_discarded() ? json(record.outcome->task) : task;
         if (task.is_object() && task.contains("reason") && task["reason"].is_string()) {

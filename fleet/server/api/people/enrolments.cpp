@@ -2,6 +2,7 @@
 
 #include "fleet/server/api/visit.h"
 #include "fleet/server/keys/trust/host_enrolment.h"
+#include "fleet/server/keys/trust/join_refused.h"
 #include "fleet/server/service/store_register.h"
 
 namespace fleet {
@@ -30,6 +31,11 @@ private:
 
 http::Answer postEnrolment(Visit& visit, const Call& call) {
     ApiServices& services = visit.services;
+    // Anybody may ask. Who has no token costs no more than looking for it.
+    const EnrolmentRequest request = readEnrolment(call.bytes());
+    const bool isInvited = services.withTrust(
+        [&](sqlite::Database& database) { return HostEnrolment(database).knows(request.token); });
+    if (!isInvited) throw JoinRefused();
     // The token is not taken while the host could not be taken up.
     if (!services.isWorking()) throw Unavailable("the centre does not work now; try again soon");
     AskingRegister hosts(services);

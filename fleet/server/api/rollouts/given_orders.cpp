@@ -3,8 +3,37 @@
 #include <nlohmann/json.hpp>
 
 #include "fleet/bus/messages/document.h"
+#include "fleet/bus/messages/order.h"
+#include "fleet/server/rollouts/incoming_orders.h"
 
 namespace fleet {
+namespace {
+
+using Orders = std::shared_ptr<const std::vector<std::string>>;
+
+Orders ordersOf(const Visit& visit, const Call& call) {
+    const nlohmann::json& body = call.body();
+    const bool hasOrders = body.contains("orders");
+    if (!body.contains("batch")) {
+        return std::make_shared<const std::vector<std::string>>(
+            hasOrders ? ordersIn(body.at("orders")) : std::vector<std::string>());
+    }
+    if (hasOrders) throw routes::BadRequest("either \"batch\" or \"orders\"");
+    Orders found = visit.services.batches.find(visit.key, body.at("batch").get<std::string>(),
+                                               ApiServices::now());
+    if (!found) throw NothingThere("there is no such batch; it may have been left for too long");
+    return found;
+}
+
+/// Hosts would wait for files that nobody brings.
+void insistOnFiles(ApiServices& services, const std::string& bytes) {
+    for (const OrderFile& file : readOrder(bytes).order.files) {
+        if (services.files.noteUse(file.sha256)) continue;
+        throw routes::BadRequest("the file " + file.path + " is not at the centre; bring it first");
+    }
+}
+
+}  // namespace
 
 std::vector<std::string> ordersIn(const nlohmann::json& array) {
     std::vector<std::string> orders;
@@ -16,17 +45,34 @@ std::vector<std::string> ordersIn(const nlohmann::json& array) {
     return orders;
 }
 
-std::vector<std::string> givenOrders(const Visit& visit, const Call& call) {
-    const nlohmann::json& body = call.body();
-    const bool hasOrders = body.contains("orders");
-    if (!body.contains("batch")) {
-        return hasOrders ? ordersIn(body.at("orders")) : std::vector<std::string>();
+Orders givenOrders(const Visit& visit, const Call& call) {
+    Orders orders = ordersOf(visit, call);
+    try {
+        readIncomingOrders(*orders, visit.asOperator(), visit.services.facts.fleet,
+                           ApiServices::now());
+        for (const std::string& order : *orders)
+            insistOnFiles(visit.services, order);
+    } catch (...) {
+        // Nobody wants them again.
+        forgetBatch(visit, call);
+        throw;
     }
-    if (hasOrders) throw routes::BadRequest("either \"batch\" or \"orders\"");
-    const auto found = visit.services.batches.find(visit.key, body.at("batch").get<std::string>(),
-                                                   ApiServices::now());
-    if (!found) throw NothingThere("there is no such batch; it may have been left for too long");
-    return *found;
+    return orders;
+}
+
+void forgetBatch(const Visit& visit, const Call& call) {
+    if (!call.body().contains("batch")) return;
+    visit.services.batches.forget(visit.key, call.body().at("batch").get<std::string>());
+}
+
+OneAtATime::OneAtATime(const Visit& visit) : batches_(visit.services.batches), key_(visit.key) {
+    if (!batches_.beginChange(key_)) {
+        throw BatchesFull("another change with your key is under way; try again in a moment");
+    }
+}
+
+OneAtATime::~OneAtATime() {
+    batches_.endChange(key_);
 }
 
 }  // namespace fleet

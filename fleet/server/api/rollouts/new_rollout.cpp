@@ -46,30 +46,19 @@ RolloutPlan planIn(const json& body) {
     return plan;
 }
 
-/// Hosts would wait for files that nobody brings.
-void insistOnFiles(const ApiServices& services, const std::vector<std::string>& orders) {
-    for (const std::string& bytes : orders) {
-        for (const OrderFile& file : readOrder(bytes).order.files) {
-            if (services.files.has(file.sha256)) continue;
-            throw routes::BadRequest("the file " + file.path +
-                                     " is not at the centre; bring it first");
-        }
-    }
-}
-
 }  // namespace
 
 http::Answer postRollout(Visit& visit, const Call& call) {
+    const OneAtATime turn(visit);
     NewRollout wanted;
     wanted.id = textAt(call.body(), "id", "");
     wanted.by = visit.asOperator();
     wanted.plan = planIn(call.body());
-    wanted.orders = givenOrders(visit, call);
-    insistOnFiles(visit.services, wanted.orders);
+    wanted.orders = *givenOrders(visit, call);
     const RolloutView made = visit.services.ask([wanted = std::move(wanted)](CentreDesk& desk) {
         return desk.rollouts.show(desk.rollouts.create(wanted, desk.now), desk.now);
     });
-    visit.services.batches.forget(visit.key);
+    forgetBatch(visit, call);
     return http::jsonReply(201, textOf(rolloutDocument(made)));
 }
 

@@ -5,6 +5,7 @@
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/trust/signed.h"
 #include "fleet/server/api/documents/page.h"
+#include "fleet/server/api/rollouts/own_rollout.h"
 
 using nlohmann::json;
 
@@ -42,6 +43,7 @@ std::string orderBytes(CentreDesk& desk, const std::string& id, const HostToSign
 }  // namespace
 
 http::Answer getToSign(Visit& visit, const Call& call) {
+    insistOnOwn(visit, call.required("id"));
     const std::string purpose = call.required("for");
     if (purpose != "resume" && purpose != "abort" && purpose != "retry-failed") {
         throw routes::BadRequest("\"for\" is not resume, abort or retry-failed");

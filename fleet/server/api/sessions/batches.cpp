@@ -10,11 +10,19 @@ namespace fleet {
 std::string Batches::open(const std::string& operatorKey, Moment now) {
     const std::lock_guard lock(mutex_);
     forgetUnused(now);
-    if (batches_.count(operatorKey) == 0 && batches_.size() >= kMostBatches) {
+    std::size_t own = 0;
+    auto oldest = batches_.end();
+    for (auto batch = batches_.begin(); batch != batches_.end(); ++batch) {
+        if (batch->second.operatorKey != operatorKey) continue;
+        ++own;
+        if (oldest == batches_.end() || batch->second.used < oldest->second.used) oldest = batch;
+    }
+    if (own >= kMostOfOperator) batches_.erase(oldest);
+    if (batches_.size() >= kMostBatches) {
         throw BatchesFull("too many operators hand over orders just now; try again in a minute");
     }
     const std::string id = makeOrderId();
-    batches_[operatorKey] = {id, now, 0, std::make_shared<Orders>()};
+    batches_[id] = {operatorKey, now, 0, std::make_shared<Orders>()};
     return id;
 }
 
@@ -23,13 +31,16 @@ std::optional<std::size_t> Batches::add(const std::string& operatorKey, const st
     const std::lock_guard lock(mutex_);
     Batch* const found = batchOf(operatorKey, batch, now);
     if (found == nullptr) return std::nullopt;
-    std::size_t bytes = found->bytes;
+    std::size_t more = 0;
     for (const std::string& order : orders)
-        bytes += order.size();
-    if (bytes > kMostBytes || found->orders->size() + orders.size() > kMostOrders) {
-        throw BatchesFull("a roll-out to so many hosts is refused");
+        more += order.size();
+    std::size_t all = more;
+    for (const auto& [id, other] : batches_)
+        all += other.bytes;
+    if (all > kMostBytes || found->orders->size() + orders.size() > kMostOrders) {
+        throw BatchesFull("there is no room for so many orders");
     }
-    found->bytes = bytes;
+    found->bytes += more;
     // Somebody may be reading them.
     if (found->orders.use_count() > 1) found->orders = std::make_shared<Orders>(*found->orders);
     found->orders->insert(found->orders->end(), std::make_move_iterator(orders.begin()),
@@ -44,17 +55,28 @@ std::shared_ptr<const Batches::Orders> Batches::find(const std::string& operator
     return found == nullptr ? nullptr : found->orders;
 }
 
-void Batches::forget(const std::string& operatorKey) {
+void Batches::forget(const std::string& operatorKey, const std::string& batch) {
     const std::lock_guard lock(mutex_);
-    batches_.erase(operatorKey);
+    const auto found = batches_.find(batch);
+    if (found != batches_.end() && found->second.operatorKey == operatorKey) batches_.erase(found);
+}
+
+bool Batches::beginChange(const std::string& operatorKey) {
+    const std::lock_guard lock(mutex_);
+    return changing_.insert(operatorKey).second;
+}
+
+void Batches::endChange(const std::string& operatorKey) {
+    const std::lock_guard lock(mutex_);
+    changing_.erase(operatorKey);
 }
 
 /// The caller holds the lock.
 Batches::Batch* Batches::batchOf(const std::string& operatorKey, const std::string& batch,
                                  Moment now) {
     forgetUnused(now);
-    const auto found = batches_.find(operatorKey);
-    if (found == batches_.end() || found->second.id != batch) return nullptr;
+    const auto found = batches_.find(batch);
+    if (found == batches_.end() || found->second.operatorKey != operatorKey) return nullptr;
     found->second.used = now;
     return &found->second;
 }

@@ -8,6 +8,7 @@ namespace fleet {
 
 std::optional<OpenedSession> Sessions::open(const SessionRequest& request, Moment now) {
     if (request.time > now + kClockError || request.time < now - kClockError) return std::nullopt;
+    if (request.time < begun_) return std::nullopt;
     const std::lock_guard lock(mutex_);
     forgetOld(now);
     // As long as its time would let it in again.

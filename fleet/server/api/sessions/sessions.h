@@ -24,6 +24,10 @@ struct OpenedSession {
 class Sessions {
 public:
     static constexpr Moment kLifetime = std::chrono::hours(8);
+    /// `begun` is when this centre began to listen: what was signed before then may have come to it
+    /// before its last end.
+    explicit Sessions(Moment begun = {}) : begun_(begun) {}
+
     /// How far an operator's clock may be off.
     static constexpr Moment kClockError = std::chrono::minutes(5);
     /// Of one key; a further one ends the oldest of them.
@@ -47,6 +51,7 @@ private:
     void forgetOld(Moment now);
     void endOldestOf(const std::string& key);
 
+    const Moment begun_;
     mutable std::mutex mutex_;
     /// By fingerprints of their tokens, so that how long a look takes tells nothing.
     std::map<std::string, Session> sessions_;

@@ -48,6 +48,10 @@ std::string HostEnrolment::invite(const HostInvitation& invitation, Moment now) 
     return token;
 }
 
+bool HostEnrolment::knows(std::string_view token) const {
+    return rowOf(token).has_value();
+}
+
 EnrolmentAnswer HostEnrolment::redeem(std::string_view bytes, const FleetDirectory& directory,
                                       HostRegister& hosts, Moment now) {
     const EnrolmentRequest request = readEnrolment(bytes);

@@ -34,6 +34,9 @@ public:
     /// which is not to be replaced, or if the time is not between a minute and 30 days.
     std::string invite(const HostInvitation& invitation, Moment now);
 
+    /// Whether there ever was an invitation with this token.
+    bool knows(std::string_view token) const;
+
     /// A host comes with its request, in the bytes of signEnrolment(). The token counts for the
     /// first who brings it; that host may repeat the request and gets the same answer, in case one
     /// was lost. The register has the host before it gets an answer. Throws MessageError if the

@@ -98,7 +98,7 @@ protected:
     FileSource source(const KeyPair& key) const {
         return FileSource({"demo", "https://localhost:" + std::to_string(front_.port()),
                            fleet_.directory().authority(), key},
-                          isEnding_);
+                          [this] { return !isEnding_; });
     }
     static OrderFile fileOf(const std::string& content) {
         fleet::Checksum sum;
@@ -175,7 +175,7 @@ TEST_F(FetchedFile, ThatTheCentreRefusesMayComeLater) {
 }
 
 TEST_F(FetchedFile, DoesNotComeToALinkThatEndsOrKnowsNoCentre) {
-    FileSource nowhere({"demo", "", "", signing_}, isEnding_);
+    FileSource nowhere({"demo", "", "", signing_}, [] { return true; });
     EXPECT_THROW(nowhere.fetch(fileOf("one two three"), spool_), NotFetched);
     isEnding_ = true;
     FileSource from = source(signing_);

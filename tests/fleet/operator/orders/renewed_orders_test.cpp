@@ -120,6 +120,30 @@ TEST_F(RenewedOrders, AreThoseOfOtherOperatorsForWhoMayDoEverything) {
               ctl::kHostReportedFailure);
 }
 
+TEST_F(RenewedOrders, AreNoneThatTheirOwnOperatorWasNotAllowedToGive) {
+    const OperatorIdentity admin = root_.certified({"*"}, {"*"});
+    const auto refusal = [&](const OperatorIdentity& by) {
+        return std::string(failureOf([&] {
+                               renewBy(admin, {listed(by, startOf("ux"))}, Renewal::RetryFailed);
+                           }).what());
+    };
+    EXPECT_NE(refusal(root_.certified({"STOP"}, {"ux"})).find("not allowed"), std::string::npos);
+    EXPECT_NE(refusal(root_.certified({"START"}, {"lz"})).find("not allowed"), std::string::npos);
+    EXPECT_NE(refusal(root_.certified({"START"}, {"ux"}, "env=prod")).find("those hosts"),
+              std::string::npos);
+}
+
+TEST_F(RenewedOrders, AreNoneThatMayStillRunIfARollOutGoesOn) {
+    const OrderMaker maker(identity_, "r1", kNow, kHour);
+    const ChosenHost host{newUser().publicKey(), "web", "here"};
+    const std::string bytes = maker.orderFor(host, startOf("ux"), "env=test");
+    const json open = {{"host", host.key},
+                       {"order", fleet::readOrder(bytes).order.id},
+                       {"signed", fleet::base64Of(bytes)}};
+    expectRefused({open}, "good for long enough");
+    EXPECT_EQ(renew({open}, Renewal::RetryFailed).size(), 1U);
+}
+
 TEST_F(RenewedOrders, AreTheRolloutsWorkOnly) {
     expectRefused({listed(identity_, startOf("lz"))}, "another product");
     expectRefused({listed(identity_, {"STOP", {{"product", "ux"}}, ""})}, "another kind");

@@ -33,7 +33,8 @@ protected:
     }
     json listed() const {
         const fleet::ChosenHost host{newUser().publicKey(), "web-1", "here"};
-        const std::string bytes = maker_.orderFor(host, {"START", {{"product", "ux"}}, ""}, "*");
+        const fleet::OrderMaker before(identity_, kId, kNow - kHour, kHour);
+        const std::string bytes = before.orderFor(host, {"START", {{"product", "ux"}}, ""}, "*");
         return {{"host", host.key},
                 {"order", fleet::readOrder(bytes).order.id},
                 {"signed", fleet::base64Of(bytes)}};

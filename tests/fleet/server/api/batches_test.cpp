@@ -26,13 +26,24 @@ TEST(OrderBatches, BelongToWhoHasOpenedThem) {
     EXPECT_NE(batches.find("anna", batch, kNow), nullptr);
 }
 
-TEST(OrderBatches, AreReplacedByTheNextOne) {
+TEST(OrderBatches, OfOneOperatorAreAFewAtATime) {
     Batches batches;
     const std::string first = batches.open("anna", kNow);
-    const std::string second = batches.open("anna", kNow);
-    EXPECT_NE(first, second);
-    EXPECT_EQ(batches.find("anna", first, kNow), nullptr);
-    EXPECT_TRUE(batches.find("anna", second, kNow)->empty());
+    for (std::size_t i = 1; i < Batches::kMostOfOperator; ++i)
+        batches.open("anna", kNow + Moment(1));
+    EXPECT_NE(batches.find("anna", first, kNow), nullptr);
+    const std::string last = batches.open("anna", kNow + Moment(2));
+    EXPECT_EQ(batches.find("anna", first, kNow), nullptr) << "it was used least lately";
+    EXPECT_TRUE(batches.find("anna", last, kNow)->empty());
+}
+
+TEST(OrderBatches, OneChangeOfAnOperatorIsUnderWayAtATime) {
+    Batches batches;
+    EXPECT_TRUE(batches.beginChange("anna"));
+    EXPECT_FALSE(batches.beginChange("anna"));
+    EXPECT_TRUE(batches.beginChange("bert"));
+    batches.endChange("anna");
+    EXPECT_TRUE(batches.beginChange("anna"));
 }
 
 TEST(OrderBatches, AreForgottenWhenNobodyUsesThem) {
@@ -43,7 +54,9 @@ TEST(OrderBatches, AreForgottenWhenNobodyUsesThem) {
     EXPECT_NE(batches.find("anna", batch, later + Batches::kUnusedTime), nullptr);
     EXPECT_EQ(batches.find("anna", batch, later + 2 * Batches::kUnusedTime + Moment(1)), nullptr);
     const std::string another = batches.open("anna", later);
-    batches.forget("anna");
+    batches.forget("bert", another);
+    EXPECT_NE(batches.find("anna", another, later), nullptr);
+    batches.forget("anna", another);
     EXPECT_EQ(batches.find("anna", another, later), nullptr);
 }
 
@@ -73,7 +86,6 @@ TEST(OrderBatches, AreOfSoManyOperatorsAtATime) {
     for (std::size_t i = 0; i < Batches::kMostBatches; ++i)
         batches.open("operator " + std::to_string(i), kNow);
     EXPECT_THROW(batches.open("one more", kNow), BatchesFull);
-    EXPECT_NO_THROW(batches.open("operator 0", kNow));
     EXPECT_NO_THROW(batches.open("one more", kNow + Batches::kUnusedTime + Moment(1)));
 }
 

@@ -376,6 +376,7 @@ TEST_F(CentreInterface, PausesResumesAndAbortsRollOuts) {
         post("/v1/rollouts", ada, {{"orders", {orderFor(host, ada, order)}}}).document["id"];
     const std::string path = "/v1/rollouts/" + id;
     EXPECT_EQ(post(path + "/pause", otto).status, 403U) << "it is somebody else's";
+    EXPECT_EQ(get(path + "/to-sign?for=abort", otto).status, 403U);
     EXPECT_EQ(post(path + "/pause", ada).document["state"], "paused");
     EXPECT_EQ(post(path + "/pause", ada).status, 409U);
     EXPECT_EQ(post(path + "/resume", ada, json::object()).document["state"], "running");

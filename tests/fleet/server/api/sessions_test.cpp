@@ -87,6 +87,12 @@ TEST(SessionList, TakesNoRequestWhoseTimeIsFarOff) {
     EXPECT_FALSE(sessions.open(requestOf("one", kNow - most - Moment(1)), kNow));
 }
 
+TEST(SessionList, TakesNoRequestThatMayHaveComeBeforeARestart) {
+    Sessions sessions(kNow);
+    EXPECT_FALSE(sessions.open(requestOf("one", kNow - Moment(1)), kNow));
+    EXPECT_TRUE(sessions.open(requestOf("one", kNow), kNow));
+}
+
 TEST(SessionList, EndsTheOldestOfAKeyThatHasTooMany) {
     Sessions sessions;
     const auto first = sessions.open(requestOf("one"), kNow);

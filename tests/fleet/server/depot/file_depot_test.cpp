@@ -102,6 +102,27 @@ TEST_F(Depot, GoesOnAfterARestart) {
     EXPECT_TRUE(again.add(sum, 7, 3, " two", kNow).isComplete());
 }
 
+TEST_F(Depot, NamesAFileThatWasCompleteWhenItWasKilled) {
+    const std::string sum = sumOf("one two");
+    std::ofstream(path(sum + ".7.part")) << "one two";
+    EXPECT_FALSE(depot.has(sum));
+    EXPECT_TRUE(depot.add(sum, 7, 0, "", kNow).isComplete());
+    EXPECT_TRUE(depot.has(sum));
+    const std::string other = sumOf("three");
+    std::ofstream(path(other + ".5.part")) << "other";
+    EXPECT_THROW(depot.add(other, 5, 0, "", kNow), DepotError);
+    EXPECT_FALSE(depot.find(other, 5));
+}
+
+TEST_F(Depot, CountsWhatFilesWillTakeAndNotWhatIsThereOfThem) {
+    DepotLimits tight = limits();
+    tight.allBytes = 20;
+    FileDepot small(scratch_.path("small"), tight);
+    small.add(sumOf("a"), 12, 0, "x", kNow);
+    EXPECT_THROW(small.add(sumOf("b"), 12, 0, "x", kNow), DepotError);
+    EXPECT_EQ(small.add(sumOf("a"), 12, 1, "y", kNow).have, 2U) << "it has its room";
+}
+
 TEST_F(Depot, KnowsNoNamesThatAreNoSums) {
     std::ofstream(scratch_.path("secret")) << "secret";
     for (const char* const name : {"../secret", "", "..", "a/b"}) {

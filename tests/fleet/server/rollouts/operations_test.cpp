@@ -61,6 +61,15 @@ TEST_F(RolloutPause, IsForOneThatRuns) {
     expectConflict("aborted, not running", [&] { pause(); });
 }
 
+TEST_F(RolloutPause, ComesWhenTheKeyThatMadeItIsRevoked) {
+    create(2);
+    const std::string key = rollouts_->show(id_, now_).rollout.by.key;
+    rollouts_->pauseThoseOf({"another key"}, now_);
+    EXPECT_EQ(state(), RolloutState::Running);
+    rollouts_->pauseThoseOf({"another key", key}, now_);
+    EXPECT_EQ(state(), RolloutState::Paused);
+}
+
 TEST_F(RolloutPause, ComesWithARestore) {
     const std::string first = create(1);
     pause();
