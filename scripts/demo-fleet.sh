@@ -199,8 +199,8 @@ if [ "$product" = ne ]; then
     curl -s --max-time 5 --retry 20 --retry-delay 1 --retry-connrefused \
         "http://127.0.0.1:$db_port/metrics" | grep -E '^node_(load1|boot_time_seconds) '
     fleet stop ne --on '*'
+    fleet uninstall ne --on '*'
 fi
-fleet uninstall "$product" --on '*'
 run zavctl hosts show db-1
 
 say "End everything"

@@ -84,6 +84,7 @@ public:
     TlsServer(const fleet::ServerCertificate& certificate, Part part)
         : context_(SSL_CTX_new(TLS_server_method()), SSL_CTX_free),
           listener_(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+        ::signal(SIGPIPE, SIG_IGN);  // a client may have gone
         const std::string chain = scratch_.write("chain.pem", certificate.chain);
         const std::string key = scratch_.write("key.pem", std::string(certificate.key.view()));
         if (SSL_CTX_use_certificate_chain_file(context_.get(), chain.c_str()) != 1 ||
