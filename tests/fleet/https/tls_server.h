@@ -7,6 +7,7 @@
 #include <sys/time.h>
 #include <unistd.h>
 
+#include <csignal>
 #include <functional>
 #include <memory>
 #include <stdexcept>
