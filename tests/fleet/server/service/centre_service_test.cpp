@@ -124,6 +124,7 @@ TEST_F(RunningCentre, TakesUpWhatACopyThatWasPutBackDoesNotKnow) {
     };
     ASSERT_TRUE(eventually([&] { return orderNow()->isPublished; }));
     stop();
+    service.reset();  // it has the directory's lock
 
     fleet::putBackCentre(directory().orders(), copies.path("orders.db"));
     start();
