@@ -152,7 +152,8 @@ TEST_F(FleetProgramTest, StartsAnAgentOnAllHostsOfASelector) {
     EXPECT_EQ(result.err.rfind("zavctl: note: your certificate ends in ", 0), 0U) << result.err;
     const auto batches = centre_.bodiesOf("POST /v1/batches/b1/orders");
     ASSERT_EQ(batches.size(), 1U);
-    for (const json& order : json::parse(batches.front())["orders"]) {
+    const json batch = json::parse(batches.front());
+    for (const json& order : batch["orders"]) {
         const std::string bytes = fleet::bytesOfBase64(order.get<std::string>());
         EXPECT_TRUE(isSignedByOperator(fleet::readOrder(bytes), key_));
     }
