@@ -218,8 +218,8 @@ bool CentreProgram::completePutBack() {
     if (settings_.putBack) settings_.putBack(parts, at);
     store_.noteCompleted();
     all.commit();
-    say(Priority::Notice, "the database was put back: " + std::to_string(found.subjects.size()) +
-                              " orders are on the bus, and roll-outs are paused");
+    say(Priority::Notice, "the database was put back; orders on the bus: " +
+                              std::to_string(found.subjects.size()) + "; roll-outs are paused");
     return true;
 }
 
