@@ -1,6 +1,32 @@
 #include "fleet/bus/nats/lease.h"
 
+#include <sodium.h>
+
+#include <array>
+#include <utility>
+
 namespace fleet {
+namespace {
+
+std::string recordOf(const std::string& holder) {
+    std::array<unsigned char, 16> mark{};
+    randombytes_buf(mark.data(), mark.size());
+    std::array<char, 2 * mark.size() + 1> text{};
+    sodium_bin2hex(text.data(), text.size(), mark.data(), mark.size());
+    return holder + '\n' + text.data();
+}
+
+std::string holderOf(const std::string& record) {
+    return record.substr(0, record.find('\n'));
+}
+
+}  // namespace
+
+Lease::Lease(Connection& connection, Settings settings, Now now)
+    : connection_(connection),
+      settings_(std::move(settings)),
+      now_(std::move(now)),
+      record_(recordOf(settings_.holder)) {}
 
 Lease::State Lease::claim() {
     const LastResult last =
@@ -9,14 +35,15 @@ Lease::State Lease::claim() {
     State state;
     state.text = last.text;
     if (last.kind != LastResult::Kind::Found) return state;
+    if (last.bytes == record_) return storeOver(last.sequence);
     if (last.sequence != seen_) {
         seen_ = last.sequence;
         seenSince_ = now_();
     }
     state.kind = State::Kind::Others;
-    state.holder = last.bytes;
+    state.holder = holderOf(last.bytes);
     state.age = std::chrono::duration_cast<Connection::Milliseconds>(now_() - seenSince_);
-    state.text = last.bytes + " has it";
+    state.text = state.holder + " has it";
     return state.age > settings_.term ? storeOver(last.sequence) : state;
 }
 
@@ -29,7 +56,7 @@ Lease::State Lease::renew() {
 
 Lease::State Lease::storeOver(std::uint64_t sequence) {
     const StoreResult stored =
-        storeAfter(connection_, settings_.subject, settings_.holder, sequence, settings_.deadline);
+        storeAfter(connection_, settings_.subject, record_, sequence, settings_.deadline);
     State state;
     state.text = stored.text;
     ours_ = 0;

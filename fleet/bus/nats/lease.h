@@ -16,7 +16,8 @@ namespace fleet {
 ///
 /// How old somebody else's lease is, each measures by its own clock that never goes back, from when
 /// it first saw it: the clocks of two machines need not agree. So whoever comes new waits for a
-/// whole term.
+/// whole term. It knows its own by a mark that no other claim has: one that was stored and whose
+/// acknowledgement was lost stands in nobody's way, least of all in its own.
 class Lease {
 public:
     using Clock = std::chrono::steady_clock;
@@ -30,8 +31,7 @@ public:
         Connection::Milliseconds deadline = std::chrono::seconds(5);  ///< for each request
     };
 
-    explicit Lease(Connection& connection, Settings settings, Now now = &Clock::now)
-        : connection_(connection), settings_(std::move(settings)), now_(std::move(now)) {}
+    explicit Lease(Connection& connection, Settings settings, Now now = &Clock::now);
 
     struct State {
         enum class Kind {
@@ -48,8 +48,7 @@ public:
     /// Claims it if it is free, and says who has it otherwise. Call it again until it is ours.
     State claim();
 
-    /// Renews what is ours. Anything but Ours means: stop, and claim it anew. It may then even be
-    /// ours in the store, if only the acknowledgement was lost; then it has to grow old.
+    /// Renews what is ours. Anything but Ours means: stop, and claim it anew.
     State renew();
 
     /// Gives it up, so that nobody has to wait for a term.
@@ -61,8 +60,9 @@ private:
     Connection& connection_;
     const Settings settings_;
     const Now now_;
-    std::uint64_t ours_ = 0;  ///< the sequence under which it is ours; 0 if it is not
-    std::uint64_t seen_ = 0;  ///< somebody else's, at the last claim
+    const std::string record_;  ///< what is stored: the holder, and the mark in a line of its own
+    std::uint64_t ours_ = 0;    ///< the sequence under which it is ours; 0 if it is not
+    std::uint64_t seen_ = 0;    ///< somebody else's, at the last claim
     Clock::time_point seenSince_{};
 };
 

@@ -31,10 +31,6 @@ constexpr char kHelloSubject[] = "hello.";
 constexpr char kTaskSubjects[] = "task.>";
 constexpr char kLeaseSubject[] = "$KV.CENTRE.lease";
 
-Moment now() {
-    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
-}
-
 /// Host and number in "task.HOST.NUMBER"; nothing if it is no such subject.
 std::optional<std::pair<std::string, Number>> placeOf(const std::string& subject) {
     const std::size_t first = subject.find('.');
@@ -67,15 +63,19 @@ void CentreProgram::end() {
 }
 
 CentreProgram::End CentreProgram::run() {
+    bool hasFailed = false;
     try {
         connect();
-        if (!isEnding_ && claim() && beginWork()) loop();
+        if (!isEnding_ && claim()) {
+            hasFailed = !beginWork();
+            if (!hasFailed) loop();
+        }
     } catch (...) {
         finish();
         throw;
     }
     finish();
-    return end_.value_or(isBusLost_ ? End::LeaseLost : End::Asked);
+    return end_.value_or(isBusLost_ || hasFailed ? End::LeaseLost : End::Asked);
 }
 
 void CentreProgram::finish() {
@@ -140,7 +140,7 @@ bool CentreProgram::claim() {
     std::string last;
     lease_ = std::make_unique<Lease>(*connection_,
                                      Lease::Settings{kCentreStream, kLeaseSubject, settings_.holder,
-                                                     settings_.leaseTerm, kAnswerTime});
+                                                     settings_.leaseTerm, settings_.leaseTerm / 3});
     while (!isEnding_ && !isBusLost_) {
         const auto asked = Steady::now();
         if (ensureStreams()) {
@@ -212,7 +212,7 @@ bool CentreProgram::completePutBack() {
     sqlite::Transaction all(database_.connection());
     for (const std::string& subject : found.subjects)
         checkOnBus(subject);
-    const Moment at = now();
+    const Moment at = wallClock();
     centre_->restored(at);
     CentreParts parts{*centre_, store_, database_.connection(), news_};
     if (settings_.putBack) settings_.putBack(parts, at);
@@ -260,7 +260,7 @@ bool CentreProgram::attend() {
     if (!settings_.attend) return false;
     sqlite::Transaction step(database_.connection());
     CentreParts parts{*centre_, store_, database_.connection(), news_};
-    const bool isMore = settings_.attend(parts, now());
+    const bool isMore = settings_.attend(parts, wallClock());
     step.commit();
     return isMore;
 }
@@ -292,10 +292,10 @@ void CentreProgram::answerHello(const std::string& host, const std::string& repl
     if (!record) return;
     try {
         const Hello hello = readHello(bytes, host, record->signing);
-        std::optional<Reply> answer = centre_->greet(host, hello, now());
+        std::optional<Reply> answer = centre_->greet(host, hello, wallClock());
         if (!answer) return;
         if (settings_.revoked) answer->revoked = settings_.revoked();
-        noteNews(host, hello, now());
+        noteNews(host, hello, wallClock());
         afterCommit_.push_back([this, reply, text = signReply(host, *answer, settings_.key)] {
             if (hasLease()) static_cast<void>(connection_->publish(reply, text));
         });

@@ -1,6 +1,7 @@
 #include "support/fleet/nats_server.h"
 
 #include <signal.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <random>
@@ -94,6 +95,17 @@ void NatsServer::stop() {
 
 void NatsServer::kill() {
     end(SIGKILL);
+}
+
+void NatsServer::pause() {
+    server_->signal(SIGSTOP);
+    // Its threads stop one after the other; the last one tells.
+    siginfo_t stopped{};
+    ::waitid(P_PID, static_cast<id_t>(server_->pid()), &stopped, WSTOPPED | WNOWAIT);
+}
+
+void NatsServer::goOn() {
+    server_->signal(SIGCONT);
 }
 
 void NatsServer::start() {

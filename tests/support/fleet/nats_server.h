@@ -28,6 +28,9 @@ public:
     void stop();
     /// Kills it, and waits.
     void kill();
+    /// Has it stand still, and go on with what came meanwhile.
+    void pause();
+    void goOn();
     /// Starts it again on the same port and files.
     void start();
     /// Has it read another configuration, and waits until it has.

@@ -25,8 +25,8 @@ protected:
         const auto made = ensureStream(*bus_, fleet::centreStream({1 << 20, 1}), kPatience);
         if (!made.status.done()) throw std::runtime_error(made.status.text);
     }
-    Lease lease(const std::string& holder) {
-        return Lease(*bus_, {"KV_CENTRE", "$KV.CENTRE.lease", holder, 30s, kPatience},
+    Lease lease(const std::string& holder, fleet::Connection::Milliseconds deadline = kPatience) {
+        return Lease(*bus_, {"KV_CENTRE", "$KV.CENTRE.lease", holder, 30s, deadline},
                      [this] { return now_; });
     }
 
@@ -113,4 +113,15 @@ TEST_F(LeaseOfCentre, IsNotSaidToBeOursWhenTheBusIsAway) {
     ASSERT_TRUE(eventually([&] { return !bus_->connected(); }));
     EXPECT_EQ(a.renew().kind, Kind::Unknown);
     EXPECT_EQ(lease("b").claim().kind, Kind::Unknown);
+}
+
+TEST_F(LeaseOfCentre, IsClaimedAnewByWhoHeardNoAcknowledgement) {
+    Lease a = lease("a", 500ms);
+    ASSERT_TRUE(eventually([&] { return a.claim().kind == Kind::Ours; }));
+    server_.pause();
+    EXPECT_EQ(a.renew().kind, Kind::Unknown);
+    server_.goOn();
+    // The server stores it now. No term goes by here: it must not wait for itself.
+    EXPECT_TRUE(eventually([&] { return a.claim().kind == Kind::Ours; }));
+    EXPECT_EQ(lease("a").claim().kind, Kind::Others) << "another one of that name is not it";
 }
