@@ -19,8 +19,8 @@ fi
 
 hosts="web-1 web-2 web-3 db-1 db-2"
 
-say() { printf '\n\033[1m== %s\033[0m\n' "$*"; }
-run() { printf '$ %s\n' "$*"; "$@"; }
+# shellcheck source=scripts/demo-tools.sh
+. scripts/demo-tools.sh
 
 # ---- Build ---------------------------------------------------------------------------------------
 
@@ -65,20 +65,12 @@ await() {
     tries=0
     until grep -qs "$1" "$output"; do
         tries=$((tries + 1))
-        if [ "$tries" -gt 300 ] || ! kill -0 "$process" 2>/dev/null; then
+        if [ "$tries" -gt 1200 ] || ! kill -0 "$process" 2>/dev/null; then
             cat "$output"
             exit 1
         fi
         sleep 0.1
     done
-}
-# A port that nothing listens on.
-free_port() {
-    port=$1
-    while grep -qi ":$(printf '%04X' "$port") 00000000:0000 0A" /proc/net/tcp /proc/net/tcp6; do
-        port=$((port + 1))
-    done
-    echo "$port"
 }
 
 # ---- The fleet's keys, its bus and its centre ----------------------------------------------------

@@ -6,8 +6,8 @@
 set -eu
 cd "$(dirname "$0")/.."
 
-say() { printf '\n\033[1m== %s\033[0m\n' "$*"; }
-run() { printf '$ %s\n' "$*"; "$@"; }
+# shellcheck source=scripts/demo-tools.sh
+. scripts/demo-tools.sh
 
 # ---- Build ---------------------------------------------------------------------------------------
 
@@ -105,13 +105,6 @@ make_bundle() {
 fetch_metrics() {
     curl -s --max-time 5 --retry 20 --retry-delay 1 --retry-connrefused "http://127.0.0.1:$1/metrics" |
         grep -E '^node_(load1|memory_MemAvailable_bytes|boot_time_seconds) '
-}
-
-# A port that nothing listens on.
-free_port() {
-    port=$1
-    while grep -qi ":$(printf '%04X' "$port") 00000000:0000 0A" /proc/net/tcp; do port=$((port + 1)); done
-    echo "$port"
 }
 
 say "Deploy a real agent: push its bundle, install it"

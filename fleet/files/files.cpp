@@ -8,8 +8,8 @@
 #include <cstdio>
 #include <system_error>
 
-#include "fleet/files/descriptor.h"
 #include "fleet/files/file_error.h"
+#include "system/file_descriptor.h"
 
 namespace fleet {
 namespace {
@@ -37,7 +37,7 @@ void insistOnSafe(const std::string& path, const struct stat& found, Secrecy sec
     }
 }
 
-std::string readAll(const std::string& path, const Descriptor& file) {
+std::string readAll(const std::string& path, const sys::FileDescriptor& file) {
     std::string content(kLongestFile + 1, '\0');
     std::size_t length = 0;
     while (length < content.size()) {
@@ -52,7 +52,8 @@ std::string readAll(const std::string& path, const Descriptor& file) {
     return content;
 }
 
-void writeAll(const std::string& path, const Descriptor& file, const std::string& content) {
+void writeAll(const std::string& path, const sys::FileDescriptor& file,
+              const std::string& content) {
     std::size_t written = 0;
     while (written < content.size()) {
         const ssize_t took = ::write(file.get(), &content[written], content.size() - written);
@@ -70,7 +71,7 @@ std::string folderOf(const std::string& path) {
 }
 
 void syncFolder(const std::string& folder) {
-    const Descriptor opened(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    const sys::FileDescriptor opened(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (!opened || ::fsync(opened.get()) != 0) fail(folder);
 }
 
@@ -79,7 +80,8 @@ void syncFolder(const std::string& folder) {
 std::string readFile(const std::string& path, Secrecy secrecy) {
     // It is looked at when it is open, so that nobody can put another in its place in between; a
     // pipe's other end is not waited for.
-    const Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+    const sys::FileDescriptor file(
+        ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
     struct stat found {};
     if (!file || ::fstat(file.get(), &found) != 0) fail(path);
     insistOnSafe(path, found, secrecy);
@@ -100,7 +102,7 @@ void replaceFile(const std::string& path, const std::string& content, Secrecy se
     ::unlink(draft.c_str());
     const mode_t mode = secrecy == Secrecy::Secret ? 0600 : 0644;
     try {
-        const Descriptor file(
+        const sys::FileDescriptor file(
             ::open(draft.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, mode));
         if (!file || ::fchmod(file.get(), mode) != 0) fail(draft);
         writeAll(draft, file, content);

@@ -13,8 +13,7 @@
 int main(int argc, char** argv) {
     ::umask(0077);
     try {
-        const auto now = std::chrono::duration_cast<fleet::Moment>(
-            std::chrono::system_clock::now().time_since_epoch());
+        const auto now = fleet::wallClock();
         const int status = fleet::runCommandLine(std::vector<std::string>(argv + 1, argv + argc),
                                                  now, std::cout, std::cerr);
         // A line that invites somebody and could not be written is lost.

@@ -71,20 +71,13 @@ http::Answer answerTo(Services& services, Endpoint& endpoint, Call& call) {
 }  // namespace
 
 Api::Api(Services& services, std::vector<Route> routes)
-    : services_(services),
-      rows_(std::move(routes)),
-      router_(routes::factsOf(rows_), "you may only read from this host") {}
+    : services_(services), table_(std::move(routes), "you may only read from this host") {}
 
 std::variant<http::Answer, http::Job> Api::handle(http::Request request) {
-    std::variant<routes::Match, http::Reply> found = router_.find(request);
-    if (auto* const reply = std::get_if<http::Reply>(&found))
-        return http::Answer(std::move(*reply));
-    const auto call =
-        std::make_shared<Call>(std::get<routes::Match>(std::move(found)), std::move(request));
-    Endpoint& endpoint = *rows_[call->row()].endpoint;
-    if (call->route().runs == Runs::AtOnce) return answerTo(services_, endpoint, *call);
-    return http::Job(
-        [call, &endpoint, &services = services_] { return answerTo(services, endpoint, *call); });
+    return table_.dispatch(std::move(request),
+                           [&services = services_](const Route& route, Call& call) {
+                               return answerTo(services, *route.endpoint, call);
+                           });
 }
 
 void Api::prepareForEnd() {

@@ -5,7 +5,7 @@
 
 #include "host/api/route.h"
 #include "http/handler.h"
-#include "routes/router.h"
+#include "routes/route_table.h"
 
 namespace host {
 
@@ -18,12 +18,11 @@ public:
     void prepareForEnd() override;
     bool quiet() const override;
 
-    const routes::Router& router() const { return router_; }
+    const routes::Router& router() const { return table_.router(); }
 
 private:
     Services& services_;
-    const std::vector<Route> rows_;
-    const routes::Router router_;
+    const routes::RouteTable<Services> table_;
 };
 
 }  // namespace host

@@ -16,6 +16,11 @@ constexpr Number kHighestNumber = (Number{1} << 53) - 1;
 /// A point in time, since the beginning of 1970 in UTC.
 using Moment = std::chrono::milliseconds;
 
+/// This machine's clock. It may be wrong, and somebody may put it back.
+inline Moment wallClock() {
+    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+}
+
 /// How an order ended: the state of the host's task, or kUnknown.
 using EndState = std::string;
 

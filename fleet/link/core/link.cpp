@@ -420,7 +420,15 @@ void Link::take(Number number, Actions& out) {
     keep(out);
 }
 
+/// At most once among actions that are done together, at the first place: what is kept only grows,
+/// and each time costs the disk.
 void Link::keep(Actions& out) {
+    for (Action& action : out) {
+        if (auto* const keep = std::get_if<Keep>(&action)) {
+            keep->kept = kept_;
+            return;
+        }
+    }
     out.push_back(Keep{kept_});
 }
 

@@ -75,9 +75,7 @@ int enrolAndTell(EnrolWords& words, std::istream& in, std::ostream& out) {
     EnrolOptions& options = words.options;
     options.labels = labelsIn(words.labels);
     if (options.invitation == "-") options.invitation = firstLineOf(in);
-    const EnrolledAs enrolled = enrolHost(
-        options,
-        std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch()));
+    const EnrolledAs enrolled = enrolHost(options, wallClock());
     out << "This host is \"" << enrolled.name << "\" of the fleet \"" << enrolled.fleet
         << "\" now (" << enrolled.host << ").\nIts keys are in " << options.directory
         << ", its configuration is " << options.configuration

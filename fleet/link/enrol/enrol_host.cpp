@@ -164,7 +164,7 @@ EnrolledAs enrolHost(const EnrolOptions& options, Moment now) {
         const OwnersRights rights(options.directory);
         return act();
     };
-    const Descriptor lock = asOwner([&] { return lockDirectory(options.directory); });
+    const sys::FileDescriptor lock = asOwner([&] { return lockDirectory(options.directory); });
     LinkFile::insistOnNone(options.directory);
     insistOnRoomForConfiguration(options);
     const Joined joined = asOwner([&] { return join(options, invitation, url, now); });

@@ -6,17 +6,9 @@
 #include "fleet/log/log.h"
 
 namespace fleet {
-namespace {
-
-Moment wallNow() {
-    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
-}
-
-}  // namespace
-
 FileSide::FileSide(FileSideSettings settings)
     : settings_(std::move(settings)),
-      spool_(settings_.spool, wallNow()),
+      spool_(settings_.spool, wallClock()),
       source_(settings_.source, [this] { return !isEnding_ && !(isPatient_ && wanted_ > 0); }),
       depot_(settings_.hostSocket) {}
 
@@ -30,7 +22,7 @@ void FileSide::fetchAhead(const Directive& directive) {
     worker_.add([this, directive] {
         isPatient_ = true;
         try {
-            spool_.sweep(wallNow());
+            spool_.sweep(wallClock());
             for (const OrderFile& file : directive.files)
                 source_.fetch(file, spool_);
         } catch (const std::exception& error) {

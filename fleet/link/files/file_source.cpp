@@ -91,8 +91,7 @@ void FileSource::openSession() {
     request.fleet = settings_.fleet;
     request.key = settings_.signing.publicKey();
     request.url = settings_.url;
-    request.time =
-        std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+    request.time = wallClock();
     request.nonce = makeSessionNonce();
     HttpsRequest post{"POST", "/v1/sessions", signSessionRequest(request, settings_.signing)};
     post.contentType = "application/octet-stream";

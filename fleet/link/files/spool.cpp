@@ -12,8 +12,8 @@
 #include <utility>
 
 #include "fleet/bus/trust/checksum.h"
-#include "fleet/files/descriptor.h"
 #include "fleet/files/file_error.h"
+#include "system/file_descriptor.h"
 
 namespace fs = std::filesystem;
 
@@ -68,7 +68,7 @@ void Spool::sweep(Moment now) {
 void Spool::append(const std::string& sum, std::string_view piece) {
     const std::string path = partPath(sum);
     const std::uint64_t before = partOf(sum);
-    const Descriptor part(
+    const sys::FileDescriptor part(
         ::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!part) failOn(path);
     while (!piece.empty()) {
@@ -87,7 +87,8 @@ void Spool::append(const std::string& sum, std::string_view piece) {
 
 bool Spool::complete(const std::string& sum) {
     const std::string path = partPath(sum);
-    const Descriptor part(::open(path.c_str(), O_RDONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    const sys::FileDescriptor part(
+        ::open(path.c_str(), O_RDONLY | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!part) failOn(path);
     if (checksumOfFile(part.get()) != sum) {
         static_cast<void>(::unlink(path.c_str()));

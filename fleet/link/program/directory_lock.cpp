@@ -10,9 +10,9 @@
 
 namespace fleet {
 
-Descriptor lockDirectory(const std::string& directory) {
+sys::FileDescriptor lockDirectory(const std::string& directory) {
     const std::string path = directory + "/lock";
-    Descriptor lock(::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    sys::FileDescriptor lock(::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
     if (!lock) throw FileError(path + ": " + std::generic_category().message(errno));
     if (::flock(lock.get(), LOCK_EX | LOCK_NB) != 0) {
         throw FileError(directory + " is in use by another zavlink");

@@ -3,12 +3,12 @@
 
 #include <string>
 
-#include "fleet/files/descriptor.h"
+#include "system/file_descriptor.h"
 
 namespace fleet {
 
 /// Two that use one directory would each undo what the other has kept. The lock lasts as long as
 /// the descriptor. Throws FileError, also when another process has it.
-Descriptor lockDirectory(const std::string& directory);
+sys::FileDescriptor lockDirectory(const std::string& directory);
 
 }  // namespace fleet

@@ -59,7 +59,7 @@ struct LinkFile::Content {
 LinkFile::LinkFile(const std::string& directory)
     : LinkFile(fileIn(directory), lockDirectory(directory), read(fileIn(directory))) {}
 
-LinkFile::LinkFile(std::string path, Descriptor lock, Content content)
+LinkFile::LinkFile(std::string path, sys::FileDescriptor lock, Content content)
     : path_(std::move(path)),
       lock_(std::move(lock)),
       bus_(content.bus),

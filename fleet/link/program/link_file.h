@@ -4,8 +4,8 @@
 #include <string>
 
 #include "fleet/bus/accounts/nkey.h"
-#include "fleet/files/descriptor.h"
 #include "fleet/link/core/kept.h"
+#include "system/file_descriptor.h"
 
 namespace fleet {
 
@@ -37,11 +37,11 @@ public:
 
 private:
     struct Content;
-    LinkFile(std::string path, Descriptor lock, Content content);
+    LinkFile(std::string path, sys::FileDescriptor lock, Content content);
     static Content read(const std::string& path);
 
     const std::string path_;
-    const Descriptor lock_;
+    const sys::FileDescriptor lock_;
     const KeyPair bus_;
     const KeyPair signing_;
     const std::string token_;

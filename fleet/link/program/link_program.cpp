@@ -67,8 +67,7 @@ Trust LinkProgram::trust(const LinkConfiguration& configuration) const {
 
 Moment LinkProgram::now() {
     const auto steady = std::chrono::steady_clock::now();
-    const auto wall =
-        std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+    const auto wall = wallClock();
     const auto passed = std::chrono::duration_cast<Moment>(steady - latestAt_);
     latest_ = std::max(wall, latest_ + passed);
     latestAt_ = steady;

@@ -28,10 +28,6 @@ json documentOf(const HttpsAnswer& answer) {
     return std::move(parsed.document);
 }
 
-Moment wallClock() {
-    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
-}
-
 }  // namespace
 
 HttpsCentre::HttpsCentre(const OperatorIdentity& identity, HttpsClient::Deadline deadline)

@@ -13,8 +13,8 @@
 #include "ctl/client/failure.h"
 #include "ctl/client/transfer/pushed_file.h"
 #include "fleet/bus/trust/checksum.h"
-#include "fleet/files/descriptor.h"
 #include "fleet/operator/centre/answers.h"
+#include "system/file_descriptor.h"
 
 using nlohmann::json;
 
@@ -33,8 +33,8 @@ constexpr std::size_t kMostLooks = 1'200;
                        path + ": cannot be read: " + std::generic_category().message(errno));
 }
 
-Descriptor openedFile(const std::string& path) {
-    Descriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+sys::FileDescriptor openedFile(const std::string& path) {
+    sys::FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
     if (!file) failToRead(path);
     return file;
 }
@@ -71,7 +71,7 @@ void bring(Centre& centre, const BroughtFile& one) {
     };
     // An empty piece tells how far the file is there.
     json told = send(0, "");
-    const Descriptor here = openedFile(one.source);
+    const sys::FileDescriptor here = openedFile(one.source);
     std::size_t looks = 0;
     while (!memberFlag(told, "complete")) {
         const std::uint64_t have = memberNumber(told, "have");

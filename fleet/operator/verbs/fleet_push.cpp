@@ -1,6 +1,8 @@
 // push: files for the depots of many hosts.
 
-#include <cstdio>
+#include <nlohmann/json.hpp>
+#include <string>
+#include <vector>
 
 #include "ctl/client/tasks/task_request.h"
 #include "ctl/show/printable.h"
@@ -19,6 +21,7 @@ constexpr ctl::Argument kDestination = ctl::positional(
     "DEST", "Name in the depot; the file's own if not given, and below it if it ends in /");
 constexpr ctl::Argument kArguments[] = {kFile, kDestination, ctl::kNoWait};
 
+/// What makes it a verb for many hosts; run() adds the files.
 ctl::TaskRequest requestOf(const ctl::Values&) {
     ctl::TaskRequest request;
     request.command = kPush;
@@ -47,8 +50,8 @@ constexpr ctl::Verb kFleetPushVerb = {
     "push",
     "Send a file, or a folder file by file, to the depots of many hosts",
     kArguments,
-    {"zavctl --fleet https://centre push --on env=test package.tar",
-     "zavctl --fleet https://centre push --on 'web-*' bundle/ ux/7.1"},
+    {"zavctl --fleet https://centre.example push --on env=test package.tar",
+     "zavctl --fleet https://centre.example push --on 'web-*' bundle/ ux/7.1"},
     run,
     requestOf,
 };

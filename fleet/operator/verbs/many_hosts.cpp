@@ -142,12 +142,7 @@ ctl::ExitStatus runWork(const Work& work, const ctl::Invocation& invocation, boo
     const Moment lasting = timeOf(given, kExpires);
     OperatorSide side(invocation);
     const std::string id = makeOrderId();
-    const auto makerNow = [&] {
-        return OrderMaker(
-            side.identity, id,
-            std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch()),
-            lasting);
-    };
+    const auto makerNow = [&] { return OrderMaker(side.identity, id, wallClock(), lasting); };
     makerNow().insistThatAllowed(work.kind, work.product());
     json rollout;
     {

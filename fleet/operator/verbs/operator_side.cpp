@@ -35,8 +35,7 @@ OperatorIdentity identityAt(const std::string& url) {
 }
 
 void warnOfEnd(const Certificate& grant) {
-    const auto left = grant.until - std::chrono::duration_cast<Moment>(
-                                        std::chrono::system_clock::now().time_since_epoch());
+    const auto left = grant.until - wallClock();
     if (left > kSoonOver) return;
     const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(left);
     ctl::print({{},

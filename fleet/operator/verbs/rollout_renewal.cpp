@@ -90,10 +90,7 @@ RenewalResult abortRollout(Centre& centre, const std::string& id, const Operator
 ctl::ExitStatus runRenewal(const ctl::Invocation& invocation, Renewal renewal, bool isForced) {
     OperatorSide side(invocation);
     const std::string id = rolloutIn(invocation.given);
-    const OrderMaker maker(
-        side.identity, id,
-        std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch()),
-        timeOf(invocation.given, kExpires));
+    const OrderMaker maker(side.identity, id, wallClock(), timeOf(invocation.given, kExpires));
     const RenewalResult result =
         renewRollout(side.centre, id, renewal, isForced, side.identity, maker);
     return ctl::print(showRenewal(result, renewal, invocation.format));

@@ -44,7 +44,7 @@ public:
 
     const FleetDirectory directory;
     const FleetFacts facts;
-    Sessions sessions{now()};
+    Sessions sessions{wallClock()};
     Batches batches;
     FileDepot files;
     KnownFetches fetches;
@@ -94,11 +94,6 @@ public:
     bool label(const std::string& host, const Labels& labels) {
         const std::lock_guard lock(mutex_);
         return members_.label(host, labels);
-    }
-
-    static Moment now() {
-        return std::chrono::duration_cast<Moment>(
-            std::chrono::system_clock::now().time_since_epoch());
     }
 
 private:

@@ -54,9 +54,8 @@ std::string_view tokenIn(std::string_view authorization) {
 std::optional<Visit> visitOf(ApiServices& services, const Call& call) {
     const auto key = sessionKey(services, call);
     if (!key) return std::nullopt;
-    auto grant = services.withTrust([&](sqlite::Database& database) {
-        return Operators(database).grantOf(*key, ApiServices::now());
-    });
+    auto grant = services.withTrust(
+        [&](sqlite::Database& database) { return Operators(database).grantOf(*key, wallClock()); });
     if (!grant) return std::nullopt;
     return Visit{services, *key, std::move(*grant)};
 }
@@ -113,21 +112,17 @@ http::Answer answerTo(ApiServices& services, const ApiRoute& route, Call& call) 
 }  // namespace
 
 std::optional<std::string> sessionKey(ApiServices& services, const Call& call) {
-    return services.sessions.keyOf(tokenIn(call.authorization()), ApiServices::now());
+    return services.sessions.keyOf(tokenIn(call.authorization()), wallClock());
 }
 
 CentreApi::CentreApi(ApiServices& services, std::vector<ApiRoute> routes)
-    : services_(services), rows_(std::move(routes)), router_(routes::factsOf(rows_), "") {}
+    : services_(services), table_(std::move(routes), "") {}
 
 std::variant<http::Answer, http::Job> CentreApi::handle(http::Request request) {
-    std::variant<routes::Match, http::Reply> found = router_.find(request);
-    if (auto* const reply = std::get_if<http::Reply>(&found))
-        return http::Answer(std::move(*reply));
-    const auto call =
-        std::make_shared<Call>(std::get<routes::Match>(std::move(found)), std::move(request));
-    const ApiRoute& route = rows_[call->row()];
-    return http::Job(
-        [call, &route, &services = services_] { return answerTo(services, route, *call); });
+    return table_.dispatch(std::move(request),
+                           [&services = services_](const ApiRoute& route, Call& call) {
+                               return answerTo(services, route, call);
+                           });
 }
 
 }  // namespace fleet

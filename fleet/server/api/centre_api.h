@@ -5,12 +5,12 @@
 
 #include "fleet/server/api/visit.h"
 #include "http/handler.h"
-#include "routes/router.h"
+#include "routes/route_table.h"
 
 namespace fleet {
 
 /// Nothing that comes changes anything unless it is signed, belongs to an invitation, or comes with
-/// a session. Every endpoint runs on a worker thread, because it may wait for the centre's.
+/// a session. Endpoints run on worker threads, because they may wait for the centre's.
 class CentreApi final : public http::Handler {
 public:
     /// The services outlive this object.
@@ -20,12 +20,9 @@ public:
     void prepareForEnd() override {}
     bool quiet() const override { return true; }
 
-    const routes::Router& router() const { return router_; }
-
 private:
     ApiServices& services_;
-    const std::vector<ApiRoute> rows_;
-    const routes::Router router_;
+    const routes::RouteTable<Visit> table_;
 };
 
 }  // namespace fleet

@@ -73,6 +73,7 @@ std::vector<ApiRoute> apiRoutes() {
         {"POST", "/v1/files/{sha256}", "Brings a piece of a file.",
          Access::Act, kWorker, postFile, {{200, "how far the file is now", nullptr}},
          {kSum, kSize, {"from", Type::Number, Need::Required, "where the piece begins"}}},
+        // Its own check: the session is a host's, and those of operators do not count.
         {"GET", "/v1/files/{sha256}/content", "A host fetches what its order needs.",
          Access::None, kWorker, getFileContent, {{206, "a piece of it", nullptr}}, {kSum}},
 

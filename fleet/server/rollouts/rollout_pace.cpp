@@ -84,7 +84,7 @@ void RolloutPace::releasePart(Part part) {
     }
     part.state = PartState::Over;
     part.end = kCancelled;
-    part.reason = "the centre has no such host any more";
+    part.reason = "the host is no longer in the fleet";
     store_.keepPart(part);
 }
 

@@ -3,7 +3,7 @@
 #include <unistd.h>
 
 #include <array>
-#include <chrono>
+#include <optional>
 #include <utility>
 
 #include "fleet/bus/messages/certificate.h"
@@ -76,10 +76,6 @@ CentreProgram::End CentreService::run() {
     return end;
 }
 
-Moment CentreService::currentMoment() {
-    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
-}
-
 /// Between two letters of the centre's.
 bool CentreService::attend(CentreParts& parts, Moment now) {
     if (!rollouts_) begin(parts);
@@ -97,7 +93,9 @@ void CentreService::begin(CentreParts& parts) {
     rollouts_ = std::make_unique<Rollouts>(
         *rolloutStore_, facts_.fleet,
         [this, &centre](const std::string& host, const std::string& order,
-                        const std::string& bytes) {
+                        const std::string& bytes) -> std::optional<Number> {
+            // It will never take an order; nothing shall wait for it.
+            if (RevokedKeys(trust_.connection()).isRevoked(host)) return std::nullopt;
             return centre.submit(host, order, [&](Number number) {
                 return signNumber(host, number, order, bytes, key_.key);
             });

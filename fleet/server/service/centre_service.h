@@ -54,7 +54,7 @@ public:
     auto ask(Act act) -> std::future<decltype(act(std::declval<CentreDesk&>()))> {
         return centre_->ask([this, act = std::move(act)](CentreParts& parts) {
             if (!rollouts_) begin(parts);
-            CentreDesk desk{parts, *rollouts_, *rolloutStore_, currentMoment()};
+            CentreDesk desk{parts, *rollouts_, *rolloutStore_, wallClock()};
             return act(desk);
         });
     }
@@ -64,7 +64,6 @@ private:
     ConnectionOptions busOptions() const;
     bool attend(CentreParts& parts, Moment now);
     void begin(CentreParts& parts);
-    static Moment currentMoment();
 
     const FleetDirectory directory_;
     const FleetFacts facts_;

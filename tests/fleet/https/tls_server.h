@@ -15,9 +15,9 @@
 #include <thread>
 #include <utility>
 
-#include "fleet/files/descriptor.h"
 #include "fleet/server/keys/tls/certificate_authority.h"
 #include "support/scratch_dir.h"
+#include "system/file_descriptor.h"
 
 namespace fleet_test {
 
@@ -72,7 +72,7 @@ private:
                (field < head ? std::stoul(text.substr(field + name.size())) : std::size_t{0});
     }
 
-    fleet::Descriptor socket_;
+    sys::FileDescriptor socket_;
     std::unique_ptr<SSL, decltype(&SSL_free)> session_;
     bool isOpen_ = false;
 };
@@ -130,7 +130,7 @@ private:
 
     const ScratchDir scratch_;
     const std::unique_ptr<SSL_CTX, decltype(&SSL_CTX_free)> context_;
-    const fleet::Descriptor listener_;
+    const sys::FileDescriptor listener_;
     unsigned port_ = 0;
     std::thread thread_;
 };

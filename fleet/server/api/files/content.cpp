@@ -55,13 +55,13 @@ bool names(const OrderRecord& record, const std::string& sum) {
 /// Whether the host has an order that needs the file. No one gets files that were meant for others.
 bool mayFetch(ApiServices& services, const std::string& host, const std::string& sum) {
     const std::string fetching = host + ' ' + sum;
-    if (services.fetches.isKnown(fetching, ApiServices::now())) return true;
+    if (services.fetches.isKnown(fetching, wallClock())) return true;
     const bool may = services.ask([host, sum](CentreDesk& desk) {
         const auto open = desk.parts.store.open(host, 1, kHighestNumber, kMostOpen);
         return std::any_of(open.begin(), open.end(),
                            [&](const OrderRecord& record) { return names(record, sum); });
     });
-    if (may) services.fetches.note(fetching, ApiServices::now());
+    if (may) services.fetches.note(fetching, wallClock());
     return may;
 }
 

@@ -34,7 +34,7 @@ http::Answer postFile(Visit& visit, const Call& call) {
     const std::string& sum = call.required("sha256");
     const auto from = static_cast<std::uint64_t>(call.number("from", 0));
     const DepotFile file =
-        visit.services.files.add(sum, sizeGiven(call), from, call.bytes(), ApiServices::now());
+        visit.services.files.add(sum, sizeGiven(call), from, call.bytes(), wallClock());
     return fileReply(sum, file, visit.services.files.has(sum));
 }
 

@@ -13,7 +13,7 @@ http::Answer getHost(Visit& visit, const Call& call) {
     const auto members = visit.services.members();
     const std::string host = hostNamed(visit, *members, call.required("host"));
     return http::jsonReply(
-        200, textOf(hostDocument(sightsOf(visit, *members, {host}).front(), ApiServices::now())));
+        200, textOf(hostDocument(sightsOf(visit, *members, {host}).front(), wallClock())));
 }
 
 }  // namespace fleet

@@ -45,7 +45,7 @@ http::Answer getHosts(Visit& visit, const Call& call) {
         document["next"] = hosts.back();
     }
     for (const HostSight& sight : sightsOf(visit, *members, hosts))
-        document["hosts"].push_back(hostDocument(sight, ApiServices::now()));
+        document["hosts"].push_back(hostDocument(sight, wallClock()));
     return http::jsonReply(200, textOf(document));
 }
 

@@ -41,7 +41,7 @@ http::Answer postLabels(Visit& visit, const Call& call) {
     visit.services.label(host, labels);
     const auto members = visit.services.members();
     return http::jsonReply(
-        200, textOf(hostDocument(sightsOf(visit, *members, {host}).front(), ApiServices::now())));
+        200, textOf(hostDocument(sightsOf(visit, *members, {host}).front(), wallClock())));
 }
 
 }  // namespace fleet

@@ -35,7 +35,7 @@ http::Answer postRetire(Visit& visit, const Call& call) {
         some = services.ask([host](CentreDesk& desk) { return endOrders(desk, host); });
     }
     services.withTrust([&](sqlite::Database& database) {
-        return RevokedKeys(database).revokeHost(host, ApiServices::now());
+        return RevokedKeys(database).revokeHost(host, wallClock());
     });
     return http::jsonReply(200, textOf({{"host", host}, {"unknown", ended}}));
 }

@@ -43,7 +43,7 @@ http::Answer postEnrolment(Visit& visit, const Call& call) {
     TrustDatabase trust(services.directory.trustDatabase());
     const EnrolmentAnswer answer =
         HostEnrolment(trust.connection())
-            .redeem(call.bytes(), services.directory, hosts, ApiServices::now());
+            .redeem(call.bytes(), services.directory, hosts, wallClock());
     return http::jsonReply(200, enrolmentAnswerText(answer));
 }
 

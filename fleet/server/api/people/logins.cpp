@@ -9,7 +9,7 @@ ApiEndpoint postLogin;
 http::Answer postLogin(Visit& visit, const Call& call) {
     const FleetFacts facts = visit.services.directory.facts();  // keys may have been rotated
     const LoginAnswer answer = visit.services.withTrust([&](sqlite::Database& database) {
-        return Operators(database).login(call.bytes(), facts, ApiServices::now());
+        return Operators(database).login(call.bytes(), facts, wallClock());
     });
     return http::jsonReply(200, loginAnswerText(answer));
 }

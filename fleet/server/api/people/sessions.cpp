@@ -26,7 +26,7 @@ json holderOf(const ApiServices& services, const std::optional<OperatorGrant>& g
 http::Answer postSession(Visit& visit, const Call& call) {
     ApiServices& services = visit.services;
     const SessionRequest request = readSessionRequest(call.bytes());
-    const Moment now = ApiServices::now();
+    const Moment now = wallClock();
     if (request.fleet != services.facts.fleet || request.url != services.facts.url) {
         throw Forbidden("the request is for another centre: this is " + services.facts.url +
                         " of the fleet " + services.facts.fleet);

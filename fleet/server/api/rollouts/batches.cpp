@@ -11,12 +11,12 @@ ApiEndpoint postBatch, postBatchOrders;
 
 http::Answer postBatch(Visit& visit, const Call&) {
     return http::jsonReply(
-        201, textOf({{"batch", visit.services.batches.open(visit.key, ApiServices::now())}}));
+        201, textOf({{"batch", visit.services.batches.open(visit.key, wallClock())}}));
 }
 
 http::Answer postBatchOrders(Visit& visit, const Call& call) {
-    const auto total = visit.services.batches.add(
-        visit.key, call.required("batch"), ordersIn(call.body().at("orders")), ApiServices::now());
+    const auto total = visit.services.batches.add(visit.key, call.required("batch"),
+                                                  ordersIn(call.body().at("orders")), wallClock());
     if (!total) throw NothingThere("there is no such batch; it may have been left for too long");
     return http::jsonReply(200, textOf({{"orders", *total}}));
 }

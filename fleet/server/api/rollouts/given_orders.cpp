@@ -19,8 +19,8 @@ Orders ordersOf(const Visit& visit, const Call& call) {
             hasOrders ? ordersIn(body.at("orders")) : std::vector<std::string>());
     }
     if (hasOrders) throw routes::BadRequest("either \"batch\" or \"orders\"");
-    Orders found = visit.services.batches.find(visit.key, body.at("batch").get<std::string>(),
-                                               ApiServices::now());
+    Orders found =
+        visit.services.batches.find(visit.key, body.at("batch").get<std::string>(), wallClock());
     if (!found) throw NothingThere("there is no such batch; it may have been left for too long");
     return found;
 }
@@ -48,8 +48,7 @@ std::vector<std::string> ordersIn(const nlohmann::json& array) {
 Orders givenOrders(const Visit& visit, const Call& call) {
     Orders orders = ordersOf(visit, call);
     try {
-        readIncomingOrders(*orders, visit.asOperator(), visit.services.facts.fleet,
-                           ApiServices::now());
+        readIncomingOrders(*orders, visit.asOperator(), visit.services.facts.fleet, wallClock());
         for (const std::string& order : *orders)
             insistOnFiles(visit.services, order);
     } catch (...) {

@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "fleet/server/keys/files/keys_error.h"
+#include "system/file_descriptor.h"
 
 namespace fleet {
 namespace {
@@ -21,22 +22,6 @@ constexpr std::size_t kLargestPrivateFile = 4U << 20U;
 KeysError keysErrorOf(const std::string& what) {
     return KeysError(what + ": " + std::generic_category().message(errno));
 }
-
-/// Closed at the end of its scope.
-class Descriptor {
-public:
-    explicit Descriptor(int opened) : opened_(opened) {}
-    ~Descriptor() {
-        if (opened_ >= 0) ::close(opened_);
-    }
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
-    int get() const { return opened_; }
-    bool isOpen() const { return opened_ >= 0; }
-
-private:
-    const int opened_;
-};
 
 void writeAll(int descriptor, std::string_view content, const std::string& file) {
     while (!content.empty()) {
@@ -50,9 +35,9 @@ void writeAll(int descriptor, std::string_view content, const std::string& file)
 
 /// Makes the file, which must not be there yet. What cannot be completed is removed.
 void writeNew(const std::string& file, std::string_view content) {
-    const Descriptor made(
+    const sys::FileDescriptor made(
         ::open(file.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC | O_NOFOLLOW, 0600));
-    if (!made.isOpen()) throw keysErrorOf("cannot make " + file);
+    if (!made) throw keysErrorOf("cannot make " + file);
     try {
         writeAll(made.get(), content, file);
     } catch (const KeysError&) {
@@ -63,8 +48,8 @@ void writeNew(const std::string& file, std::string_view content) {
 
 void syncDirectoryOf(const std::string& file) {
     const std::string parent = std::filesystem::absolute(file).parent_path().string();
-    const Descriptor folder(::open(parent.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    if (!folder.isOpen() || ::fsync(folder.get()) != 0) throw keysErrorOf("cannot sync " + parent);
+    const sys::FileDescriptor folder(::open(parent.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (!folder || ::fsync(folder.get()) != 0) throw keysErrorOf("cannot sync " + parent);
 }
 
 bool isPrivate(const struct stat& found) {
@@ -104,8 +89,9 @@ void writeNewPrivateFile(const std::string& file, std::string_view content) {
 
 void putInPlace(const std::string& complete, const std::string& file) {
     {
-        const Descriptor opened(::open(complete.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
-        if (!opened.isOpen() || ::fsync(opened.get()) != 0) {
+        const sys::FileDescriptor opened(
+            ::open(complete.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW));
+        if (!opened || ::fsync(opened.get()) != 0) {
             throw keysErrorOf("cannot sync " + complete);
         }
     }
@@ -114,8 +100,9 @@ void putInPlace(const std::string& complete, const std::string& file) {
 }
 
 SecretText readPrivateFile(const std::string& file) {
-    const Descriptor opened(::open(file.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
-    if (!opened.isOpen()) throw keysErrorOf("cannot read " + file);
+    const sys::FileDescriptor opened(
+        ::open(file.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    if (!opened) throw keysErrorOf("cannot read " + file);
     struct stat found {};
     if (::fstat(opened.get(), &found) != 0) throw keysErrorOf("cannot read " + file);
     if (!S_ISREG(found.st_mode)) throw KeysError(file + " is no file");

@@ -23,15 +23,11 @@ namespace {
 using fleet::FileSource;
 using fleet::KeyKind;
 using fleet::KeyPair;
-using fleet::Moment;
 using fleet::NotFetched;
 using fleet::OrderFile;
 using fleet::Spool;
+using fleet::wallClock;
 using nlohmann::json;
-
-Moment wallClock() {
-    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
-}
 
 /// Opens sessions for one key, and gives away one content in pieces of three bytes.
 class MadeUpCentre : public http::Handler {

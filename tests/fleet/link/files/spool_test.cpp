@@ -14,12 +14,8 @@
 
 namespace {
 
-using fleet::Moment;
 using fleet::Spool;
-
-Moment wallClock() {
-    return std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
-}
+using fleet::wallClock;
 
 std::string sumOf(const std::string& bytes) {
     fleet::Checksum sum;

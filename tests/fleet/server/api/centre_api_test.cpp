@@ -9,6 +9,7 @@
 #include <memory>
 #include <nlohmann/json.hpp>
 #include <set>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -51,7 +52,9 @@ protected:
         service_ = std::make_unique<fleet::CentreService>(
             fleet::ServiceOptions{fleet_->made().directory().path()});
         running_ = std::async(std::launch::async, [this] { return service_->run(); });
-        eventually([this] { return service_->centre().isWorking(); });
+        if (!eventually([this] { return service_->centre().isWorking(); })) {
+            throw std::runtime_error("the centre does not work");
+        }
         services_ = std::make_unique<fleet::ApiServices>(*service_);
         api_ = std::make_unique<fleet::CentreApi>(*services_, fleet::apiRoutes());
     }
@@ -308,6 +311,25 @@ TEST_F(CentreInterface, LetsAnAdminRetireAHost) {
     EXPECT_TRUE(eventually([&] { return get(path, ada).document["state"] != "running"; }));
     EXPECT_EQ(get(path, ada).document["counts"]["over"], (json{{"unknown", 1}}));
     EXPECT_EQ(ask("POST", "/v1/sessions", "", sessionRequest(signers_.at("web-1"))).status, 403U);
+}
+
+TEST_F(CentreInterface, EndsARollOutWhoseHostsWereRetiredBeforeTheirTurn) {
+    const LoggedIn ada = admin();
+    const std::string one = join("web-1");
+    const std::string other = join("web-2");
+    const std::string id =
+        post("/v1/rollouts", ada,
+             {{"waves", "1,100%"}, {"orders", {orderFor(one, ada), orderFor(other, ada)}}})
+            .document["id"];
+    const std::string path = "/v1/rollouts/" + id;
+    ASSERT_TRUE(eventually([&] { return get(path, ada).document["counts"]["released"] == 1; }));
+    EXPECT_EQ(post("/v1/hosts/web-2/retire", ada).document["unknown"], 0);
+    EXPECT_EQ(post("/v1/hosts/web-1/retire", ada).document["unknown"], 1);
+    // What nobody knows counts as a failure, and the plan allows none.
+    ASSERT_TRUE(eventually([&] { return get(path, ada).document["state"] == "paused"; }));
+    EXPECT_EQ(post(path + "/resume", ada, json::object()).status, 200U);
+    EXPECT_TRUE(eventually([&] { return get(path, ada).document["state"] == "finished"; }));
+    EXPECT_EQ(get(path, ada).document["counts"]["over"], (json{{"cancelled", 1}, {"unknown", 1}}));
 }
 
 TEST_F(CentreInterface, MakesARollOutOfOrders) {

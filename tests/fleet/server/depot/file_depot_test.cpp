@@ -21,8 +21,7 @@ using fleet::FileDepot;
 using fleet::Moment;
 
 /// The files have the system's times.
-const Moment kNow =
-    std::chrono::duration_cast<Moment>(std::chrono::system_clock::now().time_since_epoch());
+const Moment kNow = fleet::wallClock();
 
 std::string sumOf(const std::string& bytes) {
     Checksum sum;
