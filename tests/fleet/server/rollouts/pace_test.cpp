@@ -284,7 +284,7 @@ TEST_F(RolloutPaceTest, AHostThatTheCentreNoLongerHasNeedsNoOrder) {
                                  });
     withoutFirst.tick(now_);
     EXPECT_EQ(hostsThatAre("cancelled"), (Names{"h00"}));
-    EXPECT_EQ(part("h00").reason, "the centre has no such host any more");
+    EXPECT_EQ(part("h00").reason, "the host is no longer in the fleet");
     EXPECT_EQ(hostsThatAre("released"), (Names{"h01"}));
 }
 
