@@ -11,6 +11,8 @@ namespace host {
 namespace {
 
 constexpr std::chrono::milliseconds kHandOverRetry{1000};
+/// Between two looks whether what came by a query is still in the way.
+constexpr std::chrono::milliseconds kTurnPause{100};
 /// Between two looks at what is left of an earlier run.
 constexpr std::chrono::milliseconds kDispatchLook{100};
 
@@ -145,6 +147,10 @@ bool Dispatcher::handOverNext() {
     const std::optional<Task> task =
         recorded_ != 0 ? journal_.byNumber(recorded_) : journal_.nextInLine();
     if (!task) return false;
+    if (tasks_.mustWait(*task)) {
+        letWait();
+        return true;
+    }
     try {
         // With its hand-over it was recorded that it was not too late.
         if (recorded_ == 0 && journal_.isTooLate(*task)) {
@@ -159,6 +165,15 @@ bool Dispatcher::handOverNext() {
     }
     recorded_ = 0;
     return true;
+}
+
+/// In line, where it can be cancelled and expires.
+void Dispatcher::letWait() {
+    if (recorded_ != 0) {
+        journal_.takeBack(recorded_);
+        recorded_ = 0;
+    }
+    pause(kTurnPause);
 }
 
 void Dispatcher::expire(Task task) {

@@ -60,6 +60,7 @@ private:
     void work();
     /// False when nothing waits.
     bool handOverNext();
+    void letWait();
     void handOver(const Task& task);
     void expire(Task task);
     bool pause(std::chrono::milliseconds time);

@@ -110,8 +110,7 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
     try {
         if (!settings_.directory.empty()) takeDirectory();
         try {
-            open();
-            beginRun();
+            begin();
         } catch (const DatabaseError& error) {
             if (!directory_ || !error.damaged()) throw;
             replaceDamaged(error.what());
@@ -139,6 +138,20 @@ void Journal::takeDirectory() {
     } catch (const InUse& inUse) {
         if (!settings_.mayYield) throw;
         warn(std::string(inUse.what()) + "; this one keeps its tasks in memory only");
+    }
+}
+
+/// A full disk keeps nobody from asking how tasks ended: that is what the reserve is for, too.
+void Journal::begin() {
+    try {
+        open();
+        beginRun();
+    } catch (const DatabaseError& error) {
+        if (!directory_ || error.damaged() || !directory_->freeReserve()) throw;
+        reader_.reset();
+        database_.reset();
+        open();
+        beginRun();
     }
 }
 
@@ -191,8 +204,7 @@ void Journal::endCleanly(bool quiet) noexcept {
     try {
         commit([quiet, this](Database& database) {
             if (quiet) takeBackUnfinished(database);
-            database.change("UPDATE tasks SET run = NULL, turn = NULL WHERE number = ?",
-                            handedOver_.load());  // nobody has handed it over
+            forgetHandOver(database, ahead_.load());  // the plug-in never got it
             database.change("UPDATE runs SET clean = 1 WHERE run = ?", recovered_.run);
         });
         writer_->settle();
@@ -231,9 +243,21 @@ void Journal::insistOnReserve() {
 void Journal::enter(Task& task) {
     insistOnReserve();
     std::int64_t number = 0;
-    commit([&task, &number](Database& database) { number = insertTask(database, task); });
+    commit([&task, &number, this](Database& database) { number = enterInto(database, task); });
     task.number = number;
     task.id = identity_ + '-' + std::to_string(number);
+}
+
+/// One that the plug-in gets at once comes before the one whose hand-over has only been recorded:
+/// after a kill it is the older one, which alone can have begun.
+std::int64_t Journal::enterInto(Database& database, const Task& task) const {
+    const std::int64_t number = insertTask(database, task);
+    const std::int64_t ahead = ahead_.load();
+    if (task.run && ahead != 0) {
+        forgetHandOver(database, ahead);
+        noteHandOver(database, ahead, recovered_.run);
+    }
+    return number;
 }
 
 void Journal::enterSoon(Task task) {
@@ -258,6 +282,23 @@ void Journal::handOver(const Task& task) {
         if (isTooLate(task)) throw TooLate("task " + task.id + " was to begin earlier");
         updateTask(database, task);
     });
+}
+
+void Journal::handsOver(std::int64_t number) {
+    ahead_.compare_exchange_strong(number, 0);
+}
+
+void Journal::takeBack(std::int64_t number) {
+    // On the writer's thread, so that nothing is entered between the two.
+    try {
+        commit([number, this](Database& database) {
+            ahead_.store(0);
+            forgetHandOver(database, number);
+        });
+    } catch (const NotKept&) {
+        ahead_.store(number);
+        throw;
+    }
 }
 
 void Journal::saveSoon(Task task) {
@@ -423,6 +464,7 @@ std::int64_t Journal::handOverNext(Database& database) {
     const auto expires = found.maybeInteger(1);
     if (expires && microseconds(latestTime()) > *expires) return 0;
     noteHandOver(database, number, recovered_.run);
+    ahead_.store(number);
     return number;
 }
 

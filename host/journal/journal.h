@@ -58,6 +58,7 @@ public:
     void enterSoon(Task task) override;
     void save(const Task& task) override;
     void handOver(const Task& task) override;
+    void handsOver(std::int64_t number) override;
     void saveOutcome(const std::vector<Task>& tasks, const std::string& row) override;
     void saveSoon(Task task) override;
     void keepRow(const std::string& kept, const std::string& row) override;
@@ -86,6 +87,8 @@ public:
     void handOverWithOutcomes(bool wanted) { handsOver_.store(wanted); }
     /// The number of the task that was so recorded, which is to be handed over now; 0: none.
     std::int64_t takeHandedOver() { return handedOver_.exchange(0); }
+    /// It is not to be handed over now after all and waits in line again. Throws NotKept.
+    void takeBack(std::int64_t number);
     /// The task with this number, as far as it is durable.
     std::optional<Task> byNumber(std::int64_t number);
     /// The time by which tasks expire. It never goes back, not even behind what an earlier run has
@@ -149,6 +152,7 @@ private:
     template <typename Reader>
     auto read(const Reader& reader);
     void takeDirectory();
+    void begin();
     void open();
     void beginRun();
     void replaceDamaged(const std::string& fault);
@@ -159,6 +163,7 @@ private:
     void insistOnReserve();
     Writer::Change updateOf(std::vector<Task> tasks);
     std::int64_t handOverNext(Database& database);
+    std::int64_t enterInto(Database& database, const Task& task) const;
     void tellOfCommit(Database& database);
     void tellOfEvents(Database& database);
     Writer::Change pruning();
@@ -173,6 +178,8 @@ private:
 
     std::atomic<bool> handsOver_{false};
     std::atomic<std::int64_t> handedOver_{0};
+    /// Recorded as handed over, and not with the plug-in yet; 0: none.
+    std::atomic<std::int64_t> ahead_{0};
     std::atomic<WallClock::rep> latest_{0};
 
     std::optional<EventLog> events_;

@@ -125,8 +125,8 @@ bool StateDirectory::takeReserve() const {
     return false;
 }
 
-void StateDirectory::freeReserve() const {
-    ::unlink((path_ + kReserveFile).c_str());
+bool StateDirectory::freeReserve() const {
+    return ::unlink((path_ + kReserveFile).c_str()) == 0;
 }
 
 }  // namespace host

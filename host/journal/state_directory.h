@@ -46,8 +46,8 @@ public:
 
     /// Takes the reserve unless it is there; false when there is no room for it.
     bool takeReserve() const;
-    /// Gives it up.
-    void freeReserve() const;
+    /// Gives it up; false if there is none.
+    bool freeReserve() const;
 
 private:
     const std::string path_;

@@ -226,6 +226,11 @@ void noteHandOver(Database& database, std::int64_t number, std::int64_t run) {
         run, number);
 }
 
+void forgetHandOver(Database& database, std::int64_t number) {
+    database.change("UPDATE tasks SET run = NULL, turn = NULL WHERE number = ? AND ended IS NULL",
+                    number);
+}
+
 void deleteTask(Database& database, std::int64_t number) {
     database.change("DELETE FROM conditions WHERE task = ?", number);
     database.change("DELETE FROM commands WHERE task = ?", number);

@@ -21,6 +21,8 @@ bool updateTask(Database& database, const Task& task);
 
 /// Writes down that this run of the host hands it over; the first time it gets its turn.
 void noteHandOver(Database& database, std::int64_t number, std::int64_t run);
+/// Takes that back, and its turn with it, unless the task is over.
+void forgetHandOver(Database& database, std::int64_t number);
 
 /// Removes every trace of it.
 void deleteTask(Database& database, std::int64_t number);

@@ -68,6 +68,9 @@ public:
     /// This run of the host hands over a task that waited for its turn. Returns when that is
     /// durable. Throws NotKept, StepBack, and TooLate, which the same transaction decides.
     virtual void handOver(const Task& task) = 0;
+    /// The plug-in gets a task now whose hand-over was recorded together with an outcome. Until
+    /// then a task that is entered as one that the plug-in gets at once comes before it.
+    virtual void handsOver(std::int64_t number) = 0;
     /// Changes these tasks, which an outcome has changed, in one transaction; the first one is its
     /// own. `row` is the outcome as the plug-in gave it, for those who listen now: it is not kept.
     /// Returns when that is durable, however long it takes.

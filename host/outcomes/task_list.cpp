@@ -117,6 +117,8 @@ std::uint64_t TaskList::addHandedOver(Task task) {
     if (task.run != keeper_.run()) {
         task.run = keeper_.run();
         keeper_.handOver(task);
+    } else {
+        keeper_.handsOver(task.number);
     }
     return insert(std::move(task));
 }
@@ -452,6 +454,14 @@ bool TaskList::mayChange(const std::string& product) const {
                plugin::changesWhatIsInstalled(entry.task.value(plugin::kCommandColumn)) &&
                ::strcasecmp(other.c_str(), product.c_str()) == 0;
     });
+}
+
+bool TaskList::mustWait(const Task& task) const {
+    if (!guarded_) return false;
+    const bool restarts =
+        plugin::mayRestart(task.value(plugin::kCommandColumn), task.value(plugin::kOptionalColumn));
+    return (restarts && mayRestartHost()) ||
+           mayChange(std::string(task.value(plugin::kProductColumn)));
 }
 
 bool TaskList::restartsHost() const {

@@ -77,6 +77,11 @@ public:
     /// whether it is installed or which instances it has. False for no product.
     bool mayChange(const std::string& product) const;
 
+    /// Whether a task whose turn has come shall not be handed over yet: what the plug-in got by a
+    /// query meanwhile may change what the guards would see, or leaves the result of an install
+    /// that may restart the host where this one's result belongs.
+    bool mustWait(const Task& task) const;
+
     /// Whether an install has begun that may restart the host: it waits for the host's end, or for
     /// its own.
     bool restartsHost() const;

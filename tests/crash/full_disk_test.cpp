@@ -78,4 +78,19 @@ TEST_F(FullDisks, AreSeenByWhoAsks) {
     ASSERT_TRUE(eventually([this] { return isIdle(); }));
 }
 
+/// Nobody has made room when it starts again: what was accepted can be asked for all the same.
+TEST_F(FullDisks, AreStillFullAfterAKill) {
+    EXPECT_EQ(askInTurn("j1"), true);
+    ASSERT_TRUE(eventually([this] { return isIdle(); }));
+    host->program().signal(SIGKILL);
+    EXPECT_EQ(host->program().wait().status, 128 + SIGKILL);
+    disk.fill();
+    host->start();
+    EXPECT_EQ(get("/v1/tasks/j1")["state"], "done");
+    disk.empty();
+    EXPECT_TRUE(eventually([this] { return isReady(); }));
+    EXPECT_EQ(askInTurn("j2"), true);
+    ASSERT_TRUE(eventually([this] { return isIdle(); }));
+}
+
 }  // namespace

@@ -181,14 +181,7 @@ bool CentreProgram::beginWork() {
     bus_ = std::make_unique<NatsCentreBus>(*connection_, [this] { return hasLease(); });
     centre_ = std::make_unique<Centre>(store_, *bus_, settings_.alarm);
     if (store_.isPutBack() && !completePutBack()) return false;
-    Connection::Subscribed made = connection_->subscribe(
-        std::string(kHelloSubject) + '*', [this](const BusMessage& message) { takeHello(message); },
-        kAnswerTime);
-    hellos_ = std::move(made.subscription);
-    if (!hellos_) {
-        say(Priority::Error, "hellos cannot be heard: " + made.status.text);
-        return false;
-    }
+    if (!hearHellos()) return false;
     outcomes_ = std::make_unique<OutcomeFeed>(
         *connection_, [this](const auto& told) { return takeOutcomes(told); });
     renewer_ = std::make_unique<Worker>();
@@ -198,6 +191,20 @@ bool CentreProgram::beginWork() {
     isWorking_ = true;
     say(Priority::Info, "the centre works");
     return true;
+}
+
+/// A bus that is slow, or away for a moment, is asked again as long as the lease lasts.
+bool CentreProgram::hearHellos() {
+    for (;;) {
+        Connection::Subscribed made = connection_->subscribe(
+            std::string(kHelloSubject) + '*',
+            [this](const BusMessage& message) { takeHello(message); }, kAnswerTime);
+        hellos_ = std::move(made.subscription);
+        if (hellos_) return true;
+        say(Priority::Warning, "hellos cannot be heard yet: " + made.status.text);
+        std::this_thread::sleep_for(kPause);
+        if (isEnding_ || isBusLost_ || !hasLease()) return false;
+    }
 }
 
 /// A copy does not know what was given after it was made. What is still on the bus is adopted, all

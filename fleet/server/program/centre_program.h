@@ -113,6 +113,7 @@ private:
     bool claim();
     bool ensureStreams();
     bool beginWork();
+    bool hearHellos();
     bool completePutBack();
     void loop();
     void readLetters(Mailbox::Letter first);

@@ -6,8 +6,11 @@
 
 #include <unistd.h>
 
+#include <atomic>
+#include <chrono>
 #include <csignal>
 #include <future>
+#include <thread>
 
 #include "host/made_up_table.h"
 #include "support/gate.h"
@@ -195,6 +198,75 @@ TEST_F(Dispatching, ALoneTaskTakesThreeCommitsFromItsAcceptanceToItsOutcome) {
     }
     // Now and then what can wait is written by itself.
     EXPECT_LE(journal.transactions() - before, kTasks * 35U / 10U);
+}
+
+/// What the plug-in got by a query: it waits in the plug-in's own queue.
+class BesideAQuery : public Dispatching {
+protected:
+    void ask(const std::string& transid, const std::string& command) {
+        const host::Query query{tables->find("KAGREQT"),
+                                {{"TRANSID", OPER_EQ, transid},
+                                 {"COMMAND", OPER_EQ, command},
+                                 {"PRODUCT", OPER_EQ, "ux"}}};
+        host::TaskList::Request request(*list, query, "somebody");
+        const std::string reply = row(transid);
+        host::Heard heard;
+        heard.answer = 0;
+        EXPECT_TRUE(request.answered({reply, static_cast<unsigned>(reply.size())}, heard));
+    }
+    bool isHandedOver(const Task& task) { return journal.byNumber(task.number)->run.has_value(); }
+    Task enterFor(const std::string& product, const std::string& command = "STOP") {
+        Task task;
+        task.transid = product;
+        task.way = host::TaskWay::Journal;
+        task.conditions = {{"TRANSID", OPER_EQ, product},
+                           {"COMMAND", OPER_EQ, command},
+                           {"PRODUCT", OPER_EQ, product}};
+        journal.enter(task);
+        return task;
+    }
+};
+
+TEST_F(BesideAQuery, ATaskWaitsForWhatMayChangeItsProduct) {
+    ask("q1", "INSTALL");
+    const Task task = enterFor("ux");
+    std::atomic<bool> isInstalled{false};
+    Dispatcher dispatcher(journal, *list, [&](const Task& next) {
+        EXPECT_TRUE(isInstalled) << "the guards looked at it too early";
+        return accept(next);
+    });
+    start(dispatcher);
+    std::this_thread::sleep_for(std::chrono::milliseconds(50));
+    EXPECT_EQ(journal.find(task.id)->state, TaskState::Queued);
+    isInstalled = true;
+    outcomes.publish(row("q1"));
+    EXPECT_TRUE(eventually([&] { return journal.find(task.id)->state == TaskState::Running; }));
+    outcomes.publish(row("ux"));
+    EXPECT_EQ(endOf(task), TaskState::Done);
+}
+
+TEST_F(BesideAQuery, ATaskThatWaitsSoCanBeCancelled) {
+    ask("q1", "INSTALL");
+    const Task task = enterFor("ux");
+    Dispatcher dispatcher(journal, *list, [&](const Task& next) { return accept(next); });
+    start(dispatcher);
+    EXPECT_TRUE(
+        eventually([&] { return journal.cancel(task.number) == host::Journal::Cancel::Ended; }));
+}
+
+TEST_F(BesideAQuery, ATaskDoesNotWaitForOtherProductsOrForWhatChangesNothing) {
+    ask("q1", "START");
+    const Task task = enterFor("ux");
+    Dispatcher dispatcher(journal, *list, [&](const Task& next) { return accept(next); });
+    start(dispatcher);
+    EXPECT_TRUE(eventually([&] { return isHandedOver(task); }));
+    outcomes.publish(row("q1"));
+    outcomes.publish(row("ux"));
+    EXPECT_EQ(endOf(task), TaskState::Done);
+    ask("q2", "INSTALL");
+    const Task other = enterFor("lz");
+    dispatcher.wake();
+    EXPECT_TRUE(eventually([&] { return isHandedOver(other); }));
 }
 
 TEST_F(Dispatching, OneThatIsTooLateIsNotHandedOverWithTheOutcomeBefore) {

@@ -37,6 +37,15 @@ protected:
         journal->save(task);
         return task;
     }
+    /// The transaction of the first one's outcome hands over the second one, on paper.
+    Task recordedAhead() {
+        const Task first = running("t1", TaskWay::Journal);
+        const Task second = entered("t2");
+        journal->handOverWithOutcomes(true);
+        journal->saveOutcome({ended(first)}, "row");
+        EXPECT_EQ(journal->takeHandedOver(), second.number);
+        return *journal->byNumber(second.number);
+    }
 };
 
 TEST_F(Recovery, OnlyTheOldestThatWasHandedOverIsInterrupted) {
@@ -64,6 +73,43 @@ TEST_F(Recovery, WhatOvertookInTheQueueIsTheOldest) {
     open();
     EXPECT_EQ(stateOf("q1"), TaskState::Interrupted);
     EXPECT_EQ(stateOf("t1"), TaskState::Queued);
+}
+
+TEST_F(Recovery, WhatThePluginGotWhileTheNextWasAboutToBeHandedOverIsTheOldest) {
+    open();
+    recordedAhead();
+    entered("q1", TaskWay::Query);
+    open();
+    EXPECT_EQ(stateOf("q1"), TaskState::Interrupted);
+    EXPECT_EQ(stateOf("t2"), TaskState::Queued);
+}
+
+TEST_F(Recovery, WhatThePluginGotAfterTheHandOverIsNot) {
+    open();
+    journal->handsOver(recordedAhead().number);
+    entered("q1", TaskWay::Query);
+    open();
+    EXPECT_EQ(stateOf("t2"), TaskState::Interrupted);
+    EXPECT_EQ(stateOf("q1"), TaskState::Queued);
+}
+
+TEST_F(Recovery, WhatIsTakenBackBeforeItsHandOverWaitsInLine) {
+    open();
+    const Task ahead = recordedAhead();
+    journal->takeBack(ahead.number);
+    EXPECT_EQ(journal->nextInLine()->number, ahead.number);
+    entered("q1", TaskWay::Query);
+    EXPECT_EQ(journal->nextInLine()->number, ahead.number);
+    EXPECT_EQ(journal->cancel(ahead.number), host::Journal::Cancel::Ended);
+}
+
+TEST_F(Recovery, WhatWasOnlyRecordedAsHandedOverWaitsAfterAnOrderlyEnd) {
+    open();
+    recordedAhead();
+    journal->endCleanly(false);
+    open();
+    EXPECT_EQ(journal->recovered().interrupted, "");
+    EXPECT_EQ(stateOf("t2"), TaskState::Queued);
 }
 
 TEST_F(Recovery, WhatWasNeverHandedOverJustWaits) {

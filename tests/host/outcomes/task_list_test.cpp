@@ -581,6 +581,7 @@ public:
     void enter(Task&) override { throw host::NotKept("the disk is full"); }
     void enterSoon(Task) override {}
     void save(const Task&) override { throw host::NotKept("the disk is full"); }
+    void handsOver(std::int64_t) override {}
     void handOver(const Task&) override { throw host::TooLate("it expired"); }
     void saveOutcome(const std::vector<Task>&, const std::string&) override {}
     void saveSoon(Task) override {}
