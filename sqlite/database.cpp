@@ -10,7 +10,8 @@
 namespace sqlite {
 namespace {
 
-constexpr int kBusyMilliseconds = 5000;
+/// On a busy disk another connection's commit may take as long.
+constexpr int kBusyMilliseconds = 20'000;
 
 [[noreturn]] void fail(sqlite3* connection, int code) {
     throw DatabaseError(connection == nullptr ? sqlite3_errstr(code) : sqlite3_errmsg(connection),

@@ -39,10 +39,12 @@ AccountKeeper::~AccountKeeper() {
 void AccountKeeper::work() {
     std::string lastTrouble;
     std::unique_ptr<Connection> connection;
+    // It looks for damage when it is opened, which is too much for each look.
+    std::unique_ptr<TrustDatabase> trust;
     do {
         try {
-            TrustDatabase trust(directory_.trustDatabase());
-            if (RevokedKeys(trust.connection()).count() == told_) continue;
+            if (!trust) trust = std::make_unique<TrustDatabase>(directory_.trustDatabase());
+            if (RevokedKeys(trust->connection()).count() == told_) continue;
             if (!connection) {
                 const BusUser user = directory_.bus().system;
                 ConnectionOptions options = options_;
@@ -55,6 +57,7 @@ void AccountKeeper::work() {
             }
             if (!tell(*connection)) connection.reset();
         } catch (const std::exception& error) {
+            trust.reset();
             if (std::exchange(lastTrouble, error.what()) != error.what()) {
                 say(Priority::Warning,
                     std::string("the bus's accounts cannot be brought up to date: ") +

@@ -29,7 +29,7 @@ protected:
             fleet::ServiceOptions{fleet_->made().directory().path()});
         server_ = std::make_unique<fleet::ApiServer>(*service_, fleet::ListenPlace{"127.0.0.1", 0});
         running_ = std::async(std::launch::async, [this] { return service_->run(); });
-        eventually([this] { return service_->centre().isWorking(); });
+        eventually([this] { return service_->centre().isWorking(); }, made_fleet::kWorksWithin);
     }
     ~ServedCentre() override {
         server_.reset();

@@ -52,7 +52,8 @@ protected:
         service_ = std::make_unique<fleet::CentreService>(
             fleet::ServiceOptions{fleet_->made().directory().path()});
         running_ = std::async(std::launch::async, [this] { return service_->run(); });
-        if (!eventually([this] { return service_->centre().isWorking(); })) {
+        if (!eventually([this] { return service_->centre().isWorking(); },
+                        made_fleet::kWorksWithin)) {
             throw std::runtime_error("the centre does not work");
         }
         services_ = std::make_unique<fleet::ApiServices>(*service_);

@@ -18,6 +18,8 @@
 namespace made_fleet {
 
 constexpr std::chrono::seconds kPatience{60};
+/// A centre asks the bus for several things, each of which may wait for a busy disk.
+constexpr std::chrono::minutes kWorksWithin{4};
 
 inline fleet::Moment today() {
     return std::chrono::duration_cast<fleet::Moment>(

@@ -55,7 +55,8 @@ protected:
     void start() {
         service = std::make_unique<CentreService>(fleet::ServiceOptions{directory().path()});
         running = std::async(std::launch::async, [this] { return service->run(); });
-        ASSERT_TRUE(eventually([this] { return service->centre().isWorking(); }));
+        ASSERT_TRUE(
+            eventually([this] { return service->centre().isWorking(); }, made_fleet::kWorksWithin));
     }
     CentreProgram::End stop() {
         service->end();
