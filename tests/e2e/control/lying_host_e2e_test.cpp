@@ -155,6 +155,13 @@ std::vector<Lie> answersThatAreNone() {
              victim.sendWithoutEnd("1000\r\n" + std::string(4096, ' ') + "\r\n");
          },
          "is larger than 64 MiB"},
+        {"a chunk extension without end",
+         [](const Victim& victim) {
+             victim.hear();
+             victim.send(chunked("1;"));
+             victim.sendWithoutEnd(std::string(65536, 'x'));
+         },
+         "the connection to the host at "},
         {"nested lists", answeringAtLength([] { return std::string(200'000, '['); }),
          "nested deeper than 100 levels"},
         {"nested objects", answeringAtLength([] { return repeated("{\"a\":", 200'000); }),
