@@ -43,7 +43,7 @@ fi
 
 # The files of the product that are named, whose names match the expression.
 product() {
-    grep -E '^(plugin|platform|host|ctl|fleet|http|metrics|secrets|sqlite|system)/' "$scratch/named" | grep -E "$1" || :
+    grep -E '^(plugin|platform|host|ctl|fleet|http|metrics|routes|secrets|sqlite|system|text|tools)/' "$scratch/named" | grep -E "$1" || :
 }
 
 # Clang understands none of GCC's precompiled headers, so the files are listed for a build without any.

@@ -1,4 +1,4 @@
-/// Finds secret values in text: what follows a name such as "password" and "=" or ":".
+/// Finds secret values in text: what follows a name such as "password" and "=", ":", "=>" or ":=".
 ///
 /// Nothing here allocates, takes a lock or touches errno, so that a child may use it between vfork
 /// and exec.
@@ -22,12 +22,18 @@ inline constexpr std::string_view kNames[] = {"password", "passwd", "pwd",
 /// What is known of a text that comes in pieces, at the end of one of them. A name or a value that
 /// is cut there is still recognised in the next piece. All zeros before the first piece.
 struct Carried {
-    char tail[24];       ///< the last bytes before, blanks at their end counted as one
-    std::size_t length;  ///< how many there are
-    bool inValue;        ///< the piece ended before or within a value
-    bool begun;          ///< of which there was at least one byte
-    char quote;          ///< the quotation mark that is open in it, or 0
+    char tail[32];             ///< the last bytes before, blanks at their end counted as one
+    std::size_t length;        ///< how many there are
+    bool inValue;              ///< the piece ended before or within a value
+    bool begun;                ///< of which there was at least one byte
+    char quote;                ///< the quotation mark that is open in it, or 0
+    std::size_t quoteEscapes;  ///< the backslashes before that mark
+    std::size_t escapes;       ///< the backslashes at the end of the piece
 };
+
+/// Backslashes before the quotation mark behind a name: those of four texts, one within the other.
+/// With a name, a mark and a blank they find room in the tail.
+inline constexpr std::size_t kMostEscapes = 15;
 
 inline bool isBlank(char c) {
     return c == ' ' || c == '\t';
@@ -35,6 +41,11 @@ inline bool isBlank(char c) {
 
 inline bool isQuote(char c) {
     return c == '"' || c == '\'';
+}
+
+/// Whether it may stand between a name and its value, behind the first "=" or ":".
+inline bool isSeparator(char c) {
+    return c == '=' || c == ':' || c == '>' || isBlank(c);
 }
 
 inline char lower(char c) {
@@ -69,12 +80,17 @@ private:
     std::size_t left_;
 };
 
-/// Whether one of the names, perhaps in quotation marks, ends before the separator at `end`.
+/// Whether one of the names ends before the separator at `end`, perhaps in quotation marks. They
+/// may have backslashes before them, as in a text within another one.
 inline bool isNamedSecret(const Carried& before, std::string_view text, std::size_t end) {
     Backwards rest(before, text, end);
     while (isBlank(rest.peek()))
         rest.skip();
-    if (isQuote(rest.peek())) rest.skip();
+    if (isQuote(rest.peek())) {
+        rest.skip();
+        for (std::size_t i = 0; i < kMostEscapes && rest.peek() == '\\'; ++i)
+            rest.skip();
+    }
     return std::any_of(std::begin(kNames), std::end(kNames),
                        [&](std::string_view name) { return rest.endsWith(name); });
 }
@@ -105,15 +121,16 @@ private:
         sink_.show(text_.substr(begin, at_ - begin));
         state_.begun = false;
         state_.quote = '\0';
+        state_.escapes = 0;
     }
 
-    /// Blanks before the value are shown. It ends at a blank outside quotation marks, or with its
-    /// line.
+    /// What else separates the value from its name is shown. The value ends at a blank outside
+    /// quotation marks, or with its line.
     void skipValue() {
-        const std::size_t blanks = at_;
-        while (!state_.begun && at_ < text_.size() && isBlank(text_[at_]))
+        const std::size_t separators = at_;
+        while (!state_.begun && at_ < text_.size() && isSeparator(text_[at_]))
             ++at_;
-        sink_.show(text_.substr(blanks, at_ - blanks));
+        sink_.show(text_.substr(separators, at_ - separators));
         const std::size_t begin = at_;
         while (at_ < text_.size() && state_.inValue) {
             state_.inValue = goesOn(text_[at_]);
@@ -127,12 +144,22 @@ private:
     bool goesOn(char c) {
         if (c == '\n' || c == '\r') return false;
         if (state_.quote == '\0' && isBlank(c)) return false;
-        if (state_.quote == c) {
+        if (state_.quote == c && closes()) {
             state_.quote = '\0';
         } else if (state_.quote == '\0' && isQuote(c)) {
             state_.quote = c;
+            state_.quoteEscapes = state_.escapes;
         }
+        state_.escapes = c == '\\' ? state_.escapes + 1 : 0;
         return true;
+    }
+
+    /// Whether a mark like the open one ends what that one began. It does with as many backslashes
+    /// or fewer, which end a text around it. With more it is part of the value, unless they are
+    /// pairs that stand for backslashes.
+    bool closes() const {
+        const std::size_t level = state_.quoteEscapes + 1;
+        return state_.escapes < level || state_.escapes % (2 * level) == level - 1;
     }
 
     /// However many blanks stand behind a name, it must not be lost: one stands for them all.

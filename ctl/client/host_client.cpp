@@ -37,15 +37,16 @@ Response exchange(const std::string& path, const Request& request, Deadline dead
                         [&](auto done) { http::async_write(transport.socket(), request, done); });
     // A host that refuses a request early answers and closes before it has read everything. So
     // there may be an answer although the write failed.
-    boost::beast::flat_buffer buffer;
+    boost::beast::flat_buffer buffer(kBufferBytes);
     http::response_parser<http::string_body> parser;
     parser.body_limit(kMostBytes);
     transport.runInTime(deadline, tick, error, [&](auto done) {
         http::async_read(transport.socket(), buffer, parser, done);
     });
-    // A length that no text can have is found out another way.
-    const bool isTooLarge =
-        error == http::error::body_limit || error == http::error::buffer_overflow;
+    // A length that no text can have is found out another way. Chunks have no such length: with
+    // them it is the buffer that is full.
+    const bool isTooLarge = error == http::error::body_limit ||
+                            (error == http::error::buffer_overflow && !parser.chunked());
     if (isTooLarge) throw senseless("is larger than 64 MiB");
     if (error) throw transport.broken(error);
     return parser.release();

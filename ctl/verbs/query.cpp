@@ -93,9 +93,13 @@ void refuseToAct(const TableQuery& query) {
                   "Add --yes to send the query as it stands.");
 }
 
-/// The status of a reply, and of a table's rows kSuccess.
-ExitStatus statusOf(const TableQuery& query, const json& rows) {
-    if (query.table != kRequestTable) return kSuccess;
+/// The status of a reply. Another table's rows are no success where something failed while they
+/// were collected: some may be missing.
+ExitStatus statusOf(const TableQuery& query, const QueryAnswer& answer) {
+    const json& rows = answer.rows;
+    if (query.table != kRequestTable) {
+        return answer.warnings.empty() ? kSuccess : kHostReportedFailure;
+    }
     const bool isDone = !rows.empty() && std::all_of(rows.begin(), rows.end(), [](const json& row) {
         return returnCodeOf(row) == 0;
     });
@@ -135,7 +139,7 @@ QueryAnswer askQuery(const Invocation& invocation) {
 
 Page showQuery(const TableQuery& query, const QueryAnswer& answer, Format format) {
     const json& rows = answer.rows;
-    Page page{{}, {}, statusOf(query, rows)};
+    Page page{{}, {}, statusOf(query, answer)};
     if (format == Format::Json) {
         page.out = jsonText(answerDocument(answer));
         return page;
@@ -144,6 +148,10 @@ Page showQuery(const TableQuery& query, const QueryAnswer& answer, Format format
     page.out = recordsText(withoutConfigurations(rows)) + (rows.empty() ? "" : "\n") + count + "\n";
     page.err = warningsText(answer.warnings);
     if (page.status == kSuccess) return page;
+    if (query.table != kRequestTable) {
+        page.err += complaint("the rows could not be found out in full");
+        return page;
+    }
     page.err += complaint(rows.empty() ? "the host gave no reply, so it is not known what became "
                                          "of the command"
                                        : "the host refused: " + describeRow(rows.front()));

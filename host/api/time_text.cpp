@@ -1,11 +1,13 @@
 #include "host/api/time_text.h"
 
+#include <algorithm>
 #include <chrono>
-#include <ctime>
+#include <cstdint>
 #include <optional>
 
 #include "host/api/schema.h"
 #include "routes/bad_request.h"
+#include "text/calendar.h"
 
 namespace host {
 
@@ -41,6 +43,15 @@ std::optional<std::chrono::microseconds> fractionOf(const std::string& text) {
     return std::chrono::microseconds{count};
 }
 
+/// The clock counts so finely that it holds only some centuries.
+WallClock::time_point nearestTime(std::chrono::microseconds sinceEpoch) {
+    using Clock = WallClock::duration;
+    constexpr auto least = std::chrono::duration_cast<std::chrono::microseconds>(Clock::min());
+    constexpr auto most = std::chrono::duration_cast<std::chrono::microseconds>(Clock::max());
+    return WallClock::time_point(
+        std::chrono::duration_cast<Clock>(std::clamp(sinceEpoch, least, most)));
+}
+
 }  // namespace
 
 WallClock::time_point timeOf(const std::string& text) {
@@ -51,22 +62,17 @@ WallClock::time_point timeOf(const std::string& text) {
     const auto number = [&text](std::size_t at, std::size_t length) {
         return std::stoi(text.substr(at, length));
     };
-    std::tm parts{};
-    parts.tm_year = number(0, 4) - 1900;
-    parts.tm_mon = number(5, 2) - 1;
-    parts.tm_mday = number(8, 2);
-    parts.tm_hour = number(11, 2);
-    parts.tm_min = number(14, 2);
-    parts.tm_sec = number(17, 2);
-    std::tm same = parts;
-    const std::time_t seconds = ::timegm(&same);
+    const text::Date date{number(0, 4), number(5, 2), number(8, 2)};
+    const int hour = number(11, 2);
+    const int minute = number(14, 2);
+    const int second = number(17, 2);
+    const bool isInYear = date.month >= 1 && date.month <= 12 && date.day >= 1;
+    if (!isInYear || hour > 23 || minute > 59 || second > 59) throw bad;
+    const std::int64_t days = text::daysOf(date);
     // A day that the month does not have becomes one of the next month.
-    if (same.tm_mon != parts.tm_mon || same.tm_mday != parts.tm_mday ||
-        same.tm_hour != parts.tm_hour || same.tm_min != parts.tm_min ||
-        same.tm_sec != parts.tm_sec) {
-        throw bad;
-    }
-    return WallClock::from_time_t(seconds) + *fraction;
+    if (text::dateOf(days).month != date.month) throw bad;
+    return nearestTime(std::chrono::seconds(((days * 24 + hour) * 60 + minute) * 60 + second) +
+                       *fraction);
 }
 
 nlohmann::ordered_json timeSchema(Components&) {

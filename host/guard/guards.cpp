@@ -32,11 +32,11 @@ const std::vector<Guard>& guards() {
 }
 
 std::vector<std::string> refusingGuards() {
-    // The others are not asked about conditions: about columns, the journal, what still runs, and
-    // files of the depot.
-    std::vector<std::string> names = {"columns",     "journal",        "leftovers",
-                                      "old-result",  "restart-turn",   "depot-conversion",
-                                      "depot-names", "depot-transfers"};
+    // The others are not asked about conditions: about columns, the journal, what still runs, the
+    // copy of a file that a task may rewrite, and files of the depot.
+    std::vector<std::string> names = {"columns",     "journal",         "leftovers",
+                                      "old-result",  "restart-turn",    "depot-conversion",
+                                      "depot-names", "depot-transfers", "start-up-parameters"};
     for (const Guard& guard : guards())
         names.emplace_back(guard.name);
     return names;

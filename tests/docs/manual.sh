@@ -19,7 +19,7 @@ complain() {
 # Laid out as they are installed.
 mkdir -p "$scratch/man1" "$scratch/man5" "$scratch/man7" "$scratch/man8"
 cp "$pages"/zavctl/* "$scratch/man1"
-for section in 5 7 8; do cp "$pages"/zavhost/*.$section "$scratch/man$section"; done
+for section in 5 7 8; do cp "$pages"/zavhost/*."$section" "$scratch/man$section"; done
 if [ -n "$zavlink" ]; then
     cp "$pages"/zavlink/*.5 "$scratch/man5"
     cp "$pages"/zavlink/*.8 "$pages"/zavfleetd/*.8 "$scratch/man8"
@@ -104,4 +104,4 @@ page_text "$scratch/man5/zavhost.conf.5" >"$scratch/conf"
 while read -r key; do
     grep -qE "^ +$key = " "$scratch/conf" || complain "zavhost.conf.5 lacks $key"
 done <"$scratch/keys"
-exit $status
+exit "$status"

@@ -24,11 +24,20 @@ bool isIn(char c, std::string_view set) {
     return set.find(c) != std::string_view::npos;
 }
 
-/// Whether the text ends in a secret's name, perhaps in a quotation mark and blanks.
+/// How many of the character stand at the end of the text.
+std::size_t countAtEnd(const std::string& text, char c) {
+    return text.size() - (text.find_last_not_of(c) + 1);
+}
+
+/// Whether the text ends in a secret's name, perhaps in a quotation mark, with backslashes before
+/// that, and blanks.
 bool endsInName(std::string text) {
     while (!text.empty() && isIn(text.back(), " \t"))
         text.pop_back();
-    if (!text.empty() && isIn(text.back(), "\"'")) text.pop_back();
+    if (!text.empty() && isIn(text.back(), "\"'")) {
+        text.pop_back();
+        text.resize(text.size() - std::min<std::size_t>(countAtEnd(text, '\\'), 15));
+    }
     std::transform(text.begin(), text.end(), text.begin(),
                    [](unsigned char c) { return c < 0x80 ? std::tolower(c) : c; });
     for (const std::string name : {"password", "passwd", "pwd", "secret", "token", "key"}) {
@@ -40,13 +49,18 @@ bool endsInName(std::string text) {
 
 /// Where the value ends that begins there: at a blank outside quotation marks, or with its line.
 std::size_t endOfValue(const std::string& text, std::size_t at) {
+    const std::size_t begin = at;
     char open = '\0';
+    std::size_t opened = 0;  // the backslashes before the mark that is open
     for (; at < text.size() && !isIn(text[at], "\r\n"); ++at) {
         if (open == '\0' && isIn(text[at], " \t")) break;
+        const std::size_t escapes = countAtEnd(text.substr(begin, at - begin), '\\');
         if (open == text[at]) {
-            open = '\0';
+            const bool isPairs = escapes > opened && (escapes - opened) % (2 * opened + 2) == 0;
+            if (escapes <= opened || isPairs) open = '\0';
         } else if (open == '\0' && isIn(text[at], "\"'")) {
             open = text[at];
+            opened = escapes;
         }
     }
     return at;
@@ -59,7 +73,7 @@ std::string maskedAtOnce(const std::string& text) {
         const char c = text[at++];
         shown += c;
         if (!isIn(c, "=:") || !endsInName(text.substr(0, at - 1))) continue;
-        for (; at < text.size() && isIn(text[at], " \t"); ++at)
+        for (; at < text.size() && isIn(text[at], " \t=>:"); ++at)
             shown += text[at];
         const std::size_t end = endOfValue(text, at);
         if (end > at) shown += secrets::kMask;

@@ -17,6 +17,50 @@ TEST(Masked, HasNoSecretValues) {
     EXPECT_EQ(masked("nothing = secret"), "nothing = secret");
 }
 
+struct Row {
+    const char* text;
+    const char* shown;
+};
+
+/// Texts whose values are found only by who reads the whole separator and every backslash.
+const Row kRows[] = {
+    {"password => hunter2 b", "password => *** b"},
+    {"password=>hunter2 b", "password=>*** b"},
+    {"password := hunter2 b", "password := *** b"},
+    {"password == hunter2 b", "password == *** b"},
+    {"password : = hunter2 b", "password : = *** b"},
+    {R"('password' => 'a b' c)", R"('password' => *** c)"},
+    {R"({\"password\":\"hunter2\"} b)", R"({\"password\":*** b)"},
+    {R"({\"password\" : \"a b\" } c)", R"({\"password\" : *** } c)"},
+    {R"({\\\"password\\\": \\\"a b\\\" } c)", R"({\\\"password\\\": *** } c)"},
+    {R"("{\"key\": \"a \\\" b\" }" c)", R"("{\"key\": *** }" c)"},
+    {R"("{\"key\": \"a b" c)", R"("{\"key\": *** c)"},
+    {R"(password="a\" b" c)", "password=*** c"},
+    {R"(password="a\\" c)", "password=*** c"},
+    {R"(password="a\\\" b" c)", "password=*** c"},
+    {R"(password='a\' b' c)", "password=*** c"},
+};
+
+TEST(Masked, KnowsEverySeparatorAndBackslash) {
+    for (const Row& row : kRows) {
+        EXPECT_EQ(masked(row.text), row.shown);
+        EXPECT_EQ(masked(row.shown), row.shown);
+    }
+}
+
+TEST(Masker, KnowsEverySeparatorAndBackslashWhereverTheTextIsCut) {
+    for (const Row& row : kRows) {
+        const std::string text = row.text;
+        for (std::size_t piece = 1; piece <= text.size(); ++piece) {
+            Masker masker;
+            std::string shown;
+            for (std::size_t at = 0; at < text.size(); at += piece)
+                shown += masker.feed(text.substr(at, piece));
+            EXPECT_EQ(shown, row.shown) << piece;
+        }
+    }
+}
+
 TEST(Masked, IsTheSameWhenItIsMaskedAgain) {
     const std::string once = masked("pwd=x; \"secret\": \"y\" rest");
     EXPECT_EQ(masked(once), once);

@@ -11,6 +11,11 @@ namespace ctl {
 constexpr std::size_t kMostLevels = 100;
 /// Rows of one answer, counted as the objects and lists in it.
 constexpr std::size_t kMostRows = 1'000'000;
+/// Commas between the members and elements of one answer, all together. Each member takes some
+/// hundred bytes and a search for its place, so those that fit into the bytes of an answer would
+/// take longer than anybody waits. This many are read within a second or two; they are 50,000 rows
+/// of twenty columns.
+constexpr std::size_t kMostCommas = 1'000'000;
 /// Bytes of one answer, or of one event.
 constexpr std::size_t kMostBytes = 64UL * 1024 * 1024;
 

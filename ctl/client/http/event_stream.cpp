@@ -43,7 +43,7 @@ struct EventStream::Connection {
     std::size_t pieceLength() const { return sizeof piece - parser.get().body().size; }
 
     Transport transport;
-    boost::beast::flat_buffer buffer;
+    boost::beast::flat_buffer buffer{kBufferBytes};
     http::response_parser<http::buffer_body> parser;
     char piece[4096] = {};
 };

@@ -6,12 +6,17 @@
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/local/stream_protocol.hpp>
 #include <chrono>
+#include <cstddef>
 #include <string>
 
 #include "ctl/client/deadline.h"
 #include "ctl/client/failure.h"
 
 namespace ctl {
+
+/// Bytes of an answer that are kept until they can be understood: a head, or the line before a
+/// chunk. Without a limit a host could make them a line without end.
+constexpr std::size_t kBufferBytes = 64UL * 1024;
 
 /// A connected socket that runs one operation at a time, each until a deadline.
 class Transport {

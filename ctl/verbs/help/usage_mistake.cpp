@@ -47,6 +47,18 @@ std::string unknownOption(const std::string& word, const Verb* verb, const Vocab
            suggestion(word.substr(0, word.find('=')), known);
 }
 
+/// An option before the command that nobody knows; empty if there is none. What stands behind it
+/// was perhaps meant to be its value and not a command.
+std::string unknownOptionBefore(const std::string& command, const TakenWords& taken) {
+    const auto end =
+        std::find(taken.words.begin(), taken.words.end(), command.substr(0, command.find(' ')));
+    const auto found = std::find_if(taken.words.begin(), end, [&taken](const std::string& word) {
+        return isOption(word) && std::find(taken.leftOver.begin(), taken.leftOver.end(), word) !=
+                                     taken.leftOver.end();
+    });
+    return found == end ? std::string() : *found;
+}
+
 std::string commandMistake(const NamedCommand& named, const TakenWords& taken,
                            const Vocabulary& vocabulary) {
     if (named.group != nullptr && named.name == named.group->name) {
@@ -57,6 +69,8 @@ std::string commandMistake(const NamedCommand& named, const TakenWords& taken,
         const std::string word = firstOf(taken.leftOver, taken.words);
         return isOption(word) ? unknownOption(word, nullptr, vocabulary) : "a command is missing";
     }
+    const std::string option = unknownOptionBefore(named.name, taken);
+    if (!option.empty()) return unknownOption(option, nullptr, vocabulary);
     std::vector<std::string> known;
     for (const Verb* const verb : vocabulary.verbs)
         known.emplace_back(verb->name);

@@ -28,6 +28,8 @@ using WireRequest = wire::request<wire::string_body>;
 using WireAnswer = wire::response_parser<wire::string_body>;
 
 constexpr std::uint32_t kLongestHeader = 16 * 1024;
+/// Of an answer that are kept until they can be understood, such as the line before a chunk.
+constexpr std::size_t kBufferBytes = 64UL * 1024;
 /// A server may close a connection on which nothing happens for longer, just when a request comes.
 constexpr std::chrono::seconds kFresh{2};
 
@@ -155,7 +157,8 @@ private:
 
     HttpsError unusable(const Error& error) const {
         if (isEnd(error)) return failure(Kind::NoAnswer, "broke the connection");
-        if (error == wire::error::body_limit || error == wire::error::header_limit) {
+        if (error == wire::error::body_limit || error == wire::error::header_limit ||
+            error == wire::error::buffer_overflow) {
             return failure(Kind::WrongAnswer, "sends more than it should");
         }
         return failure(Kind::WrongAnswer, "sends what is no answer: " + error.message());
@@ -166,7 +169,7 @@ private:
     asio::io_context context_;
     asio::ssl::context tls_;
     std::optional<TlsStream> stream_;
-    boost::beast::flat_buffer buffer_;
+    boost::beast::flat_buffer buffer_{kBufferBytes};
     std::string authority_;
     std::chrono::steady_clock::time_point used_{};
 };

@@ -1,10 +1,10 @@
 #include "fleet/link/program/host_answers.h"
 
-#include <ctime>
 #include <nlohmann/json.hpp>
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/order.h"
+#include "text/utc_time.h"
 
 using nlohmann::json;
 
@@ -22,13 +22,10 @@ enum HttpStatus : unsigned {
     kNotImplemented = 501,
 };
 
-std::string utcTime(Moment moment) {
-    const std::time_t seconds = std::chrono::duration_cast<std::chrono::seconds>(moment).count();
-    std::tm parts{};
-    char text[32];
-    if (::gmtime_r(&seconds, &parts) == nullptr) return "9999-12-31T23:59:59Z";
-    std::strftime(text, sizeof text, "%Y-%m-%dT%H:%M:%SZ", &parts);
-    return text;
+/// To the second.
+std::string secondOf(Moment moment) {
+    constexpr std::size_t kUpToSeconds = 19;
+    return text::utcTime(moment).substr(0, kUpToSeconds) + "Z";
 }
 
 /// An order that was refused before it could be read has no request.
@@ -72,7 +69,7 @@ std::string wordsOf(const HostAnswer& answer) {
 
 std::string bodyOf(const HandOver& action) {
     json body = requestOf(action.directive);
-    body["expires"] = utcTime(action.directive.expires);
+    body["expires"] = secondOf(action.directive.expires);
     return taskOf(std::move(body), action.directive, action.journal);
 }
 

@@ -36,6 +36,17 @@ TEST(Query, ThatActsEndsAsItsReplySays) {
     EXPECT_EQ(ctl::showQuery(request({}), {}, Format::Text).status, ctl::kHostReportedFailure);
 }
 
+TEST(Query, WhoseRowsMayNotBeAllIsNoSuccess) {
+    const json warnings = {{{"text", "the inventory could not be taken"}}};
+    const ctl::QueryAnswer answer = {json::array(), warnings, json::array()};
+    const ctl::Page page = ctl::showQuery(kInventory, answer, Format::Text);
+    EXPECT_EQ(page.status, ctl::kHostReportedFailure);
+    EXPECT_EQ(page.err,
+              "zavctl: warning: the inventory could not be taken\n"
+              "zavctl: the rows could not be found out in full\n");
+    EXPECT_EQ(ctl::showQuery(kInventory, answer, Format::Json).status, ctl::kHostReportedFailure);
+}
+
 TEST(Query, ThatActsHasAVerbInItsPlace) {
     const std::pair<std::vector<ctl::Condition>, const char*> cases[] = {
         {{{"COMMAND", "=", "STOP"}, {"PRODUCT", "=", "ux"}}, "zavctl stop ux"},

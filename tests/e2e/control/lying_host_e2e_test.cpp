@@ -155,6 +155,13 @@ std::vector<Lie> answersThatAreNone() {
              victim.sendWithoutEnd("1000\r\n" + std::string(4096, ' ') + "\r\n");
          },
          "is larger than 64 MiB"},
+        {"a chunk extension without end",
+         [](const Victim& victim) {
+             victim.hear();
+             victim.send(chunked("1;"));
+             victim.sendWithoutEnd(std::string(65536, 'x'));
+         },
+         "the connection to the host at "},
         {"nested lists", answeringAtLength([] { return std::string(200'000, '['); }),
          "nested deeper than 100 levels"},
         {"nested objects", answeringAtLength([] { return repeated("{\"a\":", 200'000); }),
@@ -162,6 +169,9 @@ std::vector<Lie> answersThatAreNone() {
         {"more rows than anybody has",
          answeringAtLength([] { return "{\"rows\": [" + repeated("{},", 1'000'200) + "{}]}"; }),
          "has more than 1,000,000 rows"},
+        {"more members than anybody has",
+         answeringAtLength([] { return "{" + repeated("\"a\":1,", 6'000'000) + "\"b\":1}"; }),
+         "has more than 1,000,000 members"},
         {"raw NUL bytes", answering(std::string("{\"rows\": [\0]}", 13)), "is no JSON"},
         {"text that is no UTF-8", answering("{\"rows\": [{\"PRODUCT\": \"\xff\xfe\"}]}"),
          "is no JSON"},

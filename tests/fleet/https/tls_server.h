@@ -52,8 +52,10 @@ public:
         }
         return text;
     }
-    void send(const std::string& bytes) {
-        if (isOpen_) SSL_write(session_.get(), bytes.data(), static_cast<int>(bytes.size()));
+    /// False when the client has gone.
+    bool send(const std::string& bytes) {
+        return isOpen_ &&
+               SSL_write(session_.get(), bytes.data(), static_cast<int>(bytes.size())) > 0;
     }
     void answer(int status, const std::string& body, const std::string& more = "") {
         send("HTTP/1.1 " + std::to_string(status) + " Reason\r\n" + more +

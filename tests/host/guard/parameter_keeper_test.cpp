@@ -1,7 +1,10 @@
 // The guard of the universal agent's start-up parameters.
 #include "host/guard/parameter_keeper.h"
 
+#include <algorithm>
+
 #include "host/guard/guard_fixture.h"
+#include "host/guard/guards.h"
 
 namespace {
 
@@ -86,6 +89,8 @@ TEST_F(StartUpParameters, ThatCannotBeSavedRefuseTheRequest) {
         ADD_FAILURE() << "not refused";
     } catch (const host::Refusal& refusal) {
         EXPECT_EQ(refusal.guard(), "start-up-parameters");
+        const std::vector<std::string> counted = host::refusingGuards();
+        EXPECT_EQ(std::count(counted.begin(), counted.end(), refusal.guard()), 1);
         EXPECT_EQ(refusal.httpStatus(), 409U);
         EXPECT_NE(std::string(refusal.what()).find("cannot make "), std::string::npos);
     }

@@ -76,7 +76,7 @@ json hostDocument(const HostSight& sight, Moment now) {
 }
 
 std::string timeOfDocument(Moment time) {
-    return text::utcTime(std::chrono::system_clock::time_point(time));
+    return text::utcTime(time);
 }
 
 }  // namespace fleet

@@ -36,6 +36,25 @@ TEST(BoundedJson, TakesAMillionRows) {
     EXPECT_STREQ(parseBounded(rows).fault, "has more than 1,000,000 rows");
 }
 
+TEST(BoundedJson, TakesAMillionCommas) {
+    std::string numbers = "[0";
+    for (int i = 0; i < 1'000'000; ++i)
+        numbers += ",0";
+    EXPECT_EQ(parseBounded(numbers + "]").document.size(), 1'000'001U);
+    EXPECT_STREQ(parseBounded(numbers + ",0]").fault, "has more than 1,000,000 members");
+}
+
+TEST(BoundedJson, CountsTheMembersOfOneObject) {
+    std::string object = "{\"m\":0";
+    for (int i = 0; i <= 1'000'000; ++i)
+        object += ",\"" + std::to_string(i) + "\":0";
+    EXPECT_STREQ(parseBounded(object + "}").fault, "has more than 1,000,000 members");
+}
+
+TEST(BoundedJson, CountsNoCommasInsideText) {
+    EXPECT_EQ(parseBounded("[\"" + std::string(1'000'001, ',') + "\"]").fault, nullptr);
+}
+
 TEST(BoundedJson, ThatIsNoneIsNull) {
     for (const char* text : {"", "<html>", "{", "[1]]"}) {
         EXPECT_STREQ(parseBounded(text).fault, "is no JSON") << text;

@@ -278,6 +278,19 @@ TEST_F(OddAnswer, IsTooLong) {
               Kind::WrongAnswer);
 }
 
+TEST_F(OddAnswer, HasAChunkExtensionWithoutEnd) {
+    TlsServer server(certificate_, [](TlsServer& self) {
+        TlsPeer peer = self.accept();
+        peer.request();
+        peer.send("HTTP/1.1 200 OK\r\nTransfer-Encoding: chunked\r\n\r\n1;");
+        const std::string piece(16'384, 'x');
+        for (int i = 0; i < 1024 && peer.send(piece); ++i)
+            continue;
+    });
+    HttpsClient client = clientOf(server);
+    EXPECT_EQ(errorOf([&] { client.ask({"GET", "/"}, soon()); }).kind(), Kind::WrongAnswer);
+}
+
 TEST_F(OddAnswer, EndsTooSoon) {
     EXPECT_EQ(kindOf("HTTP/1.1 200 OK\r\nContent-Length: 5\r\n\r\nab"), Kind::NoAnswer);
     EXPECT_EQ(kindOf("HTTP/1.1 200"), Kind::NoAnswer);

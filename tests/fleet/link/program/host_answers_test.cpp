@@ -53,6 +53,17 @@ TEST(HandingOver, TheBodyIsTheOrdersWithWhatTheLinkAdds) {
                           {"expires", "2023-11-14T22:13:20Z"}}));
 }
 
+TEST(HandingOver, AnExpiryFarAwayStaysFarAway) {
+    fleet::Directive made = directive("");
+    const auto expiresAt = [&made](fleet::Moment moment) {
+        made.expires = moment;
+        return json::parse(bodyOf(fleet::HandOver{made, "journal"})).at("expires");
+    };
+    EXPECT_EQ(expiresAt(fleet::Moment(2'208'988'800'000)), "2040-01-01T00:00:00Z");
+    EXPECT_EQ(expiresAt(fleet::Moment(9'467'107'200'000)), "2270-01-01T00:00:00Z");
+    EXPECT_EQ(expiresAt(fleet::Moment(fleet::kHighestNumber)), "9999-12-31T23:59:59Z");
+}
+
 TEST(HandingOver, AnEndIsOneMoreMember) {
     const fleet::EnterEnd end{directive(R"({"command":"START"})"), "refused", "not here", "j"};
     EXPECT_EQ(json::parse(bodyOf(end)), json({{"command", "START"},
