@@ -16,7 +16,9 @@ require_whole_runas() {
 
 # complain_about_runas FILE: prints what is wrong with the list, nothing when it is whole. A list uses
 # little of XML: what it does not need (attributes, references to characters by number, document types,
-# sections of raw text) is refused rather than understood.
+# sections of raw text) is refused rather than understood. The library takes the first of two entries, passes
+# over what it does not look for, and puts the text in front of an element to that element's own: that is
+# refused too.
 complain_about_runas() {
     [ -f "$1" ] && [ -r "$1" ] || {
         echo "it cannot be read"
@@ -29,27 +31,69 @@ complain_about_runas() {
     LC_ALL=C tr '\0' '\001' <"$1" | LC_ALL=C awk '
         function bad(text) { if (complaint == "") complaint = text }
         function text_ends(text) {
-            gsub(/&(amp|lt|gt|quot|apos);/, "", text)
+            content = content text
+            gsub(/&(amp|lt|gt|quot|apos);/, "x", text)
             if (text ~ /&/) bad("it has an unknown entity")
             if (text ~ /\]\]>/) bad("it has ]]> in a text")
             if (depth == 0 && text !~ /^[ \t\r\n]*$/) bad("it has text outside its elements")
+            if (depth > 0 && text !~ /^[ \t\r\n]*$/ && role[depth] ~ /^(list|agent|instance)$/)
+                bad("it has a text between its entries")
         }
-        function opened(name) {
+        function plain_text(text) {
+            gsub(/^[ \t\r\n]+|[ \t\r\n]+$/, "", text)
+            gsub(/&lt;/, "<", text)
+            gsub(/&gt;/, ">", text)
+            gsub(/&quot;/, "\"", text)
+            gsub(/&apos;/, "\047", text)
+            gsub(/&amp;/, "\\&", text)
+            return text
+        }
+        # role_in PARENT NAME: what the library takes the element for; "" if it does not look for it.
+        function role_in(parent, name) {
+            if (parent == "list" && name == "agent") return name
+            if (parent == "agent" && name ~ /^(productCode|instance)$/) return name
+            if (parent == "instance" && name ~ /^(name|user)$/) return name
+            return ""
+        }
+        # meant_by NAME PARENT: the entry that somebody may have meant by an element that is passed over.
+        function meant_by(name, parent) {
+            name = tolower(name)
+            if (name ~ /^(agent|instance)$/) return name
+            if (parent !~ /^(list|agent|instance)$/) return ""
+            if (name == "productcode") return "productCode"
+            return name ~ /^(name|user)$/ ? name : ""
+        }
+        function opened(name,    parent, meant) {
             if (depth == 0 && roots++) bad("it has a second root element")
+            parent = depth > 0 ? role[depth] : ""
             path[++depth] = name
-            if (depth == 2 && name == "agent") code = 0
-            if (depth == 3 && name == "instance") named = used = 0
-            if (depth == 3 && name == "productCode" && path[2] == "agent") code = 1
-            if (depth == 4 && path[2] == "agent" && path[3] == "instance") {
-                if (name == "name") named = 1
-                if (name == "user") used = 1
-            }
+            role[depth] = depth == 1 ? "list" : role_in(parent, name)
+            if (parent ~ /^(productCode|name|user)$/) bad("it has elements in a productCode, a name or a user")
+            if (depth == 1 || role[depth] == "") meant = meant_by(name, parent)
+            if (meant != "") bad("it has something like <" meant "> where none is looked for")
+            if (role[depth] == "agent") { codes = 0; split("", named) }
+            if (role[depth] == "instance") names = users = 0
+            content = ""
+        }
+        function code_ends(code) {
+            if (codes++) bad("it has an agent with more than one productCode")
+            else if (code == "") bad("it has an empty productCode")
+            else if (code !~ /^[a-z0-9]+$/) bad("it has a productCode that is not lower-case letters and digits")
+            else if (coded[code]++) bad("it has more than one agent with the productCode " code)
         }
         function closed(name) {
             if (depth == 0 || path[depth] != name) { bad("it has an unexpected </" name ">"); return }
-            if (depth == 2 && name == "agent" && !code) bad("it has an agent without a productCode")
-            if (depth == 3 && path[2] == "agent" && name == "instance" && !(named && used))
-                bad("it has an instance without a name or a user")
+            if (role[depth] == "productCode") code_ends(plain_text(content))
+            if (role[depth] == "agent" && !codes) bad("it has an agent without a productCode")
+            if (role[depth] == "name") {
+                names++
+                if (named[plain_text(content)]++) bad("it has an agent with more than one instance of the same name")
+            }
+            if (role[depth] == "user") users++
+            if (role[depth] == "instance") {
+                if (!names || !users) bad("it has an instance without a name or a user")
+                else if (names > 1 || users > 1) bad("it has an instance with more than one name or user")
+            }
             depth--
         }
         function tag(text,    name) {

@@ -1,15 +1,19 @@
 #include "host/home/run_as_list.h"
 
 #include <fcntl.h>
+#include <strings.h>
 #include <sys/stat.h>
 #include <sys/utsname.h>
 #include <unistd.h>
 
+#include <array>
 #include <cerrno>
 #include <cstddef>
 #include <memory>
+#include <set>
 #include <string_view>
 #include <system_error>
+#include <vector>
 
 #include "platform/xml1.h"
 #include "system/file_descriptor.h"
@@ -19,88 +23,183 @@ namespace {
 
 constexpr int kPiece = 16 * 1024;
 constexpr std::size_t kLargest = std::size_t{16} << 20;
-/// A user's name that is longer is nobody's.
-constexpr std::size_t kLongestName = 1'024;
+/// No code, instance or user has a longer name.
+constexpr std::size_t kLongestText = 1'024;
+constexpr std::string_view kBlanks = " \t\r\n";
 
 std::string trimmedField(const std::string& text) {
-    constexpr std::string_view kBlanks = " \t\r\n";
     const std::size_t begin = text.find_first_not_of(kBlanks);
     if (begin == std::string::npos) return "";
     return text.substr(begin, text.find_last_not_of(kBlanks) + 1 - begin);
 }
 
+enum class Element { Other, List, Agent, ProductCode, Instance, Name, User };
+
+struct Place {
+    Element parent;
+    std::string_view name;
+    Element element;
+};
+
+/// Where the plug-in looks for what. Its root may have any name.
+constexpr std::array<Place, 5> kPlaces = {{
+    {Element::List, "agent", Element::Agent},
+    {Element::Agent, "productCode", Element::ProductCode},
+    {Element::Agent, "instance", Element::Instance},
+    {Element::Instance, "name", Element::Name},
+    {Element::Instance, "user", Element::User},
+}};
+
+Element elementIn(Element parent, std::string_view name) {
+    for (const Place& place : kPlaces) {
+        if (place.parent == parent && place.name == name) return place.element;
+    }
+    return Element::Other;
+}
+
+bool hasText(Element element) {
+    return element == Element::ProductCode || element == Element::Name || element == Element::User;
+}
+
+/// Whether there is no more in it than the list's own elements.
+bool hasEntries(Element element) {
+    return element == Element::List || element == Element::Agent || element == Element::Instance;
+}
+
+/// Whether the names differ in the case of their letters at most. Of `name`, what a namespace has
+/// in front does not count.
+bool isLike(std::string_view name, std::string_view known) {
+    name.remove_prefix(name.rfind(':') + 1);
+    return name.size() == known.size() &&
+           ::strncasecmp(name.data(), known.data(), known.size()) == 0;
+}
+
+/// The entry that somebody may have meant by an element that the plug-in passes over; "" if none.
+/// Other elements may hold names and users of their own.
+std::string_view meantBy(std::string_view name, Element parent) {
+    for (const Place& place : kPlaces) {
+        if (hasText(place.element) && !hasEntries(parent)) continue;
+        if (isLike(name, place.name)) return place.name;
+    }
+    return "";
+}
+
+/// Codes of products are compared letter by letter, and the products of a home are in lower case.
+bool isProductCode(const std::string& text) {
+    return !text.empty() &&
+           text.find_first_not_of("abcdefghijklmnopqrstuvwxyz0123456789") == std::string::npos;
+}
+
 /// Follows the elements of a list: a root with agents, an agent with its product code and its
-/// instances, an instance with its name and its user.
+/// instances, an instance with its name and its user. The plug-in takes the first of two entries,
+/// passes over what it does not look for, and puts the text in front of an element to that
+/// element's own; each of them is a fault here.
 class ListReader {
 public:
     explicit ListReader(RunAsList& list) : list_(list) {}
 
     void open(std::string_view name) {
-        ++depth_;
-        if (depth_ == kAgentDepth) openAgent(name);
-        if (depth_ == kInstanceDepth && isInAgent_) openPartOfAgent(name);
-        if (depth_ == kUserDepth && isInInstance_) openPartOfInstance(name);
+        const bool isRoot = open_.empty();
+        const Element parent = isRoot ? Element::Other : open_.back();
+        const Element element = isRoot ? Element::List : elementIn(parent, name);
+        if (hasText(parent)) complain("it has elements in a productCode, a name or a user");
+        if (isRoot || element == Element::Other) lookForStray(name, parent);
+        if (element == Element::Agent) agent_ = {};
+        if (element == Element::Instance) instance_ = {};
+        open_.push_back(element);
+        text_.clear();
     }
     void add(std::string_view text) {
-        if (isInUser_ && depth_ == kUserDepth && user_.size() <= kLongestName) user_ += text;
+        if (open_.empty()) return;
+        if (hasText(open_.back())) {
+            if (text_.size() <= kLongestText) text_ += text;
+        } else if (hasEntries(open_.back()) && text.find_first_not_of(kBlanks) != text.npos) {
+            complain("it has a text between its entries");
+        }
     }
     void close() {
-        if (depth_ == kUserDepth) closePartOfInstance();
-        if (depth_ == kInstanceDepth) closePartOfAgent();
-        if (depth_ == kAgentDepth) closeAgent();
-        --depth_;
+        if (open_.empty()) return;
+        switch (open_.back()) {
+            case Element::Agent:
+                closeAgent();
+                break;
+            case Element::ProductCode:
+                closeProductCode(trimmedField(text_));
+                break;
+            case Element::Instance:
+                closeInstance();
+                break;
+            case Element::Name:
+                closeName(trimmedField(text_));
+                break;
+            case Element::User:
+                closeUser(trimmedField(text_));
+                break;
+            case Element::List:
+            case Element::Other:
+                break;
+        }
+        open_.pop_back();
     }
-    bool isComplete() const { return depth_ == 0; }
+    bool isComplete() const { return open_.empty(); }
 
 private:
-    static constexpr long kAgentDepth = 2;
-    static constexpr long kInstanceDepth = 3;
-    static constexpr long kUserDepth = 4;
+    struct Agent {
+        int productCodes = 0;
+        std::set<std::string> instances;  ///< their names
+    };
+    struct Instance {
+        int names = 0;
+        int users = 0;
+    };
 
-    void openAgent(std::string_view name) {
-        isInAgent_ = name == "agent";
-        hasCode_ = false;
+    void lookForStray(std::string_view name, Element parent) {
+        const std::string_view meant = meantBy(name, parent);
+        if (meant.empty()) return;
+        complain("it has something like <" + std::string(meant) + "> where none is looked for");
     }
-    void openPartOfAgent(std::string_view name) {
-        hasCode_ = hasCode_ || name == "productCode";
-        isInInstance_ = name == "instance";
-        hasName_ = false;
-        hasUser_ = false;
-    }
-    void openPartOfInstance(std::string_view name) {
-        hasName_ = hasName_ || name == "name";
-        isInUser_ = name == "user" && !hasUser_;  // the first one counts
-        hasUser_ = hasUser_ || isInUser_;
-        user_.clear();
-    }
-    void closePartOfInstance() {
-        const std::string user = isInUser_ ? trimmedField(user_) : "";
-        if (!user.empty()) list_.users.insert(user);
-        isInUser_ = false;
-    }
-    void closePartOfAgent() {
-        if (isInInstance_ && !(hasName_ && hasUser_)) {
-            complain("it has an instance without a name or a user");
+    void closeProductCode(const std::string& code) {
+        ++agent_.productCodes;
+        if (agent_.productCodes > 1) {
+            complain("it has an agent with more than one productCode");
+        } else if (code.empty()) {
+            complain("it has an empty productCode");
+        } else if (!isProductCode(code)) {
+            complain("it has a productCode that is not lower-case letters and digits");
+        } else if (!productCodes_.insert(code).second) {
+            complain("it has more than one agent with the productCode " + code);
         }
-        isInInstance_ = false;
     }
     void closeAgent() {
-        if (isInAgent_ && !hasCode_) complain("it has an agent without a productCode");
-        isInAgent_ = false;
+        if (agent_.productCodes == 0) complain("it has an agent without a productCode");
     }
-    void complain(const char* what) {
+    void closeName(const std::string& name) {
+        ++instance_.names;
+        if (!agent_.instances.insert(name).second) {
+            complain("it has an agent with more than one instance of the same name");
+        }
+    }
+    void closeUser(const std::string& user) {
+        ++instance_.users;
+        if (!user.empty()) list_.users.insert(user);
+    }
+    void closeInstance() {
+        if (instance_.names == 0 || instance_.users == 0) {
+            complain("it has an instance without a name or a user");
+        } else if (instance_.names > 1 || instance_.users > 1) {
+            complain("it has an instance with more than one name or user");
+        }
+    }
+    void complain(const std::string& what) {
         if (list_.fault.empty()) list_.fault = what;
     }
 
     RunAsList& list_;
-    std::string user_;
-    long depth_ = 0;
-    bool isInAgent_ = false;
-    bool hasCode_ = false;
-    bool isInInstance_ = false;
-    bool hasName_ = false;
-    bool hasUser_ = false;
-    bool isInUser_ = false;
+    std::vector<Element> open_;
+    std::string text_;  ///< of the innermost element
+    std::set<std::string> productCodes_;
+    Agent agent_;
+    Instance instance_;
 };
 
 void onStart(void* reader, const char* name, const char**) {

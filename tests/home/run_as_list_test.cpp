@@ -2,6 +2,9 @@
 #include <gmock/gmock.h>
 #include <sys/utsname.h>
 
+#include <string>
+#include <vector>
+
 #include "home/home_fixture.h"
 
 using ::testing::HasSubstr;
@@ -35,12 +38,62 @@ protected:
 };
 
 const std::string kInstance = "<instance><name>a</name><user>monitor</user></instance>";
-const std::string kAgent = "<agent><productCode>ux</productCode>" + kInstance + "</agent>";
+std::string agentWith(const std::string& productCode, const std::string& instances = kInstance) {
+    return "<agent><productCode>" + productCode + "</productCode>" + instances + "</agent>";
+}
+
+const std::string kAgent = agentWith("ux");
+
+struct Overlooked {
+    std::string list;  ///< what is in the root
+    std::string reason;
+};
+
+const std::vector<Overlooked> kOverlooked = {
+    {kAgent + agentWith("lz") + agentWith(" ux\n"), "more than one agent with the productCode ux"},
+    {agentWith("ux</productCode><productCode>lz"), "an agent with more than one productCode"},
+    {agentWith(""), "an empty productCode"},
+    {agentWith(" \n"), "an empty productCode"},
+    {"<agent><productCode/>" + kInstance + "</agent>", "an empty productCode"},
+    {agentWith("UX"), "not lower-case letters and digits"},
+    {agentWith("u x"), "not lower-case letters and digits"},
+    {agentWith("u&amp;x"), "not lower-case letters and digits"},
+    {"<Agent><productCode>ux</productCode>" + kInstance + "</Agent>", "something like <agent>"},
+    {"<agents>" + kAgent + "</agents>", "something like <agent>"},
+    {kInstance, "something like <instance>"},
+    {"<productCode>ux</productCode>", "something like <productCode>"},
+    {agentWith("ux", "<Instance><name>a</name><user>m</user></Instance>"),
+     "something like <instance>"},
+    {agentWith("ux", "<all>" + kInstance + "</all>"), "something like <instance>"},
+    {agentWith("ux", "<name>a</name><user>m</user>"), "something like <name>"},
+    {agentWith("ux", "<instance><name>a</name><User>x</User><user>m</user></instance>"),
+     "something like <user>"},
+    {agentWith("ux", kInstance + kInstance), "more than one instance of the same name"},
+    {agentWith("ux", kInstance + "<instance><name> a\n</name><user>m</user></instance>"),
+     "more than one instance of the same name"},
+    {agentWith("ux",
+               "<instance><name>a&amp;&lt;</name><user>m</user></instance>"
+               "<instance><name> a&amp;&lt;</name><user>m</user></instance>"),
+     "more than one instance of the same name"},
+    {agentWith("ux", "<instance><name>b</name><name>a</name><user>m</user></instance>"),
+     "an instance with more than one name or user"},
+    {agentWith("ux", "<instance><name>a</name><user/><user>m</user></instance>"),
+     "an instance with more than one name or user"},
+    {agentWith("u<x/>x"), "elements in a productCode"},
+    {"<agent>u<productCode>x</productCode></agent>", "a text between its entries"},
+    {"for&lt;" + kAgent, "a text between its entries"},
+    {"&lt;" + kAgent, "a text between its entries"},
+};
 
 TEST_F(RunAsList, WholeListsAreAccepted) {
     accepted("<runas>\n</runas>\n");
     accepted("<runas/>");
-    accepted("<runas>" + kAgent + kAgent + "</runas>");
+    accepted("<runas>" + kAgent + agentWith("\n u2 ") + "</runas>");
+    accepted("<runas>" + agentWith("ux", kInstance + "<instance><name>b</name><user/></instance>") +
+             "</runas>");
+    accepted(
+        "<list><agent><note><name/><user>x</user></note><productCode>ux</productCode></agent>"
+        "</list>");
     accepted("<?xml version=\"1.0\" encoding=\"UTF-8\"?>\n<!-- who < runs > what -->\n<runas >" +
              kAgent + "<!--\n--></runas\n>\n");
     accepted(
@@ -93,6 +146,10 @@ TEST_F(RunAsList, EntriesThatWouldBeOverlookedAreRefused) {
         "<runas><agent><productCode>ux</productCode><instance><name>a</name></instance>"
         "</agent></runas>",
         "without a name or a user");
+    for (const auto& [list, reason] : kOverlooked)
+        refused("<runas>" + list + "</runas>", reason);
+    refused(kAgent, "something like <agent>");
+    refused("<Agent></Agent>", "something like <agent>");
 }
 
 TEST_F(RunAsList, WhatIsNoReadableFileIsRefused) {

@@ -3,6 +3,7 @@
 
 #include <cstdio>
 
+#include "base/zavrunas.h"
 #include "host/checks/check_fixture.h"
 
 namespace {
@@ -85,6 +86,64 @@ TEST_F(HomeChecks, EntriesOfTheRunAsDatabaseThatWouldBeOverlookedAreAnError) {
     }
     scratch.write(file, "<runas><agent><productCode>ux</productCode>" + instance +
                             "<instance><name/><user/></instance></agent><note/></runas>");
+    expectFinding("run-as", Verdict::Ok, file);
+
+    const auto agent = [&instance](const std::string& code) {
+        return "<agent><productCode>" + code + "</productCode>" + instance + "</agent>";
+    };
+    const std::string ux = "<agent><productCode>ux</productCode>";
+    const struct {
+        std::string list;
+        std::string fault;
+    } rows[] = {
+        {agent("ux") + agent("lz") + agent(" ux\n"), "more than one agent with the productCode ux"},
+        {agent("ux</productCode><productCode>lz"), "an agent with more than one productCode"},
+        {agent(""), "an empty productCode"},
+        {agent(" \n"), "an empty productCode"},
+        {"<agent><productCode/>" + instance + "</agent>", "an empty productCode"},
+        {agent("UX"), "not lower-case letters and digits"},
+        {agent("u x"), "not lower-case letters and digits"},
+        {"<Agent><productCode>ux</productCode>" + instance + "</Agent>", "something like <agent>"},
+        {"<o:agent xmlns:o='o'>" + instance + "</o:agent>", "something like <agent>"},
+        {"<agents>" + agent("ux") + "</agents>", "something like <agent>"},
+        {"<productCode>ux</productCode>", "something like <productCode>"},
+        {instance, "something like <instance>"},
+        {ux + "<Instance><name>a</name><user>root</user></Instance></agent>",
+         "something like <instance>"},
+        {ux + "<all>" + instance + "</all></agent>", "something like <instance>"},
+        {ux + "<name>a</name><user>root</user></agent>", "something like <name>"},
+        {ux + "<instance><name>a</name><User>x</User><user>root</user></instance></agent>",
+         "something like <user>"},
+        {ux + instance + "<instance><name> a\n</name><user>root</user></instance></agent>",
+         "more than one instance of the same name"},
+        {ux + "<instance><name>b</name><name>a</name><user>root</user></instance></agent>",
+         "an instance with more than one name or user"},
+        {ux + "<instance><name>a</name><user/><user>root</user></instance></agent>",
+         "an instance with more than one name or user"},
+        {agent("u<x/>x"), "elements in a productCode"},
+        {"<agent>u<productCode>x</productCode></agent>", "a text between its entries"},
+    };
+    for (const auto& row : rows) {
+        scratch.write(file, "<runas>" + row.list + "</runas>");
+        expectFinding("run-as", Verdict::Error, row.fault);
+    }
+    scratch.write(file, agent("ux"));
+    expectFinding("run-as", Verdict::Error, "something like <agent>");
+}
+
+TEST_F(HomeChecks, ARunAsDatabaseAsThePlugInWritesItIsWhole) {
+    const std::string file = runAsFile();
+    {
+        ZAV::StartupDB database(scratch.path(file).c_str());
+        for (const char* const code : {"ux", "u2"}) {
+            auto* const agent = new ZAV::AgentEntry(code);
+            database.addAgent(agent);
+            agent->addInstance(new ZAV::InstanceEntry("", ""));
+            agent->addInstance(new ZAV::InstanceEntry("a", "root"));
+            agent->addInstance(new ZAV::InstanceEntry("b", ""));
+        }
+        ASSERT_EQ(database.save(), 1);
+    }
     expectFinding("run-as", Verdict::Ok, file);
 }
 
