@@ -101,11 +101,11 @@ public:
 
     std::optional<http::Reply> take(std::string_view piece) override {
         if (!file_) file_ = unnamedFile(directory_);
-        if (!file_) return noRoom(directory_, errno);
+        if (!file_) return giveUp(errno);
         while (!piece.empty()) {
             const ssize_t written = ::write(file_.get(), piece.data(), piece.size());
             if (written < 0 && errno == EINTR) continue;
-            if (written < 0) return noRoom(directory_, errno);
+            if (written < 0) return giveUp(errno);
             piece.remove_prefix(static_cast<std::size_t>(written));
             size_ += static_cast<std::uintmax_t>(written);
         }
@@ -114,6 +114,13 @@ public:
 
     http::Answer answer() override {
         if (auto refusal = take({})) return std::move(*refusal);  // an empty file has no piece
+        http::Answer answer = push();
+        place_.reset();  // whoever has the answer may send the next file of this name
+        return answer;
+    }
+
+private:
+    http::Reply push() const {
         ctl::PushedFile file;
         file.source = "/proc/self/fd/" + std::to_string(file_.get());
         file.name = place_->name();
@@ -129,8 +136,12 @@ public:
         }
     }
 
-private:
-    const std::unique_ptr<UploadPlace> place_;
+    std::optional<http::Reply> giveUp(int error) {
+        place_.reset();
+        return noRoom(directory_, error);
+    }
+
+    std::unique_ptr<UploadPlace> place_;
     const std::string directory_;
     const ctl::HostAddress host_;
     sys::FileDescriptor file_;
