@@ -9,9 +9,9 @@ using ctl::Wanted;
 using ctl::wantedBy;
 using testing::Contains;
 using testing::ElementsAre;
-using testing::UnorderedElementsAre;
 using testing::IsEmpty;
 using testing::Not;
+using testing::UnorderedElementsAre;
 
 std::vector<std::string> words(const Wanted& wanted) {
     std::vector<std::string> words;
