@@ -91,10 +91,20 @@ zav_verify(conformance LIBRARIES ${libraries} ROOT ${CMAKE_SOURCE_DIR}/platform 
 foreach(program host ctl)
   file(GLOB_RECURSE sources ${program}/*.cpp)
   file(GLOB_RECURSE headers ${program}/*.h)
+  list(FILTER sources EXCLUDE REGEX "/ctl/console/")
+  list(FILTER headers EXCLUDE REGEX "/ctl/console/")
   zav_verify(${program} LIBRARIES zav${program}_core
     DEFINITIONS $<TARGET_PROPERTY:zav${program}_core,COMPILE_DEFINITIONS>
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 endforeach()
+
+if(TARGET zavctl_console)
+  file(GLOB sources ctl/console/*.cpp)
+  file(GLOB headers ctl/console/*.h)
+  zav_verify(console LIBRARIES zavctl_console
+    DEFINITIONS $<TARGET_PROPERTY:zavctl_console,COMPILE_DEFINITIONS>
+    SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
+endif()
 
 # What several programs share.
 file(GLOB sources http/*.cpp metrics/*.cpp sqlite/*.cpp)

@@ -1,21 +1,15 @@
 #include "ctl/fleet_program.h"
 
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
-#include <filesystem>
-#include <system_error>
 
-#include "ctl/client/failure.h"
+#include "ctl/sibling_program.h"
 #include "ctl/verbs/arguments/global_arguments.h"
 
 namespace ctl {
 namespace {
 
-namespace fs = std::filesystem;
-
-constexpr const char* kFleetProgram = "zavctl-fleet";
+constexpr SiblingProgram kFleetProgram = {"zavctl-fleet",
+                                          "what manages fleets is not installed here"};
 constexpr const char* kFleetOptions[] = {"--fleet", "--on"};
 constexpr const char* kFleetVerbs[] = {"login", "hosts", "rollout"};
 
@@ -57,23 +51,7 @@ bool isForFleet(const std::vector<std::string>& words) {
 }
 
 void becomeFleetProgram(char* const* argv) {
-    std::error_code error;
-    const fs::path here = fs::read_symlink("/proc/self/exe", error).parent_path();
-    // Without it, names would be looked for in the working directory.
-    if (error) throw Failure(kWrongUsage, "cannot tell where zavctl is: " + error.message());
-    const fs::path places[] = {here / kFleetProgram,
-                               here.parent_path() / "libexec" / "zavmgmt" / kFleetProgram};
-    int reason = ENOENT;
-    for (const fs::path& place : places) {
-        ::execv(place.c_str(), argv);
-        if (errno != ENOENT) reason = errno;
-    }
-    if (reason == ENOENT) {
-        throw Failure(kWrongUsage, "what manages fleets is not installed here",
-                      "The program " + std::string(kFleetProgram) + " is missing beside zavctl.");
-    }
-    throw Failure(kWrongUsage, std::string(kFleetProgram) +
-                                   " cannot be run: " + std::generic_category().message(reason));
+    becomeProgram(kFleetProgram, argv);
 }
 
 }  // namespace ctl

@@ -1,5 +1,4 @@
-/// The part of the program that manages many hosts at once. It is a program of its own, which is
-/// not there on every machine: what one host needs shall stay small.
+/// The part of the program that manages many hosts at once. It is a program of its own.
 #pragma once
 
 #include <string>
@@ -11,8 +10,7 @@ namespace ctl {
 /// alone. What stands behind "--" does not count.
 bool isForFleet(const std::vector<std::string>& words);
 
-/// Runs zavctl-fleet with the same words in the place of this process. It is looked for beside this
-/// program, and in ../libexec/zavmgmt from there. Throws Failure(kWrongUsage) if it cannot be run.
+/// Runs zavctl-fleet with the same words in the place of this process, see becomeProgram().
 [[noreturn]] void becomeFleetProgram(char* const* argv);
 
 }  // namespace ctl

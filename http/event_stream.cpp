@@ -1,14 +1,26 @@
 #include "http/event_stream.h"
 
+#include <sys/socket.h>
+
 #include <boost/asio/buffer.hpp>
 #include <boost/asio/write.hpp>
 #include <boost/beast/http/write.hpp>
+#include <cerrno>
 #include <utility>
 
 namespace http {
 
 namespace net = boost::asio;
 namespace wire = boost::beast::http;
+
+namespace {
+
+bool isTcp(const Stream& stream) {
+    Stream::endpoint_type here = stream.socket().local_endpoint();
+    return here.data()->sa_family != AF_UNIX;
+}
+
+}  // namespace
 
 EventStream::EventStream(ServerCore& core, Stream stream, std::unique_ptr<EventSource> source,
                          bool clientOnlyReads)
@@ -28,6 +40,7 @@ void EventStream::start() {
     closed_ = false;
     stream_.expires_never();
     awaitHangUp();
+    if (isTcp(stream_)) awaitEndOfInput();
     awaitHeartbeat();
     writeHead();
     source_->start([mailbox = core_.mailbox, weak = weak_from_this()] {
@@ -48,6 +61,21 @@ void EventStream::awaitHangUp() {
                                 [self = shared_from_this()](Error) { self->close(); });
 }
 
+/// A client that closes a TCP connection looks at first like one that has ended its sending only,
+/// and those of TCP do not do that.
+void EventStream::awaitEndOfInput() {
+    stream_.socket().async_wait(
+        net::socket_base::wait_read, [self = shared_from_this()](Error error) {
+            if (error || self->closed_) return;
+            char piece[4096];  // what a client sends behind its request is of no use
+            const ssize_t got =
+                ::recv(self->stream_.socket().native_handle(), piece, sizeof piece, MSG_DONTWAIT);
+            const bool isOver = got == 0 || (got < 0 && errno != EAGAIN && errno != EINTR);
+            if (isOver) return self->close();
+            self->awaitEndOfInput();
+        });
+}
+
 void EventStream::awaitHeartbeat() {
     heartbeat_.expires_after(core_.limits.heartbeat);
     heartbeat_.async_wait([self = shared_from_this()](Error error) {
@@ -61,8 +89,10 @@ void EventStream::writeHead() {
     writing_ = true;
     head_.result(wire::status::ok);
     head_.version(11);
-    head_.set(wire::field::content_type, "text/event-stream");
     head_.set(wire::field::cache_control, "no-cache");
+    for (const auto& [name, value] : core_.handler.commonFields())
+        head_.set(name, value);
+    head_.set(wire::field::content_type, "text/event-stream");
     const std::string position = source_->position();
     if (!position.empty()) head_.set("Last-Event-ID", position);
     head_.keep_alive(false);  // the stream is as long as the connection

@@ -31,6 +31,7 @@ private:
     using Head = boost::beast::http::response<boost::beast::http::empty_body>;
 
     void awaitHangUp();
+    void awaitEndOfInput();
     void awaitHeartbeat();
     void writeHead();
     void write(std::string text);

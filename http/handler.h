@@ -2,10 +2,14 @@
 #pragma once
 
 #include <chrono>
+#include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
+#include <string_view>
 #include <variant>
+#include <vector>
 
 #include "http/event_source.h"
 #include "http/peer.h"
@@ -33,6 +37,25 @@ struct Later {
     std::function<Answer()> atLimit;
 };
 
+/// Gets a body piece by piece while it is read, so that it may be larger than what memory shall
+/// hold. Everything but mostBytes() is called on worker threads, one call at a time, and may take
+/// long. It is destroyed unasked when the client goes before its body is complete.
+class BodyTaker {
+public:
+    virtual ~BodyTaker() = default;
+    /// A body that is larger is refused with status 413. Any thread.
+    virtual std::uint64_t mostBytes() const = 0;
+    /// The next piece. A reply refuses the rest: it is sent, and the connection closed. What it
+    /// throws becomes an answer with status 500.
+    virtual std::optional<Reply> take(std::string_view piece) = 0;
+    /// The body is complete. What it throws becomes an answer with status 500.
+    virtual Answer answer() = 0;
+};
+
+/// What to do with a body that is yet to be read: nothing special, refuse it unread, or hand it
+/// over piece by piece in place of Handler::handle().
+using BodyPlan = std::variant<std::monostate, Reply, std::unique_ptr<BodyTaker>>;
+
 /// One request, as it came. Method and target have not been checked.
 struct Request {
     std::string method;
@@ -42,6 +65,8 @@ struct Request {
     std::string lastEventId{};    ///< the field of this name; empty if there is none
     std::string authorization{};  ///< likewise
     std::string range{};          ///< likewise
+    /// The fields that Handler::wantedFields() names, each as often as it is there.
+    Fields fields{};
 };
 
 /// The application behind a server. Everything is called on the I/O thread and must not block.
@@ -52,6 +77,17 @@ public:
     /// Either the answer, or the job that makes it. What it throws, or the job, becomes an answer
     /// with status 500.
     virtual std::variant<Answer, Job> handle(Request request) = 0;
+
+    /// What to do with the body of a request whose head this is. Not asked about requests without
+    /// one. What it throws becomes an answer with status 500.
+    virtual BodyPlan planFor(const Request& head);
+
+    /// The names of further header fields that requests are to hold. The same at all times.
+    virtual const std::vector<std::string>& wantedFields() const;
+
+    /// Fields of every answer, also of those that the server gives itself. An answer's own fields
+    /// go before them. The same at all times.
+    virtual const Fields& commonFields() const;
 
     /// The server ends: no request is handed on from now on.
     virtual void prepareForEnd() = 0;

@@ -8,11 +8,14 @@
 
 namespace http {
 
+/// Names and values of header fields.
+using Fields = std::vector<std::pair<std::string, std::string>>;
+
 struct Reply {
     unsigned status = 200;
     std::string body;                       ///< bytes as they are sent
-    std::string type = "application/json";  ///< Content-Type; not sent with status 204
-    std::vector<std::pair<std::string, std::string>> fields{};  ///< further header fields
+    std::string type = "application/json";  ///< Content-Type; not sent with status 204 or 304
+    Fields fields{};                        ///< further header fields
 };
 
 /// A reply whose body is this JSON text and a line feed.

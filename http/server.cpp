@@ -39,6 +39,13 @@ int duplicate(int descriptor) {
     return copy;
 }
 
+int familyOf(int connection) {
+    int family = AF_UNIX;
+    socklen_t length = sizeof family;
+    ::getsockopt(connection, SOL_SOCKET, SO_DOMAIN, &family, &length);
+    return family;
+}
+
 }  // namespace
 
 using Descriptor = net::posix::basic_stream_descriptor<net::io_context::executor_type>;
@@ -157,7 +164,9 @@ void HttpServer::Implementation::admit(sys::FileDescriptor connection) {
 void HttpServer::Implementation::refuse(sys::FileDescriptor connection, const Peer& peer,
                                         unsigned status, std::string_view text) {
     core.counts.refused.add();
-    if (core.refusals >= core.limits.refusals) return turnAway(connection.get(), status, text);
+    if (core.refusals >= core.limits.refusals) {
+        return turnAway(connection.get(), errorReply(status, text), core.handler.commonFields());
+    }
     if (const auto session = sessionOn(std::move(connection), peer)) session->refuse(status, text);
 }
 
@@ -166,7 +175,8 @@ std::shared_ptr<HttpSession> HttpServer::Implementation::sessionOn(sys::FileDesc
                                                                    const Peer& peer) {
     Stream stream(core.io.get_executor());
     Error error;
-    stream.socket().assign(net::local::stream_protocol(), connection.get(), error);
+    const net::generic::stream_protocol protocol(familyOf(connection.get()), 0);
+    stream.socket().assign(protocol, connection.get(), error);
     if (error) return nullptr;
     connection.release();
     return std::make_shared<HttpSession>(core, std::move(stream), peer);

@@ -17,9 +17,9 @@ namespace http {
 /// takes long delays nobody else. A server without connections sleeps until a client comes.
 class HttpServer {
 public:
-    /// `listener` is a non-blocking Unix socket that stays the caller's, or -1 for a server that
-    /// gets all its connections from adopt(); handler and counts outlive the server. Throws
-    /// std::runtime_error.
+    /// `listener` is a non-blocking socket, a Unix one or one of TCP, that stays the caller's, or
+    /// -1 for a server that gets all its connections from adopt(); handler and counts outlive the
+    /// server. Throws std::runtime_error.
     HttpServer(int listener, Door door, Handler& handler, ServerCounts& counts,
                const ServerLimits& limits = {});
     ~HttpServer();
@@ -28,7 +28,7 @@ public:
 
     /// Serves on the calling thread until the server has ended or been stopped.
     void run();
-    /// Serves a client on this connected Unix stream socket, like one that the listener brought:
+    /// Serves a client on this connected stream socket, like one that the listener brought:
     /// the door is asked about it, and the limits count it. A server that is about to end, or has
     /// ended, closes it. Any thread. Throws std::bad_alloc; then it is closed as well.
     void adopt(sys::FileDescriptor connection);

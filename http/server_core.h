@@ -4,8 +4,8 @@
 
 #include <algorithm>
 #include <boost/asio/basic_waitable_timer.hpp>
+#include <boost/asio/generic/stream_protocol.hpp>
 #include <boost/asio/io_context.hpp>
-#include <boost/asio/local/stream_protocol.hpp>
 #include <boost/asio/post.hpp>
 #include <boost/beast/core/basic_stream.hpp>
 #include <chrono>
@@ -21,8 +21,8 @@
 
 namespace http {
 
-/// A client's connection, with time-outs.
-using Stream = boost::beast::basic_stream<boost::asio::local::stream_protocol,
+/// A client's connection, with time-outs: a Unix socket or one of TCP.
+using Stream = boost::beast::basic_stream<boost::asio::generic::stream_protocol,
                                           boost::asio::io_context::executor_type>;
 using Timer = boost::asio::basic_waitable_timer<std::chrono::steady_clock,
                                                 boost::asio::wait_traits<std::chrono::steady_clock>,

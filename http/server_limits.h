@@ -15,11 +15,12 @@ struct ServerLimits {
     std::size_t waitingRequests = 128;  ///< waiting for a worker; further ones get 503
     unsigned headBytes = 16 * 1024;     ///< request line and fields
     unsigned bodyBytes = 1024 * 1024;
-    std::chrono::milliseconds requestTime{30'000};  ///< from a request's first byte to its last
-    std::chrono::milliseconds idleTime{60'000};     ///< between requests
-    std::chrono::milliseconds answerTime{30'000};   ///< for the client to take an answer
-    std::chrono::milliseconds lingerTime{2'000};    ///< for the client to read the last answer
-    std::chrono::milliseconds heartbeat{15'000};    ///< between signs of life on an idle stream
+    /// From a request's first byte to its last; for each piece of a body that is handed over so.
+    std::chrono::milliseconds requestTime{30'000};
+    std::chrono::milliseconds idleTime{60'000};    ///< between requests
+    std::chrono::milliseconds answerTime{30'000};  ///< for the client to take an answer
+    std::chrono::milliseconds lingerTime{2'000};   ///< for the client to read the last answer
+    std::chrono::milliseconds heartbeat{15'000};   ///< between signs of life on an idle stream
 };
 
 }  // namespace http

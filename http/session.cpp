@@ -7,12 +7,14 @@
 #include <boost/beast/http/read.hpp>
 #include <boost/beast/http/write.hpp>
 #include <exception>
+#include <limits>
 #include <optional>
 #include <utility>
 #include <variant>
 
 #include "http/event_stream.h"
 #include "http/head_check.h"
+#include "http/piece_body.h"
 
 namespace http {
 namespace {
@@ -22,6 +24,7 @@ namespace beast = boost::beast;
 namespace wire = beast::http;
 
 constexpr unsigned kNoContent = 204;
+constexpr unsigned kNotModified = 304;
 constexpr std::size_t kReadBytes = 4096;
 constexpr std::size_t kBufferBytes = 64 * 1024;
 /// A client that keeps sending after the last answer is cut off after this many bytes.
@@ -33,6 +36,30 @@ std::string_view view(beast::string_view text) {
 
 bool wantsContinue(const wire::request<wire::string_body>& request) {
     return request.version() >= 11 && beast::iequals(request[wire::field::expect], "100-continue");
+}
+
+bool hasBody(const wire::request_header<>& head) {
+    return head.count(wire::field::content_length) > 0 ||
+           head.count(wire::field::transfer_encoding) > 0;
+}
+
+/// The request without its body. Made of the head alone: what a chunked body brings behind it
+/// counts for nothing.
+Request requestOf(const wire::request_header<>& head, const Peer& peer,
+                  const std::vector<std::string>& wantedFields) {
+    Request request{std::string(view(head.method_string())),
+                    std::string(view(head.target())),
+                    {},
+                    peer,
+                    std::string(view(head["Last-Event-ID"])),
+                    std::string(view(head[wire::field::authorization])),
+                    std::string(view(head[wire::field::range]))};
+    for (const std::string& name : wantedFields) {
+        const auto [first, last] = head.equal_range(name);
+        for (auto field = first; field != last; ++field)
+            request.fields.emplace_back(name, std::string(view(field->value())));
+    }
+    return request;
 }
 
 /// Looks at the extensions of each chunk, which the parser passes by as far as the end of the line.
@@ -90,8 +117,11 @@ void HttpSession::readRequest() {
     state_ = State::Reading;
     parser_.emplace();
     parser_->header_limit(core_.limits.headBytes);
-    parser_->body_limit(core_.limits.bodyBytes);
+    // How much a body may hold depends on what the head asks for.
+    parser_->body_limit(std::numeric_limits<std::uint64_t>::max());
     parser_->on_chunk_header(checkChunk);
+    request_.reset();
+    pieces_.reset();
     keepAlive_ = false;
     isHead_ = false;
     head_.clear();
@@ -128,9 +158,10 @@ void HttpSession::onHead(Error error) {
     std::optional<Reply> refused = refusalOfHead(head_, parser_->get());
     head_ = {};
     if (refused) return respond(std::move(*refused));
-    if (parser_->is_done() || buffer_.size() > 0 || !wantsContinue(parser_->get())) {
-        return readBody();
-    }
+    const bool asksFirst = !parser_->is_done() && wantsContinue(parser_->get());
+    if (!plan()) return;
+    if (isBodyTooLarge()) return onReadError(wire::error::body_limit);
+    if (buffer_.size() > 0 || !asksFirst) return readBody();
     static constexpr std::string_view kContinue = "HTTP/1.1 100 Continue\r\n\r\n";
     net::async_write(stream_, net::buffer(kContinue.data(), kContinue.size()),
                      [self = shared_from_this()](Error failure, std::size_t) {
@@ -139,7 +170,39 @@ void HttpSession::onHead(Error error) {
                      });
 }
 
+/// Decides what becomes of the body; returns false if the request has been answered.
+bool HttpSession::plan() {
+    try {
+        const auto& head = parser_->get();
+        request_ = requestOf(head, peer_, core_.handler.wantedFields());
+        BodyPlan plan = hasBody(head) ? core_.handler.planFor(*request_) : BodyPlan();
+        if (auto* const refusal = std::get_if<Reply>(&plan)) {
+            respond(std::move(*refusal));
+            return false;
+        }
+        if (auto* const taker = std::get_if<std::unique_ptr<BodyTaker>>(&plan)) {
+            pieces_ = std::make_shared<PieceBody>(std::move(*parser_), std::move(*taker));
+        }
+        return true;
+    } catch (const std::exception&) {
+        respond(failure());
+        return false;
+    }
+}
+
+/// Limits the body, and looks at the length that the head announces.
+bool HttpSession::isBodyTooLarge() {
+    if (pieces_) return pieces_->parser.content_length_remaining().value_or(0) > mostBodyBytes();
+    parser_->body_limit(mostBodyBytes());
+    return parser_->content_length_remaining().value_or(0) > mostBodyBytes();
+}
+
+std::uint64_t HttpSession::mostBodyBytes() const {
+    return pieces_ ? pieces_->taker->mostBytes() : core_.limits.bodyBytes;
+}
+
 void HttpSession::readBody() {
+    if (pieces_) return readPiece();
     wire::async_read(
         stream_, buffer_, *parser_,
         [self = shared_from_this()](Error error, std::size_t) { self->onRequest(error); });
@@ -151,13 +214,54 @@ void HttpSession::onRequest(Error error) {
     dispatch();
 }
 
+void HttpSession::readPiece() {
+    if (pieces_->parser.is_done()) {
+        const auto& head = pieces_->parser.get();
+        if (!begin(head.keep_alive(), false)) return;
+        return submit(
+            [pieces = std::exchange(pieces_, nullptr)] { return pieces->taker->answer(); });
+    }
+    pieces_->offer();
+    stream_.expires_after(core_.limits.requestTime);
+    wire::async_read(
+        stream_, buffer_, pieces_->parser,
+        [self = shared_from_this()](Error error, std::size_t) { self->onPiece(error); });
+}
+
+/// Hands the piece over on a worker thread. The next one is read after that, so that a client that
+/// sends faster than its body is taken waits.
+void HttpSession::onPiece(Error error) {
+    if (state_ == State::Closed) return;
+    if (error && error != wire::error::need_buffer) return onReadError(error);
+    stream_.expires_never();
+    const bool taken =
+        core_.pool.submit([mailbox = core_.mailbox, weak = weak_from_this(), pieces = pieces_] {
+            std::optional<Reply> refusal;
+            try {
+                refusal = pieces->taker->take(pieces->piece());
+            } catch (...) {
+                refusal = failure();
+            }
+            mailbox->post([weak, refusal = std::move(refusal)]() mutable {
+                if (const auto self = weak.lock()) self->onPieceTaken(std::move(refusal));
+            });
+        });
+    if (!taken) respond(errorReply(503, "too many requests are waiting"));
+}
+
+void HttpSession::onPieceTaken(std::optional<Reply> refusal) {
+    if (state_ == State::Closed) return;
+    if (refusal) return respond(std::move(*refusal));
+    readPiece();
+}
+
 void HttpSession::onReadError(Error error) {
     static const beast::error_category& kHttpErrors =
         wire::make_error_code(wire::error::end_of_stream).category();
     if (error == wire::error::end_of_stream || error.category() != kHttpErrors) return close();
     if (error == wire::error::body_limit) {
         return respond(errorReply(
-            413, "the body is larger than " + std::to_string(core_.limits.bodyBytes) + " bytes"));
+            413, "the body is larger than " + std::to_string(mostBodyBytes()) + " bytes"));
     }
     if (error == wire::error::header_limit || error == wire::error::buffer_overflow) {
         return respond(errorReply(400, "the request's head is larger than " +
@@ -169,21 +273,23 @@ void HttpSession::onReadError(Error error) {
     respond(errorReply(400, "the request is not HTTP/1.1: " + error.message()));
 }
 
-void HttpSession::dispatch() {
-    auto& message = parser_->get();
-    keepAlive_ = message.keep_alive() && !core_.ending;
-    isHead_ = message.method() == wire::verb::head;
+/// The request is complete; returns false if there is no time left to answer it.
+bool HttpSession::begin(bool keepAlive, bool isHead) {
+    keepAlive_ = keepAlive && !core_.ending;
+    isHead_ = isHead;
     state_ = State::Working;
     ++exchange_;
-    if (core_.ending) return respond(errorReply(503, "the host is about to end"));
+    if (core_.ending) respond(errorReply(503, "the host is about to end"));
+    return !core_.ending;
+}
+
+void HttpSession::dispatch() {
+    auto& message = parser_->get();
+    if (!begin(message.keep_alive(), message.method() == wire::verb::head)) return;
     try {
-        Request request{std::string(view(message.method_string())),
-                        std::string(view(message.target())),
-                        std::move(message.body()),
-                        peer_,
-                        std::string(view(message["Last-Event-ID"])),
-                        std::string(view(message[wire::field::authorization])),
-                        std::string(view(message[wire::field::range]))};
+        Request request = std::move(*request_);
+        request.body = std::move(message.body());
+        request_.reset();
         parser_.reset();
         std::variant<Answer, Job> wanted = core_.handler.handle(std::move(request));
         if (auto* const job = std::get_if<Job>(&wanted)) return submit(std::move(*job));
@@ -245,12 +351,15 @@ void HttpSession::respond(Reply reply) {
     if (state_ == State::Closed) return;
     state_ = State::Writing;
     parser_.reset();
+    pieces_.reset();
     keepAlive_ = keepAlive_ && !core_.ending;
     response_.emplace(static_cast<wire::status>(reply.status), 11);
+    for (const auto& [name, value] : core_.handler.commonFields())
+        response_->set(name, value);
     for (const auto& [name, value] : reply.fields)
         response_->set(name, value);
     response_->keep_alive(keepAlive_);
-    if (reply.status != kNoContent) {
+    if (reply.status != kNoContent && reply.status != kNotModified) {
         response_->set(wire::field::content_type, reply.type);
         // HEAD may ask about a stream, which has no length.
         if (!isHead_ || !reply.body.empty()) response_->content_length(reply.body.size());

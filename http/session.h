@@ -4,6 +4,7 @@
 #include <boost/beast/core/flat_buffer.hpp>
 #include <boost/beast/http/parser.hpp>
 #include <boost/beast/http/string_body.hpp>
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <string>
@@ -11,6 +12,8 @@
 #include "http/server_core.h"
 
 namespace http {
+
+struct PieceBody;
 
 /// Lives on the I/O thread. Requests go to the server's handler, their jobs to the worker threads.
 /// When a client sends requests without waiting for the answers, they are answered in order.
@@ -39,10 +42,17 @@ private:
     void readHead();
     void onEndInHead(Error error);
     void onHead(Error error);
+    bool plan();
+    bool isBodyTooLarge();
+    std::uint64_t mostBodyBytes() const;
     void readBody();
     void onRequest(Error error);
+    void readPiece();
+    void onPiece(Error error);
+    void onPieceTaken(std::optional<Reply> refusal);
     void onReadError(Error error);
 
+    bool begin(bool keepAlive, bool isHead);
     void dispatch();
     void submit(Job job);
     void answer(Answer answer);
@@ -62,7 +72,9 @@ private:
     boost::beast::flat_buffer buffer_;
     std::optional<boost::beast::http::request_parser<boost::beast::http::string_body>> parser_;
     std::optional<boost::beast::http::response<boost::beast::http::string_body>> response_;
-    std::string head_;  ///< the bytes of the request's head so far
+    std::string head_;                   ///< the bytes of the request's head so far
+    std::optional<Request> request_;     ///< once its head is there
+    std::shared_ptr<PieceBody> pieces_;  ///< of a body that is handed over piece by piece
     State state_ = State::Idle;
     unsigned exchange_ = 0;           ///< counts requests; tells late answers from others
     std::optional<Timer> waitTimer_;  ///< made by the first answer that comes later

@@ -12,12 +12,15 @@ packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev 
 libsqlite3-dev libssl-dev libnats-dev libsodium-dev libboost-dev nlohmann-json3-dev libcli11-dev libtomlplusplus-dev mksh curl pkgconf procps
 shellcheck nats-server openssl clang libclang-rt-dev python3 python3-jsonschema mandoc'
 # Programs that only judge the product from outside; their tests are skipped without them.
-judges='python3-impacket tshark zsh fish tmux'
+judges='python3-impacket tshark zsh fish tmux chromium'
+# What makes the console's page. Where npm comes from elsewhere, it is left alone.
+command -v npm >/dev/null || packages="$packages nodejs npm"
 
 # shellcheck disable=SC2086
 case $#/${1-} in
 0/) ;;
 1/--list)
+    case $packages in *npm) ;; *) packages="$packages nodejs npm" ;; esac
     printf '%s\n' $packages $judges
     exit
     ;;

@@ -52,6 +52,13 @@ cp -R build/third_party "$root/src/build/"
 
 # ---- The work ------------------------------------------------------------------------------------
 
+# npm gets the packages of the console's page from where this machine's own does.
+registry=''
+! command -v npm >/dev/null || registry=$(npm config get registry)
+in_checkout() {
+    inside "$root" /src env ${registry:+"npm_config_registry=$registry"} "$@"
+}
+
 echo "== what bootstrap still finds missing there"
 inside "$root" /src scripts/bootstrap.sh >"$root/bootstrap.log" 2>&1 || {
     cat "$root/bootstrap.log"
@@ -63,6 +70,6 @@ if [ -s "$root/bootstrap.log" ]; then
 fi
 echo "nothing"
 echo "== the demo"
-inside "$root" /src scripts/demo.sh
+in_checkout scripts/demo.sh
 echo "== the tests"
-inside "$root" /src scripts/test.sh native
+in_checkout scripts/test.sh native

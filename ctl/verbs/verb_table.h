@@ -30,6 +30,7 @@ extern const Verb kStatusVerb;
 extern const Verb kDoctorVerb;
 extern const Verb kWhoamiVerb;
 extern const Verb kTopVerb;
+extern const Verb kConsoleVerb;
 extern const Verb kPsVerb;
 extern const Verb kTasksVerb;
 extern const Verb kTaskShowVerb;
@@ -63,6 +64,7 @@ constexpr const Verb* kVerbs[] = {
     &kDoctorVerb,           //
     &kWhoamiVerb,           //
     &kTopVerb,              //
+    &kConsoleVerb,          //
     &kPsVerb,               //
     &kTasksVerb,            //
     &kTaskShowVerb,         //

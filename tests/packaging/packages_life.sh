@@ -11,6 +11,8 @@ packages=$1
 agent=ux
 home=/var/lib/zavmgmt
 ours='libzavmgmt1 libzavplatform1 zavmgmt-dev zavhost zavctl zavctl-fleet zavlink zavfleetd zavmgmt-doc'
+# Where the packages were built without npm, there is none of the console.
+[ -z "$(find "$packages/new" -name 'zavctl-console_*.deb')" ] || ours="$ours zavctl-console"
 foreign='libzavmgmt1:i386 libzavplatform1:i386 zavmgmt-dev:i386'
 
 say() { echo "-- $*"; }

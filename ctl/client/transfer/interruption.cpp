@@ -57,6 +57,10 @@ Interruption::~Interruption() {
         ::sigaction(kSignals[i], &formerActions[i], nullptr);
 }
 
+void Interruption::interrupt(int signal) {
+    onInterruption(signal);
+}
+
 int Interruption::signal() {
     return caught;
 }

@@ -16,6 +16,10 @@ public:
     /// The signal that came; 0 when none has.
     static int signal();
 
+    /// Ends all sending as this signal would, in a program that has handlers of its own. No push
+    /// begins after that.
+    static void interrupt(int signal);
+
     /// Adds or removes a socket. There is room for eight; what does not fit ends with its time-out.
     static void watch(int socket);
     static void forget(int socket);

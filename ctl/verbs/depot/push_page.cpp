@@ -23,21 +23,6 @@ std::uintmax_t sum(const std::vector<PushedFile>& files, std::uintmax_t PushedFi
         [bytes](std::uintmax_t total, const PushedFile& file) { return total + file.*bytes; });
 }
 
-/// Whether the file is in the depot, as far as is known.
-bool hasArrived(const PushedFile& file) {
-    return file.wasTaken() && file.problem.empty();
-}
-
-std::string meaningOf(const PushedFile& file, bool refused) {
-    if (!file.problem.empty()) return file.problem;
-    if (refused) return "not sent";
-    // The host has one status for all that is wrong with a name.
-    if (file.worst.status == 6 && leadsOutOfDepot(file.name)) {
-        return "the name leads out of the depot";
-    }
-    return statusText(file.worst);
-}
-
 json fileDocument(const PushedFile& file, const PushReport& report) {
     json document = {{"name", file.name},
                      {"bytes", file.sent},
@@ -154,6 +139,20 @@ std::string reportText(const PushReport& report) {
 }
 
 }  // namespace
+
+bool hasArrived(const PushedFile& file) {
+    return file.wasTaken() && file.problem.empty();
+}
+
+std::string meaningOf(const PushedFile& file, bool refused) {
+    if (!file.problem.empty()) return file.problem;
+    if (refused) return "not sent";
+    // The host has one status for all that is wrong with a name.
+    if (file.worst.status == 6 && leadsOutOfDepot(file.name)) {
+        return "the name leads out of the depot";
+    }
+    return statusText(file.worst);
+}
 
 Page showPush(const PushReport& report, Format format) {
     const ExitStatus status = statusOf(report);

@@ -50,6 +50,15 @@ TEST(AnInterruption, EndsTheSendingOnASocketThatComesLater) {
     Interruption::forget(sockets.own());
 }
 
+TEST(AnInterruption, MayBeAProgramsOwn) {
+    const Sockets sockets;
+    Interruption::watch(sockets.own());
+    Interruption::interrupt(SIGTERM);
+    EXPECT_EQ(Interruption::signal(), SIGTERM);
+    EXPECT_TRUE(sockets.ended());
+    Interruption::forget(sockets.own());
+}
+
 TEST(AnInterruption, LeavesSocketsAloneThatItWasToldToForget) {
     const Interruption interruption;
     const Sockets sockets;

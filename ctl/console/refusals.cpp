@@ -1,0 +1,34 @@
+#include "ctl/console/refusals.h"
+
+#include <string>
+
+namespace console {
+namespace {
+
+bool isBelow(std::string_view path, std::string_view folder) {
+    return path.substr(0, folder.size()) == folder &&
+           (path.size() == folder.size() || path[folder.size()] == '/');
+}
+
+}  // namespace
+
+bool isForPrograms(std::string_view path) {
+    return isBelow(path, "/v1") || isBelow(path, "/console");
+}
+
+http::Reply refusalAt(std::string_view path, unsigned status, std::string_view text) {
+    if (isForPrograms(path)) return http::errorReply(status, text);
+    return {status,
+            "<!doctype html>\n<html lang=\"en\">\n<meta charset=\"utf-8\">\n<title>zavctl "
+            "console</title>\n<p>" +
+                std::string(text) + ".</p>\n</html>\n",
+            "text/html; charset=utf-8"};
+}
+
+http::Reply wrongMethodAt(std::string_view path, std::string_view allowed) {
+    http::Reply reply = refusalAt(path, 405, "this path knows other methods only");
+    reply.fields.emplace_back("Allow", std::string(allowed));
+    return reply;
+}
+
+}  // namespace console

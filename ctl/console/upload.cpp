@@ -1,0 +1,194 @@
+#include "ctl/console/upload.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+#include <nlohmann/json.hpp>
+#include <optional>
+#include <string_view>
+#include <system_error>
+#include <utility>
+
+#include "ctl/client/transfer/push.h"
+#include "ctl/console/host_request.h"
+#include "ctl/verbs/depot/push_page.h"
+#include "http/url.h"
+#include "system/file_descriptor.h"
+
+namespace console {
+
+/// Held while a file is on its way. The uploads outlive it.
+class UploadPlace {
+public:
+    UploadPlace(Uploads& uploads, std::string name) : uploads_(uploads), name_(std::move(name)) {}
+    ~UploadPlace() { uploads_.leave(name_); }
+    UploadPlace(const UploadPlace&) = delete;
+    UploadPlace& operator=(const UploadPlace&) = delete;
+    const std::string& name() const { return name_; }
+
+private:
+    Uploads& uploads_;
+    const std::string name_;
+};
+
+namespace {
+
+using nlohmann::json;
+
+/// Each may fill as much of the disk as the largest file does.
+constexpr std::size_t kMostUploads = 4;
+
+http::Reply noRoom(const std::string& directory, int error) {
+    return http::errorReply(507, "the file does not fit into " + directory +
+                                     " here: " + std::generic_category().message(error));
+}
+
+/// A file without a name, which is gone with its descriptor; none, with errno, if there is no way.
+sys::FileDescriptor unnamedFile(const std::string& directory) {
+    std::string path = directory + "/zavctl-console-XXXXXX";
+    sys::FileDescriptor file(::mkostemp(path.data(), O_CLOEXEC));
+    if (file) ::unlink(path.c_str());
+    return file;
+}
+
+http::Reply refusalOf(const ctl::PushedFile& file, bool isRefused) {
+    const std::string text = ctl::meaningOf(file, isRefused);
+    if (file.guard.empty() && file.hint.empty()) return http::errorReply(409, text);
+    json document = {{"error", text}};
+    if (!file.guard.empty()) document["guard"] = file.guard;
+    if (!file.hint.empty()) document["hint"] = file.hint;
+    return http::jsonReply(409, document.dump(-1, ' ', false, json::error_handler_t::replace));
+}
+
+/// Why a push that went well is not verified; empty if it is.
+std::string whyNotVerified(const ctl::PushReport& report) {
+    switch (report.verification) {
+        case ctl::Verification::NotOffered:
+            return "not verified: the host cannot compute checksums";
+        case ctl::Verification::None:
+            return "not verified: the host's guards are off";
+        default:
+            return "";
+    }
+}
+
+http::Reply replyTo(const ctl::PushReport& report) {
+    const ctl::PushedFile& file = report.files.front();
+    if (report.refused || !ctl::hasArrived(file)) return refusalOf(file, report.refused);
+    if (report.verification == ctl::Verification::Unknown) {
+        return http::errorReply(502, "not verified: " + report.whyUnknown);
+    }
+    json notes = report.notes;
+    const std::string reason = whyNotVerified(report);
+    if (!reason.empty()) notes.push_back(reason);
+    const json document = {{"path", file.name},
+                           {"bytes", file.sent},
+                           {"sha256", file.sha256},
+                           {"verified", reason.empty()},
+                           {"notes", notes}};
+    return http::jsonReply(200, document.dump(-1, ' ', false, json::error_handler_t::replace));
+}
+
+/// One file: first into a file here, then to the host.
+class Upload final : public http::BodyTaker {
+public:
+    Upload(std::unique_ptr<UploadPlace> place, std::string directory, ctl::HostAddress host)
+        : place_(std::move(place)), directory_(std::move(directory)), host_(std::move(host)) {}
+
+    std::uint64_t mostBytes() const override { return kLargestUpload; }
+
+    std::optional<http::Reply> take(std::string_view piece) override {
+        if (!file_) file_ = unnamedFile(directory_);
+        if (!file_) return giveUp(errno);
+        while (!piece.empty()) {
+            const ssize_t written = ::write(file_.get(), piece.data(), piece.size());
+            if (written < 0 && errno == EINTR) continue;
+            if (written < 0) return giveUp(errno);
+            piece.remove_prefix(static_cast<std::size_t>(written));
+            size_ += static_cast<std::uintmax_t>(written);
+        }
+        return std::nullopt;
+    }
+
+    http::Answer answer() override {
+        if (auto refusal = take({})) return std::move(*refusal);  // an empty file has no piece
+        http::Answer answer = push();
+        place_.reset();  // whoever has the answer may send the next file of this name
+        return answer;
+    }
+
+private:
+    http::Reply push() const {
+        ctl::PushedFile file;
+        file.source = "/proc/self/fd/" + std::to_string(file_.get());
+        file.name = place_->name();
+        file.size = size_;
+        ctl::PushPlan plan;
+        plan.files.push_back(std::move(file));
+        ctl::PushOptions options;
+        options.wantsSums = true;
+        try {
+            return replyTo(ctl::pushToDepot(host_, std::move(plan), options));
+        } catch (const ctl::Failure& failure) {
+            return console::replyTo(failure);
+        }
+    }
+
+    std::optional<http::Reply> giveUp(int error) {
+        place_.reset();
+        return noRoom(directory_, error);
+    }
+
+    std::unique_ptr<UploadPlace> place_;
+    const std::string directory_;
+    const ctl::HostAddress host_;
+    sys::FileDescriptor file_;
+    std::uintmax_t size_ = 0;
+};
+
+/// The place in the depot that the request names; nothing if it is none.
+std::optional<std::string> nameIn(const http::Request& head) {
+    const auto target = http::parseTarget(head.target);
+    if (!target || target->parameters.size() != 1 || target->parameters.front().first != "path") {
+        return std::nullopt;
+    }
+    std::string name = target->parameters.front().second;
+    if (name.empty() || name.back() == '/') return std::nullopt;
+    return name;
+}
+
+}  // namespace
+
+http::BodyPlan Uploads::begin(const http::Request& head, const ctl::HostAddress& host) {
+    const auto name = nameIn(head);
+    if (!name) return http::errorReply(400, "path names the file in the depot");
+    // It separates components on the wire, so that the name would arrive as another.
+    if (name->find('\\') != std::string::npos) {
+        return http::errorReply(400, "a name with a backslash cannot be pushed: " + *name);
+    }
+    const std::string reason = enter(*name);
+    if (!reason.empty()) return http::errorReply(429, reason);
+    return std::make_unique<Upload>(std::make_unique<UploadPlace>(*this, *name), directory_, host);
+}
+
+bool Uploads::empty() const {
+    const embedded::MutexLock lock(lock_);
+    return names_.empty();
+}
+
+std::string Uploads::enter(const std::string& name) {
+    const embedded::MutexLock lock(lock_);
+    if (names_.count(name) > 0) return "a file of this name is on its way already";
+    if (names_.size() >= kMostUploads) return "as many files as can be are on their way already";
+    names_.insert(name);
+    return "";
+}
+
+void Uploads::leave(const std::string& name) {
+    const embedded::MutexLock lock(lock_);
+    names_.erase(name);
+}
+
+}  // namespace console
