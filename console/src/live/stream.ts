@@ -27,6 +27,7 @@ const isFinal = (problem: Problem): boolean => problem.status >= 400 && problem.
 /// Runs until `close()`, or until the watcher has closed it from within an event.
 export class EventStream {
     private stopped = false;
+    private isResting = false;
     private failures = 0;
     private connection = new AbortController();
     private wake: () => void = () => undefined;
@@ -36,14 +37,30 @@ export class EventStream {
         private readonly watch: StreamWatch,
         private position = '',
     ) {
+        addEventListener('pagehide', this.rest);
+        addEventListener('pageshow', this.resume);
         void this.run();
     }
 
     close(): void {
         this.stopped = true;
+        removeEventListener('pagehide', this.rest);
+        removeEventListener('pageshow', this.resume);
         this.connection.abort();
         this.wake();
     }
+
+    /// A browser may keep a page that has been left, and its connections with it, of which there are
+    /// few: the page that is looked at now would have none.
+    private readonly rest = (): void => {
+        this.isResting = true;
+        this.connection.abort();
+    };
+
+    private readonly resume = (): void => {
+        this.isResting = false;
+        this.wake();
+    };
 
     /// Tries again now instead of after the pause.
     retry(): void {
@@ -64,7 +81,7 @@ export class EventStream {
             this.watch.onBreak?.(problem, pause);
             await new Promise<void>((done) => {
                 this.wake = done;
-                setTimeout(done, pause);
+                if (!this.isResting) setTimeout(done, pause);
             });
         }
     }

@@ -3,6 +3,8 @@ import uPlot from 'uplot';
 import type { Buckets } from '../words/buckets';
 import { counted } from '../words/size';
 
+const chartHeight = 132;
+
 const sum = (values: readonly number[]): number => values.reduce((total, value) => total + value, 0);
 
 const added = (a: readonly number[], b: readonly number[]): number[] => a.map((value, i) => value + (b[i] ?? 0));
@@ -19,10 +21,10 @@ function optionsFor(width: number): uPlot.Options {
     });
     const axis = { stroke: color('--faint'), grid: { stroke: color('--line'), width: 1 }, ticks: { show: false }, font: '12px system-ui, sans-serif' };
     return {
-        width, height: 132, legend: { show: false }, cursor: { show: false }, padding: [8, 4, 0, 0],
+        width, height: chartHeight, legend: { show: false }, cursor: { show: false }, padding: [8, 16, 0, 0],
         scales: { y: { range: (_plot, _low, high) => [0, Math.max(Math.ceil(high * 1.1), 4)] } },
         axes: [
-            { ...axis, grid: { show: false }, space: 70, values: [[60, '{HH}:{mm}', null, null, null, null, null, null, 0]] },
+            { ...axis, grid: { show: false }, space: 70, size: 26, values: [[60, '{HH}:{mm}', null, null, null, null, null, null, 0]] },
             { ...axis, size: 34, incrs: [1, 2, 5, 10, 20, 50, 100, 200, 500, 1000, 2000, 5000] },
         ],
         series: [{}, series('--quiet', 'other'), series('--good-mark', 'done'), series('--bad-mark', 'failed')],
@@ -50,7 +52,7 @@ export function TasksChart({ buckets }: { buckets: Buckets }) {
         draw();
         const theme = matchMedia('(prefers-color-scheme: dark)');
         theme.addEventListener('change', draw);
-        const size = new ResizeObserver(() => plot.current?.setSize({ width: element.clientWidth, height: 132 }));
+        const size = new ResizeObserver(() => plot.current?.setSize({ width: element.clientWidth, height: chartHeight }));
         size.observe(element);
         return () => {
             theme.removeEventListener('change', draw);

@@ -34,6 +34,7 @@ export function socketHost(socketPath) {
         const { host, cookie, origin, ...passed } = request.headers;
         const inner = http.request({ socketPath, path: request.url, method: request.method, headers: { ...passed, Host: 'localhost' } }, (answer) => {
             response.writeHead(answer.statusCode, answer.headers);
+            response.flushHeaders();
             answer.pipe(response);
         });
         inner.on('error', () => (response.headersSent ? response.destroy() : sendJson(response, 502, { error: 'the host is away' })));
