@@ -76,7 +76,10 @@ export class EventStream {
         while (!this.stopped) {
             const problem = await this.once();
             if (this.stopped) return;
-            if (isFinal(problem)) return this.watch.onRefusal?.(problem);
+            if (isFinal(problem)) {
+                this.close();
+                return this.watch.onRefusal?.(problem);
+            }
             const pause = pauseAfter(this.failures++);
             this.watch.onBreak?.(problem, pause);
             await new Promise<void>((done) => {

@@ -22,7 +22,7 @@ export function Time({ value, brief = false }: { value: string | Date | null | u
     const latest = current < time ? time : current;
     return (
         <time dateTime={time.toISOString()} title={exactText(time)}>
-            {!brief && <>{localText(time, current)}<span class="faint">, </span></>}
+            {!brief && <span class="clock">{localText(time, current)}<span class="faint">, </span></span>}
             <span class={brief ? '' : 'faint'}>{relativeText(time, time.getTime() - current.getTime() > 60_000 ? current : latest)}</span>
         </time>
     );

@@ -10,7 +10,7 @@ export interface DiffLine {
 
 /// More changed lines than this are shown as one block that goes and one that comes: the exact way
 /// would keep the browser busy, and nobody reads it.
-const mostChanges = 2000;
+const mostChanges = 600;
 
 /// The lines of a text. A last line feed ends its line and begins no further one.
 export function linesOf(text: string): string[] {
