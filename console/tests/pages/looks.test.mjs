@@ -57,8 +57,7 @@ for (const scheme of ['light', 'dark']) {
             view.fake.accept({ command: 'START', product: 'um', transid: 'patch-8' });
             for (const [name, address, text] of pages) {
                 await view.go(address);
-                if (name === 'task-running') await new Promise((done) => setTimeout(done, 1));
-                await untilText(view.tab, text, name === 'task-running' ? 'main' : 'body').catch((error) => {
+                await untilText(view.tab, text).catch((error) => {
                     throw new Error(`${name}: "${text}" does not come (${error.message})`);
                 });
                 await untilText(view.tab, 'live', '.top');

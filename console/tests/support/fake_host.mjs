@@ -119,7 +119,7 @@ export function makeFakeHost({ tasks: count = 40, isHostile = false, access = 'a
         Object.assign(task, { state: 'running', started: at(Date.now()), run: 3, reply: { ...rowOf({ ...task, state: 'done' }) } });
         outputs.set(task.id, { pieces: [], readers: new Set() });
         task.details.commands = [{ ...commandOf(task, undefined), ended: null, stdout: '', stderr: '' }];
-        const lines = setInterval(() => say(task, 'stdout', evil(`line ${outputs.get(task.id).pieces.length + 1}\n`)), pace / 4);
+        const lines = setInterval(() => say(task, 'stdout', evil(`line ${outputs.get(task.id).pieces.length + 1}\n`)), Math.min(pace / 4, 400));
         task.finish = (state) => {
             clearInterval(lines);
             clearTimeout(timer);
@@ -178,7 +178,7 @@ export function makeFakeHost({ tasks: count = 40, isHostile = false, access = 'a
         const { context, ...kept } = members;
         const task = create(given.command === 'SETCONFIG' && !given.uaconfig ? kept : members);
         Object.defineProperty(task, 'text', { value: context, enumerable: false });
-        setTimeout(work, pace / 4);
+        setTimeout(work, 60);
         return [202, task];
     };
 
