@@ -17,7 +17,8 @@ function Console() {
     const first = useRef(true);
     useEffect(() => {
         // Whoever cannot see the page change is told by where the focus is.
-        if (!first.current) document.querySelector<HTMLElement>('h1')?.focus({ preventScroll: true });
+        const isPlaced = document.activeElement?.matches('[data-search]') ?? false;
+        if (!first.current && !isPlaced) document.querySelector<HTMLElement>('h1')?.focus({ preventScroll: true });
         first.current = false;
     }, [path]);
     return <Frame>{problem ? <><PageHead title="Console" /><ProblemBox problem={problem} /></> : <View path={path} />}</Frame>;

@@ -18,6 +18,7 @@ const isTyping = (target: EventTarget | null): boolean =>
 function search(): void {
     const field = (): HTMLInputElement | null => document.querySelector<HTMLInputElement>('[data-search]');
     if (!field()) go('/tasks');
+    // The page that has it is there with the next frame.
     requestAnimationFrame(() => setTimeout(() => field()?.focus()));
 }
 
