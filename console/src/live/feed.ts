@@ -1,0 +1,154 @@
+/// The one stream of outcomes that all pages listen to. It is open as long as somebody can see the
+/// page: browsers allow few connections to one server, and a hidden page catches up when it is
+/// looked at again.
+import { askHealth } from '../api/host';
+import { type Problem, asProblem } from '../api/problem';
+import type { Row, Task } from '../api/types';
+import { Store } from '../state/store';
+import type { ServerEvent } from './parser';
+import { EventStream } from './stream';
+
+export interface FeedItem {
+    /// No two items of this page have the same.
+    key: number;
+    /// The host's identifier of the event.
+    id: string;
+    heard: Date;
+    content:
+        | { kind: 'row'; row: Row }
+        | { kind: 'task'; task: Task }
+        /// Events that the host does not keep any more; null: nobody knows how many.
+        | { kind: 'gap'; missing: number | null };
+}
+
+export type FeedStatus =
+    | { kind: 'connecting' }
+    | { kind: 'live' }
+    | { kind: 'paused' }
+    | { kind: 'broken'; problem: Problem; since: Date };
+
+export const mostItems = 10_000;
+/// So many events from before the page was opened are shown.
+const eventsBefore = 500;
+/// Events that come faster are shown together.
+const flushEvery = 100;
+/// A page that is hidden for so long gives its connection up.
+const hiddenFor = 60_000;
+
+const path = '/v1/events?table=KAGDYST&tasks=1';
+
+export const feedStatus = new Store<FeedStatus>({ kind: 'connecting' });
+/// The newest first.
+export const feedItems = new Store<readonly FeedItem[]>([]);
+/// Counts what forces everybody to look anew: events that were lost, another journal.
+export const feedEpoch = new Store(0);
+
+type BatchListener = (items: readonly FeedItem[]) => void;
+const listeners = new Set<BatchListener>();
+
+/// Calls the listener with what has come, the oldest first. Returns how to stop that.
+export function onFeed(listener: BatchListener): () => void {
+    listeners.add(listener);
+    return () => listeners.delete(listener);
+}
+
+let stream: EventStream | undefined;
+let position = '';
+let keys = 0;
+let pending: FeedItem[] = [];
+let flushing: ReturnType<typeof setTimeout> | undefined;
+
+function flush(): void {
+    flushing = undefined;
+    const batch = pending;
+    pending = [];
+    feedItems.update((items) => [...batch.slice(-mostItems).reverse(), ...items].slice(0, mostItems));
+    if (batch.some((item) => item.content.kind === 'gap')) feedEpoch.update((count) => count + 1);
+    for (const listener of [...listeners]) listener(batch);
+}
+
+function contentOf(event: ServerEvent): FeedItem['content'] | undefined {
+    try {
+        const data = JSON.parse(event.data) as never;
+        if (event.type === 'message') return { kind: 'row', row: data };
+        if (event.type === 'task') return { kind: 'task', task: data };
+        if (event.type === 'gap') return { kind: 'gap', missing: (data as { missing: number | null }).missing };
+    } catch {
+        // What is no JSON is no event of this interface.
+    }
+    return undefined;
+}
+
+function take(event: ServerEvent): void {
+    position = event.id;
+    const content = contentOf(event);
+    if (!content) return;
+    pending.push({ key: ++keys, id: event.id, heard: new Date(), content });
+    flushing ??= setTimeout(flush, flushEvery);
+}
+
+function broken(problem: Problem): void {
+    const old = feedStatus.get();
+    feedStatus.set({ kind: 'broken', problem, since: old.kind === 'broken' ? old.since : new Date() });
+}
+
+function open(): void {
+    stream?.close();
+    stream = new EventStream(
+        path,
+        {
+            onEvent: take,
+            onOpen: (where) => {
+                position = where;
+                feedStatus.set({ kind: 'live' });
+            },
+            onBreak: broken,
+            onRefusal: broken,
+        },
+        position,
+    );
+}
+
+/// Where a page begins that has seen nothing yet: some events before the last one.
+async function startPosition(): Promise<string> {
+    const journal = (await askHealth()).journal;
+    const probe = new AbortController();
+    const answer = await fetch(path, { signal: probe.signal });
+    const now = answer.headers.get('Last-Event-ID') ?? '';
+    probe.abort();
+    const number = Number(now.slice(now.lastIndexOf('-') + 1));
+    if (!answer.ok || now === '' || !Number.isSafeInteger(number)) return '';
+    return `${journal}-${Math.max(number - eventsBefore, 0)}`;
+}
+
+async function begin(): Promise<void> {
+    try {
+        position = await startPosition();
+    } catch (error) {
+        broken(asProblem(error));
+    }
+    open();
+}
+
+/// Opens the connection again at once, when it is broken.
+export function retryFeed(): void {
+    if (feedStatus.get().kind === 'broken') open();
+}
+
+export function startFeed(): void {
+    let hiding: ReturnType<typeof setTimeout> | undefined;
+    document.addEventListener('visibilitychange', () => {
+        clearTimeout(hiding);
+        if (document.visibilityState === 'hidden') {
+            hiding = setTimeout(() => {
+                stream?.close();
+                feedStatus.set({ kind: 'paused' });
+            }, hiddenFor);
+        } else if (feedStatus.get().kind === 'paused') {
+            feedStatus.set({ kind: 'connecting' });
+            open();
+        }
+    });
+    addEventListener('online', retryFeed);
+    void begin();
+}

@@ -1,0 +1,90 @@
+/// What surrounds every page: the name of the host, the way to the pages, whether the connection
+/// holds, notices, and the keyboard.
+import type { ComponentChildren } from 'preact';
+import { useEffect, useState } from 'preact/hooks';
+import { feedStatus, retryFeed } from '../live/feed';
+import { work } from '../live/work';
+import { pages } from '../pages/table';
+import { Link } from '../route/link';
+import { usePlace } from '../route/route';
+import { health, session, whoami } from '../state/host';
+import { useStore } from '../state/store';
+import { printable } from '../words/printable';
+import { Time } from './basics';
+import { HelpDialog } from './help_dialog';
+import { listenToKeys } from './keyboard';
+import { Notices } from './notices';
+
+function Connection() {
+    const status = useStore(feedStatus);
+    const words = { connecting: 'connecting', live: 'live', paused: 'paused', broken: 'no connection' };
+    const tone = status.kind === 'live' ? 'good' : status.kind === 'broken' ? 'bad' : 'quiet';
+    return <span class={`state ${tone}`} role="status">{words[status.kind]}</span>;
+}
+
+function BrokenBanner() {
+    const status = useStore(feedStatus);
+    if (status.kind !== 'broken') return null;
+    return (
+        <div class="banner" role="alert">
+            <p>
+                The connection is broken since <Time value={status.since} />: {printable(status.problem.message)}. What you see may be old.
+                {status.problem.hint !== '' ? ` ${printable(status.problem.hint)}` : ' It is tried again, and what was missed is caught up with.'}
+            </p>
+            <button type="button" onClick={retryFeed}>Try now</button>
+        </div>
+    );
+}
+
+function Navigation() {
+    const { path } = usePlace();
+    const inHand = useStore(work)?.length ?? 0;
+    return (
+        <nav aria-label="Pages">
+            <ul>
+                {pages.map((page) => {
+                    const isHere = page.path === '/' ? path === '/' : path === page.path || path.startsWith(`${page.path}/`);
+                    return (
+                        <li key={page.path}>
+                            <Link to={page.path} aria-current={isHere ? 'page' : undefined}>
+                                {page.name}
+                                {page.path === '/tasks' && inHand > 0 && <span class="count" aria-label={`${inHand} in hand`}>{inHand}</span>}
+                            </Link>
+                        </li>
+                    );
+                })}
+            </ul>
+        </nav>
+    );
+}
+
+export function Frame({ children }: { children: ComponentChildren }) {
+    const [isHelpOpen, setHelpOpen] = useState(false);
+    const how = useStore(health);
+    const who = useStore(whoami);
+    const here = useStore(session);
+    useEffect(() => listenToKeys(() => setHelpOpen(true)), []);
+    return (
+        <>
+            <a class="skip" href="#main">Skip to the page</a>
+            <header class="top">
+                <Link to="/" class="brand"><img src="/icon.svg" alt="" width={22} height={22} /><span>{how ? printable(how.origin_node) : 'Console'}</span></Link>
+                <Connection />
+                <span class="who faint">
+                    {who && <>{printable(who.user)}{who.access === 'read' && ', may only look'}</>}
+                </span>
+                <button type="button" class="plain" aria-label="Keyboard and help" onClick={() => setHelpOpen(true)}>?</button>
+            </header>
+            <div class="frame">
+                <Navigation />
+                <main id="main" tabIndex={-1}>
+                    <BrokenBanner />
+                    {children}
+                    <footer class="foot faint">{here && `${here.program} ${here.version}`}</footer>
+                </main>
+            </div>
+            <Notices />
+            {isHelpOpen && <HelpDialog onClose={() => setHelpOpen(false)} />}
+        </>
+    );
+}

@@ -1,0 +1,65 @@
+import { useEffect, useRef, useState } from 'preact/hooks';
+import type { Problem } from '../api/problem';
+import { followOutput } from '../live/output';
+import { printableLines } from '../words/printable';
+import { counted } from '../words/size';
+import { ProblemBox } from './basics';
+
+interface Piece {
+    stream: string;
+    text: string;
+}
+
+/// More than this is not kept in the page; its beginning goes first.
+const mostCharacters = 256 * 1024;
+
+function appended(pieces: readonly Piece[], piece: Piece): Piece[] {
+    const last = pieces.at(-1);
+    const all = last?.stream === piece.stream
+        ? [...pieces.slice(0, -1), { ...last, text: last.text + piece.text }]
+        : [...pieces, piece];
+    let extra = all.reduce((total, one) => total + one.text.length, 0) - mostCharacters;
+    while (extra > 0 && all[0]) {
+        const gone = Math.min(extra, all[0].text.length);
+        extra -= gone;
+        if (gone === all[0].text.length) all.shift();
+        else all[0] = { ...all[0], text: all[0].text.slice(gone) };
+    }
+    return all;
+}
+
+/// What a running task's commands write, as they write it.
+export function OutputView({ task }: { task: string }) {
+    const [pieces, setPieces] = useState<readonly Piece[]>([]);
+    const [lost, setLost] = useState(0);
+    const [problem, setProblem] = useState<Problem>();
+    const view = useRef<HTMLPreElement>(null);
+    const isAtEnd = useRef(true);
+    useEffect(() => {
+        setPieces([]);
+        setLost(0);
+        return followOutput(task, {
+            onPiece: (piece) => setPieces((old) => appended(old, piece)),
+            onLost: (bytes) => setLost((old) => old + bytes),
+            onEnd: () => undefined,
+            onRefusal: setProblem,
+        });
+    }, [task]);
+    useEffect(() => {
+        const element = view.current;
+        if (element && isAtEnd.current) element.scrollTop = element.scrollHeight;
+    }, [pieces]);
+    const note = (element: HTMLElement) => {
+        isAtEnd.current = element.scrollTop + element.clientHeight >= element.scrollHeight - 8;
+    };
+    if (problem) return <ProblemBox problem={problem} />;
+    return (
+        <>
+            {lost > 0 && <p class="box attention">{counted(lost, 'byte')} of the output were lost: they came too fast.</p>}
+            <pre class="output" ref={view} tabIndex={0} role="region" aria-label="Output" onScroll={(event) => note(event.currentTarget)}>
+                {pieces.length === 0 ? <span class="faint">Nothing has been written yet.</span>
+                    : pieces.map((piece, i) => <span key={i} class={piece.stream}>{printableLines(piece.text)}</span>)}
+            </pre>
+        </>
+    );
+}

@@ -1,0 +1,224 @@
+// Everything that can be done, from the click to what the host shows afterwards.
+import assert from 'node:assert/strict';
+import { createHash } from 'node:crypto';
+import { mkdtemp, rm, writeFile } from 'node:fs/promises';
+import os from 'node:os';
+import path from 'node:path';
+import { after, before, test } from 'node:test';
+import { press, untilText } from '../support/browser.mjs';
+import { raise } from '../support/stage.mjs';
+
+let stage;
+before(async () => (stage = await raise()));
+after(() => stage.strike());
+
+/// Opens a console, does something with it, and sees that nothing went wrong meanwhile.
+async function on(address, options, act) {
+    const view = await stage.open(options);
+    await view.go(address);
+    await untilText(view.tab, 'live', '.top');
+    await act(view);
+    assert.deepEqual(view.faults, []);
+    await view.end();
+}
+
+const fill = async (tab, selector, text) => {
+    const field = await tab.waitForSelector(selector);
+    await field.click({ count: 3 });
+    await field.type(text);
+};
+const notice = (tab, text) => untilText(tab, text, '.notices');
+const last = (fake) => fake.tasks.at(-1);
+
+test('an agent is stopped, started and restarted, and the page follows', async () => {
+    await on('/agents', { command: ['zavctl', '--socket', '/tmp/a b'] }, async ({ tab, fake }) => {
+        await press(tab, 'Stop db7:UX');
+        await untilText(tab, "zavctl --socket '/tmp/a b' stop ux", 'dialog');
+        await press(tab, 'Copy the command line');
+        await untilText(tab, 'Copied', 'dialog');
+        assert.equal(await tab.evaluate(() => navigator.clipboard.readText()), "zavctl --socket '/tmp/a b' stop ux");
+        await press(tab, 'Send stop ux');
+        await notice(tab, 'stop ux: done');
+        await press(tab, 'Start db7:UX');
+        await press(tab, 'Send start ux');
+        await notice(tab, 'start ux: done');
+        await press(tab, 'Restart db7:UX');
+        await press(tab, 'Send restart ux');
+        await notice(tab, 'restart ux: done');
+        assert.deepEqual(fake.tasks.slice(-3).map((task) => task.command), ['STOP', 'START', 'RESTART']);
+    });
+});
+
+test('a named instance is started by its target, and removed', async () => {
+    await on('/agents', {}, async ({ tab, fake }) => {
+        await press(tab, 'Start db1:db7:UX');
+        await untilText(tab, 'zavctl start --target db1:db7:UX ux', 'dialog');
+        await press(tab, 'Send start ux db1:db7:UX');
+        await notice(tab, 'start ux db1:db7:UX: done');
+        await press(tab, 'Remove… db1:db7:UX');
+        await press(tab, 'Send remove-instance ux db1:db7:UX');
+        await notice(tab, 'remove-instance ux db1:db7:UX: done');
+        await tab.waitForFunction(() => !document.querySelector('main').innerText.includes('db1:db7:UX'));
+        assert.equal(last(fake).command, 'REMOVEINSTANCE');
+    });
+});
+
+test('a success that the host does not show is no success', async () => {
+    await on('/agents', {}, async ({ tab, fake }) => {
+        Object.defineProperty(fake.instances[0], 'state', { get: () => 'running', set: () => undefined, enumerable: true });
+        await press(tab, 'Stop db7:UX');
+        await press(tab, 'Send stop ux');
+        await notice(tab, 'the host reported success, but db7:UX still runs');
+    });
+});
+
+test('a product is installed from the depot, and uninstalled', async () => {
+    await on('/agents', {}, async ({ tab, fake }) => {
+        await press(tab, 'Install…');
+        await fill(tab, 'input[list="depot-products"]', 'ny');
+        await fill(tab, 'input[list="depot-versions"]', '7.1');
+        await untilText(tab, "zavctl install ny 7.1 -- '/bin/sh |DEPLOYDIR|/install.sh -h |TOVRINHOME|'", 'dialog');
+        await press(tab, 'Send install ny');
+        await notice(tab, 'install ny: done');
+        await press(tab, 'Uninstall… ny');
+        await press(tab, 'Send uninstall ny');
+        await notice(tab, 'uninstall ny: done');
+        assert.equal(last(fake).command, 'UNINSTALL');
+    });
+});
+
+test('a refusal has the words, the guard and the way out', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab } = view;
+        view.own.isDisturbed = true;
+        await press(tab, 'Install…');
+        await fill(tab, 'input[list="depot-products"]', 'zz');
+        await fill(tab, 'input[list="depot-versions"]', '1');
+        await press(tab, 'Send install zz');
+        for (const text of ['zz is not installed here', 'product', 'installed: ax, um, ux']) await untilText(tab, text, 'dialog [role=alert]');
+    });
+});
+
+test('a running task is watched and cancelled, and done again', async () => {
+    await on('/tasks', {}, async ({ tab, fake, go }) => {
+        fake.slow(20_000);
+        const task = fake.accept({ command: 'START', product: 'um' });
+        await untilText(tab, 'running', '.list');
+        await go(`/tasks/${task.id}`);
+        await untilText(tab, 'line 2', '.output');
+        await press(tab, 'Cancel…');
+        await untilText(tab, `zavctl task cancel ${task.id}`, 'dialog');
+        await press(tab, 'Cancel the task');
+        await untilText(tab, 'cancelled', '.page-head');
+        fake.slow(200);
+        await press(tab, 'Do again…');
+        await press(tab, 'Send start um');
+        await notice(tab, 'start um: done');
+        await untilText(tab, last(fake).id, '.page-head');
+        await untilText(tab, 'done', '.page-head');
+    });
+});
+
+test('doing a change of a configuration again asks for the text', async () => {
+    await on('/tasks/a0a99408e7707b3d-5', {}, async ({ tab, fake }) => {
+        await press(tab, 'Do again…');
+        await untilText(tab, 'Give the text of the configuration.', 'dialog');
+        assert.equal(await tab.$eval('dialog [type=submit]', (button) => button.disabled), true);
+        await fill(tab, 'dialog textarea', 'INTERVAL=7');
+        await tab.click('dialog [type=submit]');
+        await notice(tab, 'config set ux');
+        await notice(tab, 'done');
+        assert.equal(fake.configurations.get('ux'), 'INTERVAL=7');
+    });
+});
+
+test('a configuration is changed after its difference has been shown', async () => {
+    await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
+        await tab.waitForSelector('.editor');
+        await tab.$eval('.editor', (editor) => {
+            editor.value = editor.value.replace('INTERVAL=5', 'INTERVAL=30');
+            editor.dispatchEvent(new Event('input', { bubbles: true }));
+        });
+        await untilText(tab, '1 line removed, 1 line added');
+        const before = fake.tasks.filter((task) => task.command === 'SETCONFIG').length;
+        await press(tab, 'Send…');
+        await untilText(tab, "zavctl config set ux - <<'END'", 'dialog');
+        assert.equal(fake.tasks.filter((task) => task.command === 'SETCONFIG').length, before);
+        await press(tab, 'Send config set ux');
+        await notice(tab, 'config set ux: done');
+        assert.match(fake.configurations.get('ux'), /INTERVAL=30\n/);
+        await untilText(tab, 'No difference to what is there.');
+    });
+});
+
+test('what somebody else has set meanwhile is not overwritten', async () => {
+    await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
+        await fill(tab, '.editor', 'INTERVAL=1\n');
+        fake.configurations.set('ux', 'INTERVAL=99\n');
+        await press(tab, 'Send…');
+        await press(tab, 'Send config set ux');
+        await untilText(tab, 'the configuration has changed on the host while it was edited', 'dialog');
+        assert.equal(fake.configurations.get('ux'), 'INTERVAL=99\n');
+    });
+});
+
+test('files are pushed, summed and removed', async () => {
+    const scratch = await mkdtemp(path.join(os.tmpdir(), 'console-'));
+    const content = Buffer.alloc(300_000, 'push');
+    await writeFile(path.join(scratch, 'new agent.tar'), content);
+    await writeFile(path.join(scratch, 'install.sh.tar'), 'archive');
+    try {
+        await on('/depot?path=ux/7.2', {}, async ({ tab, fake }) => {
+            const chooser = await tab.waitForSelector('input[type=file]');
+            await chooser.uploadFile(path.join(scratch, 'new agent.tar'), path.join(scratch, 'install.sh.tar'));
+            await untilText(tab, 'call it package.tar');
+            await untilText(tab, "zavctl push 'new agent.tar' 'ux/7.2/new agent.tar'");
+            await press(tab, 'Push 1 file');
+            const sum = createHash('sha256').update(content).digest('hex');
+            await untilText(tab, `verified: ${sum}`);
+            assert.deepEqual(fake.depot.get('ux/7.2/new agent.tar').content, content);
+            await press(tab, 'Sum of new agent.tar');
+            await untilText(tab, sum, 'dialog');
+            await tab.keyboard.press('Escape');
+            await press(tab, 'Remove new agent.tar');
+            await untilText(tab, "zavctl depot rm 'ux/7.2/new agent.tar'", 'dialog');
+            await press(tab, 'Remove');
+            await notice(tab, 'depot rm ux/7.2/new agent.tar: done');
+            assert.equal(fake.depot.has('ux/7.2/new agent.tar'), false);
+        });
+    } finally {
+        await rm(scratch, { recursive: true });
+    }
+});
+
+test('files can be dropped, and folders removed', async () => {
+    await on('/depot', {}, async ({ tab, fake }) => {
+        await tab.waitForSelector('.drop');
+        await tab.evaluate(() => {
+            const dataTransfer = new DataTransfer();
+            dataTransfer.items.add(new File(['dropped'], 'dropped.tar'));
+            document.querySelector('.drop').dispatchEvent(new DragEvent('drop', { dataTransfer, bubbles: true, cancelable: true }));
+        });
+        await press(tab, 'Push 1 file');
+        await untilText(tab, 'verified:');
+        assert.equal(String(fake.depot.get('dropped.tar').content), 'dropped');
+        await press(tab, 'Remove um');
+        await untilText(tab, 'zavctl depot rm -r um', 'dialog');
+        await press(tab, 'Remove');
+        await notice(tab, 'depot rm um: done');
+        assert.equal(fake.depot.has('um/7.1/install.sh'), false);
+    });
+});
+
+test('who may only look is offered nothing else', async () => {
+    await on('/agents', { host: { access: 'read' } }, async ({ tab, go, front }) => {
+        await untilText(tab, 'You may look, and change nothing');
+        for (const address of ['/agents', '/tasks/a0a99408e7707b3d-5', '/depot', '/configuration?product=ux']) {
+            await go(address);
+            await untilText(tab, 'may only look', '.top');
+            const names = await tab.$$eval('main button', (buttons) => buttons.filter((button) => !button.disabled).map((button) => button.textContent));
+            assert.deepEqual(names.filter((name) => /Start|Stop|Restart|nstall|Remove|Cancel|again…|Send|choose|Import/.test(name)), [], address);
+        }
+        assert.deepEqual(front.state.requests.filter((request) => !/^GET |^POST \/v1\/query$/.test(request)), []);
+    });
+});

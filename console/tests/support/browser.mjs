@@ -1,0 +1,64 @@
+// Debian's Chromium, and pages in it on which nothing goes wrong unnoticed.
+import { access } from 'node:fs/promises';
+import puppeteer from 'puppeteer-core';
+
+const places = [process.env.CHROMIUM, '/usr/bin/chromium', '/usr/bin/chromium-browser', '/usr/bin/google-chrome'];
+
+/// The program; undefined if there is none.
+export async function chromium() {
+    for (const place of places) {
+        if (!place) continue;
+        try {
+            await access(place);
+            return place;
+        } catch {
+            // The next one, then.
+        }
+    }
+    return undefined;
+}
+
+export async function launch() {
+    return puppeteer.launch({
+        executablePath: await chromium(),
+        // Containers have neither the kernel's leave for a sandbox nor room in /dev/shm.
+        args: ['--no-sandbox', '--disable-dev-shm-usage', '--disable-gpu', '--force-color-profile=srgb', '--lang=en-GB'],
+    });
+}
+
+/// A tab that collects what must not happen: errors, violations of the policy, scripts of a host.
+export async function openTab(browser, { width = 1280, height = 860, scheme = 'light' } = {}) {
+    const tab = await browser.newPage();
+    const faults = [];
+    const own = { isDisturbed: false };
+    await tab.setViewport({ width, height });
+    await tab.emulateMediaFeatures([{ name: 'prefers-color-scheme', value: scheme }, { name: 'prefers-reduced-motion', value: 'reduce' }]);
+    await tab.exposeFunction('reportFault', (text) => faults.push(text));
+    await tab.evaluateOnNewDocument(() => {
+        addEventListener('securitypolicyviolation', (event) => globalThis.reportFault(`policy: ${event.violatedDirective} ${event.blockedURI}`));
+    });
+    tab.on('pageerror', (error) => faults.push(`error: ${error.message ?? error}`));
+    tab.on('dialog', (dialog) => {
+        if (dialog.type() !== 'beforeunload') faults.push(`dialog: ${dialog.message()}`);
+        void dialog.accept();
+    });
+    tab.on('console', (message) => {
+        // Chromium says so of each answer that tells of a refusal; tests of refusals expect it.
+        const isRefusal = /Failed to load resource/.test(message.text()) && own.isDisturbed;
+        if (message.type() === 'error' && !isRefusal) faults.push(`console: ${message.text()} ${message.location().url ?? ''}`);
+    });
+    tab.setDefaultTimeout(15_000);
+    return { tab, faults, own };
+}
+
+/// Waits until a text is on the page.
+export function untilText(tab, text, selector = 'body') {
+    return tab.waitForFunction((wanted, where) => document.querySelector(where)?.innerText.includes(wanted), { timeout: 15_000 }, text, selector);
+}
+
+/// Clicks the button or link with this name, as assistive technology knows it.
+export async function press(tab, name, role = 'button') {
+    const element = await tab.waitForSelector(`aria/${name}[role="${role}"]`, { visible: true });
+    await element.click();
+    await element.dispose();
+}

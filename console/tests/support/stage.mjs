@@ -1,0 +1,34 @@
+// A browser, a made-up host and the console between them, for one file of tests.
+import { mkdir } from 'node:fs/promises';
+import path from 'node:path';
+import { fileURLToPath } from 'node:url';
+import { launch, openTab } from './browser.mjs';
+import { makeFakeHost } from './fake_host.mjs';
+import { startFront } from './front.mjs';
+
+const root = path.join(path.dirname(fileURLToPath(import.meta.url)), '..', '..');
+export const page = process.env.CONSOLE_PAGE ?? path.join(root, 'out', 'page');
+export const shots = process.env.CONSOLE_SHOTS ?? path.join(root, 'out', 'shots');
+
+export async function raise() {
+    await mkdir(shots, { recursive: true });
+    const browser = await launch();
+    const fronts = [];
+    /// A host of its own, and a tab on its console. `faults` must be empty in the end.
+    const open = async ({ host = {}, command, ...view } = {}) => {
+        const fake = makeFakeHost(host);
+        const front = await startFront({ page, host: fake.host, depot: fake.push, ...(command ? { command } : {}) });
+        fronts.push(front);
+        const context = await browser.createBrowserContext();
+        await context.overridePermissions(front.origin, ['clipboard-read', 'clipboard-write', 'clipboard-sanitized-write']);
+        const opened = await openTab(context, view);
+        await opened.tab.goto(front.link, { waitUntil: 'domcontentloaded' });
+        const go = (address) => opened.tab.goto(front.origin + address, { waitUntil: 'domcontentloaded' });
+        return { ...opened, fake, front, go, end: () => context.close() };
+    };
+    const strike = async () => {
+        await browser.close();
+        for (const front of fronts) await front.close();
+    };
+    return { open, strike };
+}
