@@ -15,6 +15,9 @@ inline constexpr char kOutStream[] = "OUT";
 inline constexpr char kHostsStream[] = "KV_HOSTS";
 inline constexpr char kCentreStream[] = "KV_CENTRE";
 
+/// Before a host's key: where it tells about itself.
+inline constexpr char kFactsSubject[] = "$KV.HOSTS.";
+
 /// What the operator of a fleet chooses.
 struct StreamLimits {
     std::int64_t tasksBytes = 0;  ///< all orders together; new ones are refused when it is full

@@ -23,6 +23,8 @@ std::string_view nameOf(Purpose purpose) {
             return "reply";
         case Purpose::Reporting:
             return "out";
+        case Purpose::Describing:
+            return "facts";
         case Purpose::Asking:
             return "ask";
         case Purpose::Answering:

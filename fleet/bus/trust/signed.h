@@ -22,6 +22,7 @@ enum class Purpose {
     Greeting,
     Replying,
     Reporting,
+    Describing,
     Asking,
     Answering,
     Enrolling,

@@ -9,6 +9,7 @@
 #include "fleet/bus/messages/hello_bytes.h"
 #include "fleet/bus/nats/store.h"
 #include "fleet/bus/nats/streams.h"
+#include "fleet/link/facts/published_facts.h"
 #include "fleet/log/log.h"
 
 using nlohmann::json;
@@ -181,6 +182,21 @@ void BusSide::reportNow(const Outcome& outcome) {
     // by the next reply.
     static_cast<void>(
         connection_->publish("out." + trust_.host, publishedOutcome(outcome, signing_)));
+}
+
+void BusSide::tell(Facts facts, std::function<void(bool)> answer) {
+    worker_.add(
+        [this, facts = std::move(facts), answer = std::move(answer)] { answer(tellNow(facts)); });
+}
+
+/// Nobody asks for facts again, so the acknowledgement is waited for.
+bool BusSide::tellNow(const Facts& facts) {
+    if (!connection_) return false;
+    const StoreResult result = store(*connection_, kFactsSubject + trust_.host,
+                                     publishedFacts(facts, signing_), kAnswerTime);
+    if (result.kind == StoreResult::Kind::Stored) return true;
+    say(Priority::Warning, "the bus does not keep this host's facts: " + result.text);
+    return false;
 }
 
 }  // namespace fleet

@@ -6,6 +6,7 @@
 #include <memory>
 #include <string>
 
+#include "fleet/bus/messages/facts.h"
 #include "fleet/bus/nats/connection.h"
 #include "fleet/link/core/actions.h"
 #include "fleet/link/judge.h"
@@ -41,6 +42,8 @@ public:
     void read(Number number);
     void sayHello(Hello hello);
     void report(const Outcome& outcome);
+    /// `answer` is told whether the bus has them; on the worker's thread.
+    void tell(Facts facts, std::function<void(bool isStored)> answer);
 
     /// Orders whose number the centre has not signed.
     std::uint64_t unsignedNumbers() const { return unsignedNumbers_; }
@@ -53,6 +56,7 @@ private:
     void readNow(Number number);
     void sayHelloNow(const Hello& hello);
     void reportNow(const Outcome& outcome);
+    bool tellNow(const Facts& facts);
 
     ConnectionOptions options_;
     const Trust trust_;

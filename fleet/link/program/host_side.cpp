@@ -229,6 +229,7 @@ void HostSide::followOnce(std::string& journal, std::string& position) {
         position = stream.position();
         if (event.type == "gap") lookAgain();
         if (event.type != "task") continue;
+        events_.tasksChanged();
         if (std::optional<Outcome> outcome = outcomeOf(event.data, journal)) {
             events_.ended(std::move(*outcome));
         }

@@ -23,6 +23,8 @@ public:
         std::function<void(const std::string& journal, std::set<std::string> unfinished)> isThere;
         std::function<void()> isAway;
         std::function<void(Outcome)> ended;
+        /// Something was told about a task, the fleet's or not.
+        std::function<void()> tasksChanged;
     };
 
     HostSide(std::string socket, Events events);

@@ -26,16 +26,21 @@ Moment drawnPause() {
 }  // namespace
 
 LinkProgram::LinkProgram(const LinkConfiguration& configuration)
-    : file_(configuration.state), latest_(file_.kept().latest), link_(settings(), file_.kept()) {
+    : file_(configuration.state),
+      latest_(file_.kept().latest),
+      link_(settings(), file_.kept()),
+      facts_(ownFacts(configuration)) {
     files_ = std::make_unique<FileSide>(fileSettings(configuration));
     bus_ = std::make_unique<BusSide>(busOptions(configuration), trust(configuration), file_.bus(),
                                      file_.signing(), busEvents());
+    inventory_ = std::make_unique<InventorySide>(configuration.hostSocket);
     host_ = std::make_unique<HostSide>(configuration.hostSocket, hostEvents());
 }
 
 LinkProgram::~LinkProgram() {
     // Each of them may still put letters into the mailbox, and nothing else.
     host_.reset();
+    inventory_.reset();
     bus_.reset();
     files_.reset();
 }
@@ -63,6 +68,15 @@ Trust LinkProgram::trust(const LinkConfiguration& configuration) const {
     trusted.root = configuration.root;
     trusted.centres = configuration.centres;
     return trusted;
+}
+
+Facts LinkProgram::ownFacts(const LinkConfiguration& configuration) const {
+    Facts own;
+    own.host = file_.bus().publicKey();
+    own.name = configuration.name;
+    own.labels = configuration.labels;
+    own.link = ZAV_VERSION;
+    return own;
 }
 
 Moment LinkProgram::now() {
@@ -106,18 +120,28 @@ HostSide::Events LinkProgram::hostEvents() {
             if (std::exchange(journal_, journal) != journal) {
                 say(Priority::Info, "the host answers; its journal is " + journal);
             }
+            facts_.hostIs(journal, now());
             carryOut(link_.hostIs(journal, unfinished, now()));
         });
     };
     events.isAway = [this] {
         mailbox_.put([this] {
             if (!std::exchange(journal_, "").empty()) say(Priority::Warning, "the host is away");
+            facts_.hostIsAway();
             carryOut(link_.hostIsAway(now()));
         });
     };
     events.ended = [this](Outcome outcome) {
         tell([outcome = std::move(outcome)](Link& link, Moment at) {
             return link.ended(outcome, at);
+        });
+    };
+    events.tasksChanged = [this] {
+        // A host tells of many; one letter at a time is enough.
+        if (isChangeWaiting_.exchange(true)) return;
+        mailbox_.put([this] {
+            isChangeWaiting_ = false;
+            facts_.tasksChanged(now());
         });
     };
     return events;
@@ -128,12 +152,14 @@ BusSide::Events LinkProgram::busEvents() {
     events.connected = [this] {
         mailbox_.put([this] {
             say(Priority::Info, "connected to the bus");
+            facts_.connected();
             carryOut(link_.connected(now()));
         });
     };
     events.disconnected = [this] {
         mailbox_.put([this] {
             say(Priority::Warning, "the bus is away");
+            facts_.disconnected();
             link_.disconnected();
         });
     };
@@ -174,6 +200,7 @@ LinkProgram::End LinkProgram::run() {
         nextTick = Mailbox::Clock::now() + seconds(1);
         carryOut(link_.tick(now()));
         sayWhatBlocks();
+        tellFacts();
     }
     return *end_;
 }
@@ -188,6 +215,20 @@ void LinkProgram::sayWhatBlocks() {
     if (std::exchange(blocked_, link_.blocked()) == link_.blocked()) return;
     if (blocked_.empty()) return say(Priority::Info, "orders are handed over again");
     say(Priority::Notice, "the next order waits: " + blocked_);
+}
+
+void LinkProgram::tellFacts() {
+    facts_.blockedIs(link_.blocked());
+    if (facts_.wantsLook(now())) {
+        inventory_->look([this](std::optional<HostLook> look) {
+            mailbox_.put([this, look = std::move(look)] { facts_.found(look, now()); });
+        });
+    }
+    if (std::optional<Facts> facts = facts_.next(now())) {
+        bus_->tell(std::move(*facts), [this](bool isStored) {
+            mailbox_.put([this, isStored] { facts_.stored(isStored); });
+        });
+    }
 }
 
 void LinkProgram::carryOut(const Actions& actions) {

@@ -9,6 +9,8 @@
 #include <string>
 
 #include "fleet/link/core/link.h"
+#include "fleet/link/facts/facts_teller.h"
+#include "fleet/link/facts/inventory_side.h"
 #include "fleet/link/files/file_side.h"
 #include "fleet/link/program/bus_side.h"
 #include "fleet/link/program/host_side.h"
@@ -68,13 +70,17 @@ private:
     void apply(const StopLink& action);
     void noteRecorded(Number number, const HandOverAnswer& answer, Moment now);
     void sayWhatBlocks();
+    Facts ownFacts(const LinkConfiguration& configuration) const;
+    void tellFacts();
 
     Mailbox mailbox_;
     LinkFile file_;
     Moment latest_{};
     std::chrono::steady_clock::time_point latestAt_ = std::chrono::steady_clock::now();
     std::atomic<bool> isSeenWaiting_{false};
+    std::atomic<bool> isChangeWaiting_{false};
     Link link_;
+    FactsTeller facts_;
     std::string journal_;  ///< the host's, as it was last told; "" while no host answers
     std::string blocked_;  ///< what was last said of it
     std::optional<End> end_;
@@ -82,6 +88,7 @@ private:
     std::unique_ptr<FileSide> files_;  ///< the bus's threads use it, too
     std::unique_ptr<BusSide> bus_;
     std::unique_ptr<HostSide> host_;
+    std::unique_ptr<InventorySide> inventory_;
 };
 
 }  // namespace fleet

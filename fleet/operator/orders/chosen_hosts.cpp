@@ -46,32 +46,49 @@ std::vector<std::string> linesOf(const std::string& text) {
     return words;
 }
 
-Choice hostsInFile(Centre& centre, const std::string& file) {
-    Choice choice{kEveryHost, {}};
+/// The documents of the hosts that the file names, each once.
+json documentsInFile(Centre& centre, const std::string& file) {
+    json documents = json::array();
     std::set<std::string> seen;
     for (const std::string& name : linesOf(ctl::readFile(file))) {
-        ChosenHost host = hostOf(centre.get("/v1/hosts/" + ctl::percentEncoded(name)));
+        json document = centre.get("/v1/hosts/" + ctl::percentEncoded(name));
+        const ChosenHost host = hostOf(document);
         if (name != host.key && name != host.name) throw senseless("it is about another host");
-        if (seen.insert(host.key).second) choice.hosts.push_back(std::move(host));
+        if (seen.insert(host.key).second) documents.push_back(std::move(document));
     }
-    return choice;
+    return documents;
 }
 
-Choice hostsOfSelector(Centre& centre, const std::string& selector) {
+Choice choiceOf(const std::string& selector, const json& documents) {
     Choice choice{selector, {}};
-    for (const json& document : hostDocuments(centre, selector))
+    for (const json& document : documents)
         choice.hosts.push_back(hostOf(document));
     return choice;
 }
 
-}  // namespace
+bool isFileName(const std::string& selector) {
+    return !selector.empty() && selector.front() == '@';
+}
 
-json hostDocuments(Centre& centre, const std::string& selector) {
+void insistOnSome(const std::string& selector, bool areThere) {
+    if (areThere) return;
+    if (isFileName(selector)) {
+        throw ctl::Failure(ctl::kHostReportedFailure,
+                           "no host is named in " + ctl::printable(selector.substr(1)));
+    }
+    throw ctl::Failure(ctl::kHostReportedFailure,
+                       "no host is selected by " + ctl::printable(selector),
+                       "A word without * is a label's name; hosts' names have one, as web-1*, or "
+                       "stand in a file: --on @FILE.");
+}
+
+/// All pages of a list of hosts.
+json documentsAt(Centre& centre, const std::string& path, const std::string& selector) {
     checkSelector(selector);
     json hosts = json::array();
     std::string next;
     do {
-        std::string target = "/v1/hosts?limit=" + std::string(kHostsOfOnePage) +
+        std::string target = path + "?limit=" + std::string(kHostsOfOnePage) +
                              "&selector=" + ctl::percentEncoded(selector);
         if (!next.empty()) target += "&after=" + ctl::percentEncoded(next);
         const json page = centre.get(target);
@@ -85,6 +102,19 @@ json hostDocuments(Centre& centre, const std::string& selector) {
     return hosts;
 }
 
+}  // namespace
+
+json hostDocuments(Centre& centre, const std::string& selector) {
+    return documentsAt(centre, "/v1/hosts", selector);
+}
+
+json inventoryDocuments(Centre& centre, const std::string& selector) {
+    json documents = isFileName(selector) ? documentsInFile(centre, selector.substr(1))
+                                          : documentsAt(centre, "/v1/inventory", selector);
+    insistOnSome(selector, !documents.empty());
+    return documents;
+}
+
 ChosenHost hostOf(const json& document) {
     ChosenHost host{memberText(document, "host"), memberText(document, "name"),
                     memberText(document, "state")};
@@ -94,17 +124,10 @@ ChosenHost hostOf(const json& document) {
 }
 
 Choice chooseHosts(Centre& centre, const std::string& selector) {
-    const bool isFile = !selector.empty() && selector.front() == '@';
-    Choice choice =
-        isFile ? hostsInFile(centre, selector.substr(1)) : hostsOfSelector(centre, selector);
-    if (choice.hosts.empty()) {
-        throw ctl::Failure(ctl::kHostReportedFailure,
-                           isFile ? "no host is named in " + ctl::printable(selector.substr(1))
-                                  : "no host is selected by " + ctl::printable(selector),
-                           isFile ? ""
-                                  : "A word without * is a label's name; hosts' names have "
-                                    "one, as web-1*, or stand in a file: --on @FILE.");
-    }
+    Choice choice = isFileName(selector)
+                        ? choiceOf(kEveryHost, documentsInFile(centre, selector.substr(1)))
+                        : choiceOf(selector, hostDocuments(centre, selector));
+    insistOnSome(selector, !choice.hosts.empty());
     return choice;
 }
 

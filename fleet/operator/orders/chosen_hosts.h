@@ -25,6 +25,10 @@ struct Choice {
 /// The documents of all hosts with that selector, page by page. Throws ctl::Failure.
 nlohmann::json hostDocuments(Centre& centre, const std::string& selector);
 
+/// The documents of the hosts of a selector, or of "@FILE", with what they have told about
+/// themselves. Throws ctl::Failure as chooseHosts() does.
+nlohmann::json inventoryDocuments(Centre& centre, const std::string& selector);
+
 /// A host as its document tells. Throws ctl::Failure if that has no key of a host.
 ChosenHost hostOf(const nlohmann::json& document);
 

@@ -25,6 +25,9 @@ constexpr const char* kOfOneHost[] = {"--transid", "--once", "--complete"};
 /// The verbs that sign orders anew.
 constexpr const char* kRenewals[] = {"rollout resume", "rollout abort", "rollout retry-failed"};
 
+/// The verbs that look at many hosts and change none.
+constexpr const char* kLooks[] = {"agents"};
+
 ctl::Failure misplaced(const ctl::Verb& verb, const std::string& option) {
     return {ctl::kWrongUsage, std::string(verb.name) + " does not go with " + option};
 }
@@ -32,6 +35,17 @@ ctl::Failure misplaced(const ctl::Verb& verb, const std::string& option) {
 bool isRenewal(const ctl::Verb& verb) {
     return std::find(std::begin(kRenewals), std::end(kRenewals), std::string(verb.name)) !=
            std::end(kRenewals);
+}
+
+bool looksAtMany(const ctl::Verb& verb) {
+    return std::find(std::begin(kLooks), std::end(kLooks), std::string(verb.name)) !=
+           std::end(kLooks);
+}
+
+void insistOnHosts(const ctl::Values& given) {
+    if (!given.text(kOn).empty()) return;
+    throw ctl::Failure(ctl::kWrongUsage, "--on is missing: it says which hosts are meant",
+                       "--on '*' means all of them.");
 }
 
 }  // namespace
@@ -60,15 +74,14 @@ Moment timeOf(const ctl::Values& given, const ctl::Argument& option) {
 void insistOnMeaning(const ctl::Verb& verb, const ctl::Values& given) {
     if (verb.requestOf == nullptr) {
         for (const ctl::Argument* const option : kOfRollouts) {
+            if (option == &kOn && looksAtMany(verb)) continue;
             if (given.has(*option)) throw misplaced(verb, option->name);
         }
         if (given.has(kExpires) && !isRenewal(verb)) throw misplaced(verb, kExpires.name);
+        if (looksAtMany(verb)) insistOnHosts(given);
         return;
     }
-    if (given.text(kOn).empty()) {
-        throw ctl::Failure(ctl::kWrongUsage, "--on is missing: it says which hosts are meant",
-                           "--on '*' means all of them.");
-    }
+    insistOnHosts(given);
     for (const ctl::Argument& argument : verb.arguments) {
         const bool isOfOne = std::find(std::begin(kOfOneHost), std::end(kOfOneHost),
                                        std::string(argument.name)) != std::end(kOfOneHost);

@@ -18,14 +18,15 @@ const ctl::Vocabulary& fleetVocabulary() {
     static const ctl::Vocabulary vocabulary{
         "Manages the monitoring agents of many hosts: a fleet",
         kFleetArguments,
-        {&ctl::kStartVerb,     &ctl::kStopVerb,          &ctl::kRestartVerb,
-         &ctl::kInstallVerb,   &ctl::kUninstallVerb,     &ctl::kRemoveInstanceVerb,
-         &ctl::kConfigSetVerb, &ctl::kUaConfigVerb,      &kFleetPushVerb,
-         &kHostsVerb,          &kHostsShowVerb,          &kHostsLabelVerb,
-         &kHostsRetireVerb,    &kRolloutLsVerb,          &kRolloutShowVerb,
-         &kRolloutWatchVerb,   &kRolloutPauseVerb,       &kRolloutResumeVerb,
-         &kRolloutAbortVerb,   &kRolloutRetryFailedVerb, &kLoginVerb,
-         &kFleetWhoamiVerb,    &kFleetVersionVerb,       &kFleetHelpVerb},
+        {&ctl::kStartVerb,     &ctl::kStopVerb,      &ctl::kRestartVerb,
+         &ctl::kInstallVerb,   &ctl::kUninstallVerb, &ctl::kRemoveInstanceVerb,
+         &ctl::kConfigSetVerb, &ctl::kUaConfigVerb,  &kFleetPushVerb,
+         &kFleetAgentsVerb,    &kHostsVerb,          &kHostsShowVerb,
+         &kHostsLabelVerb,     &kHostsRetireVerb,    &kRolloutLsVerb,
+         &kRolloutShowVerb,    &kRolloutWatchVerb,   &kRolloutPauseVerb,
+         &kRolloutResumeVerb,  &kRolloutAbortVerb,   &kRolloutRetryFailedVerb,
+         &kLoginVerb,          &kFleetWhoamiVerb,    &kFleetVersionVerb,
+         &kFleetHelpVerb},
         {&kFleetGroups[0], &kFleetGroups[1], &kFleetGroups[2]}};
     return vocabulary;
 }

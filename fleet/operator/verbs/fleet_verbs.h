@@ -8,6 +8,7 @@ namespace fleet {
 extern const ctl::Verb kLoginVerb;
 extern const ctl::Verb kFleetWhoamiVerb;
 extern const ctl::Verb kFleetPushVerb;
+extern const ctl::Verb kFleetAgentsVerb;
 extern const ctl::Verb kHostsVerb;
 extern const ctl::Verb kHostsShowVerb;
 extern const ctl::Verb kHostsLabelVerb;

@@ -81,6 +81,29 @@ std::string fact(const std::string& title, const std::string& text) {
     return text.empty() ? "" : title + std::string(kTitleWidth - title.size(), ' ') + text + "\n";
 }
 
+/// How much is installed, as the host has told.
+std::string inventoryText(const json& facts) {
+    const auto inventory = facts.find("inventory");
+    if (inventory == facts.end() || !inventory->is_object()) return {};
+    const auto products = inventory->find("products");
+    const std::size_t count =
+        products != inventory->end() && products->is_array() ? products->size() : 0;
+    constexpr std::uint64_t kLongest = 1'000'000'000'000;
+    const std::uint64_t age = std::min(memberNumber(*inventory, "age"), kLongest);
+    return std::to_string(count) + (count == 1 ? " product, " : " products, ") +
+           ctl::spanText(std::chrono::seconds(static_cast<std::int64_t>(age))) + " old";
+}
+
+/// What the host has told about itself.
+std::string factsText(const json& host) {
+    const auto facts = host.is_object() ? host.find("facts") : host.end();
+    if (facts == host.end() || !facts->is_object()) return {};
+    return fact("own labels", ctl::printable(labelsText(*facts))) +
+           fact("versions", ctl::printable("host " + memberText(*facts, "version") + ", link " +
+                                           memberText(*facts, "link"))) +
+           fact("inventory", inventoryText(*facts));
+}
+
 json orderRows(const json& orders, ctl::WallTime now) {
     json rows = json::array();
     for (const json& order : memberList(orders, "orders")) {
@@ -169,7 +192,7 @@ ctl::Page showHost(const json& host, const json& orders, ctl::WallTime now, ctl:
                fact("labels", ctl::printable(labelsText(host))) +
                fact("orders", std::to_string(memberNumber(host, "taken")) + " of " +
                                   std::to_string(last) + " taken") +
-               fact("journal", ctl::printable(memberText(host, "journal"))) +
+               fact("journal", ctl::printable(memberText(host, "journal"))) + factsText(host) +
                fact("trouble", troubleOf(host));
     if (rows.empty()) return page;
     page.out += "\n" + ctl::tableText(rows, {{"number", "NUMBER"},

@@ -22,7 +22,8 @@ constexpr ctl::Argument kLabelArguments[] = {kLabelledHost, kLabelChanges};
 
 std::map<std::string, std::string> knownLabels(const json& host) {
     std::map<std::string, std::string> labels;
-    const auto found = host.find("labels");
+    // Those of the host's own configuration stay where they are.
+    const auto found = host.find("centreLabels");
     if (found == host.end() || !found->is_object()) return labels;
     for (const auto& item : found->items())
         labels[item.key()] = memberText(*found, item.key().c_str());

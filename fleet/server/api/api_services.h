@@ -3,7 +3,9 @@
 
 #include <algorithm>
 #include <chrono>
+#include <cstdint>
 #include <future>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -78,10 +80,20 @@ public:
         return act(trust_.connection());
     }
 
-    /// The hosts of the fleet.
+    /// The hosts of the fleet. Where centre and host both give a label, the host's own counts: by
+    /// that its link decides, so an order for hosts that were chosen by the other one would be
+    /// refused there.
     std::shared_ptr<const Members> members() {
         const std::lock_guard lock(mutex_);
-        return members_.current();
+        const ToldLabels& told = service_.centre().toldLabels();
+        const auto known = members_.current();
+        const std::uint64_t version = told.version();
+        if (known != known_ || version != toldVersion_) {
+            labelled_ = withOwnLabels(*known, told.all());
+            known_ = known;
+            toldVersion_ = version;
+        }
+        return labelled_;
     }
     /// The bus key of the host whose link signs with this key; "" if it is none of the fleet's.
     std::string hostSigningWith(const std::string& key) {
@@ -97,10 +109,24 @@ public:
     }
 
 private:
+    static std::shared_ptr<const Members> withOwnLabels(Members members,
+                                                        const std::map<std::string, Labels>& told) {
+        for (const auto& [host, labels] : told) {
+            const auto member = members.find(host);
+            if (member == members.end()) continue;
+            for (const auto& [name, value] : labels)
+                member->second.labels[name] = value;
+        }
+        return std::make_shared<const Members>(std::move(members));
+    }
+
     CentreService& service_;
-    std::mutex mutex_;  ///< for both below
+    std::mutex mutex_;  ///< for all below
     TrustDatabase trust_;
     MemberList members_;
+    std::shared_ptr<const Members> known_;  ///< what labelled_ was made of
+    std::uint64_t toldVersion_ = 0;
+    std::shared_ptr<const Members> labelled_;
 };
 
 }  // namespace fleet

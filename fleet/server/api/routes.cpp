@@ -4,7 +4,7 @@ namespace fleet {
 
 /// The endpoints. Each has a file of its own below this folder and a row here.
 ApiEndpoint getCentreHealth, postEnrolment, postLogin, postSession, getOperator;
-ApiEndpoint getHosts, getHost, getHostOrders, postLabels, postRetire;
+ApiEndpoint getHosts, getInventory, getHost, getHostOrders, postLabels, postRetire;
 ApiEndpoint postBatch, postBatchOrders, postRollout, getRollouts, getRollout;
 ApiEndpoint getRolloutHosts, getRolloutFailures, getToSign;
 ApiEndpoint getFile, postFile, getFileContent;
@@ -53,6 +53,10 @@ std::vector<ApiRoute> apiRoutes() {
 
         {"GET", "/v1/hosts", "The hosts of the fleet.",
          Access::Read, kWorker, getHosts, {{200, "a page of them", nullptr}},
+         {{"selector", Type::Text, Need::Optional, "which ones"},
+          {"after", Type::Text, Need::Optional, "the last one of the page before"}, kLimit}},
+        {"GET", "/v1/inventory", "What the hosts of the fleet have told about themselves.",
+         Access::Read, kWorker, getInventory, {{200, "a page of hosts", nullptr}},
          {{"selector", Type::Text, Need::Optional, "which ones"},
           {"after", Type::Text, Need::Optional, "the last one of the page before"}, kLimit}},
         {"GET", "/v1/hosts/{host}", "A host.",

@@ -5,11 +5,13 @@
 #include <utility>
 
 #include "fleet/bus/messages/document.h"
+#include "fleet/bus/messages/facts.h"
 #include "fleet/bus/messages/hello_bytes.h"
 #include "fleet/bus/messages/numbered_order.h"
 #include "fleet/bus/messages/order.h"
 #include "fleet/bus/trust/signed.h"
 #include "fleet/log/log.h"
+#include "fleet/server/store/host_facts.h"
 #include "sqlite/transaction.h"
 
 namespace fleet {
@@ -91,6 +93,7 @@ void CentreProgram::finish() {
     if (renewer_) renewer_->await();
     hellos_.reset();
     outcomes_.reset();
+    facts_.reset();
     if (lease_ && end_ != End::LeaseLost) lease_->release();
     if (connection_) connection_->close(kFarewellTime);
 }
@@ -184,8 +187,13 @@ bool CentreProgram::beginWork() {
     centre_ = std::make_unique<Centre>(store_, *bus_, settings_.alarm);
     if (store_.isPutBack() && !completePutBack()) return false;
     if (!hearHellos()) return false;
-    outcomes_ = std::make_unique<OutcomeFeed>(
-        *connection_, [this](const auto& told) { return takeOutcomes(told); });
+    toldLabels_.setAll(HostFacts(database_.connection()).labels());
+    outcomes_ =
+        std::make_unique<HostFeed>(*connection_, HostFeed::Source{kOutStream, "out.", "outcomes"},
+                                   [this](const auto& told) { return takeOutcomes(told); });
+    facts_ = std::make_unique<HostFeed>(*connection_,
+                                        HostFeed::Source{kHostsStream, kFactsSubject, "facts"},
+                                        [this](const auto& told) { return takeFacts(told); });
     renewer_ = std::make_unique<Worker>();
     renewer_->add([this] { renewLease(); });
     sweeper_ = std::make_unique<Worker>();
@@ -322,17 +330,18 @@ void CentreProgram::noteNews(const std::string& host, const Hello& hello, Moment
     news.skew = hello.time - at;
 }
 
-/// On the feed's thread. One that is not its host's own counts for nothing, and is done with.
-bool CentreProgram::takeOutcomes(const std::vector<OutcomeFeed::Told>& told) {
-    auto taken = ask([told](Parts& parts) {
-        for (const OutcomeFeed::Told& one : told) {
+/// On a feed's thread. What is not its host's own counts for nothing, and is done with.
+template <typename Take>
+bool CentreProgram::takeEach(const std::vector<HostFeed::Told>& told, const char* what, Take take) {
+    auto taken = ask([told, what, take](Parts& parts) {
+        for (const HostFeed::Told& one : told) {
             const std::optional<HostRecord> record = parts.store.host(one.host);
             if (!record) continue;
             try {
-                parts.centre.hear(readOutcome(one.bytes, one.host, record->signing));
+                take(parts, one, *record);
             } catch (const MessageError& error) {
                 say(Priority::Warning,
-                    "an outcome in the name of " + record->name + ": " + error.what());
+                    std::string(what) + " in the name of " + record->name + ": " + error.what());
             }
         }
         return true;
@@ -342,9 +351,27 @@ bool CentreProgram::takeOutcomes(const std::vector<OutcomeFeed::Told>& told) {
     } catch (const std::future_error&) {
         return false;  // it ends
     } catch (const std::exception& error) {
-        say(Priority::Error, std::string("outcomes not kept: ") + error.what());
+        say(Priority::Error, std::string(what) + " not kept: " + error.what());
         return false;
     }
+}
+
+bool CentreProgram::takeOutcomes(const std::vector<HostFeed::Told>& told) {
+    return takeEach(told, "an outcome",
+                    [](Parts& parts, const HostFeed::Told& one, const HostRecord& record) {
+                        parts.centre.hear(readOutcome(one.bytes, one.host, record.signing));
+                    });
+}
+
+bool CentreProgram::takeFacts(const std::vector<HostFeed::Told>& told) {
+    return takeEach(
+        told, "facts", [this](Parts& parts, const HostFeed::Told& one, const HostRecord& record) {
+            Facts facts = readFacts(one.bytes, one.host, record.signing);
+            // Older ones are repeated, or from a bus that was put back.
+            if (!HostFacts(parts.database).keep(facts, wallClock())) return;
+            afterCommit_.push_back(
+                [this, host = one.host, labels = facts.labels] { toldLabels_.set(host, labels); });
+        });
 }
 
 std::future<std::optional<Number>> CentreProgram::submit(std::string orderBytes) {

@@ -19,8 +19,9 @@
 #include "fleet/loop/worker.h"
 #include "fleet/server/core/centre.h"
 #include "fleet/server/program/hello_limit.h"
+#include "fleet/server/program/host_feed.h"
 #include "fleet/server/program/nats_centre_bus.h"
-#include "fleet/server/program/outcome_feed.h"
+#include "fleet/server/program/told_labels.h"
 #include "fleet/server/store/centre_database.h"
 #include "fleet/server/store/sqlite_centre_store.h"
 #include "sqlite/transaction.h"
@@ -106,6 +107,8 @@ public:
     bool isWorking() const { return isWorking_; }
     /// Of all hosts that were heard since the start. Any thread but that of run().
     std::future<std::map<std::string, HostNews>> news();
+    /// Of all hosts that have ever told some. Any thread.
+    const ToldLabels& toldLabels() const { return toldLabels_; }
 
 private:
     void connect();
@@ -121,7 +124,10 @@ private:
     bool workOnBus();
     void takeHello(const BusMessage& message);
     void answerHello(const std::string& host, const std::string& reply, const std::string& bytes);
-    bool takeOutcomes(const std::vector<OutcomeFeed::Told>& told);
+    bool takeOutcomes(const std::vector<HostFeed::Told>& told);
+    bool takeFacts(const std::vector<HostFeed::Told>& told);
+    template <typename Take>
+    bool takeEach(const std::vector<HostFeed::Told>& told, const char* what, Take take);
     void noteNews(const std::string& host, const Hello& hello, Moment now);
     void sweep();
     void sweepOnce();
@@ -143,6 +149,7 @@ private:
     /// Until when the lease is surely ours, in ticks of the steady clock.
     std::atomic<std::chrono::steady_clock::rep> leaseUntil_{0};
     std::map<std::string, HostNews> news_;
+    ToldLabels toldLabels_;
     HelloLimit helloLimit_;  ///< belongs to the subscription's thread
     std::atomic<int> waitingHellos_{0};
 
@@ -152,7 +159,8 @@ private:
     std::unique_ptr<NatsCentreBus> bus_;
     std::unique_ptr<Centre> centre_;
     std::unique_ptr<Subscription> hellos_;
-    std::unique_ptr<OutcomeFeed> outcomes_;
+    std::unique_ptr<HostFeed> outcomes_;
+    std::unique_ptr<HostFeed> facts_;
     std::unique_ptr<Worker> renewer_;
     std::unique_ptr<Worker> sweeper_;
 };

@@ -79,8 +79,17 @@ CREATE TRIGGER orders_told AFTER UPDATE OF state ON orders WHEN new.state IS NOT
 END;
 )";
 
+/// What hosts have told about themselves, the newest of each. taken is when its inventory
+/// was made, and -1 without one; labels are its own.
+constexpr const char* kThird = R"(
+CREATE TABLE host_facts (
+    host INTEGER PRIMARY KEY, told INTEGER NOT NULL, heard INTEGER NOT NULL, name BLOB NOT NULL,
+    labels BLOB NOT NULL, link BLOB NOT NULL, version BLOB NOT NULL, journal BLOB NOT NULL,
+    blocked BLOB NOT NULL, taken INTEGER NOT NULL, inventory BLOB NOT NULL);
+)";
+
 /// What brings version N to version N + 1, from 0 on. A row is never changed once it was released.
-constexpr std::array<const char*, kCentreSchemaVersion> kMigrations = {kFirst, kSecond};
+constexpr std::array<const char*, kCentreSchemaVersion> kMigrations = {kFirst, kSecond, kThird};
 
 void migrate(sqlite::Database& database, int version) {
     sqlite::Transaction transaction(database);

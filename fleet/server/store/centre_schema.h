@@ -8,7 +8,7 @@
 namespace fleet {
 
 /// The version of the tables that this centre writes.
-inline constexpr int kCentreSchemaVersion = 2;
+inline constexpr int kCentreSchemaVersion = 3;
 
 /// Makes all tables in a new database, in one transaction. Throws sqlite::DatabaseError.
 void makeCentreTables(sqlite::Database& database);

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <nlohmann/json.hpp>
 
+#include "fleet/server/api/documents/facts_document.h"
 #include "text/utc_time.h"
 
 using nlohmann::json;
@@ -35,17 +36,37 @@ std::string hostNamed(const Visit& visit, const Members& members, const std::str
     return byName->first;
 }
 
+std::vector<std::string> hostsMeant(const Visit& visit, const Members& members,
+                                    const std::string& selector, const std::string& after,
+                                    std::size_t most) {
+    const Selector meant(selector);
+    const Selector visible(visit.grant.selector);
+    std::vector<std::string> hosts;
+    for (auto member = members.upper_bound(after); member != members.end(); ++member) {
+        const Member& known = member->second;
+        const bool isOne =
+            meant.matches(known.name, known.labels) && visible.matches(known.name, known.labels);
+        if (!isOne) continue;
+        hosts.push_back(member->first);
+        if (hosts.size() > most) break;
+    }
+    return hosts;
+}
+
 std::vector<HostSight> sightsOf(const Visit& visit, const Members& members,
-                                const std::vector<std::string>& hosts) {
+                                const std::vector<std::string>& hosts, WithFacts withFacts) {
     std::vector<HostSight> sights;
     for (const std::string& host : hosts)
-        sights.push_back({host, members.at(host), {}, {}});
-    return visit.services.ask([sights](CentreDesk& desk) {
+        sights.push_back({host, members.at(host), {}, {}, {}});
+    return visit.services.ask([sights, withFacts](CentreDesk& desk) {
         std::vector<HostSight> known = sights;
         for (HostSight& sight : known) {
             sight.record = desk.parts.store.host(sight.host);
             const auto news = desk.parts.news.find(sight.host);
             if (news != desk.parts.news.end()) sight.news = news->second;
+            if (withFacts == WithFacts::Yes) {
+                sight.facts = HostFacts(desk.parts.database).of(sight.host);
+            }
         }
         return known;
     });
@@ -56,7 +77,10 @@ json hostDocument(const HostSight& sight, Moment now) {
                      {"name", sight.member.name},
                      {"labels", json(sight.member.labels)},
                      {"state", stateOf(sight, now)}};
-    if (document["labels"].is_null()) document["labels"] = json::object();
+    document["centreLabels"] = json(sight.member.given);
+    for (const char* const member : {"labels", "centreLabels"}) {
+        if (document[member].is_null()) document[member] = json::object();
+    }
     if (sight.record) {
         const HostRecord& record = *sight.record;
         document["signing"] = record.signing;
@@ -67,6 +91,7 @@ json hostDocument(const HostSight& sight, Moment now) {
         document["journal"] = record.journal;
         if (record.heard != Moment{}) document["heard"] = timeOfDocument(record.heard);
     }
+    if (sight.facts) document["facts"] = factsDocument(*sight.facts, now);
     document["blocked"] = sight.news ? sight.news->blocked : "";
     if (sight.news) {
         constexpr double kMilliseconds = 1000;

@@ -13,7 +13,8 @@ http::Answer getHost(Visit& visit, const Call& call) {
     const auto members = visit.services.members();
     const std::string host = hostNamed(visit, *members, call.required("host"));
     return http::jsonReply(
-        200, textOf(hostDocument(sightsOf(visit, *members, {host}).front(), wallClock())));
+        200, textOf(hostDocument(sightsOf(visit, *members, {host}, WithFacts::Yes).front(),
+                                 wallClock())));
 }
 
 }  // namespace fleet

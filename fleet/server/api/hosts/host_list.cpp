@@ -12,26 +12,6 @@ namespace fleet {
 
 ApiEndpoint getHosts;
 
-namespace {
-
-/// The hosts behind `after` that the visitor means and may see, one more than wanted.
-std::vector<std::string> hostsMeant(const Visit& visit, const Members& members,
-                                    const std::string& selector, const std::string& after,
-                                    std::size_t most) {
-    const Selector meant(selector);
-    const Selector visible(visit.grant.selector);
-    std::vector<std::string> hosts;
-    for (auto member = members.upper_bound(after); member != members.end(); ++member) {
-        const auto& [name, signing, labels] = member->second;
-        if (!meant.matches(name, labels) || !visible.matches(name, labels)) continue;
-        hosts.push_back(member->first);
-        if (hosts.size() > most) break;
-    }
-    return hosts;
-}
-
-}  // namespace
-
 http::Answer getHosts(Visit& visit, const Call& call) {
     const std::string* const selector = call.text("selector");
     const std::string* const after = call.text("after");

@@ -3,6 +3,14 @@
 #include "fleet/server/keys/trust/names.h"
 
 namespace fleet {
+namespace {
+
+Member memberOf(const sqlite::Statement& row) {
+    const Labels given = labelsKept(row.bytes(3));
+    return {row.bytes(1), row.bytes(2), given, given};
+}
+
+}  // namespace
 
 std::shared_ptr<const Members> MemberList::current() {
     // The first changes with what other connections commit, the second with what this one does.
@@ -14,7 +22,7 @@ std::shared_ptr<const Members> MemberList::current() {
         "SELECT host, name, signing, labels FROM hosts h WHERE host IS NOT NULL AND NOT EXISTS "
         "(SELECT 1 FROM revocations r WHERE r.key = h.host)");
     while (rows.step())
-        members[rows.bytes(0)] = {rows.bytes(1), rows.bytes(2), labelsKept(rows.bytes(3))};
+        members[rows.bytes(0)] = memberOf(rows);
     members_ = std::make_shared<const Members>(std::move(members));
     seen_ = state;
     return members_;

@@ -15,7 +15,8 @@ namespace fleet {
 struct Member {
     std::string name;
     std::string signing;  ///< the public key with which its link signs
-    Labels labels;        ///< the centre's; the host's own may differ
+    Labels labels;        ///< those that selectors mean
+    Labels given;         ///< the centre's alone; the host's own may differ
 };
 
 /// By the hosts' bus keys.

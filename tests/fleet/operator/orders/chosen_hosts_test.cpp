@@ -49,6 +49,20 @@ TEST_F(ChosenHosts, MustBeSomeAndTheSelectorOne) {
     EXPECT_EQ(centre_.asked().size(), 1U);
 }
 
+TEST_F(ChosenHosts, ComeWithWhatTheyHaveTold) {
+    const std::string first = "GET /v1/inventory?limit=1000&selector=env%3Dtest";
+    centre_.answer(first, json{{"hosts", {host("a")}}, {"next", "UB"}});
+    centre_.answer(first + "&after=UB", json{{"hosts", {host("b")}}});
+    EXPECT_EQ(fleet::inventoryDocuments(centre_, "env=test").size(), 2U);
+    centre_.answer("GET /v1/inventory?limit=1000&selector=no", json{{"hosts", json::array()}});
+    EXPECT_EQ(failureOf([&] { fleet::inventoryDocuments(centre_, "no"); }).status(),
+              ctl::kHostReportedFailure);
+    const ScratchDir scratch;
+    centre_.answer("GET /v1/hosts/web-1", host("web-1"));
+    const std::string file = scratch.write("hosts", "web-1\nweb-1\n");
+    EXPECT_EQ(fleet::inventoryDocuments(centre_, "@" + file).size(), 1U);
+}
+
 TEST_F(ChosenHosts, AreThoseOfAFile) {
     const ScratchDir scratch;
     json second = host("web-2");

@@ -78,6 +78,10 @@ TEST(FleetArguments, MeanSomethingToTheVerbOrAreMistakes) {
     EXPECT_EQ(mistakeIn({"--on", "*", "start", "ux", "--once", "a"}),
               "start does not go with --once");
     EXPECT_EQ(mistakeIn({"--on", "*", "hosts"}), "hosts does not go with --on");
+    EXPECT_EQ(mistakeIn({"--on", "*", "agents"}), none);
+    EXPECT_EQ(mistakeIn({"agents"}), "--on is missing: it says which hosts are meant");
+    EXPECT_EQ(mistakeIn({"--on", "*", "--waves", "1", "agents"}),
+              "agents does not go with --waves");
     EXPECT_EQ(mistakeIn({"--dry-run", "rollout", "ls"}), "rollout ls does not go with --dry-run");
     EXPECT_EQ(mistakeIn({"--expires", "1h", "hosts"}), "hosts does not go with --expires");
     EXPECT_EQ(mistakeIn({"--expires", "1h", "rollout", "resume", "ID"}), none);

@@ -1,4 +1,4 @@
-/// Takes outcomes from the bus.
+/// Takes what hosts have published from the bus.
 #pragma once
 
 #include <atomic>
@@ -12,10 +12,16 @@
 
 namespace fleet {
 
-/// A thread that takes what hosts have published on "out.HOST", hands it on, and acknowledges it to
-/// the bus once it has been dealt with: what is not comes again.
-class OutcomeFeed {
+/// A thread that takes what hosts have published on a stream's subjects, such as "out.HOST", hands
+/// it on, and acknowledges it to the bus once it has been dealt with: what is not comes again.
+class HostFeed {
 public:
+    /// Where it comes from.
+    struct Source {
+        std::string stream;
+        std::string subject;  ///< before a host's key: "out."
+        std::string what;     ///< for people
+    };
     /// Signed bytes from the host of this bus key, which nobody has looked at.
     struct Told {
         std::string host;
@@ -26,11 +32,11 @@ public:
     using Take = std::function<bool(std::vector<Told>)>;
 
     /// The connection outlives it.
-    OutcomeFeed(Connection& connection, Take take);
+    HostFeed(Connection& connection, Source source, Take take);
     /// Waits until take() has returned, and for the bus for some seconds.
-    ~OutcomeFeed();
-    OutcomeFeed(const OutcomeFeed&) = delete;
-    OutcomeFeed& operator=(const OutcomeFeed&) = delete;
+    ~HostFeed();
+    HostFeed(const HostFeed&) = delete;
+    HostFeed& operator=(const HostFeed&) = delete;
 
 private:
     void work();
@@ -38,6 +44,7 @@ private:
     void handOn(Pull& pull, const std::vector<Pull::Taken>& messages);
 
     Connection& connection_;
+    const Source source_;
     const Take take_;
     std::atomic<bool> isEnding_{false};
     std::thread thread_;  ///< last: it uses everything above

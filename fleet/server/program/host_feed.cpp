@@ -1,10 +1,9 @@
-#include "fleet/server/program/outcome_feed.h"
+#include "fleet/server/program/host_feed.h"
 
 #include <chrono>
 #include <memory>
 #include <utility>
 
-#include "fleet/bus/nats/streams.h"
 #include "fleet/log/log.h"
 
 namespace fleet {
@@ -17,34 +16,37 @@ constexpr seconds kAnswerTime{5};
 /// How long the bus waits for the first message of a batch; also how long an end takes.
 constexpr seconds kPatience{1};
 constexpr int kBatch = 256;
-constexpr char kSubject[] = "out.";
 
 }  // namespace
 
-OutcomeFeed::OutcomeFeed(Connection& connection, Take take)
-    : connection_(connection), take_(std::move(take)), thread_([this] { work(); }) {}
+HostFeed::HostFeed(Connection& connection, Source source, Take take)
+    : connection_(connection),
+      source_(std::move(source)),
+      take_(std::move(take)),
+      thread_([this] { work(); }) {}
 
-OutcomeFeed::~OutcomeFeed() {
+HostFeed::~HostFeed() {
     isEnding_ = true;
     thread_.join();
 }
 
 /// Null at the end.
-std::unique_ptr<Pull> OutcomeFeed::opened() {
+std::unique_ptr<Pull> HostFeed::opened() {
     std::string last;
     while (!isEnding_) {
         Pull::Result result =
-            Pull::open(connection_, {kOutStream, "centre", seconds(30), 1000}, kAnswerTime);
+            Pull::open(connection_, {source_.stream, "centre", seconds(30), 1000}, kAnswerTime);
         if (result.pull) return std::move(result.pull);
         if (std::exchange(last, result.status.text) != result.status.text) {
-            say(Priority::Warning, "outcomes cannot be taken from the bus: " + result.status.text);
+            say(Priority::Warning,
+                source_.what + " cannot be taken from the bus: " + result.status.text);
         }
         std::this_thread::sleep_for(milliseconds(200));
     }
     return nullptr;
 }
 
-void OutcomeFeed::work() {
+void HostFeed::work() {
     std::unique_ptr<Pull> pull;
     while (!isEnding_) {
         if (!pull) pull = opened();
@@ -56,11 +58,11 @@ void OutcomeFeed::work() {
     }
 }
 
-void OutcomeFeed::handOn(Pull& pull, const std::vector<Pull::Taken>& messages) {
+void HostFeed::handOn(Pull& pull, const std::vector<Pull::Taken>& messages) {
     std::vector<Told> told;
     for (const Pull::Taken& message : messages) {
-        if (message.subject.rfind(kSubject, 0) != 0) continue;
-        told.push_back({message.subject.substr(sizeof kSubject - 1), message.bytes});
+        if (message.subject.rfind(source_.subject, 0) != 0) continue;
+        told.push_back({message.subject.substr(source_.subject.size()), message.bytes});
     }
     const bool isTaken = take_(std::move(told));
     // What cannot be kept now is not asked for again at once.
