@@ -213,7 +213,8 @@ void FileDepot::insistOnRoom(std::uint64_t more, std::uint64_t now) const {
     if (::statvfs(directory_.c_str(), &disk) != 0) fail(directory_);
     const double free = static_cast<double>(disk.f_bavail) * static_cast<double>(disk.f_frsize);
     const double whole = static_cast<double>(disk.f_blocks) * static_cast<double>(disk.f_frsize);
-    if (free - static_cast<double>(std::max(more, now)) < limits_.freeShare * whole) {
+    const double kept = std::min(limits_.freeShare * whole, static_cast<double>(limits_.freeBytes));
+    if (free - static_cast<double>(std::max(more, now)) < kept) {
         throw DepotError(Kind::Full, "the centre's disk would be too full with this file");
     }
 }

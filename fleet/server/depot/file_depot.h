@@ -31,8 +31,10 @@ private:
 struct DepotLimits {
     std::uint64_t fileBytes = std::uint64_t{16} << 30;
     std::uint64_t allBytes = std::uint64_t{64} << 30;
-    /// Of the disk, that stays free whatever comes: the orders' database is on it, too.
+    /// That stays free whatever comes, because the orders' database is on the disk, too: this share
+    /// of the disk, and of a large one as many bytes.
     double freeShare = 0.2;
+    std::uint64_t freeBytes = std::uint64_t{4} << 30;
     /// An order lives 7 days; a file that nobody has used for longer goes.
     Moment unusedTime = std::chrono::hours(24 * 8);
 };

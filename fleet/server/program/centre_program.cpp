@@ -25,6 +25,8 @@ using Steady = std::chrono::steady_clock;
 constexpr seconds kAnswerTime{10};
 constexpr seconds kFarewellTime{5};
 constexpr seconds kPause{1};
+/// A bus that is not away but whose store is, for as long, has lost its account.
+constexpr seconds kStoreAway{10};
 /// Letters that share one transaction, and orders that are published between two looks at them.
 constexpr std::size_t kMostAtOnce = 256;
 /// Hellos that wait; those beyond are said again.
@@ -105,7 +107,7 @@ void CentreProgram::connect() {
         say(Priority::Warning, "the bus: " + what);
     };
     options.events.closed = [this](const std::string& why) {
-        if (isEnding_ || isBusLost_.exchange(true)) return;
+        if (isEnding_ || isReaching_ || isBusLost_.exchange(true)) return;
         say(Priority::Error, "the bus refuses this centre: " + why);
         mailbox_.put([this] {
             if (!end_) end_ = End::LeaseLost;
@@ -140,15 +142,41 @@ bool CentreProgram::ensureStreams() {
     return true;
 }
 
-/// Waits until this centre may work. False if it is to end before.
-bool CentreProgram::claim() {
-    std::string last;
+/// A server may take an account apart while the centre's connection comes: its store never answers
+/// that connection then, nor those that come later, until the account is told anew.
+void CentreProgram::reachAnew() {
+    say(Priority::Warning, "the bus's store does not answer; connecting anew");
+    isReaching_ = true;
+    lease_.reset();
+    connection_->close(kFarewellTime);
+    connection_.reset();
+    isReaching_ = false;
+    if (settings_.storeAway) settings_.storeAway();
+    connect();
+}
+
+void CentreProgram::prepareLease() {
     lease_ = std::make_unique<Lease>(*connection_,
                                      Lease::Settings{kCentreStream, kLeaseSubject, settings_.holder,
                                                      settings_.leaseTerm, settings_.leaseTerm / 3});
+}
+
+/// Waits until this centre may work. False if it is to end before.
+bool CentreProgram::claim() {
+    std::string last;
+    auto answered = Steady::now();
+    prepareLease();
     while (!isEnding_ && !isBusLost_) {
         const auto asked = Steady::now();
+        if (asked - answered > kStoreAway && connection_->connected()) {
+            reachAnew();
+            if (isEnding_) return false;
+            prepareLease();
+            answered = Steady::now();
+            continue;
+        }
         if (ensureStreams()) {
+            answered = asked;
             const Lease::State state = lease_->claim();
             if (state.kind == Lease::State::Kind::Ours) {
                 leaseUntil_ = (asked + settings_.leaseTerm).time_since_epoch().count();

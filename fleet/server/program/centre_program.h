@@ -50,6 +50,8 @@ struct CentreSettings {
     /// Called once, within the transaction that completes a database which was put back from a
     /// backup. On the thread of run(). May be empty.
     std::function<void(CentreParts& parts, Moment now)> putBack = {};
+    /// Called when the bus's store does not answer although the bus does. May be empty.
+    std::function<void()> storeAway = {};
     std::vector<std::string> earlierKeys = {};  ///< public keys that have numbered orders before
 };
 
@@ -115,6 +117,8 @@ private:
     void finish();
     bool claim();
     bool ensureStreams();
+    void reachAnew();
+    void prepareLease();
     bool beginWork();
     bool hearHellos();
     bool completePutBack();
@@ -144,8 +148,9 @@ private:
     std::vector<std::function<void()>> afterCommit_;
     std::optional<End> end_;
     std::atomic<bool> isEnding_{false};
-    std::atomic<bool> isWorking_{false};  // and the loop reads letters
-    std::atomic<bool> isBusLost_{false};  // the bus wants this centre no more
+    std::atomic<bool> isWorking_{false};   // and the loop reads letters
+    std::atomic<bool> isReaching_{false};  // the connection is closed to make another one
+    std::atomic<bool> isBusLost_{false};   // the bus wants this centre no more
     /// Until when the lease is surely ours, in ticks of the steady clock.
     std::atomic<std::chrono::steady_clock::rep> leaseUntil_{0};
     std::map<std::string, HostNews> news_;

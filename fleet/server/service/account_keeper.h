@@ -21,6 +21,8 @@ public:
     AccountKeeper(const AccountKeeper&) = delete;
     AccountKeeper& operator=(const AccountKeeper&) = delete;
 
+    /// Has it tell the bus all accounts once more, at its next look.
+    void tellAgain() { told_ = -1; }
     /// How often the bus has taken all accounts.
     int rounds() const { return rounds_; }
 

@@ -3,7 +3,9 @@
 #include <unistd.h>
 
 #include <array>
+#include <chrono>
 #include <optional>
+#include <thread>
 #include <utility>
 
 #include "fleet/bus/messages/certificate.h"
@@ -15,6 +17,9 @@
 
 namespace fleet {
 namespace {
+
+constexpr std::chrono::seconds kToldWithin{10};
+constexpr std::chrono::milliseconds kToldLook{20};
 
 /// For another centre that finds the lease taken.
 std::string holderName() {
@@ -59,6 +64,7 @@ CentreSettings CentreService::settings(const ServiceOptions& options) {
     }
     settings.revoked = [this] { return revoked_; };
     settings.alarm = sayAlarm;
+    settings.storeAway = [this] { accounts_->tellAgain(); };
     settings.attend = [this](CentreParts& parts, Moment now) { return attend(parts, now); };
     settings.putBack = [this](CentreParts& parts, Moment now) {
         begin(parts);
@@ -71,6 +77,11 @@ CentreProgram::End CentreService::run() {
     // The accounts are up to date whether or not this centre has the lease: a stolen key waits for
     // nobody.
     accounts_ = std::make_unique<AccountKeeper>(directory_.path(), busOptions());
+    // A server that loads an account for a connection while it is told another one of that name may
+    // lose the account's store. So the centre connects when the bus has been told, or is away.
+    const auto patience = std::chrono::steady_clock::now() + kToldWithin;
+    while (accounts_->rounds() == 0 && !isEnding_ && std::chrono::steady_clock::now() < patience)
+        std::this_thread::sleep_for(kToldLook);
     const CentreProgram::End end = centre_->run();
     accounts_.reset();
     return end;

@@ -1,6 +1,7 @@
 /// zavfleetd at work, as its directory says.
 #pragma once
 
+#include <atomic>
 #include <cstdint>
 #include <future>
 #include <memory>
@@ -45,7 +46,10 @@ public:
     /// Works until it is asked to end or must not go on. See CentreProgram::run().
     CentreProgram::End run();
     /// Any thread, at any time.
-    void end() { centre_->end(); }
+    void end() {
+        isEnding_ = true;
+        centre_->end();
+    }
     const FleetDirectory& directory() const { return directory_; }
     /// Any thread.
     CentreProgram& centre() { return *centre_; }
@@ -74,6 +78,7 @@ private:
     std::unique_ptr<Rollouts> rollouts_;
     std::unique_ptr<CentreProgram> centre_;
     std::unique_ptr<AccountKeeper> accounts_;
+    std::atomic<bool> isEnding_{false};
 };
 
 }  // namespace fleet

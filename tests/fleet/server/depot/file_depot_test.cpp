@@ -5,7 +5,9 @@
 #include <sys/stat.h>
 
 #include <chrono>
+#include <cstdint>
 #include <fstream>
+#include <limits>
 #include <string>
 
 #include "fleet/bus/trust/checksum.h"
@@ -155,6 +157,7 @@ TEST_F(Depot, TakesNoMoreThanItMay) {
 TEST_F(Depot, LeavesTheDiskRoomForTheDatabase) {
     DepotLimits cautious = limits();
     cautious.freeShare = 1;
+    cautious.freeBytes = std::numeric_limits<std::uint64_t>::max();
     FileDepot full(scratch_.path("full"), cautious);
     try {
         full.add(sumOf("x"), 1, 0, "x", kNow);
@@ -162,6 +165,14 @@ TEST_F(Depot, LeavesTheDiskRoomForTheDatabase) {
     } catch (const DepotError& error) {
         EXPECT_EQ(error.kind(), DepotError::Kind::Full);
     }
+}
+
+TEST_F(Depot, KeepsNoMoreOfALargeDiskThanTheDatabaseNeeds) {
+    DepotLimits cautious = limits();
+    cautious.freeShare = 1;
+    cautious.freeBytes = 1;
+    FileDepot large(scratch_.path("large"), cautious);
+    EXPECT_TRUE(large.add(sumOf("x"), 1, 0, "x", kNow).isComplete());
 }
 
 TEST_F(Depot, ForgetsWhatNobodyHasUsedForDays) {
