@@ -233,11 +233,15 @@ void Journal::noteTrouble(const std::string& trouble) {
     troubled_.store(!trouble.empty());
 }
 
-/// Without the reserve an outcome might find no room.
+/// Without the reserve an outcome might find no room. What is written may still find some, so this
+/// is no trouble that the next commit ends.
 void Journal::insistOnReserve() {
-    if (directory_ && !directory_->takeReserve()) {
-        throw NotKept("the disk with " + directory_->path() + " is full");
-    }
+    const bool isTaken = !directory_ || directory_->takeReserve();
+    const bool wasTaken = !lacksReserve_.exchange(!isTaken);
+    if (isTaken) return;
+    const std::string reason = "the disk with " + directory_->path() + " is full";
+    if (wasTaken) warn("the journal cannot record requests: " + reason);
+    throw NotKept(reason);
 }
 
 void Journal::enter(Task& task) {

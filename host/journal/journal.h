@@ -192,7 +192,8 @@ private:
     std::function<void()> whenCommitted_ ZAV_GUARDED_BY(committedLock_);
     mutable embedded::Mutex troubleLock_;
     std::string trouble_ ZAV_GUARDED_BY(troubleLock_);
-    std::atomic<bool> troubled_{false};  ///< whether there is any
+    std::atomic<bool> troubled_{false};      ///< whether there is any
+    std::atomic<bool> lacksReserve_{false};  ///< since a request was not recorded for that
 
     embedded::Mutex readLock_;        ///< around the connection that reads
     std::unique_ptr<Writer> writer_;  ///< last, so that it ends first

@@ -96,6 +96,28 @@ TEST_F(Journals, KeepEverythingAboutATask) {
     EXPECT_EQ(kept->commands[0].err.text(), std::string("\xFF\0", 2));
 }
 
+TEST_F(Journals, WarnOnceThatRequestsCannotBeRecorded) {
+    open();
+    const std::string warning =
+        "the journal cannot record requests: the disk with " + scratch.path("state") + " is full\n";
+    const auto enterInVain = [this] {
+        Task task = asked("t");
+        EXPECT_THROW(journal->enter(task), host::NotKept);
+    };
+    for (int i = 0; i < 2; ++i) {  // again when there was room meanwhile
+        entered("there is room");
+        std::filesystem::remove(scratch.path("state/reserve"));
+        scratch.makeDir("state/reserve");
+        testing::internal::CaptureStderr();
+        enterInVain();
+        EXPECT_THAT(testing::internal::GetCapturedStderr(), testing::EndsWith(warning));
+        testing::internal::CaptureStderr();
+        enterInVain();
+        EXPECT_EQ(testing::internal::GetCapturedStderr(), "");
+        std::filesystem::remove(scratch.path("state/reserve"));
+    }
+}
+
 TEST_F(Journals, FindTasksByIdentifierAndTheNewestByItsTransaction) {
     open();
     const Task first = entered("same");
