@@ -53,8 +53,9 @@ private:
 std::string depotOf(CheckSubject& subject);
 
 /// Looks at one thing. Changes nothing. Only what keeps the host from its work is an error: a
-/// program of the home that is missing or cannot be executed, a directory that cannot be used, a
-/// run-as database that does not parse, a time-out that is none, and a plug-in that does not fit.
+/// program of the home that is missing or cannot be executed, a directory that cannot be used or
+/// whose path the plug-in cuts, a run-as database that does not parse or has entries that would be
+/// overlooked, a time-out that is none, and a plug-in that does not fit.
 using CheckFunction = Finding(CheckSubject& subject);
 
 /// One row of the list of checks.

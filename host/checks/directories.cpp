@@ -12,6 +12,7 @@
 #include <system_error>
 
 #include "host/checks/check.h"
+#include "host/checks/lossy_path.h"
 #include "host/depot/depot_directory.h"
 #include "host/home/temporary_directory.h"
 
@@ -90,7 +91,9 @@ std::string depotOf(CheckSubject& subject) {
 }
 
 Finding checkDepot(CheckSubject& subject) {
-    Finding finding = usable(depotOf(subject), "every command and every push would be refused");
+    const std::string depot = depotOf(subject);
+    Finding finding = usable(depot, "every command and every push would be refused");
+    if (finding.verdict == Verdict::Ok) finding = lossOf(depot).value_or(finding);
     if (finding.verdict != Verdict::Ok) {
         finding.remedy += ", or name another one in ";
         finding.remedy += kDepotVariable;

@@ -12,9 +12,11 @@
 #include <set>
 #include <string>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 #include "host/checks/check.h"
+#include "host/checks/lossy_path.h"
 #include "host/checks/wording.h"
 #include "host/home/run_as_list.h"
 #include "host/home/temporary_directory.h"
@@ -77,6 +79,7 @@ CheckFunction checkHome, checkOwners, checkRunAs;
 
 Finding checkHome(CheckSubject& subject) {
     const std::string& home = subject.options.home;
+    if (auto loss = lossOf(home)) return *std::move(loss);
     const std::size_t odd = home.find_first_of(" \t\n'\"|\\");
     if (odd != std::string::npos) {
         return {Verdict::Warning,

@@ -17,6 +17,7 @@
 #include "host/commands/trace_texts.h"
 #include "host/process/children/descendants.h"
 #include "host/process/children/orphans.h"
+#include "host/process/children/pipe_writers.h"
 
 namespace host {
 namespace {
@@ -168,6 +169,7 @@ void Recorder::hearProcess(const ras1::HeardLine& line, std::string_view text) {
 
 void Recorder::begin(std::string_view line) {
     if (endsDescendants.load()) orphansBefore_ = orphans();
+    pipesBefore_ = pipesToRead();
     // Before the plug-in's own clock starts: the wait below must not outlast the plug-in's.
     began_ = std::chrono::steady_clock::now();
     notes_.pid.store(0);
@@ -199,10 +201,38 @@ void Recorder::count(std::size_t bytes) {
     written_ += bytes;
     const std::uint64_t most = mostOutput.load();
     if (written_ <= most) return;
-    ending_.tooMuch.store(true);
+    if (!ending_.tooMuch.exchange(true)) mostRead_ = most + kLeftInPipes;
     endForOutput();
-    // Whoever still writes is out of reach. The plug-in reads on until the command's time is over.
-    if (written_ > most + kLeftInPipes) std::this_thread::sleep_until(began_ + timeout_);
+    if (written_ > mostRead_) endWriters();
+}
+
+/// What still writes has made a session of its own and kept the command's pipes; an agent that has
+/// left its starter properly has not. The plug-in would read on until the command's time is over.
+/// Who cannot be ended is not read until then: that would fill the memory.
+void Recorder::endWriters() {
+    constexpr std::chrono::milliseconds kBetweenLooks{50};
+    const std::set<ino_t> pipes = pipesOfCommand();
+    while (haveWriters(pipes)) {
+        killWritersTo(pipes);
+        const auto now = std::chrono::steady_clock::now();
+        if (now >= began_ + timeout_) return;
+        std::this_thread::sleep_until(std::min(now + kBetweenLooks, began_ + timeout_));
+    }
+    mostRead_ = written_ + kLeftInPipes;
+}
+
+/// Those that have come since it began, without those of commands that other threads run.
+std::set<ino_t> Recorder::pipesOfCommand() const {
+    std::set<ino_t> pipes = pipesToRead();
+    for (const ino_t pipe : pipesBefore_)
+        pipes.erase(pipe);
+    const auto own = childrenOf(static_cast<pid_t>(::syscall(SYS_gettid)));
+    for (const pid_t command : host::commands()) {
+        if (std::find(own.begin(), own.end(), command) != own.end()) continue;
+        for (const ino_t pipe : pipesToWrite(command))
+            pipes.erase(pipe);
+    }
+    return pipes;
 }
 
 /// Kills at once: what a command writes while it makes up its mind would fill the memory.
@@ -304,6 +334,7 @@ Heard Recorder::take() {
     commands_.clear();
     open_ = false;
     written_ = 0;
+    mostRead_ = 0;
     heard.tooMuchOutput = ending_.tooMuch.exchange(false);
     maskLines(heard.commands);
     return heard;

@@ -1,12 +1,15 @@
 /// Makes a list of commands from the trace lines of one thread.
 #pragma once
 
+#include <sys/types.h>
+
 #include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <deque>
 #include <functional>
 #include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -101,6 +104,8 @@ private:
     std::optional<OutputPiece> store(std::string_view piece, bool isError, std::string& shown);
     void count(std::size_t bytes);
     void endForOutput();
+    void endWriters();
+    std::set<ino_t> pipesOfCommand() const;
     void waitForEnd(pid_t pid, bool onlyLook);
     void close(std::string_view status);
     /// The command in hand with what its child has said.
@@ -115,6 +120,8 @@ private:
     std::chrono::seconds timeout_{0};
     std::vector<pid_t> orphansBefore_;  ///< that were there when the command began
     std::uint64_t written_ = 0;         ///< bytes since the last take()
+    std::uint64_t mostRead_ = 0;        ///< of them, once they are too many
+    std::set<ino_t> pipesBefore_;       ///< that could be read when the command began
 
     ChildNotes notes_;
     Ending ending_;

@@ -7,6 +7,7 @@
 
 #include "host/guard/guard.h"
 #include "host/guard/refusal.h"
+#include "host/tables/narrow_text.h"
 #include "host/tables/plugin_facts.h"
 
 namespace host {
@@ -21,33 +22,15 @@ bool isAscii(std::string_view text) {
                        [](char c) { return static_cast<unsigned char>(c) < 0x80; });
 }
 
-/// The number of UTF-16 units of a text in UTF-8.
-std::size_t unitsOf(std::string_view utf8) {
-    std::size_t units = 0;
-    for (const char c : utf8) {
-        const auto byte = static_cast<unsigned char>(c);
-        const bool continues = (byte & 0xC0U) == 0x80;
-        if (!continues) units += byte >= 0xF0 ? 2 : 1;
-    }
-    return units;
-}
-
-/// How many bytes of the text are cut: its bytes less its units less one.
-std::size_t cutOff(const std::string& text, const CodePage& codePage) {
-    if (isAscii(text)) return 0;
-    const std::size_t room = unitsOf(codePage.toUtf8(text)) + 1;
-    return text.size() > room ? text.size() - room : 0;
-}
-
 std::string padded(const std::string& text, const CodePage& codePage) {
-    return text + std::string(cutOff(text, codePage), ' ');
+    return text + std::string(bytesCut(text, codePage), ' ');
 }
 
 /// The name of the metafile stands before the closing quote of a command line, too, of which as
 /// many bytes are cut as of the name. The quote that stands there in its place comes right after
 /// the name, so that the name ends where it should.
 std::string paddedInQuotes(const std::string& name, const CodePage& codePage) {
-    std::string padding(cutOff(name, codePage), ' ');
+    std::string padding(bytesCut(name, codePage), ' ');
     if (!padding.empty()) padding.front() = '"';
     return name + padding;
 }
@@ -68,7 +51,7 @@ std::string paddedEach(const std::string& names, const CodePage& codePage) {
 /// list may be cut than the blanks at its end; nobody would get a row that has to equal it.
 _IntfOper comparisonWithAnswer(const std::string& value, const CodePage& codePage) {
     const std::size_t blanks = value.size() - (value.find_last_not_of(' ') + 1);
-    return cutOff(value, codePage) > blanks ? OPER_NE : OPER_EQ;
+    return bytesCut(value, codePage) > blanks ? OPER_NE : OPER_EQ;
 }
 
 bool mayHoldText(std::string_view column) {

@@ -84,6 +84,13 @@ http::Answer getEvents(Services& services, const Call& call) {
         return http::errorReply(403,
                                 "you may only read from this host; " + name + " takes requests");
     }
+    if (name == plugin::kOutcomeTable && call.peer().access < http::Access::Act) {
+        for (const auto& [column, text] : call.columns()) {
+            if (!plugin::holdsFreeText(column)) continue;
+            return http::errorReply(403, "you may only read from this host, and what is in " +
+                                             column + " is not shown to you as it is");
+        }
+    }
     const ConditionReader reader(*table, services.codePage);
     std::vector<oxa::Predicate> where;
     for (const auto& [column, text] : call.columns())

@@ -11,6 +11,7 @@
 #include "host/api/schema.h"
 #include "host/api/services.h"
 #include "host/api/tasks/task_document.h"
+#include "host/tables/masked_row.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
 #include "routes/bad_request.h"
@@ -142,8 +143,10 @@ private:
     void append(const JournalEvent& event, std::string& text) {
         if (event.kind == EventKind::Row) {
             if (filter_ && !filter_->takes(whole(event.row, table_).data())) return;
+            const std::string seen =
+                outputs_ == Outputs::Shown ? event.row : rowForReaders(table_, event.row);
             http::appendEvent(
-                text, {rowDocument(table_, event.row, services_.codePage), {}, idOf(event.number)});
+                text, {rowDocument(table_, seen, services_.codePage), {}, idOf(event.number)});
         } else if (tasks_) {
             const std::optional<Task> task = services_.journal.byNumber(event.task);
             if (!task || !wants(*task)) return;

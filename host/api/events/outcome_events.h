@@ -17,7 +17,7 @@ struct Services;
 struct OutcomeWish {
     std::vector<oxa::Predicate> where;  ///< conditions on the outcome table, all of which must hold
     bool tasks = false;                 ///< the ends of tasks, too
-    Outputs outputs = Outputs::Hidden;  ///< whether the ends of tasks have them
+    Outputs outputs = Outputs::Hidden;  ///< else rows are rowForReaders()
     std::string after;                  ///< the event after which to continue; empty: from now on
 };
 

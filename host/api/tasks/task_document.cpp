@@ -2,6 +2,7 @@
 
 #include <nlohmann/json.hpp>
 
+#include "host/tables/masked_row.h"
 #include "host/tables/plugin_facts.h"
 #include "host/tables/table_documents.h"
 #include "text/utc_time.h"
@@ -25,15 +26,17 @@ std::string lowerCase(std::string name) {
     return name;
 }
 
-Json rowObject(std::string_view tableName, const std::string& row, const Services& services) {
+Json rowObject(std::string_view tableName, const std::string& row, const Services& services,
+               Outputs outputs) {
     const oxa::Table* const table = services.tables.find(std::string(tableName));
     if (table == nullptr || row.empty()) return nullptr;
-    return Json::parse(rowDocument(*table, row, services.codePage));
+    const std::string seen = outputs == Outputs::Shown ? row : rowForReaders(*table, row);
+    return Json::parse(rowDocument(*table, seen, services.codePage));
 }
 
 /// The row that answered; without the configuration, which is not kept.
-Json replyObject(const Task& task, const Services& services) {
-    Json reply = rowObject(plugin::kRequestTable, task.reply, services);
+Json replyObject(const Task& task, const Services& services, Outputs outputs) {
+    Json reply = rowObject(plugin::kRequestTable, task.reply, services, outputs);
     const std::string_view command = task.value(plugin::kCommandColumn);
     if (reply.is_object() && plugin::holdsConfiguration(command)) {
         reply.erase(std::string(plugin::kContextColumn));
@@ -96,10 +99,10 @@ std::string taskDocument(const Task& task, const Services& services, Outputs out
     if (!boot.empty()) document["boot"] = boot;
     if (task.forced) document["force"] = true;
     if (task.interruptions > 0) document["interruptions"] = task.interruptions;
-    document["reply"] = replyObject(task, services);
+    document["reply"] = replyObject(task, services, outputs);
     Json events = Json::array();
     for (const std::string& row : task.outcomes)
-        events.push_back(rowObject(plugin::kOutcomeTable, row, services));
+        events.push_back(rowObject(plugin::kOutcomeTable, row, services, outputs));
     document["events"] = std::move(events);
     Json commands = Json::array();
     for (const Command& command : task.commands)

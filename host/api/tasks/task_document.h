@@ -13,7 +13,7 @@
 
 namespace host {
 
-/// Whether what commands wrote may be told.
+/// Whether what commands wrote may be told, also by rows that hold it.
 enum class Outputs { Hidden, Shown };
 
 /// Shown to those who may act only: it may hold anything.
@@ -31,7 +31,8 @@ std::vector<shape::Property> commandProperties(Components& components);
 nlohmann::ordered_json taskSummary(const Task& task, const CodePage& codePage);
 
 /// The summary with the run of the host and the start of the machine in which it was handed over,
-/// "force", "interruptions", "reply", "events" and "details", as text.
+/// "force", "interruptions", "reply", "events" and "details", as text. Where outputs are hidden,
+/// its rows are those of rowForReaders().
 std::string taskDocument(const Task& task, const Services& services, Outputs outputs);
 
 /// Answers with that document.

@@ -10,6 +10,7 @@
 
 #include "host/depot/real_path.h"
 #include "host/depot/transfers/conversion_probe.h"
+#include "host/tables/narrow_text.h"
 
 namespace host {
 namespace {
@@ -54,16 +55,6 @@ dev_t deviceOf(std::string path) {
             path.pop_back();
     }
     return 0;
-}
-
-/// As the plug-in counts characters.
-std::size_t utf16Units(const std::string& utf8) {
-    std::size_t units = 0;
-    for (const char c : utf8) {
-        const auto byte = static_cast<unsigned char>(c);
-        if ((byte & 0xC0U) != 0x80U) units += byte >= 0xF0 ? 2U : 1U;
-    }
-    return units;
 }
 
 /// Those of the paths, without links, that lie in the depot or hold it.
@@ -165,6 +156,17 @@ bool TransferRules::canConvertAt(const std::string& name) const {
     return deviceOf(pathOf(name)) == deviceOf(temporaries_);
 }
 
+Objection TransferRules::objectionToCut(const std::string& name) const {
+    const std::size_t cut = bytesCut(pathOf(name), codePage_);
+    return {"depot-names",
+            "the file would arrive under another name: for letters outside ASCII in its path the "
+            "plug-in cuts " +
+                std::to_string(cut) + (cut == 1 ? " byte" : " bytes") + " off the end",
+            bytesCut(textOf(name), codePage_) > 0
+                ? "Rename the file: a name of ASCII letters is safe, also those of its folders."
+                : "Rename the file or use a depot whose path is ASCII: such paths are safe."};
+}
+
 std::optional<Objection> TransferRules::objectionTo(const std::string& name,
                                                     const std::string& destination,
                                                     bool startsFile) const {
@@ -177,6 +179,7 @@ std::optional<Objection> TransferRules::objectionTo(const std::string& name,
                              ", and would arrive as another one",
                          "Rename the file."};
     }
+    if (bytesCut(pathOf(name), codePage_) > 0) return objectionToCut(name);
     if (!isConverted(name)) return std::nullopt;
     if (!conversionProblem_.empty()) {
         return Objection{"depot-conversion",

@@ -68,6 +68,8 @@ public:
 private:
     bool isKept(const std::string& name, const std::string& destination, bool startsFile) const;
     bool canConvertAt(const std::string& name) const;
+    /// When the plug-in cuts the path.
+    Objection objectionToCut(const std::string& name) const;
     std::string pathOf(const std::string& name) const;
     /// Its name as it arrives, or as it is when it is no text.
     std::string textOf(const std::string& name) const { return arrivalName(name).value_or(name); }

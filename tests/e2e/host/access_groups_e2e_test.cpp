@@ -15,6 +15,7 @@ namespace {
 namespace fs = std::filesystem;
 using nlohmann::json;
 using testing::HasSubstr;
+using testing::Not;
 using Words = std::vector<std::string>;
 
 /// Groups that every machine has.
@@ -109,6 +110,35 @@ TEST_F(Groups, OfReadersSeeNothingOfWhatCommandsWrite) {
     expectRefused(kReaders, {"task", "output", id}, "you may only read from this host");
     const ProgramResult operators = as(kOperators, {"--json", "task", "show", id});
     EXPECT_THAT(operators.out, HasSubstr("said-by-the-agent"));
+}
+
+TEST_F(Groups, OfReadersSeeNothingOfWhatCommandsThatFailWrite) {
+    // A failed SETCONFIG has the translator's errors among its values, a failed INSTALL its
+    // command.
+    home_.products({"ux"}, "echo said-by-the-translator >&2; exit 3");
+    host_->zavctl({"config", "set", "ux", "INSTANCE=ux password=secret-one"});
+    host_->zavctl({"install", "ux", "7.1", "--", "/bin/false", "password=secret-two"});
+    const json tasks = json::parse(host_->zavctl({"--json", "tasks"}).out).at("tasks");
+    ASSERT_EQ(tasks.size(), 2U);
+    for (const json& task : tasks) {
+        const std::string id = task.at("id");
+        const json shown = json::parse(as(kReaders, {"--json", "task", "show", id}).out);
+        ASSERT_EQ(shown.at("state"), "failed") << shown;
+        EXPECT_EQ(shown.dump().find("said-by-the-translator"), std::string::npos) << shown;
+        EXPECT_EQ(shown.dump().find("secret-"), std::string::npos) << shown;
+        EXPECT_EQ(shown.at("events").at(0).at("RETMSGPARM"), "");
+        EXPECT_NE(shown.at("events").at(0).at("RETMSGID"), "");
+    }
+    const auto events = [this](const std::string& group) {
+        return as(group, {"--json", "--timeout", "20", "events", "--since", "0-0", "--count", "2"});
+    };
+    const ProgramResult seen = events(kReaders);
+    EXPECT_EQ(seen.status, 0) << seen.err;
+    EXPECT_THAT(seen.out, HasSubstr("SETCONFIG"));
+    EXPECT_THAT(seen.out, Not(HasSubstr("said-by-the-translator")));
+    EXPECT_THAT(seen.out, Not(HasSubstr("secret-")));
+    EXPECT_THAT(events(kOperators).out, HasSubstr("said-by-the-translator"));
+    EXPECT_THAT(events(kOperators).out, HasSubstr("secret-two"));  // as the plug-in gave it
 }
 
 TEST_F(Groups, OfReadersChangeNothing) {

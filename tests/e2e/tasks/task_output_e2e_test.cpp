@@ -150,6 +150,36 @@ TEST_F(TaskOutput, WithoutEndEndsTheTaskAndNotTheHostsMemory) {
     EXPECT_EQ(task(next, "?wait=60")["state"], "done") << "the next task may write again";
 }
 
+TEST_F(TaskOutput, OfAProcessInASessionOfItsOwnEndsTheTaskLongBeforeItsTimeIsOver) {
+    for (const auto guards : {ManagedHost::Guards::On, ManagedHost::Guards::Off}) {
+        host.reset();
+        host.emplace(home.path(), Environment{{"QVSDEPLOY_AGENTDEPOT", home.depot()}},
+                     std::vector<std::string>{"--max-output", "1000", "--task-timeout", "600"},
+                     guards);
+        const std::string id = install(home.files().script(
+            "script", "setsid sh -c 'echo $$ >\"" + path("pid") + "\"; exec yes' &\nexit 0"));
+        const json over = task(id, "?wait=60");
+        EXPECT_EQ(over["state"], "failed");
+        EXPECT_NE(over["reason"].get<std::string>().find("more than they may"), std::string::npos);
+        EXPECT_EQ(over["details"]["commands"][0].value("timed_out", false), false);
+        const std::string next = install(home.files().script("next", "exit 0"));
+        EXPECT_EQ(task(next, "?wait=60")["state"], "done") << "the next task may write again";
+    }
+}
+
+TEST_F(TaskOutput, OfAProcessInASessionOfItsOwnThatWritesElsewhereIsNotEnded) {
+    start({"--max-output", "1000"});
+    const std::string id = install(
+        home.files().script("script", "setsid sh -c 'echo $$ >\"" + path("new") + "\"; mv \"" +
+                                          path("new") + "\" \"" + path("pid") +
+                                          "\"; exec sleep 600' >/dev/null 2>&1 &\n"
+                                          "while [ ! -f '" +
+                                          path("pid") + "' ]; do sleep 0.05; done\nexec yes"));
+    EXPECT_EQ(task(id, "?wait=60")["state"], "failed");
+    const pid_t agent = std::stoi(home.files().read("pid"));
+    EXPECT_EQ(::kill(agent, SIGKILL), 0) << "it had gone";
+}
+
 TEST_F(TaskOutput, BeyondTheLimitEndsEachFurtherCommandToo) {
     start({"--max-output", "1000"});
     home.products({"ux"}, "exit 0");

@@ -389,6 +389,31 @@ TEST_F(GuardedPush, NamesThatAreNoTextOverwriteEachOtherUnguarded) {
     EXPECT_EQ(depotFiles().size(), 1U);
 }
 
+TEST_F(GuardedPush, NamesThatWouldBeCutAreRefusedBeforeOneOverwritesTheOther) {
+    files_.write("tree/\u00dcbersicht-M\u00e4rz-1", "one");
+    files_.write("tree/\u00dcbersicht-M\u00e4rz-2", "two");
+    files_.write("tree/M\u00e4rz", "three");
+    startGuarded();
+    const ProgramResult result = push(files_.path("tree"));
+    EXPECT_EQ(result.status, 1);
+    EXPECT_THAT(result.out,
+                HasSubstr("the file would arrive under another name: for letters outside ASCII in "
+                          "its path the plug-in cuts 1 byte off the end"));
+    EXPECT_THAT(result.out + result.err, HasSubstr("a name of ASCII letters is safe"));
+    EXPECT_TRUE(depotFiles().empty());
+    EXPECT_EQ(push(files_.path("tree/M\u00e4rz")).status, 0);
+    EXPECT_EQ(depot("M\u00e4rz"), "three");
+}
+
+TEST_F(GuardedPush, NamesThatAreCutOverwriteEachOtherUnguarded) {
+    files_.write("tree/\u00dcbersicht-M\u00e4rz-1", "one");
+    files_.write("tree/\u00dcbersicht-M\u00e4rz-2", "two");
+    start();
+    push(files_.path("tree"));
+    ASSERT_EQ(depotFiles().size(), 1U);
+    EXPECT_THAT(depotFiles().front(), testing::EndsWith("\u00dcbersicht-M\u00e4rz-"));
+}
+
 TEST_F(GuardedPush, WhatDoesNotFitIsNotBegun) {
     startGuarded();
     const std::uintmax_t tooMuch = makeHuge();

@@ -43,4 +43,11 @@ TEST_F(DirectoryChecks, DepotAndTmpOnDifferentFilesystemsAreAWarning) {
     expectFinding("filesystem", Verdict::Warning, "/proc and " + home + "/tmp");
 }
 
+TEST_F(DirectoryChecks, ADepotWhosePathThePlugInWouldCutIsAnError) {
+    environment["QVSDEPLOY_AGENTDEPOT"] = scratch.makeDir("d\u00e9p\u00f4t\u00fc\u00fc");
+    expectFinding("depot", Verdict::Error, "here at least 3 bytes");
+    environment["QVSDEPLOY_AGENTDEPOT"] = scratch.makeDir("d\u00e9pot");
+    expectFinding("depot", Verdict::Warning, "in which the path stands twice");
+}
+
 }  // namespace

@@ -1,6 +1,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <clocale>
 #include <cstdio>
 
 #include "base/zavrunas.h"
@@ -15,6 +16,24 @@ class HomeChecks : public CheckTest {};
 TEST_F(HomeChecks, APathThatThePlugInWouldSplitIsAWarning) {
     options.home = scratch.makeDir("home with blanks");
     expectFinding("home", Verdict::Warning, "splits its command lines");
+}
+
+TEST_F(HomeChecks, APathThatThePlugInWouldCutIsAnError) {
+    options.home = scratch.makeDir("gr\u00f6\u00dfe/h\u00f6m\u00e9");
+    expectFinding("home", Verdict::Error, "here at least 3 bytes");
+    options.home = scratch.makeDir("\u20ac home");
+    expectFinding("home", Verdict::Error, "here at least 1 byte");
+}
+
+TEST_F(HomeChecks, APathThatThePlugInWouldCutWhereItStandsTwiceIsAWarning) {
+    options.home = scratch.makeDir("h\u00f6me");
+    expectFinding("home", Verdict::Warning, "in which the path stands twice");
+}
+
+TEST_F(HomeChecks, WhetherAPathIsCutDependsOnTheCodePage) {
+    if (std::setlocale(LC_CTYPE, "C") == nullptr) GTEST_SKIP();
+    options.home = scratch.makeDir("gr\u00f6\u00dfe");
+    EXPECT_STREQ(nameOf(find("home").verdict), "warning") << "it lacks directories, no more";
 }
 
 TEST_F(HomeChecks, MissingDirectoriesAreNamed) {

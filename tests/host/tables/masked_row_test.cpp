@@ -30,6 +30,12 @@ TEST(MaskedRow, KeepsItsLengthWhenTheMaskIsLongerThanTheValue) {
     EXPECT_EQ(host::maskedRow(outcomeTable(), row("this password=1")), row("this password=**"));
 }
 
+TEST(MaskedRow, ForReadersHasNoValuesOfItsMessage) {
+    EXPECT_EQ(host::rowForReaders(outcomeTable(), row("what it wrote")), row(""));
+    EXPECT_EQ(host::rowForReaders(outcomeTable(), row("")), row(""));
+    EXPECT_EQ(host::rowForReaders(outcomeTable(), "x"), "x");
+}
+
 TEST(MaskedRow, OfTheWrongLengthIsLeftAlone) {
     EXPECT_EQ(host::maskedRow(outcomeTable(), "pwd=x"), "pwd=x");
     EXPECT_EQ(host::maskedRow(outcomeTable(), ""), "");

@@ -108,6 +108,25 @@ TEST_F(QueryEndpoint, SaysThatATableIsNoLongerOffered) {
     expectError(404, "table PASSING is no longer offered", post(R"({"table":"PASSING"})"));
 }
 
+TEST_F(QueryEndpoint, LetsReadersPickNoOutcomesByWhatTheyDoNotSee) {
+    MadeUpTable outcomes("KAGDYST", {{"transid", 0, 12, OXA_TYPE_CHARACTER},
+                                     {"retmsgparm", 12, 32, OXA_TYPE_CHARACTER}});
+    outcomes.RegisterWithManager();
+    api.reset();
+    services.emplace(oxa::tables(), host::CodePage("UTF-8"), "/home/of/it");
+    api.emplace(*services, host::routes());
+    const std::string target = "/v1/events?table=KAGDYST&";
+    expectError(403,
+                "you may only read from this host, and what is in RETMSGPARM is not shown to you "
+                "as it is",
+                ask("GET", target + "RETMSGPARM=secret", "", http::Access::Read));
+    for (const auto& [column, access] :
+         {std::pair{"TRANSID", http::Access::Read}, {"RETMSGPARM", http::Access::Act}}) {
+        const http::Answer answer = answerTo("GET", target + column + "=x", "", access);
+        EXPECT_TRUE(std::holds_alternative<std::unique_ptr<http::EventSource>>(answer)) << column;
+    }
+}
+
 TEST_F(QueryEndpoint, LetsReadersQueryTheInventoryAndNothingElse) {
     MadeUpTable requests("KAGREQT", plainColumns());
     MadeUpTable inventory("KINAGT", plainColumns());

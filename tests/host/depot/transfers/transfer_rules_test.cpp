@@ -120,6 +120,16 @@ TEST_F(Rules, RefuseNamesThatAreNoText) {
     EXPECT_EQ(guardOf(rules(false), "bad\xFFname"), "");
 }
 
+TEST_F(Rules, RefuseNamesThatThePlugInWouldCut) {
+    for (const char* name : {"M\u00e4rz-\u00dc", "\u00e4/\u00e4", "\u20ac", "\U0001F600"}) {
+        EXPECT_EQ(guardOf(rules(), name), "[depot-names]") << name;
+        EXPECT_EQ(guardOf(rules(false), name), "") << name;
+    }
+    EXPECT_EQ(guardOf(rules(), "M\u00e4rz"), "");
+    const TransferRules narrow(homeDepot_, home_, CodePage("ISO-8859-1"), true);
+    EXPECT_EQ(guardOf(narrow, "\xE4\xE4\xE4"), "") << "a byte for each letter is what there is";
+}
+
 TEST_F(Rules, TakeWhatCanBeConverted) {
     EXPECT_EQ(rules().conversionProblem(), "");
     EXPECT_EQ(guardOf(rules(), "install.sh"), "");
