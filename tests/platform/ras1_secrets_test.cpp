@@ -41,7 +41,8 @@ TEST(Secrets, WhatFollowsASecretNameIsMasked) {
     EXPECT_EQ(shown("password=a\" b\"c d"), "password=*** d");
     EXPECT_EQ(shown("password=\"open\nnext=line"), "password=***\nnext=line");
     EXPECT_EQ(shown("key=abc"), "key=***") << "as long as before";
-    EXPECT_EQ(shown("token==x"), "token=***");
+    EXPECT_EQ(shown("token==x"), "token==***");
+    EXPECT_EQ(shown("token => x y"), "token => *** y");
 }
 
 TEST(Secrets, EverythingElseIsShown) {
