@@ -13,8 +13,8 @@ std::optional<Finding> lossOf(const std::string& path) {
     if (cut > 0) {
         return Finding{Verdict::Error,
                        path +
-                           " cannot be used: for letters outside ASCII the plug-in cuts as much "
-                           "off the end of its command lines, here at least " +
+                           " cannot be used: it has letters outside ASCII, for which the "
+                           "plug-in cuts its command lines at their end, here by at least " +
                            std::to_string(cut) + (cut == 1 ? " byte" : " bytes"),
                        "use a path of ASCII letters"};
     }

@@ -45,7 +45,7 @@ TEST_F(DirectoryChecks, DepotAndTmpOnDifferentFilesystemsAreAWarning) {
 
 TEST_F(DirectoryChecks, ADepotWhosePathThePlugInWouldCutIsAnError) {
     environment["QVSDEPLOY_AGENTDEPOT"] = scratch.makeDir("d\u00e9p\u00f4t\u00fc\u00fc");
-    expectFinding("depot", Verdict::Error, "here at least 3 bytes");
+    expectFinding("depot", Verdict::Error, "here by at least 3 bytes");
     environment["QVSDEPLOY_AGENTDEPOT"] = scratch.makeDir("d\u00e9pot");
     expectFinding("depot", Verdict::Warning, "in which the path stands twice");
 }

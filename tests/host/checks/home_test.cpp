@@ -20,9 +20,9 @@ TEST_F(HomeChecks, APathThatThePlugInWouldSplitIsAWarning) {
 
 TEST_F(HomeChecks, APathThatThePlugInWouldCutIsAnError) {
     options.home = scratch.makeDir("gr\u00f6\u00dfe/h\u00f6m\u00e9");
-    expectFinding("home", Verdict::Error, "here at least 3 bytes");
+    expectFinding("home", Verdict::Error, "here by at least 3 bytes");
     options.home = scratch.makeDir("\u20ac home");
-    expectFinding("home", Verdict::Error, "here at least 1 byte");
+    expectFinding("home", Verdict::Error, "here by at least 1 byte");
 }
 
 TEST_F(HomeChecks, APathThatThePlugInWouldCutWhereItStandsTwiceIsAWarning) {
