@@ -67,11 +67,17 @@ function flush(): void {
     for (const listener of [...listeners]) listener(batch);
 }
 
+/// Ten thousand tasks with their output would be a lot to keep. Who wants that asks for the task.
+function withoutOutput(task: Task): Task {
+    const commands = task.details.commands.map(({ stdout: _out, stderr: _err, ...command }) => command);
+    return { ...task, details: { ...task.details, commands } } as Task;
+}
+
 function contentOf(event: ServerEvent): FeedItem['content'] | undefined {
     try {
         const data = JSON.parse(event.data) as never;
         if (event.type === 'message') return { kind: 'row', row: data };
-        if (event.type === 'task') return { kind: 'task', task: data };
+        if (event.type === 'task') return { kind: 'task', task: withoutOutput(data) };
         if (event.type === 'gap') return { kind: 'gap', missing: (data as { missing: number | null }).missing };
     } catch {
         // What is no JSON is no event of this interface.

@@ -62,16 +62,6 @@ export class EventStream {
         this.wake();
     };
 
-    /// Tries again now instead of after the pause.
-    retry(): void {
-        this.wake();
-    }
-
-    /// Behind which event the stream goes on.
-    get lastPosition(): string {
-        return this.position;
-    }
-
     private async run(): Promise<void> {
         while (!this.stopped) {
             const problem = await this.once();

@@ -74,7 +74,7 @@ function InstanceRow({ instance, ask, isMine }: { instance: Instance; ask: Ask; 
     const named = instance.instance === '' ? '' : `&target=${encodeURIComponent(target)}`;
     return (
         <li class="instance">
-            <StateMark state={instance.state} text={instance.state === 'missing' ? 'should run, does not' : instance.state} />
+            <StateMark state={runs ? 'ok' : instance.state} text={instance.state === 'missing' ? 'should run, does not' : instance.state} />
             <span class="grow">
                 <code>{printable(target)}</code>
                 <span class="faint">{instance.user && ` ${printable(instance.user)}`}{instance.pid !== null && `, process ${instance.pid}`}</span>

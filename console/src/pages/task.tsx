@@ -17,7 +17,7 @@ import { notify } from '../state/notices';
 import { useResource } from '../state/resource';
 import { useStore } from '../state/store';
 import { cancelLine, titleOf } from '../words/lines';
-import { printable } from '../words/printable';
+import { printable, redacted } from '../words/printable';
 import { reasonOf, requestText } from '../words/results';
 
 function CancelDialog({ task, onClose }: { task: Task; onClose: () => void }) {
@@ -61,7 +61,7 @@ function Asked({ task }: { task: Task }) {
     ];
     return (
         <dl class="facts">
-            {members.map(([name, value]) => value && <div key={name} class="wide-fact"><dt>{name}</dt><dd><code>{printable(value)}</code></dd></div>)}
+            {members.map(([name, value]) => value && <div key={name} class="wide-fact"><dt>{name}</dt><dd><code>{redacted(value)}</code></dd></div>)}
         </dl>
     );
 }

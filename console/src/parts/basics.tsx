@@ -4,7 +4,7 @@ import { useEffect, useState } from 'preact/hooks';
 import type { Problem } from '../api/problem';
 import type { TaskState } from '../api/types';
 import { Store, useStore } from '../state/store';
-import { printable } from '../words/printable';
+import { printable, redacted } from '../words/printable';
 import { exactText, localText, parsedTime, relativeText } from '../words/time';
 
 /// The time as the page shows it. All relative times step together.
@@ -42,7 +42,7 @@ export function StateMark({ state, text }: { state: TaskState | string; text?: s
 export function ProblemBox({ problem, retry }: { problem: Problem; retry?: (() => void) | undefined }) {
     return (
         <div class="box bad" role="alert">
-            <p>{printable(problem.message)}</p>
+            <p>{redacted(problem.message)}</p>
             {problem.guard !== '' && <p class="faint">Refused by the guard <code>{printable(problem.guard)}</code>; nothing was changed.</p>}
             {problem.hint !== '' && <p>{printable(problem.hint)}</p>}
             {retry && <p><button type="button" onClick={retry}>Try again</button></p>}

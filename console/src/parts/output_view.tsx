@@ -1,7 +1,7 @@
 import { useEffect, useRef, useState } from 'preact/hooks';
 import type { Problem } from '../api/problem';
 import { followOutput } from '../live/output';
-import { printableLines } from '../words/printable';
+import { redactedLines } from '../words/printable';
 import { counted } from '../words/size';
 import { ProblemBox } from './basics';
 
@@ -58,7 +58,7 @@ export function OutputView({ task }: { task: string }) {
             {lost > 0 && <p class="box attention">{counted(lost, 'byte')} of the output were lost: they came too fast.</p>}
             <pre class="output" ref={view} tabIndex={0} role="region" aria-label="Output" onScroll={(event) => note(event.currentTarget)}>
                 {pieces.length === 0 ? <span class="faint">Nothing has been written yet.</span>
-                    : pieces.map((piece, i) => <span key={i} class={piece.stream}>{printableLines(piece.text)}</span>)}
+                    : pieces.map((piece, i) => <span key={i} class={piece.stream}>{redactedLines(piece.text)}</span>)}
             </pre>
         </>
     );

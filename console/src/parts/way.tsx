@@ -2,7 +2,7 @@
 import type { Command, Task } from '../api/types';
 import { isOver } from '../api/tasks';
 import { useStore } from '../state/store';
-import { printable, printableLines } from '../words/printable';
+import { printable, redacted, redactedLines } from '../words/printable';
 import { endText, endedBadly } from '../words/results';
 import { elapsedText, parsedTime } from '../words/time';
 import { StateMark, Time, now } from './basics';
@@ -62,7 +62,7 @@ export function Commands({ task }: { task: Task }) {
         <ul class="commands">
             {commands.map((command, i) => (
                 <li key={i}>
-                    <code class="command">{printable(command.command)}</code>
+                    <code class="command">{redacted(command.command)}</code>
                     <div class="bars" aria-hidden="true"><Bar command={command} from={from} to={to} current={current} /></div>
                     <p class="command-end">
                         <span class={`state ${command.ended === null ? 'busy' : endedBadly(command) ? 'bad' : 'good'}`}>{endText(command)}</span>
@@ -82,7 +82,7 @@ function Words({ name, text }: { name: string; text: string }) {
     return (
         <>
             <h3>{name}</h3>
-            <pre class="output short" tabIndex={0} role="region" aria-label={name}>{printableLines(text)}</pre>
+            <pre class="output short" tabIndex={0} role="region" aria-label={name}>{redactedLines(text)}</pre>
         </>
     );
 }

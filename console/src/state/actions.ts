@@ -10,7 +10,7 @@ import { reasonOf } from '../words/results';
 import { elapsedText, parsedTime } from '../words/time';
 import { type Finding, doubtAboutInstall, doubtAboutState, doubtAboutUninstall } from '../words/verification';
 import { health } from './host';
-import { notify, notifyProblem } from './notices';
+import { notify } from './notices';
 
 /// The task once it is over, as the feed tells it.
 function whenOver(task: Task): Promise<Task> {
@@ -73,14 +73,4 @@ export async function act(request: TaskRequest): Promise<Task> {
     noteWork(task);
     void tellEnd(title, request, task, key);
     return task;
-}
-
-/// The same, for a place that has nowhere to show a refusal.
-export async function actOrTell(request: TaskRequest): Promise<Task | undefined> {
-    try {
-        return await act(request);
-    } catch (error) {
-        notifyProblem(`${titleOf(request)}: refused`, asProblem(error));
-        return undefined;
-    }
 }

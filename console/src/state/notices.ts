@@ -1,5 +1,4 @@
 /// What the page says about actions, in the corner, until it is read.
-import type { Problem } from '../api/problem';
 import { Store } from './store';
 
 export interface Notice {
@@ -29,9 +28,4 @@ export function notify(notice: Omit<Notice, 'key'>, key: number = ++keys): numbe
 
 export function dismiss(key: number): void {
     notices.update((all) => all.filter((notice) => notice.key !== key));
-}
-
-export function notifyProblem(title: string, problem: Problem): void {
-    const guard = problem.guard === '' ? '' : ` (guard: ${problem.guard})`;
-    notify({ tone: 'bad', text: title, detail: problem.message + guard, hint: problem.hint });
 }

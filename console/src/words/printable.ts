@@ -2,6 +2,8 @@
 /// only ever makes text nodes of them. What is left are characters that nobody sees or that turn the
 /// direction of what stands beside them.
 
+import { masked } from './masked';
+
 const hidden = /[\u0000-\u0008\u000b-\u001f\u007f-\u009f\u200b-\u200f\u2028-\u202e\u2060-\u2069\ufeff]/g;
 const lineEnds = /[\t\n]/g;
 
@@ -21,3 +23,9 @@ export function printable(text: string): string {
 export function printableLines(text: string): string {
     return text.replace(/\r\n/g, '\n').replace(hidden, escaped);
 }
+
+/// One line of text without secrets.
+export const redacted = (text: string): string => printable(masked(text));
+
+/// Several lines of text without secrets.
+export const redactedLines = (text: string): string => printableLines(masked(text));

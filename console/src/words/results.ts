@@ -1,7 +1,7 @@
 /// How things ended, in the words of zavctl.
 import type { Command, Row, Task } from '../api/types';
 import { messages } from '../generated/messages';
-import { printable } from './printable';
+import { printable, redacted } from './printable';
 
 const textOf = (row: Row, column: string): string => {
     const value = (row as Record<string, unknown>)[column];
@@ -22,13 +22,13 @@ export function describeRow(row: Row): string {
     if (id === '' && code === undefined) return 'the host gave no return code';
     let text = id === '' ? `return code ${code}` : printable(id);
     if (messages[id] !== undefined) text += `: ${messages[id]}`;
-    if (parameter !== '') text += ` [${printable(parameter)}]`;
+    if (parameter !== '') text += ` [${redacted(parameter)}]`;
     return text;
 }
 
 /// "exit code 0", "killed by signal 9", "not known".
 export function endText(command: Command): string {
-    if (command.error !== undefined) return `could not be run: ${printable(command.error)}`;
+    if (command.error !== undefined) return `could not be run: ${redacted(command.error)}`;
     if (command.signal !== undefined) {
         return `${command.timed_out ? 'given up after its time-out, ' : ''}killed by signal ${command.signal}`;
     }
@@ -47,7 +47,7 @@ const usualReasons: Readonly<Record<string, string>> = {
 
 /// Why a task ended as it did; empty if there is nothing to say.
 export function reasonOf(task: Partial<Task> & Pick<Task, 'state'>): string {
-    if (task.reason) return printable(task.reason);
+    if (task.reason) return redacted(task.reason);
     const row = task.events?.at(-1) ?? task.reply;
     if (row && (returnCodeOf(row) !== 0 || textOf(row, 'RETMSGID') !== '')) return describeRow(row);
     if (task.state === 'failed') {

@@ -1,38 +1,66 @@
 // A host that puts a script into every text that it can fill. It is shown, and does not run.
 import assert from 'node:assert/strict';
 import { after, before, test } from 'node:test';
-import { untilText } from '../support/browser.mjs';
+import { press, untilText } from '../support/browser.mjs';
 import { raise } from '../support/stage.mjs';
 
 let stage;
 before(async () => (stage = await raise()));
 after(() => stage.strike());
 
+const evilName = encodeURIComponent('<img src=x onerror=reportFault(1)>');
+
+/// The address of a page, and where on it a text of the host must be seen.
+const places = (past, running) => [
+    ['/', 'main'], ['/agents', 'main'], ['/tasks', '.list'], [`/tasks/${past}`, '.commands'], [`/tasks/${running}`, '.output'],
+    ['/depot', '.list'], ['/events', '.list'], ['/doctor', 'main'],
+];
+
+async function hasNoElements(tab, address) {
+    const made = await tab.evaluate(() => document.querySelectorAll('main img, main script, dialog img, dialog script, .notices img, .notices script').length);
+    assert.equal(made, 0, `${address} has made elements of a host's text`);
+}
+
 test('scripts in whatever a host says are text', async () => {
     const view = await stage.open({ host: { isHostile: true } });
-    const { tab, faults, fake, go, own } = view;
-    own.isDisturbed = true;
+    const { tab, faults, fake, go } = view;
     fake.slow(60_000);
-    const task = fake.accept({ command: 'START', product: 'um' });
-    const past = 'a0a99408e7707b3d-24';
-    for (const address of ['/', '/agents', '/tasks', `/tasks/${past}`, `/tasks/${task.id}`, '/configuration?product=ux', '/depot', '/events', '/doctor', `/tasks/${encodeURIComponent('<img src=x onerror=reportFault(1)>')}`]) {
+    const running = fake.accept({ command: 'START', product: 'um' });
+    for (const [address, where] of places('a0a99408e7707b3d-24', running.id)) {
         await go(address);
-        await untilText(tab, '<script>', address.startsWith('/tasks/%') ? 'body' : 'main').catch(async (error) => {
-            if (address.startsWith('/configuration')) {
-                assert.match(await tab.$eval('.editor', (editor) => editor.value), /<script>/);
-            } else if (!address.startsWith('/tasks/%')) throw new Error(`${address}: ${error.message}`);
-        });
-        const own = await tab.evaluate(() => document.querySelectorAll('main img, main script, .notices img, .notices script').length);
-        assert.equal(own, 0, `${address} has made elements of a host's text`);
+        await untilText(tab, '<script>', where);
+        await hasNoElements(tab, address);
     }
+    await go('/configuration?product=ux');
+    await tab.waitForFunction(() => document.querySelector('.editor')?.value.includes('<script>'));
+    await tab.type('.editor', 'A=1\n');
+    await untilText(tab, '<script>', '.diff');
+    await hasNoElements(tab, 'the difference');
+    assert.deepEqual(faults, []);
+    await view.end();
+});
+
+test('scripts in refusals and outcomes are text', async () => {
+    const view = await stage.open({ host: { isHostile: true } });
+    const { tab, faults, go } = view;
+    view.own.isDisturbed = true;
+    await go(`/tasks/${evilName}`);
+    await untilText(tab, 'there is no task "<img', '[role=alert]');
+    await hasNoElements(tab, 'a task that is not there');
     await go('/agents');
-    await tab.evaluate(() => [...document.querySelectorAll('button')].find((one) => one.textContent === 'Stop').click());
-    await tab.evaluate(async () => {
-        const dialog = document.querySelector('dialog');
-        dialog?.querySelector('button[type=submit]')?.click();
-    });
-    await untilText(tab, 'accepted', '.notices').catch(() => undefined);
-    assert.deepEqual(faults.filter((fault) => /script of the host|policy|dialog/.test(fault)), []);
+    await untilText(tab, 'live', '.top');
+    await press(tab, 'Install…');
+    await tab.type('input[list="depot-products"]', 'zz');
+    await tab.type('input[list="depot-versions"]', '1');
+    await press(tab, 'Send install zz');
+    await untilText(tab, '<script>', 'dialog [role=alert]');
+    await hasNoElements(tab, 'a refusal');
+    await press(tab, 'Back');
+    await press(tab, 'Uninstall… um');
+    await press(tab, 'Send uninstall um');
+    await untilText(tab, 'uninstall um: done', '.notices');
+    await hasNoElements(tab, 'an outcome');
+    assert.deepEqual(faults, []);
     await view.end();
 });
 
