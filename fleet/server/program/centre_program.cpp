@@ -30,6 +30,8 @@ constexpr int kMostHellos = 20'000;
 /// What a number adds to an order, at most.
 constexpr std::size_t kNumberBytes = 4096;
 constexpr char kHelloSubject[] = "hello.";
+constexpr char kAnswerSubject[] = "ans.";
+constexpr char kAskSubject[] = "rp.ask.";
 constexpr char kTaskSubjects[] = "task.>";
 constexpr char kLeaseSubject[] = "$KV.CENTRE.lease";
 
@@ -89,7 +91,9 @@ void CentreProgram::finish() {
     // Each of them uses what stands before it.
     if (sweeper_) sweeper_->await();
     if (renewer_) renewer_->await();
+    questions_.close();
     hellos_.reset();
+    answers_.reset();
     outcomes_.reset();
     facts_.reset();
     if (lease_ && end_ != End::LeaseLost) lease_->release();
@@ -192,6 +196,7 @@ bool CentreProgram::beginWork() {
         say(Priority::Error, "hellos cannot be heard: " + made.status.text);
         return false;
     }
+    if (!openQuestions()) return false;
     toldLabels_.setAll(HostFacts(database_.connection()).labels());
     outcomes_ =
         std::make_unique<HostFeed>(*connection_, HostFeed::Source{kOutStream, "out.", "outcomes"},
@@ -205,6 +210,25 @@ bool CentreProgram::beginWork() {
     sweeper_->add([this] { sweep(); });
     isWorking_ = true;
     say(Priority::Info, "the centre works");
+    return true;
+}
+
+bool CentreProgram::openQuestions() {
+    Connection::Subscribed made = connection_->subscribe(
+        std::string(kAnswerSubject) + '*',
+        [this](const BusMessage& message) {
+            questions_.hear(message.subject.substr(sizeof kAnswerSubject - 1), message.data,
+                            wallClock());
+        },
+        kAnswerTime);
+    answers_ = std::move(made.subscription);
+    if (!answers_) {
+        say(Priority::Error, "answers cannot be heard: " + made.status.text);
+        return false;
+    }
+    questions_.open([this](const std::string& host, const std::string& bytes) {
+        if (hasLease()) static_cast<void>(connection_->publish(kAskSubject + host, bytes));
+    });
     return true;
 }
 
