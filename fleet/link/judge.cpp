@@ -46,14 +46,6 @@ std::string productIn(const json& body) {
     return product->get<std::string>();
 }
 
-void checkSelector(const std::string& selector, const Trust& trust, const char* reason) {
-    try {
-        refuseUnless(Selector(selector).matches(trust.name, trust.labels), reason);
-    } catch (const SelectorError& error) {
-        throw MessageError(error.what());
-    }
-}
-
 void fill(Directive& directive, const NumberedOrder& numbered, const Trust& trust,
           const KeyPair& key) {
     const SignedOrder read = readOrder(numbered.bytes);
@@ -75,9 +67,9 @@ void fill(Directive& directive, const NumberedOrder& numbered, const Trust& trus
     json body = openBody(order, key);
     refuseUnless(allows(certificate, order.kind, productIn(body)),
                  "the operator's certificate does not allow this command for this product");
-    checkSelector(certificate.selector, trust,
-                  "the operator's certificate is not for hosts with these labels");
-    checkSelector(order.selector, trust, "the order is not for hosts with these labels");
+    refuseUnless(isMeant(certificate.selector, trust),
+                 "the operator's certificate is not for hosts with these labels");
+    refuseUnless(isMeant(order.selector, trust), "the order is not for hosts with these labels");
     if (order.kind == kCancel) {
         directive.cancels = textIn(body, "order");
         refuseUnless(isOrderId(directive.cancels), "what is to be cancelled is no order");
@@ -92,6 +84,14 @@ void fill(Directive& directive, const NumberedOrder& numbered, const Trust& trus
 }
 
 }  // namespace
+
+bool isMeant(const std::string& selector, const Trust& trust) {
+    try {
+        return Selector(selector).matches(trust.name, trust.labels);
+    } catch (const SelectorError& error) {
+        throw MessageError(error.what());
+    }
+}
 
 std::optional<Directive> judge(std::string_view bytes, Number number, const Trust& trust,
                                const KeyPair& key) {

@@ -22,6 +22,9 @@ struct Trust {
     std::vector<std::string> centres;  ///< the centre's signing keys: there may be a newer one
 };
 
+/// Whether a selector means this host, by its own labels. Throws MessageError if it is none.
+bool isMeant(const std::string& selector, const Trust& trust);
+
 /// The order that has this number; nothing if the centre has not signed that, which is dropped and
 /// counted. Everything else that is wrong becomes the directive's refusal, which the host records.
 /// Times are not judged: that is done when its turn has come. `key` unseals what was sealed for

@@ -85,7 +85,7 @@ std::string makeOrderId() {
     return id;
 }
 
-std::string signOrder(const Order& order, const KeyPair& key, std::string_view certificate) {
+std::string textOfOrder(const Order& order) {
     json files = json::array();
     for (const OrderFile& file : order.files)
         files.push_back(documentOf(file));
@@ -98,7 +98,11 @@ std::string signOrder(const Order& order, const KeyPair& key, std::string_view c
                            {"files", std::move(files)},
                            {"issued", order.issued.count()},
                            {"expires", order.expires.count()}};
-    return signMessage(Purpose::Ordering, key, textOf(document), certificate);
+    return textOf(document);
+}
+
+std::string signOrder(const Order& order, const KeyPair& key, std::string_view certificate) {
+    return signMessage(Purpose::Ordering, key, textOfOrder(order), certificate);
 }
 
 SignedOrder readOrder(std::string_view bytes) {

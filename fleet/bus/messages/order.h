@@ -48,6 +48,8 @@ bool isOrderId(std::string_view text);
 /// A new one, of 128 random bits.
 std::string makeOrderId();
 
+/// The text that an order's signature covers.
+std::string textOfOrder(const Order& order);
 /// Signs an order and adds the operator's certificate.
 std::string signOrder(const Order& order, const KeyPair& key, std::string_view certificate);
 

@@ -72,6 +72,8 @@ public:
     Actions tick(Moment now);
 
     const Kept& kept() const { return kept_; }
+    /// Whether the centre has told that this operator's key counts no longer.
+    bool isRevoked(const std::string& key) const { return revoked_.count(key) > 0; }
     /// Why the next order is not handed over; "" if nothing is in the way.
     const std::string& blocked() const { return blocked_; }
 

@@ -81,6 +81,7 @@ BusSide::~BusSide() {
     isEnding_ = true;
     worker_.await();  // a job may be waiting for an answer of the connection
     published_.reset();
+    questions_.reset();
     if (connection_) connection_->close(kAnswerTime);
 }
 
@@ -103,6 +104,7 @@ ConnectionOptions BusSide::optionsOfThis() {
 void BusSide::disconnect() {
     ++attempt_;
     published_.reset();
+    questions_.reset();
     connection_.reset();
 }
 
@@ -134,7 +136,18 @@ bool BusSide::subscribe() {
         },
         kAnswerTime);
     published_ = std::move(made.subscription);
-    return published_ != nullptr;
+    return published_ != nullptr && subscribeToQuestions();
+}
+
+bool BusSide::subscribeToQuestions() {
+    Connection::QueueLimit limit;
+    limit.messages = 64;
+    limit.bytes = 4 << 20;
+    Connection::Subscribed made = connection_->subscribe(
+        "rp.ask." + trust_.host, [this](const BusMessage& message) { events_.asked(message.data); },
+        kAnswerTime, limit);
+    questions_ = std::move(made.subscription);
+    return questions_ != nullptr;
 }
 
 void BusSide::read(Number number) {
@@ -182,6 +195,15 @@ void BusSide::reportNow(const Outcome& outcome) {
     // by the next reply.
     static_cast<void>(
         connection_->publish("out." + trust_.host, publishedOutcome(outcome, signing_)));
+}
+
+void BusSide::answer(std::vector<std::string> pieces) {
+    worker_.add([this, pieces = std::move(pieces)] {
+        // Who asks sees what is lost, and asks again.
+        for (const std::string& piece : pieces) {
+            if (connection_) static_cast<void>(connection_->publish("ans." + trust_.host, piece));
+        }
+    });
 }
 
 void BusSide::tell(Facts facts, std::function<void(bool)> answer) {

@@ -5,6 +5,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "fleet/bus/messages/facts.h"
 #include "fleet/bus/nats/connection.h"
@@ -29,6 +30,7 @@ public:
         std::function<void(Number)> unanswered;
         std::function<void(Reply)> replied;
         std::function<void(const std::string& nonce)> unheard;
+        std::function<void(const std::string& bytes)> asked;  ///< something, by anybody
     };
 
     /// `signing` and the bus's key in `options` are this host's.
@@ -42,6 +44,8 @@ public:
     void read(Number number);
     void sayHello(Hello hello);
     void report(const Outcome& outcome);
+    /// Publishes the pieces of an answer.
+    void answer(std::vector<std::string> pieces);
     /// `answer` is told whether the bus has them; on the worker's thread.
     void tell(Facts facts, std::function<void(bool isStored)> answer);
 
@@ -53,6 +57,7 @@ private:
     void disconnect();
     ConnectionOptions optionsOfThis();
     bool subscribe();
+    bool subscribeToQuestions();
     void readNow(Number number);
     void sayHelloNow(const Hello& hello);
     void reportNow(const Outcome& outcome);
@@ -66,6 +71,7 @@ private:
     std::atomic<std::uint64_t> unsignedNumbers_{0};
     std::unique_ptr<Connection> connection_;  ///< the worker's
     std::unique_ptr<Subscription> published_;
+    std::unique_ptr<Subscription> questions_;
     std::atomic<bool> isEnding_{false};
     std::atomic<int> attempt_{0};  ///< tells events of this connection from those of earlier ones
     Worker worker_;                ///< last: it uses everything above

@@ -10,12 +10,16 @@
 #include "fleet/bus/messages/order.h"
 #include "fleet/files/files.h"
 #include "fleet/link/program/machine.h"
+#include "fleet/link/questions/answer_pieces.h"
 #include "fleet/log/log.h"
 
 namespace fleet {
 namespace {
 
 using std::chrono::seconds;
+
+/// Questions that wait for a look at them.
+constexpr int kMostQuestions = 16;
 
 /// 20 to 40 seconds.
 Moment drawnPause() {
@@ -28,17 +32,21 @@ Moment drawnPause() {
 LinkProgram::LinkProgram(const LinkConfiguration& configuration)
     : file_(configuration.state),
       latest_(file_.kept().latest),
+      trust_(trust(configuration)),
       link_(settings(), file_.kept()),
       facts_(ownFacts(configuration)) {
     files_ = std::make_unique<FileSide>(fileSettings(configuration));
-    bus_ = std::make_unique<BusSide>(busOptions(configuration), trust(configuration), file_.bus(),
+    bus_ = std::make_unique<BusSide>(busOptions(configuration), trust_, file_.bus(),
                                      file_.signing(), busEvents());
+    questions_ = std::make_unique<QuestionSide>(configuration.hostSocket);
     inventory_ = std::make_unique<InventorySide>(configuration.hostSocket);
     host_ = std::make_unique<HostSide>(configuration.hostSocket, hostEvents());
 }
 
 LinkProgram::~LinkProgram() {
-    // Each of them may still put letters into the mailbox, and nothing else.
+    // Its answers go to the bus.
+    questions_.reset();
+    // Each of these may still put letters into the mailbox, and nothing else.
     host_.reset();
     inventory_.reset();
     bus_.reset();
@@ -186,6 +194,15 @@ BusSide::Events LinkProgram::busEvents() {
     events.replied = [this](Reply reply) {
         tell([reply = std::move(reply)](Link& link, Moment at) { return link.replied(reply, at); });
     };
+    events.asked = [this](const std::string& bytes) {
+        // Those beyond are lost, as on the bus.
+        if (waitingQuestions_ >= kMostQuestions) return;
+        ++waitingQuestions_;
+        mailbox_.put([this, bytes] {
+            --waitingQuestions_;
+            consider(bytes);
+        });
+    };
     events.unheard = [this](const std::string& nonce) {
         tell([nonce](Link& link, Moment at) { return link.unheard(nonce, at); });
     };
@@ -229,6 +246,16 @@ void LinkProgram::tellFacts() {
             mailbox_.put([this, isStored] { facts_.stored(isStored); });
         });
     }
+}
+
+void LinkProgram::consider(const std::string& question) {
+    const Moment at = now();
+    const auto isRevoked = [this](const std::string& key) { return link_.isRevoked(key); };
+    const std::optional<AskedQuestion> asked = judgeQuestion(question, trust_, at, isRevoked);
+    if (!asked || !questionBook_.enter(asked->id, asked->expires, at)) return;
+    questions_->answer(*asked, at, [this, asked = *asked](const std::string& text) {
+        bus_->answer(answerPieces(trust_.host, asked, text, file_.signing()));
+    });
 }
 
 void LinkProgram::carryOut(const Actions& actions) {

@@ -16,6 +16,8 @@
 #include "fleet/link/program/host_side.h"
 #include "fleet/link/program/link_configuration.h"
 #include "fleet/link/program/link_file.h"
+#include "fleet/link/questions/question_judge.h"
+#include "fleet/link/questions/question_side.h"
 #include "fleet/loop/mailbox.h"
 
 namespace fleet {
@@ -72,6 +74,7 @@ private:
     void sayWhatBlocks();
     Facts ownFacts(const LinkConfiguration& configuration) const;
     void tellFacts();
+    void consider(const std::string& question);
 
     Mailbox mailbox_;
     LinkFile file_;
@@ -79,6 +82,9 @@ private:
     std::chrono::steady_clock::time_point latestAt_ = std::chrono::steady_clock::now();
     std::atomic<bool> isSeenWaiting_{false};
     std::atomic<bool> isChangeWaiting_{false};
+    std::atomic<int> waitingQuestions_{0};
+    const Trust trust_;
+    QuestionBook questionBook_;
     Link link_;
     FactsTeller facts_;
     std::string journal_;  ///< the host's, as it was last told; "" while no host answers
@@ -89,6 +95,7 @@ private:
     std::unique_ptr<BusSide> bus_;
     std::unique_ptr<HostSide> host_;
     std::unique_ptr<InventorySide> inventory_;
+    std::unique_ptr<QuestionSide> questions_;
 };
 
 }  // namespace fleet

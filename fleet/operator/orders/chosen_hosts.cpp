@@ -117,7 +117,7 @@ json inventoryDocuments(Centre& centre, const std::string& selector) {
 
 ChosenHost hostOf(const json& document) {
     ChosenHost host{memberText(document, "host"), memberText(document, "name"),
-                    memberText(document, "state")};
+                    memberText(document, "state"), memberText(document, "signing")};
     if (!isPublicKey(host.key, KeyKind::User)) throw senseless("a host has no key");
     if (host.name.empty()) host.name = host.key;
     return host;

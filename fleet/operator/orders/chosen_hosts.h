@@ -9,9 +9,10 @@
 namespace fleet {
 
 struct ChosenHost {
-    std::string key;    ///< the bus key: what orders call it, and what texts are sealed for
-    std::string name;   ///< for people
-    std::string state;  ///< "here", "away", "stopped" or "unknown"
+    std::string key;           ///< the bus key: what orders call it, and what texts are sealed for
+    std::string name;          ///< for people
+    std::string state;         ///< "here", "away", "stopped" or "unknown"
+    std::string signing = {};  ///< the public key with which its link signs
 };
 
 /// A choice of hosts, and how the orders for them say it.

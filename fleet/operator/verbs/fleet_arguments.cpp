@@ -26,7 +26,7 @@ constexpr const char* kOfOneHost[] = {"--transid", "--once", "--complete"};
 constexpr const char* kRenewals[] = {"rollout resume", "rollout abort", "rollout retry-failed"};
 
 /// The verbs that look at many hosts and change none.
-constexpr const char* kLooks[] = {"agents"};
+constexpr const char* kLooks[] = {"agents", "tasks", "config get"};
 
 ctl::Failure misplaced(const ctl::Verb& verb, const std::string& option) {
     return {ctl::kWrongUsage, std::string(verb.name) + " does not go with " + option};

@@ -9,7 +9,7 @@ namespace {
 constexpr ctl::VerbGroup kFleetGroups[] = {
     {"hosts", "List the hosts of a fleet, show, label or retire one"},
     {"rollout", "Look at roll-outs, stop them, and let them go on"},
-    {"config", "Change an agent's configuration on many hosts"},
+    {"config", "Compare and change an agent's configuration on many hosts"},
 };
 
 }  // namespace
@@ -18,15 +18,15 @@ const ctl::Vocabulary& fleetVocabulary() {
     static const ctl::Vocabulary vocabulary{
         "Manages the monitoring agents of many hosts: a fleet",
         kFleetArguments,
-        {&ctl::kStartVerb,     &ctl::kStopVerb,      &ctl::kRestartVerb,
-         &ctl::kInstallVerb,   &ctl::kUninstallVerb, &ctl::kRemoveInstanceVerb,
-         &ctl::kConfigSetVerb, &ctl::kUaConfigVerb,  &kFleetPushVerb,
-         &kFleetAgentsVerb,    &kHostsVerb,          &kHostsShowVerb,
-         &kHostsLabelVerb,     &kHostsRetireVerb,    &kRolloutLsVerb,
-         &kRolloutShowVerb,    &kRolloutWatchVerb,   &kRolloutPauseVerb,
-         &kRolloutResumeVerb,  &kRolloutAbortVerb,   &kRolloutRetryFailedVerb,
-         &kLoginVerb,          &kFleetWhoamiVerb,    &kFleetVersionVerb,
-         &kFleetHelpVerb},
+        {&ctl::kStartVerb,     &ctl::kStopVerb,          &ctl::kRestartVerb,
+         &ctl::kInstallVerb,   &ctl::kUninstallVerb,     &ctl::kRemoveInstanceVerb,
+         &kFleetConfigGetVerb, &ctl::kConfigSetVerb,     &ctl::kUaConfigVerb,
+         &kFleetPushVerb,      &kFleetAgentsVerb,        &kFleetTasksVerb,
+         &kHostsVerb,          &kHostsShowVerb,          &kHostsLabelVerb,
+         &kHostsRetireVerb,    &kRolloutLsVerb,          &kRolloutShowVerb,
+         &kRolloutWatchVerb,   &kRolloutPauseVerb,       &kRolloutResumeVerb,
+         &kRolloutAbortVerb,   &kRolloutRetryFailedVerb, &kLoginVerb,
+         &kFleetWhoamiVerb,    &kFleetVersionVerb,       &kFleetHelpVerb},
         {&kFleetGroups[0], &kFleetGroups[1], &kFleetGroups[2]}};
     return vocabulary;
 }

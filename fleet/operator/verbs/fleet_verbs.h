@@ -9,6 +9,8 @@ extern const ctl::Verb kLoginVerb;
 extern const ctl::Verb kFleetWhoamiVerb;
 extern const ctl::Verb kFleetPushVerb;
 extern const ctl::Verb kFleetAgentsVerb;
+extern const ctl::Verb kFleetTasksVerb;
+extern const ctl::Verb kFleetConfigGetVerb;
 extern const ctl::Verb kHostsVerb;
 extern const ctl::Verb kHostsShowVerb;
 extern const ctl::Verb kHostsLabelVerb;

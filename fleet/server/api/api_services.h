@@ -51,6 +51,7 @@ public:
     FileDepot files;
     KnownFetches fetches;
 
+    QuestionDesk& questions() { return service_.centre().questions(); }
     bool isWorking() const { return service_.centre().isWorking(); }
 
     /// What `act` returns, which gets a CentreDesk and runs on the centre's thread as one

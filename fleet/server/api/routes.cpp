@@ -7,6 +7,7 @@ ApiEndpoint getCentreHealth, postEnrolment, postLogin, postSession, getOperator;
 ApiEndpoint getHosts, getInventory, getHost, getHostOrders, postLabels, postRetire;
 ApiEndpoint postBatch, postBatchOrders, postRollout, getRollouts, getRollout;
 ApiEndpoint getRolloutHosts, getRolloutFailures, getToSign;
+ApiEndpoint postQuestions, getAnswers;
 ApiEndpoint getFile, postFile, getFileContent;
 ApiEndpoint postPause, postResume, postAbort, postRetryFailed;
 
@@ -71,6 +72,13 @@ std::vector<ApiRoute> apiRoutes() {
         {"POST", "/v1/hosts/{host}/retire", "Takes a host out of the fleet for ever.",
          Access::Act, kWorker, postRetire, {{200, "the orders whose ends nobody tells", nullptr}},
          {kHost}},
+
+        {"POST", "/v1/questions", "Asks hosts something, now.",
+         Access::Act, kWorker, postQuestions, {{201, "the round of questions", nullptr}}, {}, kNone,
+         {{"questions", JsonType::Array, Need::Required, "the questions, signed, in base64"}}},
+        {"GET", "/v1/questions/{round}", "What hosts have answered since the last look.",
+         Access::Act, kWorker, getAnswers, {{200, "pieces of answers, as sealed", nullptr}},
+         {{"round", Type::Text, Need::Required, "the round's identifier"}}},
 
         {"GET", "/v1/files/{sha256}", "How far a file is.",
          Access::Act, kWorker, getFile, {{200, "the file", nullptr}}, {kSum, kSize}},

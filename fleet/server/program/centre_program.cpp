@@ -34,6 +34,8 @@ constexpr int kMostHellos = 20'000;
 /// What a number adds to an order, at most.
 constexpr std::size_t kNumberBytes = 4096;
 constexpr char kHelloSubject[] = "hello.";
+constexpr char kAnswerSubject[] = "ans.";
+constexpr char kAskSubject[] = "rp.ask.";
 constexpr char kTaskSubjects[] = "task.>";
 constexpr char kLeaseSubject[] = "$KV.CENTRE.lease";
 
@@ -93,7 +95,9 @@ void CentreProgram::finish() {
     // Each of them uses what stands before it.
     if (sweeper_) sweeper_->await();
     if (renewer_) renewer_->await();
+    questions_.close();
     hellos_.reset();
+    answers_.reset();
     outcomes_.reset();
     facts_.reset();
     if (lease_ && end_ != End::LeaseLost) lease_->release();
@@ -214,7 +218,9 @@ bool CentreProgram::beginWork() {
     bus_ = std::make_unique<NatsCentreBus>(*connection_, [this] { return hasLease(); });
     centre_ = std::make_unique<Centre>(store_, *bus_, settings_.alarm);
     if (store_.isPutBack() && !completePutBack()) return false;
-    if (!hearHellos()) return false;
+    hellos_ = hear(std::string(kHelloSubject) + '*',
+                   [this](const BusMessage& message) { takeHello(message); });
+    if (!hellos_ || !openQuestions()) return false;
     toldLabels_.setAll(HostFacts(database_.connection()).labels());
     outcomes_ =
         std::make_unique<HostFeed>(*connection_, HostFeed::Source{kOutStream, "out.", "outcomes"},
@@ -231,18 +237,28 @@ bool CentreProgram::beginWork() {
     return true;
 }
 
-/// A bus that is slow, or away for a moment, is asked again as long as the lease lasts.
-bool CentreProgram::hearHellos() {
+/// A bus that is slow, or away for a moment, is asked again as long as the lease lasts; null then.
+std::unique_ptr<Subscription> CentreProgram::hear(const std::string& subject,
+                                                  const Connection::Receiver& receiver) {
     for (;;) {
-        Connection::Subscribed made = connection_->subscribe(
-            std::string(kHelloSubject) + '*',
-            [this](const BusMessage& message) { takeHello(message); }, kAnswerTime);
-        hellos_ = std::move(made.subscription);
-        if (hellos_) return true;
-        say(Priority::Warning, "hellos cannot be heard yet: " + made.status.text);
+        Connection::Subscribed made = connection_->subscribe(subject, receiver, kAnswerTime);
+        if (made.subscription) return std::move(made.subscription);
+        say(Priority::Warning, subject + " cannot be heard yet: " + made.status.text);
         std::this_thread::sleep_for(kPause);
-        if (isEnding_ || isBusLost_ || !hasLease()) return false;
+        if (isEnding_ || isBusLost_ || !hasLease()) return nullptr;
     }
+}
+
+bool CentreProgram::openQuestions() {
+    answers_ = hear(std::string(kAnswerSubject) + '*', [this](const BusMessage& message) {
+        questions_.hear(message.subject.substr(sizeof kAnswerSubject - 1), message.data,
+                        wallClock());
+    });
+    if (!answers_) return false;
+    questions_.open([this](const std::string& host, const std::string& bytes) {
+        if (hasLease()) static_cast<void>(connection_->publish(kAskSubject + host, bytes));
+    });
+    return true;
 }
 
 /// A copy does not know what was given after it was made. What is still on the bus is adopted, all

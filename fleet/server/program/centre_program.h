@@ -21,6 +21,7 @@
 #include "fleet/server/program/hello_limit.h"
 #include "fleet/server/program/host_feed.h"
 #include "fleet/server/program/nats_centre_bus.h"
+#include "fleet/server/program/question_desk.h"
 #include "fleet/server/program/told_labels.h"
 #include "fleet/server/store/centre_database.h"
 #include "fleet/server/store/sqlite_centre_store.h"
@@ -109,6 +110,8 @@ public:
     bool isWorking() const { return isWorking_; }
     /// Of all hosts that were heard since the start. Any thread but that of run().
     std::future<std::map<std::string, HostNews>> news();
+    /// Any thread.
+    QuestionDesk& questions() { return questions_; }
     /// Of all hosts that have ever told some. Any thread.
     const ToldLabels& toldLabels() const { return toldLabels_; }
 
@@ -120,7 +123,9 @@ private:
     void reachAnew();
     void prepareLease();
     bool beginWork();
-    bool hearHellos();
+    std::unique_ptr<Subscription> hear(const std::string& subject,
+                                       const Connection::Receiver& receiver);
+    bool openQuestions();
     bool completePutBack();
     void loop();
     void readLetters(Mailbox::Letter first);
@@ -155,6 +160,7 @@ private:
     std::atomic<std::chrono::steady_clock::rep> leaseUntil_{0};
     std::map<std::string, HostNews> news_;
     ToldLabels toldLabels_;
+    QuestionDesk questions_;
     HelloLimit helloLimit_;  ///< belongs to the subscription's thread
     std::atomic<int> waitingHellos_{0};
 
@@ -164,6 +170,7 @@ private:
     std::unique_ptr<NatsCentreBus> bus_;
     std::unique_ptr<Centre> centre_;
     std::unique_ptr<Subscription> hellos_;
+    std::unique_ptr<Subscription> answers_;
     std::unique_ptr<HostFeed> outcomes_;
     std::unique_ptr<HostFeed> facts_;
     std::unique_ptr<Worker> renewer_;

@@ -4,6 +4,8 @@
 
 #include <algorithm>
 
+#include "fleet/bus/messages/question.h"
+
 namespace fleet_e2e {
 
 using fleet::CentreProgram;
@@ -157,6 +159,10 @@ fleet::Order FleetScene::order(const FleetHost& host, const std::string& command
 
 std::string FleetScene::sign(const fleet::Order& order) const {
     return signOrder(order, operator_, signCertificate(certificate_, root_));
+}
+
+std::string FleetScene::signQuestion(const fleet::Order& question) const {
+    return fleet::signQuestion(question, operator_, signCertificate(certificate_, root_));
 }
 
 std::string FleetScene::submit(const fleet::Order& order) {

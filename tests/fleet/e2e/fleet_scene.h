@@ -97,6 +97,7 @@ public:
     fleet::Order order(const FleetHost& host, const std::string& command,
                        const std::string& body = R"({"product":"ux"})") const;
     std::string sign(const fleet::Order& order) const;
+    std::string signQuestion(const fleet::Order& question) const;
     /// Gives it to the centre; its identifier.
     std::string submit(const fleet::Order& order);
     std::string submit(const FleetHost& host, const std::string& command);
