@@ -1,5 +1,7 @@
 #include "ctl/console/console_handler.h"
 
+#include <algorithm>
+#include <chrono>
 #include <nlohmann/json.hpp>
 #include <utility>
 
@@ -14,6 +16,9 @@ namespace {
 constexpr std::string_view kOpen = "/open";
 constexpr std::string_view kSession = "/console/session";
 constexpr std::string_view kDepot = "/console/depot";
+/// A page that asks and goes away must not keep those from their turn who want something done.
+constexpr int kMostReads = 12;
+constexpr std::chrono::seconds kReadTime{30};
 
 std::string descriptionOf(const ConsoleSettings& settings) {
     using nlohmann::json;
@@ -59,7 +64,12 @@ std::variant<http::Answer, http::Job> ConsoleHandler::handle(http::Request reque
     if (path == kOpen) return http::Answer(open(request));
     if (auto refusal = refusalOf(request)) return http::Answer(std::move(*refusal));
     if (!isForPrograms(path)) return http::Answer(page_.answer(request));
-    if (path == "/v1" || path.substr(0, 4) == "/v1/") return hand(std::move(request));
+    if (path == "/v1" || path.substr(0, 4) == "/v1/") {
+        if (onlyReads(request) && *reads_ >= kMostReads) {
+            return http::Answer(refusalAt(path, 503, "too many questions wait for the host"));
+        }
+        return hand(std::move(request));
+    }
     return http::Answer(answerOwn(request));
 }
 
@@ -96,6 +106,7 @@ std::optional<http::Reply> ConsoleHandler::refusalOf(const http::Request& reques
     if (path.empty() || path.front() != '/') return refusalAt(path, 400, "a target is a path");
     const std::string complaint = complaintAbout(request, port_);
     if (!complaint.empty()) return refusalAt(path, 403, complaint);
+    if (isOfAnotherSite(request)) return refusalAt(path, 403, "another page may not ask for this");
     if (!session_.isIn(fieldOf(request, "Cookie"))) {
         return refusalAt(path, 401,
                          "this browser has no session here, or it is over: \"zavctl console\" "
@@ -134,9 +145,13 @@ http::Reply ConsoleHandler::answerOwn(const http::Request& request) const {
 }
 
 http::Job ConsoleHandler::hand(http::Request request) {
-    std::shared_ptr<void> change = onlyReads(request) ? nullptr : counted(changes_);
-    return [this, change = std::move(change), request = std::move(request)]() -> http::Answer {
-        return passOn(request, host_, streams_);
+    const bool reads = onlyReads(request);
+    ctl::HostAddress host = host_;
+    if (reads) host.timeout = std::min<std::chrono::milliseconds>(host.timeout, kReadTime);
+    std::shared_ptr<void> turn = counted(reads ? reads_ : changes_);
+    return [this, turn = std::move(turn), host = std::move(host),
+            request = std::move(request)]() -> http::Answer {
+        return passOn(request, host, streams_);
     };
 }
 

@@ -11,6 +11,7 @@
 
 #include "ctl/client/address/host_address.h"
 #include "ctl/console/browser_session.h"
+#include "ctl/console/browsers.h"
 #include "ctl/console/host_streams.h"
 #include "ctl/console/page_files.h"
 #include "ctl/console/upload.h"
@@ -23,6 +24,7 @@ struct ConsoleSettings {
     std::vector<PageFile> page;
     std::vector<std::string> command = {"zavctl"};  ///< what a line to copy begins with
     std::string uploadDirectory = "/var/tmp";       ///< where files wait for the host
+    Browsers browsers{};
     BrowserSession::Clock clock = BrowserSession::timeSinceBoot;
 };
 
@@ -58,6 +60,7 @@ private:
     Uploads uploads_;
     HostStreams streams_;
     /// Requests to the host that may change something.
+    const std::shared_ptr<std::atomic<int>> reads_ = std::make_shared<std::atomic<int>>(0);
     const std::shared_ptr<std::atomic<int>> changes_ = std::make_shared<std::atomic<int>>(0);
 };
 

@@ -55,11 +55,6 @@ std::uint16_t portOf(const sys::FileDescriptor& listener) {
     return ntohs(address.sin_port);
 }
 
-/// Any process of this machine may connect. What it may do, its cookie says.
-http::Door openDoor() {
-    return {[](int) { return http::Peer{0, 0, 0, http::Access::Act, "the cookie tells"}; }, ""};
-}
-
 http::ServerLimits limits() {
     http::ServerLimits limits;
     limits.connections = kMostConnections;
@@ -72,8 +67,9 @@ http::ServerLimits limits() {
 ConsoleServer::ConsoleServer(ConsoleSettings settings, std::uint16_t port)
     : listener_(listenOn(port)),
       port_(portOf(listener_)),
-      handler_(std::move(settings), port_),
-      server_(listener_.get(), openDoor(), handler_, counts_, limits()) {}
+      handler_(settings, port_),
+      server_(listener_.get(), doorFor(std::move(settings.browsers)), handler_, counts_, limits()) {
+}
 
 std::string ConsoleServer::link() const {
     return "http://127.0.0.1:" + std::to_string(port_) + handler_.opening();

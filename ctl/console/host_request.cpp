@@ -1,5 +1,6 @@
 #include "ctl/console/host_request.h"
 
+#include <algorithm>
 #include <boost/beast/core/string.hpp>
 #include <boost/beast/http.hpp>
 #include <limits>
@@ -42,6 +43,18 @@ wire::request<wire::string_body> requestFor(const http::Request& given) {
     return request;
 }
 
+/// What a browser neither runs nor lays out. The page's policy trusts what comes from its own
+/// address, and a host is no part of the page.
+std::string harmlessType(const std::string& type) {
+    for (const std::string_view known : {"application/json", "text/plain", "text/event-stream"}) {
+        const std::string_view rest =
+            std::string_view(type).substr(std::min(type.size(), known.size()));
+        const bool isIt = type.compare(0, known.size(), known) == 0;
+        if (isIt && (rest.empty() || rest.front() == ';' || rest.front() == ' ')) return type;
+    }
+    return "application/octet-stream";
+}
+
 /// One request and its answer, on a connection of its own.
 class Exchange {
 public:
@@ -80,7 +93,13 @@ public:
 
     /// The rest of an answer that is no stream.
     http::Reply reply() {
-        http::Reply reply{parser_->get().result_int(), restOfBody(), field("Content-Type")};
+        const unsigned status = parser_->get().result_int();
+        // A browser would take the one for half an answer and the other for the console's own.
+        if (status < 200 || status == 401) {
+            throw Failure(ctl::kNoHost, "the host answers with the status " +
+                                            std::to_string(status) + ", which makes no sense");
+        }
+        http::Reply reply{status, restOfBody(), harmlessType(field("Content-Type"))};
         for (const char* const name : {"Retry-After", "Allow"}) {
             if (const std::string value = field(name); !value.empty()) {
                 reply.fields.emplace_back(name, value);

@@ -5,7 +5,9 @@
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/local/stream_protocol.hpp>
 #include <boost/asio/post.hpp>
+#include <boost/asio/steady_timer.hpp>
 #include <boost/beast/http/read.hpp>
+#include <chrono>
 #include <exception>
 #include <functional>
 #include <stdexcept>
@@ -28,6 +30,7 @@ constexpr std::size_t kPieceBytes = std::size_t{16} * 1024;
 constexpr std::size_t kMostWaiting = std::size_t{256} * 1024;
 /// An event that is larger ends its stream.
 constexpr std::size_t kLargestEvent = std::size_t{8} * 1024 * 1024;
+constexpr std::chrono::hours kLongestStream{1};
 constexpr std::string_view kEventEnd = "\n\n";
 
 /// Read on the carrying thread, taken from on any other.
@@ -36,6 +39,7 @@ public:
     HostStream(net::io_context& io, BegunStream stream)
         : io_(io),
           socket_(io, net::local::stream_protocol(), stream.connection.release()),
+          end_(io),
           buffer_(std::move(stream.buffer)),
           parser_(std::move(stream.parser)) {}
 
@@ -45,7 +49,10 @@ public:
             wake_ = wake;
         }
         wake();
-        net::post(io_, [self = shared_from_this()] { self->read(); });
+        net::post(io_, [self = shared_from_this()] {
+            self->read();
+            self->endInTime();
+        });
     }
 
     std::string take() {
@@ -71,6 +78,7 @@ public:
         net::post(io_, [self = shared_from_this()] {
             Error ignored;
             self->socket_.close(ignored);
+            self->end_.cancel();
         });
     }
 
@@ -83,6 +91,23 @@ private:
         wire::async_read_some(
             socket_, buffer_, *parser_,
             [self = shared_from_this()](Error error, std::size_t) { self->onRead(error); });
+    }
+
+    /// The page asks anew then, and its session is looked at again.
+    void endInTime() {
+        end_.expires_after(kLongestStream);
+        end_.async_wait([self = shared_from_this()](Error error) {
+            if (error) return;
+            Error ignored;
+            self->socket_.close(ignored);
+            std::function<void()> wake;
+            {
+                const embedded::MutexLock lock(self->lock_);
+                self->isOver_ = true;
+                wake = self->wake_;
+            }
+            wake();
+        });
     }
 
     void onRead(Error error) {
@@ -107,12 +132,13 @@ private:
         // An end may have begun in what came before.
         const std::size_t from = held_.size() > whole_ ? held_.size() - 1 : held_.size();
         held_ += text;
-        const std::size_t end = held_.rfind(kEventEnd);
-        if (end != std::string::npos && end >= from) whole_ = end + kEventEnd.size();
+        const std::size_t end = std::string_view(held_).substr(from).rfind(kEventEnd);
+        if (end != std::string_view::npos) whole_ = from + end + kEventEnd.size();
     }
 
     net::io_context& io_;
     net::local::stream_protocol::socket socket_;
+    net::steady_timer end_;
     boost::beast::flat_buffer buffer_;
     const std::unique_ptr<BegunStream::Parser> parser_;
     std::array<char, kPieceBytes> piece_{};

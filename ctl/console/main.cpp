@@ -52,6 +52,9 @@ ctl::ExitStatus serve(const ctl::Invocation& invocation) {
     if (const char* const named = std::getenv("TMPDIR"); named != nullptr && *named != '\0') {
         settings.uploadDirectory = named;
     }
+    settings.browsers.other = invocation.given.has(ctl::kBrowserUser)
+                                  ? console::browserUser(invocation.given.text(ctl::kBrowserUser))
+                                  : console::userBehindSudo();
     const auto port = static_cast<std::uint16_t>(invocation.given.number(ctl::kConsolePort));
     console::ConsoleServer server(std::move(settings), port);
     server.endWhenReadable(signals.get(), [] { ctl::Interruption::interrupt(SIGTERM); });
@@ -63,7 +66,7 @@ ctl::ExitStatus serve(const ctl::Invocation& invocation) {
     std::_Exit(ctl::kSuccess);
 }
 
-constexpr ctl::Argument kServeArguments[] = {ctl::kConsolePort};
+constexpr ctl::Argument kServeArguments[] = {ctl::kConsolePort, ctl::kBrowserUser};
 /// The verb of zavctl, whose help it is that people see.
 constexpr ctl::Verb kServeVerb = {
     "console",       "Serve a page for a browser on this machine, and print the link to it",

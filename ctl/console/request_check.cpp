@@ -8,6 +8,7 @@ namespace {
 
 constexpr std::uint16_t kHttpPort = 80;
 constexpr std::string_view kOwnField = "X-Zav-Console";
+constexpr std::string_view kSite = "Sec-Fetch-Site";
 constexpr std::string_view kScheme = "http://";
 
 std::size_t countOf(const http::Request& request, std::string_view name) {
@@ -29,8 +30,8 @@ bool isOwnName(std::string_view host, std::uint16_t port) {
 
 const std::vector<std::string>& lookedAtFields() {
     static const std::vector<std::string> kFields = {
-        "Host",         "Origin", "Cookie",        std::string(kOwnField),
-        "Content-Type", "Accept", "If-None-Match", "Accept-Encoding"};
+        "Host",   "Origin",        "Cookie",          std::string(kOwnField), "Content-Type",
+        "Accept", "If-None-Match", "Accept-Encoding", std::string(kSite)};
     return kFields;
 }
 
@@ -52,6 +53,12 @@ std::string complaintAbout(const http::Request& request, std::uint16_t port) {
     const bool isOwnOrigin = fieldOf(request, "Origin") == std::string(kScheme) + std::string(host);
     if (origins > 0 && !isOwnOrigin) return "another page may not ask for this";
     return "";
+}
+
+bool isOfAnotherSite(const http::Request& request) {
+    if (countOf(request, kSite) == 0) return false;  // older browsers do not say
+    const std::string_view site = fieldOf(request, kSite);
+    return site != "same-origin" && site != "none";
 }
 
 bool onlyReads(const http::Request& request) {

@@ -23,6 +23,10 @@ std::string_view fieldOf(const http::Request& request, std::string_view name);
 /// that the console never gives.
 std::string complaintAbout(const http::Request& request, std::uint16_t port);
 
+/// Whether the browser says that a page of another origin asks. One on another port of this machine
+/// gets the cookie sent along, because cookies know no ports.
+bool isOfAnotherSite(const http::Request& request);
+
 /// Whether the method changes nothing.
 bool onlyReads(const http::Request& request);
 

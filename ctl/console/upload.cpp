@@ -5,6 +5,7 @@
 
 #include <cerrno>
 #include <cstdlib>
+#include <filesystem>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <string_view>
@@ -22,8 +23,9 @@ namespace console {
 /// Held while a file is on its way. The uploads outlive it.
 class UploadPlace {
 public:
-    UploadPlace(Uploads& uploads, std::string name) : uploads_(uploads), name_(std::move(name)) {}
-    ~UploadPlace() { uploads_.leave(name_); }
+    UploadPlace(Uploads& uploads, std::string name, std::string place)
+        : uploads_(uploads), name_(std::move(name)), place_(std::move(place)) {}
+    ~UploadPlace() { uploads_.leave(place_); }
     UploadPlace(const UploadPlace&) = delete;
     UploadPlace& operator=(const UploadPlace&) = delete;
     const std::string& name() const { return name_; }
@@ -31,6 +33,7 @@ public:
 private:
     Uploads& uploads_;
     const std::string name_;
+    const std::string place_;  ///< the same for each way of writing the name
 };
 
 namespace {
@@ -168,9 +171,12 @@ http::BodyPlan Uploads::begin(const http::Request& head, const ctl::HostAddress&
     if (name->find('\\') != std::string::npos) {
         return http::errorReply(400, "a name with a backslash cannot be pushed: " + *name);
     }
-    const std::string reason = enter(*name);
+    // Two names of one file are one: both would be written at a time.
+    const std::string place = std::filesystem::path(*name).lexically_normal().string();
+    const std::string reason = enter(place);
     if (!reason.empty()) return http::errorReply(429, reason);
-    return std::make_unique<Upload>(std::make_unique<UploadPlace>(*this, *name), directory_, host);
+    return std::make_unique<Upload>(std::make_unique<UploadPlace>(*this, *name, place), directory_,
+                                    host);
 }
 
 bool Uploads::empty() const {

@@ -8,7 +8,7 @@
 namespace ctl {
 namespace {
 
-constexpr Argument kArguments[] = {kConsolePort};
+constexpr Argument kArguments[] = {kConsolePort, kBrowserUser};
 
 constexpr SiblingProgram kConsoleProgram = {"zavctl-console", "the console is not installed here"};
 
@@ -47,6 +47,8 @@ std::vector<std::string> consoleWords(const Values& given) {
     words.emplace_back(kConsoleVerb.name);
     if (given.has(kConsolePort))
         words.insert(words.end(), {kConsolePort.name, std::to_string(given.number(kConsolePort))});
+    if (given.has(kBrowserUser))
+        words.insert(words.end(), {kBrowserUser.name, given.text(kBrowserUser)});
     return words;
 }
 

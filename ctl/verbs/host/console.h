@@ -12,6 +12,12 @@ namespace ctl {
 constexpr Argument kConsolePort =
     numberOption("--port", "Port on 127.0.0.1; any free one if not given").between(0, 65535);
 
+constexpr Argument kBrowserUser =
+    textOption("--browser-user",
+               "Serve this user's browser, too; without it one's own and, behind\n"
+               "sudo, that of whoever called it")
+        .called("NAME");
+
 /// The words of the options that say which host is meant and how long to wait for it, as far as
 /// they are given.
 std::vector<std::string> hostWords(const Values& given);

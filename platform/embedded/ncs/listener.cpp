@@ -11,8 +11,6 @@
 #include <optional>
 #include <system_error>
 
-#include "ncs/loopback_peer.h"
-
 namespace ncs {
 namespace {
 
@@ -55,7 +53,7 @@ bool Listener::admits(int accepted) const {
     }
     if (isUnix && judge) return judge(accepted);
     const std::optional<uid_t> user =
-        isUnix ? userOfUnixPeer(accepted) : ownerOfLoopbackPeer(accepted);
+        isUnix ? userOfUnixPeer(accepted) : sys::ownerOfLoopbackPeer(accepted);
     return user && (*user == ::geteuid() || *user == 0);
 }
 

@@ -4,13 +4,17 @@
 
 #include <gtest/gtest.h>
 
+#include <unistd.h>
+
 #include <atomic>
 #include <chrono>
 #include <nlohmann/json.hpp>
+#include <optional>
 #include <string>
 #include <utility>
 
 #include "ctl/client/failure.h"
+#include "ctl/console/browsers.h"
 #include "ctl/console/secret.h"
 #include "ctl/console/served_console.h"
 
@@ -57,6 +61,45 @@ TEST_F(TheConsole, IsOpenedByItsLinkOnce) {
     EXPECT_EQ(again.status, 403);
     EXPECT_TRUE(has(again, "Content-Type: text/html; charset=utf-8"));
     EXPECT_EQ(again.head.find("Set-Cookie"), std::string::npos);
+}
+
+/// Who the kernel would name for every connection.
+class AConsole : public testing::Test {
+protected:
+    static console::ConsoleSettings ownedBy(std::optional<uid_t> user) {
+        console::ConsoleSettings settings = console_test::settingsFor(kNoHost);
+        settings.browsers.ownerOf = [user](int) { return user; };
+        return settings;
+    }
+    static unsigned statusOf(console::ConsoleSettings settings) {
+        ServedConsole served(std::move(settings));
+        return static_cast<unsigned>(served.ask(served.get(served.opening())).status);
+    }
+};
+
+TEST_F(AConsole, ServesItsOwnUsersBrowserAndRoots) {
+    EXPECT_EQ(statusOf(ownedBy(::geteuid())), 303U);
+    EXPECT_EQ(statusOf(ownedBy(0)), 303U);
+}
+
+TEST_F(AConsole, ServesNobodyElseEvenWithTheLink) {
+    EXPECT_EQ(statusOf(ownedBy(::geteuid() + 4711)), 403U);
+    EXPECT_EQ(statusOf(ownedBy(std::nullopt)), 403U);
+}
+
+TEST_F(AConsole, ServesAnotherUsersBrowserIfThatIsWanted) {
+    console::ConsoleSettings settings = ownedBy(::geteuid() + 4711);
+    settings.browsers.other = ::geteuid() + 4711;
+    EXPECT_EQ(statusOf(settings), 303U);
+    settings.browsers.other = ::geteuid() + 4712;
+    EXPECT_EQ(statusOf(settings), 403U);
+}
+
+TEST(BrowserUsers, AreNamesAndNumbers) {
+    EXPECT_EQ(console::browserUser("root"), 0U);
+    EXPECT_EQ(console::browserUser("4711"), 4711U);
+    for (const char* name : {"", "no-such-user", "-1", "4711x", "4294967295"})
+        EXPECT_THROW(console::browserUser(name), ctl::Failure) << name;
 }
 
 TEST_F(TheConsole, IsNotOpenedByAnotherToken) {

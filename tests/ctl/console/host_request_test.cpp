@@ -76,6 +76,42 @@ TEST(TheHostsAnswer, ArrivesAsItIs) {
     EXPECT_NE(answer.head.find("frame-ancestors 'none'"), std::string::npos) << answer.head;
 }
 
+/// What the browser gets of an answer of this type and status.
+RawClient::Answer passedOn(const std::string& type, unsigned status = 200) {
+    CannedHost host([&](CannedHost& self) {
+        const auto peer = self.accept();
+        peer.request();
+        peer.send("HTTP/1.1 " + std::to_string(status) + " X\r\nContent-Type: " + type +
+                  "\r\nContent-Length: 2\r\n\r\n{}");
+    });
+    OpenConsole served(host);
+    const RawClient::Answer answer = served.ask(served.get("/v1/health", served.cookie()));
+    host.join();
+    return answer;
+}
+
+TEST(TheHostsAnswer, IsNothingThatABrowserRuns) {
+    for (const char* type : {"text/html", "text/javascript", "application/javascript",
+                             "image/svg+xml", "application/jsonx", "text/css", ""}) {
+        const auto answer = passedOn(type);
+        EXPECT_EQ(answer.status, 200) << type;
+        EXPECT_NE(answer.head.find("\r\nContent-Type: application/octet-stream\r\n"),
+                  std::string::npos)
+            << type << "\n"
+            << answer.head;
+    }
+    for (const char* type : {"application/json", "text/plain; version=0.0.4"}) {
+        EXPECT_NE(passedOn(type).head.find(std::string("\r\nContent-Type: ") + type + "\r\n"),
+                  std::string::npos)
+            << type;
+    }
+}
+
+TEST(TheHostsAnswer, IsNeverTakenForTheConsolesOwn) {
+    EXPECT_EQ(passedOn("application/json", 401).status, 502);
+    EXPECT_EQ(passedOn("application/json", 103).status, 502);
+}
+
 TEST(TheHostsAnswer, HasNoBodyIfOnlyItsHeadIsAskedFor) {
     CannedHost host([](CannedHost& self) {
         const auto peer = self.accept();

@@ -34,6 +34,14 @@ TEST(ARequest, IsRefusedUnderAnyOtherName) {
     EXPECT_FALSE(isTaken("GET", {{"Host", "localhost:4711"}, {"Host", "localhost:4711"}}));
 }
 
+TEST(ARequest, IsRefusedWhenTheBrowserNamesAnotherSite) {
+    EXPECT_FALSE(console::isOfAnotherSite(request("GET", {})));
+    for (const char* site : {"same-origin", "none"})
+        EXPECT_FALSE(console::isOfAnotherSite(request("GET", {{"Sec-Fetch-Site", site}}))) << site;
+    for (const char* site : {"same-site", "cross-site", "", "Same-Origin"})
+        EXPECT_TRUE(console::isOfAnotherSite(request("GET", {{"Sec-Fetch-Site", site}}))) << site;
+}
+
 TEST(ARequestThatMayChangeSomething, NeedsTheConsolesField) {
     for (const char* method : {"POST", "PUT", "DELETE", "PATCH", "OPTIONS", "get", "FOO"}) {
         EXPECT_FALSE(isTaken(method, {{"Host", "localhost:4711"}})) << method;

@@ -1,4 +1,4 @@
-#include "ncs/loopback_peer.h"
+#include "system/loopback_peer.h"
 
 #include <linux/inet_diag.h>
 #include <linux/netlink.h>
@@ -10,9 +10,9 @@
 #include <cerrno>
 #include <cstring>
 
-#include "ncs/source.h"
+#include "system/file_descriptor.h"
 
-namespace ncs {
+namespace sys {
 namespace {
 
 /// A request for one connection, as the kernel reads it.
@@ -79,8 +79,8 @@ std::optional<inet_diag_msg> answerOf(int netlink) {
 std::optional<uid_t> ownerOfLoopbackPeer(int accepted) {
     const std::optional<inet_diag_sockid> id = otherEnd(accepted);
     if (!id) return std::nullopt;
-    const Descriptor netlink(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_SOCK_DIAG));
-    if (netlink.get() == -1 || !ask(netlink.get(), *id)) return std::nullopt;
+    const FileDescriptor netlink(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_SOCK_DIAG));
+    if (!netlink || !ask(netlink.get(), *id)) return std::nullopt;
     const std::optional<inet_diag_msg> found = answerOf(netlink.get());
     // Without such a connection the kernel names whoever listens on its port. And a socket that no
     // process holds any more is shown as root's.
@@ -91,4 +91,4 @@ std::optional<uid_t> ownerOfLoopbackPeer(int accepted) {
     return found->idiag_uid;
 }
 
-}  // namespace ncs
+}  // namespace sys

@@ -5,11 +5,11 @@
 
 #include <optional>
 
-namespace ncs {
+namespace sys {
 
 /// Asks the kernel for the user whose process made the other end of an accepted connection on
 /// 127.0.0.1. Nothing if the kernel does not say: a socket that its process has closed already
 /// belongs to nobody, and neither does one of another network name space. Any thread.
 std::optional<uid_t> ownerOfLoopbackPeer(int accepted);
 
-}  // namespace ncs
+}  // namespace sys
