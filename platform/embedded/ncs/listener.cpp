@@ -1,4 +1,5 @@
 #include "ncs/listener.h"
+#include "system/loopback_peer.h"
 
 #include <arpa/inet.h>
 #include <fcntl.h>
