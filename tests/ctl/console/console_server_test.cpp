@@ -64,7 +64,7 @@ TEST_F(TheConsole, IsOpenedByItsLinkOnce) {
 }
 
 /// Who the kernel would name for every connection.
-class AConsole : public testing::Test {
+class ABrowser : public testing::Test {
 protected:
     static console::ConsoleSettings ownedBy(std::optional<uid_t> user) {
         console::ConsoleSettings settings = console_test::settingsFor(kNoHost);
@@ -77,17 +77,17 @@ protected:
     }
 };
 
-TEST_F(AConsole, ServesItsOwnUsersBrowserAndRoots) {
+TEST_F(ABrowser, OfTheConsolesOwnUserOrOfRootIsServed) {
     EXPECT_EQ(statusOf(ownedBy(::geteuid())), 303U);
     EXPECT_EQ(statusOf(ownedBy(0)), 303U);
 }
 
-TEST_F(AConsole, ServesNobodyElseEvenWithTheLink) {
+TEST_F(ABrowser, OfAnybodyElseIsNotEvenWithTheLink) {
     EXPECT_EQ(statusOf(ownedBy(::geteuid() + 4711)), 403U);
     EXPECT_EQ(statusOf(ownedBy(std::nullopt)), 403U);
 }
 
-TEST_F(AConsole, ServesAnotherUsersBrowserIfThatIsWanted) {
+TEST_F(ABrowser, OfAnotherUserIsServedIfThatIsWanted) {
     console::ConsoleSettings settings = ownedBy(::geteuid() + 4711);
     settings.browsers.other = ::geteuid() + 4711;
     EXPECT_EQ(statusOf(settings), 303U);

@@ -63,14 +63,14 @@ TEST(TheHostsAnswer, ArrivesAsItIs) {
         const auto peer = self.accept();
         peer.request();
         peer.send(
-            "HTTP/1.1 429 Reason\r\nContent-Type: text/odd\r\nRetry-After: 7\r\nAllow: GET\r\n"
+            "HTTP/1.1 429 Reason\r\nContent-Type: text/plain\r\nRetry-After: 7\r\nAllow: GET\r\n"
             "Set-Cookie: a=b\r\nContent-Security-Policy: none\r\nContent-Length: 5\r\n\r\nwords");
     });
     OpenConsole served(host);
     const auto answer = served.ask(served.get("/v1/tasks", served.cookie()));
     EXPECT_EQ(answer.status, 429);
     EXPECT_EQ(answer.body, "words");
-    for (const char* line : {"Content-Type: text/odd", "Retry-After: 7", "Allow: GET"})
+    for (const char* line : {"Content-Type: text/plain", "Retry-After: 7", "Allow: GET"})
         EXPECT_NE(answer.head.find(std::string(line) + "\r\n"), std::string::npos) << answer.head;
     EXPECT_EQ(answer.head.find("Set-Cookie"), std::string::npos) << answer.head;
     EXPECT_NE(answer.head.find("frame-ancestors 'none'"), std::string::npos) << answer.head;
