@@ -151,6 +151,30 @@ test('a configuration is changed after its difference has been shown', async () 
     });
 });
 
+test('a changed configuration stays in the editor until its task has ended', async () => {
+    await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
+        fake.slow(60_000);
+        await fill(tab, '.editor', 'INTERVAL=44\n');
+        await press(tab, 'Send…');
+        await press(tab, 'Send config set ux');
+        await notice(tab, 'config set ux: accepted');
+        await untilText(tab, 'is on its way');
+        await new Promise((done) => setTimeout(done, 1_500));
+        assert.equal(await tab.$eval('.editor', (editor) => editor.value.includes('INTERVAL=44')), true);
+        assert.equal(await tab.$$eval('main .columns button.main', ([button]) => button.disabled), true);
+        last(fake).finish('failed');
+        await notice(tab, 'config set ux: failed');
+        await tab.waitForFunction(() => !document.querySelector('main .columns button.main').disabled);
+        assert.equal(await tab.$eval('.editor', (editor) => editor.value.includes('INTERVAL=44')), true);
+        fake.slow(200);
+        await press(tab, 'Send…');
+        await press(tab, 'Send config set ux');
+        await notice(tab, 'config set ux: done');
+        await untilText(tab, 'No difference to what is there.');
+        assert.match(fake.configurations.get('ux'), /INTERVAL=44\n/);
+    });
+});
+
 test('what somebody else has set meanwhile is not overwritten', async () => {
     await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
         await fill(tab, '.editor', 'INTERVAL=1\n');
