@@ -132,6 +132,26 @@ test('doing a change of a configuration again asks for the text', async () => {
     });
 });
 
+test('a command that the host has cut is not sent before the whole of it is given', async () => {
+    await on('/tasks', {}, async ({ tab, fake, go }) => {
+        const command = `/bin/sh |DEPLOYDIR|/install.sh ${'x'.repeat(5_000)}`;
+        const task = fake.accept({ command: 'INSTALL', product: 'ny', version: '7.1', context: command.slice(0, 4096) });
+        await go(`/tasks/${task.id}`);
+        await untilText(tab, 'done', '.page-head');
+        await press(tab, 'Do again…');
+        await untilText(tab, 'The context is cut: give the whole of it.', 'dialog');
+        assert.equal(await tab.$eval('dialog [type=submit]', (button) => button.disabled), true);
+        await tab.$eval('dialog textarea', (field, whole) => {
+            field.value = whole;
+            field.dispatchEvent(new Event('input', { bubbles: true }));
+        }, command);
+        await tab.waitForFunction(() => !document.querySelector('dialog [type=submit]').disabled);
+        await tab.click('dialog [type=submit]');
+        await notice(tab, 'install ny: done');
+        assert.equal(last(fake).context, command);
+    });
+});
+
 test('a configuration is changed after its difference has been shown', async () => {
     await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
         await tab.waitForSelector('.editor');
