@@ -1,5 +1,5 @@
 /// What the depot holds.
-import { useEffect, useMemo, useState } from 'preact/hooks';
+import { useEffect, useMemo, useRef, useState } from 'preact/hooks';
 import { type DepotPath, askListing, askSums, childOf, encodedPath, removeFromDepot, shownPath } from '../api/depot';
 import { type Problem, asProblem } from '../api/problem';
 import type { DepotEntry } from '../api/types';
@@ -92,7 +92,13 @@ export function DepotPage() {
     const path = /%|^[\w./-]*$/.test(raw) ? raw : encodedPath(raw);
     const who = useStore(whoami);
     const arrived = useStore(arrivals);
-    const listing = useResource((signal) => askListing(path, signal), [path, arrived]);
+    const listing = useResource((signal) => askListing(path, signal), [path]);
+    const seen = useRef(arrived);
+    useEffect(() => {
+        if (seen.current === arrived) return;
+        seen.current = arrived;
+        listing.reload();
+    }, [arrived]);
     const [text, setText] = useState('');
     const [removing, setRemoving] = useState<{ path: DepotPath; isFolder: boolean }>();
     const [summing, setSumming] = useState<readonly DepotPath[]>();
@@ -122,6 +128,7 @@ export function DepotPage() {
             </PageHead>
             {isMine && listing.value?.type !== 'file' && <PushPanel directory={path} />}
             {listing.problem && <ProblemBox problem={listing.problem} retry={listing.reload} />}
+            {!listing.value && listing.isLoading && <p class="faint">Reading…</p>}
             {listing.value && entries.length === 0 && (
                 <Empty title={path === '' ? 'The depot is empty' : 'This folder is empty'}>
                     <p>Drop a file above, or run <code>zavctl push package.tar</code>. A product to install lies in <code>PRODUCT/VERSION</code>; <code>zavctl push FOLDER PRODUCT/VERSION</code> brings a whole folder.</p>
