@@ -2,7 +2,7 @@
 import type { ComponentChildren } from 'preact';
 import { useState } from 'preact/hooks';
 import { type Problem, asProblem } from '../api/problem';
-import type { TaskRequest } from '../api/tasks';
+import { RequestNames, type TaskRequest } from '../api/tasks';
 import type { Task } from '../api/types';
 import { act } from '../state/actions';
 import { commandPrefix } from '../state/host';
@@ -33,6 +33,7 @@ export function ActionDialog(props: ActionDialogProps) {
     const [force, setForce] = useState(false);
     const [isBusy, setBusy] = useState(false);
     const [problem, setProblem] = useState<Problem>();
+    const [names] = useState(() => new RequestNames());
     const request = props.mayForce && force ? { ...props.request, force } : props.request;
     const title = titleOf(request);
     const line = taskLine(commandPrefix(), request);
@@ -42,11 +43,13 @@ export function ActionDialog(props: ActionDialogProps) {
         setProblem(undefined);
         try {
             await props.before?.();
-            const task = await act(request);
+            const task = await act(request, names.nameOf(request));
             props.onClose();
             props.onAccepted?.(task);
         } catch (error) {
-            setProblem(asProblem(error));
+            const found = asProblem(error);
+            if (!found.isLost) names.forget(request);
+            setProblem(found);
             setBusy(false);
         }
     };

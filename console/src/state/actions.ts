@@ -68,10 +68,10 @@ async function tellEnd(title: string, request: TaskRequest, accepted: Task, key:
 }
 
 /// Asks for the task and says what becomes of it, now and when it is over. Returns it once the host
-/// has it. Throws a Problem.
-export async function act(request: TaskRequest): Promise<Task> {
+/// has it. `transid` names the request. Throws a Problem.
+export async function act(request: TaskRequest, transid: string): Promise<Task> {
     const title = titleOf(request);
-    const task = await askForTask(request);
+    const task = await askForTask(request, transid);
     const key = notify({ tone: 'info', text: `${title}: accepted`, task: task.id });
     noteWork(task);
     void tellEnd(title, request, task, key);

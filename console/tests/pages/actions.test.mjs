@@ -99,6 +99,23 @@ test('a refusal has the words, the guard and the way out', async () => {
     });
 });
 
+test('a request whose answer was lost is no second task when it is sent again', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab, fake, front } = view;
+        view.own.isDisturbed = true;
+        const known = fake.tasks.length;
+        // The host takes it, and nobody hears of that.
+        front.state.isDeaf = true;
+        await press(tab, 'Stop db7:UX');
+        await press(tab, 'Send stop ux');
+        await untilText(tab, 'It may have been accepted all the same.', 'dialog [role=alert]');
+        front.state.isDeaf = false;
+        await press(tab, 'Send stop ux');
+        await notice(tab, 'stop ux: done');
+        assert.deepEqual(fake.tasks.slice(known).map((task) => task.command), ['STOP']);
+    });
+});
+
 test('a running task is watched and cancelled, and done again', async () => {
     await on('/tasks', {}, async ({ tab, fake, go }) => {
         fake.slow(20_000);
@@ -251,6 +268,21 @@ test('files can be dropped, and folders removed', async () => {
         await press(tab, 'Remove');
         await notice(tab, 'depot rm um: done');
         assert.equal(fake.depot.has('um/7.1/install.sh'), false);
+    });
+});
+
+test('a folder that is still read does not show the rows of another', async () => {
+    await on('/depot', {}, async ({ tab, front }) => {
+        await untilText(tab, 'package.tar', '.list');
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request, url) => (url.pathname === '/v1/depot' && url.searchParams.get('path') === 'um' ? held : undefined);
+        await tab.click('.list a[href="/depot?path=um"]');
+        await untilText(tab, 'um', '.trail');
+        await untilText(tab, 'Reading…');
+        assert.equal(await tab.$('.list'), null);
+        letGo();
+        await untilText(tab, '7.1', '.list');
     });
 });
 
