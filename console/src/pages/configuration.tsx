@@ -11,7 +11,7 @@ import { DiffView } from '../parts/diff_view';
 import { ImportPanel } from '../parts/import_panel';
 import { taskAddress } from '../parts/task_line';
 import { Link } from '../route/link';
-import { go, parameter, usePlace } from '../route/route';
+import { askBeforeLeaving, go, parameter, usePlace } from '../route/route';
 import { whenOver } from '../state/actions';
 import { health, mayAct, whoami } from '../state/host';
 import { useResource } from '../state/resource';
@@ -62,6 +62,10 @@ function useOpenChange(product: string, target: string): { id: string } | undefi
         task.product.toLowerCase() === product.toLowerCase() && (task.targetmsn ?? '') === target);
 }
 
+/// The browser's own question, as it has for a page that is closed: it can be asked while the browser
+/// goes back.
+const mayLose = (question: string): boolean => confirm(`What you have written is not on the host, and would be lost. ${question}`);
+
 function Editor({ product, target }: { product: string; target: string }) {
     const guarded = health.get()?.guarded === true;
     const { value, problem, isLoading, reload } = useResource(() => askConfiguration(product, target, guarded), [product, target]);
@@ -90,6 +94,7 @@ function Editor({ product, target }: { product: string; target: string }) {
     }, [sent]);
     const open = useOpenChange(product, target) ?? sent?.task;
     const readAgain = () => {
+        if (isChanged && !mayLose('Read the configuration again?')) return;
         spent.current = text;
         reload();
     };
@@ -100,7 +105,11 @@ function Editor({ product, target }: { product: string; target: string }) {
         if (!isChanged) return undefined;
         const warn = (event: BeforeUnloadEvent) => event.preventDefault();
         addEventListener('beforeunload', warn);
-        return () => removeEventListener('beforeunload', warn);
+        const stopAsking = askBeforeLeaving(() => mayLose('Leave it?'));
+        return () => {
+            removeEventListener('beforeunload', warn);
+            stopAsking();
+        };
     }, [isChanged]);
     if (problem && !value) return <ProblemBox problem={problem} retry={reload} />;
     if (!value) return <p class="faint">Reading…</p>;
@@ -145,11 +154,14 @@ export function ConfigurationPage() {
     useStore(whoami);
     const how = useStore(health);
     const isKnown = value?.some((one) => one.product === product && one.target === target) ?? false;
-    const choose = (event: { currentTarget: HTMLSelectElement }) => go(event.currentTarget.value || '/configuration');
+    const chosen = product === '' ? '' : addressOf(product, target);
+    const choose = ({ currentTarget }: { currentTarget: HTMLSelectElement }) => {
+        if (!go(currentTarget.value || '/configuration')) currentTarget.value = chosen;
+    };
     return (
         <>
             <PageHead title="Configuration" about="See what is there, change it, and see what changes before anything is sent">
-                <label class="inline">Agent <select value={product === '' ? '' : addressOf(product, target)} onChange={choose}>
+                <label class="inline">Agent <select value={chosen} onChange={choose}>
                     <option value="">choose…</option>
                     {!isKnown && product !== '' && <option value={addressOf(product, target)}>{printable(`${product} ${target}`)}</option>}
                     {value?.map((one) => <option key={one.name} value={addressOf(one.product, one.target)}>{printable(one.name)}</option>)}

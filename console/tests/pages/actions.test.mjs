@@ -212,6 +212,46 @@ test('a changed configuration stays in the editor until its task has ended', asy
     });
 });
 
+test('what is written and not sent is not lost without a question', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab, own } = view;
+        await tab.click('nav a[href="/configuration"]');
+        await tab.waitForSelector('main select option[value="/configuration?product=ux"]');
+        await tab.select('main select', '/configuration?product=ux');
+        await fill(tab, '.editor', 'INTERVAL=77\n');
+        const address = () => tab.evaluate(() => location.pathname + location.search);
+        const isKept = async () => {
+            await tab.waitForFunction(() => location.search === '?product=ux');
+            assert.equal(await tab.$eval('.editor', (editor) => editor.value.includes('INTERVAL=77')), true);
+            assert.deepEqual(own.answers, []);
+        };
+        own.answers = [false];
+        await press(tab, 'Read again');
+        await isKept();
+        own.answers = [false];
+        await tab.click('nav a[href="/agents"]');
+        await isKept();
+        own.answers = [false];
+        await tab.evaluate(() => document.activeElement.blur());
+        await tab.keyboard.type('go');
+        await isKept();
+        own.answers = [false];
+        await tab.select('main select', '');
+        await isKept();
+        assert.equal(await tab.$eval('main select', (field) => field.value), '/configuration?product=ux');
+        own.answers = [false];
+        await tab.evaluate(() => history.back());
+        for (let tries = 0; own.answers.length > 0 && tries < 100; ++tries) await new Promise((done) => setTimeout(done, 50));
+        await isKept();
+        own.answers = [true];
+        await tab.click('nav a[href="/agents"]');
+        await tab.waitForFunction(() => location.pathname === '/agents');
+        assert.equal(await address(), '/agents');
+        await tab.click('nav a[href="/"]');
+        await tab.waitForFunction(() => location.pathname === '/');
+    });
+});
+
 test('what somebody else has set meanwhile is not overwritten', async () => {
     await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
         await fill(tab, '.editor', 'INTERVAL=1\n');
