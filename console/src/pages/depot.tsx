@@ -43,9 +43,11 @@ function Trail({ path }: { path: DepotPath }) {
 
 function RemoveDialog({ path, isFolder, onClose, onRemoved }: { path: DepotPath; isFolder: boolean; onClose: () => void; onRemoved: () => void }) {
     const [problem, setProblem] = useState<Problem>();
+    const [isBusy, setBusy] = useState(false);
     const name = shownPath(path);
     const remove = async (event: Event) => {
         event.preventDefault();
+        setBusy(true);
         try {
             await removeFromDepot(path, isFolder);
             notify({ tone: 'good', text: `depot rm ${name}: done` });
@@ -53,15 +55,16 @@ function RemoveDialog({ path, isFolder, onClose, onRemoved }: { path: DepotPath;
             onClose();
         } catch (error) {
             setProblem(asProblem(error));
+            setBusy(false);
         }
     };
     return (
-        <Dialog title={`depot rm ${printable(name)}`} onClose={onClose}>
+        <Dialog title={`depot rm ${printable(name)}`} onClose={onClose} isBusy={isBusy}>
             <form onSubmit={(event) => void remove(event)}>
                 <p>{isFolder ? 'Remove the folder with everything in it.' : 'Remove the file from the depot.'}</p>
                 <CommandLine line={removeLine(commandPrefix(), name, isFolder)} />
                 {problem && <ProblemBox problem={problem} />}
-                <footer><button type="button" onClick={onClose}>Back</button><button type="submit" class="grave">Remove</button></footer>
+                <footer><button type="button" disabled={isBusy} onClick={onClose}>Back</button><button type="submit" class="grave" disabled={isBusy}>Remove</button></footer>
             </form>
         </Dialog>
     );

@@ -116,6 +116,50 @@ test('a request whose answer was lost is no second task when it is sent again', 
     });
 });
 
+test('a window stays until what it has asked for is answered', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab, front } = view;
+        view.own.isDisturbed = true;
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request) => (request.method === 'POST' && request.url === '/v1/tasks' ? held : undefined);
+        await press(tab, 'Install…');
+        await fill(tab, 'input[list="depot-products"]', 'zz');
+        await fill(tab, 'input[list="depot-versions"]', '1');
+        await press(tab, 'Send install zz');
+        await untilText(tab, 'Asking…', 'dialog');
+        const closers = await tab.$$eval('dialog button:not([type=submit])', (buttons) => buttons.filter((one) => /Back|✕/.test(one.textContent)).map((one) => one.disabled));
+        assert.deepEqual(closers, [true, true]);
+        for (let times = 0; times < 3; ++times) await tab.keyboard.press('Escape');
+        await tab.waitForSelector('dialog:modal');
+        letGo();
+        await untilText(tab, 'zz is not installed here', 'dialog [role=alert]');
+        await tab.keyboard.press('Escape');
+        await tab.waitForSelector('dialog', { hidden: true });
+    });
+});
+
+test('what becomes of a request is told also when its page has been left', async () => {
+    await on('/', {}, async (view) => {
+        const { tab, front } = view;
+        view.own.isDisturbed = true;
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request) => (request.method === 'POST' && request.url === '/v1/tasks' ? held : undefined);
+        await tab.click('nav a[href="/agents"]');
+        await press(tab, 'Install…');
+        await fill(tab, 'input[list="depot-products"]', 'zz');
+        await fill(tab, 'input[list="depot-versions"]', '1');
+        await press(tab, 'Send install zz');
+        await untilText(tab, 'Asking…', 'dialog');
+        await tab.evaluate(() => history.back());
+        await tab.waitForFunction(() => location.pathname === '/');
+        letGo();
+        await notice(tab, 'install zz: not accepted');
+        await notice(tab, 'zz is not installed here');
+    });
+});
+
 test('a running task is watched and cancelled, and done again', async () => {
     await on('/tasks', {}, async ({ tab, fake, go }) => {
         fake.slow(20_000);
@@ -252,6 +296,22 @@ test('what is written and not sent is not lost without a question', async () => 
     });
 });
 
+test('a line that a terminal would obey is shown, and not offered for copying', async () => {
+    await on('/agents', {}, async ({ tab, fake, go }) => {
+        fake.configurations.set('ux', 'INTERVAL=5\n# \u001b[201~ \u202e\n');
+        await go('/configuration?product=ux');
+        await tab.waitForSelector('.editor');
+        await tab.$eval('.editor', (editor) => {
+            editor.value = editor.value.replace('INTERVAL=5', 'INTERVAL=6');
+            editor.dispatchEvent(new Event('input', { bubbles: true }));
+        });
+        await press(tab, 'Send…');
+        await untilText(tab, '# \\x1B[201~ \\u202E', 'dialog .command-line');
+        await untilText(tab, 'Not to be copied', 'dialog .command-line');
+        assert.equal(await tab.$('dialog .command-line button'), null);
+    });
+});
+
 test('what somebody else has set meanwhile is not overwritten', async () => {
     await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
         await fill(tab, '.editor', 'INTERVAL=1\n');
@@ -290,6 +350,28 @@ test('files are pushed, summed and removed', async () => {
     } finally {
         await rm(scratch, { recursive: true });
     }
+});
+
+test('a push whose last byte has gone is not offered to be given up', async () => {
+    await on('/depot', {}, async ({ tab, front, fake }) => {
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request) => (request.method === 'PUT' ? held : undefined);
+        await tab.waitForSelector('.drop');
+        await tab.evaluate(() => {
+            const dataTransfer = new DataTransfer();
+            dataTransfer.items.add(new File(['late'], 'late.tar'));
+            document.querySelector('.drop').dispatchEvent(new DragEvent('drop', { dataTransfer, bubbles: true, cancelable: true }));
+        });
+        await tab.waitForSelector('aria/Put away late.tar');
+        await press(tab, 'Push 1 file');
+        await untilText(tab, 'verifying', '.push');
+        assert.equal(await tab.$('.push > button'), null);
+        letGo();
+        await untilText(tab, 'verified:');
+        assert.equal(String(fake.depot.get('late.tar').content), 'late');
+        await press(tab, 'Put away late.tar');
+    });
 });
 
 test('files can be dropped, and folders removed', async () => {

@@ -78,8 +78,8 @@ export async function startFront({ page, host, depot, command = ['zavctl'] }) {
         if (url.pathname === '/console/session') {
             return sendJson(response, 200, { mode: 'host', address: '/run/zavhost.sock', program: 'zavctl-console', version: '1.0.0', command });
         }
-        if (url.pathname === '/console/depot' && request.method === 'PUT') return depot(request, response, url);
         if (isApi) await state.hold?.(request, url);
+        if (url.pathname === '/console/depot' && request.method === 'PUT') return depot(request, response, url);
         if (isApi && state.isAway) return sendJson(response, 502, { error: 'the host is away' });
         if (isApi && state.isDeaf && !isSafe) return host(request, lostAnswer(response), url);
         if (isApi) return host(request, response, url);
