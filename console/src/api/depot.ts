@@ -49,6 +49,8 @@ export function pushFile(path: DepotPath, file: Blob, onProgress: (sent: number)
         for (const [name, value] of Object.entries(ownHeader)) request.setRequestHeader(name, value);
         request.setRequestHeader('Content-Type', 'application/octet-stream');
         request.upload.onprogress = (event) => onProgress(event.loaded);
+        // An empty file has no progress to report.
+        request.upload.onload = () => onProgress(file.size);
         request.onerror = () => reject(asProblem(undefined));
         request.onabort = () => reject(new DOMException('given up', 'AbortError'));
         request.onload = () => {

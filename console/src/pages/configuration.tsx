@@ -1,14 +1,18 @@
 /// Reads an agent's configuration, and replaces it after having shown what changes.
-import { useEffect, useState } from 'preact/hooks';
+import { useEffect, useRef, useState } from 'preact/hooks';
 import { askConfiguration } from '../api/configuration';
 import { askInstances, askInventory } from '../api/host';
 import { Problem } from '../api/problem';
+import type { Task } from '../api/types';
+import { work } from '../live/work';
 import { ActionDialog } from '../parts/action_dialog';
 import { Empty, PageHead, Panel, ProblemBox } from '../parts/basics';
 import { DiffView } from '../parts/diff_view';
 import { ImportPanel } from '../parts/import_panel';
+import { taskAddress } from '../parts/task_line';
 import { Link } from '../route/link';
-import { go, parameter, usePlace } from '../route/route';
+import { askBeforeLeaving, go, parameter, usePlace } from '../route/route';
+import { whenOver } from '../state/actions';
 import { health, mayAct, whoami } from '../state/host';
 import { useResource } from '../state/resource';
 import { useStore } from '../state/store';
@@ -51,12 +55,49 @@ async function refuseIfChanged(product: string, target: string, before: string):
         'Copy what you have written, and read the configuration again to see it as it is now.');
 }
 
+/// A change of this configuration that waits or runs, whoever has asked for it. Until it has ended nobody
+/// knows what the next one would replace.
+function useOpenChange(product: string, target: string): { id: string } | undefined {
+    return useStore(work)?.find((task) => task.command === 'SETCONFIG' &&
+        task.product.toLowerCase() === product.toLowerCase() && (task.targetmsn ?? '') === target);
+}
+
+/// The browser's own question, as it has for a page that is closed: it can be asked while the browser
+/// goes back.
+const mayLose = (question: string): boolean => confirm(`What you have written is not on the host, and would be lost. ${question}`);
+
 function Editor({ product, target }: { product: string; target: string }) {
     const guarded = health.get()?.guarded === true;
     const { value, problem, isLoading, reload } = useResource(() => askConfiguration(product, target, guarded), [product, target]);
     const [text, setText] = useState<string>();
     const [isSending, setSending] = useState(false);
-    useEffect(() => setText(undefined), [value]);
+    const [sent, setSent] = useState<{ task: Task; text: string | undefined }>();
+    /// What need not be kept once the configuration has been read anew.
+    const spent = useRef<string | undefined>(undefined);
+    useEffect(() => {
+        setText((current) => (current === spent.current ? undefined : current));
+        spent.current = undefined;
+    }, [value]);
+    useEffect(() => {
+        if (!sent) return undefined;
+        let isWanted = true;
+        void whenOver(sent.task).then((task) => {
+            if (!isWanted) return;
+            setSent(undefined);
+            if (task.state !== 'done') return;
+            spent.current = sent.text;
+            reload();
+        });
+        return () => {
+            isWanted = false;
+        };
+    }, [sent]);
+    const open = useOpenChange(product, target) ?? sent?.task;
+    const readAgain = () => {
+        if (isChanged && !mayLose('Read the configuration again?')) return;
+        spent.current = text;
+        reload();
+    };
     const before = value ? withEnd(value.text) : '';
     const after = text ?? before;
     const isChanged = withEnd(after) !== before;
@@ -64,14 +105,18 @@ function Editor({ product, target }: { product: string; target: string }) {
         if (!isChanged) return undefined;
         const warn = (event: BeforeUnloadEvent) => event.preventDefault();
         addEventListener('beforeunload', warn);
-        return () => removeEventListener('beforeunload', warn);
+        const stopAsking = askBeforeLeaving(() => mayLose('Leave it?'));
+        return () => {
+            removeEventListener('beforeunload', warn);
+            stopAsking();
+        };
     }, [isChanged]);
     if (problem && !value) return <ProblemBox problem={problem} retry={reload} />;
     if (!value) return <p class="faint">Reading…</p>;
     const isWritable = value.isWhole && mayAct(whoami.get());
     return (
         <div class="columns even">
-            <Panel title="Text" aside={<button type="button" disabled={isLoading} onClick={reload}>Read again</button>}>
+            <Panel title="Text" aside={<button type="button" disabled={isLoading} onClick={readAgain}>Read again</button>}>
                 {!value.isWhole && <ProblemBox problem={cutProblem(product, value.text)} />}
                 <textarea class="editor" aria-label="Configuration" rows={22} spellcheck={false} autocomplete="off" readOnly={!isWritable}
                     value={after} onInput={(event) => setText(event.currentTarget.value)} />
@@ -79,16 +124,21 @@ function Editor({ product, target }: { product: string; target: string }) {
             <Panel title="Difference to what is there" aside={isWritable && (
                 <span class="buttons">
                     <button type="button" disabled={!isChanged} onClick={() => setText(undefined)}>Undo all</button>
-                    <button type="button" class="main" disabled={!isChanged || after.trim() === ''} onClick={() => setSending(true)}>Send…</button>
+                    <button type="button" class="main" disabled={!isChanged || after.trim() === '' || open !== undefined} onClick={() => setSending(true)}>Send…</button>
                 </span>
             )}>
+                {open && (
+                    <p class="box attention" role="status">
+                        <Link to={taskAddress(open.id)}>A change of this configuration</Link> is on its way. What stands here is kept, and can be sent once that has ended.
+                    </p>
+                )}
                 <DiffView before={before} after={withEnd(after)} />
             </Panel>
             {isSending && (
                 <ActionDialog wide request={{ command: 'SETCONFIG', product, context: withEnd(after), ...(target === '' ? {} : { targetmsn: target }) }}
                     about={<p>Replace a configuration. The agent takes it when it is started again.</p>} mayForce
                     before={() => refuseIfChanged(product, target, value.text)}
-                    onClose={() => setSending(false)} onAccepted={() => setTimeout(reload, 1_000)}>
+                    onClose={() => setSending(false)} onAccepted={(task) => setSent({ task, text })}>
                     <DiffView before={before} after={withEnd(after)} />
                 </ActionDialog>
             )}
@@ -104,11 +154,14 @@ export function ConfigurationPage() {
     useStore(whoami);
     const how = useStore(health);
     const isKnown = value?.some((one) => one.product === product && one.target === target) ?? false;
-    const choose = (event: { currentTarget: HTMLSelectElement }) => go(event.currentTarget.value || '/configuration');
+    const chosen = product === '' ? '' : addressOf(product, target);
+    const choose = ({ currentTarget }: { currentTarget: HTMLSelectElement }) => {
+        if (!go(currentTarget.value || '/configuration')) currentTarget.value = chosen;
+    };
     return (
         <>
             <PageHead title="Configuration" about="See what is there, change it, and see what changes before anything is sent">
-                <label class="inline">Agent <select value={product === '' ? '' : addressOf(product, target)} onChange={choose}>
+                <label class="inline">Agent <select value={chosen} onChange={choose}>
                     <option value="">choose…</option>
                     {!isKnown && product !== '' && <option value={addressOf(product, target)}>{printable(`${product} ${target}`)}</option>}
                     {value?.map((one) => <option key={one.name} value={addressOf(one.product, one.target)}>{printable(one.name)}</option>)}

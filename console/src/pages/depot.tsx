@@ -1,5 +1,5 @@
 /// What the depot holds.
-import { useEffect, useMemo, useState } from 'preact/hooks';
+import { useEffect, useMemo, useRef, useState } from 'preact/hooks';
 import { type DepotPath, askListing, askSums, childOf, encodedPath, removeFromDepot, shownPath } from '../api/depot';
 import { type Problem, asProblem } from '../api/problem';
 import type { DepotEntry } from '../api/types';
@@ -43,9 +43,11 @@ function Trail({ path }: { path: DepotPath }) {
 
 function RemoveDialog({ path, isFolder, onClose, onRemoved }: { path: DepotPath; isFolder: boolean; onClose: () => void; onRemoved: () => void }) {
     const [problem, setProblem] = useState<Problem>();
+    const [isBusy, setBusy] = useState(false);
     const name = shownPath(path);
     const remove = async (event: Event) => {
         event.preventDefault();
+        setBusy(true);
         try {
             await removeFromDepot(path, isFolder);
             notify({ tone: 'good', text: `depot rm ${name}: done` });
@@ -53,15 +55,16 @@ function RemoveDialog({ path, isFolder, onClose, onRemoved }: { path: DepotPath;
             onClose();
         } catch (error) {
             setProblem(asProblem(error));
+            setBusy(false);
         }
     };
     return (
-        <Dialog title={`depot rm ${printable(name)}`} onClose={onClose}>
+        <Dialog title={`depot rm ${printable(name)}`} onClose={onClose} isBusy={isBusy}>
             <form onSubmit={(event) => void remove(event)}>
                 <p>{isFolder ? 'Remove the folder with everything in it.' : 'Remove the file from the depot.'}</p>
                 <CommandLine line={removeLine(commandPrefix(), name, isFolder)} />
                 {problem && <ProblemBox problem={problem} />}
-                <footer><button type="button" onClick={onClose}>Back</button><button type="submit" class="grave">Remove</button></footer>
+                <footer><button type="button" disabled={isBusy} onClick={onClose}>Back</button><button type="submit" class="grave" disabled={isBusy}>Remove</button></footer>
             </form>
         </Dialog>
     );
@@ -92,7 +95,13 @@ export function DepotPage() {
     const path = /%|^[\w./-]*$/.test(raw) ? raw : encodedPath(raw);
     const who = useStore(whoami);
     const arrived = useStore(arrivals);
-    const listing = useResource((signal) => askListing(path, signal), [path, arrived]);
+    const listing = useResource((signal) => askListing(path, signal), [path]);
+    const seen = useRef(arrived);
+    useEffect(() => {
+        if (seen.current === arrived) return;
+        seen.current = arrived;
+        listing.reload();
+    }, [arrived]);
     const [text, setText] = useState('');
     const [removing, setRemoving] = useState<{ path: DepotPath; isFolder: boolean }>();
     const [summing, setSumming] = useState<readonly DepotPath[]>();
@@ -122,6 +131,7 @@ export function DepotPage() {
             </PageHead>
             {isMine && listing.value?.type !== 'file' && <PushPanel directory={path} />}
             {listing.problem && <ProblemBox problem={listing.problem} retry={listing.reload} />}
+            {!listing.value && listing.isLoading && <p class="faint">Reading…</p>}
             {listing.value && entries.length === 0 && (
                 <Empty title={path === '' ? 'The depot is empty' : 'This folder is empty'}>
                     <p>Drop a file above, or run <code>zavctl push package.tar</code>. A product to install lies in <code>PRODUCT/VERSION</code>; <code>zavctl push FOLDER PRODUCT/VERSION</code> brings a whole folder.</p>

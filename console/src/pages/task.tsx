@@ -38,13 +38,13 @@ function CancelDialog({ task, onClose }: { task: Task; onClose: () => void }) {
         }
     };
     return (
-        <Dialog title={`task cancel ${task.id}`} onClose={onClose}>
+        <Dialog title={`task cancel ${task.id}`} onClose={onClose} isBusy={isBusy}>
             <form onSubmit={(event) => void send(event)}>
                 <p>{task.state === 'queued' ? 'It waits, and will never run.' : 'What its commands have started is ended: first asked to, then killed after 10 seconds. What made a session of its own, as agents do, is left alone.'}</p>
                 <CommandLine line={cancelLine(commandPrefix(), task.id)} />
                 {problem && <ProblemBox problem={problem} />}
                 <footer>
-                    <button type="button" onClick={onClose}>Back</button>
+                    <button type="button" disabled={isBusy} onClick={onClose}>Back</button>
                     <button type="submit" class="grave" disabled={isBusy}>{isBusy ? 'Ending it…' : 'Cancel the task'}</button>
                 </footer>
             </form>

@@ -1,11 +1,12 @@
 /// Asks for a task after having shown what is asked for: the words, the zavctl line, what it means.
 import type { ComponentChildren } from 'preact';
-import { useState } from 'preact/hooks';
+import { useEffect, useRef, useState } from 'preact/hooks';
 import { type Problem, asProblem } from '../api/problem';
-import type { TaskRequest } from '../api/tasks';
+import { RequestNames, type TaskRequest } from '../api/tasks';
 import type { Task } from '../api/types';
 import { act } from '../state/actions';
 import { commandPrefix } from '../state/host';
+import { notify } from '../state/notices';
 import { taskLine, titleOf } from '../words/lines';
 import { CommandLine, ProblemBox } from './basics';
 import { Dialog } from './dialog';
@@ -33,6 +34,11 @@ export function ActionDialog(props: ActionDialogProps) {
     const [force, setForce] = useState(false);
     const [isBusy, setBusy] = useState(false);
     const [problem, setProblem] = useState<Problem>();
+    const [names] = useState(() => new RequestNames());
+    const isThere = useRef(true);
+    useEffect(() => () => {
+        isThere.current = false;
+    }, []);
     const request = props.mayForce && force ? { ...props.request, force } : props.request;
     const title = titleOf(request);
     const line = taskLine(commandPrefix(), request);
@@ -42,17 +48,21 @@ export function ActionDialog(props: ActionDialogProps) {
         setProblem(undefined);
         try {
             await props.before?.();
-            const task = await act(request);
+            const task = await act(request, names.nameOf(request));
             props.onClose();
             props.onAccepted?.(task);
         } catch (error) {
-            setProblem(asProblem(error));
+            const found = asProblem(error);
+            if (!found.isLost) names.forget(request);
+            // The page may have been left meanwhile, and its window with it.
+            if (!isThere.current) notify({ tone: 'bad', text: `${title}: ${found.isLost ? 'nobody knows whether it was accepted' : 'not accepted'}`, detail: found.message, hint: found.hint });
+            setProblem(found);
             setBusy(false);
         }
     };
     const isForceOffered = props.mayForce === true && (force || problem?.guard === 'product');
     return (
-        <Dialog title={title} onClose={props.onClose} wide={props.wide === true}>
+        <Dialog title={title} onClose={props.onClose} wide={props.wide === true} isBusy={isBusy}>
             <form onSubmit={(event) => void send(event)}>
                 <div class="about">{props.about}</div>
                 {props.children}
@@ -66,7 +76,7 @@ export function ActionDialog(props: ActionDialogProps) {
                 )}
                 <footer>
                     {props.missing && <p class="faint">{props.missing}</p>}
-                    <button type="button" onClick={props.onClose}>Back</button>
+                    <button type="button" disabled={isBusy} onClick={props.onClose}>Back</button>
                     <button type="submit" class={props.isGrave ? 'grave' : 'main'} disabled={isBusy || !!props.missing}>
                         {isBusy ? 'Asking…' : `Send ${title}`}
                     </button>

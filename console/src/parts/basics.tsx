@@ -4,7 +4,7 @@ import { useEffect, useState } from 'preact/hooks';
 import type { Problem } from '../api/problem';
 import type { TaskState } from '../api/types';
 import { Store, useStore } from '../state/store';
-import { printable, redacted } from '../words/printable';
+import { holdsHidden, printable, printableLines, redacted } from '../words/printable';
 import { exactText, localText, parsedTime, relativeText } from '../words/time';
 
 /// The time as the page shows it. All relative times step together.
@@ -88,10 +88,13 @@ export function CopyButton({ text, label }: { text: string; label: string }) {
 
 /// The line that does the same in a terminal.
 export function CommandLine({ line }: { line: string }) {
+    // Words are spelled out; the text of a here-document cannot be.
+    const isCopied = !holdsHidden(line);
     return (
         <div class="command-line">
-            <pre tabIndex={0} role="region" aria-label="The same on the command line"><code>{line}</code></pre>
-            <CopyButton text={line} label="Copy the command line" />
+            <pre tabIndex={0} role="region" aria-label="The same on the command line"><code>{printableLines(line)}</code></pre>
+            {isCopied ? <CopyButton text={line} label="Copy the command line" />
+                : <span class="faint">Not to be copied: it holds characters that a terminal would obey.</span>}
         </div>
     );
 }

@@ -1,7 +1,7 @@
 import { useRef, useState } from 'preact/hooks';
 import type { DepotPath } from '../api/depot';
 import { commandPrefix } from '../state/host';
-import { type Push, addFiles, destinationOf, dropPush, pushes, sendAll } from '../state/pushes';
+import { type Push, addFiles, canDrop, destinationOf, dropPush, pushes, sendAll } from '../state/pushes';
 import { useStore } from '../state/store';
 import { pushLine } from '../words/lines';
 import { printable } from '../words/printable';
@@ -30,7 +30,7 @@ function PushRow({ push }: { push: Push }) {
                 {push.problem && <ProblemBox problem={push.problem} />}
                 {push.state === 'ready' && <CommandLine line={pushLine(commandPrefix(), push.name, destinationOf(push))} />}
             </div>
-            <button type="button" class="plain" aria-label={isUnderWay ? `Give up ${name}` : `Put away ${name}`} onClick={() => dropPush(push.key)}>✕</button>
+            {canDrop(push) && <button type="button" class="plain" aria-label={isUnderWay ? `Give up ${name}` : `Put away ${name}`} onClick={() => dropPush(push.key)}>✕</button>}
         </li>
     );
 }

@@ -11,16 +11,38 @@ const read = (): Place => ({ path: location.pathname, search: location.search })
 
 export const place = new Store<Place>(read());
 
-addEventListener('popstate', () => place.set(read()));
+let mayLeave: (() => boolean) | undefined;
+
+/// Has `ask` decide from now on whether what is shown may be left for another place within the console.
+/// Returns how to stop that.
+export function askBeforeLeaving(ask: () => boolean): () => void {
+    mayLeave = ask;
+    return () => {
+        if (mayLeave === ask) mayLeave = undefined;
+    };
+}
+
+addEventListener('popstate', () => {
+    const from = place.get();
+    const to = read();
+    // A link within the page comes here as well.
+    if (to.path === from.path && to.search === from.search) return;
+    // The browser is there already, so staying is a step of its own.
+    if (mayLeave && !mayLeave()) history.pushState(null, '', from.path + from.search);
+    else place.set(to);
+});
 
 /// Goes to another page, or to another view of this one without an entry of its own in the history.
-export function go(address: string, how: 'push' | 'replace' = 'push'): void {
-    if (address === location.pathname + location.search) return;
+/// False: what is shown was not to be left.
+export function go(address: string, how: 'push' | 'replace' = 'push'): boolean {
+    if (address === location.pathname + location.search) return true;
+    if (mayLeave && !mayLeave()) return false;
     if (how === 'push') history.pushState(null, '', address);
     else history.replaceState(null, '', address);
     const isOtherPage = location.pathname !== place.get().path;
     place.set(read());
     if (isOtherPage) scrollTo(0, 0);
+    return true;
 }
 
 /// A parameter as it stands in the address, still percent-encoded.

@@ -1,9 +1,9 @@
 /// What buttons do: ask for a task, say what becomes of it, and look whether a success is one.
 import { askInstances, askInventory } from '../api/host';
 import { asProblem } from '../api/problem';
-import { type TaskRequest, askForTask, isOver } from '../api/tasks';
+import { type TaskRequest, askForTask, askTask, isOver } from '../api/tasks';
 import type { Task } from '../api/types';
-import { feedItems, onFeed } from '../live/feed';
+import { feedEpoch, feedItems, onFeed } from '../live/feed';
 import { noteWork } from '../live/work';
 import { titleOf } from '../words/lines';
 import { reasonOf } from '../words/results';
@@ -12,20 +12,23 @@ import { type Finding, doubtAboutInstall, doubtAboutState, doubtAboutUninstall }
 import { health } from './host';
 import { notify } from './notices';
 
-/// The task once it is over, as the feed tells it.
-function whenOver(task: Task): Promise<Task> {
+/// The task once it is over, as the feed tells it, or the host itself where the feed has lost events.
+export function whenOver(task: Task): Promise<Task> {
     if (isOver(task.state)) return Promise.resolve(task);
     for (const item of feedItems.get()) {
         if (item.content.kind === 'task' && item.content.task.id === task.id) return Promise.resolve(item.content.task);
     }
     return new Promise((resolve) => {
-        const stop = onFeed((items) => {
-            for (const { content } of items) {
-                if (content.kind !== 'task' || content.task.id !== task.id) continue;
-                stop();
-                resolve(content.task);
-            }
+        const take = (current: Task) => {
+            if (current.id !== task.id || !isOver(current.state)) return;
+            stopFeed();
+            stopEpoch();
+            resolve(current);
+        };
+        const stopFeed = onFeed((items) => {
+            for (const { content } of items) if (content.kind === 'task') take(content.task);
         });
+        const stopEpoch = feedEpoch.subscribe(() => void askTask(task.id).then(take, () => undefined));
     });
 }
 
@@ -65,10 +68,10 @@ async function tellEnd(title: string, request: TaskRequest, accepted: Task, key:
 }
 
 /// Asks for the task and says what becomes of it, now and when it is over. Returns it once the host
-/// has it. Throws a Problem.
-export async function act(request: TaskRequest): Promise<Task> {
+/// has it. `transid` names the request. Throws a Problem.
+export async function act(request: TaskRequest, transid: string): Promise<Task> {
     const title = titleOf(request);
-    const task = await askForTask(request);
+    const task = await askForTask(request, transid);
     const key = notify({ tone: 'info', text: `${title}: accepted`, task: task.id });
     noteWork(task);
     void tellEnd(title, request, task, key);

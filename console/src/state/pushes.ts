@@ -87,12 +87,16 @@ export async function sendAll(): Promise<void> {
 
 const isWaiting = (push: Push): boolean => push.state === 'waiting';
 
+/// Once its last byte has gone nothing stops a push: the console hands it to the host, which puts it in
+/// its place, whether or not somebody still listens.
+export const canDrop = (push: Push): boolean => push.state !== 'verifying';
+
 /// Gives a push up, or puts its result away.
 export function dropPush(key: number): void {
     const push = pushes.get().find((one) => one.key === key);
-    const isUnderWay = push?.state === 'sending' || push?.state === 'verifying';
+    if (!push || !canDrop(push)) return;
     files.get(key)?.abort.abort();
-    if (isUnderWay) return;
+    if (push.state === 'sending') return;
     files.delete(key);
     pushes.update((all) => all.filter((one) => one.key !== key));
 }

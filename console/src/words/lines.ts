@@ -4,8 +4,9 @@ import { shellLine, withInput } from './shell';
 
 type Prefix = readonly string[];
 
-/// A word that would be taken for an option needs the dashes before it.
-const value = (text: string): string[] => (text.startsWith('-') ? ['--', text] : [text]);
+/// Words of which one would be taken for an option need the dashes before them.
+const values = (texts: readonly string[]): string[] => (texts.some((text) => text.startsWith('-')) ? ['--', ...texts] : [...texts]);
+const value = (text: string): string[] => values([text]);
 
 const option = (name: string, text: string | undefined): string[] => {
     if (!text) return [];
@@ -62,9 +63,10 @@ export function taskLine(prefix: Prefix, request: TaskRequest): string | undefin
 export const cancelLine = (prefix: Prefix, id: string): string => shellLine([...prefix, 'task', 'cancel', id]);
 export const removeLine = (prefix: Prefix, path: string, recursive: boolean): string =>
     shellLine([...prefix, 'depot', 'rm', ...flag('-r', recursive), ...value(path)]);
-export const sumLine = (prefix: Prefix, paths: readonly string[]): string => shellLine([...prefix, 'depot', 'sum', ...paths]);
+export const sumLine = (prefix: Prefix, paths: readonly string[]): string =>
+    shellLine([...prefix, 'depot', 'sum', ...values(paths)]);
 export const pushLine = (prefix: Prefix, file: string, destination: string): string =>
-    shellLine([...prefix, 'push', ...(file === destination ? value(file) : [...value(file), destination])]);
+    shellLine([...prefix, 'push', ...(file === destination ? value(file) : values([file, destination]))]);
 
 /// "start ux", as zavctl's messages begin.
 export function titleOf(request: { command: string; product: string; targetmsn?: string | undefined }): string {

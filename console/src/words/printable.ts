@@ -14,6 +14,9 @@ function escaped(character: string): string {
         : `\\u${code.toString(16).toUpperCase().padStart(4, '0')}`;
 }
 
+/// Whether there is anything in it that nobody would see, or that a terminal would obey.
+export const holdsHidden = (text: string): boolean => text.search(hidden) >= 0;
+
 /// One line of text.
 export function printable(text: string): string {
     return text.replace(hidden, escaped).replace(lineEnds, escaped);

@@ -99,6 +99,67 @@ test('a refusal has the words, the guard and the way out', async () => {
     });
 });
 
+test('a request whose answer was lost is no second task when it is sent again', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab, fake, front } = view;
+        view.own.isDisturbed = true;
+        const known = fake.tasks.length;
+        // The host takes it, and nobody hears of that.
+        front.state.isDeaf = true;
+        await press(tab, 'Stop db7:UX');
+        await press(tab, 'Send stop ux');
+        await untilText(tab, 'It may have been accepted all the same.', 'dialog [role=alert]');
+        front.state.isDeaf = false;
+        await press(tab, 'Send stop ux');
+        await notice(tab, 'stop ux: done');
+        assert.deepEqual(fake.tasks.slice(known).map((task) => task.command), ['STOP']);
+    });
+});
+
+test('a window stays until what it has asked for is answered', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab, front } = view;
+        view.own.isDisturbed = true;
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request) => (request.method === 'POST' && request.url === '/v1/tasks' ? held : undefined);
+        await press(tab, 'Install…');
+        await fill(tab, 'input[list="depot-products"]', 'zz');
+        await fill(tab, 'input[list="depot-versions"]', '1');
+        await press(tab, 'Send install zz');
+        await untilText(tab, 'Asking…', 'dialog');
+        const closers = await tab.$$eval('dialog button:not([type=submit])', (buttons) => buttons.filter((one) => /Back|✕/.test(one.textContent)).map((one) => one.disabled));
+        assert.deepEqual(closers, [true, true]);
+        for (let times = 0; times < 3; ++times) await tab.keyboard.press('Escape');
+        await tab.waitForSelector('dialog:modal');
+        letGo();
+        await untilText(tab, 'zz is not installed here', 'dialog [role=alert]');
+        await tab.keyboard.press('Escape');
+        await tab.waitForSelector('dialog', { hidden: true });
+    });
+});
+
+test('what becomes of a request is told also when its page has been left', async () => {
+    await on('/', {}, async (view) => {
+        const { tab, front } = view;
+        view.own.isDisturbed = true;
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request) => (request.method === 'POST' && request.url === '/v1/tasks' ? held : undefined);
+        await tab.click('nav a[href="/agents"]');
+        await press(tab, 'Install…');
+        await fill(tab, 'input[list="depot-products"]', 'zz');
+        await fill(tab, 'input[list="depot-versions"]', '1');
+        await press(tab, 'Send install zz');
+        await untilText(tab, 'Asking…', 'dialog');
+        await tab.evaluate(() => history.back());
+        await tab.waitForFunction(() => location.pathname === '/');
+        letGo();
+        await notice(tab, 'install zz: not accepted');
+        await notice(tab, 'zz is not installed here');
+    });
+});
+
 test('a running task is watched and cancelled, and done again', async () => {
     await on('/tasks', {}, async ({ tab, fake, go }) => {
         fake.slow(20_000);
@@ -132,6 +193,26 @@ test('doing a change of a configuration again asks for the text', async () => {
     });
 });
 
+test('a command that the host has cut is not sent before the whole of it is given', async () => {
+    await on('/tasks', {}, async ({ tab, fake, go }) => {
+        const command = `/bin/sh |DEPLOYDIR|/install.sh ${'x'.repeat(5_000)}`;
+        const task = fake.accept({ command: 'INSTALL', product: 'ny', version: '7.1', context: command.slice(0, 4096) });
+        await go(`/tasks/${task.id}`);
+        await untilText(tab, 'done', '.page-head');
+        await press(tab, 'Do again…');
+        await untilText(tab, 'The context is cut: give the whole of it.', 'dialog');
+        assert.equal(await tab.$eval('dialog [type=submit]', (button) => button.disabled), true);
+        await tab.$eval('dialog textarea', (field, whole) => {
+            field.value = whole;
+            field.dispatchEvent(new Event('input', { bubbles: true }));
+        }, command);
+        await tab.waitForFunction(() => !document.querySelector('dialog [type=submit]').disabled);
+        await tab.click('dialog [type=submit]');
+        await notice(tab, 'install ny: done');
+        assert.equal(last(fake).context, command);
+    });
+});
+
 test('a configuration is changed after its difference has been shown', async () => {
     await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
         await tab.waitForSelector('.editor');
@@ -148,6 +229,86 @@ test('a configuration is changed after its difference has been shown', async () 
         await notice(tab, 'config set ux: done');
         assert.match(fake.configurations.get('ux'), /INTERVAL=30\n/);
         await untilText(tab, 'No difference to what is there.');
+    });
+});
+
+test('a changed configuration stays in the editor until its task has ended', async () => {
+    await on('/configuration?product=ux', {}, async ({ tab, fake }) => {
+        fake.slow(60_000);
+        await fill(tab, '.editor', 'INTERVAL=44\n');
+        await press(tab, 'Send…');
+        await press(tab, 'Send config set ux');
+        await notice(tab, 'config set ux: accepted');
+        await untilText(tab, 'is on its way');
+        await new Promise((done) => setTimeout(done, 1_500));
+        assert.equal(await tab.$eval('.editor', (editor) => editor.value.includes('INTERVAL=44')), true);
+        assert.equal(await tab.$$eval('main .columns button.main', ([button]) => button.disabled), true);
+        last(fake).finish('failed');
+        await notice(tab, 'config set ux: failed');
+        await tab.waitForFunction(() => !document.querySelector('main .columns button.main').disabled);
+        assert.equal(await tab.$eval('.editor', (editor) => editor.value.includes('INTERVAL=44')), true);
+        fake.slow(200);
+        await press(tab, 'Send…');
+        await press(tab, 'Send config set ux');
+        await notice(tab, 'config set ux: done');
+        await untilText(tab, 'No difference to what is there.');
+        assert.match(fake.configurations.get('ux'), /INTERVAL=44\n/);
+    });
+});
+
+test('what is written and not sent is not lost without a question', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab, own } = view;
+        await tab.click('nav a[href="/configuration"]');
+        await tab.waitForSelector('main select option[value="/configuration?product=ux"]');
+        await tab.select('main select', '/configuration?product=ux');
+        await fill(tab, '.editor', 'INTERVAL=77\n');
+        const address = () => tab.evaluate(() => location.pathname + location.search);
+        const isKept = async () => {
+            await tab.waitForFunction(() => location.search === '?product=ux');
+            assert.equal(await tab.$eval('.editor', (editor) => editor.value.includes('INTERVAL=77')), true);
+            assert.deepEqual(own.answers, []);
+        };
+        own.answers = [false];
+        await press(tab, 'Read again');
+        await isKept();
+        own.answers = [false];
+        await tab.click('nav a[href="/agents"]');
+        await isKept();
+        own.answers = [false];
+        await tab.evaluate(() => document.activeElement.blur());
+        await tab.keyboard.type('go');
+        await isKept();
+        own.answers = [false];
+        await tab.select('main select', '');
+        await isKept();
+        assert.equal(await tab.$eval('main select', (field) => field.value), '/configuration?product=ux');
+        own.answers = [false];
+        await tab.evaluate(() => history.back());
+        for (let tries = 0; own.answers.length > 0 && tries < 100; ++tries) await new Promise((done) => setTimeout(done, 50));
+        await isKept();
+        own.answers = [true];
+        await tab.click('nav a[href="/agents"]');
+        await tab.waitForFunction(() => location.pathname === '/agents');
+        assert.equal(await address(), '/agents');
+        await tab.click('nav a[href="/"]');
+        await tab.waitForFunction(() => location.pathname === '/');
+    });
+});
+
+test('a line that a terminal would obey is shown, and not offered for copying', async () => {
+    await on('/agents', {}, async ({ tab, fake, go }) => {
+        fake.configurations.set('ux', 'INTERVAL=5\n# \u001b[201~ \u202e\n');
+        await go('/configuration?product=ux');
+        await tab.waitForSelector('.editor');
+        await tab.$eval('.editor', (editor) => {
+            editor.value = editor.value.replace('INTERVAL=5', 'INTERVAL=6');
+            editor.dispatchEvent(new Event('input', { bubbles: true }));
+        });
+        await press(tab, 'Send…');
+        await untilText(tab, '# \\x1B[201~ \\u202E', 'dialog .command-line');
+        await untilText(tab, 'Not to be copied', 'dialog .command-line');
+        assert.equal(await tab.$('dialog .command-line button'), null);
     });
 });
 
@@ -191,6 +352,28 @@ test('files are pushed, summed and removed', async () => {
     }
 });
 
+test('a push whose last byte has gone is not offered to be given up', async () => {
+    await on('/depot', {}, async ({ tab, front, fake }) => {
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request) => (request.method === 'PUT' ? held : undefined);
+        await tab.waitForSelector('.drop');
+        await tab.evaluate(() => {
+            const dataTransfer = new DataTransfer();
+            dataTransfer.items.add(new File(['late'], 'late.tar'));
+            document.querySelector('.drop').dispatchEvent(new DragEvent('drop', { dataTransfer, bubbles: true, cancelable: true }));
+        });
+        await tab.waitForSelector('aria/Put away late.tar');
+        await press(tab, 'Push 1 file');
+        await untilText(tab, 'verifying', '.push');
+        assert.equal(await tab.$('.push > button'), null);
+        letGo();
+        await untilText(tab, 'verified:');
+        assert.equal(String(fake.depot.get('late.tar').content), 'late');
+        await press(tab, 'Put away late.tar');
+    });
+});
+
 test('files can be dropped, and folders removed', async () => {
     await on('/depot', {}, async ({ tab, fake }) => {
         await tab.waitForSelector('.drop');
@@ -207,6 +390,21 @@ test('files can be dropped, and folders removed', async () => {
         await press(tab, 'Remove');
         await notice(tab, 'depot rm um: done');
         assert.equal(fake.depot.has('um/7.1/install.sh'), false);
+    });
+});
+
+test('a folder that is still read does not show the rows of another', async () => {
+    await on('/depot', {}, async ({ tab, front }) => {
+        await untilText(tab, 'package.tar', '.list');
+        let letGo;
+        const held = new Promise((done) => (letGo = done));
+        front.state.hold = (request, url) => (url.pathname === '/v1/depot' && url.searchParams.get('path') === 'um' ? held : undefined);
+        await tab.click('.list a[href="/depot?path=um"]');
+        await untilText(tab, 'um', '.trail');
+        await untilText(tab, 'Reading…');
+        assert.equal(await tab.$('.list'), null);
+        letGo();
+        await untilText(tab, '7.1', '.list');
     });
 });
 

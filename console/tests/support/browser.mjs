@@ -30,7 +30,8 @@ export async function launch() {
 export async function openTab(browser, { width = 1280, height = 860, scheme = 'light' } = {}) {
     const tab = await browser.newPage();
     const faults = [];
-    const own = { isDisturbed: false };
+    /// `answers` are given to questions that are expected, in their order.
+    const own = { isDisturbed: false, answers: [] };
     await tab.setViewport({ width, height });
     await tab.emulateMediaFeatures([{ name: 'prefers-color-scheme', value: scheme }, { name: 'prefers-reduced-motion', value: 'reduce' }]);
     await tab.exposeFunction('reportFault', (text) => faults.push(text));
@@ -39,7 +40,9 @@ export async function openTab(browser, { width = 1280, height = 860, scheme = 'l
     });
     tab.on('pageerror', (error) => faults.push(`error: ${error.message ?? error}`));
     tab.on('dialog', (dialog) => {
-        if (dialog.type() !== 'beforeunload') faults.push(`dialog: ${dialog.message()}`);
+        const answer = dialog.type() === 'confirm' ? own.answers.shift() : undefined;
+        if (answer === false) return void dialog.dismiss();
+        if (dialog.type() !== 'beforeunload' && answer === undefined) faults.push(`dialog: ${dialog.message()}`);
         void dialog.accept();
     });
     tab.on('console', (message) => {

@@ -43,13 +43,16 @@ export function socketHost(socketPath) {
     };
 }
 
+/// An answer that is made, and of which another one comes.
+const lostAnswer = (response) => ({ writeHead: () => undefined, end: () => sendJson(response, 502, { error: 'the answer was lost' }) });
+
 /// Starts the server on a free port. `host(request, response, url)` answers below /v1/, `depot` takes
-/// what is pushed. Returns the link to open, and how to end it.
+/// what is pushed. `state.hold(request, url)` may keep a request waiting; with `isDeaf` the answers to what changes something are lost. Returns the link to open, and how to end it.
 export async function startFront({ page, host, depot, command = ['zavctl'] }) {
     const token = randomBytes(16).toString('hex');
     const cookie = randomBytes(16).toString('hex');
     let isUsed = false;
-    const state = { isAway: false, requests: [] };
+    const state = { isAway: false, requests: [], hold: undefined, isDeaf: false };
 
     const serveFile = async (response, name) => {
         const bytes = await readFile(path.join(page, name));
@@ -75,8 +78,10 @@ export async function startFront({ page, host, depot, command = ['zavctl'] }) {
         if (url.pathname === '/console/session') {
             return sendJson(response, 200, { mode: 'host', address: '/run/zavhost.sock', program: 'zavctl-console', version: '1.0.0', command });
         }
+        if (isApi) await state.hold?.(request, url);
         if (url.pathname === '/console/depot' && request.method === 'PUT') return depot(request, response, url);
         if (isApi && state.isAway) return sendJson(response, 502, { error: 'the host is away' });
+        if (isApi && state.isDeaf && !isSafe) return host(request, lostAnswer(response), url);
         if (isApi) return host(request, response, url);
         const name = url.pathname.slice(1);
         return serveFile(response, types[path.extname(name)] ? name : 'index.html');

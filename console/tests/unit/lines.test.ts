@@ -1,6 +1,6 @@
 import assert from 'node:assert/strict';
 import { test } from 'node:test';
-import { cancelLine, pushLine, removeLine, taskLine, titleOf } from '../../src/words/lines';
+import { cancelLine, pushLine, removeLine, sumLine, taskLine, titleOf } from '../../src/words/lines';
 
 const line = (request: object): string | undefined => taskLine(['zavctl'], { command: '', product: 'ux', ...request });
 
@@ -14,6 +14,9 @@ test('a value that begins with a dash is no option', () => {
     assert.equal(line({ command: 'STOP', targetmsn: '-x' }), 'zavctl stop --target=-x ux');
     assert.equal(removeLine(['zavctl'], '-r', false), 'zavctl depot rm -- -r');
     assert.equal(pushLine(['zavctl'], '-a', 'ux/-a'), 'zavctl push -- -a ux/-a');
+    assert.equal(pushLine(['zavctl'], 'a', '-ux/a'), 'zavctl push -- a -ux/a');
+    assert.equal(sumLine(['zavctl'], ['a', '-r']), 'zavctl depot sum -- a -r');
+    assert.equal(sumLine(['zavctl'], ['a', 'b']), 'zavctl depot sum a b');
 });
 
 test('the command of an install is one word behind the dashes', () => {

@@ -3,7 +3,7 @@ import { execFileSync } from 'node:child_process';
 import { test } from 'node:test';
 import { shellLine, shellQuoted, withInput } from '../../src/words/shell';
 
-const through = (line: string): string => execFileSync('/bin/sh', ['-c', line], { encoding: 'utf8' });
+const through = (line: string): string => execFileSync('bash', ['-c', line], { encoding: 'utf8' });
 
 test('plain words stay as they are, as in zavctl', () => {
     assert.equal(shellQuoted('db1:myhost:UX'), 'db1:myhost:UX');
@@ -21,6 +21,14 @@ test('a shell takes each word for one, whatever is in it', () => {
     const words = ['$(reboot)', '`id`', "a'b", '"', '\\', '~', '*', ' ', 'é', 'two\nlines', '!', '#', '{a,b}', '-n', '\t'];
     const output = through(shellLine(['printf', '%s\\0', ...words]));
     assert.deepEqual(output.split('\0').slice(0, -1), words);
+});
+
+test('what a terminal would obey is spelled out, and arrives as it was', () => {
+    const words = ['v\x1b[201~\nx', "\u202e'gpj\\.exe", 'a\rb', '\x7f\x9b1m', '\ufeffé', "\t'", '\u200bff'];
+    const line = shellLine(['printf', '%s\\0', ...words]);
+    assert.doesNotMatch(line, /[\u0000-\u001f\u007f-\u009f\u200b-\u200f\u2028-\u202e\u2060-\u2069\ufeff]/);
+    assert.deepEqual(through(line).split('\0').slice(0, -1), words);
+    assert.deepEqual(execFileSync('bash', ['-c', line], { encoding: 'utf8', env: { LC_ALL: 'C' } }).split('\0').slice(0, -1), words);
 });
 
 test('an input arrives whole, also one that holds the mark of its end', () => {
