@@ -25,7 +25,8 @@ export type FeedStatus =
     | { kind: 'connecting' }
     | { kind: 'live' }
     | { kind: 'paused' }
-    | { kind: 'broken'; problem: Problem; since: Date };
+    /// `isGivenUp`: it is not tried again by itself.
+    | { kind: 'broken'; problem: Problem; since: Date; isGivenUp: boolean };
 
 export const mostItems = 10_000;
 /// So many events from before the page was opened are shown.
@@ -34,6 +35,10 @@ const eventsBefore = 500;
 const flushEvery = 100;
 /// A page that is hidden for so long gives its connection up.
 const hiddenFor = 60_000;
+
+/// After so many failures in a row in which nobody answered at all, about a minute and a half, the
+/// console has ended: another one has another session.
+const mostSilences = 12;
 
 const path = '/v1/events?table=KAGDYST&tasks=1';
 
@@ -55,6 +60,7 @@ export function onFeed(listener: BatchListener): () => void {
 let stream: EventStream | undefined;
 let position = '';
 let keys = 0;
+let silences = 0;
 let pending: FeedItem[] = [];
 let flushing: ReturnType<typeof setTimeout> | undefined;
 
@@ -95,7 +101,10 @@ function take(event: ServerEvent): void {
 
 function broken(problem: Problem): void {
     const old = feedStatus.get();
-    feedStatus.set({ kind: 'broken', problem, since: old.kind === 'broken' ? old.since : new Date() });
+    silences = problem.status === 0 ? silences + 1 : 0;
+    const isGivenUp = problem.status === 401 || silences >= mostSilences;
+    if (isGivenUp) stream?.close();
+    feedStatus.set({ kind: 'broken', problem, since: old.kind === 'broken' ? old.since : new Date(), isGivenUp });
 }
 
 function open(): void {
@@ -106,6 +115,7 @@ function open(): void {
             onEvent: take,
             onOpen: (where) => {
                 position = where;
+                silences = 0;
                 feedStatus.set({ kind: 'live' });
             },
             onBreak: broken,
@@ -138,7 +148,9 @@ async function begin(): Promise<void> {
 
 /// Opens the connection again at once, when it is broken.
 export function retryFeed(): void {
-    if (feedStatus.get().kind === 'broken') open();
+    if (feedStatus.get().kind !== 'broken') return;
+    silences = 0;
+    open();
 }
 
 export function startFeed(): void {

@@ -15,6 +15,8 @@ export interface StreamWatch {
 /// The host sends a comment at least every 15 seconds. After this long without a byte the connection
 /// is dead, although nobody has closed it.
 const longestSilence = 40_000;
+/// A stream that ends sooner, and without an event, is no better than one that could not be opened.
+const shortestLife = 5_000;
 const shortestPause = 500;
 const longestPause = 10_000;
 
@@ -62,6 +64,11 @@ export class EventStream {
         this.wake();
     };
 
+    /// The stream is of use: the next break is the first one.
+    private readonly prove = (): void => {
+        this.failures = 0;
+    };
+
     private async run(): Promise<void> {
         while (!this.stopped) {
             const problem = await this.once();
@@ -83,6 +90,7 @@ export class EventStream {
     private async once(): Promise<Problem> {
         this.connection = new AbortController();
         let silence: ReturnType<typeof setTimeout> | undefined;
+        let proving: ReturnType<typeof setTimeout> | undefined;
         const listen = () => {
             clearTimeout(silence);
             silence = setTimeout(() => this.connection.abort(), longestSilence);
@@ -95,20 +103,22 @@ export class EventStream {
             });
             if (!answer.ok || !answer.body) return problemOf(answer.status, await answer.text());
             this.position = answer.headers.get('Last-Event-ID') ?? this.position;
-            this.failures = 0;
             this.watch.onOpen?.(this.position);
+            proving = setTimeout(this.prove, shortestLife);
             await this.read(answer.body, listen);
             return new Problem('the host has ended the stream', 0);
         } catch (error) {
             return asProblem(error);
         } finally {
             clearTimeout(silence);
+            clearTimeout(proving);
         }
     }
 
     private async read(body: ReadableStream<Uint8Array>, listen: () => void): Promise<void> {
         const parser = new EventParser((event) => {
             if (this.stopped) return;
+            this.prove();
             this.position = event.id;
             this.watch.onEvent(event);
         }, this.position);

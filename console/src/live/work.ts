@@ -1,18 +1,25 @@
 /// What waits and what runs. The interface has no stream that tells of a task's acceptance and
 /// beginning, so this, and only this, is asked for again and again, while somebody looks.
+import { type Problem, asProblem } from '../api/problem';
 import { askTasks, isOver } from '../api/tasks';
 import type { Task, TaskSummary } from '../api/types';
 import { Store } from '../state/store';
-import { onFeed } from './feed';
+import { feedStatus, onFeed } from './feed';
 
 const askEvery = 4_000;
 /// After something has ended the next task begins at once; a burst of ends is one question.
 const askAfterEnd = 250;
 const most = 1000;
+/// After so many failures in a row nobody is asked any more: the console may have ended.
+const mostFailures = 5;
 
 /// Running first, then the queue in its order; undefined until the host has said it.
 export const work = new Store<readonly TaskSummary[] | undefined>(undefined);
 
+/// Why it is no longer asked for; undefined: it is.
+export const workProblem = new Store<Problem | undefined>(undefined);
+
+let failures = 0;
 let timer: ReturnType<typeof setTimeout> | undefined;
 let isAsking = false;
 
@@ -26,7 +33,7 @@ const sameWork = (a: readonly TaskSummary[] | undefined, b: readonly TaskSummary
     a.every((task, i) => task.id === b[i]?.id && task.state === b[i]?.state && task.cancelling === b[i]?.cancelling);
 
 async function look(): Promise<void> {
-    if (document.visibilityState === 'hidden') return;
+    if (document.visibilityState === 'hidden' || workProblem.get()) return;
     if (isAsking) return schedule(askAfterEnd);
     isAsking = true;
     try {
@@ -38,12 +45,23 @@ async function look(): Promise<void> {
         const all = [...running.tasks, ...queued.tasks.filter((task) => !inHand.has(task.id)).reverse()];
         // What looks the same stays the same, so that nothing is drawn anew.
         if (!sameWork(work.get(), all)) work.set(all);
-    } catch {
+        failures = 0;
+    } catch (error) {
         // The feed tells of a host that is away. What was known is shown until it is back.
+        const problem = asProblem(error);
+        if (problem.status === 401 || ++failures >= mostFailures) workProblem.set(problem);
     } finally {
         isAsking = false;
         schedule(askEvery);
     }
+}
+
+/// Asks again after it has been given up.
+export function retryWork(): void {
+    if (!workProblem.get()) return;
+    failures = 0;
+    workProblem.set(undefined);
+    void look();
 }
 
 /// Something has been asked for or has ended.
@@ -59,6 +77,9 @@ export function noteWork(task: Task): void {
 
 export function startWork(): void {
     document.addEventListener('visibilitychange', () => void look());
+    feedStatus.subscribe(() => {
+        if (feedStatus.get().kind === 'live') retryWork();
+    });
     onFeed((items) => {
         if (items.some((item) => item.content.kind === 'task')) lookAtWork();
     });

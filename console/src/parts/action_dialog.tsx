@@ -8,6 +8,7 @@ import { act } from '../state/actions';
 import { commandPrefix } from '../state/host';
 import { notify } from '../state/notices';
 import { taskLine, titleOf } from '../words/lines';
+import { masked } from '../words/masked';
 import { CommandLine, ProblemBox } from './basics';
 import { Dialog } from './dialog';
 
@@ -55,7 +56,7 @@ export function ActionDialog(props: ActionDialogProps) {
             const found = asProblem(error);
             if (!found.isLost) names.forget(request);
             // The page may have been left meanwhile, and its window with it.
-            if (!isThere.current) notify({ tone: 'bad', text: `${title}: ${found.isLost ? 'nobody knows whether it was accepted' : 'not accepted'}`, detail: found.message, hint: found.hint });
+            if (!isThere.current) notify({ tone: 'bad', text: `${title}: ${found.isLost ? 'nobody knows whether it was accepted' : 'not accepted'}`, detail: masked(found.message), hint: found.hint });
             setProblem(found);
             setBusy(false);
         }

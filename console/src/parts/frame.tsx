@@ -2,8 +2,8 @@
 /// holds, notices, and the keyboard.
 import type { ComponentChildren } from 'preact';
 import { useEffect, useState } from 'preact/hooks';
-import { feedStatus, retryFeed } from '../live/feed';
-import { work } from '../live/work';
+import { type FeedStatus, feedStatus, retryFeed } from '../live/feed';
+import { retryWork, work, workProblem } from '../live/work';
 import { pages } from '../pages/table';
 import { Link } from '../route/link';
 import { usePlace } from '../route/route';
@@ -22,16 +22,31 @@ function Connection() {
     return <span class={`state ${tone}`} role="status">{words[status.kind]}</span>;
 }
 
+/// What stands behind the reason in the banner.
+function outlookOf(status: FeedStatus & { kind: 'broken' }): string {
+    const hint = status.problem.hint === '' ? '' : ` ${printable(status.problem.hint)}`;
+    if (status.isGivenUp) return `${hint} It is not tried again by itself.`;
+    return hint === '' ? ' It is tried again, and what was missed is caught up with.' : hint;
+}
+
 function BrokenBanner() {
     const status = useStore(feedStatus);
-    if (status.kind !== 'broken') return null;
+    const problem = useStore(workProblem);
+    if (status.kind !== 'broken' && !problem) return null;
+    const retry = () => {
+        retryFeed();
+        retryWork();
+    };
     return (
         <div class="banner" role="alert">
             <p>
-                The connection is broken since <Time value={status.since} />: {printable(status.problem.message)}. What you see may be old.
-                {status.problem.hint !== '' ? ` ${printable(status.problem.hint)}` : ' It is tried again, and what was missed is caught up with.'}
+                {status.kind === 'broken' && (
+                    <>The connection is broken since <Time value={status.since} />: {printable(status.problem.message)}. What you see may be old.{outlookOf(status)}</>
+                )}
+                {status.kind !== 'broken' && problem && `${printable(problem.message)}. `}
+                {problem && ' What waits and what runs is no longer asked for.'}
             </p>
-            <button type="button" onClick={retryFeed}>Try now</button>
+            <button type="button" onClick={retry}>Try now</button>
         </div>
     );
 }

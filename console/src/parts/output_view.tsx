@@ -1,32 +1,13 @@
 import { useEffect, useRef, useState } from 'preact/hooks';
 import type { Problem } from '../api/problem';
 import { followOutput } from '../live/output';
+import { type Piece, appended } from '../words/output';
 import { redactedLines } from '../words/printable';
 import { counted } from '../words/size';
 import { ProblemBox } from './basics';
 
-interface Piece {
-    stream: string;
-    text: string;
-}
-
 /// More than this is not kept in the page; its beginning goes first.
 const mostCharacters = 256 * 1024;
-
-function appended(pieces: readonly Piece[], piece: Piece): Piece[] {
-    const last = pieces.at(-1);
-    const all = last?.stream === piece.stream
-        ? [...pieces.slice(0, -1), { ...last, text: last.text + piece.text }]
-        : [...pieces, piece];
-    let extra = all.reduce((total, one) => total + one.text.length, 0) - mostCharacters;
-    while (extra > 0 && all[0]) {
-        const gone = Math.min(extra, all[0].text.length);
-        extra -= gone;
-        if (gone === all[0].text.length) all.shift();
-        else all[0] = { ...all[0], text: all[0].text.slice(gone) };
-    }
-    return all;
-}
 
 /// What a running task's commands write, as they write it.
 export function OutputView({ task }: { task: string }) {
@@ -39,7 +20,7 @@ export function OutputView({ task }: { task: string }) {
         setPieces([]);
         setLost(0);
         return followOutput(task, {
-            onPiece: (piece) => setPieces((old) => appended(old, piece)),
+            onPiece: (piece) => setPieces((old) => appended(old, piece, mostCharacters)),
             onLost: (bytes) => setLost((old) => old + bytes),
             onEnd: () => undefined,
             onRefusal: setProblem,

@@ -1,7 +1,7 @@
 // What happens while one looks: streams that break, long lists, many events, the keyboard.
 import assert from 'node:assert/strict';
 import { after, before, test } from 'node:test';
-import { untilText } from '../support/browser.mjs';
+import { press, untilText } from '../support/browser.mjs';
 import { raise } from '../support/stage.mjs';
 
 let stage;
@@ -32,6 +32,25 @@ test('a broken connection says so, and what was missed is caught up with', async
         const texts = await tab.$$eval('.list-row', (rows) => rows.map((row) => row.innerText));
         for (const name of ['burst-40', 'burst-41', 'burst-42']) assert.equal(texts.filter((text) => text.includes(`${name}`)).length, 1, name);
         assert.equal(await tab.$('.banner'), null);
+    });
+});
+
+test('a page whose session is over asks no more until somebody wants it to', async () => {
+    await on('/agents', {}, async (view) => {
+        const { tab, front } = view;
+        view.own.isDisturbed = true;
+        front.state.isOver = true;
+        front.cut();
+        await untilText(tab, 'What waits and what runs is no longer asked for.', '.banner');
+        await untilText(tab, 'It is not tried again by itself.', '.banner');
+        front.state.requests.length = 0;
+        await new Promise((done) => setTimeout(done, 6_000));
+        assert.deepEqual(front.state.requests, []);
+        front.state.isOver = false;
+        await press(tab, 'Try now');
+        await untilText(tab, 'live', '.top');
+        await tab.waitForFunction(() => !document.querySelector('.banner'));
+        assert.ok(front.state.requests.some((request) => /^GET \/v1\/tasks\?state=running/.test(request)));
     });
 });
 

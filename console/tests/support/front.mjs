@@ -52,7 +52,7 @@ export async function startFront({ page, host, depot, command = ['zavctl'] }) {
     const token = randomBytes(16).toString('hex');
     const cookie = randomBytes(16).toString('hex');
     let isUsed = false;
-    const state = { isAway: false, requests: [], hold: undefined, isDeaf: false };
+    const state = { isAway: false, requests: [], hold: undefined, isDeaf: false, isOver: false };
 
     const serveFile = async (response, name) => {
         const bytes = await readFile(path.join(page, name));
@@ -78,6 +78,7 @@ export async function startFront({ page, host, depot, command = ['zavctl'] }) {
         if (url.pathname === '/console/session') {
             return sendJson(response, 200, { mode: 'host', address: '/run/zavhost.sock', program: 'zavctl-console', version: '1.0.0', command });
         }
+        if (isApi && state.isOver) return sendJson(response, 401, { error: 'no session' });
         if (isApi) await state.hold?.(request, url);
         if (url.pathname === '/console/depot' && request.method === 'PUT') return depot(request, response, url);
         if (isApi && state.isAway) return sendJson(response, 502, { error: 'the host is away' });
