@@ -66,18 +66,20 @@ ctl::ExitStatus serve(const ctl::Invocation& invocation) {
     std::_Exit(ctl::kSuccess);
 }
 
-constexpr ctl::Argument kServeArguments[] = {ctl::kConsolePort, ctl::kBrowserUser};
-/// The verb of zavctl, whose help it is that people see.
-constexpr ctl::Verb kServeVerb = {
-    "console",       "Serve a page for a browser on this machine, and print the link to it",
-    kServeArguments, {"zavctl console", "zavctl console --port 8080"},
-    serve,
-};
+/// The verb of zavctl, whose help it is that people see; here it does what it says.
+const ctl::Verb& serveVerb() {
+    static const ctl::Verb verb = [] {
+        ctl::Verb made = ctl::kConsoleVerb;
+        made.run = serve;
+        return made;
+    }();
+    return verb;
+}
 
 const ctl::Vocabulary& consoleVocabulary() {
     static const ctl::Vocabulary vocabulary{"Serves the console of one host",
                                             ctl::kGlobalArguments,
-                                            {&kServeVerb, &ctl::kVersionVerb},
+                                            {&serveVerb(), &ctl::kVersionVerb},
                                             {}};
     return vocabulary;
 }
