@@ -12,15 +12,7 @@ let stage;
 before(async () => (stage = await raise()));
 after(() => stage.strike());
 
-/// Opens a console, does something with it, and sees that nothing went wrong meanwhile.
-async function on(address, options, act) {
-    const view = await stage.open(options);
-    await view.go(address);
-    await untilText(view.tab, 'live', '.top');
-    await act(view);
-    assert.deepEqual(view.faults, []);
-    await view.end();
-}
+const on = (...given) => stage.on(...given);
 
 const fill = async (tab, selector, text) => {
     const field = await tab.waitForSelector(selector);

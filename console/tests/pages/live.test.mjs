@@ -8,14 +8,7 @@ let stage;
 before(async () => (stage = await raise()));
 after(() => stage.strike());
 
-async function on(address, options, act) {
-    const view = await stage.open(options);
-    await view.go(address);
-    await untilText(view.tab, 'live', '.top');
-    await act(view);
-    assert.deepEqual(view.faults, []);
-    await view.end();
-}
+const on = (...given) => stage.on(...given);
 
 test('a broken connection says so, and what was missed is caught up with', async () => {
     await on('/events', {}, async (view) => {

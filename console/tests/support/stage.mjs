@@ -1,8 +1,9 @@
 // A browser, a made-up host and the console between them, for one file of tests.
+import assert from 'node:assert/strict';
 import { mkdir } from 'node:fs/promises';
 import path from 'node:path';
 import { fileURLToPath } from 'node:url';
-import { launch, openTab } from './browser.mjs';
+import { launch, openTab, untilText } from './browser.mjs';
 import { makeFakeHost } from './fake_host.mjs';
 import { startFront } from './front.mjs';
 
@@ -26,9 +27,18 @@ export async function raise() {
         const go = (address) => opened.tab.goto(front.origin + address, { waitUntil: 'domcontentloaded' });
         return { ...opened, fake, front, go, end: () => context.close() };
     };
+    /// Opens a console at an address, does something with it, and sees that nothing went wrong meanwhile.
+    const on = async (address, options, act) => {
+        const view = await open(options);
+        await view.go(address);
+        await untilText(view.tab, 'live', '.top');
+        await act(view);
+        assert.deepEqual(view.faults, []);
+        await view.end();
+    };
     const strike = async () => {
         await browser.close();
         for (const front of fronts) await front.close();
     };
-    return { open, strike };
+    return { open, on, strike };
 }
