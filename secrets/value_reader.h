@@ -125,7 +125,7 @@ private:
     }
 
     /// What else separates the value from its name is shown. The value ends at a blank outside
-    /// quotation marks, or with its line.
+    /// quotation marks that no backslash makes part of it, or with its line.
     void skipValue() {
         const std::size_t separators = at_;
         while (!state_.begun && at_ < text_.size() && isSeparator(text_[at_]))
@@ -143,7 +143,8 @@ private:
 
     bool goesOn(char c) {
         if (c == '\n' || c == '\r') return false;
-        if (state_.quote == '\0' && isBlank(c)) return false;
+        const bool isEscaped = state_.escapes % 2 == 1;
+        if (state_.quote == '\0' && isBlank(c) && !isEscaped) return false;
         if (state_.quote == c && closes()) {
             state_.quote = '\0';
         } else if (state_.quote == '\0' && isQuote(c)) {

@@ -120,6 +120,10 @@ std::int64_t Database::lastInserted() const {
     return sqlite3_last_insert_rowid(connection_.get());
 }
 
+std::int64_t Database::totalChanges() const {
+    return sqlite3_total_changes(connection_.get());
+}
+
 bool Database::inTransaction() const {
     return sqlite3_get_autocommit(connection_.get()) == 0;
 }

@@ -98,6 +98,8 @@ public:
     }
     /// The number of the row that was inserted last.
     std::int64_t lastInserted() const;
+    /// Rows that were changed on this connection since it was opened.
+    std::int64_t totalChanges() const;
     /// Whether a transaction is open; a failure may have ended it.
     bool inTransaction() const;
 

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <charconv>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -101,6 +102,25 @@ void TraceArgument::format(const std::string& conversion, std::string& out) cons
     }
 }
 
+bool TraceArgument::formatPlain(char letter, std::string& out) const {
+    if (letter == 'd' && kind_ == Kind::Signed) {
+        char digits[24];
+        const auto [end, error] = std::to_chars(digits, digits + sizeof digits, number_);
+        out.append(digits, end);
+        return true;
+    }
+    if (letter == 's' && kind_ == Kind::Wide) {
+        out += localText(*static_cast<const String*>(pointer_));
+        return true;
+    }
+    if (letter == 's' && kind_ == Kind::Text) {
+        const char* const text = static_cast<const char*>(pointer_);
+        out += text != nullptr ? text : "(null)";
+        return true;
+    }
+    return false;
+}
+
 std::string formatTrace(const char* format, std::initializer_list<TraceArgument> arguments) {
     std::string out;
     const TraceArgument* next = arguments.begin();
@@ -109,6 +129,11 @@ std::string formatTrace(const char* format, std::initializer_list<TraceArgument>
             const std::size_t run = std::strcspn(at, "%");
             out.append(at, run);
             at += run;
+            continue;
+        }
+        if (next != arguments.end() && next->formatPlain(at[1], out)) {
+            ++next;
+            at += 2;
             continue;
         }
         const char* end = nullptr;

@@ -47,6 +47,10 @@ public:
     /// is read up to its terminating 0 or the conversion's precision, whichever comes first.
     void format(const std::string& conversion, std::string& out) const;
 
+    /// The same for a "%" that is followed by just this letter, where that is a matter of appending
+    /// a text or a number, as in most lines. False, and nothing appended, if it is not.
+    bool formatPlain(char letter, std::string& out) const;
+
 private:
     enum class Kind { Signed, Unsigned, Text, Wide, Pointer };
     void formatText(const std::string& conversion, std::string& out) const;

@@ -24,7 +24,7 @@ RAS1_UNIT traceUnit{"zavrpc"};
 
 constexpr mode_t kFileMode = 0770;
 constexpr mode_t kTemporaryMode = 0666;
-constexpr std::size_t kPieceSize = 64 * 1024;
+constexpr std::size_t kPieceSize = std::size_t{64} * 1024;
 constexpr int kFirstOwnDescriptor = 3;
 
 /// The file that is converted, by the way in which it is found.

@@ -47,14 +47,15 @@ bool endsInName(std::string text) {
     return false;
 }
 
-/// Where the value ends that begins there: at a blank outside quotation marks, or with its line.
+/// Where the value ends that begins there: with its line, or at a blank outside quotation marks that
+/// no backslash makes part of it.
 std::size_t endOfValue(const std::string& text, std::size_t at) {
     const std::size_t begin = at;
     char open = '\0';
     std::size_t opened = 0;  // the backslashes before the mark that is open
     for (; at < text.size() && !isIn(text[at], "\r\n"); ++at) {
-        if (open == '\0' && isIn(text[at], " \t")) break;
         const std::size_t escapes = countAtEnd(text.substr(begin, at - begin), '\\');
+        if (open == '\0' && isIn(text[at], " \t") && escapes % 2 == 0) break;
         if (open == text[at]) {
             const bool isPairs = escapes > opened && (escapes - opened) % (2 * opened + 2) == 0;
             if (escapes <= opened || isPairs) open = '\0';

@@ -220,7 +220,7 @@ void compare(State& state) {
     require((state.text == stringOf(other)) == (expected == 0), "equal texts are equal");
 }
 
-/// The number that the ASCII text is as a whole; nothing when it is none or too large.
+/// The number that the ASCII text is as a whole; nothing when it is not one or too large.
 std::optional<int> numberIn(const std::string& text) {
     std::size_t at = std::min(text.find_first_not_of(" \t\n\v\f\r"), text.size());
     if (text.empty()) return 0;

@@ -39,6 +39,8 @@ const Row kRows[] = {
     {R"(password="a\\" c)", "password=*** c"},
     {R"(password="a\\\" b" c)", "password=*** c"},
     {R"(password='a\' b' c)", "password=*** c"},
+    {R"(password=a\ b c)", "password=*** c"},
+    {R"(password=a\\ b c)", "password=*** b c"},
 };
 
 TEST(Masked, KnowsEverySeparatorAndBackslash) {

@@ -15,7 +15,7 @@ constexpr char32_t kMalformed = 0xFFFFFFFF;
 /// One character of UTF-8, or as many bytes as a malformed one has that could have begun a
 /// character.
 struct Decoded {
-    char32_t character;  // kMalformed if it is none
+    char32_t character;  // kMalformed if it is not one
     unsigned bytes;
 };
 
