@@ -19,16 +19,17 @@
 #include "embedded/oxa_host.h"
 #include "embedded/ras1_control.h"
 #include "host/api/api.h"
+#include "host/api/pulse.h"
 #include "host/api/routes.h"
 #include "host/api/services.h"
 #include "host/api/tasks/interruption.h"
 #include "host/checks/check_list.h"
-#include "host/commands/plugin_threads.h"
 #include "host/commands/recorder.h"
 #include "host/depot/depot_directory.h"
 #include "host/home/parameter_copy.h"
 #include "host/home/temporary_directory.h"
 #include "host/peers/peer_of.h"
+#include "host/process/children/last_processes.h"
 #include "host/process/children/orphans.h"
 #include "host/process/configuration/options.h"
 #include "host/process/configuration/task_timeout.h"
@@ -45,7 +46,7 @@
 #include "host/service/status_reporter.h"
 #include "host/service/task_log.h"
 #include "host/service/task_status.h"
-#include "host/service/watchdog.h"
+#include "host/service/trace_log.h"
 #include "http/server.h"
 
 namespace host {
@@ -186,6 +187,19 @@ Journal::Settings journalOf(const HostOptions& options) {
             options.keepDays, options.keepRows, !options.guarded && !options.ownState};
 }
 
+/// Agents live on when their host ends, but not when it is process 1: then they end with it, and
+/// may at least end in good order. Their pid files stay, so they are started again with the next
+/// container.
+void endContainer(Journal& journal) {
+    if (::getpid() == 1) journal.close();  // the commands of a task in hand are cut off, not failed
+    // Agents have five seconds to end when they are stopped, unless they ask for more.
+    constexpr std::chrono::seconds kPatience{10};
+    const std::size_t left = endLastProcesses(kPatience);
+    if (left == 0) return;
+    say(Priority::Warning, std::to_string(left) + " processes have not ended within " +
+                               std::to_string(kPatience.count()) + " s and are killed");
+}
+
 SocketFile openSocket(const std::string& path, Connects connects,
                       std::optional<PassedSocket> passed) {
     if (passed) return SocketFile(path, connects, std::move(passed->descriptor));
@@ -204,16 +218,14 @@ void feedWatchdog(http::HttpServer& server, const Notifier& notifier, const Jour
                   const ServiceEnvironment& service) {
     if (!service.watchdog || !notifier.isWanted()) return;
     server.every(feedingTime(*service.watchdog), [&notifier, &journal] {
-        const Pulse pulse{PluginThreads::ofProcess().deadline(), journal.commitBegan()};
-        if (isAlive(pulse, std::chrono::steady_clock::now())) notifier.tell("WATCHDOG=1\n");
+        const bool isAlive = hangsOf(pulseOf(journal), std::chrono::steady_clock::now()).empty();
+        if (isAlive) notifier.tell("WATCHDOG=1\n");
     });
 }
 
 std::string statusOf(Journal& journal) {
-    TaskFilter running;
-    running.state = TaskState::Running;
     const std::int64_t queued = journal.notBegun();
-    return taskStatus(queued, journal.newest(running));
+    return taskStatus(queued, journal.running());
 }
 
 /// False when the journal cannot be read now: what is new is told at the next look.
@@ -257,6 +269,9 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     refuseHomeOnPort(options, depot);
     provideDepotDirectory(depot);
     limitOutput(static_cast<std::uint64_t>(options.maxOutput));
+    if (wantsTraceFile(options.logFormat, environmentVariable)) {
+        traceToFile(options.state, environmentVariable);
+    }
     std::vector<oxa::Table> tables = startPlugin(options);
     if (options.guarded) requireDepotDirectory(depot);
     Services services(std::move(tables), CodePage::ofProcess(), options.home, {}, options.guarded,
@@ -292,7 +307,7 @@ void run(const HostOptions& options, ServiceEnvironment service) {
         logging.changed();
         reporter.changed();
     };
-    services.journal.whenCommitted(look);
+    services.journal.whenChanged(look);
     // Something may have been committed since their first looks.
     look();
     server.run();
@@ -303,6 +318,7 @@ void run(const HostOptions& options, ServiceEnvironment service) {
     transfers.stop();
     transferSocket.remove();
     socket.remove();
+    endContainer(services.journal);
     // The plug-in's executor never ends and uses its globals to the last, so destroy nothing.
     ::_exit(0);
 }

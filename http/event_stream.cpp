@@ -86,7 +86,7 @@ void EventStream::awaitHeartbeat() {
 }
 
 void EventStream::writeHead() {
-    writing_ = true;
+    limitWrite();
     head_.result(wire::status::ok);
     head_.version(11);
     head_.set(wire::field::cache_control, "no-cache");
@@ -103,11 +103,16 @@ void EventStream::writeHead() {
 }
 
 void EventStream::write(std::string text) {
-    writing_ = true;
+    limitWrite();
     out_ = std::move(text);
     net::async_write(
         stream_, net::buffer(out_),
         [self = shared_from_this()](Error error, std::size_t) { self->onWritten(error); });
+}
+
+void EventStream::limitWrite() {
+    writing_ = true;
+    if (core_.limits.streamTime.count() > 0) stream_.expires_after(core_.limits.streamTime);
 }
 
 void EventStream::pump() {
@@ -119,6 +124,7 @@ void EventStream::pump() {
 
 void EventStream::onWritten(Error error) {
     writing_ = false;
+    stream_.expires_never();
     std::string().swap(out_);  // a large batch does not stay allocated
     if (error) return close();
     pump();

@@ -12,7 +12,8 @@
 namespace http {
 
 /// Sends what its source has, in order, and a heartbeat when there has been nothing for a while. It
-/// ends when the client closes its connection or the host ends; there is no other time-out.
+/// ends when the client closes its connection, does not take a piece within
+/// ServerLimits::streamTime, or the server ends; there is no other time-out.
 class EventStream final : public Connection, public std::enable_shared_from_this<EventStream> {
 public:
     EventStream(ServerCore& core, Stream stream, std::unique_ptr<EventSource> source,
@@ -35,6 +36,7 @@ private:
     void awaitHeartbeat();
     void writeHead();
     void write(std::string text);
+    void limitWrite();
     void pump();
     void onWritten(Error error);
     void close();

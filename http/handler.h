@@ -35,6 +35,9 @@ struct Later {
     /// makes the answer.
     std::chrono::milliseconds limit{0};
     std::function<Answer()> atLimit;
+    /// Called on the I/O thread when the client closes its side before the answer has come, so that
+    /// nobody waits for it any more; empty if that makes no difference. It may outlive the wait.
+    std::function<void()> onGone{};
 };
 
 /// Gets a body piece by piece while it is read, so that it may be larger than what memory shall

@@ -1,6 +1,7 @@
 /// One complete HTTP response, before it becomes bytes.
 #pragma once
 
+#include <memory>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -16,6 +17,8 @@ struct Reply {
     std::string body;                       ///< bytes as they are sent
     std::string type = "application/json";  ///< Content-Type; not sent with status 204 or 304
     Fields fields{};                        ///< further header fields
+    /// Something that lives until the reply has been sent, or cannot be; may be null.
+    std::shared_ptr<const void> held{};
 };
 
 /// A reply whose body is this JSON text and a line feed.

@@ -21,6 +21,8 @@ struct ServerLimits {
     std::chrono::milliseconds answerTime{30'000};  ///< for the client to take an answer
     std::chrono::milliseconds lingerTime{2'000};   ///< for the client to read the last answer
     std::chrono::milliseconds heartbeat{15'000};   ///< between signs of life on an idle stream
+    /// For the client to take a piece of a stream; 0: as long as it likes.
+    std::chrono::milliseconds streamTime{0};
 };
 
 }  // namespace http

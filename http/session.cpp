@@ -1,11 +1,14 @@
 #include "http/session.h"
 
+#include <sys/socket.h>
+
 #include <boost/asio/buffer.hpp>
 #include <boost/asio/write.hpp>
 #include <boost/beast/core/bind_handler.hpp>
 #include <boost/beast/core/string.hpp>
 #include <boost/beast/http/read.hpp>
 #include <boost/beast/http/write.hpp>
+#include <cerrno>
 #include <exception>
 #include <limits>
 #include <optional>
@@ -26,9 +29,9 @@ namespace wire = beast::http;
 constexpr unsigned kNoContent = 204;
 constexpr unsigned kNotModified = 304;
 constexpr std::size_t kReadBytes = 4096;
-constexpr std::size_t kBufferBytes = 64 * 1024;
+constexpr std::size_t kBufferBytes = std::size_t{64} * 1024;
 /// A client that keeps sending after the last answer is cut off after this many bytes.
-constexpr std::size_t kDrainBytes = 4 * 1024 * 1024;
+constexpr std::size_t kDrainBytes = std::size_t{4} * 1024 * 1024;
 
 std::string_view view(beast::string_view text) {
     return {text.data(), text.size()};
@@ -340,7 +343,29 @@ void HttpSession::answer(Later later) {
         const auto self = weak.lock();
         if (!error && self && self->exchange_ == exchange && self->atLimit_) self->endWait();
     });
+    if (later.onGone) watchClient(std::move(later.onGone));
     later.begin(Responder(core_.mailbox, weak_from_this(), exchange_));
+}
+
+void HttpSession::watchClient(std::function<void()> onGone) {
+    stream_.socket().async_wait(
+        net::socket_base::wait_read,
+        [weak = weak_from_this(), exchange = exchange_, onGone = std::move(onGone)](Error error) {
+            const auto self = weak.lock();
+            const bool waits = !error && self && self->atLimit_ && self->exchange_ == exchange;
+            if (!waits || !self->hasClientGone()) return;
+            onGone();
+            self->close();
+        });
+}
+
+/// Whether the connection is at its end, and not at the beginning of the next request.
+bool HttpSession::hasClientGone() {
+    if (buffer_.size() > 0) return false;
+    char next = 0;
+    const ssize_t length =
+        ::recv(stream_.socket().native_handle(), &next, sizeof next, MSG_PEEK | MSG_DONTWAIT);
+    return length == 0 || (length < 0 && errno != EAGAIN && errno != EINTR);
 }
 
 void HttpSession::endWait() {
@@ -365,6 +390,7 @@ void HttpSession::respond(Reply reply) {
         if (!isHead_ || !reply.body.empty()) response_->content_length(reply.body.size());
     }
     if (!isHead_) response_->body() = std::move(reply.body);
+    held_ = std::move(reply.held);
     stream_.expires_after(core_.limits.answerTime);
     wire::async_write(stream_, *response_, [self = shared_from_this()](Error error, std::size_t) {
         self->onWritten(error);
@@ -373,6 +399,7 @@ void HttpSession::respond(Reply reply) {
 
 void HttpSession::onWritten(Error error) {
     response_.reset();
+    held_.reset();
     if (error) return close();
     if (keepAlive_) return awaitRequest();
     // Closing a socket with unread bytes resets the connection, and the client might lose the

@@ -5,6 +5,7 @@
 #include <boost/beast/http/parser.hpp>
 #include <boost/beast/http/string_body.hpp>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -60,6 +61,8 @@ private:
     void answer(std::unique_ptr<EventSource> source);
     void answer(Later later);
     void endWait();
+    void watchClient(std::function<void()> onGone);
+    bool hasClientGone();
 
     void respond(Reply reply);
     void onWritten(Error error);
@@ -72,6 +75,7 @@ private:
     boost::beast::flat_buffer buffer_;
     std::optional<boost::beast::http::request_parser<boost::beast::http::string_body>> parser_;
     std::optional<boost::beast::http::response<boost::beast::http::string_body>> response_;
+    std::shared_ptr<const void> held_;   ///< see Reply
     std::string head_;                   ///< the bytes of the request's head so far
     std::optional<Request> request_;     ///< once its head is there
     std::shared_ptr<PieceBody> pieces_;  ///< of a body that is handed over piece by piece

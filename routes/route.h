@@ -14,8 +14,8 @@ namespace routes {
 class Call;
 class Components;
 
-/// The shape of a document, for the interface's description; see api/description/schema.h. What it
-/// refers to it adds to the components.
+/// The shape of a document, for the interface's description; see routes/description/schema.h. What
+/// it refers to it adds to the components.
 using Schema = nlohmann::ordered_json(Components& components);
 
 /// Where an endpoint runs.
@@ -63,8 +63,9 @@ struct StreamEvent {
 struct RouteAnswer {
     unsigned status;
     const char* doc;   ///< begins with a small letter, no full stop
-    Schema* document;  ///< null: the answer is a stream of events, or else plain text
+    Schema* document;  ///< null: the answer is a stream of events, or else what `media` says
     std::vector<StreamEvent> events{};
+    const char* media = "text/plain";
 };
 
 /// Whether a query may have parameters beyond those that the route names.

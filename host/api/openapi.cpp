@@ -3,7 +3,6 @@
 #include "host/api/openapi.h"
 
 #include "host/api/routes.h"
-#include "host/api/schema.h"
 #include "host/api/statuses.h"
 #include "host/process/version.h"
 #include "routes/description/description.h"
@@ -20,7 +19,6 @@ constexpr const char* kOverview =
 }  // namespace
 
 Endpoint getOpenapi;
-Schema descriptionSchema;
 
 std::string describe(const std::vector<Route>& routes) {
     const routes::Interface host{"zavhost",
@@ -38,17 +36,6 @@ std::string describe(const std::vector<Route>& routes) {
 http::Answer getOpenapi(Services&, const Call&) {
     static const std::string document = describe(routes());
     return http::Reply{200, document};
-}
-
-nlohmann::ordered_json descriptionSchema(Components&) {
-    const nlohmann::ordered_json object = {{"type", "object"}};
-    return shape::object(
-        "Description", "An OpenAPI document.",
-        {{"openapi", shape::text("the version of OpenAPI, 3.1.0")},
-         {"info", shape::about("what is described, and its version", object)},
-         {"servers", shape::listOf("where the host is", object)},
-         {"paths", shape::about("the requests by their paths", object)},
-         {"components", shape::about("what several requests have in common", object)}});
 }
 
 }  // namespace host

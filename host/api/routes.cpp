@@ -1,5 +1,7 @@
 #include "host/api/routes.h"
 
+#include "routes/description/description.h"
+
 namespace host {
 
 /// The endpoints. Each has a file of its own in this folder and a row below.
@@ -11,7 +13,7 @@ Endpoint getDepot, deleteDepot, getDepotSum, getDepotCheck;
 /// The documents, each described beside the code that makes it.
 Schema tablesSchema, conditionsSchema, queryAnswerSchema, rowSchema, gapSchema, overflowSchema;
 Schema timeSchema, taskStateSchema, taskSchema, taskListSchema, outputPieceSchema, outputEndSchema;
-Schema doctorSchema, instancesSchema, healthSchema, readySchema, whoamiSchema, descriptionSchema;
+Schema doctorSchema, instancesSchema, healthSchema, readySchema, whoamiSchema;
 Schema depotListingSchema, depotRemovalSchema, depotSumsSchema, depotCheckSchema;
 
 // clang-format off
@@ -132,7 +134,7 @@ std::vector<Route> routes() {
 
         {"GET", "/v1/openapi.json", "This interface, described for machines.",
          http::Access::Read, Runs::OnWorker, getOpenapi,
-         {{200, "the description", descriptionSchema}}},
+         {{200, "the description", routes::descriptionSchema}}},
 
         {"GET", "/v1/depot", "What the depot holds.",
          http::Access::Read, Runs::OnWorker, getDepot,

@@ -84,7 +84,7 @@ struct Services {
     OutcomeFeed outcomes{tables};
     TaskList tasks{tables, outcomes, journal, guarded};
     TaskWatch watch{tables, outcomes};
-    const Guards guards{{codePage, home, depotFiles.directory()}, tasks};  ///< asked if `guarded`
+    Guards guards{{codePage, home, depotFiles.directory()}, tasks};  ///< asked if `guarded`
     ParameterKeeper startUpParameters{home, outcomes, tasks};              ///< asked if `guarded`
     int maxQueued = 1000;  ///< tasks that may wait in the journal
     Leftovers leftovers{journal.identity(), journal.run(), journal.recovered().formerIdentity};

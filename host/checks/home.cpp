@@ -124,6 +124,16 @@ Finding checkRunAs(CheckSubject& subject) {
                 "correct the file, or remove it"};
     }
     if (!list.isThere) {
+        // The name of the machine has changed, or that of a container, which gets a new one.
+        const std::vector<std::string> foreign = foreignRunAsLists(subject.options.home);
+        if (!foreign.empty()) {
+            return {Verdict::Warning,
+                    list.path +
+                        " does not exist, so every agent runs as the host's user; there is " +
+                        listed(foreign),
+                    "rename the file if this host had another name before, or give the host that "
+                    "name again"};
+        }
         return {Verdict::Ok, list.path + " does not exist; every agent runs as the host's user",
                 ""};
     }

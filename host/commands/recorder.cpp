@@ -1,5 +1,6 @@
 #include "host/commands/recorder.h"
 
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -17,16 +18,15 @@
 #include "host/commands/trace_texts.h"
 #include "host/process/children/descendants.h"
 #include "host/process/children/orphans.h"
-#include "host/process/children/pipe_writers.h"
 
 namespace host {
 namespace {
 
 constexpr std::size_t kMostCommands = 64;
-constexpr std::size_t kLongestLine = 16 * 1024;
+constexpr std::size_t kLongestLine = std::size_t{16} * 1024;
 
 /// What an ended command left in its pipes may still be read.
-constexpr std::uint64_t kLeftInPipes = 256 * 1024;
+constexpr std::uint64_t kLeftInPipes = std::uint64_t{256} * 1024;
 constexpr std::uint64_t kUsualOutput = std::uint64_t{16} << 20;
 
 std::atomic<bool> endsDescendants{false};
@@ -65,6 +65,13 @@ std::int64_t nanoseconds() {
 WallClock::time_point wallTime(std::int64_t sinceEpoch) {
     return WallClock::time_point(
         std::chrono::duration_cast<WallClock::duration>(std::chrono::nanoseconds(sinceEpoch)));
+}
+
+/// The number of the pipe behind a descriptor; 0 if there is none. A child between fork and exec
+/// may call it.
+std::uint64_t pipeOf(int descriptor) {
+    struct stat file {};
+    return ::fstat(descriptor, &file) == 0 && S_ISFIFO(file.st_mode) ? file.st_ino : 0;
 }
 
 /// Not before: a line tells where the output of an install goes.
@@ -115,6 +122,11 @@ bool Recorder::hearInChild(const ras1::HeardLine& line, std::string_view text) {
             ending_.reached.store(true);
             ::kill(::getpid(), SIGKILL);
         }
+        return true;
+    }
+    if (begins(text, trace::kConnected)) {
+        notes_.out.store(pipeOf(STDOUT_FILENO));
+        notes_.err.store(pipeOf(STDERR_FILENO));
         return true;
     }
     if (begins(text, trace::kNotConnected)) {
@@ -169,11 +181,12 @@ void Recorder::hearProcess(const ras1::HeardLine& line, std::string_view text) {
 
 void Recorder::begin(std::string_view line) {
     if (endsDescendants.load()) orphansBefore_ = orphans();
-    pipesBefore_ = pipesToRead();
     // Before the plug-in's own clock starts: the wait below must not outlast the plug-in's.
     began_ = std::chrono::steady_clock::now();
     notes_.pid.store(0);
     notes_.started.store(0);
+    notes_.out.store(0);
+    notes_.err.store(0);
     notes_.notExecuted.store(0);
     notes_.notConnected.store(false);
     const embedded::MutexLock lock(lock_);
@@ -221,17 +234,16 @@ void Recorder::endWriters() {
     mostRead_ = written_ + kLeftInPipes;
 }
 
-/// Those that have come since it began, without those of commands that other threads run.
+/// As its child has said. One that has a memory of its own cannot, and is looked at while it lives.
 std::set<ino_t> Recorder::pipesOfCommand() const {
-    std::set<ino_t> pipes = pipesToRead();
-    for (const ino_t pipe : pipesBefore_)
-        pipes.erase(pipe);
-    const auto own = childrenOf(static_cast<pid_t>(::syscall(SYS_gettid)));
-    for (const pid_t command : host::commands()) {
-        if (std::find(own.begin(), own.end(), command) != own.end()) continue;
-        for (const ino_t pipe : pipesToWrite(command))
-            pipes.erase(pipe);
+    std::set<ino_t> pipes;
+    for (const std::uint64_t pipe : {notes_.out.load(), notes_.err.load()}) {
+        if (pipe != 0) pipes.insert(static_cast<ino_t>(pipe));
     }
+    if (!pipes.empty()) return pipes;
+    withCommandInHand([&pipes](pid_t command) {
+        if (command != 0) pipes = pipesToWrite(command);
+    });
     return pipes;
 }
 

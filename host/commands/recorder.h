@@ -18,6 +18,7 @@
 #include "embedded/mutex.h"
 #include "embedded/ras1_listener.h"
 #include "host/commands/command.h"
+#include "host/process/children/pipe_writers.h"
 #include "secrets/masked.h"
 
 namespace host {
@@ -93,6 +94,8 @@ private:
         std::atomic<std::int64_t> started{0};  ///< nanoseconds since the epoch
         std::atomic<int> notExecuted{0};       ///< errno
         std::atomic<bool> notConnected{false};
+        std::atomic<std::uint64_t> out{0};  ///< the number of the pipe that its output goes to
+        std::atomic<std::uint64_t> err{0};
     };
 
     bool hearInChild(const ras1::HeardLine& line, std::string_view text);
@@ -121,7 +124,6 @@ private:
     std::vector<pid_t> orphansBefore_;  ///< that were there when the command began
     std::uint64_t written_ = 0;         ///< bytes since the last take()
     std::uint64_t mostRead_ = 0;        ///< of them, once they are too many
-    std::set<ino_t> pipesBefore_;       ///< that could be read when the command began
 
     ChildNotes notes_;
     Ending ending_;

@@ -54,7 +54,9 @@ inline constexpr std::string_view kGivenUp = "Terminating process group -";
 
 /// Followed by the process id.
 inline constexpr std::string_view kInChild = "Entering child process to launch command. PID: ";
-/// Its standard streams could not be connected; it ends.
+/// Its standard streams are connected.
+inline constexpr std::string_view kConnected = "Calling execvp";
+/// They could not be connected; it ends.
 inline constexpr std::string_view kNotConnected = "error on dup2 for ";
 /// errno says why.
 inline constexpr std::string_view kNotExecuted = "Unable to launch the executable";
@@ -66,8 +68,7 @@ inline constexpr std::string_view kAnswer = "Returning status return code [";
 /// What the inventory program printed is no inventory.
 inline constexpr std::string_view kNoInventory = "Inventory header string ";
 
-// ---- No trace lines, but parts of one: an install that may end the host
-// --------------------------
+// ---- No trace lines, but parts of one: an install that may end the host -------------------------
 
 /// Its command line: this, the depot with kRestartScript at its end, a blank and the command.
 inline constexpr std::string_view kRestartShell = "/bin/sh ";

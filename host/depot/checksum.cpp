@@ -12,7 +12,7 @@
 namespace host {
 namespace {
 
-constexpr std::size_t kPieceSize = 128 * 1024;
+constexpr std::size_t kPieceSize = std::size_t{128} * 1024;
 
 std::size_t readSome(int descriptor, std::vector<unsigned char>& piece) {
     for (;;) {

@@ -42,11 +42,28 @@ std::vector<std::string> refusingGuards() {
     return names;
 }
 
-void Guards::admit(CommandRequest& request, bool mayChange) const {
+void Guards::admit(CommandRequest& request) {
+    const bool knows = lastLook_.take(request, LastLook::Clock::now());
+    const bool leavesOut = knows || tasks_.mayChange(request.product());
+    ask(request, leavesOut ? Machines::LeftOut : Machines::LookedAt);
+}
+
+void Guards::admitEarly(CommandRequest& request, bool mayChange) {
+    const LastLook::Clock::time_point before = LastLook::Clock::now();
+    const CommandRequest asked = request;
+    const bool quiet = !tasks_.anyAtWork();
+    if (mayChange || tasks_.mayChange(request.product())) {
+        ask(request, Machines::LeftOut);
+        return;
+    }
+    ask(request, Machines::LookedAt);
+    if (quiet) lastLook_.keep(asked, before);
+}
+
+void Guards::ask(CommandRequest& request, Machines machines) const {
     Machine machine(site_);
-    const bool skipsMachine = mayChange || tasks_.mayChange(request.product());
     for (const Guard& guard : guards()) {
-        if (guard.asks == Asks::Machine && skipsMachine) continue;
+        if (guard.asks == Asks::Machine && machines == Machines::LeftOut) continue;
         guard.check(request, machine);
     }
 }

@@ -108,7 +108,7 @@ void checkConsole(const std::string& home) {
 
 /// The universal agent's start-up parameters; empty when there are none.
 std::string startUpParameters(const std::string& home) {
-    constexpr std::size_t kMost = 1024 * 1024;
+    constexpr std::size_t kMost = std::size_t{1024} * 1024;
     const std::string file = startUpParametersOf(home);
     struct stat status {};
     if (::stat(file.c_str(), &status) != 0 || !S_ISREG(status.st_mode)) return "";

@@ -6,6 +6,7 @@
 #include <sys/utsname.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstddef>
@@ -13,8 +14,10 @@
 #include <set>
 #include <string_view>
 #include <system_error>
+#include <utility>
 #include <vector>
 
+#include "host/process/system/directory_stream.h"
 #include "platform/xml1.h"
 #include "system/file_descriptor.h"
 
@@ -260,18 +263,27 @@ std::string read(RunAsList& list) {
     return reader.isComplete() ? "" : "it does not parse: it ends before its elements do";
 }
 
+constexpr std::string_view kListEnding = "_zavrunas.cfg";
+
+std::string listFolder(const std::string& home) {
+    return home + "/config/";
+}
+
 std::string pathIn(const std::string& home) {
     struct utsname names {};
     if (::uname(&names) != 0) return "";
     const std::string node = names.nodename;
-    return home + "/config/" + node.substr(0, node.find('.')) + "_zavrunas.cfg";
+    return listFolder(home) + node.substr(0, node.find('.')) + std::string(kListEnding);
 }
 
-}  // namespace
+bool isListName(std::string_view name) {
+    return name.size() > kListEnding.size() &&
+           name.substr(name.size() - kListEnding.size()) == kListEnding;
+}
 
-RunAsList readRunAsList(const std::string& home) {
+RunAsList readList(std::string path) {
     RunAsList list;
-    list.path = pathIn(home);
+    list.path = std::move(path);
     struct stat found {};
     // Only what is certainly not there needs no reading.
     if (::lstat(list.path.c_str(), &found) != 0 && (errno == ENOENT || errno == ENOTDIR)) {
@@ -281,6 +293,27 @@ RunAsList readRunAsList(const std::string& home) {
     const std::string fault = read(list);
     if (!fault.empty()) list.fault = fault;
     return list;
+}
+
+}  // namespace
+
+RunAsList readRunAsList(const std::string& home) {
+    return readList(pathIn(home));
+}
+
+std::vector<std::string> foreignRunAsLists(const std::string& home) {
+    const std::string folder = listFolder(home);
+    const std::string own = pathIn(home);
+    std::vector<std::string> found;
+    const DirectoryStream directory(::opendir(folder.c_str()));
+    while (const dirent* const entry = directory ? ::readdir(directory.get()) : nullptr) {
+        const std::string path = folder + entry->d_name;
+        if (!isListName(entry->d_name) || path == own) continue;
+        const RunAsList list = readList(path);
+        if (!list.fault.empty() || !list.users.empty()) found.push_back(path);
+    }
+    std::sort(found.begin(), found.end());
+    return found;
 }
 
 }  // namespace host

@@ -3,6 +3,7 @@
 
 #include <set>
 #include <string>
+#include <vector>
 
 namespace host {
 
@@ -18,5 +19,9 @@ struct RunAsList {
 
 /// Reads the list as the plug-in does, up to 16 MiB. Never waits for a pipe. Any thread.
 RunAsList readRunAsList(const std::string& home);
+
+/// The lists of other hosts' names in the same folder that name a user, or may: sorted paths.
+/// Nobody reads them here. Any thread.
+std::vector<std::string> foreignRunAsLists(const std::string& home);
 
 }  // namespace host

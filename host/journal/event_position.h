@@ -17,7 +17,7 @@ struct EventPosition {
 /// "<journal>-<number>"
 std::string textOf(const EventPosition& position);
 
-/// Reads such a text; nothing when it is none.
+/// Reads such a text; nothing when it is not one.
 std::optional<EventPosition> positionIn(std::string_view text);
 
 }  // namespace host

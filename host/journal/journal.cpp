@@ -104,6 +104,18 @@ void noteIdentity(const StateDirectory& directory, Database& database, Recovered
     directory.noteIdentity(identity);
 }
 
+/// What is known of a task that is about to be written; false if it has been written, or begins
+/// nothing.
+bool addBeginning(Task& task, const Task& known) {
+    if (task.state != TaskState::Queued) return false;
+    task.state = known.state;
+    task.started = known.started;
+    task.transid = known.transid;
+    task.answered = task.answered || known.answered;
+    if (!known.reply.empty()) task.reply = known.reply;
+    return task.state == TaskState::Running;
+}
+
 }  // namespace
 
 Journal::Journal(const Settings& settings) : settings_(settings) {
@@ -124,7 +136,7 @@ Journal::Journal(const Settings& settings) : settings_(settings) {
     if (recovered_.waiting > 0 || !recovered_.interrupted.empty()) warn(described(recovered_));
     writer_ = std::make_unique<Writer>(
         *database_, reader_ ? nullptr : &readLock_,
-        Writer::Watch{[this] { asGiven_.clear(); },
+        Writer::Watch{[this] { beginTransaction(); },
                       [this](Database& database) { tellOfCommit(database); }, pruning(),
                       settings_.pruneEvery});
     writer_->submitLater(pruning());
@@ -265,14 +277,39 @@ std::int64_t Journal::enterInto(Database& database, const Task& task) const {
 }
 
 void Journal::enterSoon(Task task) {
+    writeSoon([task = std::move(task)](Database& database) { insertTask(database, task); },
+              kEndWithin);
+}
+
+void Journal::writeSoon(Writer::Change change, std::chrono::milliseconds within) {
+    std::uint64_t number = 0;
+    {
+        const embedded::MutexLock lock(soonLock_);
+        number = ++soon_.last;
+        soon_.hidden.insert(number);
+    }
+    submitSoon(number, std::move(change), within);
+}
+
+void Journal::submitSoon(std::uint64_t number, Writer::Change change,
+                         std::chrono::milliseconds within) {
     writer_->submitLater(
-        [task = std::move(task)](Database& database) { insertTask(database, task); });
+        [change = std::move(change), number, this](Database& database) {
+            written_.push_back(number);
+            try {
+                change(database);
+            } catch (const DatabaseError&) {
+                written_.pop_back();  // it is tried again with another transaction
+                throw;
+            }
+        },
+        within);
 }
 
 Writer::Change Journal::updateOf(std::vector<Task> tasks) {
-    return [&writer = *writer_, tasks = std::move(tasks)](Database& database) {
+    return [tasks = std::move(tasks), this](Database& database) {
         for (const Task& task : tasks) {
-            if (updateTask(database, task)) writer.wipeSoon();
+            if (updateTask(database, task)) writer_->wipeSoon();
         }
     };
 }
@@ -306,8 +343,20 @@ void Journal::takeBack(std::int64_t number) {
 }
 
 void Journal::saveSoon(Task task) {
-    const std::chrono::seconds within = isOver(task.state) ? kEndWithin : kBeginningWithin;
-    writer_->submitLater(updateOf({std::move(task)}), within);
+    if (isOver(task.state)) {
+        writeSoon(updateOf({std::move(task)}), kEndWithin);
+        return;
+    }
+    std::uint64_t number = 0;
+    {
+        const embedded::MutexLock lock(soonLock_);
+        number = ++soon_.last;
+        soon_.begun.emplace(number, task);
+        // Until it is written that it was answered, nobody who asks finds it.
+        if (task.way != TaskWay::Journal) soon_.hidden.insert(number);
+    }
+    submitSoon(number, updateOf({std::move(task)}), kBeginningWithin);
+    tellOfChange();
 }
 
 void Journal::saveOutcome(const std::vector<Task>& tasks, const std::string& row) {
@@ -330,18 +379,35 @@ void Journal::keepRow(const std::string& kept, const std::string& row) {
     });
 }
 
-void Journal::whenCommitted(std::function<void()> call) {
-    const embedded::MutexLock lock(committedLock_);
-    whenCommitted_ = std::move(call);
+void Journal::whenChanged(std::function<void()> call) {
+    const embedded::MutexLock lock(changedLock_);
+    whenChanged_ = std::move(call);
+}
+
+/// On the writer's thread, before each transaction.
+void Journal::beginTransaction() {
+    asGiven_.clear();
+    written_.clear();
 }
 
 /// On the writer's thread, after each transaction.
 void Journal::tellOfCommit(Database& database) {
+    {
+        const embedded::MutexLock lock(soonLock_);
+        for (const std::uint64_t number : written_) {
+            soon_.begun.erase(number);
+            soon_.hidden.erase(number);
+        }
+    }
     tellOfEvents(database);
+    tellOfChange();
+}
+
+void Journal::tellOfChange() {
     std::function<void()> call;
     {
-        const embedded::MutexLock lock(committedLock_);
-        call = whenCommitted_;
+        const embedded::MutexLock lock(changedLock_);
+        call = whenChanged_;
     }
     if (call) call();
 }
@@ -370,6 +436,8 @@ void Journal::tellOfEvents(Database& database) {
 }
 
 void Journal::commitOutcome(const Writer::Change& change) {
+    while (closed_.load())
+        std::this_thread::sleep_for(kCommitRetry);
     while (!commitOutcomeOnce(change)) {
         if (directory_) directory_->freeReserve();
         if (commitOutcomeOnce(change)) break;
@@ -400,10 +468,12 @@ std::string Journal::trouble() {
 }
 
 void Journal::forget(std::int64_t number) {
-    writer_->submitLater([number, &writer = *writer_](Database& database) {
-        deleteTask(database, number);
-        writer.wipeSoon();
-    });
+    writeSoon(
+        [number, this](Database& database) {
+            deleteTask(database, number);
+            writer_->wipeSoon();
+        },
+        kEndWithin);
 }
 
 /// Removes what is too old.
@@ -434,14 +504,61 @@ std::vector<Task> Journal::newest(const TaskFilter& filter) {
 }
 
 std::optional<Task> Journal::find(std::string_view name) {
-    writer_->flush();
-    return read([&](Database& database) -> std::optional<Task> {
+    if (awaitsHidden()) writer_->flush();
+    // Before the look: what has been written meanwhile is then found there.
+    const std::map<std::int64_t, Task> begun = begunTasks();
+    std::optional<Task> found = read([&](Database& database) -> std::optional<Task> {
         if (const auto number = numberIn(name, identity_)) {
             std::optional<Task> task = readTask(database, identity_, *number);
             if (task) return task;
         }
         const auto number = newestWithTransid(database, name);
         return number ? readTask(database, identity_, *number) : std::nullopt;
+    });
+    if (!found) return found;
+    const auto known = begun.find(found->number);
+    if (known != begun.end()) addBeginning(*found, known->second);
+    return found;
+}
+
+bool Journal::awaitsHidden() const {
+    const embedded::MutexLock lock(soonLock_);
+    return !soon_.hidden.empty();
+}
+
+std::map<std::int64_t, Task> Journal::begunTasks() const {
+    const embedded::MutexLock lock(soonLock_);
+    std::map<std::int64_t, Task> tasks;
+    for (const auto& [change, task] : soon_.begun)
+        tasks.insert_or_assign(task.number, task);
+    return tasks;
+}
+
+/// Of the tasks that run and of which that is not written yet, as a JSON array.
+std::string Journal::begunNumbers() const {
+    std::string numbers;
+    for (const auto& [number, task] : begunTasks()) {
+        if (task.state != TaskState::Running) continue;
+        numbers += (numbers.empty() ? "" : ",") + std::to_string(number);
+    }
+    return '[' + numbers + ']';
+}
+
+std::vector<Task> Journal::running() {
+    const std::map<std::int64_t, Task> begun = begunTasks();
+    return read([&](Database& database) {
+        TaskFilter filter;
+        filter.state = TaskState::Running;
+        std::vector<Task> found = readTasks(database, identity_, filter);
+        for (const auto& [number, known] : begun) {
+            std::optional<Task> task = readTask(database, identity_, number);
+            if (!task && known.state == TaskState::Running) {
+                found.push_back(known);  // nobody has been told yet that it was accepted
+            } else if (task && addBeginning(*task, known)) {
+                found.push_back(std::move(*task));
+            }
+        }
+        return found;
     });
 }
 
@@ -492,17 +609,24 @@ std::int64_t Journal::waiting() {
 }
 
 std::int64_t Journal::notBegun() {
-    writer_->flush();
-    return read([](Database& database) {
-        return database.number("SELECT count(*) FROM tasks WHERE ended IS NULL AND state = 0");
+    const std::string begun = begunNumbers();
+    return read([&](Database& database) {
+        return database.number(
+            "SELECT count(*) FROM tasks WHERE ended IS NULL AND state = 0 "
+            "AND number NOT IN (SELECT value FROM json_each(?))",
+            begun);
     });
 }
 
 Journal::Unfinished Journal::unfinished() {
-    return read([](Database& database) {
+    const std::string begun = begunNumbers();
+    return read([&](Database& database) {
         Statement found = database.ask(
-            "SELECT coalesce(sum(state = 0), 0), coalesce(sum(state = 1), 0), "
-            "min(CASE WHEN state = 0 THEN accepted END) FROM tasks WHERE ended IS NULL");
+            "SELECT coalesce(sum(known = 0), 0), coalesce(sum(known = 1), 0), "
+            "min(CASE WHEN known = 0 THEN accepted END) FROM (SELECT accepted, "
+            "max(state, number IN (SELECT value FROM json_each(?))) AS known "
+            "FROM tasks WHERE ended IS NULL)",
+            begun);
         Unfinished tasks;
         if (!found.step()) return tasks;
         tasks.queued = found.integer(0);

@@ -8,6 +8,7 @@
 #include <map>
 #include <memory>
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -50,6 +51,9 @@ public:
     /// what it has in its queue did not begin. Errors are ignored: the next start then looks more
     /// closely.
     void endCleanly(bool quiet) noexcept;
+    /// No outcome is recorded any more: who brings one waits for the end of the process. So what is
+    /// cut off on purpose is interrupted at the next start, not failed.
+    void close() { closed_.store(true); }
 
     const std::string& identity() const override { return identity_; }
     std::int64_t run() const override { return recovered_.run; }
@@ -74,9 +78,9 @@ public:
     /// of them. Rows are as the plug-in gave them while memory has them, else masked. Throws
     /// DatabaseError.
     std::vector<JournalEvent> eventsAfter(std::int64_t position, std::size_t most);
-    /// From now on calls this on the journal's own thread after each transaction. It must return at
-    /// once.
-    void whenCommitted(std::function<void()> call);
+    /// From now on calls this after each transaction, on the journal's own thread, and when a task
+    /// has begun, on any thread and with its locks. It must return at once and not call back.
+    void whenChanged(std::function<void()> call);
     /// See EventLog::whenNew().
     void whenEvents(std::function<void()> call) { events_->whenNew(std::move(call)); }
 
@@ -98,8 +102,11 @@ public:
     bool isTooLate(const Task& task);
     /// How many tasks wait so.
     std::int64_t waiting();
-    /// How many have not begun, those in the plug-in's queue among them.
+    /// How many have not begun, those in the plug-in's queue among them. Unlike newest(), this and
+    /// running() make nothing be written sooner.
     std::int64_t notBegun();
+    /// The tasks that run.
+    std::vector<Task> running();
     /// The tasks that are not over.
     struct Unfinished {
         std::int64_t queued = 0;  ///< have not begun
@@ -165,6 +172,13 @@ private:
     std::int64_t handOverNext(Database& database);
     std::int64_t enterInto(Database& database, const Task& task) const;
     void tellOfCommit(Database& database);
+    void tellOfChange();
+    void writeSoon(Writer::Change change, std::chrono::milliseconds within);
+    void submitSoon(std::uint64_t number, Writer::Change change, std::chrono::milliseconds within);
+    bool awaitsHidden() const;
+    std::map<std::int64_t, Task> begunTasks() const;
+    std::string begunNumbers() const;
+    void beginTransaction();
     void tellOfEvents(Database& database);
     Writer::Change pruning();
 
@@ -176,6 +190,7 @@ private:
     std::string key_;
     Recovered recovered_;
 
+    std::atomic<bool> closed_{false};
     std::atomic<bool> handsOver_{false};
     std::atomic<std::int64_t> handedOver_{0};
     /// Recorded as handed over, and not with the plug-in yet; 0: none.
@@ -185,11 +200,21 @@ private:
     std::optional<EventLog> events_;
     // Of the writer's thread alone.
     std::map<std::int64_t, std::string> asGiven_;  ///< rows of the transaction, by their events
+    std::vector<std::uint64_t> written_;           ///< the changes of `soon_` in the transaction
     std::size_t sincePrune_ = 0;                   ///< events
     std::size_t rowsSincePrune_ = 0;               ///< the same since old rows were removed
 
-    embedded::Mutex committedLock_;
-    std::function<void()> whenCommitted_ ZAV_GUARDED_BY(committedLock_);
+    /// The changes that wait for a transaction, or are in the one that is being written.
+    struct Soon {
+        std::map<std::uint64_t, Task> begun;  ///< what they say of tasks: told from here meanwhile
+        std::set<std::uint64_t> hidden;       ///< who asks for a task has these written first
+        std::uint64_t last = 0;               ///< changes are numbered, so that a later one stays
+    };
+    mutable embedded::Mutex soonLock_;
+    Soon soon_ ZAV_GUARDED_BY(soonLock_);
+
+    embedded::Mutex changedLock_;
+    std::function<void()> whenChanged_ ZAV_GUARDED_BY(changedLock_);
     mutable embedded::Mutex troubleLock_;
     std::string trouble_ ZAV_GUARDED_BY(troubleLock_);
     std::atomic<bool> troubled_{false};      ///< whether there is any

@@ -64,10 +64,14 @@ std::string firstFreeName(const std::string& name) {
 
 }  // namespace
 
+void provideStateDirectory(const std::string& path) {
+    makeDirectories(path);
+    insistOnPrivacy(path);
+}
+
 StateDirectory::StateDirectory(const std::string& path)
     : path_(fs::path(path + "/").lexically_normal().parent_path().string()) {
-    makeDirectories(path_);
-    insistOnPrivacy(path_);
+    provideStateDirectory(path_);
     lock_.emplace(path_, "state directory");
     std::error_code ignored;
     endedCleanly_ = takeMark(path_) || !fs::exists(database(), ignored);

@@ -9,12 +9,17 @@
 
 namespace host {
 
+/// Makes the directory with mode 0700, and those above it, if they are missing. Throws StartError
+/// when it cannot be made, or when another user could write to it.
+void provideStateDirectory(const std::string& path);
+
 /// Belongs to one host at a time, and to nobody but its user. It holds:
 ///
 /// | journal.db, journal.db-wal, journal.db-shm | the journal |
 /// | identity | the journal's identity, which is known by it when the journal cannot be read |
 /// | clean | there is one when the last host that used the directory ended in good order |
 /// | reserve | space that is given up when the disk is full, so that outcomes still find room |
+/// | trace.log, trace.log.1 ... | the trace of a host whose standard error is a log (trace_log.h) |
 ///
 /// One thread at a time.
 class StateDirectory {

@@ -41,7 +41,7 @@ std::optional<std::int64_t> newestWithTransid(Database& database, std::string_vi
 std::vector<Task> readTasks(Database& database, const std::string& identity,
                             const TaskFilter& filter);
 
-/// The number in a task's identifier; nothing when it is none of this journal's.
+/// The number in a task's identifier; nothing when it is not one of this journal's.
 std::optional<std::int64_t> numberIn(std::string_view id, std::string_view identity);
 
 /// The newest time that is stored; tasks that are over count with their ends.

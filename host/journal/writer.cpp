@@ -13,6 +13,8 @@ namespace {
 constexpr std::chrono::seconds kNextTry{1};
 /// A reader in the way may delay the log's cutting, which then is tried again.
 constexpr std::chrono::milliseconds kWipeDelay{500};
+/// A transaction waits for this many times Watch::gather at most.
+constexpr int kMostGathers = 5;
 
 /// From a solid-state disk to one that hangs.
 std::vector<metrics::Histogram::Duration> commitBounds() {
@@ -168,11 +170,16 @@ bool Writer::awaitWork(std::unique_lock<std::mutex>& lock) {
     }
 }
 
-/// With the lock held, which is let go meanwhile.
+/// With the lock held, which is let go meanwhile. As long as more keep coming, they are waited for.
 void Writer::gather(std::unique_lock<std::mutex>& lock) {
     if (isCrowded_ && !jobs_.empty()) {
-        const Clock::time_point end = Clock::now() + watch_.gather;
-        changed_.wait_until(lock, end, [&] { return ending_ || Clock::now() >= end; });
+        const Clock::time_point end = Clock::now() + kMostGathers * watch_.gather;
+        for (std::size_t before = 0; jobs_.size() > before && Clock::now() < end;) {
+            before = jobs_.size();
+            const Clock::time_point next = std::min(end, Clock::now() + watch_.gather);
+            changed_.wait_until(lock, next, [&] { return ending_ || Clock::now() >= next; });
+            if (ending_) break;
+        }
     }
     isCrowded_ = jobs_.size() > 1;
 }

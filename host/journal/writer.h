@@ -41,7 +41,8 @@ public:
         Change regular{};
         std::chrono::milliseconds every = std::chrono::hours(1);
         /// How long a transaction waits for more of those who come at the same time, where the disk
-        /// would be faster than they are. Who comes alone does not wait.
+        /// would be faster than they are, and so again while more come, five times at most. A
+        /// caller who comes alone does not wait.
         std::chrono::milliseconds gather{2};
     };
 

@@ -45,8 +45,8 @@ public:
     };
 
     /// Subscribes to the rows that satisfy all conditions, judged as the table judges them. Rows
-    /// whose publication begins after the return reach the sink. What it answers, or throws, is
-    /// nobody's affair. Null when there is no outcome table or it makes no filter.
+    /// whose publication begins after the return reach the sink. What it answers or
+    /// throws is ignored. Null when there is no outcome table or it makes no filter.
     std::unique_ptr<Subscription> subscribe(const std::vector<oxa::Predicate>& where,
                                             oxa::Sink sink);
 

@@ -75,7 +75,8 @@ public:
     /// own. `row` is the outcome as the plug-in gave it, for those who listen now: it is not kept.
     /// Returns when that is durable, however long it takes.
     virtual void saveOutcome(const std::vector<Task>& tasks, const std::string& row) = 0;
-    /// Changes a task without waiting.
+    /// Changes a task without waiting. That it has begun can be found at once, and is durable with
+    /// the next change, or after some seconds; whatever else has changed, after about a second.
     virtual void saveSoon(Task task) = 0;
     /// A row of the outcome table that belongs to no task, as it may be kept and as it came.
     /// Returns when it is durable.

@@ -456,6 +456,13 @@ bool TaskList::mayChange(const std::string& product) const {
     });
 }
 
+bool TaskList::anyAtWork() const {
+    const embedded::MutexLock lock(lock_);
+    return std::any_of(entries_.begin(), entries_.end(), [](const auto& each) {
+        return each.second.turn != 0 && !isOver(each.second.task.state);
+    });
+}
+
 bool TaskList::mustWait(const Task& task) const {
     if (!guarded_) return false;
     const bool restarts =

@@ -76,6 +76,8 @@ public:
     /// Whether an accepted task for the product, in upper or lower case, is not over and may change
     /// whether it is installed or which instances it has. False for no product.
     bool mayChange(const std::string& product) const;
+    /// Whether the plug-in has any accepted task that is not over.
+    bool anyAtWork() const;
 
     /// Whether a task whose turn has come shall not be handed over yet: what the plug-in got by a
     /// query meanwhile may change what the guards would see, or leaves the result of an install

@@ -14,10 +14,10 @@ namespace host {
 /// further ones. Everybody else, and a peer that the kernel does not name, has no access.
 http::Peer peerOf(int connection, const AccessGroups& groups = {});
 
-/// Whom the host serves, for those whom it does not: a sentence.
+/// A sentence that tells those who are turned away whom the host serves.
 std::string servedUsers(const AccessGroups& groups);
 
-/// Lets in whom the host serves.
+/// Lets in those whom the host serves.
 http::Door doorFor(const AccessGroups& groups = {});
 
 }  // namespace host

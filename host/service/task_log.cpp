@@ -50,9 +50,7 @@ TaskLog::TaskLog(Journal& journal, Say say)
 
 void TaskLog::look() {
     tellEnds();
-    TaskFilter running;
-    running.state = TaskState::Running;
-    for (const Task& task : journal_.newest(running))
+    for (const Task& task : journal_.running())
         tellBegin(task);
 }
 

@@ -32,9 +32,24 @@ bool isPlaceholder(const std::string& segment) {
     return segment.front() == '{';
 }
 
-std::string capitalized(std::string word) {
-    word.front() = static_cast<char>(std::toupper(static_cast<unsigned char>(word.front())));
-    return word;
+/// "TryAgain" of "try-again".
+std::string capitalized(const std::string& words) {
+    std::string name;
+    bool isFirst = true;
+    for (const char letter : words) {
+        const auto plain = static_cast<unsigned char>(letter);
+        if (letter != '-') name += static_cast<char>(isFirst ? std::toupper(plain) : plain);
+        isFirst = letter == '-';
+    }
+    return name;
+}
+
+/// "task" of "tasks", "batch" of "batches".
+std::string oneOf(const std::string& words) {
+    constexpr std::string_view kHissing = "ches";
+    const std::size_t ending = words.size() < kHissing.size() ? 0 : words.size() - kHissing.size();
+    if (words.substr(ending) == kHissing) return words.substr(0, words.size() - 2);
+    return words.back() == 's' ? words.substr(0, words.size() - 1) : words;
 }
 
 Json shapeOf(Type type) {
@@ -118,7 +133,7 @@ Json contentOf(const RouteAnswer& answer, Components& components) {
         return {{"application/json", {{"schema", components.ref(answer.document)}}}};
     }
     const Json text = {{"type", "string"}};
-    if (answer.events.empty()) return {{"text/plain", {{"schema", text}}}};
+    if (answer.events.empty()) return {{answer.media, {{"schema", text}}}};
     Json events = Json::object();
     for (const StreamEvent& event : answer.events)
         events[event.name] = components.ref(event.data);
@@ -140,6 +155,8 @@ bool hasInput(const RouteFacts& route, std::string_view name) {
 
 bool mayFailWith(const Interface& about, const RouteFacts& route, const StatusMeaning& meaning) {
     if (meaning.status == about.statusOfMember) return hasInput(route, about.memberOfStatus);
+    const bool isForAll = route.access == http::Access::None;
+    if (meaning.status == about.statusOfStrangers && !isForAll) return true;
     return meaning.ofEvery || std::find(route.errors.begin(), route.errors.end(), meaning.status) !=
                                   route.errors.end();
 }
@@ -181,7 +198,7 @@ Json errorAnswers(const Interface& about, Components& components) {
             {"content", {{"application/json", {{"schema", components.ref(errorSchema)}}}}}};
         if (meaning.saysWhen) {
             answer["headers"]["Retry-After"] = {
-                {"description", "after how many seconds to ask again, where the host can say"},
+                {"description", "after how many seconds to ask again, where that is known"},
                 {"schema", {{"type", "integer"}}}};
         }
         answers[std::to_string(meaning.status)] = std::move(answer);
@@ -189,10 +206,22 @@ Json errorAnswers(const Interface& about, Components& components) {
     return answers;
 }
 
+const char* nameOf(http::Access access) {
+    switch (access) {
+        case http::Access::None:
+            return "none";
+        case http::Access::Read:
+            return "read";
+        case http::Access::Act:
+            break;
+    }
+    return "act";
+}
+
 Json operationOf(const Interface& about, const RouteFacts& route, Components& components) {
     Json operation = {{"operationId", operationName(route)},
                       {"summary", route.doc},
-                      {"x-access", route.access == http::Access::Act ? "act" : "read"}};
+                      {"x-access", nameOf(route.access)}};
     const Json parameters = parametersOf(route, components);
     if (!parameters.empty()) operation["parameters"] = parameters;
     if (!route.body.empty()) operation["requestBody"] = bodyOf(route, components);
@@ -213,11 +242,10 @@ std::string operationName(const RouteFacts& route) {
     const std::vector<std::string> segments = segmentsOf(route.path);
     for (std::size_t i = 0; i < segments.size(); ++i) {
         if (isPlaceholder(segments[i])) continue;
-        std::string word = segments[i].substr(0, segments[i].find('.'));
+        const std::string word = segments[i].substr(0, segments[i].find('.'));
         // What a parameter chooses is one of them.
         const bool isOne = i + 1 < segments.size() && isPlaceholder(segments[i + 1]);
-        if (isOne && word.back() == 's') word.pop_back();
-        name += capitalized(word);
+        name += capitalized(isOne ? oneOf(word) : word);
     }
     return name;
 }

@@ -1,4 +1,4 @@
-// The one shape of errors, as host/http/reply.h makes them.
+// The one shape of errors, as http/reply.h makes them.
 
 #include "routes/description/schema.h"
 

@@ -76,6 +76,34 @@ TEST_F(PidOne, LosesNoExitCodeOfACommand) {
     EXPECT_NE(installed.out.find("exit code 7"), std::string::npos) << installed.out;
 }
 
+TEST_F(PidOne, LetsItsAgentsEndInGoodOrderAndNotesThatTheyShouldRun) {
+    const std::string said = scratch.path("said");
+    const std::string agent = home.path("agtqvs6/" + home.platform() + "/ux/bin/agent");
+    std::ofstream(agent, std::ios::trunc)
+        << "#!/bin/sh\ntrap 'echo ended >" << said << "; exit 0' TERM\n: >" << said
+        << "\nwhile :; do sleep 0.1; done\n";
+    ASSERT_EQ(zavctl({"start", "ux"}).status, 0);
+    ASSERT_TRUE(eventually([&] { return scratch.exists("said"); }));
+    ASSERT_EQ(::kill(host(), SIGTERM), 0);
+    EXPECT_EQ(container->wait(seconds(60)).status, 0);
+    EXPECT_EQ(scratch.read("said"), "ended\n");
+    EXPECT_TRUE(home.runs("ux")) << "its pid file is there";
+}
+
+TEST_F(PidOne, WaitsSomeSecondsOnlyForWhatDoesNotEnd) {
+    const std::string installer = scratch.script(
+        "installer", "setsid sh -c 'trap \"\" TERM; : >" + scratch.path("stays") +
+                         "; while :; do sleep 1; done' </dev/null >/dev/null 2>&1 &");
+    EXPECT_EQ(zavctl({"install", "ux", "060100000", "--no-verify", "--", installer}).status, 0);
+    ASSERT_TRUE(eventually([&] { return scratch.exists("stays"); }));
+    ASSERT_EQ(::kill(host(), SIGTERM), 0);
+    const ProgramResult ended = container->wait(seconds(60));
+    EXPECT_EQ(ended.status, 0);
+    EXPECT_NE(ended.err.find(" processes have not ended within 10 s and are killed"),
+              std::string::npos)
+        << ended.err;
+}
+
 TEST_F(PidOne, EndsInGoodOrderWhenToldTo) {
     ASSERT_GT(host(), 1);
     ASSERT_EQ(::kill(host(), SIGTERM), 0);

@@ -140,6 +140,18 @@ TEST_F(ProgramWithAJournal, SaysWhenATaskBeginsAndWhenItEndsAndNothingElse) {
     EXPECT_EQ(line.find('\n'), line.size() - 1) << line;
 }
 
+TEST_F(ProgramWithAJournal, TracesIntoAFileOfItsOwn) {
+    const auto program = startInto(scratch.path("log"));
+    ASSERT_TRUE(program->awaitOutput("ready: ", std::chrono::seconds(30)));
+    EXPECT_TRUE(scratch.exists("home/zavhost/trace.log"));
+}
+
+TEST_F(ServiceProgram, TracesToStandardErrorWhenSomebodyStartsItByHand) {
+    const auto program = start();
+    ASSERT_TRUE(program->awaitOutput("ready: ", std::chrono::seconds(30)));
+    EXPECT_FALSE(scratch.exists("home/zavhost/trace.log"));
+}
+
 TEST_F(ProgramWithAJournal, TellsOfTheLastTaskBeforeItEnds) {
     const auto program = startInto(scratch.path("log"));
     ASSERT_TRUE(program->awaitOutput("ready: ", std::chrono::seconds(30)));

@@ -67,8 +67,8 @@ std::string rowLike(const Task& task, const oxa::Table& table) {
 /// What a reader gets, on its way from the journal.
 class OutcomeStream final : public PumpedStream {
 public:
-    /// Behind this position, the reader's own; where it is none of this journal's, from the oldest
-    /// event on.
+    /// Behind this position, the reader's own; where it is not one of this journal's, from the
+    /// oldest event on.
     OutcomeStream(Services& services, const oxa::Table& table, const OutcomeWish& wish,
                   const EventPosition& position)
         : services_(services),

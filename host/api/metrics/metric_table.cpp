@@ -5,7 +5,9 @@
 #include <string>
 
 #include "host/home/inventory.h"
+#include "host/process/children/process_table.h"
 #include "host/process/version.h"
+#include "metrics/process_metrics.h"
 
 namespace host {
 namespace {
@@ -17,10 +19,6 @@ double secondsOf(Time time) {
 
 double figure(const metrics::Counter& counter) {
     return static_cast<double>(counter.value());
-}
-
-void add(metrics::Exposition& out, const std::optional<double>& value) {
-    if (value) out.sample(*value);
 }
 
 void tellTasks(const Scrape& scrape, metrics::Exposition& out) {
@@ -73,16 +71,14 @@ void tellBuild(const Scrape&, metrics::Exposition& out) {
     out.sample({{"version", kVersion}, {"width", width}}, 1);
 }
 
-}  // namespace
-
-const std::vector<Metric>& metricTable() {
+std::vector<Metric> makeTable() {
     constexpr auto kCounter = metrics::MetricType::Counter;
     constexpr auto kGauge = metrics::MetricType::Gauge;
     constexpr auto kHistogram = metrics::MetricType::Histogram;
     using S = const Scrape&;
     using Out = metrics::Exposition&;
     // clang-format off
-    static const std::vector<Metric> table = {
+    std::vector<Metric> table = {
         {"zavhost_tasks_total", kCounter, "command, outcome",
          "Tasks that ended, by command and the state in which they ended.", tellTasks},
         {"zavhost_task_duration_seconds", kHistogram, "command",
@@ -142,7 +138,7 @@ const std::vector<Metric>& metricTable() {
          }},
         {"zavhost_child_processes", kGauge, "",
          "Child processes that live, adopted ones among them.",
-         [](S scrape, Out out) { add(out, scrape.process.children); }},
+         [](S, Out out) { out.sample(static_cast<double>(countLivingChildren())); }},
         {"zavhost_inventory_age_seconds", kGauge, "",
          "How long ago the host last read the home's inventory; absent until it has.",
          tellInventoryAge},
@@ -154,30 +150,20 @@ const std::vector<Metric>& metricTable() {
          [](S scrape, Out out) { out.sample(scrape.services.guarded ? 1 : 0); }},
         {"zavhost_build_info", kGauge, "version, width",
          "1; the labels tell the version and the width of the process in bits.", tellBuild},
-        // The names that programs of all kinds use for these.
-        {"process_cpu_seconds_total", kCounter, "",
-         "Processor time that the host itself has spent.",
-         [](S scrape, Out out) { add(out, scrape.process.cpuSeconds); }},
-        {"process_start_time_seconds", kGauge, "",
-         "When the process started, in seconds since the epoch.",
-         [](S scrape, Out out) { add(out, scrape.process.startSeconds); }},
-        {"process_virtual_memory_bytes", kGauge, "",
-         "Size of the address space.",
-         [](S scrape, Out out) { add(out, scrape.process.virtualBytes); }},
-        {"process_resident_memory_bytes", kGauge, "",
-         "Memory that is in use.",
-         [](S scrape, Out out) { add(out, scrape.process.residentBytes); }},
-        {"process_open_fds", kGauge, "",
-         "File descriptors that are open.",
-         [](S scrape, Out out) { add(out, scrape.process.openDescriptors); }},
-        {"process_max_fds", kGauge, "",
-         "File descriptors that may be open.",
-         [](S scrape, Out out) { add(out, scrape.process.mostDescriptors); }},
-        {"process_threads", kGauge, "",
-         "Threads of the process.",
-         [](S scrape, Out out) { add(out, scrape.process.threads); }},
+        // As process_start_time_seconds, which gets lost among those of other programs.
+        {"zavhost_start_time_seconds", kGauge, "",
+         "When the host started, in seconds since the epoch.",
+         [](S scrape, Out out) { metrics::tellKnown(out, scrape.process.startSeconds); }},
     };
     // clang-format on
+    addProcessMetrics(table);
+    return table;
+}
+
+}  // namespace
+
+const std::vector<Metric>& metricTable() {
+    static const std::vector<Metric> table = makeTable();
     return table;
 }
 

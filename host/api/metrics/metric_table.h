@@ -5,8 +5,8 @@
 #include <vector>
 
 #include "host/api/services.h"
-#include "host/process/figures.h"
-#include "metrics/exposition.h"
+#include "metrics/metric_table.h"
+#include "metrics/process_figures.h"
 
 namespace host {
 
@@ -15,18 +15,10 @@ struct Scrape {
     const Services& services;
     std::optional<Journal::Unfinished> unfinished;  ///< absent: the journal cannot be read
     WallClock::time_point now;                      ///< as the journal sees it
-    ProcessFigures process;
+    metrics::ProcessFigures process;
 };
 
-/// One metric. The values of its labels are fixed sets: none comes from a client.
-struct Metric {
-    const char* name;  ///< with "_total" for counters, and the unit, in its plural, before that
-    metrics::MetricType type;
-    const char* labels;  ///< their names, for the documentation, with ", " between them
-    const char* help;    ///< one sentence
-    /// Adds the metric's samples; none where the value is not known.
-    void (*collect)(const Scrape& scrape, metrics::Exposition& out);
-};
+using Metric = metrics::Metric<Scrape>;
 
 /// In the order in which they are told.
 const std::vector<Metric>& metricTable();

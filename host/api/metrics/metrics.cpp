@@ -23,13 +23,9 @@ Endpoint getMetrics;
 
 http::Answer getMetrics(Services& services, const Call&) {
     const Scrape scrape{services, readUnfinished(services.journal), services.journal.latestTime(),
-                        readProcessFigures()};
-    metrics::Exposition out;
-    for (const Metric& metric : metricTable()) {
-        out.metric(metric.name, metric.type, metric.help);
-        metric.collect(scrape, out);
-    }
-    return http::Reply{200, out.text(), std::string(metrics::Exposition::kContentType)};
+                        metrics::readProcessFigures()};
+    return http::Reply{200, metrics::pageOf(metricTable(), scrape),
+                       std::string(metrics::Exposition::kContentType)};
 }
 
 }  // namespace host

@@ -18,7 +18,7 @@ struct OutputPosition {
 /// "<run>-<bytes>-<bytes>"
 std::string textOf(const OutputPosition& position);
 
-/// Reads such a text; nothing when it is none.
+/// Reads such a text; nothing when it is not one.
 std::optional<OutputPosition> outputPositionIn(std::string_view text);
 
 }  // namespace host

@@ -143,7 +143,7 @@ void askGuards(const Task& task, Services& services) {
     if (!services.guarded) return;
     CommandRequest request(task.conditions, task.forced);
     try {
-        services.guards.admit(request, services.journal.mayChange(request.product()));
+        services.guards.admitEarly(request, services.journal.mayChange(request.product()));
     } catch (const Refusal& refusal) {
         if (task.once && refusal.httpStatus() == 409) {
             Task remembered = neverBegun(task, TaskState::Refused, refusal.what());

@@ -62,10 +62,6 @@ bool kill(const sys::FileDescriptor& process) {
 
 }  // namespace
 
-std::set<ino_t> pipesToRead() {
-    return numbersOf(pipesOf("self", S_IRUSR));
-}
-
 std::set<ino_t> pipesToWrite(pid_t process) {
     return numbersOf(pipesOf(std::to_string(process), S_IWUSR));
 }

@@ -8,9 +8,6 @@
 
 namespace host {
 
-/// The pipes that this process can read from, by their numbers in the system. Any thread.
-std::set<ino_t> pipesToRead();
-
 /// The pipes that another process can write to; none when this process may not see them. Any
 /// thread.
 std::set<ino_t> pipesToWrite(pid_t process);

@@ -56,6 +56,14 @@ std::optional<ProcessEntry> readProcess(pid_t pid) {
     return readEntry(std::to_string(pid));
 }
 
+std::size_t countLivingChildren() {
+    const pid_t self = ::getpid();
+    const std::vector<ProcessEntry> processes = readProcesses();
+    return static_cast<std::size_t>(std::count_if(
+        processes.begin(), processes.end(),
+        [self](const ProcessEntry& process) { return process.parent == self && process.isAlive; }));
+}
+
 std::optional<ProcessEntry> processIn(std::string_view stat) {
     // The second field is the program's name, which may hold blanks and parentheses.
     const std::size_t nameEnd = stat.rfind(')');

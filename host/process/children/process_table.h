@@ -3,6 +3,7 @@
 
 #include <sys/types.h>
 
+#include <cstddef>
 #include <optional>
 #include <string_view>
 #include <vector>
@@ -23,6 +24,9 @@ std::vector<ProcessEntry> readProcesses();
 
 /// Nothing if there is none any more.
 std::optional<ProcessEntry> readProcess(pid_t pid);
+
+/// Children of this process that live; processes that it has adopted are among them.
+std::size_t countLivingChildren();
 
 /// The entry in the text of a file /proc/PID/stat; nothing if the text is not of its form.
 std::optional<ProcessEntry> processIn(std::string_view stat);

@@ -35,7 +35,7 @@ protected:
     }
 
     StarterHome home;
-    ManagedHost host{home.path()};
+    ManagedHost host{home.path(), home.environment()};
 };
 
 TEST_F(CompletionInShells, OfBash) {
@@ -54,6 +54,29 @@ TEST_F(CompletionInShells, OfBashKnowsInstancesWithTheirColons) {
               "source " + script("zavctl.bash") + "\nzavctl start um --target " +
                   name.substr(0, name.find(':') + 2) + "\t--help\nexit\n");
     EXPECT_THAT(shown, HasSubstr("--target " + name));
+}
+
+TEST_F(CompletionInShells, OfBashKnowsTasks) {
+    ASSERT_EQ(host.zavctl({"start", "ux", "--transid", "evening-17"}).status, 0);
+    const std::string shown =
+        typed("/bin/bash --norc --noprofile -i", "source " + script("zavctl.bash") +
+                                                     "\nzavctl task show eve\t--help\nzavctl task "
+                                                     "show eve\t\nexit\n");
+    EXPECT_THAT(shown, HasSubstr("zavctl task show evening-17 --help"));
+    EXPECT_THAT(shown, HasSubstr("START ux")) << "and it was shown";
+}
+
+TEST_F(CompletionInShells, OfBashKnowsFilesOfTheDepot) {
+    home.files().write("home/depot/tool/1.0/in the box:1.tar", "abc");
+    home.files().write("home/depot/other", "");
+    ASSERT_EQ(home.files().path("home/depot"), home.path("depot"));
+    const std::string shown =
+        typed("/bin/bash --norc --noprofile -i",
+              "source " + script("zavctl.bash") + "\nzavctl depot sum to\t1\tin\t\nexit\n");
+    EXPECT_THAT(shown, HasSubstr("zavctl depot sum tool/1.0/in\\ the\\ box:1.tar"));
+    EXPECT_THAT(shown,
+                HasSubstr("ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad"))
+        << "and its sum was told";
 }
 
 TEST_F(CompletionInShells, OfZsh) {

@@ -71,6 +71,7 @@ TEST_F(Interface, HealthSaysWhatThisHostIs) {
         << body;
     EXPECT_NE(body.find(R"(,"subscriptions":2,"guarded":true,"journal":")"), std::string::npos)
         << body;
+    EXPECT_NE(body.find(R"(","alive":true,"reasons":[]})"), std::string::npos) << body;
 }
 
 TEST_F(Interface, RefusesRequestsThatMeanAnotherJournal) {

@@ -78,6 +78,8 @@ TEST(OperationNames, FollowFromMethodAndPath) {
     EXPECT_EQ(operationName(routeOf("GET", "/v1/tasks")), "getTasks");
     EXPECT_EQ(operationName(routeOf("GET", "/v1/tasks/{id}")), "getTask");
     EXPECT_EQ(operationName(routeOf("POST", "/v1/tasks/{id}/cancel")), "postTaskCancel");
+    EXPECT_EQ(operationName(routeOf("POST", "/v1/tasks/{id}/try-again")), "postTaskTryAgain");
+    EXPECT_EQ(operationName(routeOf("POST", "/v1/batches/{id}/orders")), "postBatchOrders");
     EXPECT_EQ(operationName(routeOf("DELETE", "/v1/depot")), "deleteDepot");
     EXPECT_EQ(operationName(routeOf("GET", "/v1/things.json")), "getThings");
 }
@@ -141,6 +143,14 @@ TEST(Description, TellsAnswersAndWhatTheyReferTo) {
               "#/components/schemas/Thing");
     EXPECT_EQ(keysOf(document["components"]["schemas"]),
               (std::set<std::string>{"Error", "Place", "Thing"}));
+}
+
+TEST(Description, TellsOfWhatKindAnAnswerIsThatIsNoDocument) {
+    Route route = routeOf("GET", "/v1/a");
+    route.answers = {{200, "text", nullptr}, {206, "bytes", nullptr, {}, "application/x"}};
+    const Json answers = described({route})["paths"]["/v1/a"]["get"]["responses"];
+    EXPECT_EQ(keysOf(answers["200"]["content"]), std::set<std::string>{"text/plain"});
+    EXPECT_EQ(keysOf(answers["206"]["content"]), std::set<std::string>{"application/x"});
 }
 
 TEST(Description, TellsTheEventsOfAStream) {

@@ -178,4 +178,24 @@ TEST_F(HomeChecks, UsersOfTheRunAsDatabaseWhoDoNotExistAreNamed) {
                   "names users who do not exist here: -c id, no-such-&, no-such-user;");
 }
 
+TEST_F(HomeChecks, AListOfUsersUnderAnotherHostsNameIsNamedWhereThereIsNoOwnOne) {
+    expectFinding("run-as", Verdict::Ok, "does not exist; every agent runs as the host's user");
+    const std::string users =
+        "<runas><agent><productCode>ux</productCode><instance><name/><user>daemon</user></instance>"
+        "</agent></runas>";
+    const std::string before = scratch.write("home/config/before0_zavrunas.cfg", users);
+    expectFinding("run-as", Verdict::Warning,
+                  "so every agent runs as the host's user; there is " + before);
+    const std::string broken = scratch.write("home/config/before1_zavrunas.cfg", "<runas>");
+    expectFinding("run-as", Verdict::Warning, broken);
+    scratch.write(runAsFile(), "<runas>\n</runas>\n");
+    expectFinding("run-as", Verdict::Ok, runAsFile());
+}
+
+TEST_F(HomeChecks, AListOfAnotherHostThatNamesNobodyDoesNotMatter) {
+    scratch.write("home/config/before_zavrunas.cfg", "<runas>\n</runas>\n");
+    scratch.write("home/config/before_zavrunas.cfg.saved", "<runas>");
+    expectFinding("run-as", Verdict::Ok, "does not exist");
+}
+
 }  // namespace

@@ -47,6 +47,7 @@ public:
         return false;
     }
     bool entered = false;
+    bool connected = false;
     bool notExecuted = false;
 
 private:
@@ -57,7 +58,8 @@ private:
         if (text.substr(0, trace::kNotExecuted.size()) == trace::kNotExecuted) {
             return notExecuted = true;
         }
-        return text == "Calling execvp";
+        if (text == trace::kConnected) return connected = true;
+        return false;
     }
 
     mutable std::mutex lock_;
@@ -115,6 +117,7 @@ TEST(TraceTexts, AreThoseOfThePlugin) {
     EXPECT_TRUE(lines.heard(trace::kInventoryUnit, trace::kNoInventory));
     if (kVforkSharesMemory) {
         EXPECT_TRUE(lines.entered);
+        EXPECT_TRUE(lines.connected);
         EXPECT_TRUE(lines.notExecuted);
     }
 }

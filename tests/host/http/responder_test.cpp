@@ -155,6 +155,40 @@ TEST_F(Answers, MayComeLaterAfterAJob) {
     EXPECT_EQ(client.readAnswer().body, "late");
 }
 
+TEST_F(Answers, ThatNobodyWaitsForAnyMoreAreNotMade) {
+    std::promise<void> gone;
+    handler.answer = [&](const http::Request&) {
+        http::Later later = keepResponder(seconds(60), inTime);
+        later.onGone = [&] { gone.set_value(); };
+        return http::Answer(std::move(later));
+    };
+    {
+        RawClient client = connect();
+        client.send("GET /later HTTP/1.1\r\n\r\n");
+        responder.get_future().wait();
+    }
+    EXPECT_EQ(gone.get_future().wait_for(seconds(60)), std::future_status::ready);
+    EXPECT_TRUE(eventually([&] { return counts.connections.value() == 0; }));
+}
+
+TEST_F(Answers, ComeToClientsThatAskForMoreMeanwhile) {
+    std::atomic<bool> hasGone{false};
+    handler.answer = [&](const http::Request&) {
+        http::Later later = keepResponder(seconds(60), inTime);
+        later.onGone = [&] { hasGone = true; };
+        return http::Answer(std::move(later));
+    };
+    RawClient client = connect();
+    client.send("GET /later HTTP/1.1\r\n\r\n");
+    const http::Responder respond = responder.get_future().get();
+    client.send("GET /alive HTTP/1.1\r\n\r\n");
+    EXPECT_EQ(aliveness(), "alive");
+    respond(http::Reply{200, "late"});
+    EXPECT_EQ(client.readAnswer().body, "late");
+    EXPECT_EQ(client.readAnswer().body, "alive");
+    EXPECT_FALSE(hasGone);
+}
+
 TEST_F(Answers, ThatDoNotComeInTimeAreMadeAtTheLimit) {
     handler.answer = [&](const http::Request&) {
         return http::Answer(keepResponder(milliseconds(20), inTime));

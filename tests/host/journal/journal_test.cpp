@@ -201,6 +201,96 @@ TEST_F(Journals, KeepWhatRanAtOnceWithoutACommitOfItsOwn) {
     EXPECT_EQ(stateOf("t1"), TaskState::Done);
 }
 
+TEST_F(Journals, TellThatATaskHasBegunBeforeItIsWritten) {
+    open();
+    Task task = entered("t1");
+    entered("t2");
+    task.run = journal->run();
+    journal->handOver(task);
+    const std::uint64_t before = journal->transactions();
+    std::atomic<int> changes{0};
+    journal->whenChanged([&changes] { ++changes; });
+    task.state = TaskState::Running;
+    task.started = host::WallClock::now();
+    journal->saveSoon(task);
+    EXPECT_EQ(changes, 1);
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(journal->notBegun(), 1);
+    const Journal::Unfinished unfinished = journal->unfinished();
+    EXPECT_EQ(unfinished.queued, 1);
+    EXPECT_EQ(unfinished.running, 1);
+    EXPECT_EQ(unfinished.oldestQueued, journal->find("t2")->accepted);
+    const std::vector<Task> running = journal->running();
+    ASSERT_EQ(running.size(), 1U);
+    EXPECT_EQ(running.front().id, task.id);
+    EXPECT_EQ(running.front().started, task.started);
+    EXPECT_EQ(journal->transactions(), before) << "a question costs no commit";
+    journal->save(ended(task));
+    EXPECT_EQ(journal->transactions(), before + 1);
+    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+    EXPECT_TRUE(journal->running().empty());
+    journal->whenChanged({});
+}
+
+TEST_F(Journals, TellThatATaskHasBegunWhileOlderNewsOfItIsWritten) {
+    open();
+    Task task = entered("t1");
+    task.run = journal->run();
+    journal->handOver(task);
+    task.answered = true;
+    journal->saveSoon(task);
+    task.state = TaskState::Running;
+    // It begins while another task's transaction, which takes along what waits, is written.
+    static Journal* beginsIn;
+    static const Task* begins;
+    beginsIn = &*journal;
+    begins = &task;
+    host::commitHook = [](host::CommitStep) {
+        host::commitHook = nullptr;
+        beginsIn->saveSoon(*begins);
+    };
+    entered("t2");
+    EXPECT_TRUE(host::commitHook.load() == nullptr);
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(journal->running().size(), 1U);
+    EXPECT_EQ(journal->unfinished().running, 1);
+}
+
+TEST_F(Journals, TellThatATaskHasBegunThoughTheDiskIsFull) {
+    open();
+    Task task = entered("t1");
+    task.run = journal->run();
+    journal->handOver(task);
+    {
+        const FullDisk full;
+        task.state = TaskState::Running;
+        journal->saveSoon(task);
+        Task other = asked("t2");
+        EXPECT_THROW(journal->enter(other), host::NotKept) << "the beginning was to go with it";
+        EXPECT_EQ(stateOf("t1"), TaskState::Running);
+        EXPECT_EQ(journal->running().size(), 1U);
+    }
+    entered("t3");
+    EXPECT_EQ(stateOf("t1"), TaskState::Running);
+    EXPECT_EQ(journal->running().size(), 1U);
+}
+
+TEST_F(Journals, TellThatAQuerysTaskHasBegunThoughNobodyFindsItYet) {
+    open();
+    Task task = asked("t1", TaskWay::Query);
+    task.run = journal->run();
+    task.answered = false;
+    journal->enter(task);
+    EXPECT_TRUE(journal->running().empty());
+    task.answered = true;
+    task.state = TaskState::Running;
+    journal->saveSoon(task);
+    ASSERT_EQ(journal->running().size(), 1U);
+    EXPECT_EQ(journal->running().front().id, task.id);
+    EXPECT_EQ(stateOf("t1"), TaskState::Running) << "who asks has it written";
+    EXPECT_EQ(journal->running().size(), 1U);
+}
+
 TEST_F(Journals, GiveTheNextInLineInTheOrderOfAcceptance) {
     open();
     const Task first = entered("t1");

@@ -5,7 +5,9 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <fstream>
+#include <thread>
 
 #include "host/journal/commit_step.h"
 #include "host/journal/journal_fixture.h"
@@ -413,6 +415,25 @@ TEST_F(Kills, AfterTheHandOverTheTaskIsInterrupted) {
         task.run = journal->run();
         host::commitHook = hook;
         journal->save(task);
+    });
+    EXPECT_EQ(stateOf("t1"), TaskState::Interrupted);
+}
+
+TEST_F(Kills, OnPurposeAfterTheJournalWasClosedLeaveTheTaskInterrupted) {
+    inAProcessThatIsKilled(nullptr, [this](host::CommitHook) {
+        Task task = entered("t1");
+        task.run = journal->run();
+        journal->save(task);
+        journal->endCleanly(false);
+        journal->close();
+        std::atomic<bool> recorded{false};
+        std::thread executor([&] {
+            journal->saveOutcome({ended(task, TaskState::Failed)}, "row");
+            recorded = true;
+        });
+        executor.detach();
+        std::this_thread::sleep_for(std::chrono::milliseconds(100));
+        ::_exit(recorded ? 0 : 9);
     });
     EXPECT_EQ(stateOf("t1"), TaskState::Interrupted);
 }

@@ -2,6 +2,7 @@
 // Everything that the host knows about the plug-in, compared with the plug-in as it is shipped.
 #include "host/tables/plugin_facts.h"
 
+#include <dlfcn.h>
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -22,6 +23,8 @@
 namespace {
 
 namespace plugin = host::plugin;
+
+constexpr const char* kPlugin = ZAV_BUILD_DIR "/lib/libzavmgmt.so";
 
 /// The plug-in on a home of scripts, started once: it cannot be unloaded, and its executor runs as
 /// long as the process.
@@ -83,7 +86,7 @@ private:
     }
 
     ScriptHome home_;
-    host::Plugin plugin_{std::string(ZAV_BUILD_DIR "/lib/libzavmgmt.so")};
+    host::Plugin plugin_{std::string(kPlugin)};
     std::vector<oxa::Table> tables_;
     std::mutex lock_;
     std::map<std::string, int> outcomes_;
@@ -138,12 +141,28 @@ int retvalOf(const oxa::Rows& rows) {
     return rows.count() == 1 ? host::integerField(retval, host::rowOf(rows, 0)) : -1;
 }
 
+/// Its own list of commands, which it exports.
+std::vector<std::string> commandsOfPlugin() {
+    Started::once();
+    void* const library = ::dlopen(kPlugin, RTLD_NOW | RTLD_NOLOAD);
+    EXPECT_NE(library, nullptr);
+    const auto list = static_cast<std::vector<ZAV::String>**>(::dlsym(library, "commands"));
+    std::vector<std::string> found;
+    EXPECT_NE(list, nullptr);
+    if (list == nullptr) return found;
+    for (const ZAV::String& command : **list)
+        found.push_back(narrow(command));
+    ::dlclose(library);
+    return found;
+}
+
 TEST(PluginFacts, TellQueuedCommandsFromThoseThatRunAtOnce) {
     Started& started = Started::once();
     int atOnce = 0;
-    for (const char* command : {"GETCONFIG", "COMPLETE_INSTALL", "START", "STOP", "RESTART",
-                                "INSTALL", "UNINSTALL", "SETCONFIG", "REMOVEINSTANCE"}) {
-        const std::string transid = std::string("is-") + command;
+    const std::vector<std::string> commands = commandsOfPlugin();
+    EXPECT_EQ(commands.size(), plugin::kQueuedCommands.size() + plugin::kCommandsAtOnce.size());
+    for (const std::string& command : commands) {
+        const std::string transid = "is-" + command;
         const int retval = retvalOf(started.request(command, transid));
         if (plugin::runsAtOnce(command)) {
             ++atOnce;
@@ -151,7 +170,7 @@ TEST(PluginFacts, TellQueuedCommandsFromThoseThatRunAtOnce) {
         }
         EXPECT_EQ(retval, plugin::kAccepted) << command;
         EXPECT_EQ(std::count_if(plugin::kQueuedCommands.begin(), plugin::kQueuedCommands.end(),
-                                [command](const auto& known) { return known.name == command; }),
+                                [&command](const auto& known) { return known.name == command; }),
                   1)
             << command;
         EXPECT_TRUE(eventually([&] { return started.outcomes(transid) == 1; })) << command;

@@ -6,6 +6,7 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -66,7 +67,9 @@ void ManagedHost::start() {
     std::vector<std::string> argv = {zavhostPath(), "--home", home_, "--socket", socket_};
     argv.insert(argv.end(), moreArguments_.begin(), moreArguments_.end());
     Environment environment = environment_;
-    environment.emplace_back("KBB_RAS1_LOG", scratch_.path("trace.log"));
+    const bool saysWhere = std::any_of(environment.begin(), environment.end(),
+                                       [](const auto& one) { return one.first == "KBB_RAS1_LOG"; });
+    if (!saysWhere) environment.emplace_back("KBB_RAS1_LOG", scratch_.path("trace.log"));
     program_ = std::make_unique<Program>(argv, "", environment);
     if (!program_->awaitOutput("ready: " + socket_, std::chrono::seconds(20))) {
         throw std::runtime_error("the host is not ready: " + program_->wait().err);

@@ -28,7 +28,7 @@ public:
     const std::string& socket() const { return socket_; }
     Program& program() { return *program_; }
     pid_t pid() const { return program_->pid(); }
-    /// The trace that the host has written.
+    /// The trace that the host has written, unless its environment says where it is.
     std::string trace() const { return scratch_.read("trace.log"); }
 
     ProgramResult zavctl(const std::vector<std::string>& arguments, const std::string& input = "",

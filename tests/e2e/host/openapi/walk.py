@@ -44,6 +44,8 @@ NOT_SEEN = {
     ("FullText", "complete"),
     ("QueryAnswer", "full"),
     ("Overflow", "lost"),
+    ("Hang", "part"),
+    ("Hang", "text"),
     ("Reason", "part"),
     ("Reason", "text"),
     ("Task", "cancelling"),

@@ -46,4 +46,13 @@ TEST(ProcessTable, ListsThisProcessAndItsChild) {
     EXPECT_GE(entryOf(child.pid())->start, entryOf(::getpid())->start);
 }
 
+TEST(ProcessTable, CountsChildrenThatLive) {
+    const std::size_t before = host::countLivingChildren();
+    Program sleeper({"/bin/sleep", "1000"});
+    EXPECT_EQ(host::countLivingChildren(), before + 1);
+    sleeper.signal(SIGKILL);
+    sleeper.wait();
+    EXPECT_EQ(host::countLivingChildren(), before);
+}
+
 }  // namespace

@@ -1,43 +1,67 @@
-#include "host/process/figures.h"
+#include "metrics/process_figures.h"
 
+#include <dirent.h>
 #include <sys/resource.h>
 #include <unistd.h>
 
-#include <algorithm>
+#include <ctime>
 #include <fstream>
 #include <limits>
+#include <memory>
+#include <sstream>
 #include <string>
-#include <vector>
 
-#include "host/process/children/process_table.h"
-#include "host/process/system/directory_stream.h"
-
-namespace host {
+namespace metrics {
 namespace {
+
+struct CloseDirectory {
+    void operator()(DIR* directory) const { ::closedir(directory); }
+};
 
 double secondsUsed(const timeval& time) {
     return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_usec) / 1e6;
 }
 
-/// Seconds since the epoch at which the machine started.
-std::optional<double> bootTime() {
-    std::ifstream in("/proc/stat");
-    for (std::string line; std::getline(in, line);) {
-        if (line.rfind("btime ", 0) == 0) return std::stod(line.substr(6));
-    }
-    return std::nullopt;
+double secondsOf(clockid_t clock) {
+    timespec time{};
+    ::clock_gettime(clock, &time);
+    return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) / 1e9;
+}
+
+/// Seconds since the epoch at which the machine started. From clocks, because a service that sees
+/// only processes in /proc has no /proc/stat; once, because two clocks never give the same twice.
+double bootTime() {
+    static const double time = secondsOf(CLOCK_REALTIME) - secondsOf(CLOCK_BOOTTIME);
+    return time;
+}
+
+/// When this process started, in clock ticks since boot.
+std::optional<double> startTicks() {
+    std::ifstream in("/proc/self/stat");
+    std::string text;
+    std::getline(in, text);
+    // The second field is the program's name, which may hold blanks and parentheses.
+    const std::size_t nameEnd = text.rfind(')');
+    if (nameEnd == std::string::npos) return std::nullopt;
+    std::istringstream fields(text.substr(nameEnd + 1));
+    constexpr int kFieldsBeforeStart = 19;
+    std::string passed;
+    for (int i = 0; i < kFieldsBeforeStart; ++i)
+        fields >> passed;
+    double ticks = 0;
+    if (!(fields >> ticks)) return std::nullopt;
+    return ticks;
 }
 
 std::optional<double> startTime() {
-    const std::optional<ProcessEntry> self = readProcess(::getpid());
-    const std::optional<double> boot = bootTime();
+    const std::optional<double> started = startTicks();
     const long ticks = ::sysconf(_SC_CLK_TCK);
-    if (!self || !boot || ticks <= 0) return std::nullopt;
-    return *boot + static_cast<double>(self->start) / static_cast<double>(ticks);
+    if (!started || ticks <= 0) return std::nullopt;
+    return bootTime() + *started / static_cast<double>(ticks);
 }
 
 std::optional<double> countEntries(const char* directory) {
-    const DirectoryStream open(::opendir(directory));
+    const std::unique_ptr<DIR, CloseDirectory> open(::opendir(directory));
     if (!open) return std::nullopt;
     double count = 0;
     while (const dirent* const entry = ::readdir(open.get())) {
@@ -67,14 +91,6 @@ void readDescriptors(ProcessFigures& figures) {
                                   : static_cast<double>(limit.rlim_cur);
 }
 
-double livingChildren() {
-    const pid_t self = ::getpid();
-    const std::vector<ProcessEntry> processes = readProcesses();
-    return static_cast<double>(std::count_if(
-        processes.begin(), processes.end(),
-        [self](const ProcessEntry& process) { return process.parent == self && process.isAlive; }));
-}
-
 }  // namespace
 
 ProcessFigures readProcessFigures() {
@@ -87,8 +103,7 @@ ProcessFigures readProcessFigures() {
     readMemory(figures);
     readDescriptors(figures);
     figures.threads = countEntries("/proc/self/task");
-    figures.children = livingChildren();
     return figures;
 }
 
-}  // namespace host
+}  // namespace metrics

@@ -3,7 +3,7 @@
 
 #include <optional>
 
-namespace host {
+namespace metrics {
 
 /// Absent where the system does not say.
 struct ProcessFigures {
@@ -14,10 +14,9 @@ struct ProcessFigures {
     std::optional<double> openDescriptors;
     std::optional<double> mostDescriptors;  ///< that it may have open
     std::optional<double> threads;
-    std::optional<double> children;  ///< that live; processes that it has adopted are among them
 };
 
 /// Reads them from /proc. Any thread; some milliseconds.
 ProcessFigures readProcessFigures();
 
-}  // namespace host
+}  // namespace metrics
