@@ -56,7 +56,7 @@ public:
     /// The same; null when the host has nothing there (404), as one that does not know the path.
     nlohmann::json getIfThere(const std::string& target, Deadline deadline) const;
 
-    /// The answer to a GET, also when it is none that get() would return.
+    /// The answer to a GET, also when it is not one that get() would return.
     Answer ask(const std::string& target, Deadline deadline, const Ticker& tick = {}) const;
 
     /// The answer to a POST of a document; of nothing if it is null. Throws BrokenConnection when

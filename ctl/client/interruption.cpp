@@ -67,8 +67,8 @@ InterruptNote::InterruptNote(std::string err, std::string out) {
         struct sigaction action {};
         action.sa_handler = endInterrupted;
         ::sigaction(SIGINT, &action, &before);
-        // Somebody who starts the program with SIGINT ignored, as a shell does in the background,
-        // wants it so.
+        // A SIGINT that was ignored when the program started stays ignored: a shell does that for
+        // a command in the background.
         if (before.sa_handler == SIG_IGN) ::sigaction(SIGINT, &before, nullptr);
     });
 }

@@ -7,7 +7,7 @@
 
 namespace ctl {
 
-/// What output for people fits.
+/// The width that output for people fits into.
 constexpr std::size_t kColumns = 80;
 
 /// Places that a text takes on a terminal: characters, not bytes, and none for colours.

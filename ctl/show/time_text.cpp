@@ -31,7 +31,13 @@ std::optional<WallTime> parseTime(const std::string& text) {
         fraction.empty() || (fraction.size() > 1 && fraction[0] == '.' &&
                              fraction.find_first_not_of("0123456789", 1) == std::string::npos);
     if (!isFraction) return std::nullopt;
-    return std::chrono::system_clock::from_time_t(::timegm(&parts));
+    // Where the clock's own numbers end; a host may say anything.
+    constexpr int kFirstYear = 1700;
+    constexpr int kLastYear = 2250;
+    const int year = parts.tm_year + 1900;
+    const std::time_t seconds = ::timegm(&parts);
+    if (year < kFirstYear || year > kLastYear || seconds == -1) return std::nullopt;
+    return std::chrono::system_clock::from_time_t(seconds);
 }
 
 std::string spanText(std::chrono::seconds span) {

@@ -8,5 +8,7 @@ if ! command -v promtool >/dev/null; then
     echo "promtool, of the package prometheus, is not installed"
     exit 77
 fi
-promtool check rules zavhost.rules.yml
-promtool test rules zavhost.rules_test.yml
+for program in zavhost fleet; do
+    promtool check rules "$program.rules.yml"
+    promtool test rules "${program}.rules_test.yml"
+done

@@ -24,9 +24,9 @@ std::set<std::string> namesIn(const std::string& text, const std::regex& form) {
     return names;
 }
 
-/// Metrics that an expression may name, those that histograms consist of among them.
-std::set<std::string> documented() {
-    const std::string page = contentOf("docs/metrics.md");
+/// Metrics of a page that an expression may name, those that histograms consist of among them.
+std::set<std::string> documentedIn(const std::string& file) {
+    const std::string page = contentOf(file);
     std::set<std::string> names = namesIn(page, std::regex("\\n\\| `([a-z_]+)`"));
     for (const std::string& histogram : namesIn(page, std::regex("`([a-z_]+)` \\| histogram"))) {
         for (const char* const part : {"_bucket", "_sum", "_count"})
@@ -35,23 +35,19 @@ std::set<std::string> documented() {
     return names;
 }
 
-void expectDocumented(const std::string& file) {
-    const std::set<std::string> known = documented();
+void expectDocumented(const std::string& file, const std::string& page) {
+    const std::set<std::string> known = documentedIn(page);
     const std::set<std::string> used =
-        namesIn(contentOf(file), std::regex("\\b((?:zavhost|process)_[a-z_]+)"));
+        namesIn(contentOf(file), std::regex("\\b((?:zavhost|zavfleetd|zavlink|process)_[a-z_]+)"));
     EXPECT_GE(used.size(), 8U);
     for (const std::string& name : used)
         EXPECT_EQ(known.count(name), 1U) << file << " uses " << name;
 }
 
-TEST(AlertRules, UseMetricsThatThereAre) {
-    expectDocumented("contrib/prometheus/zavhost.rules.yml");
-}
-
-TEST(AlertRules, HaveACaseEach) {
-    const auto alerts =
-        namesIn(contentOf("contrib/prometheus/zavhost.rules.yml"), std::regex("- alert: (\\w+)"));
-    const std::string cases = contentOf("contrib/prometheus/zavhost.rules_test.yml");
+void expectACaseEach(const std::string& rules) {
+    const std::string folder = "contrib/prometheus/" + rules;
+    const auto alerts = namesIn(contentOf(folder + ".rules.yml"), std::regex("- alert: (\\w+)"));
+    const std::string cases = contentOf(folder + ".rules_test.yml");
     EXPECT_GE(alerts.size(), 5U);
     for (const std::string& alert : alerts) {
         EXPECT_NE(cases.find("alertname: " + alert + "\n        exp_alerts:"), std::string::npos)
@@ -59,8 +55,18 @@ TEST(AlertRules, HaveACaseEach) {
     }
 }
 
+TEST(AlertRules, UseMetricsThatThereAre) {
+    expectDocumented("contrib/prometheus/zavhost.rules.yml", "docs/metrics.md");
+    expectDocumented("contrib/prometheus/fleet.rules.yml", "docs/fleet-metrics.md");
+}
+
+TEST(AlertRules, HaveACaseEach) {
+    expectACaseEach("zavhost");
+    expectACaseEach("fleet");
+}
+
 TEST(Dashboard, UsesMetricsThatThereAre) {
-    expectDocumented("contrib/grafana/zavhost.json");
+    expectDocumented("contrib/grafana/zavhost.json", "docs/metrics.md");
 }
 
 TEST(Dashboard, IsADocumentWithPanelsThatDoNotOverlap) {

@@ -82,6 +82,11 @@ within zavctl doctor >"$root/tmp/doctor" || {
     cat "$root/tmp/doctor" >&2
     fail "doctor has found an error"
 }
+# The engine runs it again and again.
+health=$(sed -n 's/^HEALTHCHECK .*CMD \[\(.*\)\]$/\1/p' packaging/container/Containerfile | tr -d '",')
+[ -n "$health" ] || fail "the image has no health check"
+# shellcheck disable=SC2086
+within $health >/dev/null || fail "the health check fails"
 within zavctl start ux >/dev/null || fail "the agent does not start"
 agent_runs || fail "the agent is not seen to run"
 
@@ -95,6 +100,7 @@ until_true no_zombie || fail "somebody is left who has ended"
 
 say "ends when it is told to, and goes on where it was"
 stop_container
+! says " processes have not ended" || fail "the agent was killed"
 start_container
 agent_runs || fail "the agent that ran does not run again"
 within zavctl --json tasks >"$root/tmp/tasks"

@@ -1,6 +1,6 @@
 #!/bin/sh
 # The life of the packages on a machine, as the first process of a root file system that has their
-# dependencies and nothing else: installed, used, upgraded while tasks wait, not downgraded below the
+# dependencies, man-db and bash-completion, and nothing else: installed, used, upgraded while tasks wait, not downgraded below the
 # journal, removed, installed again and purged.
 #
 #   packages_life.sh FOLDER      FOLDER holds new, before (a lower version), older (a lower version that does
@@ -103,6 +103,31 @@ as zavmgmt >/tmp/member
 holds /tmp/member '"act"'
 as nogroup >/tmp/stranger
 ! grep -qF '"access"' /tmp/stranger || fail "the host serves everybody"
+
+say "shows its manual pages"
+# page SECTION NAME: as somebody reads it, without the marks for bold letters.
+page() {
+    man -P cat "$1" "$2" 2>/tmp/man.err | sed 's/.\x08//g' >/tmp/page || true
+    [ -s /tmp/page ] || fail "there is no manual page $2($1): $(cat /tmp/man.err)"
+}
+page 1 zavctl
+holds /tmp/page "SYNOPSIS"
+page 1 zavctl-install
+page 8 zavhost
+holds /tmp/page "zavhost.conf"
+page 5 zavhost.conf
+page 7 zavmgmt
+
+say "completes command lines"
+# typed KEYS: what a terminal shows in which they are typed into a shell that has read what bash reads.
+typed() {
+    printf '%s\nexit\n' "$1" | TERM=dumb HISTFILE='' script -qec "bash --noprofile --rcfile /usr/share/bash-completion/bash_completion -i" \
+        /dev/null >/tmp/typed
+}
+tab=$(printf '\t')
+typed "zavctl agen$tab--pro${tab}u${tab}x"
+holds /tmp/typed "zavctl agents --product u"
+holds /tmp/typed "Monitoring agent"
 
 say "deploys an agent"
 zavctl uninstall "$agent" >/dev/null

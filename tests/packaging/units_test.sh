@@ -84,6 +84,18 @@ done
 expect "$units/zavlink.service" SupplementaryGroups \
     "$(sed -n 's/^group = "\(.*\)"/\1/p' "$units/zavhost.conf")"
 
+# What brings the metrics to the node exporter runs as that one's user, and the host lets it read only.
+metrics=$units/../../contrib/prometheus
+sed "s|^ExecStart=.*|ExecStart=/bin/true|" "$metrics/zavhost-metrics.service" >"$scratch/zavhost-metrics.service"
+cp "$metrics/zavhost-metrics.timer" "$scratch"
+said=$(systemd-analyze verify --man=no "$scratch/zavhost-metrics.service" "$scratch/zavhost-metrics.timer" 2>&1) ||
+    fail "systemd-analyze: $said"
+case $said in
+*"$scratch"*) fail "systemd-analyze: $said" ;;
+esac
+grep -qF "$(sed -n 's/^socket = "\(.*\)"/\1/p' "$units/zavhost.conf")}" "$metrics/zavhost-metrics" ||
+    fail "zavhost-metrics looks for another socket than the service's"
+
 # How much of the system is open to the service is what the page says, by the count of this version.
 case $(systemd-analyze --version) in
 "systemd 252"*)

@@ -308,6 +308,14 @@ class Instances(TypedDict):
     instances: list[Instance]
 
 
+class Hang(TypedDict):
+    """Why a host only seems to be alive."""
+    #: what hangs
+    part: Literal["command", "journal"]
+    #: a sentence
+    text: str
+
+
 class Health(TypedDict):
     """What a host says about itself."""
     #: the product's version
@@ -326,6 +334,10 @@ class Health(TypedDict):
     guarded: bool
     #: the identity of the journal
     journal: str
+    #: whether nothing hangs; if false, a watchdog would end the host
+    alive: bool
+    #: why it is not alive; empty if it is
+    reasons: list[Hang]
 
 
 class Reason(TypedDict):
@@ -366,7 +378,7 @@ class Description(TypedDict):
     openapi: str
     #: what is described, and its version
     info: dict[str, Any]
-    #: where the host is
+    #: where it is
     servers: list[dict[str, Any]]
     #: the requests by their paths
     paths: dict[str, Any]

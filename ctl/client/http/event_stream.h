@@ -32,6 +32,9 @@ public:
     /// TimedOut the stream is closed.
     Result next(Deadline deadline, ServerEvent& event, const Ticker& tick = {});
 
+    /// Whether next() has an event without waiting for the host.
+    bool hasNext() const { return !pending_.empty(); }
+
     /// The identifier to continue behind: that of the last event that next() gave, or of the
     /// stream's beginning. Empty when the host gives none.
     const std::string& position() const { return position_; }

@@ -14,7 +14,7 @@ namespace {
 using Wait = JournalTask::Wait;
 using End = TaskResult::End;
 
-json memberOf(const json& record, const char* name, json otherwise) {
+json memberOf(const json& record, const char* name, const json& otherwise) {
     const auto found = record.find(name);
     return found != record.end() && found->type() == otherwise.type() ? *found : otherwise;
 }

@@ -47,7 +47,7 @@ Interruption::Interruption() {
     sigemptyset(&action.sa_mask);
     for (std::size_t i = 0; i < kSignals.size(); ++i) {
         ::sigaction(kSignals[i], nullptr, &formerActions[i]);
-        // Who started the program with a signal ignored wants it so.
+        // A signal that was ignored when the program started stays ignored.
         if (formerActions[i].sa_handler != SIG_IGN) ::sigaction(kSignals[i], &action, nullptr);
     }
 }

@@ -25,7 +25,7 @@ struct PushCheck {
 /// and when a file cannot be read.
 PushCheck checkPush(const HostAddress& host, std::vector<PushedFile>& files);
 
-/// Asks again about the files that were not taken although nothing stood against them before.
+/// Asks again about files that were refused although the first check had found nothing wrong.
 void explainRefusals(const HostAddress& host, std::vector<PushedFile>& files);
 
 }  // namespace ctl

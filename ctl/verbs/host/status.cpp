@@ -3,6 +3,7 @@
 #include <chrono>
 #include <cstdint>
 #include <nlohmann/json.hpp>
+#include <string>
 
 #include "ctl/client/host_client.h"
 #include "ctl/show/table.h"
@@ -15,8 +16,23 @@ using nlohmann::json;
 namespace ctl {
 namespace {
 
-/// The document for people: how long the host has been there, in place of its seconds.
+/// Empty if there are none.
+std::string textsOf(const json& reasons) {
+    std::string texts;
+    for (const json& reason : reasons) {
+        const auto text = reason.is_object() ? reason.find("text") : reason.end();
+        if (text == reason.end() || !text->is_string()) continue;
+        texts += (texts.empty() ? "" : "; ") + text->get<std::string>();
+    }
+    return texts;
+}
+
+/// The document for people: how long the host has been there, in place of its seconds, and why it
+/// is not alive, as one text.
 json readable(json health) {
+    const std::string reasons = textsOf(health.value("reasons", json::array()));
+    health.erase("reasons");
+    if (!reasons.empty()) health["reasons"] = reasons;
     const auto uptime = health.find("uptime_seconds");
     if (uptime == health.end() || !uptime->is_number_integer()) return health;
     const std::chrono::seconds span(uptime->get<std::int64_t>());

@@ -150,6 +150,12 @@ TEST(HostClient, DoesNotReadAnAnswerBeyondItsLimits) {
     });
     EXPECT_EQ(huge, std::make_pair(int{ctl::kNoHost},
                                    std::string("the host's answer is larger than 64 MiB")));
+    const auto begun = failureOfQuery([](const Peer& peer) {
+        peer.request();
+        peer.send(
+            "HTTP/1.1 409 Conflict\r\nContent-Length: 7770252850764915\r\n\r\n{\"error\": 1}");
+    });
+    EXPECT_EQ(begun, huge) << "its body begins in the piece of its head";
 }
 
 TEST(HostClient, MendsAValueThatIsNoValidUtf8) {

@@ -35,6 +35,13 @@ TEST_F(TimeText, ThatIsNoneStaysAsItIs) {
     EXPECT_EQ(ctl::timeText("soon\x1b", {}), "soon\\x1B");
 }
 
+TEST_F(TimeText, OfAYearBeyondTheClockStaysAsItIs) {
+    for (const char* text : {"9999-12-31T23:59:59Z", "2262-06-01T00:00:00Z", "0001-01-01T00:00:00Z"}) {
+        EXPECT_FALSE(ctl::parseTime(text)) << text;
+        EXPECT_EQ(ctl::timeText(text, {}), text);
+    }
+}
+
 TEST(SpanText, IsTheLargestUnit) {
     EXPECT_EQ(ctl::spanText(seconds(-3)), "0 s");
     EXPECT_EQ(ctl::spanText(seconds(59)), "59 s");
