@@ -22,7 +22,7 @@ struct Trust {
     std::vector<std::string> centres;  ///< the centre's signing keys: there may be a newer one
 };
 
-/// Whether a selector means this host, by its own labels. Throws MessageError if it is none.
+/// Whether a selector means this host, by its own labels. Throws MessageError if it is not one.
 bool isMeant(const std::string& selector, const Trust& trust);
 
 /// The order that has this number; nothing if the centre has not signed that, which is dropped and

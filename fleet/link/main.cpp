@@ -1,20 +1,17 @@
 // zavlink: connects the host on this machine to its fleet.
 
-#include <pthread.h>
-
-#include <csignal>
 #include <cstdio>
 #include <exception>
 #include <iostream>
 #include <optional>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "fleet/files/files.h"
 #include "fleet/link/enrol/enrol_command.h"
 #include "fleet/link/program/link_program.h"
 #include "fleet/log/log.h"
+#include "fleet/loop/end_signals.h"
 
 namespace fleet {
 namespace {
@@ -56,40 +53,15 @@ std::optional<Wish> wishOf(int argc, char** argv) {
     return wish;
 }
 
-/// Blocked in all threads, so that one thread waits for them.
-sigset_t blockSignals() {
-    ::signal(SIGPIPE, SIG_IGN);
-    sigset_t signals;
-    ::sigemptyset(&signals);
-    ::sigaddset(&signals, SIGTERM);
-    ::sigaddset(&signals, SIGINT);
-    ::pthread_sigmask(SIG_BLOCK, &signals, nullptr);
-    return signals;
-}
-
 int run(const std::string& file) {
-    const sigset_t signals = blockSignals();
+    const EndSignals signals;
     const LinkConfiguration configuration =
         parseLinkConfiguration(readFile(file, Secrecy::Public), file);
     LinkProgram program(configuration);
-    std::thread waiter([&program, &signals] {
-        int signal = 0;
-        ::sigwait(&signals, &signal);
-        program.end();
-    });
+    const EndWaiter waiter(signals, [&program] { program.end(); });
     std::printf("ready: %s\n", program.host().c_str());
     std::fflush(stdout);
-    LinkProgram::End end = LinkProgram::End::Asked;
-    try {
-        end = program.run();
-    } catch (...) {
-        ::pthread_kill(waiter.native_handle(), SIGTERM);
-        waiter.join();
-        throw;
-    }
-    if (end == LinkProgram::End::Stopped) ::pthread_kill(waiter.native_handle(), SIGTERM);
-    waiter.join();
-    return end == LinkProgram::End::Stopped ? kMustNotRun : 0;
+    return program.run() == LinkProgram::End::Stopped ? kMustNotRun : 0;
 }
 
 }  // namespace

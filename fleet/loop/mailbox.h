@@ -17,6 +17,12 @@ public:
     using Letter = std::function<void()>;
     using Clock = std::chrono::steady_clock;
 
+    Mailbox() = default;
+    /// `onLetter` is called after each letter that was put in, by the thread that has done so. It
+    /// must return soon and throw nothing. For a loop that empties many mailboxes and so can wait
+    /// at none.
+    explicit Mailbox(std::function<void()> onLetter) : onLetter_(std::move(onLetter)) {}
+
     void put(Letter letter) {
         {
             const std::lock_guard lock(mutex_);
@@ -24,6 +30,7 @@ public:
             letters_.push_back(std::move(letter));
         }
         changed_.notify_one();
+        if (onLetter_) onLetter_();
     }
 
     /// Drops what is in it, and all that is put in from now on.
@@ -48,6 +55,7 @@ public:
     }
 
 private:
+    const std::function<void()> onLetter_;
     std::mutex mutex_;
     std::condition_variable changed_;
     std::deque<Letter> letters_;

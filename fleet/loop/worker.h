@@ -10,21 +10,24 @@
 
 namespace fleet {
 
-/// Jobs run in the order in which they were given, by any thread. A job may throw nothing.
+/// Jobs run in the order in which they were given, by any thread. A job may throw nothing. The
+/// thread comes with the first job: many a worker never gets one.
 class Worker {
 public:
     using Job = std::function<void()>;
 
-    Worker() : thread_([this] { work(); }) {}
+    Worker() = default;
     /// Waits for the job that runs; those behind it are dropped.
     ~Worker() { await(); }
     Worker(const Worker&) = delete;
     Worker& operator=(const Worker&) = delete;
 
+    /// Throws std::system_error if it is the first job and the system has no thread for it.
     void add(Job job) {
         {
             const std::lock_guard lock(mutex_);
             if (isEnding_) return;
+            if (!thread_.joinable()) thread_ = std::thread([this] { work(); });
             jobs_.push_back(std::move(job));
         }
         changed_.notify_all();

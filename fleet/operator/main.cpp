@@ -1,5 +1,6 @@
 // zavctl-fleet: the part of zavctl that manages many hosts. zavctl runs it.
 
+#include <algorithm>
 #include <csignal>
 #include <exception>
 #include <string>
@@ -7,6 +8,7 @@
 
 #include "ctl/client/failure.h"
 #include "ctl/command_line.h"
+#include "ctl/completion/completion.h"
 #include "ctl/show/page.h"
 #include "ctl/show/standard_streams.h"
 #include "ctl/show/terminal.h"
@@ -20,6 +22,7 @@
 #include "fleet/operator/verbs/fleet_arguments.h"
 #include "fleet/operator/verbs/fleet_verbs.h"
 #include "fleet/operator/verbs/many_hosts.h"
+#include "fleet/operator/verbs/one_hosts_verbs.h"
 
 namespace {
 
@@ -46,7 +49,21 @@ ctl::ExitStatus runWithFailures(const ctl::CommandLine& line, ctl::Format format
     }
 }
 
+/// Of a line that is not taken apart.
+ctl::Format formatAskedFor(const std::vector<std::string>& words) {
+    const bool isJson = std::find(words.begin(), words.end(), ctl::kJson.name) != words.end();
+    return isJson ? ctl::Format::Json : ctl::Format::Text;
+}
+
 ctl::ExitStatus run(const std::vector<std::string>& words) {
+    if (!words.empty() && words.front() == ctl::kCompletionWord) {
+        const std::vector<std::string> line(words.begin() + 1, words.end());
+        return ctl::print(
+            {ctl::completionBy(fleet::fleetVocabulary(), line), {}, ctl::kSuccess, true});
+    }
+    if (const auto refusal = fleet::refusalOfOneHostsVerb(words)) {
+        return ctl::print(ctl::failurePage(*refusal, formatAskedFor(words)));
+    }
     const ctl::CommandLine line = ctl::parseCommandLine(words, fleet::fleetVocabulary());
     const ctl::Format format = line.verb == nullptr ? ctl::Format::Text : ctl::formatOf(line.given);
     ctl::lookAtTerminals(line.verb != nullptr && format == ctl::Format::Text);

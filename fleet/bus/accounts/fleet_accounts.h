@@ -1,8 +1,8 @@
 /// The accounts of a fleet on its bus, and who may do what there.
 ///
-/// The centre's account has all streams. The hosts' account has none: it sees of the centre's
-/// account what that exports, and each host of that what bears its own key. The server's own
-/// account manages the other two.
+/// The centre's account has all streams. The hosts' account has none: it sees what the
+/// centre's account exports, and of that each host sees only what bears its own key. The server's
+/// own account manages the other two.
 #pragma once
 
 #include <map>

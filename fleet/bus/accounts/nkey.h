@@ -24,7 +24,7 @@ bool isPublicKey(std::string_view text, KeyKind kind);
 /// bytes.
 bool isSignedBy(std::string_view publicKey, std::string_view bytes, std::string_view signature);
 
-/// The 32 bytes of a public key of any kind; nothing if it is none.
+/// The 32 bytes of a public key of any kind; nothing if it is not one.
 std::optional<std::string> bytesOfPublicKey(std::string_view publicKey);
 
 /// A key pair. Its secret is wiped when the object ends. Const operations may run in any thread.
@@ -33,7 +33,7 @@ public:
     /// A new one from the system's source of randomness. Throws std::runtime_error if the library
     /// of cryptography cannot be used.
     static KeyPair make(KeyKind kind);
-    /// That of a seed ("SU...", "SA...", "SO..."); nothing if it is none.
+    /// That of a seed ("SU...", "SA...", "SO..."); nothing if it is not one.
     static std::optional<KeyPair> ofSeed(std::string_view seed);
 
     KeyPair(const KeyPair&) = default;

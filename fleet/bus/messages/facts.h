@@ -34,7 +34,7 @@ struct Facts {
 bool saySame(const Facts& a, const Facts& b);
 
 /// The bus takes 64 KiB a message, its headers included.
-constexpr std::size_t kMostFactsBytes = 63 * 1024;
+constexpr std::size_t kMostFactsBytes = std::size_t{63} * 1024;
 
 /// Signed by the link's key. What is longer than kMostFactsBytes no centre takes.
 std::string signFacts(const Facts& facts, const KeyPair& key);

@@ -144,8 +144,8 @@ Outcome readOutcome(std::string_view bytes, const std::string& host, std::string
     outcome.host = host;
     outcome.number = numberIn(document, "n");
     outcome.order = orderIn(document);
-    outcome.journal = textIn(document, "journal");
-    outcome.state = textIn(document, "state");
+    outcome.journal = shortTextIn(document, "journal", kLongestName);
+    outcome.state = shortTextIn(document, "state", kLongestName);
     const std::string_view task = partsOf(bytes)->carried;
     if (!task.empty()) readDocument(task);
     outcome.task = task;

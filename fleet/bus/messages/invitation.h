@@ -21,7 +21,7 @@ struct Invitation {
 /// As one word of letters, digits, "-" and "_".
 std::string invitationText(const Invitation& invitation);
 
-/// Throws MessageError if it is none. Blanks and line ends around it do not matter.
+/// Throws MessageError if it is not one. Blanks and line ends around it do not matter.
 Invitation readInvitation(std::string_view text);
 
 /// A token that nobody can guess: 128 random bits.

@@ -23,6 +23,12 @@ constexpr Moment kLongestQuestion{60 * 1000};
 constexpr const char* kAsksTasks = "TASKS";
 /// A configuration: body "product" and "target".
 constexpr const char* kAsksConfiguration = "GETCONFIG";
+/// What a task's commands write: body "task", "follow", and of who asks again "stream", the
+/// identifier of the question that has begun it, and "after", the position behind which it would go
+/// on if it had to begin anew. See output_news.h for the pieces of the answer.
+constexpr const char* kAsksOutput = "OUTPUT";
+/// What the host's checks of its home and machine find.
+constexpr const char* kAsksDoctor = "DOCTOR";
 
 /// Signs a question and adds the operator's certificate.
 std::string signQuestion(const Order& question, const KeyPair& key, std::string_view certificate);
@@ -39,7 +45,7 @@ struct AnswerPiece {
 };
 
 /// Of a piece before it is sealed.
-constexpr std::size_t kMostPieceBytes = 128 * 1024;
+constexpr std::size_t kMostPieceBytes = std::size_t{128} * 1024;
 
 /// Signed by the link's key.
 std::string signAnswer(const AnswerPiece& piece, const KeyPair& key);

@@ -1,6 +1,7 @@
 #include "fleet/bus/nats/api.h"
 
 #include <nlohmann/json.hpp>
+#include <utility>
 
 namespace fleet {
 
@@ -21,11 +22,33 @@ ApiAnswer judged(Connection::Reply reply) {
             ""};
 }
 
+std::vector<ApiAnswer> allJudged(std::vector<Connection::Reply> replies) {
+    std::vector<ApiAnswer> answers;
+    for (Connection::Reply& reply : replies)
+        answers.push_back(judged(std::move(reply)));
+    return answers;
+}
+
 }  // namespace
 
 ApiAnswer askStore(Connection& connection, const std::string& call, const std::string& json,
                    Connection::Milliseconds deadline) {
     return judged(connection.request("$JS.API." + call, json, deadline));
+}
+
+std::vector<ApiAnswer> askStore(Connection& connection, const std::string& call,
+                                const std::vector<std::string>& jsons,
+                                Connection::Milliseconds deadline) {
+    std::vector<Connection::Request> requests;
+    for (const std::string& json : jsons)
+        requests.push_back({"$JS.API." + call, json, {}});
+    return allJudged(connection.requestAll(requests, deadline));
+}
+
+std::vector<ApiAnswer> publishToStore(Connection& connection,
+                                      const std::vector<Connection::Request>& messages,
+                                      Connection::Milliseconds deadline) {
+    return allJudged(connection.requestAll(messages, deadline));
 }
 
 ApiAnswer publishToStore(Connection& connection, const std::string& subject, std::string_view bytes,

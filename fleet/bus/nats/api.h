@@ -6,6 +6,8 @@
 #pragma once
 
 #include <string>
+#include <string_view>
+#include <vector>
 
 #include "fleet/bus/nats/connection.h"
 #include "fleet/bus/nats/status.h"
@@ -20,6 +22,17 @@ struct ApiAnswer {
 /// Asks the store, for example "STREAM.INFO.TASKS". Waits for the answer.
 ApiAnswer askStore(Connection& connection, const std::string& call, const std::string& json,
                    Connection::Milliseconds deadline);
+
+/// The same for several questions at once. Answers in the order of the questions.
+std::vector<ApiAnswer> askStore(Connection& connection, const std::string& call,
+                                const std::vector<std::string>& jsons,
+                                Connection::Milliseconds deadline);
+
+/// Publishes where streams listen and waits until they have stored the messages, all of them at
+/// once. Answers in the order of the messages.
+std::vector<ApiAnswer> publishToStore(Connection& connection,
+                                      const std::vector<Connection::Request>& messages,
+                                      Connection::Milliseconds deadline);
 
 /// Publishes where a stream listens and waits until it has stored the message.
 ApiAnswer publishToStore(Connection& connection, const std::string& subject, std::string_view bytes,

@@ -9,6 +9,8 @@
 #include <exception>
 #include <vector>
 
+#include "fleet/bus/nats/system_authorities.h"
+
 namespace fleet {
 
 namespace {
@@ -16,6 +18,7 @@ namespace {
 constexpr int kPingsUnanswered = 2;
 constexpr std::int64_t kWriteDeadlineMs = 10'000;
 constexpr std::size_t kSignatureLength = 64;
+constexpr int kMostDoublings = 4;
 
 /// Runs the steps until one of them fails.
 template <typename... Step>
@@ -74,8 +77,11 @@ natsStatus Identity::setTls(natsOptions* options) const {
     if (tls == nullptr) return NATS_OK;
     // Without an expected name any certificate of the same authority would do.
     if (tls->caFile.empty() || tls->serverName.empty()) return NATS_INVALID_ARG;
+    const std::uint64_t withheld = withheldSystemAuthorities();
     return inTurn(
         [&] { return natsOptions_SetSecure(options, true); },
+        // If it had got the system's authorities after all, it would trust too many.
+        [&] { return withheldSystemAuthorities() > withheld ? NATS_OK : NATS_SSL_ERROR; },
         [&] { return natsOptions_LoadCATrustedCertificates(options, tls->caFile.c_str()); },
         [&] { return natsOptions_SetExpectedHostname(options, tls->serverName.c_str()); });
 }
@@ -147,13 +153,18 @@ natsStatus Identity::sign(char** error, unsigned char** signature, int* length, 
     }
 }
 
-std::int64_t Identity::delay(natsConnection*, int, void* identity) {
+std::int64_t Identity::delay(natsConnection*, int attempt, void* identity) {
     auto* self = static_cast<Identity*>(identity);
     ++self->failedReconnects_;
-    const auto jitter =
-        std::clamp<std::int64_t>(self->options_.reconnectJitter.count(), 0, INT_MAX);
-    return self->options_.reconnectWait.count() +
-           randombytes_uniform(static_cast<std::uint32_t>(jitter) + 1);
+    return pauseBefore(self->options_, attempt).count();
+}
+
+std::chrono::milliseconds pauseBefore(const ConnectionOptions& options, int attempt) {
+    const int doublings = std::clamp(attempt - 1, 0, kMostDoublings);
+    const auto once = std::clamp<std::int64_t>(options.reconnectJitter.count(), 0, INT_MAX);
+    const auto jitter = std::min<std::int64_t>(once << doublings, INT_MAX);
+    return options.reconnectWait +
+           std::chrono::milliseconds(randombytes_uniform(static_cast<std::uint32_t>(jitter) + 1));
 }
 
 }  // namespace fleet

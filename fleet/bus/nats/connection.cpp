@@ -79,6 +79,14 @@ std::string lastErrorOf(natsConnection* connection) {
     return text == nullptr ? "" : text;
 }
 
+/// The text of the error that a callback is called for. The connection's last one may be of a later
+/// error.
+std::string errorOfCallback(natsConnection* connection, natsStatus error) {
+    natsStatus status = NATS_OK;
+    const char* text = nats_GetLastError(&status);
+    return text == nullptr || status != error ? lastErrorOf(connection) : text;
+}
+
 }  // namespace
 
 // ---- Subscription
@@ -137,8 +145,10 @@ public:
 
     BusStatus publish(const std::string& subject, const std::string& reply, std::string_view bytes,
                       const BusHeaders& headers);
-    BusStatus request(const std::string& subject, std::string_view bytes,
-                      Clock::time_point deadline, const BusHeaders& headers, BusMessage& answer);
+    /// Publishes a request; its number is for await().
+    BusStatus ask(const Request& request, std::uint64_t& number);
+    BusStatus await(const Request& request, std::uint64_t number, Clock::time_point deadline,
+                    BusMessage& answer);
     BusStatus listen(const std::string& subject, std::shared_ptr<Delivery> delivery,
                      QueueLimit limit, natsSubscription** subscription);
     BusStatus checkPermitted(const std::string& subject, std::uint64_t violationsBefore);
@@ -220,22 +230,23 @@ BusStatus Connection::Impl::publish(const std::string& subject, const std::strin
     return statusOf(natsConnection_PublishMsg(connection_, message.get()), "not published");
 }
 
-BusStatus Connection::Impl::request(const std::string& subject, std::string_view bytes,
-                                    Clock::time_point deadline, const BusHeaders& headers,
-                                    BusMessage& answer) {
+BusStatus Connection::Impl::ask(const Request& request, std::uint64_t& number) {
     if (!connected()) return BusStatus::noAnswer("no connection to the bus");
     BusStatus status = listenForAnswers();
     if (!status.done()) return status;
-    const std::uint64_t number = waiting_.begin(subject);
-    status = publish(subject, inbox_ + "." + std::to_string(number), bytes, headers);
-    if (!status.done()) {
-        waiting_.drop(number);
-        return status;
-    }
-    status = waiting_.await(number, deadline, answer);
+    number = waiting_.begin(request.subject);
+    status = publish(request.subject, inbox_ + "." + std::to_string(number), request.bytes,
+                     request.headers);
+    if (!status.done()) waiting_.drop(number);
+    return status;
+}
+
+BusStatus Connection::Impl::await(const Request& request, std::uint64_t number,
+                                  Clock::time_point deadline, BusMessage& answer) {
+    BusStatus status = waiting_.await(number, deadline, answer);
     const std::string* code = answer.header("Status");
     if (status.done() && code != nullptr && *code == "503") {
-        return BusStatus::noAnswer("nobody listens on " + subject);
+        return BusStatus::noAnswer("nobody listens on " + request.subject);
     }
     return status;
 }
@@ -314,6 +325,8 @@ void Connection::Impl::shut() {
 void Connection::Impl::onDisconnected(natsConnection*, void* self) {
     auto* impl = static_cast<Impl*>(self);
     impl->waiting_.failAll(BusStatus::noAnswer("the connection to the bus broke"));
+    // The library subscribes again on the next connection, whose rights may be others.
+    impl->waiting_.answersComeAgain();
     if (impl->events().disconnected) impl->events().disconnected();
 }
 
@@ -334,7 +347,7 @@ void Connection::Impl::onClosed(natsConnection* connection, void* self) {
 void Connection::Impl::onError(natsConnection* connection, natsSubscription*, natsStatus error,
                                void* self) {
     auto* impl = static_cast<Impl*>(self);
-    const std::string text = lastErrorOf(connection);
+    const std::string text = errorOfCallback(connection, error);
     if (error == NATS_NOT_PERMITTED) impl->countViolation(text);
     if (!impl->events().error) return;
     impl->events().error(error == NATS_SLOW_CONSUMER || text.empty() ? natsStatus_GetText(error)
@@ -346,7 +359,8 @@ void Connection::Impl::countViolation(const std::string& text) {
     if (violation.ofPublish) {
         waiting_.fail(violation.subject, BusStatus::forbidden(text));
     } else if (violation.subject == inbox_ + ".*") {
-        waiting_.failAll(BusStatus::forbidden(text));
+        // The server says this once, maybe before the first request has begun.
+        waiting_.answersDoNotCome(BusStatus::forbidden(text));
     }
     const std::lock_guard lock(mutex_);
     ++violations_;
@@ -404,9 +418,22 @@ std::string Connection::newInbox() const {
 
 Connection::Reply Connection::request(const std::string& subject, std::string_view bytes,
                                       Milliseconds deadline, const BusHeaders& headers) {
-    Reply reply;
-    reply.status = impl_->request(subject, bytes, Clock::now() + deadline, headers, reply.message);
-    return reply;
+    return std::move(requestAll({{subject, bytes, headers}}, deadline).front());
+}
+
+std::vector<Connection::Reply> Connection::requestAll(const std::vector<Request>& requests,
+                                                      Milliseconds deadline) {
+    const auto end = Clock::now() + deadline;
+    std::vector<Reply> replies(requests.size());
+    std::vector<std::uint64_t> numbers(requests.size());
+    for (std::size_t i = 0; i < requests.size(); ++i)
+        replies[i].status = impl_->ask(requests[i], numbers[i]);
+    for (std::size_t i = 0; i < requests.size(); ++i) {
+        Reply& reply = replies[i];
+        if (!reply.status.done()) continue;
+        reply.status = impl_->await(requests[i], numbers[i], end, reply.message);
+    }
+    return replies;
 }
 
 Connection::Subscribed Connection::subscribe(const std::string& subject, Receiver receiver,

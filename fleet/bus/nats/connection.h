@@ -8,6 +8,7 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "fleet/bus/nats/options.h"
 #include "fleet/bus/nats/status.h"
@@ -60,6 +61,17 @@ public:
     /// then the client library tells one of them only, and the other request ends with NoAnswer.
     Reply request(const std::string& subject, std::string_view bytes, Milliseconds deadline,
                   const BusHeaders& headers = {});
+
+    /// One of several requests. What it refers to outlives the call.
+    struct Request {
+        std::string subject;
+        std::string_view bytes;
+        BusHeaders headers;
+    };
+    /// The same for several at once: all are published before the first answer is waited for, which
+    /// costs one round trip and not many. The replies are in the order of the requests, and the
+    /// deadline is that of all together. None is under way any more when it returns.
+    std::vector<Reply> requestAll(const std::vector<Request>& requests, Milliseconds deadline);
 
     /// What a subscription may hold that its callback has not yet taken; the rest is dropped and
     /// counted.

@@ -48,9 +48,35 @@ Lease::State Lease::claim() {
 }
 
 Lease::State Lease::renew() {
-    if (ours_ != 0) return storeOver(ours_);
     State state;
-    state.text = "it is not ours";
+    if (ours_ == 0) {
+        state.kind = State::Kind::Others;
+        state.text = "it is not ours";
+        return state;
+    }
+    state = storeOver(ours_);
+    return state.kind == State::Kind::Others ? renewFound() : state;
+}
+
+/// What is there is another message than expected: our own, if an acknowledgement was lost or the
+/// bus has lost its newest messages, or somebody else's.
+Lease::State Lease::renewFound() {
+    State state;
+    const LastResult last =
+        lastOn(connection_, settings_.stream, settings_.subject, settings_.deadline);
+    const bool isFound = last.kind == LastResult::Kind::Found;
+    if (isFound && last.bytes != record_) {
+        ours_ = 0;
+        state.kind = State::Kind::Others;
+        state.holder = holderOf(last.bytes);
+        state.text = state.holder + " has it";
+        return state;
+    }
+    state.text = last.text;
+    if (!isFound && last.kind != LastResult::Kind::Missing) return state;
+    state = storeOver(last.sequence);
+    // A server that lags behind has answered. Nobody else's was seen: the next try tells.
+    if (state.kind == State::Kind::Others) state.kind = State::Kind::Unknown;
     return state;
 }
 
@@ -59,7 +85,6 @@ Lease::State Lease::storeOver(std::uint64_t sequence) {
         storeAfter(connection_, settings_.subject, record_, sequence, settings_.deadline);
     State state;
     state.text = stored.text;
-    ours_ = 0;
     if (stored.kind == StoreResult::Kind::Stored) {
         ours_ = stored.sequence;
         state.kind = State::Kind::Ours;

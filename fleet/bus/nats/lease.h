@@ -48,7 +48,9 @@ public:
     /// Claims it if it is free, and says who has it otherwise. Call it again until it is ours.
     State claim();
 
-    /// Renews what is ours. Anything but Ours means: stop, and claim it anew.
+    /// Renews what is ours. Others means: it is lost, stop and claim it anew. After Unknown it may
+    /// be asked for again, for as long as the term since the last renewal that was answered lasts:
+    /// a renewal that was stored and whose acknowledgement was lost is found to be ours.
     State renew();
 
     /// Gives it up, so that nobody has to wait for a term.
@@ -56,6 +58,7 @@ public:
 
 private:
     State storeOver(std::uint64_t sequence);
+    State renewFound();
 
     Connection& connection_;
     const Settings settings_;

@@ -70,7 +70,7 @@ struct ConnectionOptions {
     std::string inboxPrefix = "_INBOX";  ///< answers come to subjects below it
     /// For one attempt, with the handshake. Generous: thousands may connect at once.
     std::chrono::milliseconds connectTimeout = std::chrono::seconds(30);
-    /// Between two attempts to come back: at least the wait, at most that and the jitter.
+    /// Before each attempt to come back: see pauseBefore().
     std::chrono::milliseconds reconnectWait = std::chrono::seconds(2);
     std::chrono::milliseconds reconnectJitter = std::chrono::seconds(3);
     /// How many bytes may be published while there is no server; 0 for none.
@@ -82,5 +82,15 @@ struct ConnectionOptions {
     bool sharesThreads = false;
     ConnectionEvents events;
 };
+
+/// The pause before an attempt to reach a server again, the first of which has the number 1: the
+/// wait, and a part of the jitter that is drawn, which is twice as long after each attempt up to 16
+/// times.
+///
+/// Thousands come back at the same time when a server was away, and each attempt costs it a TLS
+/// handshake. It expects that a client is through with it within some seconds; one that comes when
+/// there are too many others fails and tries again. If all of them did so within the same few
+/// seconds for ever, none of them would get through.
+std::chrono::milliseconds pauseBefore(const ConnectionOptions& options, int attempt);
 
 }  // namespace fleet

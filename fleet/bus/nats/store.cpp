@@ -31,9 +31,11 @@ StoreResult storeFailure(BusStatus status) {
     return result;
 }
 
-StoreResult storeWith(Connection& connection, const std::string& subject, std::string_view bytes,
-                      Connection::Milliseconds deadline, const BusHeaders& headers) {
-    ApiAnswer answer = publishToStore(connection, subject, bytes, deadline, headers);
+BusHeaders expecting(std::uint64_t lastSequence) {
+    return {{"Nats-Expected-Last-Subject-Sequence", std::to_string(lastSequence)}};
+}
+
+StoreResult storeResultOf(ApiAnswer answer) {
     if (!answer.status.done()) return storeFailure(std::move(answer.status));
     const auto json = nlohmann::json::parse(answer.json);
     const auto sequence = json.find("seq");
@@ -43,6 +45,11 @@ StoreResult storeWith(Connection& connection, const std::string& subject, std::s
     StoreResult result;
     result.sequence = sequence->get<std::uint64_t>();
     return result;
+}
+
+StoreResult storeWith(Connection& connection, const std::string& subject, std::string_view bytes,
+                      Connection::Milliseconds deadline, const BusHeaders& headers) {
+    return storeResultOf(publishToStore(connection, subject, bytes, deadline, headers));
 }
 
 LastResult lastFailure(LastResult::Kind kind, std::string text) {
@@ -67,29 +74,9 @@ bool readSequence(const std::string* text, std::uint64_t& sequence) {
     return read.ec == std::errc() && read.ptr == end;
 }
 
-}  // namespace
-
-StoreResult storeFirst(Connection& connection, const std::string& subject, std::string_view bytes,
-                       Connection::Milliseconds deadline) {
-    return storeAfter(connection, subject, bytes, 0, deadline);
-}
-
-StoreResult storeAfter(Connection& connection, const std::string& subject, std::string_view bytes,
-                       std::uint64_t lastSequence, Connection::Milliseconds deadline) {
-    return storeWith(connection, subject, bytes, deadline,
-                     {{"Nats-Expected-Last-Subject-Sequence", std::to_string(lastSequence)}});
-}
-
-StoreResult store(Connection& connection, const std::string& subject, std::string_view bytes,
-                  Connection::Milliseconds deadline) {
-    return storeWith(connection, subject, bytes, deadline, {});
-}
-
-LastResult lastOn(Connection& connection, const std::string& stream, const std::string& subject,
-                  Connection::Milliseconds deadline) {
+/// What a store says of the last message on a subject.
+LastResult lastResultOf(Connection::Reply reply, const std::string& subject) {
     using Kind = LastResult::Kind;
-    Connection::Reply reply =
-        connection.request("$JS.API.DIRECT.GET." + stream + "." + subject, "", deadline);
     switch (reply.status.kind) {
         case BusStatus::Kind::Done:
             break;
@@ -117,11 +104,75 @@ LastResult lastOn(Connection& connection, const std::string& stream, const std::
     return result;
 }
 
+std::string erasure(std::uint64_t sequence) {
+    return nlohmann::json{{"seq", sequence}, {"no_erase", true}}.dump();
+}
+
+}  // namespace
+
+StoreResult storeFirst(Connection& connection, const std::string& subject, std::string_view bytes,
+                       Connection::Milliseconds deadline) {
+    return storeAfter(connection, subject, bytes, 0, deadline);
+}
+
+StoreResult storeAfter(Connection& connection, const std::string& subject, std::string_view bytes,
+                       std::uint64_t lastSequence, Connection::Milliseconds deadline) {
+    return storeWith(connection, subject, bytes, deadline, expecting(lastSequence));
+}
+
+std::vector<StoreResult> storeFirst(Connection& connection,
+                                    const std::vector<StoreRequest>& messages,
+                                    Connection::Milliseconds deadline) {
+    std::vector<Connection::Request> requests;
+    for (const StoreRequest& message : messages)
+        requests.push_back({message.subject, message.bytes, expecting(0)});
+    std::vector<StoreResult> results;
+    for (ApiAnswer& answer : publishToStore(connection, requests, deadline))
+        results.push_back(storeResultOf(std::move(answer)));
+    return results;
+}
+
+StoreResult store(Connection& connection, const std::string& subject, std::string_view bytes,
+                  Connection::Milliseconds deadline) {
+    return storeWith(connection, subject, bytes, deadline, {});
+}
+
+LastResult lastOn(Connection& connection, const std::string& stream, const std::string& subject,
+                  Connection::Milliseconds deadline) {
+    return std::move(
+        lastOn(connection, stream, std::vector<std::string>{subject}, deadline).front());
+}
+
+std::vector<LastResult> lastOn(Connection& connection, const std::string& stream,
+                               const std::vector<std::string>& subjects,
+                               Connection::Milliseconds deadline) {
+    std::vector<Connection::Request> requests;
+    for (const std::string& subject : subjects)
+        requests.push_back({"$JS.API.DIRECT.GET." + stream + "." + subject, "", {}});
+    std::vector<Connection::Reply> replies = connection.requestAll(requests, deadline);
+    std::vector<LastResult> results;
+    for (std::size_t i = 0; i < subjects.size(); ++i)
+        results.push_back(lastResultOf(std::move(replies[i]), subjects[i]));
+    return results;
+}
+
 BusStatus erase(Connection& connection, const std::string& stream, std::uint64_t sequence,
                 Connection::Milliseconds deadline) {
-    return askStore(connection, "STREAM.MSG.DELETE." + stream,
-                    nlohmann::json{{"seq", sequence}, {"no_erase", true}}.dump(), deadline)
-        .status;
+    return askStore(connection, "STREAM.MSG.DELETE." + stream, erasure(sequence), deadline).status;
+}
+
+std::vector<BusStatus> erase(Connection& connection, const std::string& stream,
+                             const std::vector<std::uint64_t>& sequences,
+                             Connection::Milliseconds deadline) {
+    std::vector<std::string> questions;
+    for (const std::uint64_t sequence : sequences)
+        questions.push_back(erasure(sequence));
+    std::vector<BusStatus> statuses;
+    for (ApiAnswer& answer :
+         askStore(connection, "STREAM.MSG.DELETE." + stream, questions, deadline)) {
+        statuses.push_back(std::move(answer.status));
+    }
+    return statuses;
 }
 
 }  // namespace fleet

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "fleet/bus/nats/connection.h"
 #include "fleet/bus/nats/status.h"
@@ -31,6 +32,15 @@ struct StoreResult {
 /// what was there once and has been erased.
 StoreResult storeFirst(Connection& connection, const std::string& subject, std::string_view bytes,
                        Connection::Milliseconds deadline);
+
+struct StoreRequest {
+    std::string subject;
+    std::string_view bytes;
+};
+/// The same for several messages at once, of which each may fail by itself. Results in their order.
+std::vector<StoreResult> storeFirst(Connection& connection,
+                                    const std::vector<StoreRequest>& messages,
+                                    Connection::Milliseconds deadline);
 
 /// Stores the bytes if the last message on the subject has that sequence; 0 for none.
 StoreResult storeAfter(Connection& connection, const std::string& subject, std::string_view bytes,
@@ -58,6 +68,16 @@ struct LastResult {
 /// The last message on a subject of a stream that allows direct reading.
 LastResult lastOn(Connection& connection, const std::string& stream, const std::string& subject,
                   Connection::Milliseconds deadline);
+
+/// The same for several subjects at once. Results in their order.
+std::vector<LastResult> lastOn(Connection& connection, const std::string& stream,
+                               const std::vector<std::string>& subjects,
+                               Connection::Milliseconds deadline);
+
+/// Removes several messages at once.
+std::vector<BusStatus> erase(Connection& connection, const std::string& stream,
+                             const std::vector<std::uint64_t>& sequences,
+                             Connection::Milliseconds deadline);
 
 /// Removes one message. One that is not there is Refused with 10057.
 BusStatus erase(Connection& connection, const std::string& stream, std::uint64_t sequence,

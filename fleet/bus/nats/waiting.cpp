@@ -6,7 +6,9 @@ namespace fleet {
 
 std::uint64_t Waiting::begin(const std::string& subject) {
     const std::lock_guard lock(mutex_);
-    requests_[++next_].subject = subject;
+    Request& request = requests_[++next_];
+    request.subject = subject;
+    request.failure = noAnswers_;
     return next_;
 }
 
@@ -14,6 +16,7 @@ BusStatus Waiting::await(std::uint64_t number, Deadline deadline, BusMessage& an
     std::unique_lock lock(mutex_);
     const auto request = requests_.find(number);
     if (request == requests_.end()) return BusStatus::noAnswer("no such request");
+    request->second.isAwaited = true;
     changed_.wait_until(lock, deadline,
                         [&] { return request->second.answer || request->second.failure; });
     Request over = std::move(request->second);
@@ -36,6 +39,8 @@ void Waiting::answer(std::uint64_t number, BusMessage message) {
         const auto request = requests_.find(number);
         if (request == requests_.end()) return;
         request->second.answer = std::move(message);
+        // Of many that were asked together, the others are found answered when their turn comes.
+        if (!request->second.isAwaited) return;
     }
     changed_.notify_all();
 }
@@ -57,6 +62,19 @@ void Waiting::failAll(const BusStatus& status) {
             request.failure = status;
     }
     changed_.notify_all();
+}
+
+void Waiting::answersDoNotCome(const BusStatus& status) {
+    {
+        const std::lock_guard lock(mutex_);
+        noAnswers_ = status;
+    }
+    failAll(status);
+}
+
+void Waiting::answersComeAgain() {
+    const std::lock_guard lock(mutex_);
+    noAnswers_.reset();
 }
 
 }  // namespace fleet

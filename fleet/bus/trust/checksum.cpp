@@ -13,8 +13,8 @@
 namespace fleet {
 namespace {
 
-constexpr std::size_t kChecksumDigits = 2 * crypto_hash_sha256_BYTES;
-constexpr std::size_t kPieceBytes = 256 * 1024;
+constexpr std::size_t kChecksumDigits = std::size_t{2} * crypto_hash_sha256_BYTES;
+constexpr std::size_t kPieceBytes = std::size_t{256} * 1024;
 
 }  // namespace
 

@@ -39,7 +39,7 @@ struct SignedParts {
 };
 
 /// No message is longer.
-constexpr std::size_t kMostSignedBytes = 1024 * 1024;
+constexpr std::size_t kMostSignedBytes = std::size_t{1024} * 1024;
 
 std::string signMessage(Purpose purpose, const KeyPair& key, std::string_view text,
                         std::string_view carried = {});

@@ -1,8 +1,10 @@
 #include "fleet/https/client/https_client.h"
 
+#include <atomic>
 #include <boost/asio/connect.hpp>
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/ip/tcp.hpp>
+#include <boost/asio/post.hpp>
 #include <boost/asio/ssl/context.hpp>
 #include <boost/asio/ssl/error.hpp>
 #include <boost/asio/ssl/stream.hpp>
@@ -21,12 +23,14 @@ namespace {
 namespace asio = boost::asio;
 namespace wire = boost::beast::http;
 using boost::asio::ip::tcp;
+using std::chrono::milliseconds;
 using Error = boost::system::error_code;
 using Kind = HttpsError::Kind;
 using TlsStream = asio::ssl::stream<tcp::socket>;
 using WireRequest = wire::request<wire::string_body>;
 using WireAnswer = wire::response_parser<wire::string_body>;
 
+constexpr unsigned kOk = 200;
 constexpr std::uint32_t kLongestHeader = 16 * 1024;
 /// Of an answer that are kept until they can be understood, such as the line before a chunk.
 constexpr std::size_t kBufferBytes = 64UL * 1024;
@@ -41,10 +45,16 @@ WireRequest wireRequestOf(const HttpsRequest& request, const ServerUrl& url) {
         sent.set(wire::field::authorization, "Bearer " + request.session);
     }
     if (!request.range.empty()) sent.set(wire::field::range, request.range);
+    if (!request.lastEventId.empty()) sent.set("Last-Event-ID", request.lastEventId);
     if (!request.body.empty()) sent.set(wire::field::content_type, request.contentType);
     sent.body() = request.body;
     sent.prepare_payload();
     return sent;
+}
+
+HttpsAnswer answerFrom(WireAnswer& answer) {
+    return {answer.get().result_int(), std::move(answer.get().body()),
+            std::string(answer.get()[wire::field::retry_after])};
 }
 
 /// Whether an error tells that the other end has gone, and not that it talks nonsense.
@@ -86,11 +96,19 @@ public:
     }
 
     /// Nothing if the connection was at its end before an answer began.
-    std::optional<HttpsAnswer> exchange(const WireRequest& request, Deadline deadline) {
+    std::optional<HttpsAnswer> exchange(const WireRequest& request, std::size_t mostBytes,
+                                        Deadline deadline) {
         Error error = run(deadline, [&](auto done) { wire::async_write(*stream_, request, done); });
         WireAnswer answer;
         answer.header_limit(kLongestHeader);
-        answer.body_limit(kMostBytes);
+        answer.body_limit(mostBytes);
+        // The head by itself: a parser that goes on to the body within one piece of bytes forgets
+        // that the body is too long.
+        if (!error) {
+            error = run(deadline, [&](auto done) {
+                wire::async_read_header(*stream_, buffer_, answer, done);
+            });
+        }
         if (!error) {
             error = run(deadline,
                         [&](auto done) { wire::async_read(*stream_, buffer_, answer, done); });
@@ -99,7 +117,38 @@ public:
         if (error) throw unusable(error);
         used_ = std::chrono::steady_clock::now();
         if (!answer.keep_alive()) close();
-        return HttpsAnswer{answer.get().result_int(), std::move(answer.get().body())};
+        return answerFrom(answer);
+    }
+
+    /// As HttpsClient::read(), on a connection that was just opened.
+    HttpsAnswer read(const WireRequest& request, std::size_t mostBytes, Deadline deadline,
+                     milliseconds quiet, const TakePiece& take, const OnBegin& onBegin) {
+        Error error = run(deadline, [&](auto done) { wire::async_write(*stream_, request, done); });
+        WireAnswer answer;
+        answer.header_limit(kLongestHeader);
+        answer.body_limit(mostBytes);
+        if (!error) {
+            error = run(deadline, [&](auto done) {
+                wire::async_read_header(*stream_, buffer_, answer, done);
+            });
+        }
+        if (error) throw unusable(error);
+        const unsigned status = answer.get().result_int();
+        if (status == kOk) {
+            answer.body_limit(boost::none);
+            if (onBegin) onBegin(std::string(answer.get()["Last-Event-ID"]));
+            readPieces(answer, quiet, take);
+            return {status, {}};
+        }
+        error =
+            run(deadline, [&](auto done) { wire::async_read(*stream_, buffer_, answer, done); });
+        if (error) throw unusable(error);
+        return answerFrom(answer);
+    }
+
+    void cancel() {
+        isCancelled_ = true;
+        asio::post(context_, [] {});  // lets a wait look at it
     }
 
     HttpsError failure(Kind kind, const std::string& what) const {
@@ -107,6 +156,24 @@ public:
     }
 
 private:
+    void readPieces(WireAnswer& answer, milliseconds quiet, const TakePiece& take) {
+        answer.eager(true);
+        std::string& body = answer.get().body();
+        for (;;) {
+            if (!body.empty() && !take(std::exchange(body, {}))) return;
+            if (answer.is_done()) return;
+            const Error error = run(std::chrono::steady_clock::now() + quiet, [&](auto done) {
+                wire::async_read_some(*stream_, buffer_, answer, done);
+            });
+            // Such an answer is as long as its connection: its end is no failure.
+            const bool isOver = error && isEnd(error);
+            if (error && !isOver) throw unusable(error);
+            if (!isOver) continue;
+            if (!body.empty()) take(body);
+            return;
+        }
+    }
+
     void connect(Deadline deadline) {
         tcp::resolver resolver(context_);
         tcp::resolver::results_type found;
@@ -126,7 +193,7 @@ private:
     }
 
     /// Starts an operation and waits for its end. The operation's handler refers to what the caller
-    /// has, so when the deadline has passed it is run out before this throws.
+    /// has, so when the deadline has passed, or it was cancelled, it is run out before this throws.
     template <typename Start>
     Error run(Deadline deadline, Start start) {
         bool ended = false;
@@ -136,7 +203,7 @@ private:
             ended = true;
         });
         context_.restart();
-        while (!ended && context_.run_one_until(deadline) != 0) {
+        while (!ended && !isCancelled_ && context_.run_one_until(deadline) != 0) {
         }
         if (ended) return result;
         if (stream_) {
@@ -146,6 +213,7 @@ private:
         context_.restart();
         context_.run();
         close();
+        if (isCancelled_) throw failure(Kind::Cancelled, "is asked no more");
         throw failure(Kind::TooLate, "has not answered in time");
     }
 
@@ -172,6 +240,7 @@ private:
     boost::beast::flat_buffer buffer_{kBufferBytes};
     std::string authority_;
     std::chrono::steady_clock::time_point used_{};
+    std::atomic<bool> isCancelled_{false};
 };
 
 HttpsClient::HttpsClient(ServerUrl url, ServerTrust trust)
@@ -185,7 +254,8 @@ HttpsAnswer HttpsClient::ask(const HttpsRequest& request, Deadline deadline) {
     try {
         for (;;) {
             if (!isReused) connection_->open(deadline);
-            std::optional<HttpsAnswer> answer = connection_->exchange(sent, deadline);
+            std::optional<HttpsAnswer> answer =
+                connection_->exchange(sent, request.mostBytes, deadline);
             if (answer) return std::move(*answer);
             if (!isReused || !isRepeatable) {
                 throw connection_->failure(Kind::NoAnswer, "broke the connection");
@@ -196,6 +266,23 @@ HttpsAnswer HttpsClient::ask(const HttpsRequest& request, Deadline deadline) {
         connection_->close();
         throw;
     }
+}
+
+HttpsAnswer HttpsClient::read(const HttpsRequest& request, Deadline deadline,
+                              std::chrono::milliseconds quiet, const TakePiece& take,
+                              const OnBegin& onBegin) {
+    // A connection of its own: what was asked before may have left one that has gone.
+    const struct Closer {
+        Connection& connection;
+        ~Closer() { connection.close(); }
+    } closer{*connection_};
+    connection_->open(deadline);
+    return connection_->read(wireRequestOf(request, url_), request.mostBytes, deadline, quiet, take,
+                             onBegin);
+}
+
+void HttpsClient::cancel() {
+    connection_->cancel();
 }
 
 const std::string& HttpsClient::authority() const {

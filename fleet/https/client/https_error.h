@@ -15,6 +15,7 @@ public:
         TooLate,      ///< the deadline passed first; the server may have done what it was asked
         NoAnswer,     ///< the connection broke; the server may have done what it was asked
         WrongAnswer,  ///< what came is no answer of HTTP, or is too long
+        Cancelled,    ///< this side wanted it no more; the server may have done what it was asked
     };
 
     HttpsError(Kind kind, const std::string& text) : std::runtime_error(text), kind_(kind) {}

@@ -112,6 +112,7 @@ Actions Link::replied(const Reply& reply, Moment now) {
     listWanted_ = reply.list;
     revoked_.clear();
     revoked_.insert(reply.revoked.begin(), reply.revoked.end());
+    knowsRevoked_ = true;
     ahead_.expect(reply.last);
     if (needsAdoption(reply)) {
         // Until that is done the link must look to the centre like one that has forgotten.

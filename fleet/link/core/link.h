@@ -74,6 +74,8 @@ public:
     const Kept& kept() const { return kept_; }
     /// Whether the centre has told that this operator's key counts no longer.
     bool isRevoked(const std::string& key) const { return revoked_.count(key) > 0; }
+    /// Whether a reply has said which keys those are. Before that, nobody's key counts.
+    bool knowsRevoked() const { return knowsRevoked_; }
     /// Why the next order is not handed over; "" if nothing is in the way.
     const std::string& blocked() const { return blocked_; }
 
@@ -115,6 +117,7 @@ private:
     Moment nextScan_{};
     Moment lastSeen_{};  ///< when the latest scan was begun because of a number that was seen
     bool listWanted_ = false;
+    bool knowsRevoked_ = false;
     std::set<std::string> revoked_;
 
     // The host.

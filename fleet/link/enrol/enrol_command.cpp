@@ -16,7 +16,7 @@ namespace {
 
 constexpr int kWrongWords = 2;
 /// No invitation is that long.
-constexpr std::size_t kLongestLine = 16 * 1024;
+constexpr std::size_t kLongestLine = std::size_t{16} * 1024;
 constexpr const char* kFooter =
     "Makes this host's keys, tells the centre of them, and writes what zavlink needs to run.\n"
     "The invitation is the line that \"zavfleetd enrol NAME\" prints. It is secret as long as it\n"

@@ -1,6 +1,8 @@
 #include "fleet/link/files/depot_side.h"
 
+#include <algorithm>
 #include <chrono>
+#include <cstdint>
 #include <optional>
 
 #include "ctl/client/address/host_address.h"
@@ -13,6 +15,16 @@ namespace fleet {
 namespace {
 
 constexpr std::chrono::seconds kTransferTime{60};
+/// In a second, on a slow disk: the host answers with the sums of all files at once.
+constexpr std::uint64_t kBytesSummed = 10'000'000;
+
+std::chrono::seconds timeToSum(const std::vector<OrderFile>& files) {
+    std::uint64_t bytes = 0;
+    for (const OrderFile& file : files)
+        bytes += file.size;
+    constexpr std::uint64_t kLongest = 3600;  // the host's own patience
+    return kTransferTime + std::chrono::seconds(std::min(bytes / kBytesSummed, kLongest));
+}
 
 std::vector<ctl::PushedFile> filesOf(const std::vector<OrderFile>& files, const Spool& spool) {
     std::vector<ctl::PushedFile> pushed;
@@ -70,7 +82,9 @@ PrepareAnswer DepotSide::place(const std::vector<OrderFile>& files, Spool& spool
             return Unacceptable{problemIn(pushed).value_or("the host did not take all files")};
         }
         if (!check.guarded) return FilesPlaced{};
-        const std::string why = ctl::verifyArrival(host, pushed);
+        ctl::HostAddress patient = host;
+        patient.timeout = timeToSum(files);
+        const std::string why = ctl::verifyArrival(patient, pushed);
         if (!why.empty()) return NotNow{why};
         if (const auto problem = problemIn(pushed)) return NotNow{*problem};
         return FilesPlaced{};

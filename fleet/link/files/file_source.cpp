@@ -43,7 +43,7 @@ void FileSource::fetch(const OrderFile& file, Spool& spool) {
     while (have < file.size) {
         if (!isWanted_()) throw NotFetched("something else comes first");
         if (!spool.hasRoomFor(file.size - have)) {
-            throw NotFetched(file.path + " does not fit on this disk, of which a tenth stays free");
+            throw NotFetched(file.path + " does not fit on this disk, which must not become full");
         }
         const HttpsAnswer answer = piece(file.sha256, have);
         if (answer.status != kPiece || answer.body.empty() ||

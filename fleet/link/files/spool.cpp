@@ -5,6 +5,7 @@
 #include <sys/statvfs.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <filesystem>
@@ -50,12 +51,14 @@ std::uint64_t Spool::partOf(const std::string& sum) const {
 }
 
 bool Spool::hasRoomFor(std::uint64_t bytes) const {
+    // That stays free: this share of the disk, and of a large one as many bytes.
     constexpr double kFreeShare = 0.1;
+    constexpr double kFreeBytes = 1ULL << 30;
     struct statvfs disk {};
     if (::statvfs(directory_.c_str(), &disk) != 0) return false;
     const double free = static_cast<double>(disk.f_bavail) * static_cast<double>(disk.f_frsize);
     const double whole = static_cast<double>(disk.f_blocks) * static_cast<double>(disk.f_frsize);
-    return free - static_cast<double>(bytes) >= kFreeShare * whole;
+    return free - static_cast<double>(bytes) >= std::min(kFreeShare * whole, kFreeBytes);
 }
 
 void Spool::sweep(Moment now) {

@@ -23,11 +23,10 @@ using std::chrono::seconds;
 /// For each request. A server that is there answers in milliseconds, a centre with many hosts in a
 /// second or two.
 constexpr seconds kAnswerTime{5};
-constexpr seconds kConnectPause{2};
 /// After the bus has refused this host.
 constexpr seconds kRefusedPause{30};
 /// The bus takes 256 KiB a message, its headers included.
-constexpr std::size_t kMostOutcome = 255 * 1024;
+constexpr std::size_t kMostOutcome = std::size_t{255} * 1024;
 
 /// The number at the end of "rp.task.HOST.NUMBER".
 std::optional<Number> numberOf(const std::string& subject) {
@@ -111,7 +110,7 @@ void BusSide::disconnect() {
 /// On the worker, where everything else waits for it.
 void BusSide::connect() {
     std::string last;
-    while (!isEnding_) {
+    for (int attempt = 1; !isEnding_; ++attempt) {
         Connection::Result result = Connection::connect(optionsOfThis());
         if (result.connection) {
             connection_ = std::move(result.connection);
@@ -122,7 +121,7 @@ void BusSide::connect() {
         if (std::exchange(last, result.text) != result.text) {
             say(Priority::Warning, "no connection to the bus: " + result.text);
         }
-        if (!worker_.pause(kConnectPause)) return;
+        if (!worker_.pause(pauseBefore(options_, attempt))) return;
     }
 }
 

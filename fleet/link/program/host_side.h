@@ -1,20 +1,20 @@
-/// A link's connection to the host on its machine.
+/// The host of a link, as its program uses it.
 #pragma once
 
-#include <atomic>
 #include <functional>
+#include <optional>
 #include <set>
 #include <string>
-#include <thread>
 #include <vector>
 
-#include "fleet/link/program/host_answers.h"
-#include "fleet/loop/worker.h"
+#include "fleet/link/core/actions.h"
+#include "fleet/link/core/answers.h"
+#include "fleet/link/facts/facts_teller.h"
 
 namespace fleet {
 
-/// Asks the host over its Unix socket, one request after the other, and follows the ends of its
-/// tasks. Answers and events come on threads of its own; they may be called for from any thread.
+/// Carries out what a link wants of its host. Answers and events may come on any thread, also
+/// before a function returns. Each function may be called from any thread, and returns soon.
 class HostSide {
 public:
     /// Each must return soon and throw nothing.
@@ -27,47 +27,24 @@ public:
         std::function<void()> tasksChanged;
     };
 
-    HostSide(std::string socket, Events events);
     /// Ends what is under way within seconds; no event or answer comes any more once it is over.
-    ~HostSide();
-    HostSide(const HostSide&) = delete;
-    HostSide& operator=(const HostSide&) = delete;
+    virtual ~HostSide() = default;
 
-    void handOver(const HandOver& action, std::function<void(HandOverAnswer)> answer);
-    void enter(const EnterEnd& action, std::function<void(HandOverAnswer)> answer);
-    void cancel(const std::string& order, const std::string& journal,
-                std::function<void(CancelAnswer)> answer);
-    void lookUp(const std::string& order, const std::string& journal,
-                std::function<void(LookUpAnswer)> answer);
+    virtual void handOver(const HandOver& action, std::function<void(HandOverAnswer)> answer) = 0;
+    virtual void enter(const EnterEnd& action, std::function<void(HandOverAnswer)> answer) = 0;
+    virtual void cancel(const std::string& order, const std::string& journal,
+                        std::function<void(CancelAnswer)> answer) = 0;
+    virtual void lookUp(const std::string& order, const std::string& journal,
+                        std::function<void(LookUpAnswer)> answer) = 0;
     /// The fleet's orders in this journal, newest first, as many as a hello can tell; nothing if
     /// the host does not answer.
-    void listOrders(const std::string& journal,
-                    std::function<void(std::optional<std::vector<std::string>>)> answer);
+    virtual void listOrders(
+        const std::string& journal,
+        std::function<void(std::optional<std::vector<std::string>>)> answer) = 0;
     /// Looks at the journal and at what is unfinished once more, and tells isThere.
-    void lookAgain();
-
-private:
-    struct View {
-        std::string journal;
-        std::set<std::string> unfinished;
-    };
-
-    HostAnswer request(bool isPost, const std::string& target, const std::string& body) const;
-    HandOverAnswer post(const std::string& order, const std::string& journal,
-                        const std::string& body) const;
-    std::string journalNow() const;
-    /// Calls `each` for the tasks of a state, or of all if it is "", until it returns false.
-    void eachTask(const std::string& state, const std::string& journal,
-                  const std::function<bool(const std::string& transid)>& each) const;
-    View view() const;
-    void follow();
-    void followOnce(std::string& journal, std::string& position);
-
-    const std::string socket_;
-    const Events events_;
-    std::atomic<bool> isEnding_{false};
-    Worker worker_;
-    std::thread follower_;  ///< last: it uses everything above
+    virtual void lookAgain() = 0;
+    /// What the host is and what is installed there; nothing if it does not answer.
+    virtual void look(std::function<void(std::optional<HostLook>)> answer) = 0;
 };
 
 }  // namespace fleet

@@ -92,6 +92,10 @@ std::vector<std::string> addressesOf(const toml::node& value, const Place& place
     return addresses;
 }
 
+bool endsWith(std::string_view text, std::string_view end) {
+    return text.size() >= end.size() && text.substr(text.size() - end.size()) == end;
+}
+
 struct Member {
     const char* name;
     bool isNeeded;
@@ -131,6 +135,13 @@ constexpr Member kMembers[] = {
      }},
     {"host-socket", false, readText<&LinkConfiguration::hostSocket>},
     {"state", true, readText<&LinkConfiguration::state>},
+    {"metrics", false,
+     [](const toml::node& value, const Place& place, LinkConfiguration& into) {
+         into.metrics = textOf(value, place);
+         // The node exporter passes over other names.
+         const bool isRead = endsWith(into.metrics, ".prom");
+         if (into.metrics.front() != '/' || !isRead) place.refuse("must be a path /.../NAME.prom");
+     }},
     {"labels", false,
      [](const toml::node& value, const Place& place, LinkConfiguration& into) {
          into.labels = labelsOf(value, place);

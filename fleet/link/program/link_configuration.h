@@ -20,6 +20,7 @@ namespace fleet {
 ///   centre      = ["U..."]
 ///   host-socket = "/run/zavhost/zavhost.sock"
 ///   state       = "/var/lib/zavlink"
+///   metrics     = "/run/zavlink/zavlink.prom"
 ///   [labels]
 ///   env = "test"
 struct LinkConfiguration {
@@ -32,7 +33,8 @@ struct LinkConfiguration {
     std::string root;                              ///< the public key that certifies operators
     std::vector<std::string> centres;              ///< the centre's signing keys
     std::string hostSocket = "/run/zavhost.sock";  ///< where the host is asked
-    std::string state;  ///< the directory of what the link must not forget
+    std::string state;    ///< the directory of what the link must not forget
+    std::string metrics;  ///< a file for the node exporter, see MetricsFile; "": none is written
     Labels labels;
 };
 

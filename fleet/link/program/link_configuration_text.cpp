@@ -47,7 +47,8 @@ std::string linkConfigurationText(const LinkConfiguration& configuration) {
         "bus = " + listed(configuration.bus) + '\n' + lineWith("ca", configuration.ca) +
         lineWith("server-name", configuration.serverName) + lineWith("url", configuration.url) +
         lineWith("root", configuration.root) + "centre = " + listed(configuration.centres) + '\n' +
-        lineWith("host-socket", configuration.hostSocket) + lineWith("state", configuration.state);
+        lineWith("host-socket", configuration.hostSocket) + lineWith("state", configuration.state) +
+        lineWith("metrics", configuration.metrics);
     if (!configuration.labels.empty()) text += "\n[labels]\n";
     for (const auto& [name, value] : configuration.labels)
         text += quoted(name) + " = " + quoted(value) + '\n';

@@ -3,18 +3,14 @@
 
 #include <string>
 
-#include "fleet/bus/accounts/nkey.h"
-#include "fleet/link/core/kept.h"
+#include "fleet/link/program/link_memory.h"
 #include "system/file_descriptor.h"
 
 namespace fleet {
 
 /// "link.json" in the link's directory, readable for its user only: who this host is, and what must
 /// not be forgotten. Whoever has a copy of it can speak for the host.
-///
-/// The bus's key is never the one that signs: a bad server of the bus can have its key sign
-/// anything.
-class LinkFile {
+class LinkFile : public LinkMemory {
 public:
     /// Reads it, and holds the directory's lock as long as it lives. Throws FileError, also when
     /// another process has that.
@@ -27,13 +23,11 @@ public:
     /// Throws FileError if the host whose directory this is has been enrolled.
     static void insistOnNone(const std::string& directory);
 
-    const KeyPair& bus() const { return bus_; }
-    const KeyPair& signing() const { return signing_; }
-    const std::string& token() const { return token_; }
-    const Kept& kept() const { return kept_; }
-
-    /// Durable when it returns. Throws FileError; then the older state is on disk.
-    void keep(const Kept& kept);
+    const KeyPair& bus() const override { return bus_; }
+    const KeyPair& signing() const override { return signing_; }
+    const std::string& token() const override { return token_; }
+    const Kept& kept() const override { return kept_; }
+    void keep(const Kept& kept) override;
 
 private:
     struct Content;

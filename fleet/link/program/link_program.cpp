@@ -9,7 +9,9 @@
 #include "fleet/bus/accounts/fleet_accounts.h"
 #include "fleet/bus/messages/order.h"
 #include "fleet/files/files.h"
+#include "fleet/link/program/link_file.h"
 #include "fleet/link/program/machine.h"
+#include "fleet/link/program/socket_host.h"
 #include "fleet/link/questions/answer_pieces.h"
 #include "fleet/log/log.h"
 
@@ -18,59 +20,81 @@ namespace {
 
 using std::chrono::seconds;
 
+/// What is told of why the host is blocked: the words may be the centre's.
+constexpr std::size_t kLongestBlocked = 1024;
+
 /// Questions that wait for a look at them.
-constexpr int kMostQuestions = 16;
+constexpr std::size_t kMostQuestions = 16;
 
 /// 20 to 40 seconds.
 Moment drawnPause() {
-    static std::mt19937 dice{std::random_device{}()};
+    thread_local std::mt19937 dice{std::random_device{}()};
     return Moment(std::uniform_int_distribution<Moment::rep>(20'000, 40'000)(dice));
+}
+
+/// Those of the one link on a machine.
+LinkParts partsOf(const LinkConfiguration& configuration) {
+    LinkParts parts;
+    parts.memory = std::make_unique<LinkFile>(configuration.state);
+    parts.host = [socket = configuration.hostSocket](HostSide::Events events) {
+        return std::make_unique<SocketHost>(socket, std::move(events));
+    };
+    return parts;
 }
 
 }  // namespace
 
 LinkProgram::LinkProgram(const LinkConfiguration& configuration)
-    : file_(configuration.state),
-      latest_(file_.kept().latest),
+    : LinkProgram(configuration, partsOf(configuration)) {}
+
+LinkProgram::LinkProgram(const LinkConfiguration& configuration, LinkParts parts)
+    : mailbox_(std::move(parts.hasWork)),
+      memory_(std::move(parts.memory)),
+      latest_(memory_->kept().latest),
       trust_(trust(configuration)),
-      link_(settings(), file_.kept()),
+      metricsFile_(configuration.metrics),
+      link_(settings(), memory_->kept()),
       facts_(ownFacts(configuration)) {
     files_ = std::make_unique<FileSide>(fileSettings(configuration));
-    bus_ = std::make_unique<BusSide>(busOptions(configuration), trust_, file_.bus(),
-                                     file_.signing(), busEvents());
+    bus_ = std::make_unique<BusSide>(busOptions(configuration, parts.sharesThreads), trust_,
+                                     memory_->bus(), memory_->signing(), busEvents());
     questions_ = std::make_unique<QuestionSide>(configuration.hostSocket);
-    inventory_ = std::make_unique<InventorySide>(configuration.hostSocket);
-    host_ = std::make_unique<HostSide>(configuration.hostSocket, hostEvents());
+    outputs_ = std::make_unique<OutputSide>(
+        trust_.host, memory_->signing(), configuration.hostSocket,
+        [this](std::string piece) { bus_->answer({std::move(piece)}); });
+    host_ = parts.host(hostEvents());
 }
 
 LinkProgram::~LinkProgram() {
-    // Its answers go to the bus.
+    // Their answers go to the bus.
+    outputs_.reset();
     questions_.reset();
     // Each of these may still put letters into the mailbox, and nothing else.
     host_.reset();
-    inventory_.reset();
     bus_.reset();
     files_.reset();
 }
 
-ConnectionOptions LinkProgram::busOptions(const LinkConfiguration& configuration) const {
+ConnectionOptions LinkProgram::busOptions(const LinkConfiguration& configuration,
+                                          bool sharesThreads) const {
     ConnectionOptions options;
     options.urls = configuration.bus;
     if (!configuration.ca.empty()) {
         options.tls = TlsOptions{configuration.ca, configuration.serverName};
     }
     options.credentials =
-        UserToken{[token = file_.token()] { return token; },
-                  [key = file_.bus()](std::string_view nonce) { return key.sign(nonce); }};
+        UserToken{[token = memory_->token()] { return token; },
+                  [key = memory_->bus()](std::string_view nonce) { return key.sign(nonce); }};
     options.name = configuration.name;
-    options.inboxPrefix = inboxPrefixOf(file_.bus().publicKey());
+    options.inboxPrefix = inboxPrefixOf(memory_->bus().publicKey());
+    options.sharesThreads = sharesThreads;
     return options;
 }
 
 Trust LinkProgram::trust(const LinkConfiguration& configuration) const {
     Trust trusted;
     trusted.fleet = configuration.fleet;
-    trusted.host = file_.bus().publicKey();
+    trusted.host = memory_->bus().publicKey();
     trusted.name = configuration.name;
     trusted.labels = configuration.labels;
     trusted.root = configuration.root;
@@ -80,7 +104,7 @@ Trust LinkProgram::trust(const LinkConfiguration& configuration) const {
 
 Facts LinkProgram::ownFacts(const LinkConfiguration& configuration) const {
     Facts own;
-    own.host = file_.bus().publicKey();
+    own.host = memory_->bus().publicKey();
     own.name = configuration.name;
     own.labels = configuration.labels;
     own.link = ZAV_VERSION;
@@ -97,7 +121,7 @@ Moment LinkProgram::now() {
 }
 
 FileSideSettings LinkProgram::fileSettings(const LinkConfiguration& configuration) const {
-    FileSideSettings settings{{configuration.fleet, configuration.url, "", file_.signing()},
+    FileSideSettings settings{{configuration.fleet, configuration.url, "", memory_->signing()},
                               configuration.state + "/spool",
                               configuration.hostSocket};
     if (!configuration.url.empty()) {
@@ -108,7 +132,7 @@ FileSideSettings LinkProgram::fileSettings(const LinkConfiguration& configuratio
 
 LinkSettings LinkProgram::settings() const {
     LinkSettings made;
-    made.host = file_.bus().publicKey();
+    made.host = memory_->bus().publicKey();
     made.session = makeOrderId();
     made.machine = machineIdentity(made.host);
     made.nonce = makeOrderId;
@@ -160,6 +184,7 @@ BusSide::Events LinkProgram::busEvents() {
     events.connected = [this] {
         mailbox_.put([this] {
             say(Priority::Info, "connected to the bus");
+            isConnected_ = true;
             facts_.connected();
             carryOut(link_.connected(now()));
         });
@@ -167,6 +192,7 @@ BusSide::Events LinkProgram::busEvents() {
     events.disconnected = [this] {
         mailbox_.put([this] {
             say(Priority::Warning, "the bus is away");
+            if (std::exchange(isConnected_, false)) counts_.disconnected.add();
             facts_.disconnected();
             link_.disconnected();
         });
@@ -192,7 +218,11 @@ BusSide::Events LinkProgram::busEvents() {
         tell([number](Link& link, Moment at) { return link.unanswered(number, at); });
     };
     events.replied = [this](Reply reply) {
-        tell([reply = std::move(reply)](Link& link, Moment at) { return link.replied(reply, at); });
+        mailbox_.put([this, reply = std::move(reply)] {
+            replied_ = now();
+            carryOut(link_.replied(reply, *replied_));
+            considerEarly();
+        });
     };
     events.asked = [this](const std::string& bytes) {
         // Those beyond are lost, as on the bus.
@@ -204,22 +234,51 @@ BusSide::Events LinkProgram::busEvents() {
         });
     };
     events.unheard = [this](const std::string& nonce) {
+        counts_.unheard.add();
         tell([nonce](Link& link, Moment at) { return link.unheard(nonce, at); });
     };
     return events;
 }
 
 LinkProgram::End LinkProgram::run() {
-    auto nextTick = Mailbox::Clock::now();
     while (!end_) {
-        if (const std::optional<Mailbox::Letter> letter = mailbox_.take(nextTick)) (*letter)();
-        if (Mailbox::Clock::now() < nextTick) continue;
-        nextTick = Mailbox::Clock::now() + seconds(1);
-        carryOut(link_.tick(now()));
-        sayWhatBlocks();
-        tellFacts();
+        if (const std::optional<Mailbox::Letter> letter = mailbox_.take(nextTick_)) (*letter)();
+        tickIfDue();
     }
     return *end_;
+}
+
+std::optional<LinkProgram::End> LinkProgram::work() {
+    while (!end_) {
+        const std::optional<Mailbox::Letter> letter = mailbox_.take(Mailbox::Clock::time_point());
+        if (!letter) break;
+        (*letter)();
+    }
+    tickIfDue();
+    return end_;
+}
+
+void LinkProgram::tickIfDue() {
+    if (end_ || Mailbox::Clock::now() < nextTick_) return;
+    nextTick_ = Mailbox::Clock::now() + seconds(1);
+    carryOut(link_.tick(now()));
+    sayWhatBlocks();
+    tellFacts();
+    tellMetrics();
+}
+
+void LinkProgram::tellMetrics() {
+    const auto at = MetricsFile::Clock::now();
+    if (!metricsFile_.isDue(at)) return;
+    const LinkScrape scrape{counts_,
+                            isConnected_,
+                            !journal_.empty(),
+                            !link_.blocked().empty(),
+                            link_.kept().taken,
+                            bus_->unsignedNumbers(),
+                            replied_,
+                            metrics::readProcessFigures()};
+    metricsFile_.write(scrape, at);
 }
 
 void LinkProgram::end() {
@@ -235,9 +294,9 @@ void LinkProgram::sayWhatBlocks() {
 }
 
 void LinkProgram::tellFacts() {
-    facts_.blockedIs(link_.blocked());
+    facts_.blockedIs(link_.blocked().substr(0, kLongestBlocked));
     if (facts_.wantsLook(now())) {
-        inventory_->look([this](std::optional<HostLook> look) {
+        host_->look([this](std::optional<HostLook> look) {
             mailbox_.put([this, look = std::move(look)] { facts_.found(look, now()); });
         });
     }
@@ -248,13 +307,26 @@ void LinkProgram::tellFacts() {
     }
 }
 
+/// Questions that came before the link knew whose key was revoked.
+void LinkProgram::considerEarly() {
+    if (!link_.knowsRevoked()) return;
+    for (const std::string& question : std::exchange(early_, {}))
+        consider(question);
+}
+
 void LinkProgram::consider(const std::string& question) {
+    if (!link_.knowsRevoked()) {
+        if (early_.size() < kMostQuestions) early_.push_back(question);
+        return;
+    }
     const Moment at = now();
     const auto isRevoked = [this](const std::string& key) { return link_.isRevoked(key); };
     const std::optional<AskedQuestion> asked = judgeQuestion(question, trust_, at, isRevoked);
     if (!asked || !questionBook_.enter(asked->id, asked->expires, at)) return;
+    counts_.questions.add();
+    if (asked->kind == kAsksOutput) return outputs_->ask(*asked);
     questions_->answer(*asked, at, [this, asked = *asked](const std::string& text) {
-        bus_->answer(answerPieces(trust_.host, asked, text, file_.signing()));
+        bus_->answer(answerPieces(trust_.host, asked, text, memory_->signing()));
     });
 }
 
@@ -279,7 +351,8 @@ void LinkProgram::apply(const PrepareFiles& action) {
 void LinkProgram::apply(const HandOver& action) {
     say(Priority::Info, "order " + std::to_string(action.directive.number) + " (" +
                             action.directive.order + ") goes to the host");
-    host_->handOver(action, [this, number = action.directive.number](HandOverAnswer answer) {
+    counts_.handedOver.add();
+    host_->handOver(action, [this, number = action.directive.number](const HandOverAnswer& answer) {
         mailbox_.put([this, number, answer] { noteRecorded(number, answer, now()); });
     });
 }
@@ -288,7 +361,8 @@ void LinkProgram::apply(const EnterEnd& action) {
     say(Priority::Notice, "order " + std::to_string(action.directive.number) + " (" +
                               action.directive.order + ") is recorded as " + action.state + ": " +
                               action.reason);
-    host_->enter(action, [this, number = action.directive.number](HandOverAnswer answer) {
+    counts_.entered.add();
+    host_->enter(action, [this, number = action.directive.number](const HandOverAnswer& answer) {
         mailbox_.put([this, number, answer] { noteRecorded(number, answer, now()); });
     });
 }
@@ -299,26 +373,28 @@ void LinkProgram::noteRecorded(Number number, const HandOverAnswer& answer, Mome
 }
 
 void LinkProgram::apply(const CancelTask& action) {
-    host_->cancel(action.order, journal_, [this, by = action.by](CancelAnswer answer) {
+    host_->cancel(action.order, journal_, [this, by = action.by](const CancelAnswer& answer) {
         tell([by, answer](Link& link, Moment at) { return link.cancelled(by, answer, at); });
     });
 }
 
 void LinkProgram::apply(const LookUp& action) {
-    host_->lookUp(action.order, journal_, [this, order = action.order](LookUpAnswer answer) {
+    host_->lookUp(action.order, journal_, [this, order = action.order](const LookUpAnswer& answer) {
         tell([order, answer](Link& link, Moment at) { return link.found(order, answer, at); });
     });
 }
 
 void LinkProgram::apply(const Report& action) {
+    counts_.reported.add();
     bus_->report(action.outcome);
 }
 
 void LinkProgram::apply(const Keep& action) {
-    file_.keep(action.kept);
+    memory_->keep(action.kept);
 }
 
 void LinkProgram::apply(const SayHello& action) {
+    counts_.hellos.add();
     if (!action.listWanted || journal_.empty()) return bus_->sayHello(action.hello);
     host_->listOrders(journal_, [this, hello = action.hello](
                                     const std::optional<std::vector<std::string>>& orders) mutable {

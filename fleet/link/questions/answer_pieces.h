@@ -10,7 +10,7 @@
 namespace fleet {
 
 /// An answer is no longer; a longer one is replaced by what says so.
-constexpr std::size_t kMostAnswerBytes = 1024 * 1024;
+constexpr std::size_t kMostAnswerBytes = std::size_t{1024} * 1024;
 
 /// The signed messages of an answer, which is a JSON text: cut into pieces, each sealed for the
 /// question's key.

@@ -2,8 +2,8 @@
 
 #include <nlohmann/json.hpp>
 
-#include "fleet/bus/messages/certificate.h"
 #include "fleet/bus/messages/document.h"
+#include "fleet/bus/trust/sealed.h"
 #include "fleet/link/core/link.h"
 
 using nlohmann::json;
@@ -51,10 +51,11 @@ std::optional<AskedQuestion> judgeQuestion(
                            question.issued <= now + Link::kMostAhead;
         AskedQuestion asked{question.id,      question.kind,
                             question.body,    textIn(readDocument(question.body), "answerTo"),
-                            question.expires, ""};
-        if (!isOperators || !isForThis || !isNow || !isPublicKey(asked.answerTo, KeyKind::User)) {
-            return std::nullopt;
-        }
+                            question.expires, "",
+                            certificate};
+        const bool canBeAnswered =
+            isPublicKey(asked.answerTo, KeyKind::User) && canSealFor(asked.answerTo);
+        if (!isOperators || !isForThis || !isNow || !canBeAnswered) return std::nullopt;
         asked.refusal = refusalOf(question, certificate, trust);
         return asked;
     } catch (const MessageError&) {

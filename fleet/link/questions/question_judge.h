@@ -7,6 +7,7 @@
 #include <string>
 #include <string_view>
 
+#include "fleet/bus/messages/certificate.h"
 #include "fleet/bus/messages/question.h"
 #include "fleet/link/judge.h"
 
@@ -19,6 +20,7 @@ struct AskedQuestion {
     std::string answerTo;  ///< the key for which the answer is sealed
     Moment expires{};
     std::string refusal;  ///< why it is not answered otherwise; "" if it is
+    Certificate grant;    ///< what its operator may
 };
 
 /// The question, if an operator of this fleet asks this host now. Nothing for everything else: to

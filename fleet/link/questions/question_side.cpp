@@ -11,6 +11,7 @@
 #include "ctl/client/http/percent_encoding.h"
 #include "ctl/client/tasks/task_request.h"
 #include "fleet/bus/messages/document.h"
+#include "fleet/link/questions/allowed_tasks.h"
 
 using nlohmann::json;
 
@@ -34,16 +35,21 @@ struct Asking {
     const ctl::Ticker& tick;
 };
 
-json tasksOf(const Asking& asking, const AskedQuestion&, const json& body) {
+json tasksOf(const Asking& asking, const AskedQuestion& question, const json& body) {
     const Number limit =
         body.contains("limit") ? std::min(numberIn(body, "limit"), kMostTasksAsked) : 20;
-    std::string target = "/v1/tasks?limit=" + std::to_string(std::max<Number>(limit, 1));
+    std::string filters;
     for (const char* const filter : {"state", "product"}) {
         const std::string value = optionalText(body, filter);
         if (value.empty()) continue;
-        target += "&" + std::string(filter) + "=" + ctl::percentEncoded(value);
+        filters += "&" + std::string(filter) + "=" + ctl::percentEncoded(value);
     }
-    return asking.client.ask(target, asking.deadline, asking.tick).document();
+    const auto ask = [&](Number most, const std::string& after) {
+        std::string target = "/v1/tasks?limit=" + std::to_string(most) + filters;
+        if (!after.empty()) target += "&after=" + ctl::percentEncoded(after);
+        return asking.client.ask(target, asking.deadline, asking.tick).document();
+    };
+    return allowedTasks(ask, std::max<Number>(limit, 1), question.grant);
 }
 
 json configurationOf(const Asking& asking, const AskedQuestion& question, const json& body) {
@@ -58,12 +64,17 @@ json configurationOf(const Asking& asking, const AskedQuestion& question, const 
     return {{"rows", answer.rows}, {"full", answer.full}, {"warnings", answer.warnings}};
 }
 
+json checksOf(const Asking& asking, const AskedQuestion&, const json&) {
+    return asking.client.ask("/v1/doctor", asking.deadline, asking.tick).document();
+}
+
 /// What can be asked. A new kind is a function and a row.
 struct Kind {
     const char* name;
     json (*answer)(const Asking&, const AskedQuestion&, const json& body);
 };
-constexpr Kind kKinds[] = {{kAsksTasks, tasksOf}, {kAsksConfiguration, configurationOf}};
+constexpr Kind kKinds[] = {
+    {kAsksTasks, tasksOf}, {kAsksConfiguration, configurationOf}, {kAsksDoctor, checksOf}};
 
 }  // namespace
 
@@ -87,6 +98,8 @@ void QuestionSide::answer(const AskedQuestion& question, Moment now,
         try {
             take(answerNow(question, left));
         } catch (const QuestionsEnd&) {
+        } catch (const std::exception&) {
+            // It cannot be told; who asked learns it from the silence.
         }
     });
 }

@@ -1,6 +1,7 @@
 #include "fleet/operator/centre/answers.h"
 
 #include <nlohmann/json.hpp>
+#include <utility>
 
 #include "ctl/client/http/bounded_json.h"
 
@@ -40,6 +41,15 @@ const json& memberList(const json& answer, const char* member) {
         throw senseless(std::string("it has no list \"") + member + '"');
     }
     return *found;
+}
+
+json documentIn(const HttpsAnswer& answer) {
+    const bool isSuccess = answer.status >= 200 && answer.status < 300;
+    if (!isSuccess) throw centreRefusal(answer.status, answer.body);
+    ctl::ParsedJson parsed = ctl::parseBounded(answer.body);
+    if (parsed.fault != nullptr) throw senseless(std::string("it ") + parsed.fault);
+    if (!parsed.document.is_object()) throw senseless("it is no JSON object");
+    return std::move(parsed.document);
 }
 
 ctl::Failure senseless(const std::string& what) {

@@ -6,6 +6,7 @@
 #include <string>
 
 #include "ctl/client/failure.h"
+#include "fleet/https/client/https_client.h"
 #include "fleet/https/client/https_error.h"
 
 namespace fleet {
@@ -15,8 +16,12 @@ std::string memberText(const nlohmann::json& object, const char* member);
 std::uint64_t memberNumber(const nlohmann::json& object, const char* member);
 bool memberFlag(const nlohmann::json& object, const char* member);
 
-/// The list that the member of an answer is. Throws ctl::Failure(kNoHost) if it is none.
+/// The list that the member of an answer is. Throws ctl::Failure(kNoHost) if it is not one.
 const nlohmann::json& memberList(const nlohmann::json& answer, const char* member);
+
+/// The JSON object that the centre has answered with. Throws ctl::Failure if it has refused, or if
+/// its answer is none.
+nlohmann::json documentIn(const HttpsAnswer& answer);
 
 /// What to throw when the centre's answer makes no sense.
 ctl::Failure senseless(const std::string& what);

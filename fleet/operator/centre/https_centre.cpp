@@ -4,10 +4,9 @@
 #include <nlohmann/json.hpp>
 #include <utility>
 
-#include "ctl/client/http/bounded_json.h"
 #include "fleet/bus/messages/document.h"
-#include "fleet/bus/messages/session.h"
 #include "fleet/operator/centre/answers.h"
+#include "fleet/operator/centre/session_opening.h"
 
 using nlohmann::json;
 
@@ -15,18 +14,6 @@ namespace fleet {
 namespace {
 
 constexpr unsigned kNoSession = 401;
-
-bool isSuccess(const HttpsAnswer& answer) {
-    return answer.status >= 200 && answer.status < 300;
-}
-
-json documentOf(const HttpsAnswer& answer) {
-    if (!isSuccess(answer)) throw centreRefusal(answer.status, answer.body);
-    ctl::ParsedJson parsed = ctl::parseBounded(answer.body);
-    if (parsed.fault != nullptr) throw senseless(std::string("it ") + parsed.fault);
-    if (!parsed.document.is_object()) throw senseless("it is no JSON object");
-    return std::move(parsed.document);
-}
 
 }  // namespace
 
@@ -38,23 +25,14 @@ HttpsCentre::HttpsCentre(const OperatorIdentity& identity, HttpsClient::Deadline
 HttpsAnswer HttpsCentre::ask(const HttpsRequest& request) {
     try {
         return client_.ask(request,
-                           std::min(deadline_, std::chrono::steady_clock::now() + kAnswerTime));
+                           std::min(deadline_, std::chrono::steady_clock::now() + answerTime_));
     } catch (const HttpsError& error) {
         throw centreFailure(error);
     }
 }
 
 void HttpsCentre::openSession() {
-    const SessionRequest wanted{identity_.fleet, identity_.key.publicKey(), identity_.url,
-                                wallClock(), makeSessionNonce()};
-    const json answer =
-        documentOf(ask({"POST", "/v1/sessions", signSessionRequest(wanted, identity_.key),
-                        "application/octet-stream"}));
-    session_ = memberText(answer, "session");
-    const bool isToken =
-        !session_.empty() &&
-        std::all_of(session_.begin(), session_.end(), [](char c) { return c > ' ' && c < '\x7f'; });
-    if (!isToken) throw senseless("it has no session");
+    session_ = sessionIn(ask(sessionOpening(identity_)));
 }
 
 json HttpsCentre::request(HttpsRequest request) {
@@ -68,7 +46,7 @@ json HttpsCentre::request(HttpsRequest request) {
         request.session = session_;
         answer = ask(request);
     }
-    return documentOf(answer);
+    return documentIn(answer);
 }
 
 json HttpsCentre::get(const std::string& target) {

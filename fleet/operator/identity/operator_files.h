@@ -17,7 +17,7 @@ struct PendingLogin {
 };
 
 /// Operations throw FileError, also for files whose content makes no sense. `url` is that of a
-/// centre and throws UrlError if it is none.
+/// centre and throws UrlError if it is not one.
 class OperatorFiles {
 public:
     /// What is kept makes the directory; one that is there must be its owner's only.

@@ -22,7 +22,7 @@ namespace fleet {
 namespace {
 
 /// A request to the centre has at most 1 MiB.
-constexpr std::size_t kPieceBytes = 1024 * 1024;
+constexpr std::size_t kPieceBytes = std::size_t{1024} * 1024;
 constexpr std::size_t kMostFilesOfAnOrder = 1'000;
 /// For the sum of a file that is complete: ten minutes.
 constexpr std::chrono::milliseconds kLookPause{500};

@@ -12,7 +12,7 @@ namespace fleet {
 namespace {
 
 /// A request ends with the order that reaches this, as text.
-constexpr std::size_t kRequestBytes = 500 * 1024;
+constexpr std::size_t kRequestBytes = std::size_t{500} * 1024;
 /// What an order's text needs in a request beyond its own length.
 constexpr std::size_t kAroundAnOrder = 3;
 

@@ -25,7 +25,7 @@ public:
 
     /// 32 hexadecimal digits in lower case. The same key makes the same ones again.
     std::string identifier(std::size_t number) const;
-    /// The number of an order; nothing if it is none of these.
+    /// The number of an order; nothing if it is not one of these.
     std::optional<std::size_t> numberOf(const std::string& identifier) const;
 
 private:

@@ -1,5 +1,6 @@
 #include "fleet/operator/orders/order_maker.h"
 
+#include <algorithm>
 #include <optional>
 #include <utility>
 
@@ -77,10 +78,10 @@ bool OrderMaker::isOwn(const Order& order) const {
     return chainOf(order.host).numberOf(order.id).has_value();
 }
 
-std::string OrderMaker::sign(Order order) const {
+std::string OrderMaker::sign(Order order, Moment lasting) const {
     order.fleet = identity_.fleet;
     order.issued = now_;
-    order.expires = now_ + lasting_;
+    order.expires = now_ + lasting;
     std::string bytes = signOrder(order, identity_.key, identity_.certificate);
     if (bytes.size() > kMostOrderBytes) {
         throw ctl::Failure(ctl::kWrongUsage,
@@ -104,21 +105,21 @@ std::string OrderMaker::orderFor(const ChosenHost& host, const Work& work,
     order.kind = work.kind;
     order.body = textOf(body);
     order.files = work.files;
-    return sign(std::move(order));
+    return sign(std::move(order), lasting_);
 }
 
-std::string OrderMaker::again(const Order& order) const {
+std::string OrderMaker::again(const Order& order, std::size_t tries) const {
     const OrderChain chain = chainOf(order.host);
     const std::optional<std::size_t> known = chain.numberOf(order.id);
-    // The first one of this operator, if the order is another one's.
-    const std::size_t next = known ? *known + 1 : 0;
+    // In the place of another operator's order comes one behind all that this one can have signed.
+    const std::size_t next = known ? *known + 1 : tries;
     if (next >= kMostTries) {
         throw ctl::Failure(ctl::kHostReportedFailure,
                            "the roll-out has tried too often; begin another one");
     }
     Order another = order;
     another.id = chain.identifier(next);
-    return sign(std::move(another));
+    return sign(std::move(another), lasting_);
 }
 
 std::string OrderMaker::cancelOf(const Order& order) const {
@@ -128,7 +129,9 @@ std::string OrderMaker::cancelOf(const Order& order) const {
     cancel.selector = order.selector;
     cancel.kind = kCancel;
     cancel.body = textOf({{"order", order.id}});
-    return sign(std::move(cancel));
+    // A host that comes back late must not find the cancel out of date and the order not.
+    const Moment left = order.expires - now_;
+    return sign(std::move(cancel), std::min(kLongestOrder, std::max(lasting_, left)));
 }
 
 }  // namespace fleet

@@ -54,8 +54,9 @@ public:
     bool isOverSoon(const Order& order) const { return order.expires <= now_ + kSoonOver; }
 
     /// A signed order that does the same as another one, with another identifier and other times.
-    /// Throws ctl::Failure for more tries than kMostTries.
-    std::string again(const Order& order) const;
+    /// `tries` is how many were signed for that host so far, whoever has signed them. Throws
+    /// ctl::Failure for more than kMostTries.
+    std::string again(const Order& order, std::size_t tries) const;
     /// A signed order that cancels another one.
     std::string cancelOf(const Order& order) const;
 
@@ -64,7 +65,7 @@ private:
     static constexpr Moment kSoonOver = std::chrono::minutes(10);
 
     OrderChain chainOf(const std::string& host) const;
-    std::string sign(Order order) const;
+    std::string sign(Order order, Moment lasting) const;
 
     const OperatorIdentity& identity_;
     const Certificate grant_;

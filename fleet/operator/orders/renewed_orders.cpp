@@ -69,6 +69,11 @@ Order checkedOrder(const json& listed, const json& rollout, const OperatorIdenti
     return read.order;
 }
 
+/// How many orders were signed for the host. An older centre does not say that.
+std::size_t triesOf(const json& listed) {
+    return listed.contains("tries") ? static_cast<std::size_t>(memberNumber(listed, "tries")) : 0;
+}
+
 /// What the orders have in common, and must: all but what is sealed for each host.
 json openPartOf(const Order& order) {
     json body = readDocument(order.body);
@@ -113,7 +118,7 @@ std::vector<std::string> renewedOrders(const json& toSign, const json& rollout, 
                 maker.insistThatAllowed(isAbort ? kCancel : order.kind,
                                         isAbort ? "" : memberText(open["body"], "product"));
             }
-            orders.push_back(isAbort ? maker.cancelOf(order) : maker.again(order));
+            orders.push_back(isAbort ? maker.cancelOf(order) : maker.again(order, triesOf(listed)));
         } catch (const MessageError& error) {
             throw ctl::Failure(
                 ctl::kHostReportedFailure,

@@ -4,14 +4,13 @@
 #include <thread>
 #include <utility>
 
-#include "ctl/client/failure.h"
 #include "ctl/client/http/bounded_json.h"
 #include "ctl/client/http/percent_encoding.h"
-#include "fleet/bus/messages/certificate.h"
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/question.h"
 #include "fleet/operator/centre/answers.h"
 #include "fleet/operator/questions/gathered_answer.h"
+#include "fleet/operator/questions/made_question.h"
 
 using nlohmann::json;
 
@@ -21,22 +20,8 @@ namespace {
 /// The centre takes no more at once.
 constexpr std::size_t kMostOfRound = 200;
 /// A request with questions is not longer.
-constexpr std::size_t kRequestRoom = 500 * 1024;
+constexpr std::size_t kRequestRoom = std::size_t{500} * 1024;
 constexpr std::chrono::milliseconds kLookPause{200};
-
-void insistThatAllowed(const OperatorIdentity& identity, const Inquiry& inquiry) {
-    const Certificate grant = identity.grant();
-    if (grant.until <= wallClock()) {
-        throw ctl::Failure(ctl::kHostReportedFailure, "your certificate has ended",
-                           "Ask for another invitation, and log in with that.");
-    }
-    const std::string product = memberText(inquiry.body, "product");
-    if (allows(grant, inquiry.kind, product)) return;
-    throw ctl::Failure(ctl::kHostReportedFailure,
-                       "your certificate does not allow " + inquiry.kind +
-                           (product.empty() ? std::string() : " for the product " + product),
-                       "zavctl whoami with --fleet shows what it allows.");
-}
 
 /// What one round has asked, and what has come of it.
 class AskedRound {
@@ -80,18 +65,11 @@ private:
     std::string questionFor(HostAnswer& asked) {
         json body = inquiry_.body;
         body["answerTo"] = key_.publicKey();
-        Order question;
-        question.fleet = identity_.fleet;
-        question.id = makeOrderId();
-        question.host = asked.host.key;
-        question.selector = selector_;
-        question.kind = inquiry_.kind;
-        question.body = textOf(body);
-        question.issued = wallClock();
-        question.expires = question.issued + kLongestQuestion;
+        const MadeQuestion made =
+            makeQuestion(identity_, {asked.host.key, selector_, inquiry_.kind, body}, wallClock());
         open_.emplace_back(&asked,
-                           GatheredAnswer(asked.host.key, asked.host.signing, question.id, key_));
-        return signQuestion(question, identity_.key, identity_.certificate);
+                           GatheredAnswer(asked.host.key, asked.host.signing, made.id, key_));
+        return made.bytes;
     }
 
     static void fill(HostAnswer& answer, const GatheredAnswer& gathered) {
@@ -135,7 +113,7 @@ void askRound(Centre& centre, const OperatorIdentity& identity, const std::strin
 std::vector<HostAnswer> askHosts(Centre& centre, const OperatorIdentity& identity,
                                  const Choice& choice, const Inquiry& inquiry,
                                  const AskingPace& pace) {
-    insistThatAllowed(identity, inquiry);
+    insistThatMayAsk(identity, inquiry.kind, memberText(inquiry.body, "product"));
     std::vector<HostAnswer> answers;
     for (const ChosenHost& host : choice.hosts)
         answers.push_back({host, nullptr, host.state == "here" ? "" : "it is " + host.state});

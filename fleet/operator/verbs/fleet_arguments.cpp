@@ -26,20 +26,17 @@ constexpr const char* kOfOneHost[] = {"--transid", "--once", "--complete"};
 constexpr const char* kRenewals[] = {"rollout resume", "rollout abort", "rollout retry-failed"};
 
 /// The verbs that look at many hosts and change none.
-constexpr const char* kLooks[] = {"agents", "tasks", "config get"};
+constexpr const char* kLooks[] = {"agents", "tasks", "config get", "doctor"};
+/// Those that look at one, and may be told which.
+constexpr const char* kLooksAtOne[] = {"task output"};
 
 ctl::Failure misplaced(const ctl::Verb& verb, const std::string& option) {
     return {ctl::kWrongUsage, std::string(verb.name) + " does not go with " + option};
 }
 
-bool isRenewal(const ctl::Verb& verb) {
-    return std::find(std::begin(kRenewals), std::end(kRenewals), std::string(verb.name)) !=
-           std::end(kRenewals);
-}
-
-bool looksAtMany(const ctl::Verb& verb) {
-    return std::find(std::begin(kLooks), std::end(kLooks), std::string(verb.name)) !=
-           std::end(kLooks);
+template <typename List>
+bool isOneOf(const ctl::Verb& verb, const List& names) {
+    return std::find(std::begin(names), std::end(names), std::string(verb.name)) != std::end(names);
 }
 
 void insistOnHosts(const ctl::Values& given) {
@@ -74,11 +71,12 @@ Moment timeOf(const ctl::Values& given, const ctl::Argument& option) {
 void insistOnMeaning(const ctl::Verb& verb, const ctl::Values& given) {
     if (verb.requestOf == nullptr) {
         for (const ctl::Argument* const option : kOfRollouts) {
-            if (option == &kOn && looksAtMany(verb)) continue;
+            const bool goesWithOn = isOneOf(verb, kLooks) || isOneOf(verb, kLooksAtOne);
+            if (option == &kOn && goesWithOn) continue;
             if (given.has(*option)) throw misplaced(verb, option->name);
         }
-        if (given.has(kExpires) && !isRenewal(verb)) throw misplaced(verb, kExpires.name);
-        if (looksAtMany(verb)) insistOnHosts(given);
+        if (given.has(kExpires) && !isOneOf(verb, kRenewals)) throw misplaced(verb, kExpires.name);
+        if (isOneOf(verb, kLooks)) insistOnHosts(given);
         return;
     }
     insistOnHosts(given);

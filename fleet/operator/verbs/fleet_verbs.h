@@ -10,6 +10,8 @@ extern const ctl::Verb kFleetWhoamiVerb;
 extern const ctl::Verb kFleetPushVerb;
 extern const ctl::Verb kFleetAgentsVerb;
 extern const ctl::Verb kFleetTasksVerb;
+extern const ctl::Verb kFleetTaskOutputVerb;
+extern const ctl::Verb kFleetDoctorVerb;
 extern const ctl::Verb kFleetConfigGetVerb;
 extern const ctl::Verb kHostsVerb;
 extern const ctl::Verb kHostsShowVerb;
@@ -22,6 +24,7 @@ extern const ctl::Verb kRolloutPauseVerb;
 extern const ctl::Verb kRolloutResumeVerb;
 extern const ctl::Verb kRolloutAbortVerb;
 extern const ctl::Verb kRolloutRetryFailedVerb;
+extern const ctl::Verb kFleetConsoleVerb;
 extern const ctl::Verb kFleetVersionVerb;
 extern const ctl::Verb kFleetHelpVerb;
 

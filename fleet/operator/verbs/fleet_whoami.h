@@ -7,7 +7,7 @@
 
 namespace fleet {
 
-/// The answer of /v1/whoami. Throws ctl::Failure if it is none.
+/// The answer of /v1/whoami. Throws ctl::Failure if it is not one.
 ctl::Page showOperator(const nlohmann::json& answer, ctl::Format format);
 
 }  // namespace fleet

@@ -71,15 +71,39 @@ json handOver(Centre& centre, const std::string& id, Renewal renewal, bool isFor
     return centre.post(rolloutTarget(id) + "/" + nameOf(renewal), body);
 }
 
+/// Cancels what hosts have not done yet. Who tells that an order has ended leaves the list, and
+/// what stands behind it moves up while it is read; so it is read until it brings nothing new.
+void cancelAll(Centre& centre, const std::string& id, const json& rollout,
+               const OperatorIdentity& identity, const OrderMaker& maker, RenewalResult& result) {
+    std::set<std::string> cancelled;  // a host that has refused to stands on the list again
+    for (;;) {
+        json fresh = json::array();
+        const json listed = listToSign(centre, id, Renewal::Abort, false);
+        for (const json& host : listed["hosts"]) {
+            const std::string order = memberText(host, "host") + ' ' + memberText(host, "order");
+            if (cancelled.size() < kMostToSign && cancelled.insert(order).second) {
+                fresh.push_back(host);
+            }
+        }
+        if (fresh.empty()) return;
+        const std::vector<std::string> cancels =
+            renewedOrders({{"hosts", fresh}}, rollout, Renewal::Abort, identity, maker);
+        if (cancels.empty()) return;
+        result.rollout = handOver(centre, id, Renewal::Abort, false, cancels);
+        result.orders += cancels.size();
+    }
+}
+
+/// One that was aborted already may still have hosts that were not told.
 RenewalResult abortRollout(Centre& centre, const std::string& id, const OperatorIdentity& identity,
                            const OrderMaker& maker) {
-    RenewalResult result{handOver(centre, id, Renewal::Abort, false, {}), 0, ""};
+    const json rollout = centre.get(rolloutTarget(id));
+    RenewalResult result{rollout, 0, ""};
+    if (memberText(rollout, "state") != "aborted") {
+        result.rollout = handOver(centre, id, Renewal::Abort, false, {});
+    }
     try {
-        const std::vector<std::string> cancels =
-            wantedOrders(centre, id, Renewal::Abort, false, identity, maker);
-        if (cancels.empty()) return result;
-        result.rollout = handOver(centre, id, Renewal::Abort, false, cancels);
-        result.orders = cancels.size();
+        cancelAll(centre, id, rollout, identity, maker, result);
     } catch (const ctl::Failure& failure) {
         result.note = "nothing more is released, but hosts that have their orders keep them: " +
                       std::string(failure.what());

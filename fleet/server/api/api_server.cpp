@@ -1,11 +1,15 @@
 #include "fleet/server/api/api_server.h"
 
+#include <utility>
+
 #include "fleet/server/api/routes.h"
 
 namespace fleet {
 namespace {
 
 constexpr std::chrono::seconds kGrace{5};
+/// Who takes nothing for so long reads no more; it can come again where it was.
+constexpr std::chrono::seconds kStreamTime{30};
 
 /// Who a client is, its session tells; the connection comes from the front.
 http::Door openDoor() {
@@ -16,6 +20,7 @@ http::ServerLimits limits() {
     http::ServerLimits limits;
     limits.connections = FrontLimits{}.connections;
     limits.waitingRequests = 1024;
+    limits.streamTime = kStreamTime;
     return limits;
 }
 
@@ -25,10 +30,15 @@ FrontSettings frontSettings(const FleetDirectory& directory, const ListenPlace& 
 
 }  // namespace
 
-ApiServer::ApiServer(CentreService& service, const ListenPlace& place)
-    : services_(service),
+ApiServer::ApiServer(CentreService& service, const ListenPlace& place,
+                     std::vector<console::PageFile> page)
+    : service_(service),
+      services_(service, !page.empty()),
       api_(services_, apiRoutes()),
-      server_(-1, openDoor(), api_, counts_, limits()),
+      console_(page.empty() ? nullptr
+                            : std::make_unique<CentreConsole>(services_, api_, std::move(page))),
+      server_(-1, openDoor(), console_ ? static_cast<http::Handler&>(*console_) : api_, counts_,
+              limits()),
       front_(frontSettings(service.directory(), place),
              [this](sys::FileDescriptor connection) { server_.adopt(std::move(connection)); }),
       thread_([this] { server_.run(); }) {}

@@ -13,8 +13,13 @@
 #include <string>
 #include <utility>
 
+#include "fleet/server/api/events/event_log.h"
+#include "fleet/server/api/events/event_readers.h"
 #include "fleet/server/api/files/known_fetches.h"
+#include "fleet/server/api/metrics/api_counts.h"
 #include "fleet/server/api/sessions/batches.h"
+#include "fleet/server/api/sessions/browser_sessions.h"
+#include "fleet/server/api/sessions/session_proof.h"
 #include "fleet/server/api/sessions/sessions.h"
 #include "fleet/server/depot/file_depot.h"
 #include "fleet/server/keys/trust/members.h"
@@ -35,11 +40,13 @@ public:
     /// How long a request waits for the centre's thread.
     static constexpr std::chrono::seconds kPatience{25};
 
-    /// Throws KeysError, DepotError and sqlite::DatabaseError.
-    explicit ApiServices(CentreService& service)
+    /// `withConsole`: the centre serves the console to browsers. Throws KeysError, DepotError and
+    /// sqlite::DatabaseError.
+    explicit ApiServices(CentreService& service, bool withConsole = false)
         : directory(service.directory()),
           facts(directory.facts()),
           files(directory.files()),
+          servesConsole(withConsole),
           service_(service),
           trust_(directory.trustDatabase()),
           members_(trust_.connection()) {}
@@ -50,8 +57,18 @@ public:
     Batches batches;
     FileDepot files;
     KnownFetches fetches;
+    EventLog events;
+    EventReaders readers{events};
+    ApiCounts counts;
+    BrowserSessions browsers;
+    const bool servesConsole;
 
     QuestionDesk& questions() { return service_.centre().questions(); }
+    /// The key in whose name a session was opened; nothing if it is none, or not any more.
+    std::optional<std::string> keyOf(const SessionProof& proof, Moment now) const {
+        return proof.isBrowsers ? browsers.keyOf(proof.token, now)
+                                : sessions.keyOf(proof.token, now);
+    }
     bool isWorking() const { return service_.centre().isWorking(); }
 
     /// What `act` returns, which gets a CentreDesk and runs on the centre's thread as one
@@ -96,7 +113,7 @@ public:
         }
         return labelled_;
     }
-    /// The bus key of the host whose link signs with this key; "" if it is none of the fleet's.
+    /// The bus key of the host whose link signs with this key; "" if it is not one of the fleet's.
     std::string hostSigningWith(const std::string& key) {
         const auto known = members();
         const auto found = std::find_if(known->begin(), known->end(), [&](const auto& member) {

@@ -51,13 +51,13 @@ std::string_view tokenIn(std::string_view authorization) {
 }
 
 /// Who makes the request, if they have a session and their key counts still.
-std::optional<Visit> visitOf(ApiServices& services, const Call& call) {
-    const auto key = sessionKey(services, call);
+std::optional<Visit> visitOf(ApiServices& services, const SessionProof& proof) {
+    const auto key = services.keyOf(proof, wallClock());
     if (!key) return std::nullopt;
     auto grant = services.withTrust(
         [&](sqlite::Database& database) { return Operators(database).grantOf(*key, wallClock()); });
     if (!grant) return std::nullopt;
-    return Visit{services, *key, std::move(*grant)};
+    return Visit{services, *key, std::move(*grant), proof};
 }
 
 http::Answer answerIn(Visit& visit, ApiEndpoint& endpoint, Call& call) {
@@ -80,6 +80,8 @@ http::Answer answerIn(Visit& visit, ApiEndpoint& endpoint, Call& call) {
         return http::errorReply(statusOf(error.kind()), error.what());
     } catch (const BatchesFull& full) {
         return later(kTooMany, full.what());
+    } catch (const TooMany& full) {
+        return later(kTooMany, full.what());
     } catch (const DepotError& error) {
         if (error.kind() == DepotError::Kind::Failed) throw;
         return http::errorReply(error.kind() == DepotError::Kind::Full ? kNoRoom : 400,
@@ -89,19 +91,24 @@ http::Answer answerIn(Visit& visit, ApiEndpoint& endpoint, Call& call) {
     }
 }
 
-http::Answer answerTo(ApiServices& services, const ApiRoute& route, Call& call) {
+/// Why whoever makes the request may not act; empty if they may.
+const char* whyNoAct(const Visit& visit) {
+    if (visit.session.isBrowsers) return "a browser's session only reads";
+    return visit.grant.role == Role::Viewer ? "a viewer changes nothing" : "";
+}
+
+http::Answer answerTo(ApiServices& services, const ApiRoute& route, Call& call,
+                      const SessionProof& proof) {
     try {
-        Visit visit{services, {}, {}};
-        if (route.access != http::Access::None) {
-            std::optional<Visit> known = visitOf(services, call);
-            if (!known) return unauthorized();
-            if (route.access == http::Access::Act && known->grant.role == Role::Viewer) {
-                return http::errorReply(403, "a viewer changes nothing");
-            }
-            visit.key = std::move(known->key);
-            visit.grant = std::move(known->grant);
+        if (route.access == http::Access::None) {
+            Visit anybody{services, {}, {}};
+            return answerIn(anybody, *route.endpoint, call);
         }
-        return answerIn(visit, *route.endpoint, call);
+        std::optional<Visit> visit = visitOf(services, proof);
+        if (!visit) return unauthorized();
+        const std::string_view refusal = route.access == http::Access::Act ? whyNoAct(*visit) : "";
+        if (!refusal.empty()) return http::errorReply(403, refusal);
+        return answerIn(*visit, *route.endpoint, call);
     } catch (const std::exception& error) {
         // A database or a disk. The details are the administrator's.
         say(Priority::Error, std::string(route.method) + " " + route.path + ": " + error.what());
@@ -116,13 +123,41 @@ std::optional<std::string> sessionKey(ApiServices& services, const Call& call) {
 }
 
 CentreApi::CentreApi(ApiServices& services, std::vector<ApiRoute> routes)
-    : services_(services), table_(std::move(routes), "") {}
+    : services_(services), table_(std::move(routes), ""), watch_(services) {}
 
 std::variant<http::Answer, http::Job> CentreApi::handle(http::Request request) {
-    return table_.dispatch(std::move(request),
-                           [&services = services_](const ApiRoute& route, Call& call) {
-                               return answerTo(services, route, call);
-                           });
+    SessionProof proof{std::string(tokenIn(request.authorization))};
+    return dispatch(std::move(request), std::move(proof));
+}
+
+std::variant<http::Answer, http::Job> CentreApi::handleForBrowser(http::Request request,
+                                                                  std::string token) {
+    // Some routes that anybody may ask take what is signed, or sessions of hosts.
+    if (request.method != "GET" && request.method != "HEAD") {
+        http::Answer refusal(http::errorReply(403, "a browser only reads"));
+        services_.counts.noteAnswer(refusal);
+        return refusal;
+    }
+    request.authorization.clear();
+    return dispatch(std::move(request), {std::move(token), true});
+}
+
+std::variant<http::Answer, http::Job> CentreApi::dispatch(http::Request request,
+                                                          SessionProof proof) {
+    auto handled = table_.dispatch(
+        std::move(request),
+        [&services = services_, proof = std::move(proof)](const ApiRoute& route, Call& call) {
+            return answerTo(services, route, call, proof);
+        });
+    if (const auto* const answer = std::get_if<http::Answer>(&handled)) {
+        services_.counts.noteAnswer(*answer);
+        return handled;
+    }
+    return http::Job([job = std::get<http::Job>(std::move(handled)), &counts = services_.counts] {
+        http::Answer answer = job();
+        counts.noteAnswer(answer);
+        return answer;
+    });
 }
 
 }  // namespace fleet

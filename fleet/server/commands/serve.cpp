@@ -1,64 +1,46 @@
-#include <pthread.h>
 #include <sys/resource.h>
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
-#include <csignal>
 #include <memory>
+#include <optional>
 #include <ostream>
-#include <thread>
+#include <vector>
 
+#include "ctl/console/embedded_page.h"
 #include "fleet/https/client/server_url.h"
 #include "fleet/log/log.h"
+#include "fleet/loop/end_signals.h"
 #include "fleet/server/api/api_server.h"
+#include "fleet/server/api/metrics/metrics_server.h"
 #include "fleet/server/commands/command_line.h"
 #include "fleet/server/commands/command_table.h"
+#include "fleet/server/keys/files/keys_error.h"
 #include "fleet/server/service/centre_service.h"
 
 namespace fleet {
 namespace {
 
-/// Blocked in all threads, so that one thread waits for them.
-sigset_t blockSignals() {
-    ::signal(SIGPIPE, SIG_IGN);
-    sigset_t signals;
-    ::sigemptyset(&signals);
-    ::sigaddset(&signals, SIGTERM);
-    ::sigaddset(&signals, SIGINT);
-    ::pthread_sigmask(SIG_BLOCK, &signals, nullptr);
-    return signals;
-}
-
-/// Ends the service when a signal comes. Waits for one until it is destroyed.
-class SignalWaiter {
-public:
-    SignalWaiter(const sigset_t& signals, CentreService& service)
-        : thread_([signals, &service] {
-              int signal = 0;
-              ::sigwait(&signals, &signal);
-              service.end();
-          }) {}
-    ~SignalWaiter() {
-        ::pthread_kill(thread_.native_handle(), SIGTERM);
-        thread_.join();
-    }
-    SignalWaiter(const SignalWaiter&) = delete;
-    SignalWaiter& operator=(const SignalWaiter&) = delete;
-
-private:
-    std::thread thread_;
-};
-
 struct ServeOptions {
     ServiceOptions service;
     std::string address;
-    int port = -1;  ///< -1: that of the fleet's URL
+    int port = -1;         ///< -1: that of the fleet's URL
+    int metricsPort = -1;  ///< -1: nobody reads metrics
+    bool console = false;
 };
 
 ListenPlace placeOf(const ServeOptions& options, const CentreService& service) {
     if (options.port >= 0) return {options.address, static_cast<std::uint16_t>(options.port)};
     const ServerUrl url = readServerUrl(service.directory().facts().url);
     return {options.address, static_cast<std::uint16_t>(std::stoi(url.port))};
+}
+
+/// Empty if browsers are not to be served.
+std::vector<console::PageFile> pageOf(const ServeOptions& options) {
+    if (!options.console) return {};
+    std::vector<console::PageFile> page = console::embeddedPage();
+    if (page.empty()) throw KeysError("this zavfleetd was built without the console's page");
+    return page;
 }
 
 /// A client takes three; the usual limit of 1,024 would be used up by those of one place.
@@ -74,10 +56,15 @@ int serve(ServeOptions options, Surroundings& around) {
     nameProgram("zavfleetd");
     options.service.directory = around.directory;
     raiseDescriptorLimit();
-    const sigset_t signals = blockSignals();
+    const EndSignals signals;
     CentreService service(options.service);
-    const ApiServer server(service, placeOf(options, service));
-    const SignalWaiter waiter(signals, service);
+    ApiServer server(service, placeOf(options, service), pageOf(options));
+    std::optional<MetricsServer> metrics;
+    if (options.metricsPort >= 0) {
+        metrics.emplace(server.metricsSources(), static_cast<std::uint16_t>(options.metricsPort));
+        around.out << "metrics on port " << metrics->port() << std::endl;
+    }
+    const EndWaiter waiter(signals, [&service] { service.end(); });
     around.out << "started, listening on port " << server.port() << std::endl;
     return service.run() == CentreProgram::End::Asked ? kDone : kFailed;
 }
@@ -100,6 +87,12 @@ Action declareServe(CLI::App& app) {
     app.add_option("--port", options->port,
                    "The port there; without it that of the fleet's URL; 0 is any that is free")
         ->check(CLI::Range(0, 65535));
+    app.add_option("--metrics-port", options->metricsPort,
+                   "The port of 127.0.0.1 at which a monitoring system reads /v1/metrics by HTTP; "
+                   "without it none; 0 is any that is free")
+        ->check(CLI::Range(0, 65535));
+    app.add_flag("--console", options->console,
+                 "Serve the console to browsers at that port as well, only to look at");
     return [options](Surroundings& around) { return serve(*options, around); };
 }
 

@@ -5,13 +5,16 @@
 #pragma once
 
 #include <functional>
+#include <map>
 #include <optional>
 #include <set>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "fleet/bus/messages/hello.h"
 #include "fleet/server/core/centre_bus.h"
+#include "fleet/server/core/centre_counts.h"
 #include "fleet/server/core/centre_store.h"
 
 namespace fleet {
@@ -34,8 +37,8 @@ public:
 
     using TellAlarm = std::function<void(const Alarm&)>;
 
-    /// Borrows the store and the bus.
-    Centre(CentreStore& store, CentreBus& bus, TellAlarm alarm);
+    /// Borrows the store and the bus, and the counts if there are any.
+    Centre(CentreStore& store, CentreBus& bus, TellAlarm alarm, CentreCounts* counts = nullptr);
 
     /// Gives an order its number; it is durable when this returns. `seal` puts a signed number and
     /// the order together. Nothing if there is no such host.
@@ -47,16 +50,20 @@ public:
     bool work(std::size_t most);
 
     /// The reply to a hello that its host has signed; nothing for a host that nobody has enrolled,
-    /// nor to a hello that is older than one before.
+    /// nor to a hello that is older than one before, or the same.
     std::optional<Reply> greet(const std::string& host, const Hello& hello, Moment now);
 
     /// Takes an outcome that its host has signed. When this returns, the bus may forget it.
     void hear(const Outcome& outcome);
 
-    /// Tells of an order that was found on the bus, by the hourly sweep or after the database was
-    /// put back from a backup. One that is over will be removed: a lost answer, or a bus that lost
-    /// its newest messages, has left it there. One that this database does not know is adopted.
-    void foundOnBus(const OrderRecord& order);
+    /// Tells of an order that the hourly sweep has found on the bus. One that is over will be
+    /// removed: a lost answer, or a bus that lost its newest messages, has left it there. If this
+    /// database does not know it, one of both is wrong, and nothing is published for its host.
+    ///
+    /// While a database that was put back learns what it has forgotten, it adopts the order.
+    void foundOnBus(const OrderRecord& order, Moment now);
+    /// The same, while the database is being put back.
+    void adoptFromBus(const OrderRecord& order);
     /// The end of a restore: numbers that may have been given are skipped, and from now on hosts
     /// are asked what they have.
     void restored(Moment now);
@@ -66,12 +73,18 @@ public:
     bool isBehind() const { return ahead_.size() > 1; }
 
 private:
-    using Place = std::pair<std::string, Number>;
+    /// What the bus has taken of some orders. It has no room for the others, or says nothing of
+    /// them.
+    enum class Published { All, Some, Unanswered };
 
     bool publish(std::size_t most);
-    bool publishOne(const OrderRecord& order);
+    Published publishAll(const std::vector<OrderRecord>& orders);
+    Published publishTogether(const std::vector<OrderRecord>& orders);
+    bool comparePublished(const std::vector<OrderRecord>& orders);
+    void notePublished(const OrderRecord& order);
     bool publishAgain(std::size_t most);
     bool removeOver(std::size_t most);
+    bool removeTogether(const std::vector<OrderPlace>& places);
     void noteSession(HostRecord& record, const Hello& hello);
     void noteTaken(HostRecord& record, const Hello& hello, bool isListing);
     void stopPublishing(HostRecord& record, const std::string& why);
@@ -81,8 +94,11 @@ private:
     CentreStore& store_;
     CentreBus& bus_;
     const TellAlarm alarm_;
-    std::set<Place> again_;        ///< published before, and perhaps lost by the bus since
-    std::set<Place> over_;         ///< still to be removed from the bus
+    CentreCounts* const counts_;                 ///< may be null
+    std::map<std::string, std::string> nonces_;  ///< of each host's latest hello
+    std::size_t withoutRoom_ = 0;                ///< orders that the bus has refused in this turn
+    std::set<OrderPlace> again_;   ///< published before, and perhaps lost by the bus since
+    std::set<OrderPlace> over_;    ///< still to be removed from the bus
     std::set<std::string> ahead_;  ///< hosts that have taken what this database never gave
 };
 

@@ -32,13 +32,13 @@ public:
     virtual std::optional<OrderRecord> order(const std::string& host,
                                              const std::string& order) const = 0;
     virtual std::optional<OrderRecord> orderAt(const std::string& host, Number number) const = 0;
-    /// Orders without an outcome that wait to be published, the lowest numbers of each host first,
-    /// but for hosts for which nothing is published.
-    virtual std::vector<OrderRecord> unpublished(std::size_t most) const = 0;
+    /// Orders without an outcome that wait to be published, the lowest numbers first, but for hosts
+    /// for which nothing is published. The first `skipped` of them are left out.
+    virtual std::vector<OrderRecord> unpublished(std::size_t most, std::size_t skipped) const = 0;
     virtual void notePublished(const std::string& host, Number number) = 0;
     /// Orders without an outcome whose number is at least `from` and at most `upTo`, ascending.
-    virtual std::vector<OrderRecord> open(const std::string& host, Number from, Number upTo,
-                                          std::size_t most) const = 0;
+    virtual std::vector<OpenOrder> open(const std::string& host, Number from, Number upTo,
+                                        std::size_t most) const = 0;
     virtual void keepOutcome(const Outcome& outcome) = 0;
 
     /// Skips `count` numbers of every host, and all below `atLeast`; publishes for all of them

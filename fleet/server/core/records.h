@@ -34,4 +34,11 @@ struct OrderRecord {
     std::optional<Outcome> outcome;
 };
 
+/// An order without an outcome. Its bytes stay where they are: a host may have many, and long ones.
+struct OpenOrder {
+    Number number = 0;  ///< as in OrderRecord
+    std::string order;
+    bool isPublished = false;
+};
+
 }  // namespace fleet

@@ -11,6 +11,7 @@
 #include "fleet/bus/messages/order.h"
 #include "fleet/bus/trust/signed.h"
 #include "fleet/log/log.h"
+#include "fleet/server/program/counted_transaction.h"
 #include "fleet/server/store/host_facts.h"
 #include "sqlite/transaction.h"
 
@@ -59,7 +60,8 @@ std::optional<std::pair<std::string, Number>> placeOf(const std::string& subject
 CentreProgram::CentreProgram(CentreSettings settings)
     : settings_(std::move(settings)),
       database_(settings_.directory),
-      store_(database_.connection()) {}
+      store_(database_.connection()),
+      leaseTerm_(settings_.leaseTerm) {}
 
 CentreProgram::~CentreProgram() = default;
 
@@ -110,7 +112,10 @@ void CentreProgram::connect() {
     options.events.error = [](const std::string& what) {
         say(Priority::Warning, "the bus: " + what);
     };
+    options.events.disconnected = [this] { isConnected_ = false; };
+    options.events.reconnected = [this] { isConnected_ = true; };
     options.events.closed = [this](const std::string& why) {
+        isConnected_ = false;
         if (isEnding_ || isReaching_ || isBusLost_.exchange(true)) return;
         say(Priority::Error, "the bus refuses this centre: " + why);
         mailbox_.put([this] {
@@ -118,11 +123,14 @@ void CentreProgram::connect() {
         });
     };
     while (!isEnding_) {
+        // Events of the new connection may come before it is told to be there.
+        isConnected_ = true;
         Connection::Result result = Connection::connect(options);
         if (result.connection) {
             connection_ = std::move(result.connection);
             return;
         }
+        isConnected_ = false;
         if (std::exchange(last, result.text) != result.text) {
             say(Priority::Warning, "no connection to the bus: " + result.text);
         }
@@ -162,7 +170,7 @@ void CentreProgram::reachAnew() {
 void CentreProgram::prepareLease() {
     lease_ = std::make_unique<Lease>(*connection_,
                                      Lease::Settings{kCentreStream, kLeaseSubject, settings_.holder,
-                                                     settings_.leaseTerm, settings_.leaseTerm / 3});
+                                                     settings_.leaseTerm, leaseTerm_.deadline()});
 }
 
 /// Waits until this centre may work. False if it is to end before.
@@ -182,10 +190,8 @@ bool CentreProgram::claim() {
         if (ensureStreams()) {
             answered = asked;
             const Lease::State state = lease_->claim();
-            if (state.kind == Lease::State::Kind::Ours) {
-                leaseUntil_ = (asked + settings_.leaseTerm).time_since_epoch().count();
-                return true;
-            }
+            leaseTerm_.judge(state.kind, asked, Steady::now());
+            if (state.kind == Lease::State::Kind::Ours && hasLease()) return true;
             if (std::exchange(last, state.text) != state.text) {
                 say(Priority::Notice, "waiting for the lease: " + state.text);
             }
@@ -195,28 +201,60 @@ bool CentreProgram::claim() {
     return false;
 }
 
+/// On the renewer's thread.
 void CentreProgram::renewLease() {
-    while (renewer_->pause(settings_.leaseTerm / 3)) {
+    std::string trouble;
+    milliseconds pause = leaseTerm_.pause();
+    while (renewer_->pause(pause)) {
         const auto asked = Steady::now();
         const Lease::State state = lease_->renew();
-        if (state.kind != Lease::State::Kind::Ours) {
-            mailbox_.put([this, text = state.text] {
-                say(Priority::Error, "the lease is lost: " + text);
-                if (!end_) end_ = End::LeaseLost;
-            });
-            return;
+        switch (leaseTerm_.judge(state.kind, asked, Steady::now())) {
+            case LeaseTerm::Next::Renew:
+                counts_.renewals.add();
+                trouble.clear();
+                pause = leaseTerm_.pause();
+                break;
+            case LeaseTerm::Next::Repeat:
+                counts_.repeatedRenewals.add();
+                if (std::exchange(trouble, state.text) != state.text) {
+                    say(Priority::Warning, "the lease is not renewed yet: " + state.text);
+                }
+                pause = leaseTerm_.pauseOfRepeats();
+                break;
+            case LeaseTerm::Next::Stop:
+                mailbox_.put([this, text = state.text] { loseLease(text); });
+                return;
         }
-        leaseUntil_ = (asked + settings_.leaseTerm).time_since_epoch().count();
     }
 }
 
+void CentreProgram::loseLease(const std::string& why) {
+    if (end_) return;
+    say(Priority::Error, "the lease is lost: " + why);
+    end_ = End::LeaseLost;
+}
+
 bool CentreProgram::hasLease() const {
-    return Steady::now().time_since_epoch().count() < leaseUntil_;
+    return leaseTerm_.isOurs(Steady::now());
+}
+
+std::optional<milliseconds> CentreProgram::leaseAge() const {
+    if (!isWorking_) return std::nullopt;
+    return leaseTerm_.age(Steady::now());
 }
 
 bool CentreProgram::beginWork() {
+    // First: to complete a database that was put back may take longer than the lease lasts.
+    renewer_ = std::make_unique<Worker>();
+    renewer_->add([this] { renewLease(); });
     bus_ = std::make_unique<NatsCentreBus>(*connection_, [this] { return hasLease(); });
-    centre_ = std::make_unique<Centre>(store_, *bus_, settings_.alarm);
+    centre_ = std::make_unique<Centre>(
+        store_, *bus_,
+        [this](const Alarm& alarm) {
+            counts_.alarms.add();
+            if (settings_.alarm) settings_.alarm(alarm);
+        },
+        &counts_);
     if (store_.isPutBack() && !completePutBack()) return false;
     hellos_ = hear(std::string(kHelloSubject) + '*',
                    [this](const BusMessage& message) { takeHello(message); });
@@ -228,8 +266,6 @@ bool CentreProgram::beginWork() {
     facts_ = std::make_unique<HostFeed>(*connection_,
                                         HostFeed::Source{kHostsStream, kFactsSubject, "facts"},
                                         [this](const auto& told) { return takeFacts(told); });
-    renewer_ = std::make_unique<Worker>();
-    renewer_->add([this] { renewLease(); });
     sweeper_ = std::make_unique<Worker>();
     sweeper_->add([this] { sweep(); });
     isWorking_ = true;
@@ -271,12 +307,17 @@ bool CentreProgram::completePutBack() {
         return false;
     }
     sqlite::Transaction all(database_.connection());
-    for (const std::string& subject : found.subjects)
-        checkOnBus(subject);
     const Moment at = wallClock();
-    centre_->restored(at);
+    // Before the look at the bus: orders of hosts that joined after the copy was made count, too.
     CentreParts parts{*centre_, store_, database_.connection(), news_};
     if (settings_.putBack) settings_.putBack(parts, at);
+    const TellFound adopt = [this](const OrderRecord& order) { centre_->adoptFromBus(order); };
+    for (const std::string& subject : found.subjects) {
+        if (checkOnBus(subject, adopt)) continue;
+        say(Priority::Error, "the bus does not say what " + subject + " is");
+        return false;
+    }
+    centre_->restored(at);
     store_.noteCompleted();
     all.commit();
     say(Priority::Notice, "the database was put back; orders on the bus: " +
@@ -294,6 +335,8 @@ void CentreProgram::loop() {
         } else if (Steady::now() < nextWork) {
             continue;
         }
+        // The renewer may wait for an answer meanwhile.
+        if (!hasLease()) loseLease("the bus has not renewed it in time");
         if (end_) return;
         const bool isDue = Steady::now() >= nextLook;
         if (isDue) nextLook = Steady::now() + (attend() ? milliseconds(0) : milliseconds(kPause));
@@ -305,7 +348,7 @@ void CentreProgram::loop() {
 /// Those that wait already share the transaction. What they let others know is told when it is
 /// durable.
 void CentreProgram::readLetters(Mailbox::Letter first) {
-    sqlite::Transaction batch(database_.connection());
+    CountedTransaction batch(database_.connection(), counts_);
     first();
     for (std::size_t i = 1; i < kMostAtOnce && !end_; ++i) {
         const std::optional<Mailbox::Letter> next = mailbox_.take(Mailbox::Clock::time_point());
@@ -319,7 +362,7 @@ void CentreProgram::readLetters(Mailbox::Letter first) {
 
 bool CentreProgram::attend() {
     if (!settings_.attend) return false;
-    sqlite::Transaction step(database_.connection());
+    CountedTransaction step(database_.connection(), counts_);
     CentreParts parts{*centre_, store_, database_.connection(), news_};
     const bool isMore = settings_.attend(parts, wallClock());
     step.commit();
@@ -329,7 +372,7 @@ bool CentreProgram::attend() {
 /// Notes of what was published share a transaction, too: what is published and not noted is found
 /// on the bus when it is published again. Returns whether there is more to do at once.
 bool CentreProgram::workOnBus() {
-    sqlite::Transaction batch(database_.connection());
+    CountedTransaction batch(database_.connection(), counts_);
     const bool isMore = centre_->work(kMostAtOnce);
     batch.commit();
     return isMore;
@@ -338,8 +381,11 @@ bool CentreProgram::workOnBus() {
 /// On a thread of the bus.
 void CentreProgram::takeHello(const BusMessage& message) {
     const std::string host = message.subject.substr(sizeof kHelloSubject - 1);
-    if (!helloLimit_.admits(host, Steady::now())) return;
-    if (waitingHellos_ >= kMostHellos || message.reply.empty()) return;
+    if (message.reply.empty()) return;
+    if (!helloLimit_.admits(host, Steady::now()) || waitingHellos_ >= kMostHellos) {
+        counts_.unheard.add();
+        return;
+    }
     ++waitingHellos_;
     mailbox_.put([this, host, reply = message.reply, bytes = message.data] {
         --waitingHellos_;
@@ -357,6 +403,7 @@ void CentreProgram::answerHello(const std::string& host, const std::string& repl
         if (!answer) return;
         if (settings_.revoked) answer->revoked = settings_.revoked();
         noteNews(host, hello, wallClock());
+        counts_.hellos.add();
         afterCommit_.push_back([this, reply, text = signReply(host, *answer, settings_.key)] {
             if (hasLease()) static_cast<void>(connection_->publish(reply, text));
         });
@@ -466,33 +513,36 @@ void CentreProgram::sweepOnce() {
     for (const std::string& subject : found.subjects) {
         // Each waits for its turn, so that nobody waits for all of them.
         ask([this, subject](Parts&) {
-            checkOnBus(subject);
-            return true;
+            return checkOnBus(subject, [this](const OrderRecord& order) {
+                centre_->foundOnBus(order, wallClock());
+            });
         }).get();
     }
 }
 
-void CentreProgram::checkOnBus(const std::string& subject) {
+bool CentreProgram::checkOnBus(const std::string& subject, const TellFound& tell) {
     const auto place = placeOf(subject);
-    if (!place) return;
+    if (!place) return true;
     const auto& [host, number] = *place;
     if (const std::optional<OrderRecord> known = store_.orderAt(host, number)) {
-        if (known->outcome) centre_->foundOnBus(*known);
-        return;
+        if (known->outcome) tell(*known);
+        return true;
     }
-    const FetchAnswer answer = bus_->fetch(host, number);
+    const FetchAnswer answer = bus_->fetch({{host, number}}).front();
+    if (std::holds_alternative<Unanswered>(answer)) return false;
     const auto* const stored = std::get_if<StoredOrder>(&answer);
-    if (stored == nullptr) return;
-    // Only what this centre has signed itself is adopted.
+    if (stored == nullptr) return true;
+    // Only what this centre has signed itself counts.
     const std::optional<NumberedOrder> numbered =
         readNumber(stored->bytes, host, number, ownKeys());
-    if (!numbered) return;
+    if (!numbered) return true;
     OrderRecord order;
     order.host = host;
     order.number = number;
     order.order = numbered->order;
     order.bytes = stored->bytes;
-    centre_->foundOnBus(order);
+    tell(order);
+    return true;
 }
 
 }  // namespace fleet

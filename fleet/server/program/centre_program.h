@@ -18,8 +18,10 @@
 #include "fleet/loop/mailbox.h"
 #include "fleet/loop/worker.h"
 #include "fleet/server/core/centre.h"
+#include "fleet/server/core/centre_counts.h"
 #include "fleet/server/program/hello_limit.h"
 #include "fleet/server/program/host_feed.h"
+#include "fleet/server/program/lease_term.h"
 #include "fleet/server/program/nats_centre_bus.h"
 #include "fleet/server/program/question_desk.h"
 #include "fleet/server/program/told_labels.h"
@@ -108,6 +110,12 @@ public:
 
     /// Whether it has the lease and works. Any thread.
     bool isWorking() const { return isWorking_; }
+    /// Whether there is a connection to the bus. Any thread.
+    bool isConnected() const { return isConnected_; }
+    /// How long ago the lease was claimed or renewed; nothing unless it works. Any thread.
+    std::optional<std::chrono::milliseconds> leaseAge() const;
+    /// Any thread.
+    const CentreCounts& counts() const { return counts_; }
     /// Of all hosts that were heard since the start. Any thread but that of run().
     std::future<std::map<std::string, HostNews>> news();
     /// Any thread.
@@ -142,10 +150,14 @@ private:
     void sweepOnce();
     std::vector<std::string> ownKeys() const;
     bool hasLease() const;
-    void checkOnBus(const std::string& subject);
+    /// False if the bus does not say what is there.
+    using TellFound = std::function<void(const OrderRecord&)>;
+    bool checkOnBus(const std::string& subject, const TellFound& tell);
     void renewLease();
+    void loseLease(const std::string& why);
 
     const CentreSettings settings_;
+    CentreCounts counts_;
     CentreDatabase database_;
     SqliteCentreStore store_;
     Mailbox mailbox_;
@@ -153,11 +165,11 @@ private:
     std::vector<std::function<void()>> afterCommit_;
     std::optional<End> end_;
     std::atomic<bool> isEnding_{false};
-    std::atomic<bool> isWorking_{false};   // and the loop reads letters
+    std::atomic<bool> isWorking_{false};  // and the loop reads letters
+    std::atomic<bool> isConnected_{false};
     std::atomic<bool> isReaching_{false};  // the connection is closed to make another one
     std::atomic<bool> isBusLost_{false};   // the bus wants this centre no more
-    /// Until when the lease is surely ours, in ticks of the steady clock.
-    std::atomic<std::chrono::steady_clock::rep> leaseUntil_{0};
+    LeaseTerm leaseTerm_;
     std::map<std::string, HostNews> news_;
     ToldLabels toldLabels_;
     QuestionDesk questions_;

@@ -11,6 +11,15 @@ namespace {
 
 constexpr std::chrono::seconds kAnswerTime{5};
 
+/// The store's code for why it does not take a message.
+bool isWantOfRoom(int code) {
+    constexpr int kNoResources = 10023;
+    constexpr int kTooLong = 10054;
+    constexpr int kNoStorage = 10047;
+    constexpr int kStoreFailed = 10077;  // the stream has reached a limit
+    return code == kNoResources || code == kTooLong || code == kNoStorage || code == kStoreFailed;
+}
+
 }  // namespace
 
 std::string taskSubject(const std::string& host, Number number) {
@@ -20,26 +29,45 @@ std::string taskSubject(const std::string& host, Number number) {
 NatsCentreBus::NatsCentreBus(Connection& connection, std::function<bool()> mayChange)
     : connection_(connection), mayChange_(std::move(mayChange)) {}
 
-StoreAnswer NatsCentreBus::store(const std::string& host, Number number, const std::string& bytes) {
-    if (!mayChange_()) return Unanswered{};
-    StoreResult result = storeFirst(connection_, taskSubject(host, number), bytes, kAnswerTime);
-    trouble_.clear();
-    if (result.kind == StoreResult::Kind::Stored) return Stored{};
-    if (result.kind == StoreResult::Kind::Occupied) return Occupied{};
-    trouble_ = std::move(result.text);
-    return Unanswered{};
+std::vector<StoreAnswer> NatsCentreBus::store(const std::vector<PlacedOrder>& orders) {
+    std::vector<StoreAnswer> answers(orders.size(), Unanswered{});
+    if (!mayChange_()) return answers;
+    std::vector<StoreRequest> requests;
+    for (const PlacedOrder& order : orders)
+        requests.push_back({taskSubject(order.place.host, order.place.number), order.bytes});
+    const std::vector<StoreResult> results = storeFirst(connection_, requests, kAnswerTime);
+    for (std::size_t i = 0; i < orders.size(); ++i) {
+        if (results[i].kind == StoreResult::Kind::Stored) {
+            answers[i] = Stored{};
+        } else if (results[i].kind == StoreResult::Kind::Occupied) {
+            answers[i] = Occupied{};
+        } else if (results[i].kind == StoreResult::Kind::Refused && isWantOfRoom(results[i].code)) {
+            answers[i] = NoRoom{};
+        }
+    }
+    return answers;
 }
 
-FetchAnswer NatsCentreBus::fetch(const std::string& host, Number number) {
-    LastResult found = lastOn(connection_, kTasksStream, taskSubject(host, number), kAnswerTime);
-    if (found.kind == LastResult::Kind::Missing) return NotThere{};
-    if (found.kind != LastResult::Kind::Found) return Unanswered{};
-    return StoredOrder{found.sequence, std::move(found.bytes)};
+std::vector<FetchAnswer> NatsCentreBus::fetch(const std::vector<OrderPlace>& places) {
+    std::vector<std::string> subjects;
+    for (const OrderPlace& place : places)
+        subjects.push_back(taskSubject(place.host, place.number));
+    std::vector<FetchAnswer> answers;
+    for (LastResult& found : lastOn(connection_, kTasksStream, subjects, kAnswerTime)) {
+        if (found.kind == LastResult::Kind::Found) {
+            answers.emplace_back(StoredOrder{found.sequence, std::move(found.bytes)});
+        } else if (found.kind == LastResult::Kind::Missing) {
+            answers.emplace_back(NotThere{});
+        } else {
+            answers.emplace_back(Unanswered{});
+        }
+    }
+    return answers;
 }
 
-void NatsCentreBus::erase(std::uint64_t sequence) {
+void NatsCentreBus::erase(const std::vector<std::uint64_t>& sequences) {
     if (!mayChange_()) return;
-    static_cast<void>(fleet::erase(connection_, kTasksStream, sequence, kAnswerTime));
+    static_cast<void>(fleet::erase(connection_, kTasksStream, sequences, kAnswerTime));
 }
 
 }  // namespace fleet

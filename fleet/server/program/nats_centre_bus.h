@@ -1,8 +1,10 @@
 /// The bus of a centre.
 #pragma once
 
+#include <cstdint>
 #include <functional>
 #include <string>
+#include <vector>
 
 #include "fleet/bus/nats/connection.h"
 #include "fleet/server/core/centre_bus.h"
@@ -16,17 +18,13 @@ public:
     /// changed on the bus, and nothing is answered.
     NatsCentreBus(Connection& connection, std::function<bool()> mayChange);
 
-    StoreAnswer store(const std::string& host, Number number, const std::string& bytes) override;
-    FetchAnswer fetch(const std::string& host, Number number) override;
-    void erase(std::uint64_t sequence) override;
-
-    /// Why the last try to store was not answered; "" if it was.
-    const std::string& trouble() const { return trouble_; }
+    std::vector<StoreAnswer> store(const std::vector<PlacedOrder>& orders) override;
+    std::vector<FetchAnswer> fetch(const std::vector<OrderPlace>& places) override;
+    void erase(const std::vector<std::uint64_t>& sequences) override;
 
 private:
     Connection& connection_;
     const std::function<bool()> mayChange_;
-    std::string trouble_;
 };
 
 /// "task.HOST.NUMBER", where the order with this number is stored.

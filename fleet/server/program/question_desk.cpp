@@ -9,7 +9,7 @@ namespace {
 /// One reply to the operator has no more than that, and one answer.
 constexpr std::size_t kMostFetched = std::size_t{1} << 20;
 /// A link's answers are shorter.
-constexpr std::size_t kLongestAnswer = 256 * 1024;
+constexpr std::size_t kLongestAnswer = std::size_t{256} * 1024;
 
 }  // namespace
 
@@ -27,7 +27,7 @@ void QuestionDesk::close() {
 }
 
 void QuestionDesk::endRound(Rounds::iterator round) {
-    for (const auto& place : round->second.asked)
+    for (const auto& [place, until] : round->second.asked)
         roundOf_.erase(place);
     bytes_ -= round->second.bytes;
     rounds_.erase(round);
@@ -61,18 +61,42 @@ std::optional<std::string> QuestionDesk::ask(const std::string& operatorKey,
     if (!publish_ || rounds_.size() >= kMostRounds || asked.size() > kMostHosts) {
         return std::nullopt;
     }
-    const std::string id = makeOrderId();
-    Round& round = rounds_[id];
-    round.operatorKey = operatorKey;
-    round.until = now + kRoundTime;
+    const auto made = rounds_.emplace(makeOrderId(), Round()).first;
+    made->second.operatorKey = operatorKey;
+    publish(made, asked, now);
+    return made->first;
+}
+
+bool QuestionDesk::askAgain(const std::string& operatorKey, const std::string& round,
+                            const std::vector<Asked>& asked, Moment now) {
+    const std::lock_guard lock(mutex_);
+    endOver(now);
+    const auto found = rounds_.find(round);
+    const bool isOwn = found != rounds_.end() && found->second.operatorKey == operatorKey;
+    if (!publish_ || !isOwn) return false;
+    forgetOldQuestions(found->second, now);
+    if (found->second.asked.size() + asked.size() > kMostHosts) return false;
+    publish(found, asked, now);
+    return true;
+}
+
+void QuestionDesk::publish(Rounds::iterator round, const std::vector<Asked>& asked, Moment now) {
+    round->second.until = now + kRoundTime;
     for (const Asked& one : asked) {
-        const std::pair place(one.host, one.question);
+        const Place place(one.host, one.question);
         // A question that is repeated stays with the round that asked it first.
-        if (!roundOf_.emplace(place, id).second) continue;
-        round.asked.insert(place);
+        if (!roundOf_.emplace(place, round->first).second) continue;
+        round->second.asked.emplace(place, round->second.until);
         publish_(one.host, one.bytes);
     }
-    return id;
+}
+
+void QuestionDesk::forgetOldQuestions(Round& round, Moment now) {
+    for (auto one = round.asked.begin(); one != round.asked.end();) {
+        const bool isOld = one->second <= now;
+        if (isOld) roundOf_.erase(one->first);
+        one = isOld ? round.asked.erase(one) : std::next(one);
+    }
 }
 
 void QuestionDesk::hear(const std::string& host, const std::string& bytes, Moment now) {

@@ -7,7 +7,6 @@
 #include <map>
 #include <mutex>
 #include <optional>
-#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -21,7 +20,7 @@ namespace fleet {
 /// room is dropped, and seen as lost by its place. Any thread.
 class QuestionDesk {
 public:
-    static constexpr std::size_t kMostOfOperator = 4;  ///< rounds; an older one ends
+    static constexpr std::size_t kMostOfOperator = 8;  ///< rounds; an older one ends
     static constexpr std::size_t kMostRounds = 64;
     static constexpr std::size_t kMostHosts = 500;  ///< of a round
     static constexpr std::size_t kMostBytesOfRound = std::size_t{16} << 20;
@@ -46,6 +45,11 @@ public:
     /// The identifier of the round; nothing if there are too many, or the desk is closed.
     std::optional<std::string> ask(const std::string& operatorKey, const std::vector<Asked>& asked,
                                    Moment now);
+    /// Asks further questions in a round, which lasts longer by that: its older questions may still
+    /// be answered for kRoundTime. False if the operator has no such round, or with these it would
+    /// have more than kMostHosts of them.
+    bool askAgain(const std::string& operatorKey, const std::string& round,
+                  const std::vector<Asked>& asked, Moment now);
     /// A host has answered. It counts only if it was asked that.
     void hear(const std::string& host, const std::string& bytes, Moment now);
     /// What has come since the last call, as much as fits into one reply; nothing if the operator
@@ -54,14 +58,17 @@ public:
                                              const std::string& round, Moment now);
 
 private:
+    using Place = std::pair<std::string, std::string>;  ///< a host and a question
     struct Round {
         std::string operatorKey;
         Moment until{};
-        std::set<std::pair<std::string, std::string>> asked;  ///< hosts and questions
+        std::map<Place, Moment> asked;  ///< until when an answer counts
         std::deque<Answer> answers;
         std::size_t bytes = 0;
     };
     using Rounds = std::map<std::string, Round>;
+    void publish(Rounds::iterator round, const std::vector<Asked>& asked, Moment now);
+    void forgetOldQuestions(Round& round, Moment now);
     void endRound(Rounds::iterator round);
     void endOver(Moment now);
     void makeRoomFor(const std::string& operatorKey);
@@ -69,7 +76,7 @@ private:
     std::mutex mutex_;
     Publish publish_;
     Rounds rounds_;
-    std::map<std::pair<std::string, std::string>, std::string> roundOf_;
+    std::map<Place, std::string> roundOf_;
     std::size_t bytes_ = 0;
 };
 

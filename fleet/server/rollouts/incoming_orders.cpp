@@ -17,6 +17,10 @@ namespace {
 /// longer message: it would wait for ever for what has that number.
 constexpr std::size_t kMostOrderBytes = kMostSignedBytes - 4'096;
 
+/// A roll-out keeps these, and lists show them.
+constexpr std::size_t kLongestName = 128;
+constexpr std::size_t kLongestSelector = std::size_t{64} << 10;
+
 std::string textOr(const json& body, const char* member) {
     return body.contains(member) ? textIn(body, member) : "";
 }
@@ -31,12 +35,16 @@ IncomingOrder incomingOrderOf(const std::string& bytes, const RolloutOperator& b
     insistThat(order.expires > now, "it has expired");
     insistThat(order.expires <= order.issued + kLongestOrder, "it is good for more than 7 days");
     const json body = readDocument(order.body);
+    const std::string product = textOr(body, "product");
+    insistThat(order.kind.size() <= kLongestName && product.size() <= kLongestName,
+               "its kind or its product is too long");
+    insistThat(order.selector.size() <= kLongestSelector, "its selector is too long");
     IncomingOrder incoming;
     incoming.host = order.host;
     incoming.order = order.id;
     incoming.bytes = bytes;
     incoming.kind = order.kind;
-    incoming.product = textOr(body, "product");
+    incoming.product = product;
     incoming.selector = order.selector;
     if (order.kind == kCancel) incoming.cancels = textIn(body, "order");
     incoming.expires = order.expires;

@@ -98,7 +98,7 @@ struct Part {
     std::size_t wave = 0;      ///< the one in which it is released
     std::string order;         ///< the identifier of its latest order
     Moment expires{};          ///< until when that order may be carried out
-    std::size_t tries = 1;     ///< orders that the host was meant to get, this one included
+    std::size_t tries = 1;     ///< orders that were signed for it, this one included
     PartState state = PartState::Waiting;
     Number number = 0;   ///< the order's; 0 before it is released, or if only the host knows it
     EndState end;        ///< how it ended; "" before that

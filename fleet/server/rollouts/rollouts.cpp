@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <limits>
+#include <utility>
 
 #include "fleet/bus/messages/order.h"
 #include "fleet/server/rollouts/end_states.h"
@@ -68,7 +69,7 @@ std::vector<HostToSign> hostsToSign(const std::vector<Part>& parts) {
     std::vector<HostToSign> hosts;
     hosts.reserve(parts.size());
     for (const Part& part : parts)
-        hosts.push_back({part.host, part.order, part.end});
+        hosts.push_back({part.host, part.order, part.end, part.tries});
     return hosts;
 }
 
@@ -134,9 +135,23 @@ void Rollouts::pause(const std::string& id, const RolloutOperator& by, Moment no
     });
 }
 
-void Rollouts::pauseThoseOf(const std::vector<std::string>& revoked, Moment now) {
+bool Rollouts::isOfRevoked(const Rollout& rollout) const {
+    return std::find(revoked_.begin(), revoked_.end(), rollout.by.key) != revoked_.end();
+}
+
+/// Hosts refuse what still waits. That somebody else signs it anew would be no help: no client
+/// takes the centre's word for it that orders which have not expired will not run.
+void Rollouts::insistOnLivingKey(const Rollout& rollout) const {
+    insistOnState(!isOfRevoked(rollout),
+                  "the key of " + rollout.by.name +
+                      ", who made the roll-out, was revoked; abort it, and begin another one");
+}
+
+void Rollouts::pauseThoseOf(std::vector<std::string> revoked, Moment now) {
+    revoked_ = std::move(revoked);
+    if (revoked_.empty()) return;
     for (Rollout& rollout : store_.running()) {
-        if (std::find(revoked.begin(), revoked.end(), rollout.by.key) == revoked.end()) continue;
+        if (!isOfRevoked(rollout)) continue;
         store_.atomically([&] {
             enterState(rollout, RolloutState::Paused, now, PauseCause::Operator,
                        "the key of " + rollout.by.name + " was revoked");
@@ -154,6 +169,7 @@ void Rollouts::resume(const std::string& id, const RolloutOperator& by,
         Rollout rollout = find(id);
         insistOnState(rollout.state == RolloutState::Paused,
                       std::string("the roll-out is ") + nameOf(rollout.state) + ", not paused");
+        insistOnLivingKey(rollout);
         for (const IncomingOrder& order : incoming) {
             const Part part = partFor(rollout, order);
             insistThat(part.state == PartState::Waiting,
@@ -188,6 +204,7 @@ Part Rollouts::partFor(const Rollout& rollout, const IncomingOrder& order) const
 void Rollouts::replaceOrder(Part part, const IncomingOrder& order) {
     insistOnNewOrder(order);
     part.order = order.order;
+    ++part.tries;
     part.expires = order.expires;
     part.state = PartState::Waiting;
     part.number = 0;
@@ -248,6 +265,7 @@ void Rollouts::retryFailed(const std::string& id, const RolloutOperator& by,
     store_.atomically([&] {
         Rollout rollout = find(id);
         insistOnState(rollout.state != RolloutState::Aborted, "the roll-out has been aborted");
+        insistOnLivingKey(rollout);
         for (const IncomingOrder& order : incoming) {
             Part part = partFor(rollout, order);
             const bool isUnknown = part.state == PartState::Over && part.end == kUnknown;
@@ -258,7 +276,6 @@ void Rollouts::retryFailed(const std::string& id, const RolloutOperator& by,
                        "host " + order.host + " has not failed");
             insistOnSameWork(order, rollout);
             part.wave = std::max(part.wave, rollout.wave);
-            ++part.tries;
             replaceOrder(part, order);
         }
         if (rollout.state == RolloutState::Finished) {

@@ -29,6 +29,7 @@ struct HostToSign {
     std::string host;
     std::string order;  ///< the one that is replaced or cancelled
     EndState end;       ///< how that ended, if it did
+    std::size_t tries;  ///< as in Part
 };
 
 /// One thread at a time, and the same one that uses the centre's store.
@@ -49,8 +50,9 @@ public:
     /// Nothing more is released. What was released goes on.
     void pause(const std::string& id, const RolloutOperator& by, Moment now);
 
-    /// Pauses all that were made with one of these keys, which count no longer.
-    void pauseThoseOf(const std::vector<std::string>& revoked, Moment now);
+    /// These keys count no longer: what was made with them is paused, and does not go on. To be
+    /// called before each tick(), with all of them.
+    void pauseThoseOf(std::vector<std::string> revoked, Moment now);
 
     /// Goes on with a roll-out that is paused. `orders` replace those of hosts that still wait, and
     /// must do so for all that have expired: see toSignAnew(). Failures that have paused it are
@@ -95,6 +97,8 @@ public:
 
 private:
     Rollout find(const std::string& id) const;
+    bool isOfRevoked(const Rollout& rollout) const;
+    void insistOnLivingKey(const Rollout& rollout) const;
     void addParts(const Rollout& rollout, const std::vector<std::size_t>& waves,
                   const std::vector<IncomingOrder>& orders);
     void insistOnNewOrder(const IncomingOrder& order) const;
@@ -107,6 +111,7 @@ private:
     RolloutStore& store_;
     const std::string fleet_;
     RolloutPace pace_;
+    std::vector<std::string> revoked_;  ///< keys of operators
 };
 
 }  // namespace fleet

@@ -48,6 +48,9 @@ ConnectionOptions CentreService::busOptions() const {
     options.urls = facts_.busUrls;
     options.tls = TlsOptions{directory_.authorityFile(), facts_.names.front()};
     options.name = "zavfleetd";
+    // There is one centre, and its lease does not wait.
+    options.reconnectWait = std::chrono::milliseconds(500);
+    options.reconnectJitter = std::chrono::milliseconds(50);
     return options;
 }
 
@@ -91,8 +94,28 @@ CentreProgram::End CentreService::run() {
 bool CentreService::attend(CentreParts& parts, Moment now) {
     if (!rollouts_) begin(parts);
     revoked_ = RevokedKeys(trust_.connection()).operators(now);
-    if (!revoked_.empty()) rollouts_->pauseThoseOf(revoked_, now);
-    return rollouts_->tick(now);
+    rollouts_->pauseThoseOf(revoked_, now);
+    const bool isMoreToEnd = endOrdersOfRevoked(parts);
+    return rollouts_->tick(now) || isMoreToEnd;
+}
+
+/// How the open orders of a host that was revoked or replaced ended, nobody will tell. Some at a
+/// time; returns whether there may be more.
+bool CentreService::endOrdersOfRevoked(CentreParts& parts) {
+    constexpr std::size_t kMostEnded = 64;
+    const RevokedKeys keys(trust_.connection());
+    const std::int64_t count = keys.count();
+    if (count == endedFor_) return false;
+    std::size_t ended = 0;
+    for (const auto& [host, since] : keys.hosts()) {
+        const auto open = parts.store.open(host, 1, kHighestNumber, kMostEnded - ended);
+        for (const OpenOrder& order : open)
+            parts.centre.hear({host, order.number, order.order, "", kUnknown, ""});
+        ended += open.size();
+        if (ended == kMostEnded) return true;
+    }
+    endedFor_ = count;
+    return false;
 }
 
 void CentreService::begin(CentreParts& parts) {

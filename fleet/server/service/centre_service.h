@@ -67,6 +67,7 @@ private:
     CentreSettings settings(const ServiceOptions& options);
     ConnectionOptions busOptions() const;
     bool attend(CentreParts& parts, Moment now);
+    bool endOrdersOfRevoked(CentreParts& parts);
     void begin(CentreParts& parts);
 
     const FleetDirectory directory_;
@@ -74,6 +75,7 @@ private:
     const CentreKey key_;
     TrustDatabase trust_;  ///< for the thread of run()
     std::vector<std::string> revoked_;
+    std::int64_t endedFor_ = -1;  ///< the count of revocations whose hosts have no open orders
     std::unique_ptr<SqliteRolloutStore> rolloutStore_;
     std::unique_ptr<Rollouts> rollouts_;
     std::unique_ptr<CentreProgram> centre_;

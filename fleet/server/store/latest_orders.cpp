@@ -15,4 +15,12 @@ std::vector<OrderRecord> latestOrders(sqlite::Database& database, const std::str
     return orders;
 }
 
+std::vector<OrderRecord> ordersNamed(sqlite::Database& database, const std::string& order) {
+    std::vector<OrderRecord> orders;
+    sqlite::Statement rows = database.ask(kOrdersNamed, order);
+    while (rows.step())
+        orders.push_back(orderIn(rows));
+    return orders;
+}
+
 }  // namespace fleet

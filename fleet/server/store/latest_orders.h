@@ -1,4 +1,4 @@
-/// What a host was asked for last, for people.
+/// What hosts were asked for, for people.
 #pragma once
 
 #include <cstddef>
@@ -13,5 +13,9 @@ namespace fleet {
 /// The host's orders with the highest numbers, descending. Throws sqlite::DatabaseError.
 std::vector<OrderRecord> latestOrders(sqlite::Database& database, const std::string& host,
                                       std::size_t most);
+
+/// The orders of that identifier: each host may have one, and but for a bad operator only one has.
+/// Throws sqlite::DatabaseError.
+std::vector<OrderRecord> ordersNamed(sqlite::Database& database, const std::string& order);
 
 }  // namespace fleet

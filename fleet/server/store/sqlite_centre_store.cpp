@@ -141,17 +141,23 @@ std::optional<OrderRecord> SqliteCentreStore::orderAt(const std::string& host,
     return oneOf(database_.ask(kOrderByNumber, host, bounded(number)));
 }
 
-std::vector<OrderRecord> SqliteCentreStore::unpublished(std::size_t most) const {
-    return allOf(database_.ask(kUnpublished, bounded(most)));
+std::vector<OrderRecord> SqliteCentreStore::unpublished(std::size_t most,
+                                                        std::size_t skipped) const {
+    return allOf(database_.ask(kUnpublished, bounded(most), bounded(skipped)));
 }
 
 void SqliteCentreStore::notePublished(const std::string& host, Number number) {
     database_.change(kNotePublished, host, bounded(number));
 }
 
-std::vector<OrderRecord> SqliteCentreStore::open(const std::string& host, Number from, Number upTo,
-                                                 std::size_t most) const {
-    return allOf(database_.ask(kOpen, host, bounded(from), bounded(upTo), bounded(most)));
+std::vector<OpenOrder> SqliteCentreStore::open(const std::string& host, Number from, Number upTo,
+                                               std::size_t most) const {
+    Statement rows = database_.ask(kOpen, host, bounded(from), bounded(upTo), bounded(most));
+    std::vector<OpenOrder> orders;
+    while (rows.step())
+        orders.push_back(
+            {static_cast<Number>(rows.integer(0)), rows.bytes(1), rows.integer(2) != 0});
+    return orders;
 }
 
 void SqliteCentreStore::keepOutcome(const Outcome& outcome) {

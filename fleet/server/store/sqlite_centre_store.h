@@ -22,10 +22,10 @@ public:
     std::optional<OrderRecord> order(const std::string& host,
                                      const std::string& order) const override;
     std::optional<OrderRecord> orderAt(const std::string& host, Number number) const override;
-    std::vector<OrderRecord> unpublished(std::size_t most) const override;
+    std::vector<OrderRecord> unpublished(std::size_t most, std::size_t skipped) const override;
     void notePublished(const std::string& host, Number number) override;
-    std::vector<OrderRecord> open(const std::string& host, Number from, Number upTo,
-                                  std::size_t most) const override;
+    std::vector<OpenOrder> open(const std::string& host, Number from, Number upTo,
+                                std::size_t most) const override;
     void keepOutcome(const Outcome& outcome) override;
     void skipNumbers(Number count, Number atLeast, Moment listUntil) override;
     Moment listUntil() const override;

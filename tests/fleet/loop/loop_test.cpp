@@ -2,7 +2,9 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <filesystem>
 #include <future>
+#include <iterator>
 #include <memory>
 #include <vector>
 
@@ -46,6 +48,37 @@ TEST(Mailbox, AClosedOneDropsWhatIsInItAndWhatComes) {
     mailbox.put([content] {});
     EXPECT_EQ(content.use_count(), 1);
     EXPECT_FALSE(mailbox.take(Mailbox::Clock::now()).has_value());
+}
+
+TEST(Mailbox, TellsWhoeverEmptiesManyOfThemOfEachLetter) {
+    int told = 0;
+    Mailbox mailbox([&told] { ++told; });
+    mailbox.put([] {});
+    mailbox.put([] {});
+    EXPECT_EQ(told, 2);
+    mailbox.close();
+    mailbox.put([] {});
+    EXPECT_EQ(told, 2);
+}
+
+std::ptrdiff_t threadsNow() {
+    const std::filesystem::directory_iterator threads("/proc/self/task");
+    return std::distance(begin(threads), end(threads));
+}
+
+TEST(Worker, HasAThreadFromItsFirstJobOn) {
+    const std::ptrdiff_t before = threadsNow();
+    Worker worker;
+    EXPECT_EQ(threadsNow(), before);
+    worker.add([] {});
+    EXPECT_EQ(threadsNow(), before + 1);
+}
+
+TEST(Worker, ThatNeverHadAJobEndsAndCutsPausesShort) {
+    Worker worker;
+    worker.end();
+    EXPECT_FALSE(worker.pause(std::chrono::hours(1)));
+    worker.await();
 }
 
 TEST(Worker, JobsRunOneAfterTheOther) {

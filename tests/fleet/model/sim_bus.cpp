@@ -44,11 +44,32 @@ std::optional<std::pair<std::uint64_t, fleet::Outcome>> SimBus::nextOutcome() co
     return std::nullopt;
 }
 
-fleet::StoreAnswer SimCentreBus::store(const std::string& host, fleet::Number number,
-                                       const std::string& bytes) {
+/// Each of those that were asked together may be lost by itself, and the centre may be killed
+/// between any two of them.
+std::vector<fleet::StoreAnswer> SimCentreBus::store(const std::vector<fleet::PlacedOrder>& orders) {
+    std::vector<fleet::StoreAnswer> answers;
+    for (const fleet::PlacedOrder& order : orders)
+        answers.push_back(storeOne(order));
+    return answers;
+}
+
+std::vector<fleet::FetchAnswer> SimCentreBus::fetch(const std::vector<fleet::OrderPlace>& places) {
+    std::vector<fleet::FetchAnswer> answers;
+    for (const fleet::OrderPlace& place : places)
+        answers.push_back(fetchOne(place));
+    return answers;
+}
+
+void SimCentreBus::erase(const std::vector<std::uint64_t>& sequences) {
+    for (const std::uint64_t sequence : sequences)
+        eraseOne(sequence);
+}
+
+fleet::StoreAnswer SimCentreBus::storeOne(const fleet::PlacedOrder& order) {
+    const auto& [host, number] = order.place;
     if (dice_.fault(2)) throw Killed{};
     if (dice_.fault(3)) return fleet::Unanswered{};
-    const bool isNew = bus_.store(host, number, bytes);
+    const bool isNew = bus_.store(host, number, order.bytes);
     if (isNew) republish(host, number);
     if (dice_.fault(2)) throw Killed{};
     if (dice_.fault(5)) return fleet::Unanswered{};
@@ -56,10 +77,10 @@ fleet::StoreAnswer SimCentreBus::store(const std::string& host, fleet::Number nu
     return fleet::Occupied{};
 }
 
-fleet::FetchAnswer SimCentreBus::fetch(const std::string& host, fleet::Number number) {
+fleet::FetchAnswer SimCentreBus::fetchOne(const fleet::OrderPlace& place) {
     if (dice_.fault(2)) throw Killed{};
     if (dice_.fault(5)) return fleet::Unanswered{};
-    const std::optional<StoredMessage> message = bus_.fetch(host, number);
+    const std::optional<StoredMessage> message = bus_.fetch(place.host, place.number);
     // Between the two requests of a removal the bus may lose its newest messages, so that the
     // sequence names another message when it is used.
     if (dice_.fault(1)) bus_.losePower();
@@ -67,7 +88,7 @@ fleet::FetchAnswer SimCentreBus::fetch(const std::string& host, fleet::Number nu
     return fleet::StoredOrder{message->sequence, message->bytes};
 }
 
-void SimCentreBus::erase(std::uint64_t sequence) {
+void SimCentreBus::eraseOne(std::uint64_t sequence) {
     if (dice_.fault(2)) throw Killed{};
     if (dice_.fault(5)) return;
     bus_.erase(sequence);

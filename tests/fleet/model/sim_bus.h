@@ -9,6 +9,7 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "fleet/bus/messages/outcome.h"
 #include "fleet/server/core/centre_bus.h"
@@ -66,15 +67,18 @@ class SimCentreBus : public fleet::CentreBus {
 public:
     SimCentreBus(SimBus& bus, Dice& dice) : bus_(bus), dice_(dice) {}
 
-    fleet::StoreAnswer store(const std::string& host, fleet::Number number,
-                             const std::string& bytes) override;
-    fleet::FetchAnswer fetch(const std::string& host, fleet::Number number) override;
-    void erase(std::uint64_t sequence) override;
+    std::vector<fleet::StoreAnswer> store(const std::vector<fleet::PlacedOrder>& orders) override;
+    std::vector<fleet::FetchAnswer> fetch(const std::vector<fleet::OrderPlace>& places) override;
+    void erase(const std::vector<std::uint64_t>& sequences) override;
 
     /// Called for each order that the bus has newly stored: it is republished.
     std::function<void(const std::string&, fleet::Number)> republish;
 
 private:
+    fleet::StoreAnswer storeOne(const fleet::PlacedOrder& order);
+    fleet::FetchAnswer fetchOne(const fleet::OrderPlace& place);
+    void eraseOne(std::uint64_t sequence);
+
     SimBus& bus_;
     Dice& dice_;
 };

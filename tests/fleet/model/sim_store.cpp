@@ -1,6 +1,8 @@
 #include "tests/fleet/model/sim_store.h"
 
 #include <algorithm>
+#include <cstddef>
+#include <tuple>
 
 namespace model {
 
@@ -71,15 +73,18 @@ std::optional<fleet::OrderRecord> SimStore::orderAt(const std::string& host,
     return std::nullopt;
 }
 
-std::vector<fleet::OrderRecord> SimStore::unpublished(std::size_t most) const {
+std::vector<fleet::OrderRecord> SimStore::unpublished(std::size_t most, std::size_t skipped) const {
     std::vector<fleet::OrderRecord> orders;
     for (const auto& [place, order] : tables.orders) {
         if (order.isPublished || order.outcome || order.number == 0) continue;
         if (!tables.hosts.at(place.first).unpublished.empty()) continue;
         orders.push_back(order);
     }
-    std::sort(orders.begin(), orders.end(),
-              [](const auto& a, const auto& b) { return a.number < b.number; });
+    std::sort(orders.begin(), orders.end(), [](const auto& a, const auto& b) {
+        return std::tie(a.number, a.host) < std::tie(b.number, b.host);
+    });
+    orders.erase(orders.begin(),
+                 orders.begin() + static_cast<std::ptrdiff_t>(std::min(skipped, orders.size())));
     if (orders.size() > most) orders.resize(most);
     return orders;
 }
@@ -90,12 +95,13 @@ void SimStore::notePublished(const std::string& host, fleet::Number number) {
     mayDie();
 }
 
-std::vector<fleet::OrderRecord> SimStore::open(const std::string& host, fleet::Number from,
-                                               fleet::Number upTo, std::size_t most) const {
-    std::vector<fleet::OrderRecord> orders;
+std::vector<fleet::OpenOrder> SimStore::open(const std::string& host, fleet::Number from,
+                                             fleet::Number upTo, std::size_t most) const {
+    std::vector<fleet::OpenOrder> orders;
     for (const auto& [place, order] : tables.orders) {
         if (place.first != host || order.outcome) continue;
-        if (order.number >= from && order.number <= upTo) orders.push_back(order);
+        if (order.number < from || order.number > upTo) continue;
+        orders.push_back({order.number, order.order, order.isPublished});
     }
     std::sort(orders.begin(), orders.end(),
               [](const auto& a, const auto& b) { return a.number < b.number; });

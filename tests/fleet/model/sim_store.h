@@ -33,10 +33,11 @@ public:
                                             const std::string& order) const override;
     std::optional<fleet::OrderRecord> orderAt(const std::string& host,
                                               fleet::Number number) const override;
-    std::vector<fleet::OrderRecord> unpublished(std::size_t most) const override;
+    std::vector<fleet::OrderRecord> unpublished(std::size_t most,
+                                                std::size_t skipped) const override;
     void notePublished(const std::string& host, fleet::Number number) override;
-    std::vector<fleet::OrderRecord> open(const std::string& host, fleet::Number from,
-                                         fleet::Number upTo, std::size_t most) const override;
+    std::vector<fleet::OpenOrder> open(const std::string& host, fleet::Number from,
+                                       fleet::Number upTo, std::size_t most) const override;
     void keepOutcome(const fleet::Outcome& outcome) override;
     void skipNumbers(fleet::Number count, fleet::Number atLeast, fleet::Moment listUntil) override;
     fleet::Moment listUntil() const override { return tables.listUntil; }

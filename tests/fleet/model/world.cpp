@@ -151,7 +151,7 @@ void World::restoreCentre() {
     hasRestored_ = true;
     const bool faults = std::exchange(dice_.faults, false);
     startCentre();
-    sweep();
+    sweep([this](const fleet::OrderRecord& order) { centre_->adoptFromBus(order); });
     centre_->restored(now_);
     dice_.faults = faults;
 }
@@ -173,18 +173,18 @@ void World::serveCentre() {
     });
     asCentre([&] {
         if (!dice_.chance(2)) return;
-        sweep();
+        sweep([this](const fleet::OrderRecord& order) { centre_->foundOnBus(order, now_); });
     });
 }
 
-void World::sweep() {
+void World::sweep(const std::function<void(const fleet::OrderRecord&)>& tell) {
     const std::map<Place, StoredMessage> tasks = bus_.tasks();
     for (const auto& [place, message] : tasks) {
         fleet::OrderRecord found;
         found.host = place.first;
         found.bytes = message.bytes;
         found.order = orderIn(message.bytes, found.number).order;
-        centre_->foundOnBus(found);
+        tell(found);
     }
 }
 

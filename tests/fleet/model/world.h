@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <deque>
+#include <functional>
 #include <map>
 #include <memory>
 #include <optional>
@@ -57,7 +58,7 @@ private:
     void makePeace();
     bool isQuiet() const;
     void deliverHello();
-    void sweep();
+    void sweep(const std::function<void(const fleet::OrderRecord&)>& tell);
     template <typename Function>
     void asCentre(Function function);
     template <typename Function>

@@ -2,15 +2,11 @@
 // The programs zavctl and zavctl-fleet, with a centre whose answers the tests write.
 
 #include <gtest/gtest.h>
+#include <unistd.h>
 
-#include <atomic>
 #include <csignal>
-#include <deque>
-#include <map>
-#include <mutex>
 #include <nlohmann/json.hpp>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "ctl/client/failure.h"
@@ -23,74 +19,14 @@
 #include "tests/fleet/https/tls_server.h"
 #include "tests/fleet/operator/certified.h"
 #include "tests/fleet/operator/rollouts/rollout_documents.h"
+#include "tests/fleet/operator/scripted_centre.h"
 
 namespace {
 
-using fleet_test::TlsPeer;
-using fleet_test::TlsServer;
 using nlohmann::json;
 using operator_test::kHour;
 using operator_test::newUser;
-
-/// Answers what it is asked, one connection after the other.
-class ScriptedCentre {
-public:
-    explicit ScriptedCentre(const fleet::ServerCertificate& certificate)
-        : server_(certificate, [this](TlsServer& self) { serve(self); }) {}
-    ~ScriptedCentre() {
-        isStopping_ = true;
-        server_.stop();
-        server_.join();
-    }
-
-    std::string url() const { return server_.url(); }
-    /// The next answer to a question such as "GET /v1/whoami"; the last one is given again and
-    /// again. "ID" in a question stands for the roll-out that was made.
-    void answer(const std::string& question, int status, const json& body) {
-        const std::lock_guard lock(mutex_);
-        answers_[question].emplace_back(status, body.dump());
-    }
-    /// The bodies that came with a question.
-    std::vector<std::string> bodiesOf(const std::string& question) const {
-        const std::lock_guard lock(mutex_);
-        const auto found = bodies_.find(question);
-        return found == bodies_.end() ? std::vector<std::string>() : found->second;
-    }
-
-private:
-    void serve(TlsServer& self) {
-        while (!isStopping_) {
-            TlsPeer peer = self.accept();
-            for (std::string request = peer.request(); !request.empty(); request = peer.request()) {
-                const auto [status, body] = answerTo(request);
-                peer.answer(status, body);
-            }
-        }
-    }
-    std::pair<int, std::string> answerTo(const std::string& request) {
-        const std::lock_guard lock(mutex_);
-        std::string question = request.substr(0, request.find(" HTTP/1.1"));
-        const std::string body = request.substr(request.find("\r\n\r\n") + 4);
-        if (question == "POST /v1/rollouts") id_ = json::parse(body).value("id", "");
-        if (const std::size_t at = id_.empty() ? std::string::npos : question.find(id_);
-            at != std::string::npos) {
-            question.replace(at, id_.size(), "ID");
-        }
-        bodies_[question].push_back(body);
-        auto& answers = answers_[question];
-        if (answers.empty()) return {404, R"({"error":"there is no such thing"})"};
-        const auto next = answers.front();
-        if (answers.size() > 1) answers.pop_front();
-        return next;
-    }
-
-    mutable std::mutex mutex_;
-    std::map<std::string, std::deque<std::pair<int, std::string>>> answers_;
-    std::map<std::string, std::vector<std::string>> bodies_;
-    std::string id_;
-    std::atomic<bool> isStopping_{false};
-    TlsServer server_;
-};
+using operator_test::ScriptedCentre;
 
 class FleetProgramTest : public testing::Test {
 protected:
@@ -231,6 +167,64 @@ TEST_F(FleetProgramTest, FindsItsFleetInTheEnvironment) {
     const ProgramResult result = runProgram({zavctl(), "hosts", "env=test"}, "", named);
     EXPECT_EQ(result.status, ctl::kSuccess) << result.err;
     EXPECT_NE(result.out.find("web-2"), std::string::npos) << result.out;
+}
+
+TEST_F(FleetProgramTest, TellsShellsWhatMayStandThere) {
+    const auto offered = [this](std::vector<std::string> words) {
+        words.insert(words.begin(), {zavctl(), "__complete"});
+        return runProgram(words, "", environment()).out;
+    };
+    const std::string pause = "pause\tLet no more hosts get their orders for now\n";
+    EXPECT_EQ(offered({"rollout", "pa"}), "words\n" + pause);
+    EXPECT_EQ(offered({"--fleet", centre_.url(), "rollout", "pa"}), "words\n" + pause);
+    EXPECT_EQ(offered({"rollo"}),
+              "words\nrollout\tLook at roll-outs, stop them, and let them go on\n");
+    EXPECT_EQ(offered({"--fl"}), "words\n--fleet\tThe fleet's centre\n");
+    EXPECT_NE(offered({"start", "ux", "--on=*", "--wav"}).find("--waves\t"), std::string::npos);
+}
+
+/// The shells' own part is the same for one host.
+TEST_F(FleetProgramTest, IsCompletedByShells) {
+    const std::string folder = ZAV_SOURCE_DIR "/ctl/completion/shell/";
+    const auto typed = [this](const std::string& shell, const std::string& lines) {
+        Environment named = environment();
+        named.insert(named.end(), {{"PATH", ZAV_BUILD_DIR "/bin:/usr/bin:/bin"},
+                                   {"TERM", "dumb"},
+                                   {"LC_ALL", "C.UTF-8"},
+                                   {"HOME", scratch_.path("")}});
+        return runProgram({"/usr/bin/script", "-qec", shell, "/dev/null"}, lines, named).out;
+    };
+    const std::string bash =
+        typed("/bin/bash --norc --noprofile -i",
+              "source " + folder + "zavctl.bash\nzavctl rollo\tpau\t--he\t\nexit\n");
+    EXPECT_NE(bash.find("Let no more hosts get their orders for now.\r\n"), std::string::npos)
+        << bash;
+    if (::access("/usr/bin/zsh", X_OK) == 0) {
+        const std::string zsh =
+            typed("/usr/bin/zsh -f -i", "fpath=(" + folder +
+                                            " $fpath); autoload -Uz compinit; compinit -u -D\n"
+                                            "zavctl rollo\tpau\t--he\t\nexit\n");
+        EXPECT_NE(zsh.find("Let no more hosts get their orders for now."), std::string::npos)
+            << zsh;
+    }
+    if (::access("/usr/bin/fish", X_OK) == 0) {
+        const std::string fish = typed("/usr/bin/fish --no-config -c 'source " + folder +
+                                           "zavctl.fish; complete -C \"zavctl rollout pa\"'",
+                                       "");
+        EXPECT_NE(fish.find("pause\tLet no more hosts"), std::string::npos) << fish;
+    }
+}
+
+TEST_F(FleetProgramTest, NamesTheWayWhereAVerbIsForOneHost) {
+    const ProgramResult text = run({"--on", "env=test", "query", "KINAGT"});
+    EXPECT_EQ(text.status, ctl::kWrongUsage);
+    EXPECT_EQ(text.err,
+              "zavctl: query is for one host at a time\n"
+              "  zavctl agents --on, tasks --on and config get --on tell what the tables hold.\n");
+    const ProgramResult document = run({"--json", "depot", "ls"});
+    EXPECT_EQ(document.status, ctl::kWrongUsage);
+    EXPECT_EQ(json::parse(document.out)["error"], "depot ls is for one host at a time");
+    EXPECT_TRUE(centre_.bodiesOf("POST /v1/sessions").empty());
 }
 
 TEST_F(FleetProgramTest, TellsThatThereIsNoCentre) {

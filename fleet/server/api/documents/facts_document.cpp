@@ -4,6 +4,7 @@
 #include <nlohmann/json.hpp>
 #include <string>
 
+#include "fleet/server/api/schema.h"
 #include "text/utc_time.h"
 
 using nlohmann::json;
@@ -31,6 +32,28 @@ json inventoryDocument(const Inventory& inventory, const KeptFacts& kept, Moment
     return document;
 }
 
+shape::Json inventoryShape(Components& components) {
+    const shape::Json any = {{"type", "object"}};
+    return shape::object(
+        "Inventory", "What was installed on a host and what ran there, in the host's words.",
+        {{"taken",
+          shape::about("when the host was asked, by its clock", components.ref(timeSchema))},
+         {"age", shape::wholeNumber("how long ago that was, in seconds, by whichever clock makes "
+                                    "it older")},
+         {"products",
+          shape::listOf("the rows of the table KINAGT",
+                        shape::about("column names and values", any)),
+          Need::Optional},
+         {"instances",
+          shape::listOf("as the host's own interface tells them",
+                        shape::about("an instance of an agent", any)),
+          Need::Optional},
+         {"warnings", shape::listOf("what could not be found out", shape::text("a sentence")),
+          Need::Optional},
+         {"leftOut", shape::wholeNumber("how many entries were too many to be told"),
+          Need::Optional}});
+}
+
 }  // namespace
 
 json factsDocument(const KeptFacts& kept, Moment now) {
@@ -47,6 +70,20 @@ json factsDocument(const KeptFacts& kept, Moment now) {
         document["labels"][name] = value;
     if (facts.inventory) document["inventory"] = inventoryDocument(*facts.inventory, kept, now);
     return document;
+}
+
+nlohmann::ordered_json factsSchema(Components& components) {
+    return shape::object(
+        "Facts", "What a host has told about itself.",
+        {{"told", shape::about("when, by the host's clock", components.ref(timeSchema))},
+         {"heard", shape::about("when that came to the centre", components.ref(timeSchema))},
+         {"name", shape::text("for people, from the host's own configuration")},
+         {"labels", labelsShape("from there, too")},
+         {"link", shape::text("the link's version")},
+         {"version", shape::text("the host program's; empty before one has answered")},
+         {"journal", shape::text("the identity of the host's journal; empty while none answers")},
+         {"blocked", shape::text("why the next order waits; empty if nothing is in the way")},
+         {"inventory", inventoryShape(components), Need::Optional}});
 }
 
 }  // namespace fleet

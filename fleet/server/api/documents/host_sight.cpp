@@ -4,6 +4,7 @@
 #include <nlohmann/json.hpp>
 
 #include "fleet/server/api/documents/facts_document.h"
+#include "fleet/server/api/schema.h"
 #include "text/utc_time.h"
 
 using nlohmann::json;
@@ -12,13 +13,16 @@ namespace fleet {
 namespace {
 
 const char* stateOf(const HostSight& sight, Moment now) {
-    if (!sight.record) return "unknown";
-    if (!sight.record->stopped.empty()) return "stopped";
-    if (sight.record->heard == Moment{}) return "unknown";
-    return now - sight.record->heard < kAwayAfter ? "here" : "away";
+    return sight.record ? hostState(sight.record->heard, sight.record->stopped, now) : "unknown";
 }
 
 }  // namespace
+
+const char* hostState(Moment heard, const std::string& stopped, Moment now) {
+    if (!stopped.empty()) return "stopped";
+    if (heard == Moment{}) return "unknown";
+    return now - heard < kAwayAfter ? "here" : "away";
+}
 
 bool maySee(const Visit& visit, const Member& member) {
     return Selector(visit.grant.selector).matches(member.name, member.labels);
@@ -102,6 +106,48 @@ json hostDocument(const HostSight& sight, Moment now) {
 
 std::string timeOfDocument(Moment time) {
     return text::utcTime(time);
+}
+
+nlohmann::ordered_json timeSchema(Components&) {
+    return {{"title", "Time"},
+            {"type", "string"},
+            {"format", "date-time"},
+            {"description", "A time in UTC, as RFC 3339 writes it, with Z at its end."}};
+}
+
+nlohmann::ordered_json hostSchema(Components& components) {
+    return shape::object(
+        "Host", "A host of the fleet.",
+        {{"host", shape::text("its bus key, by which the fleet knows it")},
+         {"name", shape::text("for people")},
+         {"labels", labelsShape("those that selectors mean: the centre's and the host's own")},
+         {"centreLabels", labelsShape("those that the centre has given it")},
+         {"state", components.ref(hostStateSchema)},
+         {"blocked", shape::text("why its next order waits; empty if nothing is in the way")},
+         {"signing", shape::text("the public key with which its link signs"), Need::Optional},
+         {"last", shape::wholeNumber("the highest number of an order that it was given"),
+          Need::Optional},
+         {"taken", shape::wholeNumber("the highest number that its link has told it took"),
+          Need::Optional},
+         {"stopped", shape::text("why its link must not go on; empty if it may"), Need::Optional},
+         {"unpublished", shape::text("why nothing goes to the bus for it; empty if all is well"),
+          Need::Optional},
+         {"journal", shape::text("the identity of its journal; empty before one was seen"),
+          Need::Optional},
+         {"heard", shape::about("when its last hello came", components.ref(timeSchema)),
+          Need::Optional},
+         {"facts", components.ref(factsSchema), Need::Optional},
+         {"skew", numberShape("by how many seconds its clock is ahead of the centre's"),
+          Need::Optional}});
+}
+
+nlohmann::ordered_json hostStateSchema(Components&) {
+    nlohmann::ordered_json state = shape::oneOf(
+        "Unknown before the first hello, away when the last one came long ago, stopped when an "
+        "administrator has to look.",
+        {"unknown", "here", "away", "stopped"});
+    state["title"] = "HostState";
+    return state;
 }
 
 }  // namespace fleet

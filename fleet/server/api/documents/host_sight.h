@@ -22,6 +22,10 @@ struct HostSight {
     std::optional<KeptFacts> facts;  ///< if they were asked for
 };
 
+/// The state of a host that was last heard then, or never if that is 0, and whose link must not go
+/// on for this reason, if there is one.
+const char* hostState(Moment heard, const std::string& stopped, Moment now);
+
 /// Whether the visitor may see a host of the fleet.
 bool maySee(const Visit& visit, const Member& member);
 

@@ -15,7 +15,7 @@ ApiEndpoint getFileContent;
 
 namespace {
 
-constexpr std::size_t kMostBytes = 512 * 1024;  ///< of one answer
+constexpr std::size_t kMostBytes = std::size_t{512} * 1024;  ///< of one answer
 constexpr std::size_t kMostOpen = 1000;
 
 struct Range {
@@ -58,8 +58,10 @@ bool mayFetch(ApiServices& services, const std::string& host, const std::string&
     if (services.fetches.isKnown(fetching, wallClock())) return true;
     const bool may = services.ask([host, sum](CentreDesk& desk) {
         const auto open = desk.parts.store.open(host, 1, kHighestNumber, kMostOpen);
-        return std::any_of(open.begin(), open.end(),
-                           [&](const OrderRecord& record) { return names(record, sum); });
+        return std::any_of(open.begin(), open.end(), [&](const OpenOrder& order) {
+            const auto record = desk.parts.store.order(host, order.order);
+            return record && names(*record, sum);
+        });
     });
     if (may) services.fetches.note(fetching, wallClock());
     return may;
@@ -84,6 +86,8 @@ http::Answer getFileContent(Visit& visit, const Call& call) {
         return reply;
     }
     std::string bytes = services.files.read(sum, range.from, range.most).value_or("");
+    services.counts.servedPieces.add();
+    services.counts.servedBytes.add(bytes.size());
     if (bytes.empty()) return http::Reply{200, "", "application/octet-stream"};
     const std::string last = std::to_string(range.from + bytes.size() - 1);
     http::Reply reply{206, std::move(bytes), "application/octet-stream"};

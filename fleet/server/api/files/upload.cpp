@@ -3,11 +3,13 @@
 #include <nlohmann/json.hpp>
 
 #include "fleet/bus/messages/document.h"
+#include "fleet/server/api/schema.h"
 #include "fleet/server/api/visit.h"
 
 namespace fleet {
 
 ApiEndpoint getFile, postFile;
+Schema fileSchema;
 
 namespace {
 
@@ -36,6 +38,15 @@ http::Answer postFile(Visit& visit, const Call& call) {
     const DepotFile file =
         visit.services.files.add(sum, sizeGiven(call), from, call.bytes(), wallClock());
     return fileReply(sum, file, visit.services.files.has(sum));
+}
+
+nlohmann::ordered_json fileSchema(Components&) {
+    return shape::object(
+        "File", "A file on its way to hosts.",
+        {{"sha256", shape::text("its SHA-256, by which it is named")},
+         {"size", shape::wholeNumber("in bytes")},
+         {"have", shape::wholeNumber("how many of them have come")},
+         {"complete", shape::yesOrNo("whether it is all there, and is what its name says")}});
 }
 
 }  // namespace fleet

@@ -5,12 +5,14 @@
 #include "fleet/bus/messages/document.h"
 #include "fleet/server/api/documents/host_sight.h"
 #include "fleet/server/api/documents/page.h"
+#include "fleet/server/api/schema.h"
 
 using nlohmann::json;
 
 namespace fleet {
 
 ApiEndpoint getHosts;
+Schema hostListSchema;
 
 http::Answer getHosts(Visit& visit, const Call& call) {
     const std::string* const selector = call.text("selector");
@@ -27,6 +29,14 @@ http::Answer getHosts(Visit& visit, const Call& call) {
     for (const HostSight& sight : sightsOf(visit, *members, hosts))
         document["hosts"].push_back(hostDocument(sight, wallClock()));
     return http::jsonReply(200, textOf(document));
+}
+
+nlohmann::ordered_json hostListSchema(Components& components) {
+    return shape::object(
+        "HostList", "Hosts, in the order of their keys.",
+        {{"hosts", shape::listOf("those that the operator may see", components.ref(hostSchema))},
+         {"next", shape::text("what to give as \"after\" for the next page; not there at the end"),
+          Need::Optional}});
 }
 
 }  // namespace fleet

@@ -16,7 +16,7 @@ namespace {
 
 constexpr std::size_t kMostInventories = 100;
 /// A page ends with the host whose facts reach this.
-constexpr std::size_t kInventoryPageBytes = 1024 * 1024;
+constexpr std::size_t kInventoryPageBytes = std::size_t{1024} * 1024;
 
 std::size_t bytesOf(const HostSight& sight) {
     return sight.facts && sight.facts->facts.inventory

@@ -4,12 +4,14 @@
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/server/api/documents/host_sight.h"
+#include "fleet/server/api/schema.h"
 #include "fleet/server/keys/files/keys_error.h"
 #include "fleet/server/keys/trust/names.h"
 
 namespace fleet {
 
 ApiEndpoint postLabels;
+Schema labelsSchema;
 
 namespace {
 
@@ -42,6 +44,12 @@ http::Answer postLabels(Visit& visit, const Call& call) {
     const auto members = visit.services.members();
     return http::jsonReply(
         200, textOf(hostDocument(sightsOf(visit, *members, {host}).front(), wallClock())));
+}
+
+nlohmann::ordered_json labelsSchema(Components&) {
+    nlohmann::ordered_json labels = labelsShape("Labels of a host.");
+    labels["title"] = "Labels";
+    return labels;
 }
 
 }  // namespace fleet

@@ -4,11 +4,13 @@
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/server/api/documents/host_sight.h"
+#include "fleet/server/api/schema.h"
 #include "fleet/server/keys/trust/revocations.h"
 
 namespace fleet {
 
 ApiEndpoint postRetire;
+Schema retiredSchema;
 
 namespace {
 
@@ -17,7 +19,7 @@ constexpr std::size_t kMostEnded = 1000;  ///< in one transaction
 /// How its open orders ended, nobody will tell. Returns how many there were.
 std::size_t endOrders(CentreDesk& desk, const std::string& host) {
     const auto open = desk.parts.store.open(host, 1, kHighestNumber, kMostEnded);
-    for (const OrderRecord& order : open)
+    for (const OpenOrder& order : open)
         desk.parts.centre.hear({host, order.number, order.order, "", kUnknown, ""});
     return open.size();
 }
@@ -38,6 +40,13 @@ http::Answer postRetire(Visit& visit, const Call& call) {
         return RevokedKeys(database).revokeHost(host, wallClock());
     });
     return http::jsonReply(200, textOf({{"host", host}, {"unknown", ended}}));
+}
+
+nlohmann::ordered_json retiredSchema(Components&) {
+    return shape::object(
+        "Retired", "A host that has left the fleet.",
+        {{"host", shape::text("its bus key")},
+         {"unknown", shape::wholeNumber("how many orders it had whose ends nobody will tell")}});
 }
 
 }  // namespace fleet

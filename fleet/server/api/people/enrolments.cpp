@@ -1,5 +1,6 @@
 // POST /v1/enrolments: a host joins, with the token of its invitation.
 
+#include "fleet/server/api/schema.h"
 #include "fleet/server/api/visit.h"
 #include "fleet/server/keys/trust/host_enrolment.h"
 #include "fleet/server/keys/trust/join_refused.h"
@@ -8,6 +9,7 @@
 namespace fleet {
 
 ApiEndpoint postEnrolment;
+Schema enrolmentSchema;
 
 namespace {
 
@@ -45,6 +47,18 @@ http::Answer postEnrolment(Visit& visit, const Call& call) {
         HostEnrolment(trust.connection())
             .redeem(call.bytes(), services.directory, hosts, wallClock());
     return http::jsonReply(200, enrolmentAnswerText(answer));
+}
+
+nlohmann::ordered_json enrolmentSchema(Components&) {
+    return shape::object(
+        "Enrolment", "What a host needs to take part.",
+        {{"name", shape::text("the host's, for people")},
+         {"token", shape::text("lets the host's bus key into the bus")},
+         {"bus", shape::listOf("where that is", shape::text("a URL"))},
+         {"server", shape::text("the DNS name in the certificates of the bus's servers")},
+         {"authority", shape::text("the certificate that vouches for those, as PEM")},
+         {"centres", shape::listOf("certificates of the centre's signing keys, the newest first",
+                                   shape::text("signed by the fleet's root, in base64"))}});
 }
 
 }  // namespace fleet

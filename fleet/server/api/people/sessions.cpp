@@ -4,6 +4,7 @@
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/server/api/documents/host_sight.h"
+#include "fleet/server/api/schema.h"
 #include "fleet/server/api/visit.h"
 
 using nlohmann::json;
@@ -11,6 +12,7 @@ using nlohmann::json;
 namespace fleet {
 
 ApiEndpoint postSession;
+Schema sessionSchema;
 
 namespace {
 
@@ -44,10 +46,22 @@ http::Answer postSession(Visit& visit, const Call& call) {
             "wrong; here it is " +
             timeOfDocument(now));
     }
+    services.counts.openedSessions.add();
     json document = holderOf(services, grant, host);
     document["session"] = opened->token;
     document["expires"] = timeOfDocument(opened->expires);
     return http::jsonReply(200, textOf(document));
+}
+
+nlohmann::ordered_json sessionSchema(Components& components) {
+    return shape::object(
+        "Session", "A session of an operator, or of a host.",
+        {{"session", shape::text("the token for the field Authorization, after \"Bearer \"")},
+         {"expires", shape::about("when the session ends", components.ref(timeSchema))},
+         {"operator", shape::text("of an operator: the name"), Need::Optional},
+         {"role", shape::about("of an operator", components.ref(roleSchema)), Need::Optional},
+         {"fleet", shape::text("of a host: the fleet's name"), Need::Optional},
+         {"host", shape::text("of a host: its bus key"), Need::Optional}});
 }
 
 }  // namespace fleet

@@ -7,12 +7,14 @@
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/question.h"
 #include "fleet/server/api/documents/host_sight.h"
+#include "fleet/server/api/schema.h"
 
 using nlohmann::json;
 
 namespace fleet {
 
 ApiEndpoint postQuestions, getAnswers;
+Schema roundSchema, answersSchema, questionsSchema;
 
 namespace {
 
@@ -43,6 +45,10 @@ QuestionDesk::Asked questionOf(const Visit& visit, const Members& members, const
     return asked;
 }
 
+NothingThere noSuchRound() {
+    return NothingThere("there are no such questions; their time may be over");
+}
+
 }  // namespace
 
 http::Answer postQuestions(Visit& visit, const Call& call) {
@@ -56,7 +62,13 @@ http::Answer postQuestions(Visit& visit, const Call& call) {
     std::vector<QuestionDesk::Asked> asked;
     for (const json& text : questions)
         asked.push_back(questionOf(visit, *members, text, now));
-    const auto round = visit.services.questions().ask(visit.key, asked, now);
+    QuestionDesk& desk = visit.services.questions();
+    const std::string again = call.body().value("round", "");
+    if (!again.empty()) {
+        if (!desk.askAgain(visit.key, again, asked, now)) throw noSuchRound();
+        return http::jsonReply(201, textOf({{"round", again}}));
+    }
+    const auto round = desk.ask(visit.key, asked, now);
     if (!round) throw BatchesFull("too many questions are under way, or the centre does not work");
     return http::jsonReply(201, textOf({{"round", *round}}));
 }
@@ -64,12 +76,33 @@ http::Answer postQuestions(Visit& visit, const Call& call) {
 http::Answer getAnswers(Visit& visit, const Call& call) {
     const auto answers =
         visit.services.questions().fetch(visit.key, call.required("round"), wallClock());
-    if (!answers) throw NothingThere("there are no such questions; their time may be over");
+    if (!answers) throw noSuchRound();
     json document = {{"answers", json::array()}};
     for (const QuestionDesk::Answer& answer : *answers) {
         document["answers"].push_back({{"host", answer.host}, {"signed", base64Of(answer.bytes)}});
     }
     return http::jsonReply(200, textOf(document));
+}
+
+nlohmann::ordered_json questionsSchema(Components&) {
+    nlohmann::ordered_json questions =
+        shape::listOf("Questions to hosts.", shape::text("signed by who brings it, in base64"));
+    questions["title"] = "Questions";
+    return questions;
+}
+
+nlohmann::ordered_json roundSchema(Components&) {
+    return shape::object("Round", "Questions that are under way.",
+                         {{"round", shape::text("the identifier, to fetch answers with")}});
+}
+
+nlohmann::ordered_json answersSchema(Components&) {
+    const shape::Json piece = shape::object(
+        "Answer", "A piece of a host's answer.",
+        {{"host", shape::text("the host's bus key")},
+         {"signed", shape::text("signed by the host and sealed for who has asked, in base64")}});
+    return shape::object("Answers", "What hosts have answered since the last look.",
+                         {{"answers", shape::listOf("in the order in which they came", piece)}});
 }
 
 }  // namespace fleet

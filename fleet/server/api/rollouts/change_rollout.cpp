@@ -1,6 +1,5 @@
 // POST /v1/rollouts/{id}/pause, resume, abort and retry-failed
 
-#include <memory>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <string>
@@ -18,56 +17,71 @@ ApiEndpoint postPause, postResume, postAbort, postRetryFailed;
 
 namespace {
 
-using Orders = std::shared_ptr<const std::vector<std::string>>;
+using SignedOrders = std::vector<std::string>;
 
-/// Does it, if the roll-out is the visitor's or the visitor an admin, and shows what is then. What
-/// comes without orders costs little, and stops something perhaps: that waits for nothing.
-template <typename Change>
-http::Answer change(Visit& visit, const Call& call, const Orders& orders, Change act) {
-    insistOnOwn(visit, call.required("id"));
-    std::optional<OneAtATime> turn;
-    if (orders && !orders->empty()) turn.emplace(visit);
-    const RolloutView after = visit.services.ask(
-        [act, id = call.required("id"), by = visit.asOperator()](CentreDesk& desk) {
+/// What comes without orders costs little, and stops something perhaps: that waits for nothing.
+bool bringsOrders(const Call& call) {
+    const auto orders = call.body().find("orders");
+    return call.body().contains("batch") ||
+           (orders != call.body().end() && orders->is_array() && !orders->empty());
+}
+
+/// Does it on the centre's thread, and shows what is then.
+template <typename Act>
+http::Answer done(Visit& visit, const std::string& id, Act act) {
+    const RolloutView after =
+        visit.services.ask([act, id, by = visit.asOperator()](CentreDesk& desk) {
             act(desk, id, by);
             return desk.rollouts.show(id, desk.now);
         });
     return http::jsonReply(200, textOf(rolloutDocument(after)));
 }
 
+/// The same, if the roll-out is the visitor's or the visitor an admin, with the orders that come
+/// along.
+template <typename Act>
+http::Answer doneWithOrders(Visit& visit, const Call& call, Act act) {
+    insistOnOwn(visit, call.required("id"));
+    std::optional<OneAtATime> turn;
+    if (bringsOrders(call)) turn.emplace(visit);
+    return done(visit, call.required("id"),
+                [act, orders = givenOrders(visit, call)](CentreDesk& desk, const std::string& id,
+                                                         const RolloutOperator& by) {
+                    act(desk.rollouts, id, by, *orders, desk.now);
+                });
+}
+
 }  // namespace
 
 http::Answer postPause(Visit& visit, const Call& call) {
-    return change(visit, call, nullptr,
-                  [](CentreDesk& desk, const std::string& id, const RolloutOperator& by) {
-                      desk.rollouts.pause(id, by, desk.now);
-                  });
+    insistOnOwn(visit, call.required("id"));
+    return done(visit, call.required("id"),
+                [](CentreDesk& desk, const std::string& id, const RolloutOperator& by) {
+                    desk.rollouts.pause(id, by, desk.now);
+                });
 }
 
 http::Answer postResume(Visit& visit, const Call& call) {
-    const Orders orders = givenOrders(visit, call);
-    return change(visit, call, orders,
-                  [orders](CentreDesk& desk, const std::string& id, const RolloutOperator& by) {
-                      desk.rollouts.resume(id, by, *orders, desk.now);
-                  });
+    return doneWithOrders(
+        visit, call,
+        [](Rollouts& rollouts, const std::string& id, const RolloutOperator& by,
+           const SignedOrders& orders, Moment now) { rollouts.resume(id, by, orders, now); });
 }
 
 http::Answer postAbort(Visit& visit, const Call& call) {
-    const Orders orders = givenOrders(visit, call);
-    return change(visit, call, orders,
-                  [orders](CentreDesk& desk, const std::string& id, const RolloutOperator& by) {
-                      desk.rollouts.abort(id, by, *orders, desk.now);
-                  });
+    return doneWithOrders(
+        visit, call,
+        [](Rollouts& rollouts, const std::string& id, const RolloutOperator& by,
+           const SignedOrders& orders, Moment now) { rollouts.abort(id, by, orders, now); });
 }
 
 http::Answer postRetryFailed(Visit& visit, const Call& call) {
     const bool isForced = call.body().contains("force") && call.body().at("force").get<bool>();
-    const Orders orders = givenOrders(visit, call);
-    return change(
-        visit, call, orders,
-        [orders, isForced](CentreDesk& desk, const std::string& id, const RolloutOperator& by) {
-            desk.rollouts.retryFailed(id, by, *orders, isForced, desk.now);
-        });
+    return doneWithOrders(
+        visit, call,
+        [isForced](Rollouts& rollouts, const std::string& id, const RolloutOperator& by,
+                   const SignedOrders& orders,
+                   Moment now) { rollouts.retryFailed(id, by, orders, isForced, now); });
 }
 
 }  // namespace fleet

@@ -4,6 +4,7 @@
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/order.h"
+#include "fleet/server/api/schema.h"
 #include "fleet/server/rollouts/incoming_orders.h"
 
 namespace fleet {
@@ -72,6 +73,13 @@ OneAtATime::OneAtATime(const Visit& visit) : batches_(visit.services.batches), k
 
 OneAtATime::~OneAtATime() {
     batches_.endChange(key_);
+}
+
+nlohmann::ordered_json ordersSchema(Components&) {
+    nlohmann::ordered_json orders =
+        shape::listOf("Orders for hosts.", shape::text("signed by who brings it, in base64"));
+    orders["title"] = "Orders";
+    return orders;
 }
 
 }  // namespace fleet

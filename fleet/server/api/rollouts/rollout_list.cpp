@@ -5,12 +5,14 @@
 #include "fleet/bus/messages/document.h"
 #include "fleet/server/api/documents/page.h"
 #include "fleet/server/api/documents/rollout_document.h"
+#include "fleet/server/api/schema.h"
 
 using nlohmann::json;
 
 namespace fleet {
 
 ApiEndpoint getRollouts, getRollout;
+Schema rolloutListSchema;
 
 http::Answer getRollouts(Visit& visit, const Call& call) {
     const std::string* const given = call.text("before");
@@ -28,6 +30,12 @@ http::Answer getRollout(Visit& visit, const Call& call) {
     const RolloutView view = visit.services.ask(
         [id = call.required("id")](CentreDesk& desk) { return desk.rollouts.show(id, desk.now); });
     return http::jsonReply(200, textOf(rolloutDocument(view)));
+}
+
+nlohmann::ordered_json rolloutListSchema(Components& components) {
+    return shape::object(
+        "RolloutList", "Roll-outs.",
+        {{"rollouts", shape::listOf("the newest first", components.ref(rolloutSchema))}});
 }
 
 }  // namespace fleet

@@ -6,12 +6,14 @@
 #include "fleet/server/api/documents/host_sight.h"
 #include "fleet/server/api/documents/page.h"
 #include "fleet/server/api/documents/rollout_document.h"
+#include "fleet/server/api/schema.h"
 
 using nlohmann::json;
 
 namespace fleet {
 
 ApiEndpoint getRolloutHosts, getRolloutFailures;
+Schema partListSchema;
 
 namespace {
 
@@ -51,6 +53,12 @@ http::Answer getRolloutFailures(Visit& visit, const Call& call) {
             views.push_back(viewOf(PartSight{part, desk.now, {}}, desk.now));
         return views;
     }));
+}
+
+nlohmann::ordered_json partListSchema(Components& components) {
+    return shape::object(
+        "PartList", "Hosts of a roll-out, without those that the operator may not see.",
+        {{"hosts", shape::listOf("their parts in it", components.ref(partSchema))}});
 }
 
 }  // namespace fleet

@@ -32,6 +32,12 @@ std::optional<std::string> Sessions::keyOf(std::string_view token, Moment now) c
     return found->second.key;
 }
 
+std::size_t Sessions::count(Moment now) const {
+    const std::lock_guard lock(mutex_);
+    const auto isOpen = [now](const auto& session) { return session.second.expires > now; };
+    return static_cast<std::size_t>(std::count_if(sessions_.begin(), sessions_.end(), isOpen));
+}
+
 void Sessions::forgetOld(Moment now) {
     for (auto& [key, nonces] : nonces_) {
         for (auto nonce = nonces.begin(); nonce != nonces.end();)

@@ -1,6 +1,7 @@
 /// Who is logged in at the centre.
 #pragma once
 
+#include <cstddef>
 #include <deque>
 #include <map>
 #include <mutex>
@@ -42,6 +43,9 @@ public:
 
     /// The key that has opened the session; nothing if there is none of this token.
     std::optional<std::string> keyOf(std::string_view token, Moment now) const;
+
+    /// How many are open.
+    std::size_t count(Moment now) const;
 
 private:
     struct Session {

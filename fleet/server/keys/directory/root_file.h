@@ -22,7 +22,7 @@ struct RootKeys {
 
 /// Makes the file, with mode 0600. Throws KeysError if there is anything of that name already.
 void writeRootFile(const std::string& file, const RootKeys& keys);
-/// Throws KeysError if it is none, or others may read it.
+/// Throws KeysError if it is not one, or others may read it.
 RootKeys readRootFile(const std::string& file);
 
 }  // namespace fleet

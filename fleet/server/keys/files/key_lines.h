@@ -30,7 +30,7 @@ public:
     /// The value, as long as the object lasts. Throws KeysError, which names the file, if there is
     /// none.
     std::string_view value(std::string_view name) const;
-    /// The key pair whose seed the value is. Throws KeysError if it is none of that kind.
+    /// The key pair whose seed the value is. Throws KeysError if it is not one of that kind.
     KeyPair key(std::string_view name, KeyKind kind) const;
 
 private:

@@ -11,18 +11,23 @@
 namespace fleet {
 
 struct Ending {
+    enum class Of { Centre, Server, Authority, Operator };
     std::string what;  ///< for people
     std::string help;  ///< what is to be done about it
     Moment until{};    ///< it may be over already
+    Of of = Of::Centre;
 };
 
 /// How long before the end an administrator is warned.
 constexpr Moment kWarnedBefore = std::chrono::hours(24 * 30);
 
-/// What ends within kWarnedBefore or has ended, the most urgent first: the certificate of the
-/// centre's key, those for TLS, and the operators'. An operator who has a key that lasts longer is
-/// not among them, nor one that has been over for as long. Throws KeysError and
-/// sqlite::DatabaseError.
+/// What has an end at all, the most urgent first: the certificate of the centre's key, those for
+/// TLS, and the latest ones of the operators, but for those that have been over for kWarnedBefore.
+/// Throws KeysError and sqlite::DatabaseError.
+std::vector<Ending> allEndingsOf(const FleetDirectory& directory, sqlite::Database& trust,
+                                 Moment now);
+
+/// Of those, what ends within kWarnedBefore or has ended.
 std::vector<Ending> endingsOf(const FleetDirectory& directory, sqlite::Database& trust, Moment now);
 
 }  // namespace fleet

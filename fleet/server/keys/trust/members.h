@@ -32,7 +32,7 @@ public:
     /// thousand of them are asked for with each page of a list.
     std::shared_ptr<const Members> current();
 
-    /// Gives a host other labels. False if it is none of the fleet's.
+    /// Gives a host other labels. False if it is not one of the fleet's.
     bool label(const std::string& host, const Labels& labels);
 
 private:

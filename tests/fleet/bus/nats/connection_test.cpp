@@ -29,6 +29,32 @@ using Kind = fleet::BusStatus::Kind;
 
 namespace {
 
+TEST(PauseBeforeAnAttempt, IsDrawnFromEverLongerTimes) {
+    fleet::ConnectionOptions options;
+    options.reconnectWait = std::chrono::milliseconds(2000);
+    options.reconnectJitter = std::chrono::milliseconds(3000);
+    constexpr int kLongest[] = {0, 5000, 8000, 14000, 26000, 50000, 50000, 50000};
+    for (int attempt = 1; attempt < 8; ++attempt) {
+        std::chrono::milliseconds most{0};
+        for (int i = 0; i < 1000; ++i) {
+            const auto pause = fleet::pauseBefore(options, attempt);
+            ASSERT_GE(pause, options.reconnectWait);
+            most = std::max(most, pause);
+        }
+        EXPECT_LE(most.count(), kLongest[attempt]);
+        // Of a thousand draws one at least is in the upper half.
+        EXPECT_GT(most.count(), kLongest[attempt] / 2);
+    }
+}
+
+TEST(PauseBeforeAnAttempt, IsOneThatCanBeWaitedForWhateverTheOptionsSay) {
+    fleet::ConnectionOptions options;
+    options.reconnectJitter = std::chrono::hours(24 * 365);
+    EXPECT_GE(fleet::pauseBefore(options, 1'000'000), options.reconnectWait);
+    options.reconnectJitter = std::chrono::milliseconds(-1);
+    EXPECT_EQ(fleet::pauseBefore(options, -1), options.reconnectWait);
+}
+
 /// What was received, for the thread of the test.
 class Received {
 public:
@@ -178,8 +204,24 @@ TEST(BusConnection, TellsThatItMayNotHearItsAnswers) {
     }();
     const auto silent = all->subscribe(
         "may.ask", [](const BusMessage&) {}, kPatience);
-    const auto reply = connection->request("may.ask", "", std::chrono::hours(1));
-    EXPECT_EQ(reply.status.kind, Kind::Forbidden);
+    for (int i = 1; i <= 2; ++i) {
+        const auto reply = connection->request("may.ask", "", std::chrono::hours(1));
+        EXPECT_EQ(reply.status.kind, Kind::Forbidden) << "request " << i;
+    }
+}
+
+TEST(BusConnection, TellsEachOfManyRequestsThatItsPermissionIsMissing) {
+    const NatsServer server(kOneWithLimits);
+    const auto connection = connected(fewRights(server));
+    std::vector<fleet::Connection::Request> requests;
+    for (int i = 0; i < 50; ++i)
+        requests.push_back({"mayNot." + std::to_string(i), "", {}});
+    const auto replies = connection->requestAll(requests, std::chrono::hours(1));
+    for (std::size_t i = 0; i < replies.size(); ++i) {
+        EXPECT_EQ(replies[i].status.kind, Kind::Forbidden);
+        EXPECT_NE(replies[i].status.text.find('"' + requests[i].subject + '"'), std::string::npos)
+            << replies[i].status.text;
+    }
 }
 
 TEST(BusConnection, TellsAMissingPermissionOfAPublishAsAnError) {

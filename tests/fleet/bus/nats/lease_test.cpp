@@ -115,6 +115,41 @@ TEST_F(LeaseOfCentre, IsNotSaidToBeOursWhenTheBusIsAway) {
     EXPECT_EQ(lease("b").claim().kind, Kind::Unknown);
 }
 
+TEST_F(LeaseOfCentre, IsRenewedOnceTheBusIsThereAgain) {
+    Lease a = lease("a");
+    ASSERT_EQ(a.claim().kind, Kind::Ours);
+    server_.kill();
+    ASSERT_TRUE(eventually([&] { return !bus_->connected(); }));
+    EXPECT_EQ(a.renew().kind, Kind::Unknown);
+    EXPECT_EQ(a.renew().kind, Kind::Unknown);
+    server_.start();
+    EXPECT_TRUE(eventually([&] { return a.renew().kind == Kind::Ours; }));
+    EXPECT_EQ(lease("b").claim().kind, Kind::Others);
+}
+
+TEST_F(LeaseOfCentre, IsRenewedByWhoHeardNoAcknowledgement) {
+    Lease a = lease("a", 500ms);
+    ASSERT_TRUE(eventually([&] { return a.claim().kind == Kind::Ours; }));
+    server_.pause();
+    EXPECT_EQ(a.renew().kind, Kind::Unknown);
+    server_.goOn();
+    // The server has stored that one by now, so what is there is another message than expected.
+    EXPECT_TRUE(eventually([&] { return a.renew().kind == Kind::Ours; }));
+    EXPECT_EQ(a.renew().kind, Kind::Ours);
+}
+
+TEST_F(LeaseOfCentre, IsNotTakenBackByRenewingWhileTheBusWasAway) {
+    Lease a = lease("a", 500ms);
+    Lease b = lease("b");
+    ASSERT_TRUE(eventually([&] { return a.claim().kind == Kind::Ours; }));
+    EXPECT_EQ(b.claim().kind, Kind::Others);
+    now_ += 31s;
+    ASSERT_EQ(b.claim().kind, Kind::Ours);
+    EXPECT_EQ(a.renew().kind, Kind::Others);
+    EXPECT_EQ(a.renew().kind, Kind::Others);
+    EXPECT_EQ(b.renew().kind, Kind::Ours);
+}
+
 TEST_F(LeaseOfCentre, IsClaimedAnewByWhoHeardNoAcknowledgement) {
     Lease a = lease("a", 500ms);
     ASSERT_TRUE(eventually([&] { return a.claim().kind == Kind::Ours; }));

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <vector>
 
 #include "fleet/bus/nats/connecting.h"
 #include "fleet/bus/nats/streams.h"
@@ -135,4 +136,73 @@ TEST_F(Store, KeepsWhatItHasOverARestart) {
     server_.start();
     bus_ = connectedTo(server_);
     EXPECT_EQ(lastOn(*bus_, "TASKS", "task.h.1", kPatience).bytes, "one");
+}
+
+namespace {
+
+/// Enough that they are under way at the same time.
+constexpr int kMany = 200;
+
+std::string subjectOf(int order) {
+    return "task.h." + std::to_string(order);
+}
+
+}  // namespace
+
+TEST_F(Store, TakesManyTogetherAndTellsOfEachByItself) {
+    ASSERT_EQ(storeFirst(*bus_, subjectOf(7), "was there", kPatience).kind,
+              StoreResult::Kind::Stored);
+    std::vector<std::string> texts;
+    for (int i = 0; i < kMany; ++i)
+        texts.push_back("order " + std::to_string(i));
+    std::vector<fleet::StoreRequest> orders;
+    for (int i = 0; i < kMany; ++i)
+        orders.push_back({subjectOf(i), texts[static_cast<std::size_t>(i)]});
+    const std::vector<StoreResult> results = storeFirst(*bus_, orders, kPatience);
+    ASSERT_EQ(results.size(), orders.size());
+    for (int i = 0; i < kMany; ++i) {
+        EXPECT_EQ(results[static_cast<std::size_t>(i)].kind,
+                  i == 7 ? StoreResult::Kind::Occupied : StoreResult::Kind::Stored)
+            << i;
+    }
+    std::vector<std::string> subjects;
+    for (int i = 0; i <= kMany; ++i)
+        subjects.push_back(subjectOf(i));
+    const std::vector<LastResult> found = lastOn(*bus_, "TASKS", subjects, kPatience);
+    ASSERT_EQ(found.size(), subjects.size());
+    std::vector<std::uint64_t> sequences;
+    for (int i = 0; i < kMany; ++i) {
+        const LastResult& one = found[static_cast<std::size_t>(i)];
+        EXPECT_EQ(one.bytes, i == 7 ? "was there" : texts[static_cast<std::size_t>(i)]);
+        sequences.push_back(one.sequence);
+    }
+    EXPECT_EQ(found.back().kind, LastResult::Kind::Missing);
+    for (const fleet::BusStatus& status : erase(*bus_, "TASKS", sequences, kPatience))
+        EXPECT_TRUE(status.done()) << status.text;
+    for (const LastResult& one : lastOn(*bus_, "TASKS", subjects, kPatience))
+        EXPECT_EQ(one.kind, LastResult::Kind::Missing);
+}
+
+/// Nothing of a group is still under way when the answer is there: closing the connection loses
+/// nothing that was said to be stored.
+TEST_F(Store, HasWhatItHasSaidToBeStoredTogetherWhenTheConnectionIsGone) {
+    std::vector<fleet::StoreRequest> orders;
+    for (int i = 0; i < kMany; ++i)
+        orders.push_back({subjectOf(i), "order"});
+    const std::vector<StoreResult> results = storeFirst(*bus_, orders, kPatience);
+    bus_.reset();
+    bus_ = connectedTo(server_);
+    for (int i = 0; i < kMany; ++i) {
+        ASSERT_EQ(results[static_cast<std::size_t>(i)].kind, StoreResult::Kind::Stored);
+        EXPECT_EQ(lastOn(*bus_, "TASKS", subjectOf(i), kPatience).kind, LastResult::Kind::Found);
+    }
+}
+
+TEST_F(Store, AnswersNoneOfThoseAskedTogetherWhenItIsAway) {
+    server_.kill();
+    ASSERT_TRUE(eventually([&] { return !bus_->connected(); }));
+    const std::vector<fleet::StoreRequest> orders = {{subjectOf(1), "a"}, {subjectOf(2), "b"}};
+    for (const StoreResult& result : storeFirst(*bus_, orders, kPatience))
+        EXPECT_EQ(result.kind, StoreResult::Kind::NoAnswer);
+    EXPECT_TRUE(storeFirst(*bus_, std::vector<fleet::StoreRequest>(), kPatience).empty());
 }

@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <string>
 
 #include "fleet/bus/nats/certificates.h"
@@ -51,6 +52,14 @@ TEST_F(BusConnectionByTls, IsMadeWithAServerThatTheAuthorityVouchesFor) {
 
 TEST_F(BusConnectionByTls, IsNotMadeWithAServerOfAnotherAuthority) {
     const NatsServer server(serverOf(Authority(), "bus.example"));
+    const auto result = Connection::connect(trusting(server, authority_));
+    EXPECT_EQ(result.failure, Failure::NotTrusted) << result.text;
+}
+
+TEST_F(BusConnectionByTls, IsNotMadeWithAServerForWhichOnlyTheSystemsAuthoritiesVouch) {
+    const Authority ofTheSystem;
+    ::setenv("SSL_CERT_FILE", dir_.write("system.pem", ofTheSystem.pem()).c_str(), 1);
+    const NatsServer server(serverOf(ofTheSystem, "bus.example"));
     const auto result = Connection::connect(trusting(server, authority_));
     EXPECT_EQ(result.failure, Failure::NotTrusted) << result.text;
 }

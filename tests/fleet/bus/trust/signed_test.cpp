@@ -115,6 +115,13 @@ TEST(Sealing, WhatWasChangedOrCutIsNotOpened) {
 
 TEST(Sealing, NothingIsSealedForWhatIsNoKey) {
     EXPECT_THROW(sealFor("Unknown", "text"), std::invalid_argument);
+    // 32 zero bytes with the right check sum: of these anybody has the secret half.
+    const std::string zeros = "UAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAABET7";
+    ASSERT_TRUE(fleet::isPublicKey(zeros, KeyKind::User));
+    EXPECT_THROW(sealFor(zeros, "text"), std::invalid_argument);
+    EXPECT_FALSE(fleet::canSealFor(zeros));
+    EXPECT_FALSE(fleet::canSealFor("Unknown"));
+    EXPECT_TRUE(fleet::canSealFor(KeyPair::make(KeyKind::User).publicKey()));
 }
 
 }  // namespace

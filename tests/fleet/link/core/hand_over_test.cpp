@@ -288,6 +288,23 @@ TEST(Refusing, AnOperatorWhoseKeyIsRevoked) {
     expectEnd(driver, "refused", "revoked");
 }
 
+TEST(Refusing, NobodyKnowsWhoseKeyIsRevokedBeforeTheFirstReply) {
+    LinkDriver driver(kept(0));
+    driver.note(driver.link().hostIs("journal", {}, kNow));
+    driver.note(driver.link().connected(kNow));
+    fleet::Reply reply;
+    reply.nonce = "of another hello";
+    reply.revoked = {"operator"};
+    driver.note(driver.link().replied(reply, kNow));
+    EXPECT_FALSE(driver.link().knowsRevoked());
+    reply.nonce = driver.nonce();
+    driver.note(driver.link().replied(reply, kNow));
+    EXPECT_TRUE(driver.link().knowsRevoked());
+    EXPECT_TRUE(driver.link().isRevoked("operator"));
+    driver.link().disconnected();
+    EXPECT_TRUE(driver.link().knowsRevoked()) << "it does not forget that while it runs";
+}
+
 TEST(Refusing, AnOrderOlderThanTheJournalThatTookAnothersPlace) {
     fleet::Kept memory = kept(0);
     memory.adopted = kNow;

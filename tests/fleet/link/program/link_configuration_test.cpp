@@ -63,6 +63,17 @@ TEST_F(LinksConfiguration, IsReadWhole) {
     EXPECT_EQ(read.hostSocket, "/run/h.sock");
     EXPECT_EQ(read.state, "/var/lib/zavlink");
     EXPECT_EQ(read.labels, (fleet::Labels{{"env", "test"}}));
+    EXPECT_EQ(read.metrics, "") << "nobody has asked for them";
+}
+
+TEST_F(LinksConfiguration, MetricsGoWhereTheNodeExporterLooks) {
+    const auto withMetrics = [this](const std::string& path) {
+        return with("state", "state = \"/var/lib/zavlink\"\nmetrics = \"" + path + '"');
+    };
+    const std::string path = "/run/zavlink/zavlink.prom";
+    EXPECT_EQ(fleet::parseLinkConfiguration(withMetrics(path), "zavlink.toml").metrics, path);
+    expectRefusal(withMetrics("/run/zavlink/zavlink.txt"), "must be a path");
+    expectRefusal(withMetrics("zavlink.prom"), "must be a path");
 }
 
 TEST_F(LinksConfiguration, EverythingUnknownIsRefusedWithItsLine) {
@@ -115,6 +126,7 @@ TEST_F(LinksConfiguration, IsReadAsItWasWritten) {
     written.root = root;
     written.centres = {centre, KeyPair::make(KeyKind::User).publicKey()};
     written.state = "/var/lib/zavlink";
+    written.metrics = "/run/zavlink/zavlink.prom";
     written.labels = {{"env", "test"}, {"a b.c", "1=2"}};
     const LinkConfiguration read =
         fleet::parseLinkConfiguration(fleet::linkConfigurationText(written), "zavlink.toml");
@@ -127,6 +139,7 @@ TEST_F(LinksConfiguration, IsReadAsItWasWritten) {
     EXPECT_EQ(read.centres, written.centres);
     EXPECT_EQ(read.hostSocket, written.hostSocket);
     EXPECT_EQ(read.state, written.state);
+    EXPECT_EQ(read.metrics, written.metrics);
     EXPECT_EQ(read.labels, written.labels);
 }
 

@@ -129,7 +129,9 @@ TEST_F(AskingAHost, IsWithinTheCertificateAndTheHostsOwnLabels) {
 TEST_F(AskingAHost, NamesAKeyForTheAnswer) {
     for (const json& body :
          {json{{"product", "ux"}}, json{{"product", "ux"}, {"answerTo", "U"}},
-          json{{"product", "ux"}, {"answerTo", root_.publicKey()}}, json{{"answerTo", 7}}}) {
+          json{{"product", "ux"}, {"answerTo", root_.publicKey()}}, json{{"answerTo", 7}},
+          // A key by its check sum, for which nothing can be sealed.
+          json{{"answerTo", "UAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAAABET7"}}}) {
         question_.body = body.dump();
         EXPECT_FALSE(judged().has_value()) << body;
     }

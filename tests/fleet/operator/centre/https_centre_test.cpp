@@ -69,6 +69,21 @@ TEST_F(HttpsCentreTest, OpensASessionWithTheOperatorsKeyAndAsksInIt) {
     EXPECT_EQ(bodyOf(seen[2]), "{}");
 }
 
+TEST_F(HttpsCentreTest, WaitsNoLongerForACentreThatSaysNothingThanItWasTold) {
+    TlsServer server(certificate_, [](TlsServer& self) {
+        TlsPeer peer = self.accept();
+        peer.request();
+        peer.request();  // until the client goes
+    });
+    HttpsCentre centre(identityAt(server), soon());
+    centre.answersWithin(std::chrono::seconds(1));
+    const auto begun = std::chrono::steady_clock::now();
+    EXPECT_EQ(failureOf([&] { centre.get("/v1/whoami"); }).status(), ctl::kNoOutcome);
+    EXPECT_LT(std::chrono::steady_clock::now() - begun, std::chrono::seconds(15))
+        << "the command's own time is 20 s";
+    server.join();
+}
+
 TEST_F(HttpsCentreTest, OpensAnotherSessionWhenOneHasEnded) {
     std::vector<std::string> seen;
     TlsServer server(certificate_, [&](TlsServer& self) {

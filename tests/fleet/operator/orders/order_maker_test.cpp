@@ -50,7 +50,7 @@ protected:
         const fleet::KeyPair centre = newUser();
         const std::string numbered =
             signNumber(host_.key, 7, fleet::readOrder(order).order.id, order, centre);
-        const fleet::Trust trust{"demo",         host_.key,         "web-1", {{"env", "test"}},
+        const fleet::Trust trust{"demo",         host_.key,           "web-1", {{"env", "test"}},
                                  identity_.root, {centre.publicKey()}};
         return judge(numbered, 7, trust, bus_);
     }
@@ -152,10 +152,27 @@ TEST_F(OrderMakerTest, TriesAgainWithAnotherIdentifierAsOftenAsItMay) {
         const Order order = fleet::readOrder(bytes).order;
         EXPECT_TRUE(maker_.isOwn(order));
         EXPECT_TRUE(identifiers.insert(order.id).second);
-        bytes = maker_.again(order);
+        bytes = maker_.again(order, tries);
     }
-    EXPECT_EQ(failureOf([&] { maker_.again(fleet::readOrder(bytes).order); }).status(),
+    const Order last = fleet::readOrder(bytes).order;
+    EXPECT_EQ(failureOf([&] { maker_.again(last, fleet::kMostTries); }).status(),
               ctl::kHostReportedFailure);
+}
+
+TEST_F(OrderMakerTest, TakesTurnsWithAnotherOperator) {
+    const fleet::OperatorIdentity colleague = root_.certified({"*"}, {"*"});
+    const OrderMaker other(colleague, "r1", kNow, kHour);
+    std::string bytes = maker_.orderFor(host_, workOf(startOfUx()), "*");
+    std::set<std::string> identifiers = {fleet::readOrder(bytes).order.id};
+    const OrderMaker* const turns[] = {&other, &maker_, &maker_, &other, &other, &maker_, &other};
+    std::size_t tries = 0;
+    for (const OrderMaker* const maker : turns) {
+        bytes = maker->again(fleet::readOrder(bytes).order, ++tries);
+        const Order order = fleet::readOrder(bytes).order;
+        EXPECT_TRUE(identifiers.insert(order.id).second) << "try " << tries;
+        EXPECT_EQ(maker->again(order, tries + 1), maker->again(order, tries + 1))
+            << "who is interrupted and begins again makes the same order again";
+    }
 }
 
 TEST_F(OrderMakerTest, CancelsAnOrder) {
@@ -167,6 +184,22 @@ TEST_F(OrderMakerTest, CancelsAnOrder) {
     ASSERT_TRUE(directive.has_value());
     EXPECT_EQ(directive->refusal, "");
     EXPECT_EQ(directive->cancels, order.id);
+}
+
+TEST_F(OrderMakerTest, CancelsForAsLongAsTheOrderIsGood) {
+    const auto expiryOf = [](const std::string& bytes) {
+        return fleet::readOrder(bytes).order.expires;
+    };
+    const OrderMaker longer(identity_, "r1", kNow, 50 * kHour);
+    const std::string bytes = longer.orderFor(host_, workOf(startOfUx()), "env=test");
+    const Order order = fleet::readOrder(bytes).order;
+    EXPECT_EQ(expiryOf(maker_.cancelOf(order)), order.expires);
+    Order shorter = order;
+    shorter.expires = kNow + fleet::Moment(1);
+    EXPECT_EQ(expiryOf(maker_.cancelOf(shorter)), kNow + 24 * kHour);
+    Order endless = order;
+    endless.expires = kNow + 1000 * kHour;
+    EXPECT_EQ(expiryOf(maker_.cancelOf(endless)), kNow + fleet::kLongestOrder);
 }
 
 }  // namespace

@@ -80,6 +80,9 @@ TEST(FleetArguments, MeanSomethingToTheVerbOrAreMistakes) {
     EXPECT_EQ(mistakeIn({"--on", "*", "hosts"}), "hosts does not go with --on");
     EXPECT_EQ(mistakeIn({"--on", "*", "agents"}), none);
     EXPECT_EQ(mistakeIn({"agents"}), "--on is missing: it says which hosts are meant");
+    EXPECT_EQ(mistakeIn({"doctor"}), "--on is missing: it says which hosts are meant");
+    EXPECT_EQ(mistakeIn({"--on", "web-1", "task", "output", "-f", "deploy-7"}), none);
+    EXPECT_EQ(mistakeIn({"task", "output", "deploy-7"}), none);
     EXPECT_EQ(mistakeIn({"--on", "*", "--waves", "1", "agents"}),
               "agents does not go with --waves");
     EXPECT_EQ(mistakeIn({"--dry-run", "rollout", "ls"}), "rollout ls does not go with --dry-run");

@@ -24,8 +24,11 @@ const std::string kId(32, 'a');
 class RolloutRenewal : public testing::Test {
 protected:
     RolloutRenewal() {
-        centre_.answer("GET " + at_, json{{"kind", "START"}, {"product", "ux"}, {"selector", "*"}});
+        centre_.answer("GET " + at_, rollout("running"));
         centre_.answer("POST /v1/batches", json{{"batch", "b1"}});
+    }
+    static json rollout(const std::string& state) {
+        return {{"state", state}, {"kind", "START"}, {"product", "ux"}, {"selector", "*"}};
     }
     /// The centre has so many orders in its batch.
     void keepOrders(unsigned orders) {
@@ -99,9 +102,24 @@ TEST_F(RolloutRenewal, StopsTheReleaseOfOrdersBeforeItCancelsOthers) {
     const fleet::RenewalResult result = renew(Renewal::Abort);
     EXPECT_EQ(result.orders, 1U);
     EXPECT_EQ(result.note, "");
-    EXPECT_EQ(centre_.questions().front(), "POST " + at_ + "/abort");
-    EXPECT_EQ(centre_.asked().front().body, (json{{"orders", json::array()}}));
-    EXPECT_EQ(centre_.asked().back().body, (json{{"batch", "b1"}}));
+    const std::vector<std::string> asked = centre_.questions();
+    EXPECT_EQ(asked.at(1), "POST " + at_ + "/abort");
+    EXPECT_EQ(centre_.asked().at(1).body, (json{{"orders", json::array()}}));
+    EXPECT_EQ(asked.at(asked.size() - 2), "POST " + at_ + "/abort");
+    EXPECT_EQ(centre_.asked().at(asked.size() - 2).body, (json{{"batch", "b1"}}));
+    EXPECT_EQ(asked.back(), "GET " + at_ + "/to-sign?for=abort&from=0")
+        << "the list may have moved while it was read";
+}
+
+TEST_F(RolloutRenewal, CancelsWhatAnEarlierAbortLeft) {
+    keepOrders(1);
+    centre_.answer("GET " + at_, rollout("aborted"));
+    centre_.get(at_);  // the answer before
+    centre_.answer("GET " + at_ + "/to-sign?for=abort&from=0", json{{"hosts", {listed()}}});
+    centre_.answer("POST " + at_ + "/abort", json{{"state", "aborted"}});
+    EXPECT_EQ(renew(Renewal::Abort).orders, 1U);
+    for (const auto& question : centre_.asked())
+        EXPECT_NE(question.body, (json{{"orders", json::array()}})) << "it is aborted already";
 }
 
 TEST_F(RolloutRenewal, AbortsAlsoWhenNothingCanBeCancelled) {

@@ -74,6 +74,19 @@ TEST_F(ServedCentre, TakesNoBodyThatIsTooLong) {
     EXPECT_EQ(client.ask({"POST", "/v1/logins", most + "x"}, deadline()).status, 413U);
 }
 
+TEST_F(ServedCentre, ServesBrowsersOnlyIfItHasAPage) {
+    HttpsClient client(url(), ServerTrust::byAuthority(authority()));
+    EXPECT_EQ(client.ask({"GET", "/"}, deadline()).status, 404U);
+    const fleet::ApiServer console(*service_, {"127.0.0.1", 0},
+                                   {{"/index.html", "text/html", "<!doctype html>", ""}});
+    HttpsClient browser({"localhost", std::to_string(console.port())},
+                        ServerTrust::byAuthority(authority()));
+    EXPECT_EQ(browser.ask({"GET", "/v1/health"}, deadline()).status, 200U);
+    const fleet::HttpsAnswer refused = browser.ask({"GET", "/"}, deadline());
+    EXPECT_EQ(refused.status, 403U) << "this is not the port that the fleet's URL names";
+    EXPECT_NE(refused.body.find("its own address"), std::string::npos) << refused.body;
+}
+
 TEST_F(ServedCentre, SaysThatItsPortIsTaken) {
     EXPECT_THROW(fleet::ApiServer(*service_, {"127.0.0.1", server_->port()}), fleet::FrontError);
 }

@@ -247,6 +247,11 @@ TEST_F(CentreInterface, MakesARollOutOfOrders) {
     EXPECT_EQ(given[0]["product"], "ux");
     EXPECT_EQ(given[0]["operator"], "ada");
     EXPECT_EQ(given[0]["state"], "open");
+    EXPECT_EQ(get("/v1/orders/" + order, ada).document, given[0]);
+    EXPECT_EQ(get("/v1/orders/" + fleet::makeOrderId(), ada).status, 404U);
+    EXPECT_EQ(get("/v1/orders/none", ada).status, 400U);
+    const LoggedIn vera = login({"vera", Role::Viewer, {}, {}, "env=test", made_fleet::kDay});
+    EXPECT_EQ(get("/v1/orders/" + order, vera).status, 404U) << "it is another host's";
 }
 
 TEST_F(CentreInterface, TakesOrdersInABatch) {

@@ -14,6 +14,7 @@
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/enrolment.h"
+#include "fleet/bus/messages/hello_bytes.h"
 #include "fleet/bus/messages/login.h"
 #include "fleet/bus/messages/order.h"
 #include "fleet/server/api/centre_api.h"
@@ -45,7 +46,8 @@ struct LoggedIn {
 
 class CentreInterface : public testing::Test {
 protected:
-    CentreInterface() { start(); }
+    /// `withConsole`: as a centre that serves the console, too.
+    explicit CentreInterface(bool withConsole = false) : withConsole_(withConsole) { start(); }
     ~CentreInterface() override { stop(); }
 
     void start() {
@@ -56,7 +58,7 @@ protected:
                         made_fleet::kWorksWithin)) {
             throw std::runtime_error("the centre does not work");
         }
-        services_ = std::make_unique<fleet::ApiServices>(*service_);
+        services_ = std::make_unique<fleet::ApiServices>(*service_, withConsole_);
         api_ = std::make_unique<fleet::CentreApi>(*services_, fleet::apiRoutes());
     }
     void stop() {
@@ -152,9 +154,29 @@ protected:
         return fleet::base64Of(signOrder(order, who.key, who.certificate));
     }
 
+    /// As the host's link does.
+    void sayHello(const std::string& name, const std::string& blocked = "") {
+        const fleet::KeyPair& bus = buses_.at(name);
+        const auto host = fleet_->connect(bus, fleet_->hostToken(bus));
+        ASSERT_TRUE(host.connection) << host.text;
+        fleet::Hello hello;
+        hello.machine = "machine";
+        hello.session = fleet::makeOrderId();
+        hello.nonce = fleet::makeOrderId();
+        hello.journal = "j1";
+        hello.journalNow = "j1";
+        hello.blocked = blocked;
+        hello.time = made_fleet::today();
+        const auto answer = host.connection->request(
+            "hello." + bus.publicKey(), signHello(bus.publicKey(), hello, signers_.at(name)),
+            made_fleet::kPatience);
+        ASSERT_TRUE(answer.status.done()) << answer.status.text;
+    }
+
     // Keys of the hosts that have joined, by their names.
     std::map<std::string, KeyPair> signers_;
     std::map<std::string, KeyPair> buses_;
+    const bool withConsole_;
     const std::unique_ptr<RunningFleet> fleet_ = RunningFleet::start();
     std::unique_ptr<fleet::CentreService> service_;
     std::future<fleet::CentreProgram::End> running_;

@@ -38,6 +38,9 @@ protected:
     Answered give(const LoggedIn& who, const std::string& text) {
         return post("/v1/questions", who, {{"questions", {text}}});
     }
+    Answered giveAgain(const LoggedIn& who, const std::string& text, const json& round) {
+        return post("/v1/questions", who, {{"questions", {text}}, {"round", round}});
+    }
 };
 
 TEST_F(CentresQuestions, GoToTheHostAndItsAnswerToWhoAsked) {
@@ -69,6 +72,16 @@ TEST_F(CentresQuestions, GoToTheHostAndItsAnswerToWhoAsked) {
     const std::string piece = fleet::bytesOfBase64(answers.at(0).at("signed").get<std::string>());
     EXPECT_EQ(fleet::readAnswer(piece, key, signers_.at("web-1").publicKey()).sealed, "sealed");
     EXPECT_EQ(get(path, ada).document.at("answers").size(), 0U);
+
+    const json round = given.document.at("round");
+    const Answered again = giveAgain(ada, signedBy(ada, question(key)), round);
+    EXPECT_EQ(again.status, 201U) << again.document;
+    EXPECT_EQ(again.document.at("round"), round);
+    EXPECT_TRUE(eventually([&] { return !get(path, ada).document.at("answers").empty(); }))
+        << "answers to it come in the same round";
+    EXPECT_EQ(giveAgain(eve, signedBy(eve, question(key)), round).status, 404U);
+    EXPECT_EQ(giveAgain(ada, signedBy(ada, question(key)), "none").status, 404U);
+    EXPECT_EQ(giveAgain(ada, signedBy(ada, question(key)), 7).status, 400U);
 }
 
 TEST_F(CentresQuestions, AreTheVisitorsOwnForHostsThatTheyMaySee) {

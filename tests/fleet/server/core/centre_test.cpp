@@ -47,13 +47,14 @@ protected:
     Hello hello(Number taken) const {
         Hello made;
         made.session = "session";
-        made.nonce = "nonce";
         made.machine = "machine";
         made.taken = taken;
         made.journal = made.journalNow = "journal";
         return made;
     }
-    Reply greet(const std::string& host, const Hello& said) {
+    /// A link makes a nonce for each hello.
+    Reply greet(const std::string& host, Hello said) {
+        said.nonce = "nonce " + std::to_string(++nonces_);
         return centre_.greet(host, said, kNow).value();
     }
     void end(const std::string& host, const std::string& order, const std::string& state) {
@@ -74,6 +75,7 @@ protected:
     model::SimCentreBus bus_{disk_, dice_};
     model::SimStore store_{dice_};
     std::vector<std::string> republished_;
+    int nonces_ = 0;
     std::vector<std::string> alarms_;
     Centre centre_{store_, bus_,
                    [this](const fleet::Alarm& alarm) { alarms_.push_back(alarm.host); }};
@@ -168,6 +170,16 @@ TEST_F(CentreTest, RemovesFromTheBusWhatIsOver) {
     EXPECT_TRUE(disk_.fetch("b", 1).has_value());
 }
 
+TEST_F(CentreTest, TheSameHelloAgainProvesNothing) {
+    Hello said = hello(0);
+    said.nonce = "one";
+    EXPECT_TRUE(centre_.greet("a", said, kNow).has_value());
+    EXPECT_FALSE(centre_.greet("a", said, kNow + Moment(60'000)).has_value());
+    EXPECT_EQ(store_.host("a")->heard, kNow) << "a bus that repeats it hides that the host is away";
+    said.nonce = "another";
+    EXPECT_TRUE(centre_.greet("a", said, kNow + Moment(60'000)).has_value());
+}
+
 TEST_F(CentreTest, TheSweepRemovesWhatWasLeftOnTheBus) {
     submit("a", "one");
     work();
@@ -178,9 +190,30 @@ TEST_F(CentreTest, TheSweepRemovesWhatWasLeftOnTheBus) {
     found.host = "a";
     found.number = 1;
     found.order = "one";
-    centre_.foundOnBus(found);
+    centre_.foundOnBus(found, kNow);
     work();
     EXPECT_FALSE(disk_.fetch("a", 1).has_value());
+}
+
+TEST_F(CentreTest, AnUnknownOrderOnTheBusStopsWhatIsPublishedForItsHost) {
+    submit("a", "one");
+    work();
+    fleet::OrderRecord found;
+    found.host = "a";
+    found.number = 2;
+    found.order = "nobody's";
+    found.bytes = "a.2=nobody's";
+    centre_.foundOnBus(found, kNow);
+    EXPECT_FALSE(store_.order("a", "nobody's").has_value()) << "only a restore adopts orders";
+    EXPECT_NE(store_.host("a")->unpublished, "");
+    EXPECT_EQ(alarms_, std::vector<std::string>{"a"});
+    centre_.foundOnBus(found, kNow);
+    EXPECT_EQ(alarms_.size(), 1U) << "said once";
+    submit("a", "two");
+    submit("b", "one");
+    work();
+    EXPECT_FALSE(disk_.fetch("a", 2).has_value());
+    EXPECT_TRUE(disk_.fetch("b", 1).has_value());
 }
 
 TEST_F(CentreTest, TheFirstOutcomeStaysAndAnotherRaisesAnAlarm) {
@@ -305,7 +338,7 @@ TEST_F(CentreTest, AfterARestoreListedOrdersAreOpenAndThoseOnTheBusAdopted) {
     found.number = 5;
     found.order = "told";
     found.bytes = "bytes";
-    centre_.foundOnBus(found);
+    centre_.adoptFromBus(found);
     EXPECT_EQ(store_.order("a", "told")->number, Number{5});
 }
 

@@ -63,6 +63,39 @@ TEST_F(AskingThroughTheCentre, EndsWithItsTime) {
     EXPECT_FALSE(desk_.fetch("op", *round, end).has_value());
 }
 
+TEST_F(AskingThroughTheCentre, GoesOnInARoundForAsLongAsItIsAskedAgain) {
+    const auto round = desk_.ask("op", {{"h1", "q1", "b1"}}, Moment(1));
+    const Moment half = Moment(1) + QuestionDesk::kRoundTime / 2;
+    ASSERT_TRUE(desk_.askAgain("op", *round, {{"h1", "q2", "b2"}}, half));
+    EXPECT_EQ(published_.back(), "h1:b2");
+    const Moment end = Moment(1) + QuestionDesk::kRoundTime;
+    desk_.hear("h1", answer("q1", "x"), end - Moment(1));
+    desk_.hear("h1", answer("q2", "x"), end);
+    EXPECT_EQ(waiting(*round, end), 2U);
+    ASSERT_TRUE(desk_.askAgain("op", *round, {{"h1", "q3", "b3"}}, end));
+    desk_.hear("h1", answer("q1", "x"), end);
+    EXPECT_EQ(waiting(*round, end), 0U) << "the first question is over";
+    EXPECT_FALSE(desk_.askAgain("thief", *round, {{"h1", "q4", "b4"}}, end));
+    EXPECT_FALSE(desk_.askAgain("op", "none", {{"h1", "q4", "b4"}}, end));
+    EXPECT_FALSE(
+        desk_.askAgain("op", *round, {{"h1", "q4", "b4"}}, end + QuestionDesk::kRoundTime));
+    EXPECT_EQ(published_.size(), 3U);
+}
+
+TEST_F(AskingThroughTheCentre, HasALimitForTheQuestionsOfARound) {
+    const auto round = desk_.ask("op", {{"h1", "q1", "b1"}}, Moment(1));
+    std::vector<QuestionDesk::Asked> more;
+    for (std::size_t i = 0; i < QuestionDesk::kMostHosts; ++i)
+        more.push_back({"h", std::to_string(i), "b"});
+    EXPECT_FALSE(desk_.askAgain("op", *round, more, Moment(2)));
+    more.pop_back();
+    EXPECT_TRUE(desk_.askAgain("op", *round, more, Moment(2)));
+    EXPECT_FALSE(desk_.askAgain("op", *round, {{"h1", "q2", "b2"}}, Moment(3)));
+    EXPECT_TRUE(
+        desk_.askAgain("op", *round, {{"h1", "q2", "b2"}}, Moment(1) + QuestionDesk::kRoundTime))
+        << "older ones make room";
+}
+
 TEST_F(AskingThroughTheCentre, TakesLimitedRoom) {
     const auto round = desk_.ask("op", {{"h1", "q1", "b1"}}, Moment(1));
     const std::string piece = answer("q1", std::string(200'000, 'x'));
@@ -80,11 +113,12 @@ TEST_F(AskingThroughTheCentre, TakesLimitedRoom) {
 
 TEST_F(AskingThroughTheCentre, EndsTheOldestRoundOfWhoAsksTooMuch) {
     std::vector<std::string> rounds;
-    for (int i = 0; i < 5; ++i) {
-        rounds.push_back(*desk_.ask("op", {{"h1", std::to_string(i), "b"}}, Moment(i + 1)));
+    for (std::size_t i = 0; i <= QuestionDesk::kMostOfOperator; ++i) {
+        const Moment now(static_cast<Moment::rep>(i) + 1);
+        rounds.push_back(*desk_.ask("op", {{"h1", std::to_string(i), "b"}}, now));
     }
-    EXPECT_FALSE(desk_.fetch("op", rounds[0], Moment(6)).has_value());
-    EXPECT_TRUE(desk_.fetch("op", rounds[1], Moment(6)).has_value());
+    EXPECT_FALSE(desk_.fetch("op", rounds[0], Moment(100)).has_value());
+    EXPECT_TRUE(desk_.fetch("op", rounds[1], Moment(100)).has_value());
 }
 
 TEST_F(AskingThroughTheCentre, HasLimitsForAllTogether) {

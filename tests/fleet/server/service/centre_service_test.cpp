@@ -40,16 +40,20 @@ protected:
 
     /// A host that has joined.
     fleet::EnrolmentAnswer join(const std::string& name) const {
+        return join(name, bus, signing, false);
+    }
+    fleet::EnrolmentAnswer join(const std::string& name, const KeyPair& key, const KeyPair& signs,
+                                bool replaces) const {
         fleet::TrustDatabase trust(directory().trustDatabase());
         fleet::HostEnrolment enrolment(trust.connection());
         fleet::EnrolmentRequest request;
         request.fleet = "demo";
-        request.token = enrolment.invite({name, {}}, today());
-        request.host = bus.publicKey();
-        request.signing = signing.publicKey();
+        request.token = enrolment.invite({name, {}, replaces}, today());
+        request.host = key.publicKey();
+        request.signing = signs.publicKey();
         request.machine = "machine";
         NoRegister nobody;
-        return enrolment.redeem(fleet::signEnrolment(request, bus, signing), directory(), nobody,
+        return enrolment.redeem(fleet::signEnrolment(request, key, signs), directory(), nobody,
                                 today());
     }
     void start() {
@@ -65,6 +69,28 @@ protected:
     std::optional<fleet::HostRecord> recordOf(const std::string& host) const {
         return service->centre()
             .ask([host](fleet::CentreParts& parts) { return parts.store.host(host); })
+            .get();
+    }
+
+    static fleet::Order orderFor(const std::string& host) {
+        fleet::Order order;
+        order.fleet = "demo";
+        order.id = fleet::makeOrderId();
+        order.host = host;
+        order.selector = "*";
+        order.kind = "START";
+        order.body = "{}";
+        order.issued = today();
+        order.expires = today() + made_fleet::kDay;
+        return order;
+    }
+    std::optional<fleet::Number> submit(const fleet::Order& order) const {
+        const KeyPair key = KeyPair::make(KeyKind::User);
+        return service->centre().submit(signOrder(order, key, "certificate")).get();
+    }
+    std::optional<fleet::OrderRecord> orderNow(const fleet::Order& order) const {
+        return service->centre()
+            .ask([&](fleet::CentreParts& parts) { return parts.store.order(order.host, order.id); })
             .get();
     }
 
@@ -106,39 +132,57 @@ TEST_F(RunningCentre, TakesUpWhatACopyThatWasPutBackDoesNotKnow) {
     ASSERT_TRUE(eventually([&] { return recordOf(host).has_value(); }));
     const ScratchDir copies;
     fleet::backUpCentre(directory().orders(), copies.path("orders.db"));
-    fleet::Order order;
-    order.fleet = "demo";
-    order.id = fleet::makeOrderId();
-    order.host = host;
-    order.selector = "*";
-    order.kind = "START";
-    order.body = "{}";
-    order.issued = today();
-    order.expires = today() + made_fleet::kDay;
-    const KeyPair key = KeyPair::make(KeyKind::User);
-    ASSERT_EQ(service->centre().submit(signOrder(order, key, "certificate")).get(),
-              fleet::Number{1});
-    const auto orderNow = [&] {
-        return service->centre()
-            .ask([&](fleet::CentreParts& parts) { return parts.store.order(host, order.id); })
-            .get();
-    };
-    ASSERT_TRUE(eventually([&] { return orderNow()->isPublished; }));
+    fleet::Order order = orderFor(host);
+    ASSERT_EQ(submit(order), fleet::Number{1});
+    ASSERT_TRUE(eventually([&] { return orderNow(order)->isPublished; }));
     stop();
     service.reset();  // it has the directory's lock
 
     fleet::putBackCentre(directory().orders(), copies.path("orders.db"));
     start();
-    const auto known = orderNow();
+    const auto known = orderNow(order);
     ASSERT_TRUE(known.has_value()) << "it is on the bus";
     EXPECT_EQ(known->number, fleet::Number{1});
-    order.id = fleet::makeOrderId();
-    const auto next = service->centre().submit(signOrder(order, key, "certificate")).get();
-    EXPECT_GT(next.value(), fleet::Centre::kRestoreGap);
+    EXPECT_GT(submit(orderFor(host)).value(), fleet::Centre::kRestoreGap);
     EXPECT_GT(service->centre()
                   .ask([](fleet::CentreParts& parts) { return parts.store.listUntil(); })
                   .get(),
               today());
+}
+
+TEST_F(RunningCentre, KnowsWhatHostsGotThatJoinedAfterTheCopyThatWasPutBack) {
+    start();
+    const ScratchDir copies;
+    fleet::backUpCentre(directory().orders(), copies.path("orders.db"));
+    stop();
+    service.reset();
+    join("web-1");
+    start();
+    const std::string host = bus.publicKey();
+    ASSERT_TRUE(eventually([&] { return recordOf(host).has_value(); }));
+    const fleet::Order order = orderFor(host);
+    ASSERT_EQ(submit(order), fleet::Number{1});
+    ASSERT_TRUE(eventually([&] { return orderNow(order)->isPublished; }));
+    stop();
+    service.reset();
+
+    fleet::putBackCentre(directory().orders(), copies.path("orders.db"));
+    start();
+    ASSERT_TRUE(orderNow(order).has_value()) << "it is on the bus";
+    EXPECT_GT(submit(orderFor(host)).value(), fleet::Centre::kRestoreGap);
+}
+
+TEST_F(RunningCentre, EndsTheOrdersOfAHostThatIsReplacedOrRevoked) {
+    join("web-1");
+    start();
+    const std::string host = bus.publicKey();
+    ASSERT_TRUE(eventually([&] { return recordOf(host).has_value(); }));
+    const fleet::Order order = orderFor(host);
+    submit(order);
+    join("web-1", KeyPair::make(KeyKind::User), KeyPair::make(KeyKind::User), true);
+    const auto hasEnded = [&] { return orderNow(order)->outcome.has_value(); };
+    ASSERT_TRUE(eventually(hasEnded)) << "nobody else will tell";
+    EXPECT_EQ(orderNow(order)->outcome->state, "unknown");
 }
 
 TEST_F(RunningCentre, IsAProgramThatEndsWhenItIsTold) {

@@ -62,9 +62,10 @@ protected:
         record.unpublished = why;
         store().keepHost(record);
     }
-    static Names namesOf(const std::vector<OrderRecord>& orders) {
+    template <typename Order>
+    static Names namesOf(const std::vector<Order>& orders) {
         Names names;
-        for (const OrderRecord& order : orders)
+        for (const Order& order : orders)
             names.push_back(order.order);
         return names;
     }
@@ -164,12 +165,14 @@ TYPED_TEST(CentreStoreContract, FindsAnOrderByItsNumber) {
 TYPED_TEST(CentreStoreContract, TellsWhatWaitsLowestNumbersFirst) {
     for (const char* const order : {"one", "two", "three"})
         this->give("a", order);
-    EXPECT_EQ(this->namesOf(this->store().unpublished(9)), (Names{"one", "two", "three"}));
-    EXPECT_EQ(this->namesOf(this->store().unpublished(2)), (Names{"one", "two"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(9, 0)), (Names{"one", "two", "three"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(2, 0)), (Names{"one", "two"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(2, 1)), (Names{"two", "three"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(2, 3)), Names{});
     this->store().notePublished("a", 1);
     EXPECT_TRUE(this->store().order("a", "one")->isPublished);
     this->store().keepOutcome(this->done("a", "two"));
-    EXPECT_EQ(this->namesOf(this->store().unpublished(9)), (Names{"three"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(9, 0)), (Names{"three"}));
 }
 
 TYPED_TEST(CentreStoreContract, HoldsBackTheOrdersOfAHostForWhichNothingIsPublished) {
@@ -177,12 +180,12 @@ TYPED_TEST(CentreStoreContract, HoldsBackTheOrdersOfAHostForWhichNothingIsPublis
     this->give("b", "other");
     this->hold("a", "something is wrong");
     this->give("a", "two");
-    EXPECT_EQ(this->namesOf(this->store().unpublished(9)), (Names{"other"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(9, 0)), (Names{"other"}));
     this->hold("a", "something else is wrong");
-    EXPECT_EQ(this->namesOf(this->store().unpublished(9)), (Names{"other"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(9, 0)), (Names{"other"}));
     this->store().notePublished("b", 1);
     this->hold("a", "");
-    EXPECT_EQ(this->namesOf(this->store().unpublished(9)), (Names{"one", "two"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(9, 0)), (Names{"one", "two"}));
 }
 
 TYPED_TEST(CentreStoreContract, TellsTheOpenOrdersOfARange) {
@@ -219,7 +222,7 @@ TYPED_TEST(CentreStoreContract, AdoptsAnOrderThatOnlyTheHostKnows) {
     this->store().adopt(order);
     EXPECT_EQ(this->store().order("a", "listed")->number, Number{0});
     EXPECT_EQ(this->namesOf(this->store().open("a", 0, 9, 9)), (Names{"listed"}));
-    EXPECT_EQ(this->namesOf(this->store().unpublished(9)), Names{});
+    EXPECT_EQ(this->namesOf(this->store().unpublished(9, 0)), Names{});
 
     order.number = 5;
     order.bytes = "sealed 5";
@@ -255,7 +258,7 @@ TYPED_TEST(CentreStoreContract, SkipsNumbersOfEveryHostAndPublishesForAll) {
     EXPECT_EQ(this->store().host("b")->last, Number{5'010});
     EXPECT_EQ(this->store().host("a")->unpublished, "");
     EXPECT_EQ(this->store().listUntil(), fleet::Moment(77));
-    EXPECT_EQ(this->namesOf(this->store().unpublished(9)), (Names{"one"}));
+    EXPECT_EQ(this->namesOf(this->store().unpublished(9, 0)), (Names{"one"}));
     EXPECT_EQ(this->give("a", "two"), Number{1'001});
 }
 

@@ -44,14 +44,15 @@ public:
                                               fleet::Number number) const override {
         return store_.orderAt(host, number);
     }
-    std::vector<fleet::OrderRecord> unpublished(std::size_t most) const override {
-        return store_.unpublished(most);
+    std::vector<fleet::OrderRecord> unpublished(std::size_t most,
+                                                std::size_t skipped) const override {
+        return store_.unpublished(most, skipped);
     }
     void notePublished(const std::string& host, fleet::Number number) override {
         around([&] { store_.notePublished(host, number); });
     }
-    std::vector<fleet::OrderRecord> open(const std::string& host, fleet::Number from,
-                                         fleet::Number upTo, std::size_t most) const override {
+    std::vector<fleet::OpenOrder> open(const std::string& host, fleet::Number from,
+                                       fleet::Number upTo, std::size_t most) const override {
         return store_.open(host, from, upTo, most);
     }
     void keepOutcome(const fleet::Outcome& outcome) override {

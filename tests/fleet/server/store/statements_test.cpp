@@ -6,6 +6,7 @@
 
 #include "fleet/server/store/centre_schema.h"
 #include "fleet/server/store/order_rows.h"
+#include "fleet/server/store/stored_figures.h"
 
 namespace {
 
@@ -34,10 +35,30 @@ INSTANTIATE_TEST_SUITE_P(All, StoreStatement,
                                          fleet::kNotePublished, fleet::kKeepOutcome, fleet::kHold,
                                          fleet::kRelease, fleet::kReleaseAll, fleet::kComplete));
 
+TEST(StoreStatements, AnOrderWhoseHostNobodyKnowsIsSearchedForOnceForEachHost) {
+    const std::string plan = planOf(fleet::kOrdersNamed);
+    EXPECT_NE(plan.find("SEARCH o "), std::string::npos) << plan;
+    EXPECT_EQ(plan.find("SCAN o "), std::string::npos) << plan;
+}
+
 TEST(StoreStatements, ThoseWithoutAnIndexAreSeenToGoThroughAllOrders) {
     const std::string plan = planOf("SELECT name FROM orders WHERE bytes = x'' ORDER BY task");
     EXPECT_NE(plan.find("SCAN"), std::string::npos) << plan;
     EXPECT_NE(plan.find("TEMP B-TREE"), std::string::npos) << plan;
+}
+
+/// A scrape reads them beside the centre, every some seconds.
+TEST(StoreStatements, FiguresAreCountedInIndexesOfWhatIsUnfinished) {
+    for (const char* const count :
+         {fleet::kCountWaiting, fleet::kCountOpen, fleet::kCountUnconfirmed}) {
+        const std::string plan = planOf(count);
+        EXPECT_EQ(plan.find("SCAN rollout_parts"), std::string::npos) << plan;
+        EXPECT_EQ(plan.find("SCAN p"), std::string::npos) << plan;
+        EXPECT_EQ(plan.find("SCAN orders\n"), std::string::npos) << plan;
+    }
+    EXPECT_NE(planOf(fleet::kCountWaiting).find("orders_waiting"), std::string::npos);
+    EXPECT_NE(planOf(fleet::kCountOpen).find("orders_open"), std::string::npos);
+    EXPECT_NE(planOf(fleet::kCountUnconfirmed).find("rollout_parts_by_state"), std::string::npos);
 }
 
 /// What waits for a host that is held back is not gone through on the way to what may be published.
