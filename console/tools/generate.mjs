@@ -1,6 +1,6 @@
 // Writes src/generated: what the page takes from other places of the project, so that each fact has
-// one place. The types of the host's interface come from docs/openapi.json, the words for message
-// identifiers from zavctl's catalogue.
+// one place. The types of the host's interface come from docs/openapi.json, those of the centre's from
+// docs/fleet-openapi.json, the words for message identifiers from zavctl's catalogue.
 import { mkdir, readFile, writeFile } from 'node:fs/promises';
 import path from 'node:path';
 import { fileURLToPath, pathToFileURL } from 'node:url';
@@ -27,8 +27,10 @@ export function messagesOf(source) {
 export async function generate(project) {
     const target = path.join(here, '..', 'src', 'generated');
     await mkdir(target, { recursive: true });
-    const description = pathToFileURL(path.join(project, 'docs', 'openapi.json'));
-    await writeFile(path.join(target, 'host.ts'), astToString(await openapi(description)));
+    for (const [description, name] of [['openapi.json', 'host.ts'], ['fleet-openapi.json', 'centre.ts']]) {
+        const types = await openapi(pathToFileURL(path.join(project, 'docs', description)));
+        await writeFile(path.join(target, name), astToString(types));
+    }
     const catalogue = path.join(project, 'ctl', 'show', 'message_catalogue.cpp');
     await writeFile(path.join(target, 'messages.ts'), messagesOf(await readFile(catalogue, 'utf8')));
 }

@@ -1,11 +1,8 @@
 #include "ctl/console/console_handler.h"
 
-#include <algorithm>
-#include <chrono>
-#include <nlohmann/json.hpp>
+#include <string_view>
 #include <utility>
 
-#include "ctl/console/host_request.h"
 #include "ctl/console/refusals.h"
 #include "ctl/console/request_check.h"
 #include "http/url.h"
@@ -15,20 +12,6 @@ namespace {
 
 constexpr std::string_view kOpen = "/open";
 constexpr std::string_view kSession = "/console/session";
-constexpr std::string_view kDepot = "/console/depot";
-/// A page that asks and goes away must not keep those from their turn who want something done.
-constexpr int kMostReads = 12;
-constexpr std::chrono::seconds kReadTime{30};
-
-std::string descriptionOf(const ConsoleSettings& settings) {
-    using nlohmann::json;
-    const json document = {{"mode", "host"},
-                           {"address", settings.host.socket},
-                           {"program", "zavctl-console"},
-                           {"version", ZAV_VERSION},
-                           {"command", settings.command}};
-    return document.dump(-1, ' ', false, json::error_handler_t::replace);
-}
 
 /// The only parameter, if it is the token.
 std::string tokenIn(const http::Request& request) {
@@ -38,22 +21,13 @@ std::string tokenIn(const http::Request& request) {
     return hasToken ? target->parameters.front().second : "";
 }
 
-/// Counts while it lives, copies included.
-std::shared_ptr<void> counted(std::shared_ptr<std::atomic<int>> count) {
-    ++*count;
-    std::atomic<int>* const counter = count.get();
-    return {counter, [count = std::move(count)](void*) { --*count; }};
-}
-
 }  // namespace
 
-ConsoleHandler::ConsoleHandler(ConsoleSettings settings, std::uint16_t port)
-    : host_(settings.host),
+ConsoleHandler::ConsoleHandler(ConsoleSettings settings, Backend& backend, std::uint16_t port)
+    : backend_(backend),
       port_(port),
-      description_(descriptionOf(settings)),
       page_(std::move(settings.page)),
-      session_(std::move(settings.clock)),
-      uploads_(std::move(settings.uploadDirectory)) {}
+      session_(std::move(settings.clock)) {}
 
 std::string ConsoleHandler::opening() const {
     return std::string(kOpen) + "?token=" + session_.token();
@@ -64,19 +38,14 @@ std::variant<http::Answer, http::Job> ConsoleHandler::handle(http::Request reque
     if (path == kOpen) return http::Answer(open(request));
     if (auto refusal = refusalOf(request)) return http::Answer(std::move(*refusal));
     if (!isForPrograms(path)) return http::Answer(page_.answer(request));
-    if (path == "/v1" || path.substr(0, 4) == "/v1/") {
-        if (onlyReads(request) && *reads_ >= kMostReads) {
-            return http::Answer(refusalAt(path, 503, "too many questions wait for the host"));
-        }
-        return hand(std::move(request));
-    }
-    return http::Answer(answerOwn(request));
+    if (path != kSession) return backend_.handle(std::move(request));
+    if (!onlyReads(request)) return http::Answer(wrongMethodAt(path, "GET, HEAD"));
+    return backend_.describe();
 }
 
 http::BodyPlan ConsoleHandler::planFor(const http::Request& head) {
     if (auto refusal = refusalOf(head)) return std::move(*refusal);
-    if (pathOf(head) == kDepot && head.method == "PUT") return uploads_.begin(head, host_);
-    return {};
+    return isForPrograms(pathOf(head)) ? backend_.planFor(head) : http::BodyPlan();
 }
 
 const std::vector<std::string>& ConsoleHandler::wantedFields() const {
@@ -84,20 +53,7 @@ const std::vector<std::string>& ConsoleHandler::wantedFields() const {
 }
 
 const http::Fields& ConsoleHandler::commonFields() const {
-    static const http::Fields kFields = {
-        {"Content-Security-Policy",
-         "default-src 'none'; script-src 'self'; style-src 'self'; img-src 'self'; connect-src "
-         "'self'; base-uri 'none'; form-action 'none'; frame-ancestors 'none'"},
-        {"X-Content-Type-Options", "nosniff"},
-        {"Referrer-Policy", "no-referrer"},
-        {"Cross-Origin-Opener-Policy", "same-origin"},
-        {"Cross-Origin-Resource-Policy", "same-origin"},
-        {"Cache-Control", "no-store"}};
-    return kFields;
-}
-
-bool ConsoleHandler::quiet() const {
-    return *changes_ == 0 && uploads_.empty();
+    return pageFields();
 }
 
 std::optional<http::Reply> ConsoleHandler::refusalOf(const http::Request& request) const {
@@ -131,28 +87,6 @@ http::Reply ConsoleHandler::open(const http::Request& request) {
                     {"Set-Cookie", std::string(kCookieName) + "=" + *cookie +
                                        "; HttpOnly; SameSite=Strict; Path=/"}};
     return reply;
-}
-
-http::Reply ConsoleHandler::answerOwn(const http::Request& request) const {
-    const std::string_view path = pathOf(request);
-    if (path == kSession) {
-        if (!onlyReads(request)) return wrongMethodAt(path, "GET, HEAD");
-        return http::jsonReply(200, description_);
-    }
-    if (path != kDepot) return refusalAt(path, 404, "there is nothing at this path");
-    if (request.method != "PUT") return wrongMethodAt(path, "PUT");
-    return refusalAt(path, 411, "the file is the body, and there is none");
-}
-
-http::Job ConsoleHandler::hand(http::Request request) {
-    const bool reads = onlyReads(request);
-    ctl::HostAddress host = host_;
-    if (reads) host.timeout = std::min<std::chrono::milliseconds>(host.timeout, kReadTime);
-    std::shared_ptr<void> turn = counted(reads ? reads_ : changes_);
-    return [this, turn = std::move(turn), host = std::move(host),
-            request = std::move(request)]() -> http::Answer {
-        return passOn(request, host, streams_);
-    };
 }
 
 }  // namespace console

@@ -64,10 +64,10 @@ http::ServerLimits limits() {
 
 }  // namespace
 
-ConsoleServer::ConsoleServer(ConsoleSettings settings, std::uint16_t port)
+ConsoleServer::ConsoleServer(ConsoleSettings settings, Backend& backend, std::uint16_t port)
     : listener_(listenOn(port)),
       port_(portOf(listener_)),
-      handler_(settings, port_),
+      handler_(settings, backend, port_),
       server_(listener_.get(), doorFor(std::move(settings.browsers)), handler_, counts_, limits()) {
 }
 

@@ -16,9 +16,9 @@ namespace console {
 /// Listens on 127.0.0.1 only.
 class ConsoleServer {
 public:
-    /// Port 0 is any that is free. Throws ctl::Failure if the port cannot be had, and
-    /// std::runtime_error.
-    ConsoleServer(ConsoleSettings settings, std::uint16_t port);
+    /// Port 0 is any that is free; the backend outlives the server. Throws ctl::Failure if the port
+    /// cannot be had, and std::runtime_error.
+    ConsoleServer(ConsoleSettings settings, Backend& backend, std::uint16_t port);
     ConsoleServer(const ConsoleServer&) = delete;
     ConsoleServer& operator=(const ConsoleServer&) = delete;
 

@@ -1,21 +1,20 @@
 // zavctl-console: the part of zavctl that serves a page for a browser. zavctl runs it.
 
-#include <sys/signalfd.h>
-
 #include <csignal>
-#include <cstdlib>
 #include <exception>
-#include <nlohmann/json.hpp>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "ctl/client/address/peer.h"
 #include "ctl/client/failure.h"
 #include "ctl/client/transfer/interruption.h"
 #include "ctl/command_line.h"
-#include "ctl/console/console_server.h"
-#include "ctl/console/copied_command.h"
 #include "ctl/console/embedded_page.h"
+#include "ctl/console/host/copied_command.h"
+#include "ctl/console/host/host_backend.h"
+#include "ctl/console/received_file.h"
+#include "ctl/console/serving.h"
 #include "ctl/show/page.h"
 #include "ctl/show/standard_streams.h"
 #include "ctl/show/terminal.h"
@@ -27,43 +26,19 @@
 
 namespace {
 
-/// Readable once somebody wants the program to end. No thread gets these signals otherwise.
-sys::FileDescriptor endSignals() {
-    sigset_t signals;
-    sigemptyset(&signals);
-    for (const int signal : {SIGINT, SIGTERM, SIGHUP})
-        sigaddset(&signals, signal);
-    ::sigprocmask(SIG_BLOCK, &signals, nullptr);
-    return sys::FileDescriptor(::signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK));
-}
-
-ctl::ExitStatus printLink(const std::string& link, ctl::Format format) {
-    if (format == ctl::Format::Json) return ctl::print(ctl::jsonPage({{"console", link}}));
-    // A link that is broken into lines is none.
-    return ctl::print({"console: " + link + "\n", {}, ctl::kSuccess, true});
-}
-
 ctl::ExitStatus serve(const ctl::Invocation& invocation) {
-    const sys::FileDescriptor signals = endSignals();
+    const sys::FileDescriptor signals = console::endSignals();
+    console::HostSettings host;
+    host.host = invocation.host;
+    host.command = console::copiedCommand(invocation.given);
+    host.uploadDirectory = console::receivingDirectory();
+    console::HostBackend backend(std::move(host));
     console::ConsoleSettings settings;
-    settings.host = invocation.host;
     settings.page = console::embeddedPage();
-    settings.command = console::copiedCommand(invocation.given);
-    if (const char* const named = std::getenv("TMPDIR"); named != nullptr && *named != '\0') {
-        settings.uploadDirectory = named;
-    }
-    settings.browsers.other = invocation.given.has(ctl::kBrowserUser)
-                                  ? console::browserUser(invocation.given.text(ctl::kBrowserUser))
-                                  : console::userBehindSudo();
-    const auto port = static_cast<std::uint16_t>(invocation.given.number(ctl::kConsolePort));
-    console::ConsoleServer server(std::move(settings), port);
-    server.endWhenReadable(signals.get(), [] { ctl::Interruption::interrupt(SIGTERM); });
-    const ctl::ExitStatus status =
-        ctl::withOutputWritten(printLink(server.link(), invocation.format));
-    if (status != ctl::kSuccess) return status;  // nobody could open it
-    server.run();
-    // Requests that only wait for the host may go on for minutes. They change nothing.
-    std::_Exit(ctl::kSuccess);
+    settings.browsers = console::browsersOf(invocation.given);
+    return console::serveUntilSignal(std::move(settings), backend, invocation.given,
+                                     invocation.format, signals,
+                                     [] { ctl::Interruption::interrupt(SIGTERM); });
 }
 
 /// The verb of zavctl, whose help it is that people see; here it does what it says.

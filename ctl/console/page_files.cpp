@@ -77,6 +77,19 @@ const PageFiles::Entry* PageFiles::find(std::string_view path) const {
     return found == entries_.end() ? nullptr : &*found;
 }
 
+const http::Fields& pageFields() {
+    static const http::Fields kFields = {
+        {"Content-Security-Policy",
+         "default-src 'none'; script-src 'self'; style-src 'self'; img-src 'self'; connect-src "
+         "'self'; base-uri 'none'; form-action 'none'; frame-ancestors 'none'"},
+        {"X-Content-Type-Options", "nosniff"},
+        {"Referrer-Policy", "no-referrer"},
+        {"Cross-Origin-Opener-Policy", "same-origin"},
+        {"Cross-Origin-Resource-Policy", "same-origin"},
+        {"Cache-Control", "no-store"}};
+    return kFields;
+}
+
 bool takesGzip(std::string_view acceptEncoding) {
     return anyOf(acceptEncoding, [](std::string_view coding) {
         const std::size_t end = coding.find(';');

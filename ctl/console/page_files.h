@@ -38,6 +38,10 @@ private:
     std::vector<Entry> entries_;
 };
 
+/// The fields of all answers of a server of the page: the browser runs and asks for nothing that
+/// comes from elsewhere, shows it in no other page, and keeps nothing.
+const http::Fields& pageFields();
+
 /// Whether a field Accept-Encoding takes gzip.
 bool takesGzip(std::string_view acceptEncoding);
 

@@ -46,7 +46,7 @@ std::string complaintAbout(const http::Request& request, std::uint16_t port) {
     const std::string_view host = fieldOf(request, "Host");
     if (!isOwnName(host, port)) return "the console answers to its own address only";
     if (onlyReads(request)) return "";
-    if (fieldOf(request, kOwnField) != "1") {
+    if (!isOfPage(request)) {
         return "a request that may change something needs the field X-Zav-Console: 1";
     }
     const std::size_t origins = countOf(request, "Origin");
@@ -59,6 +59,10 @@ bool isOfAnotherSite(const http::Request& request) {
     if (countOf(request, kSite) == 0) return false;  // older browsers do not say
     const std::string_view site = fieldOf(request, kSite);
     return site != "same-origin" && site != "none";
+}
+
+bool isOfPage(const http::Request& request) {
+    return fieldOf(request, kOwnField) == "1";
 }
 
 bool onlyReads(const http::Request& request) {

@@ -27,6 +27,8 @@ std::string complaintAbout(const http::Request& request, std::uint16_t port);
 /// gets the cookie sent along, because cookies know no ports.
 bool isOfAnotherSite(const http::Request& request);
 
+/// Whether the console's own page asks: no other page can send its field without being let.
+bool isOfPage(const http::Request& request);
 /// Whether the method changes nothing.
 bool onlyReads(const http::Request& request);
 

@@ -33,19 +33,20 @@ export async function askSums(paths: readonly DepotPath[]): Promise<DepotSum[]> 
     return (await ask<{ files: DepotSum[] }>(target('/v1/depot/sum', paths.map((path) => `path=${path}`)))).files;
 }
 
-/// Whether the host would take a file of so many bytes.
-export const askCheck = (path: DepotPath, bytes: number): Promise<DepotCheck> =>
-    ask(target('/v1/depot/check', [`path=${path}`, `bytes=${bytes}`]));
+/// Whether the host would take files of so many bytes together. There are as many as one request can carry.
+export const askCheck = (paths: readonly DepotPath[], bytes: number): Promise<DepotCheck> =>
+    ask(target('/v1/depot/check', [...paths.map((path) => `path=${path}`), `bytes=${bytes}`]));
 
 export const removeFromDepot = (path: DepotPath, recursive: boolean): Promise<unknown> =>
     ask(target('/v1/depot', [`path=${path}`, ...(recursive ? ['recursive=1'] : [])]), { method: 'DELETE' });
 
 /// Sends a file. `onProgress` hears how many bytes have gone; XMLHttpRequest is what can tell.
 /// Throws a Problem.
-export function pushFile(path: DepotPath, file: Blob, onProgress: (sent: number) => void, signal: AbortSignal): Promise<Arrival> {
+/// The answer is the JSON document of whoever takes it.
+export function putFile<T>(address: string, file: Blob, onProgress: (sent: number) => void, signal: AbortSignal): Promise<T> {
     return new Promise((resolve, reject) => {
         const request = new XMLHttpRequest();
-        request.open('PUT', `/console/depot?path=${path}`);
+        request.open('PUT', address);
         for (const [name, value] of Object.entries(ownHeader)) request.setRequestHeader(name, value);
         request.setRequestHeader('Content-Type', 'application/octet-stream');
         request.upload.onprogress = (event) => onProgress(event.loaded);
@@ -55,9 +56,12 @@ export function pushFile(path: DepotPath, file: Blob, onProgress: (sent: number)
         request.onabort = () => reject(new DOMException('given up', 'AbortError'));
         request.onload = () => {
             if (request.status !== 200) reject(problemOf(request.status, request.responseText));
-            else resolve(JSON.parse(request.responseText) as Arrival);
+            else resolve(JSON.parse(request.responseText) as T);
         };
         signal.addEventListener('abort', () => request.abort(), { once: true });
         request.send(file);
     });
 }
+
+export const pushFile = (path: DepotPath, file: Blob, onProgress: (sent: number) => void, signal: AbortSignal): Promise<Arrival> =>
+    putFile(`/console/depot?path=${path}`, file, onProgress, signal);

@@ -32,7 +32,7 @@ export function problemOf(status: number, body: string): Problem {
         // Whoever answered was not the host. Its status has to do.
     }
     if (status === 401) {
-        return new Problem('this session is over', status, '', 'Run zavctl console again and open the link that it prints.');
+        return new Problem('this session is over', status, '', 'Open a new link: zavctl console prints it, and with --at-centre one to the console of a centre.');
     }
     const text = member(document, 'error') || `the answer has the status ${status}`;
     return new Problem(text, status, member(document, 'guard'), member(document, 'hint'));
@@ -40,5 +40,5 @@ export function problemOf(status: number, body: string): Problem {
 
 export function asProblem(error: unknown): Problem {
     if (error instanceof Problem) return error;
-    return new Problem('the console cannot be reached', 0, '', 'zavctl console must be running on this machine.');
+    return new Problem('the console cannot be reached', 0, '', 'What serves it must be running: zavctl console on this machine, or the centre.');
 }

@@ -28,7 +28,15 @@ export interface Session {
     program: string;
     version: string;
     /// What stands before a verb in a line to copy.
-    command: string[];
+    command: string[] | string;
+    /// Of a fleet: its name, and whose session the centre has opened.
+    fleet?: string;
+    operator?: string;
+    role?: string;
+    /// Whether files for the depots of its hosts are taken.
+    push?: boolean;
+    /// The server does nothing that changes anything, whoever asks: it is done elsewhere, with zavctl.
+    onlyLooks?: boolean;
 }
 
 /// A file that has arrived in the depot.

@@ -1,12 +1,9 @@
-/// The one stream of outcomes that all pages listen to. It is open as long as somebody can see the
-/// page: browsers allow few connections to one server, and a hidden page catches up when it is
-/// looked at again.
+/// A host's outcomes, as all pages of its console hear of them.
 import { askHealth } from '../api/host';
-import { type Problem, asProblem } from '../api/problem';
 import type { Row, Task } from '../api/types';
 import { Store } from '../state/store';
+import { startConnection } from './connection';
 import type { ServerEvent } from './parser';
-import { EventStream } from './stream';
 
 export interface FeedItem {
     /// No two items of this page have the same.
@@ -21,28 +18,14 @@ export interface FeedItem {
         | { kind: 'gap'; missing: number | null };
 }
 
-export type FeedStatus =
-    | { kind: 'connecting' }
-    | { kind: 'live' }
-    | { kind: 'paused' }
-    /// `isGivenUp`: it is not tried again by itself.
-    | { kind: 'broken'; problem: Problem; since: Date; isGivenUp: boolean };
-
 export const mostItems = 10_000;
 /// So many events from before the page was opened are shown.
 const eventsBefore = 500;
 /// Events that come faster are shown together.
 const flushEvery = 100;
-/// A page that is hidden for so long gives its connection up.
-const hiddenFor = 60_000;
-
-/// After so many failures in a row in which nobody answered at all, about a minute and a half, the
-/// console has ended: another one has another session.
-const mostSilences = 12;
 
 const path = '/v1/events?table=KAGDYST&tasks=1';
 
-export const feedStatus = new Store<FeedStatus>({ kind: 'connecting' });
 /// The newest first.
 export const feedItems = new Store<readonly FeedItem[]>([]);
 /// Counts what forces everybody to look anew: events that were lost, another journal.
@@ -57,10 +40,7 @@ export function onFeed(listener: BatchListener): () => void {
     return () => listeners.delete(listener);
 }
 
-let stream: EventStream | undefined;
-let position = '';
 let keys = 0;
-let silences = 0;
 let pending: FeedItem[] = [];
 let flushing: ReturnType<typeof setTimeout> | undefined;
 
@@ -92,40 +72,13 @@ function contentOf(event: ServerEvent): FeedItem['content'] | undefined {
 }
 
 function take(event: ServerEvent): void {
-    position = event.id;
     const content = contentOf(event);
     if (!content) return;
     pending.push({ key: ++keys, id: event.id, heard: new Date(), content });
     flushing ??= setTimeout(flush, flushEvery);
 }
 
-function broken(problem: Problem): void {
-    const old = feedStatus.get();
-    silences = problem.status === 0 ? silences + 1 : 0;
-    const isGivenUp = problem.status === 401 || silences >= mostSilences;
-    if (isGivenUp) stream?.close();
-    feedStatus.set({ kind: 'broken', problem, since: old.kind === 'broken' ? old.since : new Date(), isGivenUp });
-}
-
-function open(): void {
-    stream?.close();
-    stream = new EventStream(
-        path,
-        {
-            onEvent: take,
-            onOpen: (where) => {
-                position = where;
-                silences = 0;
-                feedStatus.set({ kind: 'live' });
-            },
-            onBreak: broken,
-            onRefusal: broken,
-        },
-        position,
-    );
-}
-
-/// Where a page begins that has seen nothing yet: some events before the last one.
+/// Some events before the last one.
 async function startPosition(): Promise<string> {
     const journal = (await askHealth()).journal;
     const probe = new AbortController();
@@ -137,36 +90,4 @@ async function startPosition(): Promise<string> {
     return `${journal}-${Math.max(number - eventsBefore, 0)}`;
 }
 
-async function begin(): Promise<void> {
-    try {
-        position = await startPosition();
-    } catch (error) {
-        broken(asProblem(error));
-    }
-    open();
-}
-
-/// Opens the connection again at once, when it is broken.
-export function retryFeed(): void {
-    if (feedStatus.get().kind !== 'broken') return;
-    silences = 0;
-    open();
-}
-
-export function startFeed(): void {
-    let hiding: ReturnType<typeof setTimeout> | undefined;
-    document.addEventListener('visibilitychange', () => {
-        clearTimeout(hiding);
-        if (document.visibilityState === 'hidden') {
-            hiding = setTimeout(() => {
-                stream?.close();
-                feedStatus.set({ kind: 'paused' });
-            }, hiddenFor);
-        } else if (feedStatus.get().kind === 'paused') {
-            feedStatus.set({ kind: 'connecting' });
-            open();
-        }
-    });
-    addEventListener('online', retryFeed);
-    void begin();
-}
+export const startFeed = (): void => startConnection({ path, onEvent: take, beginAt: startPosition });

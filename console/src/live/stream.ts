@@ -1,4 +1,5 @@
 /// A stream of events that is opened again when it breaks, behind the last event that came.
+import { ownHeader } from '../api/client';
 import { Problem, asProblem, problemOf } from '../api/problem';
 import { EventParser, type ServerEvent } from './parser';
 
@@ -98,7 +99,7 @@ export class EventStream {
         listen();
         try {
             const answer = await fetch(this.path, {
-                headers: this.position === '' ? {} : { 'Last-Event-ID': this.position },
+                headers: { ...ownHeader, ...(this.position === '' ? {} : { 'Last-Event-ID': this.position }) },
                 signal: this.connection.signal,
             });
             if (!answer.ok || !answer.body) return problemOf(answer.status, await answer.text());

@@ -4,7 +4,8 @@ import { type Problem, asProblem } from '../api/problem';
 import { askTasks, isOver } from '../api/tasks';
 import type { Task, TaskSummary } from '../api/types';
 import { Store } from '../state/store';
-import { feedStatus, onFeed } from './feed';
+import { feedStatus } from './connection';
+import { onFeed } from './feed';
 
 const askEvery = 4_000;
 /// After something has ended the next task begins at once; a burst of ends is one question.

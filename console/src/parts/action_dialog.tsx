@@ -5,7 +5,7 @@ import { type Problem, asProblem } from '../api/problem';
 import { RequestNames, type TaskRequest } from '../api/tasks';
 import type { Task } from '../api/types';
 import { act } from '../state/actions';
-import { commandPrefix } from '../state/host';
+import { commandPrefix } from '../state/session';
 import { notify } from '../state/notices';
 import { taskLine, titleOf } from '../words/lines';
 import { masked } from '../words/masked';

@@ -86,13 +86,13 @@ export function CopyButton({ text, label }: { text: string; label: string }) {
     return <button type="button" class="small" onClick={() => void copy()} aria-label={said || label} aria-live="polite">{said || 'Copy'}</button>;
 }
 
-/// The line that does the same in a terminal.
-export function CommandLine({ line }: { line: string }) {
+/// The line that does the same in a terminal. Where there are several, each has a name.
+export function CommandLine({ line, name = 'The same on the command line' }: { line: string; name?: string }) {
     // Words are spelled out; the text of a here-document cannot be.
     const isCopied = !holdsHidden(line);
     return (
         <div class="command-line">
-            <pre tabIndex={0} role="region" aria-label="The same on the command line"><code>{printableLines(line)}</code></pre>
+            <pre tabIndex={0} role="region" aria-label={name}><code>{printableLines(line)}</code></pre>
             {isCopied ? <CopyButton text={line} label="Copy the command line" />
                 : <span class="faint">Not to be copied: it holds characters that a terminal would obey.</span>}
         </div>

@@ -2,12 +2,14 @@
 /// holds, notices, and the keyboard.
 import type { ComponentChildren } from 'preact';
 import { useEffect, useState } from 'preact/hooks';
-import { type FeedStatus, feedStatus, retryFeed } from '../live/feed';
+import { type FeedStatus, feedStatus, retryFeed } from '../live/connection';
 import { retryWork, work, workProblem } from '../live/work';
-import { pages } from '../pages/table';
+import { usePages } from '../pages/table';
 import { Link } from '../route/link';
 import { usePlace } from '../route/route';
-import { health, session, whoami } from '../state/host';
+import { rollouts } from '../state/fleet/rollouts';
+import { health, whoami } from '../state/host';
+import { isFleet, session } from '../state/session';
 import { useStore } from '../state/store';
 import { printable } from '../words/printable';
 import { Time } from './basics';
@@ -53,17 +55,21 @@ function BrokenBanner() {
 
 function Navigation() {
     const { path } = usePlace();
-    const inHand = useStore(work)?.length ?? 0;
+    const inHand: Readonly<Record<string, number>> = {
+        '/tasks': useStore(work)?.length ?? 0,
+        '/rollouts': (useStore(rollouts).value ?? []).filter((rollout) => rollout.state === 'running').length,
+    };
     return (
         <nav aria-label="Pages">
             <ul>
-                {pages.map((page) => {
+                {usePages().map((page) => {
+                    const count = inHand[page.path] ?? 0;
                     const isHere = page.path === '/' ? path === '/' : path === page.path || path.startsWith(`${page.path}/`);
                     return (
                         <li key={page.path}>
                             <Link to={page.path} aria-current={isHere ? 'page' : undefined}>
                                 {page.name}
-                                {page.path === '/tasks' && inHand > 0 && <span class="count" aria-label={`${inHand} in hand`}>{inHand}</span>}
+                                {count > 0 && <span class="count" aria-label={`${count} in hand`}>{count}</span>}
                             </Link>
                         </li>
                     );
@@ -73,21 +79,30 @@ function Navigation() {
     );
 }
 
-export function Frame({ children }: { children: ComponentChildren }) {
-    const [isHelpOpen, setHelpOpen] = useState(false);
+/// What is looked at, and who looks.
+function useNames(): { title: string; visitor: string } {
+    const known = useStore(session);
     const how = useStore(health);
     const who = useStore(whoami);
+    if (isFleet(known)) {
+        const role = known?.role === 'viewer' ? 'may only look' : known?.onlyLooks ? `${known.role ?? ''}, here only to look` : known?.role;
+        return { title: known?.fleet || 'Fleet', visitor: [known?.operator, role].filter((text) => text).join(', ') };
+    }
+    return { title: how?.origin_node ?? 'Console', visitor: who ? `${who.user}${who.access === 'read' ? ', may only look' : ''}` : '' };
+}
+
+export function Frame({ children }: { children: ComponentChildren }) {
+    const [isHelpOpen, setHelpOpen] = useState(false);
+    const { title, visitor } = useNames();
     const here = useStore(session);
     useEffect(() => listenToKeys(() => setHelpOpen(true)), []);
     return (
         <>
             <a class="skip" href="#main">Skip to the page</a>
             <header class="top">
-                <Link to="/" class="brand"><img src="/icon.svg" alt="" width={22} height={22} /><span>{how ? printable(how.origin_node) : 'Console'}</span></Link>
+                <Link to="/" class="brand"><img src="/icon.svg" alt="" width={22} height={22} /><span>{printable(title)}</span></Link>
                 <Connection />
-                <span class="who faint">
-                    {who && <>{printable(who.user)}{who.access === 'read' && ', may only look'}</>}
-                </span>
+                <span class="who faint">{printable(visitor)}</span>
                 <button type="button" class="plain" aria-label="Keyboard and help" onClick={() => setHelpOpen(true)}>?</button>
             </header>
             <div class="frame">

@@ -1,4 +1,4 @@
-import { pages } from '../pages/table';
+import { usePages } from '../pages/table';
 import { useStore } from '../state/store';
 import { Dialog } from './dialog';
 import { areKeysOn } from './keyboard';
@@ -7,7 +7,7 @@ export function HelpDialog({ onClose }: { onClose: () => void }) {
     const isOn = useStore(areKeysOn);
     const keys: readonly (readonly [string, string])[] = [
         ['/', 'Search on this page'],
-        ...pages.map((page) => [`g ${page.key}`, page.name] as const),
+        ...usePages().map((page) => [`g ${page.key}`, page.name] as const),
         ['Esc', 'Close a window'],
         ['?', 'This help'],
     ];

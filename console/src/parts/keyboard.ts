@@ -1,5 +1,5 @@
 /// Keys that lead somewhere. They can be switched off: single letters get in the way of speech input.
-import { pages } from '../pages/table';
+import { pagesNow } from '../pages/table';
 import { go } from '../route/route';
 import { Store } from '../state/store';
 
@@ -17,7 +17,8 @@ const isTyping = (target: EventTarget | null): boolean =>
 
 function search(): void {
     const field = (): HTMLInputElement | null => document.querySelector<HTMLInputElement>('[data-search]');
-    if (!field()) go('/tasks');
+    const searched = pagesNow().find((page) => page.isSearched);
+    if (!field() && searched) go(searched.path);
     // The page that has it is there with the next frame.
     requestAnimationFrame(() => setTimeout(() => field()?.focus()));
 }
@@ -29,7 +30,7 @@ export function listenToKeys(showHelp: () => void): () => void {
         if (!areKeysOn.get() || event.ctrlKey || event.metaKey || event.altKey || isTyping(event.target)) return;
         if (document.querySelector('dialog[open]')) return;
         const isSecond = event.timeStamp - goneAt < patience;
-        const page = isSecond ? pages.find((one) => one.key === event.key) : undefined;
+        const page = isSecond ? pagesNow().find((one) => one.key === event.key) : undefined;
         goneAt = event.key === 'g' && !isSecond ? event.timeStamp : -patience;
         if (page) go(page.path);
         else if (isSecond) return;

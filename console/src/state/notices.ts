@@ -9,6 +9,8 @@ export interface Notice {
     hint?: string | undefined;
     /// A task to look at.
     task?: string | undefined;
+    /// Of a fleet: a roll-out to look at.
+    rollout?: string | undefined;
 }
 
 export const notices = new Store<readonly Notice[]>([]);

@@ -1,7 +1,7 @@
 /// Files on their way into the depot. They go on while other pages are looked at.
 import { askCheck, encodedPath, pushFile, shownPath, type DepotPath } from '../api/depot';
 import { Problem, asProblem } from '../api/problem';
-import type { Arrival } from '../api/types';
+import type { Arrival, DepotCheck } from '../api/types';
 import { Store } from './store';
 
 export interface Push {
@@ -10,9 +10,16 @@ export interface Push {
     path: DepotPath;
     bytes: number;
     sent: number;
-    state: 'checking' | 'ready' | 'waiting' | 'sending' | 'verifying' | 'arrived' | 'refused';
+    /// `held`: it could be sent, but others of its folder could not.
+    state: 'checking' | 'held' | 'ready' | 'waiting' | 'sending' | 'verifying' | 'arrived' | 'refused';
     /// What the host said before anything was sent.
     notes: string[];
+    /// There is a file of that name already.
+    replaces: boolean;
+    /// Its line ends are converted.
+    converted: boolean;
+    /// The folder that it came with; see folders.ts.
+    folder?: number;
     problem?: Problem;
     arrival?: Arrival;
 }
@@ -25,37 +32,62 @@ const files = new Map<number, { file: File; abort: AbortController }>();
 let keys = 0;
 
 function change(key: number, changes: Partial<Push>): void {
-    pushes.update((all) => all.map((push) => (push.key === key ? { ...push, ...changes } : push)));
+    changeMany(new Map([[key, changes]]));
+}
+
+/// All at once: each change is drawn.
+export function changeMany(changes: ReadonlyMap<number, Partial<Push>>): void {
+    pushes.update((all) => all.map((push) => (changes.has(push.key) ? { ...push, ...changes.get(push.key) } : push)));
+}
+
+/// What the host has answered about the file in that place of its question.
+export function verdictOn({ taken, error, guard, hint, files: rows }: DepotCheck, place: number): Partial<Push> {
+    const row = rows[place];
+    const refused = row && !row.taken ? row : !taken && rows.every((one) => one.taken) ? { error, guard, hint } : undefined;
+    if (refused) return { state: 'refused', problem: new Problem(refused.error ?? 'the host does not take it', 409, refused.guard ?? '', refused.hint ?? '') };
+    const notes = [
+        ...(row?.replaces ? ['There is a file of that name: it is gone once this one is on its way.'] : []),
+        ...(row?.converted ? ['Line ends are converted: carriage returns and Ctrl-Z are dropped from it.'] : []),
+    ];
+    return { state: 'ready', notes, replaces: row?.replaces === true, converted: row?.converted === true };
 }
 
 /// Asks the host whether it would take the file, before anything is sent.
 async function check(push: Push): Promise<void> {
     try {
-        const answer = await askCheck(push.path, push.bytes);
-        const row = answer.files[0];
-        const refused = row && !row.taken ? row : answer;
-        if (!answer.taken) {
-            throw new Problem(refused.error ?? 'the host does not take it', 409, refused.guard ?? '', refused.hint ?? '');
-        }
-        const notes = [
-            ...(row?.replaces ? ['There is a file of that name: it is gone once this one is on its way.'] : []),
-            ...(row?.converted ? ['Line ends are converted: carriage returns and Ctrl-Z are dropped from it.'] : []),
-        ];
-        change(push.key, { state: 'ready', notes });
+        change(push.key, verdictOn(await askCheck([push.path], push.bytes), 0));
     } catch (error) {
         change(push.key, { state: 'refused', problem: asProblem(error) });
     }
 }
 
-/// Files that are to go into a directory of the depot. Nothing is sent yet.
-export function addFiles(directory: DepotPath, list: readonly File[]): void {
-    for (const file of list) {
-        const path = `${directory === '' ? '' : `${directory}/`}${encodedPath(file.name)}`;
-        const push: Push = { key: ++keys, name: file.name, path, bytes: file.size, sent: 0, state: 'checking', notes: [] };
-        files.set(push.key, { file, abort: new AbortController() });
-        pushes.update((all) => [...all, push]);
-        void check(push);
+/// The names as a path below the directory; undefined if one of them is no text.
+export function pathBelow(directory: DepotPath, names: readonly string[]): DepotPath | undefined {
+    try {
+        const below = encodedPath(names.join('/'));
+        return directory === '' ? below : `${directory}/${below}`;
+    } catch {
+        return undefined;
     }
+}
+
+/// Files at their places in the depot, which the host has yet to be asked about.
+export function enter(list: readonly { file: File; path: DepotPath }[], folder?: number): Push[] {
+    const made = list.map(({ file, path }): Push => ({
+        key: ++keys, name: file.name, path, bytes: file.size, sent: 0, state: 'checking', notes: [], replaces: false, converted: false, ...(folder === undefined ? {} : { folder }),
+    }));
+    made.forEach((push, i) => files.set(push.key, { file: list[i]!.file, abort: new AbortController() }));
+    pushes.update((all) => [...all, ...made]);
+    return made;
+}
+
+/// Files that are to go into a directory of the depot. Nothing is sent yet. Returns the names of those
+/// whose names are no text.
+export function addFiles(directory: DepotPath, list: readonly File[]): string[] {
+    const named = list.map((file) => ({ file, path: pathBelow(directory, [file.name]) }));
+    const fit = named.filter((one): one is { file: File; path: DepotPath } => one.path !== undefined);
+    for (const push of enter(fit)) void check(push);
+    return named.filter(({ path }) => path === undefined).map(({ file }) => file.name);
 }
 
 async function send(push: Push): Promise<void> {
@@ -71,8 +103,11 @@ async function send(push: Push): Promise<void> {
         change(push.key, { state: 'refused', problem: isGivenUp ? new Problem('given up', 0) : asProblem(error) });
     }
     files.delete(push.key);
-    arrivals.update((count) => count + 1);
+    if (!hasFollowers(push)) arrivals.update((count) => count + 1);
 }
+
+/// Whether others of its folder come next: the listing is made anew once for all of them.
+const hasFollowers = ({ folder }: Push): boolean => folder !== undefined && pushes.get().some((one) => one.folder === folder && one.state === 'waiting');
 
 let isSending = false;
 
@@ -91,14 +126,13 @@ const isWaiting = (push: Push): boolean => push.state === 'waiting';
 /// its place, whether or not somebody still listens.
 export const canDrop = (push: Push): boolean => push.state !== 'verifying';
 
-/// Gives a push up, or puts its result away.
-export function dropPush(key: number): void {
-    const push = pushes.get().find((one) => one.key === key);
-    if (!push || !canDrop(push)) return;
-    files.get(key)?.abort.abort();
-    if (push.state === 'sending') return;
-    files.delete(key);
-    pushes.update((all) => all.filter((one) => one.key !== key));
+/// Gives pushes up, or puts their results away. What is just being sent is given up only.
+export function dropPushes(isMeant: (push: Push) => boolean): void {
+    const meant = pushes.get().filter((push) => canDrop(push) && isMeant(push));
+    for (const { key } of meant) files.get(key)?.abort.abort();
+    const gone = new Set(meant.filter(({ state }) => state !== 'sending').map(({ key }) => key));
+    for (const key of gone) files.delete(key);
+    pushes.update((all) => all.filter(({ key }) => !gone.has(key)));
 }
 
 export const destinationOf = (push: Push): string => shownPath(push.path);

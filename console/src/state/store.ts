@@ -36,3 +36,10 @@ export function useStore<T>(store: Store<T>): T {
     }, [store]);
     return value;
 }
+
+/// The list with another entry in one place.
+export function replaced<T>(list: readonly T[], place: number, entry: T): T[] {
+    const copy = [...list];
+    copy[place] = entry;
+    return copy;
+}

@@ -55,7 +55,7 @@ export function exactText(time: Date): string {
     return `${date(time)} ${clock(time)}.${fraction} ${zone} (${time.toISOString()})`;
 }
 
-/// A time of the interface; undefined if it is none.
+/// A time of the interface; undefined if it is not one.
 export function parsedTime(text: string | null | undefined): Date | undefined {
     if (!text) return undefined;
     const time = new Date(text);

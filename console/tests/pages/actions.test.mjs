@@ -1,11 +1,12 @@
 // Everything that can be done, from the click to what the host shows afterwards.
 import assert from 'node:assert/strict';
 import { createHash } from 'node:crypto';
-import { mkdtemp, rm, writeFile } from 'node:fs/promises';
+import { mkdir, mkdtemp, rm, writeFile } from 'node:fs/promises';
 import os from 'node:os';
 import path from 'node:path';
 import { after, before, test } from 'node:test';
 import { press, untilText } from '../support/browser.mjs';
+import { dropPaths, folderOf } from '../support/drop.mjs';
 import { raise } from '../support/stage.mjs';
 
 let stage;
@@ -341,6 +342,85 @@ test('files are pushed, summed and removed', async () => {
         });
     } finally {
         await rm(scratch, { recursive: true });
+    }
+});
+
+test('a whole folder is dropped, checked, pushed and verified', async () => {
+    const { folder, remove } = await folderOf({ 'install.sh': '#!/bin/sh\n', 'lib/agent 1.tar': 'x'.repeat(200_000), 'lib/deep/note.txt': 'read me' });
+    await mkdir(path.join(folder, 'nothing'));
+    try {
+        await on('/depot?path=ux/7.1', {}, async ({ tab, fake, front }) => {
+            const kept = String(fake.depot.get('ux/7.1/install.sh').content);
+            await dropPaths(tab, folder);
+            await untilText(tab, 'Where do its 3 files (195 KiB) go?', '.push');
+            await untilText(tab, 'note: bundle/nothing is empty', '.push');
+            assert.equal(front.state.requests.some((one) => one.includes('/depot/check')), false, 'nothing is asked before that is known');
+            await press(tab, 'Into ux/7.1/');
+            await untilText(tab, 'zavctl push bundle/ ux/7.1', '.push');
+            await untilText(tab, '1 file of these names is there', '.push');
+            await untilText(tab, 'Line ends of 1 file are converted', '.push');
+            assert.equal(front.state.requests.filter((one) => one.includes('/depot/check')).length, 1, 'one question is enough');
+            assert.equal(String(fake.depot.get('ux/7.1/install.sh').content), kept, 'nothing is sent yet');
+            await press(tab, 'Push 3 files');
+            await untilText(tab, '3 of 3 files arrived, all of them verified', '.push');
+            assert.equal(String(fake.depot.get('ux/7.1/lib/deep/note.txt').content), 'read me');
+            assert.equal(fake.depot.get('ux/7.1/lib/agent 1.tar').content.length, 200_000);
+            await untilText(tab, 'lib/', '.list');
+            await (await tab.waitForSelector('summary')).click();
+            await untilText(tab, createHash('sha256').update('read me').digest('hex'), '.sums');
+            await press(tab, 'Put away bundle/');
+            await tab.waitForFunction(() => !document.querySelector('.push'));
+        });
+    } finally {
+        await remove();
+    }
+});
+
+test('a folder goes as one of its name, and not at all if one of its files is not taken', async () => {
+    const { folder, remove } = await folderOf({ 'a.tar': 'a', 'b/install.sh.tar': 'b' });
+    try {
+        await on('/depot?path=ux', {}, async ({ tab, fake }) => {
+            const before = fake.depot.size;
+            await dropPaths(tab, folder);
+            await press(tab, 'Into ux/bundle/');
+            await untilText(tab, 'The host does not take all of its files, so none is sent.', '.push');
+            await untilText(tab, 'ux/bundle/b/install.sh.tar', '.push');
+            await untilText(tab, 'call it package.tar', '.push [role=alert]');
+            assert.equal(await tab.$('.panel > header .main'), null, 'there is nothing to push');
+            await press(tab, 'Put away bundle/');
+            await rm(path.join(folder, 'b'), { recursive: true });
+            await dropPaths(tab, folder);
+            await press(tab, 'Into ux/bundle/');
+            await untilText(tab, 'zavctl push bundle/ ux/bundle', '.push');
+            await press(tab, 'Push 1 file');
+            await untilText(tab, '1 of 1 file arrived, all of them verified', '.push');
+            assert.equal(String(fake.depot.get('ux/bundle/a.tar').content), 'a');
+            assert.equal(fake.depot.size, before + 1);
+        });
+    } finally {
+        await remove();
+    }
+});
+
+test('a folder is chosen without dragging, and one that is too deep is not begun', async () => {
+    const { folder, remove } = await folderOf(Object.fromEntries(Array.from({ length: 120 }, (_, i) => [`many/${String(i).padStart(3, '0')}.txt`, String(i)])));
+    try {
+        await on('/depot', {}, async ({ tab, fake, front }) => {
+            const chooser = await tab.waitForSelector('input[webkitdirectory]');
+            await chooser.uploadFile(folder);
+            await press(tab, 'Into bundle/');
+            await press(tab, 'Push 120 files');
+            await untilText(tab, '120 of 120 files arrived, all of them verified', '.push');
+            assert.equal(String(fake.depot.get('bundle/many/119.txt').content), '119');
+            const checks = front.state.requests.filter((one) => one.includes('/depot/check'));
+            assert.ok(checks.length === 2 && checks.every((one) => one.length < 8_000), `${checks.length} questions`);
+            await mkdir(path.join(folder, 'deep/'.repeat(20)), { recursive: true });
+            await dropPaths(tab, folder);
+            await untilText(tab, 'bundle holds more than this page takes', '.push [role=alert]');
+            assert.equal(await tab.$('.places'), null);
+        });
+    } finally {
+        await remove();
     }
 });
 

@@ -1,14 +1,11 @@
 // Every page in light and dark, on a desk and on a phone: it can be used by everybody, it keeps to
 // the policy, it is no wider than the window, and it has its picture taken.
-import assert from 'node:assert/strict';
-import { readFile } from 'node:fs/promises';
 import path from 'node:path';
 import { after, before, test } from 'node:test';
-import { createRequire } from 'node:module';
-import { untilText } from '../support/browser.mjs';
+import { press, untilText } from '../support/browser.mjs';
+import { dropPaths, folderOf } from '../support/drop.mjs';
+import { looksRight } from '../support/looks.mjs';
 import { raise, shots } from '../support/stage.mjs';
-
-const axe = await readFile(createRequire(import.meta.url).resolve('axe-core/axe.min.js'), 'utf8');
 
 let stage;
 before(async () => (stage = await raise()));
@@ -30,23 +27,6 @@ const pages = [
     ['doctor', '/doctor', 'JAVA_HOME'],
     ['lost', '/nowhere', 'nothing at this address'],
 ];
-
-async function violations(tab) {
-    // Through the debugger: the page's own policy lets no such script in.
-    await tab.evaluate(axe);
-    return tab.evaluate(async () => {
-        const { violations: found } = await globalThis.axe.run(document, { runOnly: ['wcag2a', 'wcag2aa', 'wcag21a', 'wcag21aa', 'wcag22aa', 'best-practice'] });
-        return found.map((one) => `${one.id}: ${one.nodes.map((node) => node.html.slice(0, 160)).join(' | ')}`);
-    });
-}
-
-async function looksRight(view, name) {
-    const { tab, faults } = view;
-    assert.deepEqual(await violations(tab), [], `${name}: accessibility`);
-    const { wide, window } = await tab.evaluate(() => ({ wide: document.documentElement.scrollWidth, window: innerWidth }));
-    assert.ok(wide <= window, `${name}: ${wide} pixels in a window of ${window}`);
-    assert.deepEqual(faults, [], name);
-}
 
 for (const scheme of ['light', 'dark']) {
     for (const [width, height] of [[1280, 860], [360, 740]]) {
@@ -91,6 +71,28 @@ test('windows and drafts are fit to be used as well', async () => {
         await looksRight(view, 'difference');
         await view.tab.screenshot({ path: path.join(shots, `difference-${scheme}-1280.png`) });
         await view.end();
+    }
+});
+
+test('a folder on its way into the depot is fit to be used as well', async () => {
+    const { folder, remove } = await folderOf({ 'install.sh': '#!/bin/sh\n', 'lib/agent.tar': 'x', 'lib/install.sh.tar': 'x' });
+    try {
+        for (const [scheme, width, height] of [['light', 1280, 860], ['dark', 360, 740]]) {
+            const view = await stage.open({ scheme, width, height });
+            await view.go('/depot?path=ux/7.2');
+            await dropPaths(view.tab, folder);
+            await untilText(view.tab, 'Where do its 3 files', '.push');
+            await looksRight(view, 'where a folder goes');
+            await press(view.tab, 'Into ux/7.2/');
+            await untilText(view.tab, 'so none is sent', '.push');
+            await (await view.tab.waitForSelector('summary')).click();
+            await untilText(view.tab, 'install.sh', '.sums');
+            await looksRight(view, 'a folder that is not taken');
+            await view.tab.screenshot({ path: path.join(shots, `folder-${scheme}-${width}.png`) });
+            await view.end();
+        }
+    } finally {
+        await remove();
     }
 });
 

@@ -18,13 +18,17 @@ export async function chromium() {
     return undefined;
 }
 
-export async function launch() {
+/// `more` are further options of the program.
+export async function launch(more = []) {
     return puppeteer.launch({
         executablePath: await chromium(),
         // Containers have neither the kernel's leave for a sandbox nor room in /dev/shm.
-        args: ['--no-sandbox', '--disable-dev-shm-usage', '--disable-gpu', '--force-color-profile=srgb', '--lang=en-GB'],
+        args: ['--no-sandbox', '--disable-dev-shm-usage', '--disable-gpu', '--force-color-profile=srgb', '--lang=en-GB', ...more],
     });
 }
+
+/// How long a text may take that is to come: the machine may be busy with other tests.
+const patience = 40_000;
 
 /// A tab that collects what must not happen: errors, violations of the policy, scripts of a host.
 export async function openTab(browser, { width = 1280, height = 860, scheme = 'light' } = {}) {
@@ -50,13 +54,13 @@ export async function openTab(browser, { width = 1280, height = 860, scheme = 'l
         const isRefusal = /Failed to load resource/.test(message.text()) && own.isDisturbed;
         if (message.type() === 'error' && !isRefusal) faults.push(`console: ${message.text()} ${message.location().url ?? ''}`);
     });
-    tab.setDefaultTimeout(15_000);
+    tab.setDefaultTimeout(patience);
     return { tab, faults, own };
 }
 
 /// Waits until a text is on the page.
 export function untilText(tab, text, selector = 'body') {
-    return tab.waitForFunction((wanted, where) => document.querySelector(where)?.innerText.includes(wanted), { timeout: 15_000 }, text, selector);
+    return tab.waitForFunction((wanted, where) => document.querySelector(where)?.innerText.includes(wanted), { timeout: patience }, text, selector);
 }
 
 /// Clicks the button or link with this name, as assistive technology knows it.
@@ -64,4 +68,23 @@ export async function press(tab, name, role = 'button') {
     const element = await tab.waitForSelector(`aria/${name}[role="${role}"]`, { visible: true });
     await element.click();
     await element.dispose();
+}
+
+/// A meter of what the page itself does: asked, it gives the milliseconds of processor time that scripts,
+/// styles and layout have taken since it was made, each. Processor time, because the machine may be busy
+/// with other tests.
+export async function meterOf(tab) {
+    const session = await tab.createCDPSession();
+    await session.send('Performance.enable', { timeDomain: 'threadTicks' });
+    const read = async () => {
+        const { metrics } = await session.send('Performance.getMetrics');
+        const all = Object.fromEntries(metrics.map(({ name, value }) => [name, value * 1000]));
+        return { script: all.ScriptDuration, style: all.RecalcStyleDuration, layout: all.LayoutDuration };
+    };
+    const before = await read();
+    return async () => {
+        const now = await read();
+        const spent = Object.fromEntries(Object.keys(now).map((name) => [name, now[name] - before[name]]));
+        return { ...spent, whole: spent.script + spent.style + spent.layout };
+    };
 }

@@ -279,10 +279,11 @@ export function makeFakeHost({ tasks: count = 40, isHostile = false, access = 'a
             return sendJson(response, 200, { files: rows });
         }
         if (url.pathname === '/v1/depot/check') {
-            const path = parameters.get('path');
-            const taken = !path.endsWith('install.sh.tar');
-            const row = { path, taken, converted: path.includes('install.sh'), replaces: depot.has(path), ...(taken ? {} : { error: evil('the archive would lose bytes'), guard: 'depot-content', hint: evil('call it package.tar') }) };
-            return sendJson(response, 200, { guarded: true, taken, free_bytes: 1e12, replaced_bytes: 0, files: [row] });
+            const rows = parameters.getAll('path').map((path) => {
+                const taken = !path.endsWith('install.sh.tar');
+                return { path, taken, converted: path.includes('install.sh'), replaces: depot.has(path), ...(taken ? {} : { error: evil('the archive would lose bytes'), guard: 'depot-content', hint: evil('call it package.tar') }) };
+            });
+            return sendJson(response, 200, { guarded: true, taken: rows.every((row) => row.taken), free_bytes: 1e12, replaced_bytes: 0, files: rows });
         }
         return sendJson(response, 404, { error: `there is nothing at ${url.pathname}` });
     }

@@ -1,5 +1,5 @@
 // The console's server as the page sees it: the same headers, the same session, the same refusals.
-// Behind it stands a host, a made-up one or a real one on a Unix socket.
+// Behind it stands a host, a made-up one or a real one on a Unix socket, or a made-up fleet.
 import { createHash, randomBytes } from 'node:crypto';
 import { readFile } from 'node:fs/promises';
 import http from 'node:http';
@@ -47,12 +47,14 @@ export function socketHost(socketPath) {
 const lostAnswer = (response) => ({ writeHead: () => undefined, end: () => sendJson(response, 502, { error: 'the answer was lost' }) });
 
 /// Starts the server on a free port. `host(request, response, url)` answers below /v1/, `depot` takes
-/// what is pushed. `state.hold(request, url)` may keep a request waiting; with `isDeaf` the answers to what changes something are lost. Returns the link to open, and how to end it.
-export async function startFront({ page, host, depot, command = ['zavctl'] }) {
+/// what is pushed, and `run` what the operator's zavctl of a fleet is to do. `session` is what the server says
+/// of itself. `state.hold(request, url)` may keep a request waiting; with `isDeaf` the answers to what changes
+/// something are lost, and with `refusal` they are that one. Returns the link to open, and how to end it.
+export async function startFront({ page, host, depot, run, command = ['zavctl'], session }) {
     const token = randomBytes(16).toString('hex');
     const cookie = randomBytes(16).toString('hex');
     let isUsed = false;
-    const state = { isAway: false, requests: [], hold: undefined, isDeaf: false, isOver: false };
+    const state = { isAway: false, requests: [], hold: undefined, isDeaf: false, isOver: false, refusal: '' };
 
     const serveFile = async (response, name) => {
         const bytes = await readFile(path.join(page, name));
@@ -75,15 +77,17 @@ export async function startFront({ page, host, depot, command = ['zavctl'] }) {
         const isSafe = request.method === 'GET' || request.method === 'HEAD';
         if (!isSafe && request.headers['x-zav-console'] !== '1') return sendJson(response, 403, { error: 'the header X-Zav-Console is missing' });
         if (isApi) state.requests.push(`${request.method} ${request.url}`);
-        if (url.pathname === '/console/session') {
-            return sendJson(response, 200, { mode: 'host', address: '/run/zavhost.sock', program: 'zavctl-console', version: '1.0.0', command });
+        if (url.pathname === '/console/session' && !state.isOver) {
+            return sendJson(response, 200, session ?? { mode: 'host', address: '/run/zavhost.sock', program: 'zavctl-console', version: '1.0.0', command });
         }
         if (isApi && state.isOver) return sendJson(response, 401, { error: 'no session' });
         if (isApi) await state.hold?.(request, url);
         if (url.pathname === '/console/depot' && request.method === 'PUT') return depot(request, response, url);
         if (isApi && state.isAway) return sendJson(response, 502, { error: 'the host is away' });
-        if (isApi && state.isDeaf && !isSafe) return host(request, lostAnswer(response), url);
-        if (isApi) return host(request, response, url);
+        if (isApi && !isSafe && state.refusal !== '') return sendJson(response, 403, { error: state.refusal });
+        const behind = url.pathname === '/console/run' && run ? run : host;
+        if (isApi && state.isDeaf && !isSafe) return behind(request, lostAnswer(response), url);
+        if (isApi) return behind(request, response, url);
         const name = url.pathname.slice(1);
         return serveFile(response, types[path.extname(name)] ? name : 'index.html');
     };

@@ -4,6 +4,7 @@ import { mkdir } from 'node:fs/promises';
 import path from 'node:path';
 import { fileURLToPath } from 'node:url';
 import { launch, openTab, untilText } from './browser.mjs';
+import { makeFakeCentre } from './fake_centre.mjs';
 import { makeFakeHost } from './fake_host.mjs';
 import { startFront } from './front.mjs';
 
@@ -15,10 +16,12 @@ export async function raise() {
     await mkdir(shots, { recursive: true });
     const browser = await launch();
     const fronts = [];
-    /// A host of its own, and a tab on its console. `faults` must be empty in the end.
-    const open = async ({ host = {}, command, ...view } = {}) => {
-        const fake = makeFakeHost(host);
-        const front = await startFront({ page, host: fake.host, depot: fake.push, ...(command ? { command } : {}) });
+    /// A host of its own, or a fleet if `centre` is given, and a tab on its console. `faults` must be empty
+    /// in the end.
+    const open = async ({ host = {}, centre, command, ...view } = {}) => {
+        const fake = centre ? makeFakeCentre(centre) : makeFakeHost(host);
+        const { host: answers, push, run, session } = fake;
+        const front = await startFront({ page, host: answers, depot: push, run, session, ...(command ? { command } : {}) });
         fronts.push(front);
         const context = await browser.createBrowserContext();
         await context.overridePermissions(front.origin, ['clipboard-read', 'clipboard-write', 'clipboard-sanitized-write']);

@@ -11,6 +11,11 @@ test('a text has no secret values, by the rules of zavctl', () => {
     assert.equal(masked(`a "api_secret"  =hunter2 b`), `a "api_secret"  =*** b`);
     assert.equal(masked('key=a"b c"d e'), 'key=*** e');
     assert.equal(masked('pwd="never closed\nnext'), 'pwd=***\nnext');
+    assert.equal(masked('password => hunter2 b'), 'password => *** b');
+    assert.equal(masked('password := hunter2 b'), 'password := *** b');
+    assert.equal(masked('pwd=a\\ b c'), 'pwd=*** c');
+    assert.equal(masked('pwd="a\\" b" c'), 'pwd=*** c');
+    assert.equal(masked('{\\"key\\": \\"a b\\", d'), '{\\"key\\": *** d');
 });
 
 test('a masked text stays the same', () => {

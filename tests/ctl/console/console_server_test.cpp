@@ -67,12 +67,12 @@ TEST_F(TheConsole, IsOpenedByItsLinkOnce) {
 class ABrowser : public testing::Test {
 protected:
     static console::ConsoleSettings ownedBy(std::optional<uid_t> user) {
-        console::ConsoleSettings settings = console_test::settingsFor(kNoHost);
+        console::ConsoleSettings settings = console_test::smallConsole();
         settings.browsers.ownerOf = [user](int) { return user; };
         return settings;
     }
     static unsigned statusOf(console::ConsoleSettings settings) {
-        ServedConsole served(std::move(settings));
+        ServedConsole served(console_test::hostAt(kNoHost), std::move(settings));
         return static_cast<unsigned>(served.ask(served.get(served.opening())).status);
     }
 };
@@ -272,7 +272,7 @@ TEST_F(TheConsole, TakesTheSameFileOnceAtATime) {
 }
 
 TEST(AConsole, SaysThatThereIsNoRoomForAFile) {
-    console::ConsoleSettings settings = console_test::settingsFor(kNoHost);
+    console::HostSettings settings = console_test::hostAt(kNoHost);
     settings.uploadDirectory = "/nowhere";
     ServedConsole served(std::move(settings));
     served.open();
@@ -283,9 +283,9 @@ TEST(AConsole, SaysThatThereIsNoRoomForAFile) {
 
 TEST(AConsole, EndsItsSessionAfterHalfADay) {
     std::atomic<int> hours{1};
-    console::ConsoleSettings settings = console_test::settingsFor(kNoHost);
+    console::ConsoleSettings settings = console_test::smallConsole();
     settings.clock = [&hours] { return std::chrono::hours(hours); };
-    ServedConsole served(std::move(settings));
+    ServedConsole served(console_test::hostAt(kNoHost), std::move(settings));
     served.open();
     EXPECT_EQ(served.ask(served.get("/", served.cookie())).status, 200);
     hours = 13;
@@ -295,7 +295,8 @@ TEST(AConsole, EndsItsSessionAfterHalfADay) {
 
 TEST(AConsole, DoesNotTakeAPortThatSomebodyHas) {
     const ServedConsole served(kNoHost);
-    EXPECT_THROW(console::ConsoleServer(console_test::settingsFor(kNoHost), served.port()),
+    console::HostBackend backend(console_test::hostAt(kNoHost));
+    EXPECT_THROW(console::ConsoleServer(console_test::smallConsole(), backend, served.port()),
                  ctl::Failure);
 }
 

@@ -1,15 +1,16 @@
-/// A console that is served, and a browser in front of it.
+/// A console that is served in this process, and a browser in front of it.
 #pragma once
 
 #include <chrono>
-#include <cstdint>
+#include <memory>
 #include <string>
 #include <thread>
 #include <utility>
 #include <vector>
 
+#include "ctl/console/browser.h"
 #include "ctl/console/console_server.h"
-#include "http/tcp_client.h"
+#include "ctl/console/host/host_backend.h"
 
 namespace console_test {
 
@@ -19,65 +20,50 @@ inline std::vector<console::PageFile> smallPage() {
             {"/app.js", "text/javascript; charset=utf-8", "run()", "small js"}};
 }
 
-inline console::ConsoleSettings settingsFor(const std::string& socket) {
+inline console::ConsoleSettings smallConsole() {
     console::ConsoleSettings settings;
-    settings.host = {socket, socket + ".rpc", std::chrono::seconds(20)};
     settings.page = smallPage();
     return settings;
 }
 
-class ServedConsole {
+inline console::HostSettings hostAt(const std::string& socket) {
+    console::HostSettings settings;
+    settings.host = {socket, socket + ".rpc", std::chrono::seconds(20)};
+    return settings;
+}
+
+/// A server on a thread of its own.
+class RunningConsole {
 public:
-    explicit ServedConsole(const std::string& socket) : ServedConsole(settingsFor(socket)) {}
-    explicit ServedConsole(console::ConsoleSettings settings)
-        : server_(std::move(settings), 0), serving_([this] { server_.run(); }) {}
-    ~ServedConsole() {
+    RunningConsole(std::unique_ptr<console::Backend> backend, console::ConsoleSettings settings)
+        : backend_(std::move(backend)),
+          server_(std::move(settings), *backend_, 0),
+          serving_([this] { server_.run(); }) {}
+    ~RunningConsole() {
         server_.stop();
         serving_.join();
     }
-    ServedConsole(const ServedConsole&) = delete;
-    ServedConsole& operator=(const ServedConsole&) = delete;
+    RunningConsole(const RunningConsole&) = delete;
+    RunningConsole& operator=(const RunningConsole&) = delete;
 
-    std::uint16_t port() const { return server_.port(); }
-    std::string origin() const { return "http://" + host(); }
-    std::string host() const { return "127.0.0.1:" + std::to_string(port()); }
-    /// The target of the link.
-    std::string opening() const { return server_.link().substr(origin().size()); }
-
-    RawClient connect() const { return http_test::tcpClient(port()); }
-    RawClient::Answer ask(const std::string& request) const {
-        RawClient client = connect();
-        client.send(request);
-        return client.readAnswer();
-    }
-
-    /// A GET with these lines, each with its end, behind that of the host.
-    std::string get(const std::string& target, const std::string& lines = "") const {
-        return "GET " + target + " HTTP/1.1\r\nHost: " + host() + "\r\n" + lines + "\r\n";
-    }
-    /// A request of the page's own with a body.
-    std::string send(const std::string& method, const std::string& target,
-                     const std::string& body) const {
-        return method + " " + target + " HTTP/1.1\r\nHost: " + host() + "\r\nOrigin: " + origin() +
-               "\r\nX-Zav-Console: 1\r\n" + cookie_ +
-               "Content-Length: " + std::to_string(body.size()) + "\r\n\r\n" + body;
-    }
-
-    /// Follows the link. The line with the cookie that it gave.
-    const std::string& open() {
-        const std::string head = ask(get(opening())).head;
-        const std::string field = "Set-Cookie: ";
-        const std::size_t begin = head.find(field) + field.size();
-        cookie_ = "Cookie: " + head.substr(begin, head.find(';', begin) - begin) + "\r\n";
-        return cookie_;
-    }
-    /// The line of open().
-    const std::string& cookie() const { return cookie_; }
+    std::string link() const { return server_.link(); }
 
 private:
+    const std::unique_ptr<console::Backend> backend_;
     console::ConsoleServer server_;
     std::thread serving_;
-    std::string cookie_;
+};
+
+class ServedConsole : private RunningConsole, public Browser {
+public:
+    explicit ServedConsole(std::unique_ptr<console::Backend> backend,
+                           console::ConsoleSettings settings = smallConsole())
+        : RunningConsole(std::move(backend), std::move(settings)), Browser(link()) {}
+    explicit ServedConsole(console::HostSettings host,
+                           console::ConsoleSettings settings = smallConsole())
+        : ServedConsole(std::make_unique<console::HostBackend>(std::move(host)),
+                        std::move(settings)) {}
+    explicit ServedConsole(const std::string& socket) : ServedConsole(hostAt(socket)) {}
 };
 
 }  // namespace console_test
