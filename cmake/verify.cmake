@@ -5,9 +5,10 @@
 # platform have none, so the build itself checks them; it also checks a header that the source beside
 # it includes first.
 #
-# GoogleTest's headers take longer to read than most tests. A file that includes one of them gets
-# that header precompiled, which hides nothing that the file does not include itself. The files are
-# sorted at configure time; run cmake before the target when includes of these headers changed.
+# The headers of GoogleTest and of the JSON library take longer to read than most files that include
+# them. Such a file gets that header precompiled, which hides nothing that the file does not include
+# itself. The files are sorted at configure time; run cmake before the target when includes of these
+# headers changed.
 add_custom_target(verify)
 
 # zav_verify(<name> LIBRARIES <lib>... [DEFINITIONS <definition>...]
@@ -18,8 +19,8 @@ add_custom_target(verify)
 function(zav_verify name)
   cmake_parse_arguments(PARSE_ARGV 1 arg "" "ROOT" "LIBRARIES;DEFINITIONS;SOURCES;HEADERS")
   foreach(file ${arg_SOURCES})
-    zav_test_library_of(library ${file})
-    list(APPEND ${library}_files ${file})
+    zav_slow_headers_of(kind ${file})
+    list(APPEND ${kind}_files ${file})
   endforeach()
   foreach(header ${arg_HEADERS})
     file(RELATIVE_PATH path ${arg_ROOT} ${header})
@@ -27,41 +28,51 @@ function(zav_verify name)
     if(checked)
       continue()
     endif()
-    zav_test_library_of(library ${header})
+    zav_slow_headers_of(kind ${header})
     set(source ${CMAKE_BINARY_DIR}/verify/${name}/${path}.cpp)
     file(CONFIGURE OUTPUT ${source} CONTENT "#include \"${path}\"\n")
-    list(APPEND ${library}_files ${source})
+    list(APPEND ${kind}_files ${source})
   endforeach()
 
-  foreach(library gmock gtest no)
-    if(NOT ${library}_files)
+  foreach(kind none gtest gmock json gtest_json gmock_json)
+    if(NOT ${kind}_files)
       continue()
     endif()
-    set(target verify_${name}_${library}_library)
-    add_library(${target} OBJECT EXCLUDE_FROM_ALL ${${library}_files})
+    set(target verify_${name}_${kind})
+    add_library(${target} OBJECT EXCLUDE_FROM_ALL ${${kind}_files})
     set_target_properties(${target} PROPERTIES
       CXX_COMPILER_LAUNCHER ${CMAKE_SOURCE_DIR}/cmake/syntax-only.sh EXPORT_COMPILE_COMMANDS OFF)
     target_link_libraries(${target} PRIVATE ${arg_LIBRARIES} zav_options)
     target_compile_definitions(${target} PRIVATE ${arg_DEFINITIONS})
     target_compile_options(${target} PRIVATE -O0 -g0)
-    if(NOT library STREQUAL "no")
-      target_precompile_headers(${target} PRIVATE <${library}/${library}.h>)
+    if(kind MATCHES "gtest|gmock")
+      target_precompile_headers(${target} PRIVATE <${CMAKE_MATCH_0}/${CMAKE_MATCH_0}.h>)
+    endif()
+    if(kind MATCHES "json")
+      target_precompile_headers(${target} PRIVATE <nlohmann/json.hpp>)
     endif()
     add_dependencies(verify ${target})
   endforeach()
 endfunction()
 
-# Sets `variable` to gmock, gtest or no: the test library whose header the file includes. That of
-# gmock brings gtest's.
-function(zav_test_library_of variable file)
-  file(STRINGS ${file} lines REGEX "^#include <g(mock|test)/g(mock|test)\\.h>")
-  set(library no)
+# Sets `variable` to gmock or gtest, json, both with a "_" between them, or none: the slow headers that
+# the file includes. That of gmock brings gtest's.
+function(zav_slow_headers_of variable file)
+  file(STRINGS ${file} lines REGEX "^#include <(g(mock|test)/g(mock|test)\\.h|nlohmann/json\\.hpp)>")
+  set(kinds "")
   if(lines MATCHES "gmock")
-    set(library gmock)
+    list(APPEND kinds gmock)
   elseif(lines MATCHES "gtest")
-    set(library gtest)
+    list(APPEND kinds gtest)
   endif()
-  set(${variable} ${library} PARENT_SCOPE)
+  if(lines MATCHES "nlohmann")
+    list(APPEND kinds json)
+  endif()
+  if(NOT kinds)
+    set(kinds none)
+  endif()
+  list(JOIN kinds "_" kind)
+  set(${variable} ${kind} PARENT_SCOPE)
 endfunction()
 
 # Sets `variable` to whether the source beside a header includes it first.
@@ -99,17 +110,17 @@ foreach(program host ctl)
 endforeach()
 
 if(TARGET zavctl_console)
-  file(GLOB sources ctl/console/*.cpp)
-  file(GLOB headers ctl/console/*.h)
+  file(GLOB_RECURSE sources ctl/console/*.cpp)
+  file(GLOB_RECURSE headers ctl/console/*.h)
   zav_verify(console LIBRARIES zavctl_console
     DEFINITIONS $<TARGET_PROPERTY:zavctl_console,COMPILE_DEFINITIONS>
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 endif()
 
 # What several programs share.
-file(GLOB sources http/*.cpp metrics/*.cpp sqlite/*.cpp)
-file(GLOB headers http/*.h metrics/*.h secrets/*.h sqlite/*.h system/*.h)
-zav_verify(shared LIBRARIES zav_http zav_metrics zav_database
+file(GLOB_RECURSE sources http/*.cpp metrics/*.cpp routes/*.cpp sqlite/*.cpp text/*.cpp)
+file(GLOB_RECURSE headers http/*.h metrics/*.h routes/*.h secrets/*.h sqlite/*.h system/*.h text/*.h)
+zav_verify(shared LIBRARIES zav_routes zav_http zav_text zav_metrics zav_database
   DEFINITIONS $<TARGET_PROPERTY:zav_http,COMPILE_DEFINITIONS>
   SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 
@@ -118,7 +129,7 @@ if(TARGET zavfleet_bus)
   set(fleet_libraries zavfleet_bus zavfleet_https zav_nats zav_sodium)
   file(GLOB_RECURSE sources fleet/*.cpp)
   file(GLOB_RECURSE headers fleet/*.h)
-  zav_verify(fleet LIBRARIES ${fleet_libraries} zavctl_client zav_database
+  zav_verify(fleet LIBRARIES ${fleet_libraries} zavctl_console zav_database
     DEFINITIONS ZAV_VERSION="${PROJECT_VERSION}" $<TARGET_PROPERTY:zav_http,COMPILE_DEFINITIONS>
     SOURCES ${sources} ROOT ${CMAKE_SOURCE_DIR} HEADERS ${headers})
 endif()

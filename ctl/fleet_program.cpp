@@ -10,12 +10,23 @@ namespace {
 
 constexpr SiblingProgram kFleetProgram = {"zavctl-fleet",
                                           "what manages fleets is not installed here"};
-constexpr const char* kFleetOptions[] = {"--fleet", "--on"};
-constexpr const char* kFleetVerbs[] = {"login", "hosts", "rollout"};
+constexpr FleetWord kFleetOptions[] = {{"--fleet", "The fleet's centre"},
+                                       {"--on", "The hosts of the fleet that are meant"}};
+constexpr FleetWord kFleetVerbs[] = {
+    {"login", "Join a fleet as an operator"},
+    {"hosts", "List the hosts of a fleet"},
+    {"rollout", "Look at roll-outs, stop them, and let them go on"}};
 
 template <typename List>
 bool isAmong(const std::string& word, const List& list) {
-    return std::find(std::begin(list), std::end(list), word) != std::end(list);
+    return std::any_of(std::begin(list), std::end(list),
+                       [&word](const FleetWord& one) { return word == one.word; });
+}
+
+template <typename List>
+std::vector<FleetWord> offered(const List& list) {
+    if (!isThere(kFleetProgram)) return {};
+    return {std::begin(list), std::end(list)};
 }
 
 bool hasValueBehind(const std::string& option) {
@@ -48,6 +59,14 @@ bool isForFleet(const std::vector<std::string>& words) {
     const std::vector<std::string> command = commandWords(words);
     const std::size_t verb = !command.empty() && command.front() == "help" ? 1 : 0;
     return command.size() > verb && isAmong(command[verb], kFleetVerbs);
+}
+
+std::vector<FleetWord> fleetVerbsOffered() {
+    return offered(kFleetVerbs);
+}
+
+std::vector<FleetWord> fleetOptionsOffered() {
+    return offered(kFleetOptions);
 }
 
 void becomeFleetProgram(char* const* argv) {

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <csignal>
 #include <exception>
+#include <iterator>
 #include <string>
 #include <vector>
 
@@ -39,10 +40,31 @@ ctl::ExitStatus runForFleet(char* const* argv, const std::vector<std::string>& w
     }
 }
 
+std::vector<ctl::Candidate> candidatesOf(const std::vector<ctl::FleetWord>& words) {
+    std::vector<ctl::Candidate> candidates;
+    for (const ctl::FleetWord& one : words)
+        candidates.push_back({one.word, one.help});
+    return candidates;
+}
+
+/// What a shell may offer at the end of these words.
+std::string completion(char* const* argv, const std::vector<std::string>& words) {
+    // The last word is not complete, so it decides nothing yet.
+    const bool isFleets =
+        !words.empty() && ctl::isForFleet({words.begin(), std::prev(words.end())});
+    try {
+        if (isFleets) ctl::becomeFleetProgram(argv);
+        return ctl::completionOf(words, candidatesOf(ctl::fleetVerbsOffered()),
+                                 candidatesOf(ctl::fleetOptionsOffered()));
+    } catch (const ctl::Failure&) {
+        return {};  // somebody who types is told nothing of it
+    }
+}
+
 ctl::ExitStatus run(char* const* argv, const std::vector<std::string>& words) {
     if (!words.empty() && words.front() == ctl::kCompletionWord) {
         return ctl::print(
-            {ctl::completionOf({words.begin() + 1, words.end()}), {}, ctl::kSuccess, true});
+            {completion(argv, {words.begin() + 1, words.end()}), {}, ctl::kSuccess, true});
     }
     if (ctl::isForFleet(words)) return runForFleet(argv, words);
     const ctl::CommandLine line = ctl::parseCommandLine(words);

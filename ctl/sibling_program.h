@@ -9,6 +9,9 @@ struct SiblingProgram {
     const char* missing;  ///< what to say if it is not there
 };
 
+/// Whether the program is where becomeProgram() looks for it.
+bool isThere(const SiblingProgram& program);
+
 /// Runs the program with these words, the first of which is its name, in the place of this process.
 /// It is looked for beside this program, and in ../libexec/zavmgmt from there. Throws
 /// Failure(kWrongUsage) if it cannot be run.

@@ -1,17 +1,34 @@
 #!/usr/bin/env python3
-"""Writes docs/api.md, the description of the host's interface for readers.
+"""Writes docs/api.md and docs/fleet-api.md, the descriptions of the interfaces for readers.
 
 usage: scripts/api_page.py docs/openapi.json docs/api.md
+       scripts/api_page.py docs/fleet-openapi.json docs/fleet-api.md
 """
 
 import json
 import sys
 
-HEAD = """# The host's interface, request by request
+# By the titles of what is described.
+HEADS = {
+    "zavhost": """# The host's interface, request by request
 
 Made by `scripts/api_page.py` from [openapi.json](openapi.json), which a host gives as
 `GET /v1/openapi.json`. [http.md](http.md) explains the requests, with examples.
-"""
+""",
+    "zavfleetd": """# The centre's interface, request by request
+
+Made by `scripts/api_page.py` from [fleet-openapi.json](fleet-openapi.json), which the centre of a
+fleet gives as `GET /v1/openapi.json`. [fleet.md](fleet.md) tells what a fleet is.
+""",
+}
+ACCESS = {
+    "zavhost": {"read": "Everybody whom the host serves may ask.", "act": "Readers may not ask."},
+    "zavfleetd": {
+        "none": "It needs no session of an operator.",
+        "read": "Every operator may ask.",
+        "act": "Viewers may not ask.",
+    },
+}
 
 
 def anchor(title):
@@ -73,8 +90,7 @@ def answers_of(operation):
     yield ", ".join(errors), "an error", "[Error](#error)"
 
 
-def operation_lines(path, verb, operation):
-    access = {"read": "Everybody whom the host serves may ask.", "act": "Readers may not ask."}
+def operation_lines(path, verb, operation, access):
     about = f"{operation['summary']} {access[operation['x-access']]}"
     name = f"Operation: `{operation['operationId']}`."
     lines = [f"## {verb.upper()} {path}", "", f"{about} {name}", ""]
@@ -104,11 +120,12 @@ def schema_lines(name, schema):
 
 
 def page(description):
-    lines = [HEAD, description["info"]["description"], ""]
+    title = description["info"]["title"]
+    lines = [HEADS[title], description["info"]["description"], ""]
     lines += [f"Version {description['info']['version']}.", ""]
     for path, verbs in description["paths"].items():
         for verb, operation in verbs.items():
-            lines += operation_lines(path, verb, operation)
+            lines += operation_lines(path, verb, operation, ACCESS[title])
     responses = description["components"]["responses"].items()
     lines += ["## Errors", "", "Each is an [Error](#error).", ""]
     lines += table(("Status", "When"), [(status, one["description"]) for status, one in responses])

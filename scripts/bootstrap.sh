@@ -12,7 +12,7 @@ packages='g++ g++-multilib cmake ninja-build ccache googletest libbenchmark-dev 
 libsqlite3-dev libssl-dev libnats-dev libsodium-dev libboost-dev nlohmann-json3-dev libcli11-dev libtomlplusplus-dev mksh curl pkgconf procps
 shellcheck nats-server openssl clang libclang-rt-dev python3 python3-jsonschema mandoc'
 # Programs that only judge the product from outside; their tests are skipped without them.
-judges='python3-impacket tshark zsh fish tmux chromium'
+judges='python3-impacket tshark zsh fish tmux chromium prometheus'
 # What makes the console's page. Where npm comes from elsewhere, it is left alone.
 command -v npm >/dev/null || packages="$packages nodejs npm"
 
@@ -66,31 +66,50 @@ if [ -n "$missing$missing_judges" ]; then
     echo bootstrap: installing $missing $missing_judges
     refresh_lists
 fi
-# The tests start servers of their own. The package would run one as a service that listens to everybody.
+# The tests start servers of their own. The packages would run them as services that listen to everybody,
+# now and after each boot.
+services='nats-server prometheus'
+policy=/usr/sbin/policy-rc.d
+held='' made_policy=''
 has_service_manager() { [ -d /run/systemd/system ]; }
-hold_service_back() {
-    case " $missing " in *[[:space:]]nats-server[[:space:]]*) ;; *) return 0 ;; esac
-    held=yes
-    ! has_service_manager || as_root systemctl mask --runtime --quiet nats-server.service
-}
-leave_service_off() {
-    [ "${held-}" = yes ] && has_service_manager || return 0
-    as_root systemctl --quiet disable nats-server.service
-    as_root systemctl unmask --runtime --quiet nats-server.service
-}
-if [ -n "$missing" ]; then
-    hold_service_back
+hold_services_back() {
+    for service in $services; do
+        case " $missing $missing_judges " in *[[:space:]]"$service"[[:space:]]*) held="$held $service.service" ;; esac
+    done
+    [ -n "$held" ] || return 0
     # shellcheck disable=SC2086
-    install $missing || {
-        leave_service_off
-        exit 1
-    }
-    leave_service_off
-fi
+    if has_service_manager; then
+        as_root systemctl mask --runtime --quiet $held
+    elif [ ! -e "$policy" ]; then
+        # What the scripts of packages ask before they start something.
+        made_policy=yes
+        printf '#!/bin/sh\nexit 101\n' | as_root tee "$policy" >/dev/null
+        as_root chmod 0755 "$policy"
+    fi
+}
+leave_services_off() {
+    [ -z "$made_policy" ] || as_root rm -f "$policy"
+    made_policy=''
+    [ -n "$held" ] && has_service_manager || return 0
+    # shellcheck disable=SC2086
+    as_root systemctl unmask --runtime --quiet $held
+    # What is masked cannot be disabled, and would start with the machine. One whose package could
+    # not be installed is not known.
+    # shellcheck disable=SC2086
+    as_root systemctl --quiet disable $held 2>/dev/null || true
+    held=''
+}
+trap leave_services_off EXIT
+# Without this a shell that is interrupted skips the trap above.
+trap 'exit 130' HUP INT TERM
+hold_services_back
 # shellcheck disable=SC2086
+[ -z "$missing" ] || install $missing
 # shellcheck disable=SC2086
 [ -z "$missing_judges" ] || install $missing_judges ||
     echo "bootstrap: could not install" $missing_judges "- their tests will be skipped" >&2
+leave_services_off
+trap - EXIT HUP INT TERM
 
 # The 32-bit libraries cannot be installed beside the 64-bit ones: they are unpacked below build/
 # instead. `package` holds the static library `file`.

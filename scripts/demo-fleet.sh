@@ -4,16 +4,29 @@
 # host half-way and shows it coming back, and removes everything. Asks nothing, leaves no process
 # behind, and ends with status 0 when all of it worked.
 #
-#   scripts/demo-fleet.sh [--built DIR]
+#   scripts/demo-fleet.sh [--built DIR] [--console]
 #
 #   --built DIR  uses the programs there, and a made-up agent: nothing is built, nothing fetched
+#   --console    after the first roll-outs, prints the link that opens the fleet in a browser, how to get
+#                one to the centre's own console, and goes on until Ctrl-C
 set -eu
 cd "$(dirname "$0")/.."
 built=
-if [ "${1-}" = --built ] && [ $# -eq 2 ]; then
-    built=$2
-elif [ $# -gt 0 ]; then
-    sed -n '7,9s/^# \{0,1\}//p' "$0" >&2
+console=
+while [ $# -gt 0 ]; do
+    case $1 in
+    --built)
+        [ $# -ge 2 ] || break
+        built=$2
+        shift
+        ;;
+    --console) console=yes ;;
+    *) break ;;
+    esac
+    shift
+done
+if [ $# -gt 0 ]; then
+    sed -n '7,11s/^# \{0,1\}//p' "$0" >&2
     exit 2
 fi
 
@@ -37,14 +50,21 @@ PATH=$built:$PATH
 
 scratch=$(mktemp -d)
 running=  # the processes, the newest first
+# Also those that somebody has stopped.
+end_running() {
+    for process in $running; do
+        kill "$process" 2>/dev/null || true
+        kill -CONT "$process" 2>/dev/null || true
+    done
+    for process in $running; do wait "$process" 2>/dev/null || true; done
+}
 cleanup() {
     status=$?
     trap - EXIT
     for name in $hosts; do
         ZAV_SOCKET=$scratch/$name/host.sock zavctl stop ne >/dev/null 2>&1 || true
     done
-    for process in $running; do kill "$process" 2>/dev/null || true; done
-    for process in $running; do wait "$process" 2>/dev/null || true; done
+    end_running
     rm -rf "$scratch"
     [ "$status" -eq 0 ] || echo "demo-fleet: failed"
     exit "$status"
@@ -55,6 +75,7 @@ trap 'exit 130' INT TERM
 # begin NAME COMMAND...: starts a process whose output goes to a file of that name; sets process.
 begin() {
     output=$scratch/$1.out
+    rm -f "$output"
     shift
     "$@" >"$output" 2>&1 &
     process=$!
@@ -70,6 +91,29 @@ await() {
             exit 1
         fi
         sleep 0.1
+    done
+}
+
+# end_everything: ends what was started, and fails if any of it is left.
+end_everything() {
+    say "End everything"
+    end_running
+    running=
+    [ -z "$console" ] || end_agents
+    if pgrep -f "$scratch" >/dev/null; then
+        echo "A process was left behind:"
+        pgrep -af "$scratch"
+        exit 1
+    fi
+    echo "Nothing is left running."
+}
+# end_agents: ends what somebody has started in the browser. Its files are below the scratch directory.
+end_agents() {
+    tries=0
+    while pgrep -f "$scratch" >"$scratch/left" && [ "$tries" -lt 50 ]; do
+        while read -r process; do kill "$process" 2>/dev/null || true; done <"$scratch/left"
+        tries=$((tries + 1))
+        sleep 0.2
     done
 }
 
@@ -93,7 +137,7 @@ say "Start the bus and the centre"
 begin bus nats-server -c "$scratch/keys/bus/nats-server.conf"
 await 'Server is ready'
 # shellcheck disable=SC2086
-begin centre $centre serve
+begin centre $centre serve ${console:+--console}
 await 'the centre works'
 cat "$output"
 
@@ -120,6 +164,7 @@ for name in $hosts; do
             --host-socket "$scratch/$name/host.sock" --label "role=$role" -
     begin "$name.link" zavlink --config "$scratch/$name/zavlink.toml"
     await 'connected to the bus'
+    link_process=$process
     [ "$name" != db-1 ] || killed_host=$host_process
 done
 
@@ -162,6 +207,23 @@ fleet install "$product" "$version" --on 'role=web' --waves 1,100% --dry-run -- 
 fleet install "$product" "$version" --on 'role=web' --waves 1,100% -- \
     /bin/sh '|DEPLOYDIR|/install.sh' -h '|TOVRINHOME|'
 
+if [ -n "$console" ]; then
+    say "The fleet in a browser, until Ctrl-C"
+    # Shells have what they start in the background ignore Ctrl-C.
+    trap 'end_everything; exit 0' INT TERM
+    begin console zavctl --fleet "$ZAV_FLEET" console
+    await '^console: '
+    cat <<EOF
+The centre's own console only looks; a browser has to know $scratch/keys/ca.pem. For a link:
+  XDG_CONFIG_HOME=$XDG_CONFIG_HOME $built/zavctl --fleet $ZAV_FLEET console --at-centre
+To see $name go away within two minutes: kill -STOP $link_process, and -CONT brings it back.
+EOF
+    cat "$output"
+    wait "$process" || true
+    echo "The console has ended."
+    exit 1
+fi
+
 say "The others: and one of these hosts is killed with -9"
 kill -9 "$killed_host"
 wait "$killed_host" 2>/dev/null || true
@@ -195,13 +257,4 @@ if [ "$product" = ne ]; then
 fi
 run zavctl hosts show db-1
 
-say "End everything"
-for process in $running; do kill "$process" 2>/dev/null || true; done
-for process in $running; do wait "$process" 2>/dev/null || true; done
-running=
-if pgrep -f "$scratch" >/dev/null; then
-    echo "A process was left behind:"
-    pgrep -af "$scratch"
-    exit 1
-fi
-echo "Nothing is left running."
+end_everything

@@ -45,6 +45,8 @@ export ZAV_SOCKET QVSDEPLOY_AGENTDEPOT
 
 # Starts the host and waits until it is ready.
 start_host() {
+    # Not what an earlier one has said: the next one's redirection may come later than the look at it.
+    rm -f "$scratch/host.out"
     KBB_RAS1='ERROR (UNIT:zavtasks DETAIL) (UNIT:zavtqelm DETAIL)' KBB_RAS1_LOG=$KBB_RAS1_LOG \
         zavhost --home "$home" --origin-node "$(hostname):DEMO" >"$scratch/host.out" 2>&1 &
     host=$!

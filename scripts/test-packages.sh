@@ -46,8 +46,10 @@ needed_by() {
 
 set -- "$packages"/lib*_amd64.deb "$packages"/zav*_amd64.deb "$packages"/lib*_i386.deb \
     "$packages"/zavmgmt-dev_*_i386.deb
-echo "== a root file system with nothing but what the packages depend on"
-make_root "$root" amd64,i386 --include="$(needed_by "$@" | paste -sd, -)"
+# What they suggest for reading their manual pages and completing their command lines.
+suggested=man-db,bash-completion
+echo "== a root file system with what the packages depend on, and $suggested"
+make_root "$root" amd64,i386 --include="$(needed_by "$@" | paste -sd, -),$suggested"
 
 # ---- The packages --------------------------------------------------------------------------------
 

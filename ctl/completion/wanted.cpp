@@ -25,7 +25,8 @@ std::string shortHelp(const char* help) {
 /// Reads the words from the left, as far as the declarations explain them.
 class Reading {
 public:
-    explicit Reading(const std::vector<std::string>& words) {
+    Reading(const std::vector<std::string>& words, const Vocabulary& vocabulary)
+        : vocabulary_(vocabulary) {
         const auto complete = words.size() - 1;
         for (std::size_t i = 0; i < complete; ++i)
             take(words[i]);
@@ -44,11 +45,19 @@ private:
             takeOption(word);
         } else if (verb_ == nullptr) {
             name_ += (name_.empty() ? "" : " ") + word;
-            verb_ = findVerb(name_);
+            verb_ = vocabulary_.findVerb(name_);
+        } else if (const Verb* const longer = longerVerb(word)) {
+            name_ = longer->name;
+            verb_ = longer;
         } else {
             if (const Argument* const argument = nextPositional()) note(*argument, word);
             ++positionals_;
         }
+    }
+    /// Of a group whose name is a verb as well: the group's verb that the word completes.
+    const Verb* longerVerb(const std::string& word) const {
+        return positionals_ > 0 || optionsEnded_ ? nullptr
+                                                 : vocabulary_.findVerb(name_ + " " + word);
     }
     void takeOption(const std::string& word) {
         const std::size_t equals = word.find('=');
@@ -80,9 +89,12 @@ private:
             finishOption(word);
         } else if (verb_ == nullptr) {
             offerVerbs(name_.empty() ? "" : name_ + " ");
-        } else if (const Argument* const argument = nextPositional()) {
-            wanted.source = argument->completion;
-            if (wanted.source == Completion::Verb) offerVerbs(explained_);
+        } else {
+            if (positionals_ == 0 && !optionsEnded_) offerVerbs(name_ + " ");
+            if (const Argument* const argument = nextPositional()) {
+                wanted.source = argument->completion;
+                if (wanted.source == Completion::Verb) offerVerbs(explained_);
+            }
         }
     }
     void finishOption(const std::string& word) {
@@ -99,6 +111,7 @@ private:
         if (startsWith(word, wanted.typed)) wanted.words.push_back({word, shortHelp(help)});
     }
     void offerOptions() {
+        wanted.isOption = true;
         for (const ArgumentList& list : lists()) {
             for (const Argument& argument : list) {
                 const bool isOption = argument.kind != Argument::Kind::Positional;
@@ -113,10 +126,13 @@ private:
     /// The next words of the names that begin like this: "" or "config ".
     void offerVerbs(const std::string& begin) {
         if (begin.empty()) {
-            for (const VerbGroup& group : kVerbGroups)
-                offer(group.name, group.help);
+            wanted.isVerb = verb_ == nullptr;
+            for (const VerbGroup* const group : vocabulary_.groups) {
+                // What is a verb, too, is offered as that.
+                if (vocabulary_.findVerb(group->name) == nullptr) offer(group->name, group->help);
+            }
         }
-        for (const Verb* const verb : kVerbs) {
+        for (const Verb* const verb : vocabulary_.verbs) {
             const std::string name = verb->name;
             if (!startsWith(name, begin)) continue;
             const std::string rest = name.substr(begin.size());
@@ -127,7 +143,7 @@ private:
     std::vector<ArgumentList> lists() const {
         std::vector<ArgumentList> lists;
         if (verb_ != nullptr) lists.push_back(verb_->arguments);
-        lists.push_back(kGlobalArguments);
+        lists.push_back(vocabulary_.globals);
         return lists;
     }
     const Argument* findOption(const std::string& name) const {
@@ -151,6 +167,7 @@ private:
         return nullptr;
     }
 
+    const Vocabulary& vocabulary_;
     std::string name_;  ///< of the verb, as far as it stands there
     const Verb* verb_ = nullptr;
     const Argument* pending_ = nullptr;  ///< an option whose value comes next
@@ -162,9 +179,9 @@ private:
 
 }  // namespace
 
-Wanted wantedBy(const std::vector<std::string>& words) {
-    if (words.empty()) return wantedBy({""});
-    return Reading(words).wanted;
+Wanted wantedBy(const std::vector<std::string>& words, const Vocabulary& vocabulary) {
+    if (words.empty()) return wantedBy({""}, vocabulary);
+    return Reading(words, vocabulary).wanted;
 }
 
 }  // namespace ctl

@@ -2,12 +2,12 @@
 # Checks the manual pages: that mandoc finds no fault with them, that there is one for every verb, and
 # that they name every option.
 #
-#   tests/docs/manual.sh TEMPLATES PAGES ZAVCTL ZAVHOST [ZAVLINK ZAVFLEETD]
+#   tests/docs/manual.sh TEMPLATES PAGES ZAVCTL ZAVHOST [ZAVLINK ZAVFLEETD ZAVCTL_FLEET]
 #
 # TEMPLATES is the folder of the hand-written text. PAGES is that of the pages as the build lays them out,
-# one folder for each program. The last two programs are not built for every width.
+# one folder for each program. The last three programs are not built for every width.
 set -eu
-templates=$1 pages=$2 zavctl=$3 zavhost=$4 zavlink=${5-} zavfleetd=${6-}
+templates=$1 pages=$2 zavctl=$3 zavhost=$4 zavlink=${5-} zavfleetd=${6-} zavctl_fleet=${7-}
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 status=0
@@ -21,6 +21,7 @@ mkdir -p "$scratch/man1" "$scratch/man5" "$scratch/man7" "$scratch/man8"
 cp "$pages"/zavctl/* "$scratch/man1"
 for section in 5 7 8; do cp "$pages"/zavhost/*."$section" "$scratch/man$section"; done
 if [ -n "$zavlink" ]; then
+    cp "$pages"/zavctl-fleet/* "$scratch/man1"
     cp "$pages"/zavlink/*.5 "$scratch/man5"
     cp "$pages"/zavlink/*.8 "$pages"/zavfleetd/*.8 "$scratch/man8"
 fi
@@ -38,16 +39,34 @@ done <"$scratch/references"
 verbs_in() {
     sed -n '/^Commands:/,/^$/s/^  \([a-z][a-z-]*\( [a-z][a-z-]*\)\{0,1\}\)  .*/\1/p'
 }
-"$zavctl" help | verbs_in >"$scratch/words"
-[ "$(wc -l <"$scratch/words")" -gt 10 ] || complain "zavctl help lists hardly any command"
-while read -r word; do
-    "$zavctl" help "$word" >"$scratch/help"
-    if grep -q '^Commands:' "$scratch/help"; then
-        verbs_in <"$scratch/help"
-    else
-        echo "$word"
-    fi
-done <"$scratch/words" | tr ' ' - | sed 's/.*/zavctl-&.1/' | LC_ALL=C sort >"$scratch/expected"
+# The groups of a fleet are named by their first words: the name of one of them is a verb as well.
+all_verbs_of() {
+    "$1" help | verbs_in >"$scratch/words"
+    [ "$(wc -l <"$scratch/words")" -gt 10 ] || complain "$1 help lists hardly any command"
+    while read -r word; do
+        "$1" help "$word" >"$scratch/help"
+        if grep -q '^Commands:' "$scratch/help"; then
+            verbs_in <"$scratch/help"
+        else
+            echo "$word"
+        fi
+    done <"$scratch/words" | LC_ALL=C sort -u
+}
+all_verbs_of "$zavctl" >"$scratch/host_verbs"
+cp "$scratch/host_verbs" "$scratch/all_verbs"
+if [ -n "$zavctl_fleet" ]; then
+    all_verbs_of "$zavctl_fleet" >"$scratch/fleet_verbs"
+    LC_ALL=C sort -u "$scratch/host_verbs" "$scratch/fleet_verbs" >"$scratch/all_verbs"
+    # The page about fleets names the others.
+    echo fleet >>"$scratch/all_verbs"
+    # What both have is on that page: as a reference, or with a section of its own.
+    LC_ALL=C comm -12 "$scratch/host_verbs" "$scratch/fleet_verbs" | while read -r verb; do
+        grep -qE "^\.(Ss $verb|It Xr zavctl-$(echo "$verb" | tr ' ' -) 1)\$" "$scratch/man1/zavctl-fleet.1" ||
+            echo "$verb"
+    done >"$scratch/lacking"
+    [ ! -s "$scratch/lacking" ] || complain "zavctl-fleet.1 lacks $(cat "$scratch/lacking")"
+fi
+tr ' ' - <"$scratch/all_verbs" | sed 's/.*/zavctl-&.1/' | LC_ALL=C sort >"$scratch/expected"
 (cd "$scratch/man1" && LC_ALL=C ls zavctl-*) >"$scratch/found"
 diff "$scratch/expected" "$scratch/found" || complain "the pages (>) are not those of the verbs (<)"
 # A text whose verb has another name now would be nowhere.
@@ -77,6 +96,14 @@ check_options() {
 cli_options() {
     grep -oE '^  (-h,)?--[a-z][a-z-]*' | sed 's/^  //' | grep -v -e '^-h,--help$'
 }
+if [ -n "$zavctl_fleet" ]; then
+    for verb in tasks 'task output' 'config get' doctor push; do
+        # shellcheck disable=SC2086 # a verb may be two words
+        "$zavctl_fleet" help $verb | grep -oE '^  (-h, )?--?[a-z-]+' | sed 's/^ *\(-h, \)*//'
+    done | grep -e '^--' | grep -vxE -e '--help|--version' | check_options man1/zavctl-fleet.1
+    "$zavctl_fleet" help rollout retry-failed | grep -oE '^  --[a-z-]+' | tr -d ' ' |
+        grep -vxE -e '--version' | check_options man1/zavctl-rollout-retry-failed.1
+fi
 if [ -n "$zavlink" ]; then
     {
         "$zavlink" --help | grep -oE -e '--[a-z]+' | grep -v -e '^--help$'

@@ -9,7 +9,7 @@ trap 'rm -rf "$scratch"' EXIT
 # Names in backquotes that begin with a folder of the root, and the targets of relative links.
 # shellcheck disable=SC2016
 names_in() {
-    grep -oE '`(bench|cmake|ctl|docs|examples|home|host|platform|plugin|scripts|tests)/[A-Za-z0-9_./-]*`' "$1" |
+    grep -oE '`(bench|cmake|console|contrib|ctl|docs|examples|fleet|home|host|http|metrics|packaging|platform|plugin|routes|scripts|secrets|sqlite|system|tests|tools)/[A-Za-z0-9_./-]*`' "$1" |
         tr -d '`' || :
     grep -oE '\]\([A-Za-z0-9_./-]+\)' "$1" | sed "s|^](|$(dirname "$1")/|; s|)\$||" || :
 }
