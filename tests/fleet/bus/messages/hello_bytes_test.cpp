@@ -110,6 +110,21 @@ TEST(HelloBytes, KeepAllOfAnOutcomeAndTheHostsDocumentAsItIs) {
                  MessageError);
 }
 
+TEST(OutcomeBytes, HaveAStateAndAJournalThatFitIntoTheirPlaces) {
+    for (std::string Outcome::*const member : {&Outcome::state, &Outcome::journal}) {
+        Outcome outcome;
+        outcome.host = "H";
+        outcome.number = 4;
+        outcome.order = fleet::makeOrderId();
+        outcome.task = "{}";
+        outcome.*member = "fits";
+        EXPECT_NO_THROW(fleet::readOutcome(signOutcome(outcome, kKey), "H", kKey.publicKey()));
+        outcome.*member = std::string(5'000, 'x');
+        EXPECT_THROW(fleet::readOutcome(signOutcome(outcome, kKey), "H", kKey.publicKey()),
+                     MessageError);
+    }
+}
+
 TEST(HelloBytes, OfAnotherHostOrSignerOrPurposeDoNotCount) {
     const std::string hello = signHello("H", Hello{}, kKey);
     EXPECT_THROW(fleet::readHello(hello, "G", kKey.publicKey()), MessageError);

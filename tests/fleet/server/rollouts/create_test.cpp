@@ -90,6 +90,19 @@ TEST_F(NewRolloutTest, HasOrdersForHostsOfTheFleetOnly) {
     expectInvalid(foreign, "another fleet");
 }
 
+TEST_F(NewRolloutTest, HasOrdersOfWhichListsCanTell) {
+    enrol(2);
+    fleet::Order longKind = order("h01");
+    longKind.kind = std::string(129, 'K');
+    expectInvalid(longKind, "its kind or its product is too long");
+    fleet::Order longProduct = order("h01");
+    longProduct.body = R"({"product":")" + std::string(129, 'p') + "\"}";
+    expectInvalid(longProduct, "its kind or its product is too long");
+    fleet::Order longSelector = order("h01");
+    longSelector.selector = std::string((64 << 10) + 1, 's');
+    expectInvalid(longSelector, "its selector is too long");
+}
+
 TEST_F(NewRolloutTest, HasOrdersThatItsOperatorHasSigned) {
     enrol(2);
     fleet::NewRollout made = wanted({"h00"});
