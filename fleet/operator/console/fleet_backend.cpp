@@ -12,7 +12,7 @@
 #include "ctl/show/shell_quoted.h"
 #include "fleet/bus/messages/document.h"
 #include "fleet/operator/centre/answers.h"
-#include "fleet/operator/console/run_request.h"
+#include "fleet/operator/console/runs/run_request.h"
 
 using nlohmann::json;
 

@@ -6,10 +6,10 @@
 
 #include "ctl/console/backend.h"
 #include "ctl/console/turns.h"
-#include "fleet/operator/console/centre_reads.h"
-#include "fleet/operator/console/fleet_uploads.h"
-#include "fleet/operator/console/output_streams.h"
-#include "fleet/operator/console/verb_runs.h"
+#include "fleet/operator/console/outputs/output_streams.h"
+#include "fleet/operator/console/reads/centre_reads.h"
+#include "fleet/operator/console/runs/fleet_uploads.h"
+#include "fleet/operator/console/runs/verb_runs.h"
 #include "fleet/operator/identity/operator_identity.h"
 
 namespace fleet {

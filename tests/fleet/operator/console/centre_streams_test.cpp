@@ -1,7 +1,7 @@
 // ctest-label: threaded
 // The centre's events on their way through the console, with a centre whose every word is written
 // by the test.
-#include "fleet/operator/console/centre_streams.h"
+#include "fleet/operator/console/reads/centre_streams.h"
 
 #include <gtest/gtest.h>
 

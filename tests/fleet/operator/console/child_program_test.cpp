@@ -1,5 +1,5 @@
 // ctest-label: threaded
-#include "fleet/operator/console/child_program.h"
+#include "fleet/operator/console/runs/child_program.h"
 
 #include <gtest/gtest.h>
 

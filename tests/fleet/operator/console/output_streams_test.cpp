@@ -2,7 +2,7 @@
 
 // The output of a host's task on its way through the console, with a centre and a host whose every
 // word is written by the test.
-#include "fleet/operator/console/output_streams.h"
+#include "fleet/operator/console/outputs/output_streams.h"
 
 #include <gtest/gtest.h>
 

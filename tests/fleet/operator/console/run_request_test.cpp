@@ -1,4 +1,4 @@
-#include "fleet/operator/console/run_request.h"
+#include "fleet/operator/console/runs/run_request.h"
 
 #include <gtest/gtest.h>
 

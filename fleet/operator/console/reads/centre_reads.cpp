@@ -1,4 +1,4 @@
-#include "fleet/operator/console/centre_reads.h"
+#include "fleet/operator/console/reads/centre_reads.h"
 
 #include <string_view>
 #include <utility>

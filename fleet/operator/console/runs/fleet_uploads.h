@@ -6,7 +6,7 @@
 #include <memory>
 #include <string>
 
-#include "fleet/operator/console/run_request.h"
+#include "fleet/operator/console/runs/run_request.h"
 #include "http/handler.h"
 
 namespace fleet {

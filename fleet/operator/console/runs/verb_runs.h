@@ -3,13 +3,11 @@
 
 #include <chrono>
 #include <cstddef>
-#include <list>
-#include <memory>
 #include <mutex>
 #include <string>
-#include <thread>
 
-#include "fleet/operator/console/run_request.h"
+#include "fleet/loop/run_list.h"
+#include "fleet/operator/console/runs/run_request.h"
 #include "http/handler.h"
 
 namespace fleet {
@@ -44,17 +42,11 @@ public:
 
 private:
     class Run;
-    struct Entry {
-        std::shared_ptr<Run> run;
-        std::thread thread;
-    };
-
-    void joinEnded();
 
     const std::string program_;
     const RunLimits limits_;
     mutable std::mutex mutex_;
-    std::list<Entry> runs_;
+    RunList<Run> runs_;
 };
 
 }  // namespace fleet

@@ -1,4 +1,4 @@
-#include "fleet/operator/console/centre_session.h"
+#include "fleet/operator/console/reads/centre_session.h"
 
 #include <chrono>
 

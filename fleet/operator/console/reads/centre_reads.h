@@ -10,8 +10,8 @@
 
 #include "ctl/console/answer_room.h"
 #include "fleet/https/client/https_client.h"
-#include "fleet/operator/console/centre_session.h"
-#include "fleet/operator/console/centre_streams.h"
+#include "fleet/operator/console/reads/centre_session.h"
+#include "fleet/operator/console/reads/centre_streams.h"
 #include "fleet/operator/identity/operator_identity.h"
 #include "http/handler.h"
 

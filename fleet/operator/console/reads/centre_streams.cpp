@@ -1,6 +1,5 @@
-#include "fleet/operator/console/centre_streams.h"
+#include "fleet/operator/console/reads/centre_streams.h"
 
-#include <atomic>
 #include <condition_variable>
 #include <cstddef>
 #include <exception>
@@ -34,11 +33,10 @@ public:
         } catch (...) {
             end({}, std::current_exception());
         }
-        hasEnded_ = true;
     }
 
     /// Ends it soon.
-    void cancel() {
+    void stop() {
         client_->cancel();
         feed_->cancel();
     }
@@ -57,7 +55,6 @@ public:
         const std::lock_guard lock(mutex_);
         return position_;
     }
-    bool hasEnded() const { return hasEnded_; }
 
 private:
     void begin(const std::string& position) {
@@ -80,7 +77,6 @@ private:
 
     const std::unique_ptr<HttpsClient> client_;
     const std::shared_ptr<BrowserFeed> feed_ = std::make_shared<BrowserFeed>();
-    std::atomic<bool> hasEnded_{false};
 
     mutable std::mutex mutex_;
     std::condition_variable changed_;
@@ -91,42 +87,27 @@ private:
     bool isOver_ = false;
 };
 
-CentreStreams::~CentreStreams() {
-    for (Entry& entry : readers_) {
-        entry.reader->cancel();
-        entry.thread.join();
-    }
-}
+CentreStreams::CentreStreams() = default;
+
+CentreStreams::~CentreStreams() = default;
 
 CentreStreams::Opened CentreStreams::open(std::unique_ptr<HttpsClient> client, Read read) {
     const std::shared_ptr<Reader> reader = start(std::move(client), std::move(read));
     std::optional<HttpsAnswer> answer = reader->awaitBegin();
     if (answer) return std::move(*answer);
-    return sourceOf(reader->feed(), reader->position(), [reader] { reader->cancel(); });
+    return sourceOf(reader->feed(), reader->position(), stopperOf(reader));
 }
 
 std::shared_ptr<CentreStreams::Reader> CentreStreams::start(std::unique_ptr<HttpsClient> client,
                                                             Read read) {
     const std::lock_guard lock(mutex_);
-    joinEnded();
+    readers_.removeEnded();
     if (readers_.size() >= kMostStreams) {
         throw ctl::Failure(ctl::kHostReportedFailure, "as many streams as can be are open already");
     }
     const auto reader = std::make_shared<Reader>(std::move(client));
-    readers_.push_back(
-        {reader, std::thread([reader, read = std::move(read)] { reader->run(read); })});
+    readers_.start(reader, [read = std::move(read)](Reader& started) { started.run(read); });
     return reader;
-}
-
-void CentreStreams::joinEnded() {
-    for (auto entry = readers_.begin(); entry != readers_.end();) {
-        if (!entry->reader->hasEnded()) {
-            ++entry;
-            continue;
-        }
-        entry->thread.join();
-        entry = readers_.erase(entry);
-    }
 }
 
 }  // namespace fleet

@@ -1,4 +1,4 @@
-#include "fleet/operator/console/child_program.h"
+#include "fleet/operator/console/runs/child_program.h"
 
 #include <fcntl.h>
 #include <poll.h>

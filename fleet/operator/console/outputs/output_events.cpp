@@ -1,4 +1,4 @@
-#include "fleet/operator/console/output_events.h"
+#include "fleet/operator/console/outputs/output_events.h"
 
 #include <nlohmann/json.hpp>
 #include <string_view>

@@ -1,4 +1,4 @@
-#include "fleet/operator/console/output_request.h"
+#include "fleet/operator/console/outputs/output_request.h"
 
 #include <algorithm>
 #include <cstddef>

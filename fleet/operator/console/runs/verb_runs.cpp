@@ -1,8 +1,7 @@
-#include "fleet/operator/console/verb_runs.h"
+#include "fleet/operator/console/runs/verb_runs.h"
 
-#include <algorithm>
-#include <atomic>
 #include <exception>
+#include <memory>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <utility>
@@ -10,7 +9,7 @@
 #include "ctl/client/http/bounded_json.h"
 #include "fleet/bus/messages/document.h"
 #include "fleet/operator/centre/answers.h"
-#include "fleet/operator/console/child_program.h"
+#include "fleet/operator/console/runs/child_program.h"
 #include "http/responder.h"
 
 using nlohmann::json;
@@ -75,11 +74,9 @@ public:
             child_.stop();
             answer(http::errorReply(500, error.what()));
         }
-        hasEnded_ = true;
     }
 
     void stop() { child_.stop(); }
-    bool hasEnded() const { return hasEnded_; }
 
     void answerTo(const http::Responder& responder) {
         const std::lock_guard lock(mutex_);
@@ -102,7 +99,6 @@ private:
     const std::chrono::seconds time_;
     const std::size_t mostBytes_;
     ChildProgram child_;
-    std::atomic<bool> hasEnded_{false};
     std::mutex mutex_;
     std::optional<http::Responder> responder_;
     std::optional<http::Reply> reply_;
@@ -111,26 +107,18 @@ private:
 VerbRuns::VerbRuns(std::string program, const RunLimits& limits)
     : program_(std::move(program)), limits_(limits) {}
 
-VerbRuns::~VerbRuns() {
-    stopAll();
-    for (Entry& entry : runs_)
-        entry.thread.join();
-}
+VerbRuns::~VerbRuns() = default;
 
 http::Answer VerbRuns::begin(RunRequest request) {
     const std::lock_guard lock(mutex_);
-    joinEnded();
+    runs_.removeEnded();
     if (runs_.size() >= limits_.runs) {
         return http::errorReply(429, "as many commands as can be are under way already");
     }
     const std::chrono::seconds time = timeFor(request, limits_);
     const auto run = std::make_shared<Run>(program_, std::move(request), limits_);
-    runs_.push_back({run, std::thread([run] { run->follow(); })});
-    // The server may keep these for longer than the run lasts.
-    const std::weak_ptr<Run> held = run;
-    const auto stop = [held] {
-        if (const auto alive = held.lock()) alive->stop();
-    };
+    runs_.start(run, [](Run& started) { started.follow(); });
+    const auto stop = stopperOf(run);
     const auto end = [stop]() -> http::Answer {
         stop();
         return http::errorReply(503, "the console ends, and the command with it");
@@ -141,25 +129,12 @@ http::Answer VerbRuns::begin(RunRequest request) {
 
 void VerbRuns::stopAll() {
     const std::lock_guard lock(mutex_);
-    for (const Entry& entry : runs_)
-        entry.run->stop();
+    runs_.stopAll();
 }
 
 bool VerbRuns::empty() const {
     const std::lock_guard lock(mutex_);
-    return std::all_of(runs_.begin(), runs_.end(),
-                       [](const Entry& entry) { return entry.run->hasEnded(); });
-}
-
-void VerbRuns::joinEnded() {
-    for (auto entry = runs_.begin(); entry != runs_.end();) {
-        if (!entry->run->hasEnded()) {
-            ++entry;
-            continue;
-        }
-        entry->thread.join();
-        entry = runs_.erase(entry);
-    }
+    return runs_.haveAllEnded();
 }
 
 }  // namespace fleet

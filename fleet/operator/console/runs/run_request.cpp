@@ -1,4 +1,4 @@
-#include "fleet/operator/console/run_request.h"
+#include "fleet/operator/console/runs/run_request.h"
 
 #include <algorithm>
 #include <cstring>
@@ -10,9 +10,9 @@
 #include "ctl/client/http/bounded_json.h"
 #include "ctl/show/printable.h"
 #include "ctl/show/shell_quoted.h"
-#include "fleet/operator/console/child_program.h"
-#include "fleet/operator/console/run_line.h"
-#include "fleet/operator/console/run_verbs.h"
+#include "fleet/operator/console/runs/child_program.h"
+#include "fleet/operator/console/runs/run_line.h"
+#include "fleet/operator/console/runs/run_verbs.h"
 #include "fleet/operator/verbs/fleet_arguments.h"
 #include "fleet/operator/verbs/fleet_verbs.h"
 

@@ -3,15 +3,13 @@
 
 #include <chrono>
 #include <cstddef>
-#include <list>
 #include <map>
-#include <memory>
 #include <mutex>
 #include <string>
-#include <thread>
 
-#include "fleet/operator/console/centre_session.h"
-#include "fleet/operator/console/output_request.h"
+#include "fleet/loop/run_list.h"
+#include "fleet/operator/console/outputs/output_request.h"
+#include "fleet/operator/console/reads/centre_session.h"
 #include "fleet/operator/identity/operator_identity.h"
 #include "http/handler.h"
 
@@ -28,8 +26,7 @@ public:
 
     /// Both outlive it. `answerTime` is for each answer of the centre.
     OutputStreams(const OperatorIdentity& identity, CentreSession& session,
-                  std::chrono::milliseconds answerTime)
-        : identity_(identity), session_(session), answerTime_(answerTime) {}
+                  std::chrono::milliseconds answerTime);
     ~OutputStreams();
     OutputStreams(const OutputStreams&) = delete;
     OutputStreams& operator=(const OutputStreams&) = delete;
@@ -45,19 +42,15 @@ public:
 
 private:
     class Run;
-    struct Entry {
-        std::shared_ptr<Run> run;
-        std::thread thread;
-    };
 
-    void joinEnded();
+    void removeEnded();
     KeyPair readerFor(const std::string& host);
 
     const OperatorIdentity& identity_;
     CentreSession& session_;
     const std::chrono::milliseconds answerTime_;
     std::mutex mutex_;
-    std::list<Entry> runs_;
+    RunList<Run> runs_;
     /// Of streams that have ended, by host. A host that hears of one again ends what it still shows
     /// it: else the streams that a browser has left would take up its places for a while.
     std::multimap<std::string, KeyPair> readers_;

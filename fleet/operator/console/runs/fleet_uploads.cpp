@@ -1,4 +1,4 @@
-#include "fleet/operator/console/fleet_uploads.h"
+#include "fleet/operator/console/runs/fleet_uploads.h"
 
 #include <exception>
 #include <optional>

@@ -1,4 +1,4 @@
-#include "fleet/operator/console/run_line.h"
+#include "fleet/operator/console/runs/run_line.h"
 
 #include <nlohmann/json.hpp>
 

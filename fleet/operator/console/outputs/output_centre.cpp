@@ -1,4 +1,4 @@
-#include "fleet/operator/console/output_centre.h"
+#include "fleet/operator/console/outputs/output_centre.h"
 
 #include <chrono>
 #include <nlohmann/json.hpp>

@@ -2,13 +2,12 @@
 #pragma once
 
 #include <functional>
-#include <list>
 #include <memory>
 #include <mutex>
-#include <thread>
 #include <variant>
 
 #include "fleet/https/client/https_client.h"
+#include "fleet/loop/run_list.h"
 #include "http/event_source.h"
 
 namespace fleet {
@@ -25,7 +24,7 @@ public:
     /// A stream, or what was answered in its place.
     using Opened = std::variant<std::unique_ptr<http::EventSource>, HttpsAnswer>;
 
-    CentreStreams() = default;
+    CentreStreams();
     /// Nothing that open() made may live any longer.
     ~CentreStreams();
     CentreStreams(const CentreStreams&) = delete;
@@ -37,16 +36,11 @@ public:
 
 private:
     class Reader;
-    struct Entry {
-        std::shared_ptr<Reader> reader;
-        std::thread thread;
-    };
 
     std::shared_ptr<Reader> start(std::unique_ptr<HttpsClient> client, Read read);
-    void joinEnded();
 
     std::mutex mutex_;
-    std::list<Entry> readers_;
+    RunList<Reader> readers_;
 };
 
 }  // namespace fleet

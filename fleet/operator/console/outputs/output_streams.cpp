@@ -1,8 +1,8 @@
-#include "fleet/operator/console/output_streams.h"
+#include "fleet/operator/console/outputs/output_streams.h"
 
-#include <atomic>
 #include <chrono>
 #include <exception>
+#include <memory>
 #include <optional>
 #include <string>
 #include <utility>
@@ -10,8 +10,8 @@
 #include "ctl/client/failure.h"
 #include "ctl/console/refusals.h"
 #include "fleet/operator/console/browser_feed.h"
-#include "fleet/operator/console/output_centre.h"
-#include "fleet/operator/console/output_events.h"
+#include "fleet/operator/console/outputs/output_centre.h"
+#include "fleet/operator/console/outputs/output_events.h"
 #include "fleet/operator/questions/followed_output.h"
 #include "fleet/operator/verbs/looks/fleet_task_output.h"
 #include "http/responder.h"
@@ -60,7 +60,6 @@ public:
         // Who has not begun to get it goes without: they have gone themselves.
         if (!hasBegun_) answer(http::errorReply(503, "the output is not wanted any more"));
         disconnect();
-        hasEnded_ = true;
     }
 
     /// Ends it soon.
@@ -71,7 +70,6 @@ public:
         }
         feed_->cancel();
     }
-    bool hasEnded() const { return hasEnded_; }
     const std::string& host() const { return request_.host; }
     const KeyPair& reader() const { return reader_; }
 
@@ -127,9 +125,7 @@ private:
     void begin(const std::string& position) {
         hasBegun_ = true;
         // The answer may be kept here, and must not keep this alive.
-        answer(sourceOf(feed_, position, [held = weak_from_this()] {
-            if (const auto alive = held.lock()) alive->stop();
-        }));
+        answer(sourceOf(feed_, position, stopperOf(shared_from_this())));
     }
 
     void fail(const ctl::Failure& failure) {
@@ -165,7 +161,6 @@ private:
     const std::shared_ptr<BrowserFeed> feed_ = std::make_shared<BrowserFeed>();
     OutputEvents events_;    ///< of the stream's thread
     bool hasBegun_ = false;  ///< likewise: it has answered
-    std::atomic<bool> hasEnded_{false};
 
     std::mutex mutex_;
     std::unique_ptr<HttpsClient> client_;  ///< until the end; changed with the lock
@@ -173,25 +168,21 @@ private:
     std::optional<http::Answer> answer_;  ///< until somebody waits for it
 };
 
-OutputStreams::~OutputStreams() {
-    stopAll();
-    for (Entry& entry : runs_)
-        entry.thread.join();
-}
+OutputStreams::OutputStreams(const OperatorIdentity& identity, CentreSession& session,
+                             std::chrono::milliseconds answerTime)
+    : identity_(identity), session_(session), answerTime_(answerTime) {}
+
+OutputStreams::~OutputStreams() = default;
 
 http::Answer OutputStreams::begin(OutputRequest request) {
     const std::lock_guard lock(mutex_);
-    joinEnded();
+    removeEnded();
     if (runs_.size() >= kMost) return tooMany();
     KeyPair reader = readerFor(request.host);
     const auto run = std::make_shared<Run>(identity_, session_, answerTime_, std::move(request),
                                            std::move(reader));
-    runs_.push_back({run, std::thread([run] { run->follow(); })});
-    // The server may keep these for longer than the stream lasts.
-    const std::weak_ptr<Run> held = run;
-    const auto stop = [held] {
-        if (const auto alive = held.lock()) alive->stop();
-    };
+    runs_.start(run, [](Run& started) { started.follow(); });
+    const auto stop = stopperOf(run);
     const auto giveUp = [stop]() -> http::Answer {
         stop();
         return http::errorReply(504, "the host has not begun to show the output");
@@ -202,20 +193,13 @@ http::Answer OutputStreams::begin(OutputRequest request) {
 
 void OutputStreams::stopAll() {
     const std::lock_guard lock(mutex_);
-    for (const Entry& entry : runs_)
-        entry.run->stop();
+    runs_.stopAll();
 }
 
-void OutputStreams::joinEnded() {
-    for (auto entry = runs_.begin(); entry != runs_.end();) {
-        if (!entry->run->hasEnded()) {
-            ++entry;
-            continue;
-        }
-        entry->thread.join();
+void OutputStreams::removeEnded() {
+    for (const std::shared_ptr<Run>& ended : runs_.removeEnded()) {
         if (readers_.size() >= kMostReaders) readers_.clear();
-        readers_.emplace(entry->run->host(), entry->run->reader());
-        entry = runs_.erase(entry);
+        readers_.emplace(ended->host(), ended->reader());
     }
 }
 

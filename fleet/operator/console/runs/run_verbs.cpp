@@ -1,4 +1,4 @@
-#include "fleet/operator/console/run_verbs.h"
+#include "fleet/operator/console/runs/run_verbs.h"
 
 #include <algorithm>
 #include <iterator>

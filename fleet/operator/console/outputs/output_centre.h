@@ -7,7 +7,7 @@
 
 #include "fleet/https/client/https_client.h"
 #include "fleet/operator/centre/centre.h"
-#include "fleet/operator/console/centre_session.h"
+#include "fleet/operator/console/reads/centre_session.h"
 
 namespace fleet {
 
