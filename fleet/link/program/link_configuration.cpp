@@ -28,7 +28,7 @@ struct Place {
     }
 };
 
-std::string textOf(const toml::node& value, const Place& place) {
+std::string wordIn(const toml::node& value, const Place& place) {
     const std::optional<std::string> text = value.value_exact<std::string>();
     if (!text) place.refuse("must be a text in quotes");
     if (text->empty()) place.refuse("must not be empty");
@@ -40,7 +40,7 @@ std::vector<std::string> textsOf(const toml::node& value, const Place& place) {
     if (list == nullptr || list->empty()) place.refuse("must be a list of texts");
     std::vector<std::string> texts;
     for (const toml::node& text : *list)
-        texts.push_back(textOf(text, place));
+        texts.push_back(wordIn(text, place));
     return texts;
 }
 
@@ -51,7 +51,7 @@ Labels labelsOf(const toml::node& value, const Place& place) {
     for (const auto& [name, label] : *table) {
         const Place where{place.path, "label " + std::string(name.str()),
                           static_cast<int>(label.source().begin.line)};
-        labels[std::string(name.str())] = textOf(label, where);
+        labels[std::string(name.str())] = wordIn(label, where);
     }
     return labels;
 }
@@ -63,7 +63,7 @@ std::string checkedKey(std::string key, const Place& place, KeyKind kind) {
 
 /// One key as a text, or a list of them: while the centre's key is replaced there are two.
 std::vector<std::string> keysOf(const toml::node& value, const Place& place, KeyKind kind) {
-    if (value.is_string()) return {checkedKey(textOf(value, place), place, kind)};
+    if (value.is_string()) return {checkedKey(wordIn(value, place), place, kind)};
     std::vector<std::string> keys;
     for (std::string& key : textsOf(value, place))
         keys.push_back(checkedKey(std::move(key), place, kind));
@@ -104,7 +104,7 @@ struct Member {
 
 template <std::string LinkConfiguration::*kMember>
 void readText(const toml::node& value, const Place& place, LinkConfiguration& into) {
-    into.*kMember = textOf(value, place);
+    into.*kMember = wordIn(value, place);
 }
 
 constexpr Member kMembers[] = {
@@ -118,7 +118,7 @@ constexpr Member kMembers[] = {
     {"server-name", false, readText<&LinkConfiguration::serverName>},
     {"url", false,
      [](const toml::node& value, const Place& place, LinkConfiguration& into) {
-         into.url = textOf(value, place);
+         into.url = wordIn(value, place);
          try {
              readServerUrl(into.url);
          } catch (const UrlError& error) {
@@ -127,7 +127,7 @@ constexpr Member kMembers[] = {
      }},
     {"root", true,
      [](const toml::node& value, const Place& place, LinkConfiguration& into) {
-         into.root = checkedKey(textOf(value, place), place, KeyKind::Operator);
+         into.root = checkedKey(wordIn(value, place), place, KeyKind::Operator);
      }},
     {"centre", true,
      [](const toml::node& value, const Place& place, LinkConfiguration& into) {
@@ -137,7 +137,7 @@ constexpr Member kMembers[] = {
     {"state", true, readText<&LinkConfiguration::state>},
     {"metrics", false,
      [](const toml::node& value, const Place& place, LinkConfiguration& into) {
-         into.metrics = textOf(value, place);
+         into.metrics = wordIn(value, place);
          // The node exporter passes over other names.
          const bool isRead = endsWith(into.metrics, ".prom");
          if (into.metrics.front() != '/' || !isRead) place.refuse("must be a path /.../NAME.prom");

@@ -23,7 +23,7 @@ using std::chrono::seconds;
 using Steady = std::chrono::steady_clock;
 
 /// The bus writes to its disk before it answers, which may be as busy as the rest of its machine.
-constexpr seconds kAnswerTime{10};
+constexpr seconds kStreamAnswerTime{10};
 constexpr seconds kFarewellTime{5};
 constexpr seconds kPause{1};
 /// A bus that is not away but whose store is, for as long, has lost its account.
@@ -142,7 +142,7 @@ bool CentreProgram::ensureStreams() {
     for (const StreamSettings& stream :
          {tasksStream(settings_.limits), outStream(settings_.limits), hostsStream(settings_.limits),
           centreStream(settings_.limits)}) {
-        const EnsureResult ensured = ensureStream(*connection_, stream, kAnswerTime);
+        const EnsureResult ensured = ensureStream(*connection_, stream, kStreamAnswerTime);
         if (!ensured.status.done()) {
             say(Priority::Warning, "stream " + stream.name + ": " + ensured.status.text);
             return false;
@@ -277,7 +277,7 @@ bool CentreProgram::beginWork() {
 std::unique_ptr<Subscription> CentreProgram::hear(const std::string& subject,
                                                   const Connection::Receiver& receiver) {
     for (;;) {
-        Connection::Subscribed made = connection_->subscribe(subject, receiver, kAnswerTime);
+        Connection::Subscribed made = connection_->subscribe(subject, receiver, kStreamAnswerTime);
         if (made.subscription) return std::move(made.subscription);
         say(Priority::Warning, subject + " cannot be heard yet: " + made.status.text);
         std::this_thread::sleep_for(kPause);
@@ -301,7 +301,8 @@ bool CentreProgram::openQuestions() {
 /// numbers that may have been given are skipped, and hosts are asked what they have. Before that
 /// nobody is answered.
 bool CentreProgram::completePutBack() {
-    const SubjectsResult found = subjectsOf(*connection_, kTasksStream, kTaskSubjects, kAnswerTime);
+    const SubjectsResult found =
+        subjectsOf(*connection_, kTasksStream, kTaskSubjects, kStreamAnswerTime);
     if (!found.status.done()) {
         say(Priority::Error, "the orders on the bus cannot be listed: " + found.status.text);
         return false;
@@ -506,7 +507,8 @@ std::vector<std::string> CentreProgram::ownKeys() const {
 
 void CentreProgram::sweepOnce() {
     ensureStreams();
-    const SubjectsResult found = subjectsOf(*connection_, kTasksStream, kTaskSubjects, kAnswerTime);
+    const SubjectsResult found =
+        subjectsOf(*connection_, kTasksStream, kTaskSubjects, kStreamAnswerTime);
     if (!found.status.done()) {
         say(Priority::Warning, "the orders on the bus cannot be listed: " + found.status.text);
     }

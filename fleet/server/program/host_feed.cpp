@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "fleet/log/log.h"
+#include "fleet/server/program/answer_time.h"
 
 namespace fleet {
 namespace {
@@ -12,7 +13,6 @@ namespace {
 using std::chrono::milliseconds;
 using std::chrono::seconds;
 
-constexpr seconds kAnswerTime{5};
 /// How long the bus waits for the first message of a batch; also how long an end takes.
 constexpr seconds kPatience{1};
 constexpr int kBatch = 256;

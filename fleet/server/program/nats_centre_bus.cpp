@@ -1,15 +1,13 @@
 #include "fleet/server/program/nats_centre_bus.h"
 
-#include <chrono>
 #include <utility>
 
 #include "fleet/bus/nats/store.h"
 #include "fleet/bus/nats/streams.h"
+#include "fleet/server/program/answer_time.h"
 
 namespace fleet {
 namespace {
-
-constexpr std::chrono::seconds kAnswerTime{5};
 
 /// The store's code for why it does not take a message.
 bool isWantOfRoom(int code) {

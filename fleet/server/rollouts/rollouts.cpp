@@ -16,7 +16,7 @@ namespace fleet {
 namespace {
 
 constexpr std::size_t kLearntInOneTick = 1'000;
-constexpr std::size_t kLongestName = 200;
+constexpr std::size_t kLongestOperatorName = 200;
 constexpr std::size_t kAll = std::numeric_limits<std::int64_t>::max();
 
 void insistOnState(bool holds, const std::string& otherwise) {
@@ -24,7 +24,8 @@ void insistOnState(bool holds, const std::string& otherwise) {
 }
 
 void checkOperator(const RolloutOperator& by) {
-    insistThat(!by.name.empty() && by.name.size() <= kLongestName, "the operator has no name");
+    insistThat(!by.name.empty() && by.name.size() <= kLongestOperatorName,
+               "the operator has no name");
     insistThat(!by.key.empty(), "the operator has no key");
 }
 

@@ -11,13 +11,13 @@
 #include "fleet/server/keys/trust/account_tokens.h"
 #include "fleet/server/keys/trust/revocations.h"
 #include "fleet/server/keys/trust/trust_database.h"
+#include "fleet/server/program/answer_time.h"
 
 namespace fleet {
 namespace {
 
 using std::chrono::seconds;
 
-constexpr seconds kAnswerTime{5};
 constexpr seconds kLookPause{1};
 
 TokenTime secondNow() {

@@ -12,7 +12,6 @@
 namespace fleet {
 namespace {
 
-constexpr unsigned kSessionOver = 401;
 /// A browser asks no more at a time of one server, and the answers are held as a whole.
 constexpr std::size_t kMostClients = 6;
 constexpr std::size_t kMostDigits = 6;

@@ -10,7 +10,6 @@
 namespace fleet {
 namespace {
 
-constexpr unsigned kSessionOver = 401;
 /// Several times what a page of the centre's longest lists takes.
 constexpr std::size_t kLongestAnswer = std::size_t{8} * 1024 * 1024;
 

@@ -12,6 +12,9 @@
 
 namespace fleet {
 
+/// The status with which the centre answers when there is no session, or none any more.
+constexpr unsigned kSessionOver = 401;
+
 /// One session, which all connections share. It is opened when it is first needed, and anew when it
 /// has ended. Any thread.
 class CentreSession {
