@@ -181,7 +181,7 @@ run zavctl --fleet "$ZAV_FLEET" whoami
 tries=0
 until [ "$(zavctl hosts | grep -c ' here ')" -eq 5 ]; do
     tries=$((tries + 1))
-    [ "$tries" -le 100 ]
+    [ "$tries" -le 600 ]
     sleep 0.5
 done
 run zavctl hosts

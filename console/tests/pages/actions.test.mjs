@@ -278,7 +278,7 @@ test('what is written and not sent is not lost without a question', async () => 
         assert.equal(await tab.$eval('main select', (field) => field.value), '/configuration?product=ux');
         own.answers = [false];
         await tab.evaluate(() => history.back());
-        for (let tries = 0; own.answers.length > 0 && tries < 100; ++tries) await new Promise((done) => setTimeout(done, 50));
+        for (let tries = 0; own.answers.length > 0 && tries < 800; ++tries) await new Promise((done) => setTimeout(done, 50));
         await isKept();
         own.answers = [true];
         await tab.click('nav a[href="/agents"]');

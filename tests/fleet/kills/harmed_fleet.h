@@ -66,6 +66,9 @@ protected:
         return false;
     }
 
+    /// Roll-outs that the centre has made, among them those of which the operator got no answer.
+    std::int64_t madeRollouts() const { return CentreRecords(fleet_.directory()).rollouts(); }
+
     bool isAllOver() const {
         CentreRecords records(fleet_.directory());
         const std::vector<RolledOut> orders = records.rolledOut();

@@ -133,7 +133,7 @@ TEST_F(FleetProgramTest, LeavesTheRolloutAloneAtCtrlC) {
 
 TEST_F(FleetProgramTest, GivesUpAtItsTimeOut) {
     endWith("running", json::object(), 1, 3);
-    const ProgramResult result = run({"--timeout", "1", "--on", "env=test", "start", "ux"});
+    const ProgramResult result = run({"--timeout", "5", "--on", "env=test", "start", "ux"});
     EXPECT_EQ(result.status, ctl::kNoOutcome) << result.err;
     EXPECT_NE(result.err.find("rollout watch"), std::string::npos) << result.err;
 }

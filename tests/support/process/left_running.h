@@ -33,5 +33,5 @@ private:
 /// A piece of shell script that waits until there is a file of that name, for a minute at most.
 inline std::string untilReleased(const std::string& file) {
     return "n=0\nuntil [ -e '" + file +
-           "' ] || [ $n -gt 1200 ]; do n=$((n + 1)); sleep 0.05; done\n";
+           "' ] || [ $n -gt 12000 ]; do n=$((n + 1)); sleep 0.05; done\n";
 }

@@ -176,7 +176,7 @@ TEST_F(FrontOfAServer, EndsWithWhoSpeaksNoTls) {
 
 TEST_F(FrontOfAServer, EndsWithWhoNeverSpeaks) {
     fleet::FrontLimits limits;
-    limits.handshakeTime = milliseconds(100);
+    limits.handshakeTime = milliseconds(2'000);
     start(limits);
     TcpClient silent(front_->port());
     TcpClient half(front_->port());
@@ -263,7 +263,7 @@ public:
         const std::string piece(10'000, 'x');
         std::size_t sent = 0;
         pollfd writable{connection_.get(), POLLOUT, 0};
-        while (::poll(&writable, 1, 300) == 1) {
+        while (::poll(&writable, 1, 2'000) == 1) {
             const ssize_t took =
                 ::send(connection_.get(), piece.data(), piece.size(), MSG_NOSIGNAL | MSG_DONTWAIT);
             sent += took < 0 ? 0 : static_cast<std::size_t>(took);

@@ -308,10 +308,12 @@ TEST_F(FleetConsole, EndsTheProgramWhenItEndsItself) {
 TEST_F(FleetConsole, BoundsWhatAProgramMayTakeAndSay) {
     fleet::FleetBackend::Settings bounded = settings();
     bounded.runs.time = std::chrono::seconds(1);
-    bounded.runs.bytes = 100'000;
     serve(std::move(bounded));
     program("exec sleep 600");
     EXPECT_EQ(run(startOf("ux")).status, 504);
+    bounded = settings();
+    bounded.runs.bytes = 100'000;
+    serve(std::move(bounded));
     program("exec cat /dev/zero");
     EXPECT_EQ(run(startOf("ux")).status, 502);
 }

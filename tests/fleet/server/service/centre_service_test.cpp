@@ -190,7 +190,8 @@ TEST_F(RunningCentre, IsAProgramThatEndsWhenItIsTold) {
                      "--port", "0"});
     ASSERT_TRUE(program.awaitOutput("started", kPatience)) << program.err();
     EXPECT_TRUE(eventually(
-        [&program] { return program.err().find("the centre works") != std::string::npos; }));
+        [&program] { return program.err().find("the centre works") != std::string::npos; },
+        made_fleet::kWorksWithin));
     program.signal(SIGTERM);
     const ProgramResult result = program.wait();
     EXPECT_EQ(result.status, 0) << result.err;
