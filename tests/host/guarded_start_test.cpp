@@ -18,7 +18,7 @@
 
 namespace {
 
-using std::chrono::seconds;
+using std::chrono::minutes;
 
 class GuardedStart : public testing::Test {
 protected:
@@ -35,7 +35,7 @@ protected:
         return std::make_unique<Program>(command(socket, more), "", environment);
     }
     bool isReady(Program& program, const std::string& socket) const {
-        return program.awaitOutput("ready: " + scratch.path(socket), seconds(30));
+        return program.awaitOutput("ready: " + scratch.path(socket), minutes(3));
     }
     ProgramResult refused(const std::vector<std::string>& more = {},
                           const Environment& environment = {}) const {
@@ -123,7 +123,7 @@ TEST_F(GuardedStart, OfManyAtOnceExactlyOneServesTheHome) {
     const auto owner = std::find_if(programs.begin(), programs.end(),
                                     [](const auto& program) { return program->running(); });
     ASSERT_NE(owner, programs.end());
-    EXPECT_TRUE((*owner)->awaitOutput("ready: ", seconds(30))) << (*owner)->err();
+    EXPECT_TRUE((*owner)->awaitOutput("ready: ", minutes(3))) << (*owner)->err();
     for (const auto& program : programs) {
         if (program == *owner) continue;
         EXPECT_EQ(program->wait().status, 1);

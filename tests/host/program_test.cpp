@@ -20,6 +20,7 @@
 namespace {
 
 using std::chrono::milliseconds;
+using std::chrono::minutes;
 using std::chrono::seconds;
 
 class HostProgram : public testing::Test {
@@ -38,7 +39,7 @@ protected:
     }
     std::unique_ptr<Program> start(std::vector<std::string> more = {}) {
         auto program = std::make_unique<Program>(command(std::move(more)));
-        EXPECT_TRUE(program->awaitOutput("ready: " + socket + "\n", seconds(30))) << program->err();
+        EXPECT_TRUE(program->awaitOutput("ready: " + socket + "\n", minutes(3))) << program->err();
         return program;
     }
     /// Starts it for nothing; its one line of complaint.
@@ -119,7 +120,7 @@ TEST_F(HostProgram, EndsWithStatus0OnBothSignals) {
 TEST_F(HostProgram, OpensItsTraceLogAnewOnHangUpAndGoesOn) {
     const std::string log = scratch.path("trace.log");
     Program program(command(), "", {{"KBB_RAS1_LOG", log}});
-    ASSERT_TRUE(program.awaitOutput("ready: ", seconds(30))) << program.err();
+    ASSERT_TRUE(program.awaitOutput("ready: ", minutes(3))) << program.err();
     for (int round = 0; round < 3; ++round) {
         ASSERT_TRUE(scratch.exists("trace.log"));
         std::filesystem::rename(log, scratch.path("trace.old"));
@@ -194,7 +195,7 @@ TEST_F(HostProgram, OfManyThatStartAtOnceExactlyOneServes) {
     EXPECT_TRUE(eventually([&] { return running() == 1; }));
     for (const auto& program : programs) {
         if (program->running()) {
-            EXPECT_TRUE(program->awaitOutput("ready: ", seconds(20)));
+            EXPECT_TRUE(program->awaitOutput("ready: ", minutes(3)));
         } else {
             EXPECT_EQ(program->wait().status, 1);
         }
@@ -224,7 +225,7 @@ TEST_F(HostProgram, ServesFileTransfersOnALoopbackPortWhenToldTo) {
 
 TEST_F(HostProgram, GoesOnWhenOnlyFileTransfersFailToRegister) {
     Program program(command(), "", {{"MADE_UP_PLUGIN", "status"}});
-    EXPECT_TRUE(program.awaitOutput("ready: ", seconds(30)));
+    EXPECT_TRUE(program.awaitOutput("ready: ", minutes(3)));
     EXPECT_EQ(program.err(), "zavhost: plug-in " + command().back() +
                                  " started with status 7; file transfers may fail\n");
 }
