@@ -2,8 +2,6 @@
 // What a guarded host looks at before it starts, on a home of the starter home's and with the real
 // plug-in; and that an unguarded one does not.
 #include <gtest/gtest.h>
-#include <netinet/in.h>
-#include <sys/socket.h>
 
 #include <algorithm>
 #include <filesystem>
@@ -12,9 +10,9 @@
 
 #include "host/checks/check_list.h"
 #include "host/raw_client.h"
+#include "support/free_port.h"
 #include "support/host/program.h"
 #include "support/host/starter_home.h"
-#include "system/file_descriptor.h"
 
 namespace {
 
@@ -56,18 +54,6 @@ protected:
                         "060100000", "--no-verify", "--", installer});
         EXPECT_EQ(installed.status, 0) << installed.out << installed.err;
         return scratch.read("umask");
-    }
-    /// A port of the loopback address that nobody uses.
-    static std::uint16_t freePort() {
-        const sys::FileDescriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        socklen_t length = sizeof address;
-        auto* const generic = reinterpret_cast<sockaddr*>(&address);
-        EXPECT_EQ(::bind(socket.get(), generic, length), 0);
-        EXPECT_EQ(::getsockname(socket.get(), generic, &length), 0);
-        return ntohs(address.sin_port);
     }
 
     StarterHome home{"ux"};

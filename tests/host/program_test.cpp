@@ -14,6 +14,7 @@
 #include <utility>
 
 #include "host/raw_client.h"
+#include "support/free_port.h"
 #include "support/host/program.h"
 #include "support/scratch_dir.h"
 
@@ -207,12 +208,12 @@ TEST_F(HostProgram, ServesFileTransfersOnALoopbackPortWhenToldTo) {
     sockaddr_in address{};
     address.sin_family = AF_INET;
     address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    address.sin_port = htons(freePort());
     const int taken = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    socklen_t length = sizeof address;
+    const socklen_t length = sizeof address;
     auto* const generic = reinterpret_cast<sockaddr*>(&address);
     ASSERT_EQ(::bind(taken, generic, length), 0);
     ASSERT_EQ(::listen(taken, 1), 0);
-    ASSERT_EQ(::getsockname(taken, generic, &length), 0);
     const std::string port = std::to_string(ntohs(address.sin_port));
     EXPECT_EQ(complaint(command({"--rpc-port", port})),
               "zavhost: cannot listen on the loopback port " + port + ": Address already in use\n");
