@@ -10,6 +10,7 @@ keeps and says is in DIRECTORY.
 
 import json
 import os
+import random
 import signal
 import socket
 import subprocess
@@ -53,8 +54,15 @@ def accept_all(listener):
 
 
 def free_port():
-    with socket.create_server(("127.0.0.1", 0)) as probe:
-        return probe.getsockname()[1]
+    """Below those that the system gives to outgoing connections, which could take it first."""
+    while True:
+        port = random.randint(12000, 31999)
+        with socket.socket() as probe:
+            try:
+                probe.bind(("127.0.0.1", port))
+                return port
+            except OSError:
+                pass  # somebody has it
 
 
 class Prometheus:

@@ -12,19 +12,23 @@
 #include <thread>
 
 #include "crash/killed_host.h"
+#include "support/process/left_running.h"
 
 namespace {
 
 class OvertakenHandOver : public KilledHost {
 protected:
     OvertakenHandOver() {
-        // What the guards ask takes as long as a query needs to get in between, and one task lasts.
+        // What the guards ask takes as long as a query needs to get in between, and one task lasts
+        // until the host is dead.
         const std::string slow = home.files().path("slow");
         const std::string list = home.files().read("home/bin/cinfo");
         home.files().script("home/bin/cinfo", "[ ! -e '" + slow + "' ] || sleep 0.5\n" + list);
         const std::string notes = home.files().path("notes");
         home.agentScript("echo begin $product >>'" + notes + "'\n" +
-                         "[ $product != b1 ] || sleep 2\n" + "echo end $product >>'" + notes + "'");
+                         "if [ $product = b1 ]; then\n" +
+                         untilReleased(home.files().path("killed")) + "fi\n" +
+                         "echo end $product >>'" + notes + "'");
     }
     int begun(const std::string& name) const {
         int times = 0;
@@ -50,6 +54,7 @@ TEST_F(OvertakenHandOver, RunsOnceAfterAKillAndNothingRunsTwice) {
     ASSERT_TRUE(eventually([this] { return begun("b1") == 1; }));
     host->program().signal(SIGKILL);
     EXPECT_EQ(host->program().wait().status, 128 + SIGKILL);
+    home.files().write("killed", "");
     ASSERT_EQ(::unlink(home.files().path("slow").c_str()), 0);
     host->start();
     ASSERT_TRUE(eventually([this] { return isIdle(); }));

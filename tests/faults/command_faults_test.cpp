@@ -91,7 +91,7 @@ TEST_F(CommandFaults, WritingInputLeavesTheChildWithLess) {
 TEST_F(CommandFaults, ClosesAndHandlesDoNotMatter) {
     echo_.expectAll(Call::kClose, EIO, {echo_.unharmed()});
     // Its outputs end before it does, so that it is waited for.
-    scenario("/bin/sh -c \"exec >&- 2>&-; sleep 0.05\"", "", "")
+    scenario("/bin/sh -c \"exec >&- 2>&-; sleep 1\"", "", "")
         .expectEach(Call::kPidfdOpen, EMFILE, {{"true 0 [] []", {}}});
 }
 

@@ -15,7 +15,8 @@ using ::testing::StartsWith;
 namespace {
 
 const char* const kPatient = "exec sleep 600\n";
-const char* const kStubborn = "trap '' TERM\nwhile :; do sleep 1; done\n";
+const char* const kStubborn =
+    "trap '' TERM\n: >\"$TOVRINHOME/tmp/deaf\"\nwhile :; do sleep 1; done\n";
 
 class AgentControl : public PreparedHomeTest {};
 
@@ -164,7 +165,7 @@ TEST_F(AgentControl, ChildrenOfAnAgentThatEndedAtOnceAreEnded) {
 TEST_F(AgentControl, AgentThatIgnoresTheRequestIsKilledWithItsChildren) {
     addAgent("tt", "sleep 600 &\necho $! >\"$TOVRINHOME/tmp/child\"\n" + std::string(kStubborn));
     ASSERT_EQ(agent({"start", "tt"}).status, 0);
-    ASSERT_TRUE(eventually([&] { return pidIn(inHome("tmp/child")) > 1; }));
+    ASSERT_TRUE(eventually([&] { return exists("tmp/deaf"); }));
     const pid_t pid = pidOf("tt");
     const Outcome stopped = agent({"-c", "stop", "tt"});
     EXPECT_EQ(stopped.status, 0);
@@ -359,6 +360,7 @@ TEST_F(AgentControl, ValuesOutOfRangeFallBackToTheDefaults) {
     const Outcome started = agent({"start", "tt"});
     EXPECT_EQ(started.status, 0);
     EXPECT_THAT(started.err, HasSubstr("START_SECONDS is not a number from 0 to 300"));
+    ASSERT_TRUE(eventually([&] { return exists("tmp/deaf"); }));
     EXPECT_THAT(agent({"stop", "tt"}).err, HasSubstr("killed after 1 s"));
 }
 

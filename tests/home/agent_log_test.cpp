@@ -65,7 +65,8 @@ TEST_F(AgentLog, GoesOnWithWhatIsThere) {
 }
 
 TEST_F(AgentLog, HoldsTheLastWordsOfAnAgentOnceItIsStopped) {
-    addAgent("tt", "trap 'echo last words; exit 0' TERM\necho up\nwhile :; do sleep 0.1; done\n");
+    addAgent("tt", "trap 'echo last words; exit 0' TERM\necho up\nwhile :; do sleep 0.1; done\n",
+             "START_SECONDS=0\nSTOP_SECONDS=20\n");
     ASSERT_EQ(agent({"start", "tt"}).status, 0);
     ASSERT_TRUE(logged("up\n"));
     ASSERT_EQ(agent({"stop", "tt"}).status, 0);

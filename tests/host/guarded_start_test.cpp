@@ -2,8 +2,6 @@
 // What a guarded host looks at before it starts, on a home of the starter home's and with the real
 // plug-in; and that an unguarded one does not.
 #include <gtest/gtest.h>
-#include <netinet/in.h>
-#include <sys/socket.h>
 
 #include <algorithm>
 #include <filesystem>
@@ -12,13 +10,13 @@
 
 #include "host/checks/check_list.h"
 #include "host/raw_client.h"
+#include "support/free_port.h"
 #include "support/host/program.h"
 #include "support/host/starter_home.h"
-#include "system/file_descriptor.h"
 
 namespace {
 
-using std::chrono::seconds;
+using std::chrono::minutes;
 
 class GuardedStart : public testing::Test {
 protected:
@@ -35,7 +33,7 @@ protected:
         return std::make_unique<Program>(command(socket, more), "", environment);
     }
     bool isReady(Program& program, const std::string& socket) const {
-        return program.awaitOutput("ready: " + scratch.path(socket), seconds(30));
+        return program.awaitOutput("ready: " + scratch.path(socket), minutes(3));
     }
     ProgramResult refused(const std::vector<std::string>& more = {},
                           const Environment& environment = {}) const {
@@ -56,18 +54,6 @@ protected:
                         "060100000", "--no-verify", "--", installer});
         EXPECT_EQ(installed.status, 0) << installed.out << installed.err;
         return scratch.read("umask");
-    }
-    /// A port of the loopback address that nobody uses.
-    static std::uint16_t freePort() {
-        const sys::FileDescriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        socklen_t length = sizeof address;
-        auto* const generic = reinterpret_cast<sockaddr*>(&address);
-        EXPECT_EQ(::bind(socket.get(), generic, length), 0);
-        EXPECT_EQ(::getsockname(socket.get(), generic, &length), 0);
-        return ntohs(address.sin_port);
     }
 
     StarterHome home{"ux"};
@@ -123,7 +109,7 @@ TEST_F(GuardedStart, OfManyAtOnceExactlyOneServesTheHome) {
     const auto owner = std::find_if(programs.begin(), programs.end(),
                                     [](const auto& program) { return program->running(); });
     ASSERT_NE(owner, programs.end());
-    EXPECT_TRUE((*owner)->awaitOutput("ready: ", seconds(30))) << (*owner)->err();
+    EXPECT_TRUE((*owner)->awaitOutput("ready: ", minutes(3))) << (*owner)->err();
     for (const auto& program : programs) {
         if (program == *owner) continue;
         EXPECT_EQ(program->wait().status, 1);

@@ -17,6 +17,9 @@
 
 class RawClient {
 public:
+    /// Longer than any wait that a test asks the host for.
+    static constexpr std::chrono::seconds kPatience{120};
+
     explicit RawClient(const std::string& path)
         : descriptor_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
         sockaddr_un address{};
@@ -55,8 +58,7 @@ public:
     }
 
     /// What has come when `end` has come with it, the connection has ended or the time is over.
-    std::string readUntil(const std::string& end,
-                          std::chrono::milliseconds time = std::chrono::seconds(20)) {
+    std::string readUntil(const std::string& end, std::chrono::milliseconds time = kPatience) {
         const auto deadline = std::chrono::steady_clock::now() + time;
         std::size_t found = std::string::npos;
         while ((found = buffer_.find(end)) == std::string::npos && fill(deadline)) {
@@ -64,14 +66,14 @@ public:
         const std::size_t length = found == std::string::npos ? buffer_.size() : found + end.size();
         return take(length);
     }
-    std::string readAll(std::chrono::milliseconds time = std::chrono::seconds(20)) {
+    std::string readAll(std::chrono::milliseconds time = kPatience) {
         const auto deadline = std::chrono::steady_clock::now() + time;
         while (fill(deadline)) {
         }
         return take(buffer_.size());
     }
     /// True when the other side closes within the time.
-    bool isClosed(std::chrono::milliseconds time = std::chrono::seconds(20)) {
+    bool isClosed(std::chrono::milliseconds time = kPatience) {
         const auto deadline = std::chrono::steady_clock::now() + time;
         while (!ended_ && fill(deadline)) {
         }
@@ -84,7 +86,7 @@ public:
         std::string body;
     };
     /// One answer with a Content-Length.
-    Answer readAnswer(std::chrono::milliseconds time = std::chrono::seconds(20)) {
+    Answer readAnswer(std::chrono::milliseconds time = kPatience) {
         Answer answer;
         answer.head = readUntil("\r\n\r\n", time);
         if (answer.head.size() < 12) return answer;

@@ -125,7 +125,13 @@ typed() {
         /dev/null >/tmp/typed
 }
 tab=$(printf '\t')
-typed "zavctl agen$tab--pro${tab}u${tab}x"
+# Where the host does not answer within two seconds, nothing is offered.
+tries=10
+until typed "zavctl agen$tab--pro${tab}u${tab}x" && grep -qF "zavctl agents --product u" /tmp/typed &&
+    grep -qF "Monitoring agent" /tmp/typed; do
+    tries=$((tries - 1))
+    [ $tries -gt 0 ] || break
+done
 holds /tmp/typed "zavctl agents --product u"
 holds /tmp/typed "Monitoring agent"
 

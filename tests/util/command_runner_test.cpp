@@ -160,7 +160,7 @@ TEST_F(CommandRunner, AChildThatDoesNotReadItsInputIsNoFailure) {
 }
 
 TEST_F(CommandRunner, AChildThatNeverTakesItsInputIsKilledAtTheTimeout) {
-    limit("3");
+    limit("10");
     TraceCapture traces;
     const Outcome outcome =
         run("/bin/sh -c 'echo early; exec sleep 60'", String(std::string(300 * 1000, 'x').c_str()));
@@ -219,12 +219,12 @@ TEST_F(CommandRunner, OneTextForBothGetsTheOutputThenTheErrors) {
 }
 
 TEST_F(CommandRunner, RunsPastTheTimeoutAreKilled) {
-    limit("3");
+    limit("10");
     TraceCapture traces;
     const Stopwatch watch;
     const Outcome outcome = run("/bin/sh -c 'echo begun; echo bad >&2; exec sleep 60'");
     EXPECT_FALSE(outcome.ran);
-    EXPECT_GT(watch.seconds(), 2.9);
+    EXPECT_GT(watch.seconds(), 9.9);
     EXPECT_EQ(outcome.rc, 0);
     EXPECT_EQ(outcome.text(), "begun\n");
     EXPECT_EQ(outcome.errText(), "");
@@ -247,7 +247,7 @@ TEST_F(CommandRunner, AnUnusableTimeoutLeavesNoTime) {
 }
 
 TEST_F(CommandRunner, OutputThatOthersKeepOpenEndsTheRunAtTheTimeout) {
-    limit("3");
+    limit("10");
     TraceCapture traces;
     LeftRunning other;
     const Outcome outcome = run("/bin/sh -c '" + other.command() + " echo started'");
@@ -263,7 +263,7 @@ TEST_F(CommandRunner, AChildThatNeverStopsWritingIsKilled) {
 }
 
 TEST_F(CommandRunner, AChildBlockedOnAFullErrorPipeIsKilled) {
-    limit("3");
+    limit("10");
     const Outcome outcome = run("/bin/sh -c 'echo out; head -c 200000 /dev/zero >&2'");
     EXPECT_FALSE(outcome.ran);
     EXPECT_EQ(outcome.text(), "out\n");
@@ -301,7 +301,7 @@ TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsNothingUpWhenReadWithoutB
 }
 
 TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsABlockingReadUpToTheTimeoutAtMost) {
-    limit("3");
+    limit("10");
     TraceCapture traces;
     const ScratchDir scratch;
     LeftRunning agent;
@@ -312,7 +312,7 @@ TEST_F(CommandRunner, AnAgentThatKeepsThePipesOpenHoldsABlockingReadUpToTheTimeo
     EXPECT_TRUE(outcome.ran);
     EXPECT_TRUE(agent.isRunning());
     EXPECT_EQ(outcome.rc, 6);
-    EXPECT_GT(watch.seconds(), 2.9);
+    EXPECT_GT(watch.seconds(), 9.9);
     EXPECT_EQ(outcome.text(), "up\n");
     EXPECT_EQ(outcome.errText(), "");
     EXPECT_THAT(traces.errors(), Contains(StartsWith("Bad return code (6)")));

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "crash/killed_host.h"
+#include "support/process/left_running.h"
 
 namespace {
 
@@ -53,8 +54,9 @@ protected:
                       {"ZAV_KILL_ARMED", armed()}}) {
         const std::string notes = home.files().path("notes");
         const std::string arm = home.files().path("arm");
-        home.agentScript("echo begin $product >>'" + notes + "'\n" + "echo end $product >>'" +
-                         notes + "'\n" +  //
+        // A task that kills the host must not do so before the answer is sent.
+        home.agentScript(untilReleased(home.files().path("go")) + "echo begin $product >>'" +
+                         notes + "'\n" + "echo end $product >>'" + notes + "'\n" +  //
                          "[ ! -e '" + arm + "' ] || mv '" + arm + "' '" + armed() + "'\n" +
                          "[ $ZAV_KILL_POINT != while-command-runs ] || ! rm '" + armed() +
                          "' || kill -9 $PPID");
@@ -77,6 +79,7 @@ protected:
 TEST_P(KillPoints, LeaveATaskThatRanOnceAtMostAndHasOneEnd) {
     const json request = {{"command", "START"}, {"product", "j1"}, {"transid", "j1"}};
     EXPECT_EQ(post("/v1/tasks", request).status, GetParam().answer);
+    home.files().write("go", "");
     EXPECT_EQ(host->program().wait().status, 128 + SIGKILL);
     host->start();
     ASSERT_TRUE(eventually([this] { return isIdle(); }));

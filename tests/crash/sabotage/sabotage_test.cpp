@@ -22,7 +22,7 @@ protected:
     /// Loads and kills it until the comparison finds this, but not for ever.
     std::vector<std::string> faultsUntil(const std::string& fault) {
         std::vector<std::string> found;
-        for (int round = 0; round < 5; ++round) {
+        for (int round = 0; round < 20; ++round) {
             loadAndKill(round, std::chrono::milliseconds(100));
             // Such a journal may never come to rest.
             eventually([this] { return isIdle(); });

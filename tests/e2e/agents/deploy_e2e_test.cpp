@@ -185,7 +185,7 @@ TEST(Deploy, AnInstallerThatHangsIsKilledAtTheTimeout) {
     ScriptHome home;
     home.files().script("depot/ux/7/hang.sh",
                         "echo $$ >'" + home.files().path("pid") + "'; exec sleep 60");
-    ManagedHost host(home.path(), depotOf(home, {{"TIMEOUT", "3"}}));
+    ManagedHost host(home.path(), depotOf(home, {{"TIMEOUT", "10"}}));
     const std::string command = "/bin/sh " + home.depot() + "ux/7/hang.sh";
     const ProgramResult result =
         host.zavctl({"--json", "install", "ux", "7", "--", "/bin/sh", "|DEPLOYDIR|/hang.sh"});

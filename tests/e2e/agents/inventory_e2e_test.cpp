@@ -102,7 +102,7 @@ void makeInventoryMeet(const StarterHome& home) {
                                               home.path("run") +
                                               "' | grep -c here) -ge 2 ]; do\n"
                                               "    tries=$((tries + 1))\n"
-                                              "    [ $tries -le 400 ] || exit 9\n"
+                                              "    [ $tries -le 2400 ] || exit 9\n"
                                               "    sleep 0.05\n"
                                               "done\n"
                                               "exec '" +
@@ -116,7 +116,7 @@ TEST(Inventory, TwoQueriesAtOnceDisturbNeitherEachOtherNorATaskThatRuns) {
     const std::string release = home.path("run/release");
     home.files().script("home/bin/TovrinAgent",
                         "touch '" + started + "'; tries=0; until [ -e '" + release +
-                            "' ]; do tries=$((tries + 1)); [ $tries -le 600 ] || exit 9; "
+                            "' ]; do tries=$((tries + 1)); [ $tries -le 2400 ] || exit 9; "
                             "sleep 0.05; done\n");
     ManagedHost host(home.path());
     const auto task = host.startZavctl({"start", "ux"});

@@ -149,7 +149,7 @@ TEST(StartStop, NoOutcomeWithinTheTimeoutIsAStatusOfItsOwn) {
 TEST(StartStop, ACommandThatHangsIsKilledAtTheTimeoutOfTheHost) {
     ScriptHome home;
     home.agentScript("echo $$ >'" + home.files().path("pid") + "'; exec sleep 60");
-    ManagedHost host(home.path(), {{"TIMEOUT", "3"}});
+    ManagedHost host(home.path(), {{"TIMEOUT", "10"}});
     const ProgramResult result = host.zavctl({"--json", "start", "ux"});
     EXPECT_EQ(result.status, 1);
     EXPECT_EQ(json::parse(result.out)["events"][0]["RETMSGID"], "ZAV1025E");

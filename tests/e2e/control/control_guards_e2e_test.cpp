@@ -410,6 +410,7 @@ TEST_F(ControlGuards, CtrlCNamesTheTaskAndTheWayToItsOutcome) {
     EXPECT_EQ(result.status, 130);
     EXPECT_EQ(result.err, "zavctl: interrupted; the host goes on with task " + id +
                               " (T-1)\n  zavctl task wait " + id + " waits for its outcome\n");
+    ASSERT_TRUE(eventually([&] { return home.agentCalls().size() == 1; }));
     const ProgramResult work = zavctl({"ps"});
     EXPECT_THAT(work.out, HasSubstr("T-1: START ux, running since "));
     EXPECT_THAT(work.out, HasSubstr("/bin/TovrinAgent "));
@@ -493,14 +494,20 @@ TEST_F(ControlGuards, AFailureIsADocumentAsJson) {
     const ProgramResult unknown = zavctl({"--json", "query", "NOPE"});
     EXPECT_EQ(unknown.status, 2);
     EXPECT_THAT(json::parse(unknown.out)["error"].get<std::string>(), HasSubstr("NOPE"));
-    const ProgramResult late = zavctl({"--timeout", "1", "events", "--count", "1"});
+    const ProgramResult late = zavctl({"--timeout", "5", "events", "--count", "1"});
     EXPECT_EQ(late.status, 4);
     EXPECT_EQ(late.err, "zavctl: only 0 of 1 outcomes came within the time-out\n");
 }
 
 TEST_F(ControlGuards, TheVersionIsThatOfTheHostToo) {
     start(Guards::On);
-    EXPECT_THAT(zavctl({"--version"}).out,
+    std::string told;
+    // The host has two seconds to answer.
+    eventually([&] {
+        told = zavctl({"--version"}).out;
+        return told.find(" at " + host->socket() + "\n") != std::string::npos;
+    });
+    EXPECT_THAT(told,
                 ContainsRegex("^zavctl [0-9.]+\nzavhost [0-9.]+ at " + host->socket() + "\n$"));
 }
 

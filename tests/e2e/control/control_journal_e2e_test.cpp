@@ -216,7 +216,7 @@ TEST_F(ControlJournal, AWatchedListIsShownAnewWhenSomethingChanges) {
     EXPECT_TRUE(watching.awaitOutput("second\n", std::chrono::seconds(20)));
     watching.signal(SIGTERM);
     openGate();
-    EXPECT_EQ(zavctl({"--timeout", "0.1", "tasks", "--watch"}).status, 0);
+    EXPECT_EQ(zavctl({"--timeout", "3", "tasks", "--watch"}).status, 0);
     EXPECT_EQ(zavctl({"--json", "tasks", "--watch"}).status, 2);
 }
 
@@ -224,7 +224,7 @@ TEST_F(ControlJournal, ATaskCanBeWaitedForByAnybodyAndHasTheVerbsStatus) {
     start();
     const auto waiting = install(3);
     ASSERT_TRUE(awaitRun());
-    const ProgramResult late = zavctl({"--timeout", "0.3", "task", "wait", "T"});
+    const ProgramResult late = zavctl({"--timeout", "3", "task", "wait", "T"});
     EXPECT_EQ(late.status, 4);
     EXPECT_THAT(late.err, HasSubstr("no outcome within the time-out"));
     openGate();

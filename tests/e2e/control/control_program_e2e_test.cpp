@@ -14,6 +14,7 @@
 #include "ctl/client/canned_host.h"
 #include "support/host/managed_host.h"
 #include "support/host/script_home.h"
+#include "support/process/left_running.h"
 
 namespace {
 
@@ -229,7 +230,7 @@ TEST(ControlProgram, FindsTheHostByTheEnvironmentAsTheHostDoes) {
         {byName, home.files().path("named")}};
     for (const auto& [environment, socket] : cases) {
         Program host({zavhostPath(), "--unguarded", "--home", home.path()}, "", environment);
-        ASSERT_TRUE(host.awaitOutput("ready: " + socket + "\n", std::chrono::seconds(20)))
+        ASSERT_TRUE(host.awaitOutput("ready: " + socket + "\n", std::chrono::minutes(3)))
             << host.err();
         EXPECT_EQ(runProgram({zavctlPath(), "status"}, "", environment).status, 0);
         EXPECT_EQ(runProgram({zavctlPath(), "push", file}, "", environment).status, 0);
@@ -266,10 +267,12 @@ TEST(ControlProgram, AHostThatDoesNotAnswerIsStatusFour) {
 
 TEST(ControlProgram, AHostThatGoesAwayAndStaysAwayLeavesNoOutcome) {
     ScriptHome home;
-    home.agentScript("exec sleep 3");
+    home.agentScript(untilReleased(home.files().path("go")));
     ManagedHost host(home.path());
-    const auto waiting = host.startZavctl({"--timeout", "3", "start", "ux", "--transid", "T"});
+    const auto waiting = host.startZavctl({"--timeout", "15", "start", "ux", "--transid", "T"});
     ASSERT_TRUE(eventually([&] { return !home.agentCalls().empty(); }));
+    // Time for the answer, which nothing else shows: without it nobody knows of the task.
+    ASSERT_EQ(host.zavctl({"task", "show", "T"}).status, 0);
     host.program().signal(SIGKILL);
     const ProgramResult result = waiting->wait();
     EXPECT_EQ(result.status, 4);
@@ -280,12 +283,14 @@ TEST(ControlProgram, AHostThatGoesAwayAndStaysAwayLeavesNoOutcome) {
     const json document = json::parse(result.out);
     EXPECT_EQ(document["task"]["transid"], "T");
     EXPECT_EQ(document["events"], json::array());
+    home.files().write("go", "");
 }
 
 TEST(ControlProgram, EventsThatEndWithTheHostAreStatusThreeAndAWholeDocument) {
     ScriptHome home;
     ManagedHost host(home.path());
-    const auto events = host.startZavctl({"--timeout", "10", "events"});
+    const auto events = host.startZavctl({"--timeout", "15", "events"});
+    ASSERT_TRUE(events->awaitOutput("{\"events\": [", std::chrono::seconds(20)));
     ASSERT_EQ(host.zavctl({"start", "ux", "--transid", "T"}).status, 0);
     ASSERT_TRUE(events->awaitOutput("\"T\"", std::chrono::seconds(20)));
     host.program().signal(SIGKILL);
@@ -330,10 +335,10 @@ TEST(ControlProgram, EventsThatNobodyReadsAnyMoreEnd) {
 TEST(ControlProgram, EventsThatDoNotComeInTimeAreStatusFour) {
     ScriptHome home;
     ManagedHost host(home.path());
-    const ProgramResult none = host.zavctl({"--json", "--timeout", "2", "events", "--count", "1"});
+    const ProgramResult none = host.zavctl({"--json", "--timeout", "5", "events", "--count", "1"});
     EXPECT_EQ(none.status, 4);
     EXPECT_EQ(json::parse(none.out)["events"], json::array());
-    EXPECT_EQ(host.zavctl({"--timeout", "2", "events"}).status, 0) << "as long as was asked for";
+    EXPECT_EQ(host.zavctl({"--timeout", "5", "events"}).status, 0) << "as long as was asked for";
 }
 
 // ---- What is said -------------------------------------------------------------------------------

@@ -62,7 +62,7 @@ TEST_F(WatchedAgents, AreWrittenAnewOnlyWhenTheyHaveChangedWhereThereIsNoTermina
 }
 
 TEST_F(WatchedAgents, AreWatchedNoLongerThanTheTimeOut) {
-    const ProgramResult ended = host.zavctl({"--timeout", "1", "agents", "--watch"});
+    const ProgramResult ended = host.zavctl({"--timeout", "5", "agents", "--watch"});
     EXPECT_EQ(ended.status, 0) << ended.err;
     EXPECT_THAT(ended.out, HasSubstr("Monitoring agent"));
 }

@@ -48,8 +48,8 @@ protected:
     void hangWithProcesses() {
         const std::string quiet = " >/dev/null 2>&1 </dev/null & ";
         home.agentScript("sleep 1000" + quiet + "echo $! >" + file("child") + "; (sleep 1000" +
-                         quiet + "echo $! >" + file("orphan") + "); setsid sleep 1000" + quiet +
-                         "echo $! >" + file("agent") + "; exec sleep 1000");
+                         quiet + "echo $! >" + file("orphan") + "); setsid sh -c 'echo $$ >" +
+                         file("agent") + "; exec sleep 1000'" + quiet + "exec sleep 1000");
     }
 
     ScriptHome home;
@@ -58,7 +58,7 @@ protected:
 
 TEST_F(TimeOut, EndsWhatTheCommandStartedButNotAgents) {
     hangWithProcesses();
-    start(Guards::On, {"--task-timeout", "1"});
+    start(Guards::On, {"--task-timeout", "5"});
     EXPECT_EQ(host->zavctl({"start", "ux"}).status, 1);
     EXPECT_TRUE(eventually([&] { return !lives("child") && !lives("orphan"); }));
     EXPECT_TRUE(lives("agent"));
@@ -66,7 +66,7 @@ TEST_F(TimeOut, EndsWhatTheCommandStartedButNotAgents) {
 
 TEST_F(TimeOut, WithoutGuardsTheyLiveOn) {
     hangWithProcesses();
-    start(Guards::Off, {"--task-timeout", "1"});
+    start(Guards::Off, {"--task-timeout", "5"});
     EXPECT_EQ(host->zavctl({"start", "ux"}).status, 1);
     for (const char* const name : {"child", "orphan", "agent"})
         EXPECT_TRUE(lives(name)) << name;

@@ -14,6 +14,7 @@
 #include <cstring>
 
 #include "e2e/transfers/push_fixture.h"
+#include "support/free_port.h"
 
 namespace {
 
@@ -156,19 +157,6 @@ protected:
         EXPECT_EQ(depot("big"), "a big-endian caller");
     }
 };
-
-std::uint16_t freePort() {
-    const int descriptor = ::socket(AF_INET, SOCK_STREAM, 0);
-    sockaddr_in address{};
-    address.sin_family = AF_INET;
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    socklen_t size = sizeof address;
-    auto* const generic = reinterpret_cast<sockaddr*>(&address);
-    EXPECT_EQ(::bind(descriptor, generic, size), 0);
-    EXPECT_EQ(::getsockname(descriptor, generic, &size), 0);
-    ::close(descriptor);
-    return ntohs(address.sin_port);
-}
 
 TEST_F(RpcSocket, BelongsToItsOwnerAlone) {
     start();

@@ -4,7 +4,7 @@
 
 #include <stdexcept>
 
-#include "http/tcp_client.h"
+#include "support/free_port.h"
 #include "tests/fleet/e2e/fleet_scene.h"
 
 namespace fleet_e2e {
@@ -14,11 +14,6 @@ std::string programPath(const std::string& name) {
     return ZAV_BUILD_DIR "/bin/" + name;
 }
 
-/// A port that nobody has now.
-std::string freePort() {
-    return std::to_string(http_test::portOf(http_test::listener()));
-}
-
 void insist(bool isSo, const std::string& what) {
     if (!isSo) throw std::runtime_error(what);
 }
@@ -26,7 +21,8 @@ void insist(bool isSo, const std::string& what) {
 }  // namespace
 
 ProgramFleet::ProgramFleet()
-    : bus_("nats://localhost:" + freePort()), url_("https://localhost:" + freePort()) {
+    : bus_("nats://localhost:" + std::to_string(freePort())),
+      url_("https://localhost:" + std::to_string(freePort())) {
     makeKeys();
     Program& bus = *programs_.emplace_back(
         begin({"/usr/sbin/nats-server", "-c", scratch_.path("keys/bus/nats-server.conf")}));

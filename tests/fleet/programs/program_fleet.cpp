@@ -1,11 +1,7 @@
 #include "tests/fleet/programs/program_fleet.h"
 
-#include <netinet/in.h>
 #include <signal.h>
-#include <sys/socket.h>
-#include <unistd.h>
 
-#include <random>
 #include <stdexcept>
 #include <utility>
 
@@ -13,29 +9,13 @@
 #include "fleet/operator/identity/operator_files.h"
 #include "fleet/server/keys/trust/operators.h"
 #include "fleet/server/keys/trust/trust_database.h"
+#include "support/free_port.h"
 
 namespace fleet_programs {
 namespace {
 
 constexpr const char* kReady = "Server is ready";
 constexpr const char* kWorks = "the centre works";
-
-/// A port that nobody listens on, below those that the system gives to outgoing connections.
-std::string freePort() {
-    std::random_device dice;
-    std::uniform_int_distribution<int> ports(12000, 31999);
-    for (;;) {
-        const int port = ports(dice);
-        const int descriptor = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_port = htons(static_cast<std::uint16_t>(port));
-        const bool isFree =
-            ::bind(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0;
-        ::close(descriptor);
-        if (isFree) return std::to_string(port);
-    }
-}
 
 std::string programPath(const std::string& name) {
     return ZAV_BUILD_DIR "/bin/" + name;
@@ -78,7 +58,9 @@ fleet::Moment wallTime() {
 }
 
 ProgramFleet::ProgramFleet()
-    : busPort_(freePort()), centrePort_(freePort()), made_([this](fleet::FleetPlan& plan) {
+    : busPort_(std::to_string(freePort())),
+      centrePort_(std::to_string(freePort())),
+      made_([this](fleet::FleetPlan& plan) {
           plan.busUrls = {"nats://localhost:" + busPort_};
           plan.url = "https://localhost:" + centrePort_;
           plan.now = wallTime() - std::chrono::minutes(1);

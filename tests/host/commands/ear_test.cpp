@@ -140,7 +140,7 @@ TEST_F(Ear, ACommandThatOutlastsItsTimeWasKilledByThePlugin) {
 }
 
 TEST_F(Ear, AnEndBehindAnOutputThatStaysOpenIsStillKnown) {
-    const ScopedEnv timeout("TIMEOUT", "1");
+    const ScopedEnv timeout("TIMEOUT", "5");
     const LeftRunning left;
     const Command command = hearOne(left.command() + " echo started; exit 5");
     EXPECT_FALSE(outcome.ran);

@@ -1,6 +1,8 @@
 // A request that is handed over right after it came costs one look at the machine.
 #include "host/guard/last_look.h"
 
+#include <filesystem>
+
 #include "host/guard/guard_fixture.h"
 
 namespace {
@@ -22,21 +24,39 @@ protected:
         return inventories() - before;
     }
 
+    struct Looks {
+        std::size_t early;
+        std::size_t atHandOver;
+    };
+    /// How often the machine is looked at for a request that is handed over as soon as it has come.
+    /// Where that took longer than a look holds, it is done anew with guards that know of nothing.
+    Looks looksAtOnce(const Conditions& conditions) {
+        for (int rounds = 1;; ++rounds) {
+            const Clock::time_point begin = Clock::now();
+            const std::size_t before = inventories();
+            comes(conditions);
+            const std::size_t early = inventories() - before;
+            const Looks looks{early, looksAtHandOver(conditions)};
+            if (Clock::now() - begin <= host::LastLook::kHolds || rounds == 100) return looks;
+            std::filesystem::remove(files.path("calls"));
+            guards.emplace(host::Site{page, files.path("home"), files.path("depot")}, *tasks);
+        }
+    }
+
     const Conditions start = command("START", "ux", {{"TARGETMSN", "inst1:elsewhere:UX"}});
     const Conditions stop = command("STOP", "ux", {{"TARGETMSN", "inst1:elsewhere:UX"}});
 };
 
 TEST_F(LastLook, IsEnoughForARequestThatIsHandedOverAtOnce) {
-    comes(start);
-    EXPECT_EQ(inventories(), 1U);
-    EXPECT_EQ(looksAtHandOver(start), 0U);
+    const Looks looks = looksAtOnce(start);
+    EXPECT_EQ(looks.early, 1U);
+    EXPECT_EQ(looks.atHandOver, 0U);
     EXPECT_EQ(files.read("calls"), "-i inst1:elsewhere:UX -pc ux\n")
         << "nor is the target asked again";
 }
 
 TEST_F(LastLook, IsGoodOnce) {
-    comes(start);
-    EXPECT_EQ(looksAtHandOver(start), 0U);
+    EXPECT_EQ(looksAtOnce(start).atHandOver, 0U);
     EXPECT_EQ(looksAtHandOver(start), 1U);
 }
 

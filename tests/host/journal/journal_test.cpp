@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <chrono>
 #include <filesystem>
 #include <thread>
 
@@ -193,12 +194,22 @@ TEST_F(Journals, LetTasksGoForwardOnly) {
 }
 
 TEST_F(Journals, KeepWhatRanAtOnceWithoutACommitOfItsOwn) {
-    open();
-    const std::uint64_t before = journal->transactions();
-    journal->enterSoon(ended(asked("t1", TaskWay::AtOnce)));
-    entered("t2");
-    EXPECT_EQ(journal->transactions(), before + 1);
-    EXPECT_EQ(stateOf("t1"), TaskState::Done);
+    // What can wait is written by itself after a second, so that a longer round tells nothing.
+    constexpr int kMostRounds = 60;
+    for (int round = 0; round < kMostRounds; ++round) {
+        const auto begin = std::chrono::steady_clock::now();
+        open();
+        const std::uint64_t before = journal->transactions();
+        journal->enterSoon(ended(asked("t1", TaskWay::AtOnce)));
+        entered("t2");
+        const std::uint64_t after = journal->transactions();
+        const auto time = std::chrono::steady_clock::now() - begin;
+        EXPECT_EQ(stateOf("t1"), TaskState::Done);
+        if (time >= std::chrono::seconds(1)) continue;
+        EXPECT_EQ(after, before + 1);
+        return;
+    }
+    FAIL() << "no round took less than a second";
 }
 
 TEST_F(Journals, TellThatATaskHasBegunBeforeItIsWritten) {

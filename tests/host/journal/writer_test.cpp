@@ -173,7 +173,7 @@ TEST_F(JournalWriter, MeasuresTransactionsAndCountsThoseThatFail) {
 
 TEST_F(JournalWriter, WhatCanWaitGoesWithTheNextThatCannot) {
     Writer writer(database);
-    writer.submitLater(inserting(1));
+    writer.submitLater(inserting(1), std::chrono::hours(1));
     writer.submit(inserting(2)).get();
     EXPECT_EQ(writer.transactions(), 1U);
     EXPECT_EQ(rows(), 2);

@@ -71,7 +71,7 @@ void ManagedHost::start() {
                                        [](const auto& one) { return one.first == "KBB_RAS1_LOG"; });
     if (!saysWhere) environment.emplace_back("KBB_RAS1_LOG", scratch_.path("trace.log"));
     program_ = std::make_unique<Program>(argv, "", environment);
-    if (!program_->awaitOutput("ready: " + socket_, std::chrono::seconds(20))) {
+    if (!program_->awaitOutput("ready: " + socket_, std::chrono::minutes(3))) {
         throw std::runtime_error("the host is not ready: " + program_->wait().err);
     }
 }

@@ -8,8 +8,6 @@
 // Without the variable the servers go in an order of chance; its seed is printed.
 
 #include <gtest/gtest.h>
-#include <netinet/in.h>
-#include <sys/socket.h>
 
 #include <algorithm>
 #include <chrono>
@@ -28,8 +26,8 @@
 #include "fleet/bus/nats/store.h"
 #include "fleet/server/program/centre_program.h"
 #include "support/fleet/nats_server.h"
+#include "support/free_port.h"
 #include "support/scratch_dir.h"
-#include "system/file_descriptor.h"
 
 namespace {
 
@@ -45,31 +43,13 @@ constexpr int kOrdersAtATime = 40;
 /// Elections and copies take their time on a machine that does much else.
 constexpr auto kSettledWithin = 180s;
 
-/// A port for servers among themselves, that nobody uses now: below those that the system gives to
-/// outgoing connections, which could take it while a server is down.
-int freePort(std::mt19937& random) {
-    std::uniform_int_distribution<int> ports(12'000, 31'999);
-    for (;;) {
-        const int port = ports(random);
-        const sys::FileDescriptor socket(::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0));
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        address.sin_port = htons(static_cast<std::uint16_t>(port));
-        if (::bind(socket.get(), reinterpret_cast<sockaddr*>(&address), sizeof address) == 0) {
-            return port;
-        }
-    }
-}
-
 class ClusterOfThree : public testing::Test {
 protected:
     ClusterOfThree() {
-        std::mt19937 random{std::random_device()()};
         std::vector<int> ports;
         std::string routes;
         for (std::size_t i = 0; i < kServers; ++i) {
-            ports.push_back(freePort(random));
+            ports.push_back(freePort());
             routes += (i == 0 ? "" : ", ") + std::string("\"nats://127.0.0.1:") +
                       std::to_string(ports.back()) + '"';
         }
