@@ -56,6 +56,7 @@ IncomingOrder incomingOrderOf(const std::string& bytes, const RolloutOperator& b
 std::vector<IncomingOrder> readIncomingOrders(const std::vector<std::string>& orders,
                                               const RolloutOperator& by, const std::string& fleet,
                                               Moment now) {
+    insistThat(orders.size() <= kMostOrders, "there are more than 100,000 orders");
     std::vector<IncomingOrder> incoming;
     incoming.reserve(orders.size());
     std::set<std::string> hosts;

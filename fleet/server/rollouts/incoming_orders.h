@@ -20,6 +20,9 @@ struct IncomingOrder {
     Moment expires{};
 };
 
+/// A roll-out to more hosts is refused.
+constexpr std::size_t kMostOrders = 100'000;
+
 /// Reads orders, of which each must be signed by that operator, be for that fleet, still have time,
 /// and be the only one for its host. What a host may refuse beyond that only the host knows. Throws
 /// RolloutError, which names the order.

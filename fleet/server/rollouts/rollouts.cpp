@@ -6,7 +6,6 @@
 
 #include "fleet/bus/messages/order.h"
 #include "fleet/server/rollouts/end_states.h"
-#include "fleet/server/rollouts/incoming_orders.h"
 #include "fleet/server/rollouts/learn_outcomes.h"
 #include "fleet/server/rollouts/rollout_error.h"
 #include "fleet/server/rollouts/share.h"
@@ -85,12 +84,10 @@ Rollout Rollouts::find(const std::string& id) const {
 std::string Rollouts::create(const NewRollout& wanted, Moment now) {
     insistThat(wanted.id.empty() || isOrderId(wanted.id),
                "a roll-out's identifier is 32 hexadecimal digits in lower case");
-    insistThat(!wanted.orders.empty(), "there is no order, so no host");
-    insistThat(wanted.orders.size() <= kMostHosts, "there are more than 100,000 orders");
     checkOperator(wanted.by);
+    const std::vector<IncomingOrder>& orders = wanted.orders;
+    insistThat(!orders.empty(), "there is no order, so no host");
     checkTimes(wanted.plan);
-    const std::vector<IncomingOrder> orders =
-        readIncomingOrders(wanted.orders, wanted.by, fleet_, now);
     insistThat(orders.front().kind != kCancel, "a roll-out cannot cancel orders; abort does that");
     Rollout rollout = draftOf(wanted, orders.front(), orders.size(), now);
     const std::vector<std::size_t> waves = wavesOf(wanted.plan.waves, orders.size());
@@ -162,16 +159,15 @@ void Rollouts::pauseThoseOf(std::vector<std::string> revoked, Moment now) {
 }
 
 void Rollouts::resume(const std::string& id, const RolloutOperator& by,
-                      const std::vector<std::string>& orders, Moment now) {
+                      const std::vector<IncomingOrder>& orders, Moment now) {
     checkOperator(by);
-    const std::vector<IncomingOrder> incoming = readIncomingOrders(orders, by, fleet_, now);
     learnAllOutcomes(store_);
     store_.atomically([&] {
         Rollout rollout = find(id);
         insistOnState(rollout.state == RolloutState::Paused,
                       std::string("the roll-out is ") + nameOf(rollout.state) + ", not paused");
         insistOnLivingKey(rollout);
-        for (const IncomingOrder& order : incoming) {
+        for (const IncomingOrder& order : orders) {
             const Part part = partFor(rollout, order);
             insistThat(part.state == PartState::Waiting,
                        "host " + order.host + " does not wait for its order any more");
@@ -219,18 +215,17 @@ void Rollouts::replaceOrder(Part part, const IncomingOrder& order) {
 }
 
 void Rollouts::abort(const std::string& id, const RolloutOperator& by,
-                     const std::vector<std::string>& cancels, Moment now) {
+                     const std::vector<IncomingOrder>& cancels, Moment now) {
     checkOperator(by);
-    const std::vector<IncomingOrder> incoming = readIncomingOrders(cancels, by, fleet_, now);
     learnAllOutcomes(store_);
     store_.atomically([&] {
         Rollout rollout = find(id);
         if (rollout.state == RolloutState::Aborted) {
-            insistOnState(!incoming.empty(), "the roll-out has been aborted already");
+            insistOnState(!cancels.empty(), "the roll-out has been aborted already");
         } else {
             endAsAborted(rollout, by, now);
         }
-        for (const IncomingOrder& cancel : incoming)
+        for (const IncomingOrder& cancel : cancels)
             keepCancel(rollout, cancel);
     });
 }
@@ -258,16 +253,15 @@ void Rollouts::keepCancel(const Rollout& rollout, const IncomingOrder& order) {
 }
 
 void Rollouts::retryFailed(const std::string& id, const RolloutOperator& by,
-                           const std::vector<std::string>& orders, bool isForced, Moment now) {
+                           const std::vector<IncomingOrder>& orders, bool isForced, Moment now) {
     checkOperator(by);
     insistThat(!orders.empty(), "there is no order, so nothing is tried again");
-    const std::vector<IncomingOrder> incoming = readIncomingOrders(orders, by, fleet_, now);
     learnAllOutcomes(store_);
     store_.atomically([&] {
         Rollout rollout = find(id);
         insistOnState(rollout.state != RolloutState::Aborted, "the roll-out has been aborted");
         insistOnLivingKey(rollout);
-        for (const IncomingOrder& order : incoming) {
+        for (const IncomingOrder& order : orders) {
             Part part = partFor(rollout, order);
             const bool isUnknown = part.state == PartState::Over && part.end == kUnknown;
             insistThat(!isUnknown || isForced, "nobody knows whether the order of host " +

@@ -8,20 +8,19 @@
 #include <string>
 #include <vector>
 
+#include "fleet/server/rollouts/incoming_orders.h"
 #include "fleet/server/rollouts/rollout_pace.h"
 #include "fleet/server/rollouts/rollout_view.h"
 
 namespace fleet {
-
-struct IncomingOrder;
 
 /// What an operator hands over for a new roll-out.
 struct NewRollout {
     std::string id;  ///< 32 hexadecimal digits in lower case; "" has one made up
     RolloutOperator by;
     RolloutPlan plan;
-    /// One for each host, signed by the operator. Their order is that of the hosts in the waves.
-    std::vector<std::string> orders;
+    /// One for each host, in the order of the hosts in the waves.
+    std::vector<IncomingOrder> orders;
 };
 
 /// A host for which an operator has to sign an order.
@@ -32,17 +31,16 @@ struct HostToSign {
     std::size_t tries;  ///< as in Part
 };
 
-/// One thread at a time, and the same one that uses the centre's store.
+/// One thread at a time, and the same one that uses the centre's store. Orders that are handed over
+/// here have been read for the operator who hands them over, see readIncomingOrders(): that needs
+/// no store, and takes long for many hosts.
 class Rollouts {
 public:
-    /// A roll-out to more hosts is refused.
-    static constexpr std::size_t kMostHosts = 100'000;
     /// Orders that end so soon are signed anew together with those that have ended.
     static constexpr Moment kSoon{5 * 60 * 1000};
 
-    /// Borrows the store. `fleet` is the fleet's name.
-    Rollouts(RolloutStore& store, std::string fleet, GiveNumber give)
-        : store_(store), fleet_(std::move(fleet)), pace_(store, std::move(give)) {}
+    /// Borrows the store.
+    Rollouts(RolloutStore& store, GiveNumber give) : store_(store), pace_(store, std::move(give)) {}
 
     /// Returns the roll-out's identifier. Nothing is released yet.
     std::string create(const NewRollout& wanted, Moment now);
@@ -58,19 +56,19 @@ public:
     /// must do so for all that have expired: see toSignAnew(). Failures that have paused it are
     /// forgiven; it pauses again after as many others.
     void resume(const std::string& id, const RolloutOperator& by,
-                const std::vector<std::string>& orders, Moment now);
+                const std::vector<IncomingOrder>& orders, Moment now);
 
     /// Releases nothing any more, and ends all parts that still wait. Hosts that have their orders
     /// need others that cancel them: see toCancel(). `cancels` are some of those; more may follow
     /// by calling it again. A roll-out that has finished can be aborted while hosts still have its
     /// orders.
     void abort(const std::string& id, const RolloutOperator& by,
-               const std::vector<std::string>& cancels, Moment now);
+               const std::vector<IncomingOrder>& cancels, Moment now);
 
     /// Gives other orders to hosts that failed, see toTryAgain(); some or all. They belong to the
     /// latest wave, which goes on with them. A finished roll-out runs again; a paused one stays so.
     void retryFailed(const std::string& id, const RolloutOperator& by,
-                     const std::vector<std::string>& orders, bool isForced, Moment now);
+                     const std::vector<IncomingOrder>& orders, bool isForced, Moment now);
 
     /// Learns what hosts have told, and releases what is due. To be called every second. Returns
     /// whether there is more to do at once.
@@ -109,7 +107,6 @@ private:
     void keepCancel(const Rollout& rollout, const IncomingOrder& order);
 
     RolloutStore& store_;
-    const std::string fleet_;
     RolloutPace pace_;
     std::vector<std::string> revoked_;  ///< keys of operators
 };

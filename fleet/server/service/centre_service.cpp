@@ -125,7 +125,7 @@ void CentreService::begin(CentreParts& parts) {
     rolloutStore_ = std::make_unique<SqliteRolloutStore>(parts.database);
     Centre& centre = parts.centre;
     rollouts_ = std::make_unique<Rollouts>(
-        *rolloutStore_, facts_.fleet,
+        *rolloutStore_,
         [this, &centre](const std::string& host, const std::string& order,
                         const std::string& bytes) -> std::optional<Number> {
             // It will never take an order; nothing shall wait for it.

@@ -1,5 +1,6 @@
 // POST /v1/rollouts/{id}/pause, resume, abort and retry-failed
 
+#include <memory>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <string>
@@ -17,7 +18,7 @@ ApiEndpoint postPause, postResume, postAbort, postRetryFailed;
 
 namespace {
 
-using SignedOrders = std::vector<std::string>;
+using ReadOrders = std::vector<IncomingOrder>;
 
 /// What comes without orders costs little, and stops something perhaps: that waits for nothing.
 bool bringsOrders(const Call& call) {
@@ -45,8 +46,8 @@ http::Answer doneWithOrders(Visit& visit, const Call& call, Act act) {
     std::optional<OneAtATime> turn;
     if (bringsOrders(call)) turn.emplace(visit);
     return done(visit, call.required("id"),
-                [act, orders = givenOrders(visit, call)](CentreDesk& desk, const std::string& id,
-                                                         const RolloutOperator& by) {
+                [act, orders = std::make_shared<const ReadOrders>(givenOrders(visit, call))](
+                    CentreDesk& desk, const std::string& id, const RolloutOperator& by) {
                     act(desk.rollouts, id, by, *orders, desk.now);
                 });
 }
@@ -65,14 +66,14 @@ http::Answer postResume(Visit& visit, const Call& call) {
     return doneWithOrders(
         visit, call,
         [](Rollouts& rollouts, const std::string& id, const RolloutOperator& by,
-           const SignedOrders& orders, Moment now) { rollouts.resume(id, by, orders, now); });
+           const ReadOrders& orders, Moment now) { rollouts.resume(id, by, orders, now); });
 }
 
 http::Answer postAbort(Visit& visit, const Call& call) {
     return doneWithOrders(
         visit, call,
         [](Rollouts& rollouts, const std::string& id, const RolloutOperator& by,
-           const SignedOrders& orders, Moment now) { rollouts.abort(id, by, orders, now); });
+           const ReadOrders& orders, Moment now) { rollouts.abort(id, by, orders, now); });
 }
 
 http::Answer postRetryFailed(Visit& visit, const Call& call) {
@@ -80,7 +81,7 @@ http::Answer postRetryFailed(Visit& visit, const Call& call) {
     return doneWithOrders(
         visit, call,
         [isForced](Rollouts& rollouts, const std::string& id, const RolloutOperator& by,
-                   const SignedOrders& orders,
+                   const ReadOrders& orders,
                    Moment now) { rollouts.retryFailed(id, by, orders, isForced, now); });
 }
 

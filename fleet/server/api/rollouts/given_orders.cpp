@@ -1,11 +1,11 @@
 #include "fleet/server/api/rollouts/given_orders.h"
 
+#include <memory>
 #include <nlohmann/json.hpp>
 
 #include "fleet/bus/messages/document.h"
 #include "fleet/bus/messages/order.h"
 #include "fleet/server/api/schema.h"
-#include "fleet/server/rollouts/incoming_orders.h"
 
 namespace fleet {
 namespace {
@@ -46,18 +46,19 @@ std::vector<std::string> ordersIn(const nlohmann::json& array) {
     return orders;
 }
 
-Orders givenOrders(const Visit& visit, const Call& call) {
-    Orders orders = ordersOf(visit, call);
+std::vector<IncomingOrder> givenOrders(const Visit& visit, const Call& call) {
+    const Orders orders = ordersOf(visit, call);
     try {
-        readIncomingOrders(*orders, visit.asOperator(), visit.services.facts.fleet, wallClock());
+        std::vector<IncomingOrder> read = readIncomingOrders(
+            *orders, visit.asOperator(), visit.services.facts.fleet, wallClock());
         for (const std::string& order : *orders)
             insistOnFiles(visit.services, order);
+        return read;
     } catch (...) {
         // Nobody wants them again.
         forgetBatch(visit, call);
         throw;
     }
-    return orders;
 }
 
 void forgetBatch(const Visit& visit, const Call& call) {

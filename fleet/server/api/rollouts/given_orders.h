@@ -1,12 +1,12 @@
 /// Signed orders that come with a request, or came before it in a batch.
 #pragma once
 
-#include <memory>
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 #include <vector>
 
 #include "fleet/server/api/visit.h"
+#include "fleet/server/rollouts/incoming_orders.h"
 
 namespace fleet {
 
@@ -16,7 +16,7 @@ std::vector<std::string> ordersIn(const nlohmann::json& array);
 /// The orders that the body's member "batch" or "orders" stands for; none without either. They are
 /// signed by the visitor, and their files are here: what can be seen without the centre's thread
 /// is no burden for it. Throws BadRequest, NothingThere and RolloutError.
-std::shared_ptr<const std::vector<std::string>> givenOrders(const Visit& visit, const Call& call);
+std::vector<IncomingOrder> givenOrders(const Visit& visit, const Call& call);
 
 /// Forgets the batch that the body names, if it names one.
 void forgetBatch(const Visit& visit, const Call& call);

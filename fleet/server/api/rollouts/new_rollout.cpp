@@ -54,7 +54,7 @@ http::Answer postRollout(Visit& visit, const Call& call) {
     wanted.id = textAt(call.body(), "id", "");
     wanted.by = visit.asOperator();
     wanted.plan = planIn(call.body());
-    wanted.orders = *givenOrders(visit, call);
+    wanted.orders = givenOrders(visit, call);
     const RolloutView made = visit.services.ask([wanted = std::move(wanted)](CentreDesk& desk) {
         return desk.rollouts.show(desk.rollouts.create(wanted, desk.now), desk.now);
     });

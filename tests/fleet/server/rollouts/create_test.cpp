@@ -9,12 +9,12 @@ using namespace rollout_test;
 
 class NewRolloutTest : public RolloutTest {
 protected:
-    void expectInvalid(const fleet::NewRollout& made, const std::string& words) {
-        expectRefusal(RolloutError::Kind::Invalid, words, [&] { rollouts_->create(made, now_); });
+    void expectInvalid(const Wanted& made, const std::string& words) {
+        expectRefusal(RolloutError::Kind::Invalid, words, [&] { make(made); });
     }
     /// Insists that one such order among others spoils the roll-out.
     void expectInvalid(const fleet::Order& bad, const std::string& words) {
-        fleet::NewRollout made = wanted({"h00"});
+        Wanted made = wanted({"h00"});
         made.orders.push_back(sign(bad));
         expectInvalid(made, words);
     }
@@ -55,12 +55,12 @@ TEST_F(NewRolloutTest, KeepsWhatItsOrdersSayAndReleasesNothing) {
 }
 
 TEST_F(NewRolloutTest, MayBringItsIdentifier) {
-    fleet::NewRollout made = wanted(enrol(1));
+    Wanted made = wanted(enrol(1));
     made.id = "0123456789abcdef0123456789abcdef";
-    EXPECT_EQ(rollouts_->create(made, now_), made.id);
-    fleet::NewRollout again = wanted({"h00"});
+    EXPECT_EQ(make(made), made.id);
+    Wanted again = wanted({"h00"});
     again.id = made.id;
-    expectRefusal(RolloutError::Kind::Conflict, "already", [&] { rollouts_->create(again, now_); });
+    expectRefusal(RolloutError::Kind::Conflict, "already", [&] { make(again); });
     again.id = "0123456789ABCDEF0123456789ABCDEF";
     expectInvalid(again, "identifier");
 }
@@ -70,10 +70,11 @@ TEST_F(NewRolloutTest, NeedsAnOrder) {
 }
 
 TEST_F(NewRolloutTest, NeedsAnOperator) {
-    fleet::NewRollout made = wanted(enrol(1));
+    Wanted made = wanted(enrol(1));
     made.by.name.clear();
     expectInvalid(made, "name");
     made.by = {"anna", ""};
+    made.orders.clear();
     expectInvalid(made, "key");
 }
 
@@ -105,7 +106,7 @@ TEST_F(NewRolloutTest, HasOrdersOfWhichListsCanTell) {
 
 TEST_F(NewRolloutTest, HasOrdersThatItsOperatorHasSigned) {
     enrol(2);
-    fleet::NewRollout made = wanted({"h00"});
+    Wanted made = wanted({"h00"});
     const fleet::KeyPair other = fleet::KeyPair::make(fleet::KeyKind::User);
     made.orders.push_back(fleet::signOrder(order("h01"), other, "certificate"));
     expectInvalid(made, "has not signed it");
@@ -129,7 +130,7 @@ TEST_F(NewRolloutTest, HasOrdersThatStillHaveTimeButNotForEver) {
 
 TEST_F(NewRolloutTest, HasOrdersThatTheirNumbersFitAround) {
     enrol(2);
-    fleet::NewRollout made = wanted({"h00"});
+    Wanted made = wanted({"h00"});
     const auto longOrder = [&](std::size_t bytes) {
         fleet::Order sized = order("h00");
         const std::size_t others = sign(sized).size();
@@ -141,7 +142,7 @@ TEST_F(NewRolloutTest, HasOrdersThatTheirNumbersFitAround) {
     ASSERT_EQ(made.orders[0].size(), most + 1);
     expectInvalid(made, "too long");
     made.orders = {longOrder(most)};
-    id_ = rollouts_->create(made, now_);
+    id_ = make(made);
     EXPECT_LE(
         fleet::signNumber("h00", fleet::kHighestNumber, part("h00").order, made.orders[0], key_)
             .size(),
@@ -165,7 +166,7 @@ TEST_F(NewRolloutTest, HasOrdersThatDoTheSame) {
 
 TEST_F(NewRolloutTest, CancelsNothing) {
     enrol(1);
-    fleet::NewRollout made = wanted({"h00"});
+    Wanted made = wanted({"h00"});
     fleet::Order cancel = order("h00");
     cancel.kind = fleet::kCancel;
     cancel.body = R"({"order":"0123456789abcdef0123456789abcdef"})";
@@ -175,12 +176,12 @@ TEST_F(NewRolloutTest, CancelsNothing) {
 
 TEST_F(NewRolloutTest, TakesNoOrderTwice) {
     enrol(2);
-    const fleet::NewRollout first = wanted({"h00"});
-    id_ = rollouts_->create(first, now_);
+    const Wanted first = wanted({"h00"});
+    id_ = make(first);
     expectInvalid(first, "was handed over before");
     tick();
     expectInvalid(first, "was handed over before");
-    fleet::NewRollout single = wanted({"h01"});
+    Wanted single = wanted({"h01"});
     const std::string name = fleet::readOrder(single.orders[0]).order.id;
     giver()("h01", name, single.orders[0]);
     expectInvalid(single, "was handed over before");
@@ -216,7 +217,7 @@ TEST_F(NewRolloutTest, StandsInTheListTheNewestFirst) {
     const Names hosts = enrol(1);
     Names made;
     for (int i = 0; i < 3; ++i)
-        made.push_back(rollouts_->create(wanted(hosts), now_));
+        made.push_back(make(wanted(hosts)));
     const auto idsOf = [&](const std::string& before, std::size_t most) {
         Names ids;
         for (const fleet::RolloutView& one : rollouts_->list(before, most, now_))
@@ -238,7 +239,7 @@ TEST_F(NewRolloutTest, IsFoundByItsIdentifierOnly) {
     expectMissing([&] { rollouts_->pause("x", by(), now_); });
     expectMissing([&] { rollouts_->resume("x", by(), {}, now_); });
     expectMissing([&] { rollouts_->abort("x", by(), {}, now_); });
-    expectMissing([&] { rollouts_->retryFailed("x", by(), orders({"h00"}), false, now_); });
+    expectMissing([&] { rollouts_->retryFailed("x", by(), read(orders({"h00"})), false, now_); });
     expectMissing([&] { rollouts_->toCancel("x"); });
 }
 

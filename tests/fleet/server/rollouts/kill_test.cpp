@@ -43,7 +43,7 @@ protected:
     /// what is known then, as someone does who has lost an answer.
     bool act(fleet::Rollouts& rollouts) {
         if (!store_.rollout(id_)) {
-            rollouts.create(first_, now_);
+            rollouts.create(read(first_), now_);
             return true;
         }
         now_ += kSecond;
@@ -53,7 +53,7 @@ protected:
             rollouts.resume(id_, by(), {}, now_);
         } else if (state == RolloutState::Finished) {
             const Names failed = hostsOf(rollouts.toTryAgain(id_, false));
-            if (!failed.empty()) rollouts.retryFailed(id_, by(), orders(failed), false, now_);
+            if (!failed.empty()) rollouts.retryFailed(id_, by(), read(orders(failed)), false, now_);
             return !failed.empty();
         }
         tellEnds();
@@ -69,7 +69,7 @@ protected:
     /// The same, with an abort as soon as the second wave is released.
     bool actAndAbort(fleet::Rollouts& rollouts) {
         if (!store_.rollout(id_)) {
-            rollouts.create(first_, now_);
+            rollouts.create(read(first_), now_);
             return true;
         }
         now_ += kSecond;
@@ -79,7 +79,7 @@ protected:
             return true;
         }
         const Names open = cancels();
-        if (!open.empty()) rollouts.abort(id_, by(), open, now_);
+        if (!open.empty()) rollouts.abort(id_, by(), read(open), now_);
         return isMore || !open.empty();
     }
 
@@ -93,7 +93,7 @@ protected:
     bool liveThrough(Fate& fate, const std::function<bool(fleet::Rollouts&)>& act) {
         MortalStore store(database_, fate);
         for (int turn = 0; turn < 1'000; ++turn) {
-            fleet::Rollouts rollouts(store, "fleet", mortalGiver(fate));
+            fleet::Rollouts rollouts(store, mortalGiver(fate));
             try {
                 while (act(rollouts)) {
                     if (++turn > 1'000) break;
@@ -120,7 +120,7 @@ protected:
             database_.run((std::string("DELETE FROM ") + table).c_str());
     }
 
-    fleet::NewRollout first_;
+    Wanted first_;
 };
 
 TEST_F(RolloutsKilled, GiveEachHostItsOrdersOnce) {

@@ -14,10 +14,10 @@ protected:
         expectRefusal(RolloutError::Kind::Invalid, words, call);
     }
     void pause() { rollouts_->pause(id_, by(), now_); }
-    void resume(const Names& fresh = {}) { rollouts_->resume(id_, by(), fresh, now_); }
-    void abort(const Names& cancels = {}) { rollouts_->abort(id_, by(), cancels, now_); }
+    void resume(const Names& fresh = {}) { rollouts_->resume(id_, by(), read(fresh), now_); }
+    void abort(const Names& cancels = {}) { rollouts_->abort(id_, by(), read(cancels), now_); }
     void retry(const Names& fresh, bool isForced = false) {
-        rollouts_->retryFailed(id_, by(), fresh, isForced, now_);
+        rollouts_->retryFailed(id_, by(), read(fresh), isForced, now_);
     }
     /// A roll-out to that many hosts that has finished; all are done.
     void finish(std::size_t hosts) {

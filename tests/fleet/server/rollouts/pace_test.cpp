@@ -263,7 +263,7 @@ TEST_F(RolloutPaceTest, LearnsAllThatWasToldBeforeItReleasesMore) {
 
 TEST_F(RolloutPaceTest, SeveralRunBesideEachOther) {
     const std::string first = create(2);
-    const std::string second = rollouts_->create(wanted({"h00", "h01"}), now_);
+    const std::string second = make(wanted({"h00", "h01"}));
     tick();
     EXPECT_EQ(given("h00").size(), 2U);
     endAll({"h00", "h01"}, "done");
@@ -274,9 +274,9 @@ TEST_F(RolloutPaceTest, SeveralRunBesideEachOther) {
 }
 
 TEST_F(RolloutPaceTest, AHostThatTheCentreNoLongerHasNeedsNoOrder) {
-    const std::string id = rollouts_->create(wanted(enrol(2)), now_);
+    const std::string id = make(wanted(enrol(2)));
     id_ = id;
-    fleet::Rollouts withoutFirst(store_, "fleet",
+    fleet::Rollouts withoutFirst(store_,
                                  [&](const std::string& host, const std::string& order,
                                      const std::string& bytes) -> std::optional<fleet::Number> {
                                      if (host == "h00") return std::nullopt;

@@ -42,7 +42,7 @@ protected:
                     now_ += kHour * static_cast<int>(dice.below(13));
                     return;
                 case 6:
-                    rollouts_ = std::make_unique<fleet::Rollouts>(store_, "fleet", giver());
+                    rollouts_ = std::make_unique<fleet::Rollouts>(store_, giver());
                     return;
                 case 7:
                 case 8:
@@ -57,14 +57,14 @@ protected:
     void resume(bool areSignedAnew) {
         Names fresh;
         if (areSignedAnew) fresh = orders(hostsOf(rollouts_->toSignAnew(id_, now_)));
-        rollouts_->resume(id_, by(), fresh, now_);
+        rollouts_->resume(id_, by(), read(fresh), now_);
     }
     void retry(bool isForced) {
         const Names fresh = orders(hostsOf(rollouts_->toTryAgain(id_, isForced)));
-        rollouts_->retryFailed(id_, by(), fresh, isForced, now_);
+        rollouts_->retryFailed(id_, by(), read(fresh), isForced, now_);
     }
     void abortSometimes(model::Dice& dice) {
-        if (dice.below(5) == 0) rollouts_->abort(id_, by(), cancels(), now_);
+        if (dice.below(5) == 0) rollouts_->abort(id_, by(), read(cancels()), now_);
     }
     /// A host tells an end. One of which nobody knew may be told later.
     void tell(model::Dice& dice) {

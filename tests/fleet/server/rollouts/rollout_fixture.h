@@ -37,7 +37,7 @@ protected:
         dice_.faults = false;
         bus_.republish = [](const std::string&, fleet::Number) {};
         fleet::makeCentreTables(database_);
-        rollouts_ = std::make_unique<fleet::Rollouts>(store_, "fleet", giver());
+        rollouts_ = std::make_unique<fleet::Rollouts>(store_, giver());
     }
 
     /// Hosts "h00", "h01" and so on, heard right now.
@@ -80,8 +80,23 @@ protected:
         return signedOrders;
     }
     fleet::RolloutOperator by() const { return {"anna", key_.publicKey()}; }
-    fleet::NewRollout wanted(const Names& hosts) const {
-        fleet::NewRollout made;
+    /// A roll-out whose orders nobody has read yet.
+    struct Wanted {
+        std::string id;
+        fleet::RolloutOperator by;
+        fleet::RolloutPlan plan;
+        Names orders;
+    };
+    std::vector<fleet::IncomingOrder> read(const Names& signedOrders) const {
+        return fleet::readIncomingOrders(signedOrders, by(), "fleet", now_);
+    }
+    fleet::NewRollout read(const Wanted& wanted) const {
+        return {wanted.id, wanted.by, wanted.plan,
+                fleet::readIncomingOrders(wanted.orders, wanted.by, "fleet", now_)};
+    }
+    std::string make(const Wanted& wanted) { return rollouts_->create(read(wanted), now_); }
+    Wanted wanted(const Names& hosts) const {
+        Wanted made;
         made.by = by();
         made.plan = plan_;
         made.orders = orders(hosts);
@@ -89,7 +104,7 @@ protected:
     }
     /// A roll-out to that many new hosts, as plan_ says.
     std::string create(std::size_t hosts) {
-        id_ = rollouts_->create(wanted(enrol(hosts)), now_);
+        id_ = make(wanted(enrol(hosts)));
         return id_;
     }
 
